@@ -1,0 +1,175 @@
+// velathumb_bench SCRATCH-DIRECTORY
+//
+// Measures velathumb against the least that could do the same, each in the same run, and prints
+// the ratios. Works in a sandbox; the scratch directory (on a real disk) takes its files.
+
+#include <cstdio>
+#include <fstream>
+#include <string>
+#include <vector>
+
+#include "answering_daemon.h"
+#include "photo_tree.h"
+#include "support/build_paths.h"
+#include "support/files.h"
+#include "support/profile_file.h"
+#include "support/sandbox.h"
+#include "support/stub_tool.h"
+#include "timed_run.h"
+
+namespace vela_bench {
+
+namespace {
+
+using vela_test::HostPath;
+
+const std::string kScratch = vela_test::kWritablePlace;
+
+/// All six size classes, with everything that the converter must do in one phase or the next.
+std::string WriteSixSizes() {
+  return vela_test::WriteProfileFile(
+      "/tmp/six.conf", {{"thumb_xl", 1280, 90, "0.5x0.5+1+0", "VELAPHOTO_THUMB_XL.jpg", 0},
+                        {"thumb_m", 320, 80, "0.5x0.5+1+0", "VELAPHOTO_THUMB_M.jpg", 0},
+                        {"thumb_l", 800, 80, "", "VELAPHOTO_THUMB_L.jpg", 1},
+                        {"thumb_sm", 240, 80, "", "VELAPHOTO_THUMB_SM.jpg", 1},
+                        {"thumb_b", 640, 80, "", "VELAPHOTO_THUMB_B.jpg", 2},
+                        {"thumb_s", 120, 80, "", "VELAPHOTO_THUMB_S.jpg", 2}});
+}
+
+void Report(const char* what, const Cost& subject, const Cost& floor, int photos, const char* aim) {
+  std::printf("%-34s %9.3f ms %9.3f ms  ratio %6.3f  %s\n", what,
+              subject.wallSeconds * 1e3 / photos, floor.wallSeconds * 1e3 / photos,
+              subject.wallSeconds / floor.wallSeconds, aim);
+}
+
+void WriteCommands(const std::string& path) {
+  std::ofstream file(path, std::ios::binary);
+  for (const vela_test::StubCall& call : vela_test::AllStubCalls()) {
+    for (const std::string& argument : call.arguments) {
+      file << argument << '\0';
+    }
+    file << '\0';
+  }
+}
+
+/// Wall time over 50 photos against the same converter commands alone.
+void MeasureConversion() {
+  constexpr int kPhotos = 50;
+  const std::string directory = kScratch + "/real";
+  const std::string profiles = WriteSixSizes();
+  MakeRealPhotos(directory, kPhotos, 2048, 1536);
+  const std::vector<std::string> subject = {vela_test::VelathumbPath(), profiles, directory};
+  {
+    const vela_test::StubTool recorder(vela_test::kConverterPath);
+    recorder.Plan(vela_test::StubPlan().PassThrough("/usr/bin/convert"));
+    TimedRun(subject);
+    WriteCommands("/tmp/commands");
+  }
+  vela_test::InstallRealConverter();
+  const CostPair cost = FastestOf(
+      3,
+      [&] {
+        RemoveMetadata(directory);
+        return TimedRun(subject);
+      },
+      [&] {
+        return TimedRun({HostPath(FLOOR_COMMANDS), "/tmp/commands"});
+      });
+  Report("conversion, a photo", cost.subject, cost.floor, kPhotos, "(aim 1.02)");
+  vela_test::RemoveTree(directory);
+}
+
+/// Time over photos that are up to date against listing them and taking the status of their files.
+void MeasureNothingToDo() {
+  constexpr int kPhotos = 20000;
+  const std::string directory = kScratch + "/done";
+  MakePhotoFiles(directory, kPhotos);
+  MakeThumbFiles(directory, kPhotos);
+  const std::vector<std::string> subject = {vela_test::VelathumbPath(), WriteSixSizes(), directory};
+  const auto runSubject = [&] { return TimedRun(subject); };
+  const auto runFloor = [&] { return TimedRun({HostPath(FLOOR_STATUS), directory}); };
+  const CostPair alone = FastestOf(5, runSubject, runFloor);
+  Report("nothing to do, no daemon, a photo", alone.subject, alone.floor, kPhotos, "(aim 2.00)");
+  {
+    const AnsweringDaemon daemon;
+    const CostPair answered = FastestOf(3, runSubject, runFloor);
+    Report("nothing to do, daemon, a photo", answered.subject, answered.floor, kPhotos, "");
+  }
+  vela_test::RemoveTree(directory);
+}
+
+/// Start to end on an empty directory against a program that does nothing.
+void MeasureStart() {
+  constexpr int kRuns = 100;
+  const std::string directory = kScratch + "/empty";
+  vela_test::MakeDirectories(directory);
+  const std::vector<std::string> subject = {vela_test::VelathumbPath(), WriteSixSizes(), directory};
+  const CostPair cost = FastestOf(
+      kRuns, [&] { return TimedRun(subject); }, [] { return TimedRun({"/bin/true"}); });
+  std::printf("%-34s %9.3f ms %9.3f ms  %.3f ms more (aim 5)\n", "start to end, empty directory",
+              cost.subject.wallSeconds * 1e3, cost.floor.wallSeconds * 1e3,
+              (cost.subject.wallSeconds - cost.floor.wallSeconds) * 1e3);
+}
+
+/// Resident memory of a running process in MiB.
+struct Memory {
+  double now = 0;
+  double peak = 0;
+};
+
+Memory MemoryOf(int pid) {
+  std::ifstream status("/proc/" + std::to_string(pid) + "/status");
+  Memory memory;
+  for (std::string line; std::getline(status, line);) {
+    long kibibytes = 0;
+    if (std::sscanf(line.c_str(), "VmRSS: %ld", &kibibytes) == 1) {
+      memory.now = static_cast<double>(kibibytes) / 1024;
+    } else if (std::sscanf(line.c_str(), "VmHWM: %ld", &kibibytes) == 1) {
+      memory.peak = static_cast<double>(kibibytes) / 1024;
+    }
+  }
+  return memory;
+}
+
+/// Peak memory for a large directory, and whether it grows with the photos done.
+void MeasureMemory() {
+  constexpr int kPhotos = 100000;
+  const std::string directory = kScratch + "/many";
+  MakePhotoFiles(directory, kPhotos);
+  // Without a profile nothing is converted, so that every photo passes quickly.
+  const std::string profiles = vela_test::WriteProfileFile("/tmp/none.conf", {});
+  std::vector<Memory> samples;
+  TimedRun({vela_test::VelathumbPath(), profiles, directory}, [&](int pid) {
+    const Memory memory = MemoryOf(pid);
+    if (memory.peak > 0) {
+      samples.push_back(memory);
+    }
+  });
+  if (samples.size() < 10) {
+    Fail("too few samples of the memory");
+  }
+  std::printf("%-34s %9.1f MiB  (aim below 40)\n", "peak memory, 100,000 photos",
+              samples.back().peak);
+  std::printf("%-34s %9.1f MiB %9.1f MiB at the end\n", "resident after three tenths",
+              samples[samples.size() * 3 / 10].now, samples.back().now);
+  vela_test::RemoveTree(directory);
+}
+
+}  // namespace
+
+}  // namespace vela_bench
+
+int main(int argc, char** argv) {
+  if (argc != 2) {
+    std::fprintf(stderr, "usage: velathumb_bench SCRATCH-DIRECTORY\n");
+    return 2;
+  }
+  vela_test::EnterSandbox(argv[1]);
+  std::setvbuf(stdout, nullptr, _IOLBF, 0);
+  std::printf("%-34s %12s %12s\n", "", "velathumb", "floor");
+  vela_bench::MeasureStart();
+  vela_bench::MeasureNothingToDo();
+  vela_bench::MeasureMemory();
+  vela_bench::MeasureConversion();
+  return 0;
+}

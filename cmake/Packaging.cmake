@@ -1,0 +1,37 @@
+# The Debian package: cpack -G DEB in the build directory.
+set(CPACK_PACKAGE_NAME velathumb)
+set(CPACK_PACKAGE_CONTACT "velathumb maintainers <root@localhost>" CACHE STRING
+    "Name and address of who answers for the package")
+set(CPACK_PACKAGE_DESCRIPTION_SUMMARY "${PROJECT_DESCRIPTION}")
+set(CPACK_PACKAGE_DESCRIPTION
+    "velathumb makes the missing preview thumbnails of the photos in a directory or a tree, in up to
+six sizes, and keeps them in a metadata directory beside the photos.")
+set(CPACK_PACKAGING_INSTALL_PREFIX /usr)
+set(CPACK_STRIP_FILES ON)
+set(CPACK_VERBATIM_VARIABLES ON)
+
+# Libraries are found in the program itself; the tools it drives come from the project's list.
+execute_process(
+  COMMAND ${PROJECT_SOURCE_DIR}/scripts/dependencies run
+  OUTPUT_VARIABLE VELA_RUN_PACKAGES
+  OUTPUT_STRIP_TRAILING_WHITESPACE COMMAND_ERROR_IS_FATAL ANY)
+string(REPLACE "\n" ", " CPACK_DEBIAN_PACKAGE_DEPENDS "${VELA_RUN_PACKAGES}")
+set(CPACK_DEBIAN_PACKAGE_SHLIBDEPS ON)
+set(CPACK_DEBIAN_PACKAGE_SECTION graphics)
+set(CPACK_DEBIAN_PACKAGE_PRIORITY optional)
+set(CPACK_DEBIAN_FILE_NAME DEB-DEFAULT)
+
+# The tools where the program looks for them. Only the package does this: an installation under
+# another prefix has no business in /usr/vela.
+set(VELA_TOOLS ${PROJECT_BINARY_DIR}/tools)
+file(MAKE_DIRECTORY ${VELA_TOOLS}/bin ${VELA_TOOLS}/lib)
+file(COPY_FILE ${PROJECT_SOURCE_DIR}/programs/convert-thumb/convert-thumb.sh
+     ${VELA_TOOLS}/bin/convert-thumb)
+file(CREATE_LINK /usr/bin/convert-im6.q16 ${VELA_TOOLS}/lib/convert-thumb SYMBOLIC)
+file(CREATE_LINK /usr/bin/exiftool ${VELA_TOOLS}/bin/exiftool SYMBOLIC)
+set(CPACK_INSTALLED_DIRECTORIES ${VELA_TOOLS} vela)
+
+install(FILES ${PROJECT_SOURCE_DIR}/README.md DESTINATION ${CMAKE_INSTALL_DOCDIR})
+install(FILES ${PROJECT_SOURCE_DIR}/LICENSE DESTINATION ${CMAKE_INSTALL_DOCDIR} RENAME copyright)
+
+include(CPack)

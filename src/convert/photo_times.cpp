@@ -1,0 +1,13 @@
+#include "convert/photo_times.h"
+
+namespace {
+
+constexpr int kSetAccessAndModification = 3;
+
+}  // namespace
+
+void DateLikePhoto(const std::string& path, const VLIBCFileStatus& photo) {
+  const VLIBCTime modified = {photo.modification.seconds, 0};
+  const VLIBCFileTimes times = {modified, modified, photo.change};
+  VLIBCFileUTime(path.c_str(), kSetAccessAndModification, &times);
+}

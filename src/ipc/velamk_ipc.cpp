@@ -1,0 +1,93 @@
+#include "ipc/velamk_ipc.h"
+
+#include <json/value.h>
+#include <syslog.h>
+
+#include "platform/velaindex.h"
+
+namespace {
+
+constexpr char kLogSource[] = "velamk_ipc";
+constexpr int kExchangeSeconds = 1800;
+
+Json::Value MakeRequest(const char* command) {
+  Json::Value packet(Json::objectValue);
+  packet["command"] = command;
+  return packet;
+}
+
+Json::Value MakePathRequest(const char* command, const char* path) {
+  Json::Value packet = MakeRequest(command);
+  packet["path"] = path == nullptr ? "" : path;
+  return packet;
+}
+
+/// Returns a member of the reply, null when it is missing.
+Json::Value Member(const Json::Value& packet, const char* name) {
+  return packet.isObject() ? packet[name] : Json::Value();
+}
+
+/// The JSON library throws on a value that it cannot convert; a daemon that answers with one must
+/// not end the program.
+bool ToBool(const Json::Value& value) {
+  return value.isConvertibleTo(Json::booleanValue) && value.asBool();
+}
+
+int ToInt(const Json::Value& value) {
+  return value.isConvertibleTo(Json::intValue) ? value.asInt() : 0;
+}
+
+/// Replaces the request by the daemon's reply and tells whether the daemon carried it out; logs the
+/// failure with the operation's `line`.
+bool Exchange(Json::Value& packet, int line) {
+  AutoSendRecvPacket(PluginDaemonSocketPath, -1, packet, kExchangeSeconds);
+  if (ToBool(Member(packet, "success"))) {
+    return true;
+  }
+  syslog(LOG_ERR, "%s:%d fail", kLogSource, line);
+  return false;
+}
+
+bool AskResult(const char* command, int line) {
+  Json::Value packet = MakeRequest(command);
+  return Exchange(packet, line) && ToBool(Member(packet, "result"));
+}
+
+}  // namespace
+
+int GetMediaFromPluginDB(int type, const char* path, VELA_MEDIA_INFO& out) {
+  Json::Value packet = MakePathRequest("GET_MEDIA_FROM_PLUGIN_DB", path);
+  packet["type"] = type;
+  if (!Exchange(packet, 30)) {
+    return -1;
+  }
+  Json::Value media = Member(packet, "media");
+  if (!media.isObject()) {
+    media = Json::Value(Json::objectValue);
+  }
+  MediaInfoJson2Object(media, out);
+  return 0;
+}
+
+int GetIndexVersion(const char* path) {
+  Json::Value packet = MakePathRequest("GET_INDEX_VERSION", path);
+  return Exchange(packet, 57) ? ToInt(Member(packet, "version")) : -1;
+}
+
+bool IsDisableConvertVideo() {
+  return AskResult("IS_DISABLE_CONVERT_VIDEO", 83);
+}
+
+bool IsDisableConvertPhoto() {
+  return AskResult("IS_DISABLE_CONVERT_PHOTO", 110);
+}
+
+void PostPhotoConvert(const char* path) {
+  Json::Value packet = MakePathRequest("POST_PHOTO_CONVERT", path);
+  Exchange(packet, 137);
+}
+
+void PostVideoConvert(const char* path) {
+  Json::Value packet = MakePathRequest("POST_VIDEO_CONVERT", path);
+  Exchange(packet, 157);
+}

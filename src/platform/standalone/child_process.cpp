@@ -1,0 +1,218 @@
+#include "platform/standalone/child_process.h"
+
+#include <fcntl.h>
+#include <poll.h>
+#include <sched.h>
+#include <signal.h>
+#include <sys/prctl.h>
+#include <sys/syscall.h>
+#include <sys/wait.h>
+#include <syslog.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <cstring>
+#include <memory>
+#include <new>
+
+#include "platform/standalone/child_status_keeper.h"
+#include "platform/standalone/deadline.h"
+#include "platform/standalone/file_descriptor.h"
+#include "platform/standalone/signal_block.h"
+
+namespace velaplatform {
+
+namespace {
+
+constexpr int kFirstOtherDescriptor = STDERR_FILENO + 1;
+constexpr size_t kCommandNameSize = 16;
+constexpr size_t kChildStackSize = 64 * 1024;
+
+/// What the child has to do, in memory that it shares with its parent until the program runs.
+struct ChildPlan {
+  const char* program;
+  char* const* arguments;
+  ChildStreams streams;
+  pid_t parent;
+  char commandName[kCommandNameSize];
+  int error;
+};
+
+// From here to RunChild: the child before its program, on borrowed memory. System calls only.
+
+void SetDefaultSignals() {
+  struct sigaction action;
+  memset(&action, 0, sizeof(action));
+  action.sa_handler = SIG_DFL;
+  for (int number = 1; number < NSIG; ++number) sigaction(number, &action, nullptr);
+}
+
+/// Copies `fd` out of the way of the standard descriptors; `fallback` is copied for one that is not
+/// open. Returns the copy, or -1 with errno set.
+int CopyAside(int fd, int fallback) {
+  const int copy = fd < 0 ? -1 : fcntl(fd, F_DUPFD_CLOEXEC, kFirstOtherDescriptor);
+  if (copy >= 0) return copy;
+  if (fd >= 0 && errno != EBADF) return -1;
+  return fcntl(fallback, F_DUPFD_CLOEXEC, kFirstOtherDescriptor);
+}
+
+bool SetStreams(const ChildStreams& streams) {
+  const int null = open("/dev/null", O_RDWR | O_CLOEXEC);
+  if (null < 0) return false;
+  const int input = CopyAside(null, null);
+  const int output = CopyAside(streams.standardOutput, null);
+  const int error = CopyAside(streams.standardError, null);
+  if (input < 0 || output < 0 || error < 0) return false;
+  if (dup2(input, STDIN_FILENO) < 0 || dup2(output, STDOUT_FILENO) < 0) return false;
+  if (dup2(error, STDERR_FILENO) < 0) return false;
+  // Also what the program itself was given open by whoever started it.
+  closefrom(kFirstOtherDescriptor);
+  return true;
+}
+
+bool EndWithParent(pid_t parent) {
+  if (prctl(PR_SET_PDEATHSIG, SIGTERM) != 0) return false;
+  // The parent may have been killed before the call above.
+  if (getppid() == parent) return true;
+  errno = ESRCH;
+  return false;
+}
+
+bool UnblockSignals() {
+  sigset_t none;
+  sigemptyset(&none);
+  return sigprocmask(SIG_SETMASK, &none, nullptr) == 0;
+}
+
+/// Returns an errno value; does not return once the program runs.
+int BecomeProgram(const ChildPlan& plan) {
+  SetDefaultSignals();
+  // The kernel sets this name only at the end of exec, after the parent has gone on: until then a
+  // search for the program's name would miss the child.
+  prctl(PR_SET_NAME, plan.commandName);
+  if (!EndWithParent(plan.parent)) return errno;
+  if (setpgid(0, 0) != 0) return errno;
+  if (!SetStreams(plan.streams)) return errno;
+  if (!UnblockSignals()) return errno;
+  execve(plan.program, plan.arguments, environ);
+  return errno;
+}
+
+int RunChild(void* data) {
+  auto* plan = static_cast<ChildPlan*>(data);
+  plan->error = BecomeProgram(*plan);
+  _exit(127);
+}
+
+ChildPlan MakePlan(const char* program, char* const arguments[], const ChildStreams& streams) {
+  ChildPlan plan{program, arguments, streams, getpid(), {}, 0};
+  const char* slash = strrchr(program, '/');
+  strncpy(plan.commandName, slash == nullptr ? program : slash + 1, kCommandNameSize - 1);
+  return plan;
+}
+
+/// Returns the process id, or -1 with errno set. The parent stands still until the program runs or
+/// the child has ended, which makes sharing its memory safe, and the start independent of how much
+/// memory that is.
+pid_t CloneChild(ChildPlan& plan) {
+  // Not on the caller's own stack: the child leaves its frames there without returning from them,
+  // which tools that watch over the stack take for damage.
+  const std::unique_ptr<char[]> stack(new (std::nothrow) char[kChildStackSize]);
+  if (!stack) {
+    errno = ENOMEM;
+    return -1;
+  }
+  return clone(RunChild, stack.get() + kChildStackSize, CLONE_VM | CLONE_VFORK | SIGCHLD, &plan);
+}
+
+/// Returns 0 when the child has ended, ETIMEDOUT, or another errno value when the system has no
+/// such wait.
+int AwaitByDescriptor(pid_t pid, const Deadline& deadline) {
+  const FileDescriptor process(static_cast<int>(syscall(SYS_pidfd_open, pid, 0)));
+  if (!process) return errno;
+  pollfd entry{process.Get(), POLLIN, 0};
+  for (;;) {
+    const int ready = poll(&entry, 1, deadline.PollMilliseconds());
+    if (ready > 0) return 0;
+    if (ready < 0 && errno != EINTR) return errno;
+    if (ready == 0 && deadline.Left() == std::chrono::nanoseconds::zero()) return ETIMEDOUT;
+  }
+}
+
+/// Asks again and again, for systems that cannot wait with a limit.
+int AwaitByAsking(pid_t pid, const Deadline& deadline) {
+  constexpr int kPauseMilliseconds = 10;
+  for (;;) {
+    siginfo_t info;
+    info.si_pid = 0;
+    const int result = waitid(P_PID, static_cast<id_t>(pid), &info, WEXITED | WNOWAIT | WNOHANG);
+    if (result != 0 && errno != EINTR) return 0;
+    if (result == 0 && info.si_pid == pid) return 0;
+    if (deadline.Left() == std::chrono::nanoseconds::zero()) return ETIMEDOUT;
+    poll(nullptr, 0, kPauseMilliseconds);
+  }
+}
+
+bool HasEnded(pid_t pid) {
+  siginfo_t info;
+  info.si_pid = 0;
+  const int result = waitid(P_PID, static_cast<id_t>(pid), &info, WEXITED | WNOWAIT | WNOHANG);
+  return result != 0 || info.si_pid == pid;
+}
+
+}  // namespace
+
+int StartChild(const char* program, char* const arguments[], const ChildStreams& streams,
+               pid_t& pid) {
+  // A handler that ends the tools must not run while this one has no name yet.
+  const SignalBlock noSignals;
+  ChildPlan plan = MakePlan(program, arguments, streams);
+  KeepChildStatus();
+  const pid_t child = CloneChild(plan);
+  if (child < 0) {
+    const int error = errno;
+    ReleaseChildStatus();
+    return error;
+  }
+  if (plan.error != 0) {
+    ReapChild(child);
+    return plan.error;
+  }
+  pid = child;
+  return 0;
+}
+
+void AwaitChild(pid_t pid) {
+  siginfo_t info;
+  while (waitid(P_PID, static_cast<id_t>(pid), &info, WEXITED | WNOWAIT) != 0) {
+    if (errno != EINTR) return;
+  }
+}
+
+bool AwaitChildFor(pid_t pid, std::chrono::seconds limit) {
+  const Deadline deadline(limit);
+  const int error = AwaitByDescriptor(pid, deadline);
+  if (error == 0 || error == ETIMEDOUT) return error == 0;
+  return AwaitByAsking(pid, deadline) == 0;
+}
+
+void EndOverdueChild(pid_t pid, const char* program, std::chrono::seconds limit) {
+  if (!HasEnded(pid)) {
+    kill(pid, SIGKILL);
+    syslog(LOG_ERR, "%s has not ended within %lld seconds (tool_timeout) and was killed", program,
+           static_cast<long long>(limit.count()));
+  }
+  kill(-pid, SIGKILL);
+}
+
+int ReapChild(pid_t pid) {
+  int status = -1;
+  pid_t reaped;
+  do {
+    reaped = waitpid(pid, &status, 0);
+  } while (reaped < 0 && errno == EINTR);
+  ReleaseChildStatus();
+  return reaped == pid ? status : -1;
+}
+
+}  // namespace velaplatform

@@ -1,0 +1,39 @@
+#include "platform/standalone/child_watchdog.h"
+
+#include <system_error>
+
+#include "platform/standalone/child_process.h"
+#include "platform/standalone/deadline.h"
+#include "platform/standalone/signal_block.h"
+
+namespace velaplatform {
+
+bool ChildWatchdog::Start(pid_t pid, const char* program, std::chrono::seconds limit) {
+  // The thread inherits the block: signals stay with the threads of the program.
+  const SignalBlock noSignals;
+  try {
+    thread_ = std::thread(&ChildWatchdog::Watch, this, pid, std::string(program), limit);
+    return true;
+  } catch (const std::system_error&) {
+    return false;
+  }
+}
+
+void ChildWatchdog::Stop() {
+  if (!thread_.joinable()) return;
+  {
+    const std::lock_guard<std::mutex> lock(mutex_);
+    isStopped_ = true;
+  }
+  wakeUp_.notify_one();
+  thread_.join();
+}
+
+void ChildWatchdog::Watch(pid_t pid, const std::string& program, std::chrono::seconds limit) {
+  const Deadline deadline(limit);
+  std::unique_lock<std::mutex> lock(mutex_);
+  const bool isStopped = wakeUp_.wait_until(lock, deadline.End(), [this] { return isStopped_; });
+  if (!isStopped) EndOverdueChild(pid, program.c_str(), limit);
+}
+
+}  // namespace velaplatform

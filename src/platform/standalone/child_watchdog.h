@@ -1,0 +1,39 @@
+// The time limit of a child whose caller waits in plain reads.
+#pragma once
+
+#include <sys/types.h>
+
+#include <chrono>
+#include <condition_variable>
+#include <mutex>
+#include <string>
+#include <thread>
+
+namespace velaplatform {
+
+/// Ends a child at its time limit from a thread of its own.
+class ChildWatchdog {
+ public:
+  ChildWatchdog() = default;
+  ChildWatchdog(const ChildWatchdog&) = delete;
+  ChildWatchdog& operator=(const ChildWatchdog&) = delete;
+  ~ChildWatchdog() { Stop(); }
+
+  /// Begins to watch the child `pid`, whose program is named in the system log. Returns false when
+  /// no thread can be had.
+  bool Start(pid_t pid, const char* program, std::chrono::seconds limit);
+
+  /// Ends the watch. To be called before the child is reaped: as long as it is not, its process id
+  /// belongs to nobody else.
+  void Stop();
+
+ private:
+  void Watch(pid_t pid, const std::string& program, std::chrono::seconds limit);
+
+  std::mutex mutex_;
+  std::condition_variable wakeUp_;
+  bool isStopped_ = false;
+  std::thread thread_;
+};
+
+}  // namespace velaplatform

@@ -1,0 +1,228 @@
+#include <ini.h>
+
+#include <algorithm>
+#include <charconv>
+#include <climits>
+#include <cstring>
+#include <exception>
+#include <map>
+#include <mutex>
+#include <string_view>
+
+#include "platform/standalone/file_content.h"
+#include "platform/standalone/last_error.h"
+#include "platform/standalone/white_space.h"
+#include "platform/velautils.h"
+
+namespace VELAUtils {
+
+namespace {
+
+struct Section {
+  std::string name;
+  std::map<std::string, std::string> values;
+};
+
+constexpr size_t kFileSizeMax = 64 * 1024 * 1024;
+
+/// The parser's own dialect knows more than this format: values that go on in the next line,
+/// comments behind values, lines of limited length.
+void SetDialect() {
+  static std::once_flag isSet;
+  std::call_once(isSet, [] {
+    ini_allow_multiline = false;
+    ini_allow_inline_comments = false;
+    ini_allow_no_value = false;
+    ini_allow_bom = true;
+    ini_use_stack = false;
+    ini_allow_realloc = true;
+    ini_max_line = INT_MAX / 4;
+  });
+}
+
+/// Feeds the parser line by line. It knows no empty sections, cuts section names and takes a colon
+/// for an equals sign; so each section and key is noted here, and the parser is given a line with a
+/// short stand-in.
+class LineFeed {
+ public:
+  LineFeed(std::string_view text, std::vector<Section>& sections)
+      : text_(text), sections_(sections) {}
+
+  /// The parser's reader, with the contract of fgets.
+  static char* Read(char* buffer, int size, void* feed);
+
+  /// The parser's handler.
+  static int Store(void* feed, const char* section, const char* name, const char* value);
+
+  /// Returns whether no line was met that has no place in the format.
+  bool IsFaultless() const { return isFaultless_; }
+
+ private:
+  static constexpr std::string_view kByteOrderMark = "\xEF\xBB\xBF";
+
+  bool PrepareLine();
+  std::string_view TakeLine();
+  bool PrepareText(std::string_view line);
+  bool PrepareSection(std::string_view line);
+  bool PreparePair(std::string_view line);
+  char* Copy(char* buffer, size_t size);
+
+  std::string_view text_;
+  std::vector<Section>& sections_;
+  bool isFirstLine_ = true;
+  bool isFaultless_ = true;
+  std::string line_;    // prepared, with its newline
+  size_t given_ = 0;    // how much of it the parser has got
+  size_t section_ = 0;  // number from 1, 0 before the first
+  std::string key_;
+};
+
+char* LineFeed::Read(char* buffer, int size, void* feed) {
+  auto* self = static_cast<LineFeed*>(feed);
+  if (size < 2) return nullptr;
+  const bool isLineGiven = self->given_ == self->line_.size();
+  if (isLineGiven && !self->PrepareLine()) return nullptr;
+  return self->Copy(buffer, static_cast<size_t>(size));
+}
+
+char* LineFeed::Copy(char* buffer, size_t size) {
+  const size_t length = std::min(size - 1, line_.size() - given_);
+  memcpy(buffer, line_.data() + given_, length);
+  buffer[length] = '\0';
+  given_ += length;
+  return buffer;
+}
+
+bool LineFeed::PrepareLine() {
+  if (text_.empty() || !isFaultless_) return false;
+  given_ = 0;
+  isFaultless_ = PrepareText(velaplatform::Trimmed(TakeLine()));
+  return isFaultless_;
+}
+
+std::string_view LineFeed::TakeLine() {
+  const size_t newline = text_.find('\n');
+  std::string_view line = text_.substr(0, newline);
+  text_.remove_prefix(newline == std::string_view::npos ? text_.size() : newline + 1);
+  const bool hasMark = isFirstLine_ && line.substr(0, kByteOrderMark.size()) == kByteOrderMark;
+  if (hasMark) line.remove_prefix(kByteOrderMark.size());
+  isFirstLine_ = false;
+  return line;
+}
+
+/// Returns false for a line that has no place in the format.
+bool LineFeed::PrepareText(std::string_view line) {
+  line_ = "\n";
+  if (line.find('\0') != std::string_view::npos) return false;
+  if (line.empty() || line.front() == ';' || line.front() == '#') return true;
+  return line.front() == '[' ? PrepareSection(line) : PreparePair(line);
+}
+
+bool LineFeed::PrepareSection(std::string_view line) {
+  if (line.find(']') != line.size() - 1) return false;
+  const std::string_view name = velaplatform::Trimmed(line.substr(1, line.size() - 2));
+  if (name.empty()) return false;
+  const auto known = std::find_if(sections_.begin(), sections_.end(),
+                                  [&](const Section& section) { return section.name == name; });
+  section_ = static_cast<size_t>(known - sections_.begin()) + 1;
+  if (known == sections_.end()) sections_.push_back({std::string(name), {}});
+  line_ = "[" + std::to_string(section_) + "]\n";
+  return true;
+}
+
+bool LineFeed::PreparePair(std::string_view line) {
+  const size_t equals = line.find('=');
+  if (equals == std::string_view::npos) return false;
+  key_ = velaplatform::Trimmed(line.substr(0, equals));
+  if (key_.empty()) return false;
+  line_ = "key";
+  line_.append(line.substr(equals));
+  line_ += '\n';
+  return true;
+}
+
+int LineFeed::Store(void* feed, const char* section, const char* /*name*/, const char* value) {
+  auto* self = static_cast<LineFeed*>(feed);
+  size_t number = 0;
+  std::from_chars(section, section + strlen(section), number);
+  if (number != 0) self->sections_[number - 1].values[self->key_] = value;
+  return 1;
+}
+
+/// Returns false when the text has a line that is no part of the format.
+bool Parse(std::string_view text, std::vector<Section>& sections) {
+  SetDialect();
+  LineFeed feed(text, sections);
+  return ini_parse_stream(LineFeed::Read, &feed, LineFeed::Store, &feed) == 0 && feed.IsFaultless();
+}
+
+int ParseInt(std::string_view text, int defaultValue) {
+  if (!text.empty() && text.front() == '+') {
+    text.remove_prefix(1);
+    if (!text.empty() && text.front() == '-') return defaultValue;
+  }
+  int number = 0;
+  const auto [stop, error] = std::from_chars(text.data(), text.data() + text.size(), number);
+  if (error == std::errc::invalid_argument) return defaultValue;
+  if (error == std::errc::result_out_of_range) return text.front() == '-' ? INT_MIN : INT_MAX;
+  return number;
+}
+
+}  // namespace
+
+struct ConfParser::Content {
+  std::vector<Section> sections;
+
+  /// Returns the key's value, null when it is absent.
+  const std::string* Find(const std::string& section, const std::string& key) const;
+};
+
+const std::string* ConfParser::Content::Find(const std::string& section,
+                                             const std::string& key) const {
+  const auto named = std::find_if(sections.begin(), sections.end(),
+                                  [&](const Section& one) { return one.name == section; });
+  if (named == sections.end()) return nullptr;
+  const auto value = named->values.find(key);
+  return value == named->values.end() ? nullptr : &value->second;
+}
+
+ConfParser::ConfParser() : content_(std::make_unique<Content>()) {}
+
+ConfParser::~ConfParser() = default;
+
+bool ConfParser::loadFromFile(const std::string& path) {
+  content_->sections.clear();
+  std::string text;
+  const int error = velaplatform::ReadFile(path.c_str(), text);
+  if (error != 0) {
+    velaplatform::SetLastError(error);
+    return false;
+  }
+  std::vector<Section> sections;
+  if (text.size() > kFileSizeMax || !Parse(text, sections)) {
+    velaplatform::SetLastError(EINVAL);
+    return false;
+  }
+  content_->sections = std::move(sections);
+  return true;
+}
+
+std::vector<std::string> ConfParser::enumSections() const {
+  std::vector<std::string> names;
+  names.reserve(content_->sections.size());
+  for (const Section& section : content_->sections) names.push_back(section.name);
+  return names;
+}
+
+int ConfParser::getInt(const std::string& section, const std::string& key, int defaultValue) const {
+  const std::string* value = content_->Find(section, key);
+  return value == nullptr ? defaultValue : ParseInt(*value, defaultValue);
+}
+
+std::string ConfParser::getString(const std::string& section, const std::string& key,
+                                  const std::string& defaultValue) const {
+  const std::string* value = content_->Find(section, key);
+  return value == nullptr ? defaultValue : *value;
+}
+
+}  // namespace VELAUtils

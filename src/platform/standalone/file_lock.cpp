@@ -1,0 +1,20 @@
+#include "platform/standalone/file_lock.h"
+
+#include <sys/file.h>
+
+#include <cerrno>
+
+namespace velaplatform {
+
+int LockExclusively(int fd) {
+  while (flock(fd, LOCK_EX) != 0) {
+    if (errno != EINTR) return errno;
+  }
+  return 0;
+}
+
+bool IsSameFile(const struct stat& a, const struct stat& b) {
+  return a.st_dev == b.st_dev && a.st_ino == b.st_ino;
+}
+
+}  // namespace velaplatform

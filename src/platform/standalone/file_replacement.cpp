@@ -1,0 +1,122 @@
+#include "platform/standalone/file_replacement.h"
+
+#include <fcntl.h>
+#include <stdio.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <utility>
+
+#include "platform/standalone/file_content.h"
+#include "platform/standalone/file_descriptor.h"
+#include "platform/standalone/file_lock.h"
+
+namespace velaplatform {
+
+namespace {
+
+constexpr mode_t kNewFileMode = 0644;
+constexpr mode_t kPermissionBits = 07777;
+
+/// The new file while it is written, beside the one it is for and under one name for all writers:
+/// what a writer that died has left is then found and removed by the next one. Its lock tells a
+/// dead writer from a living one.
+class ScratchFile {
+ public:
+  explicit ScratchFile(const std::string& target) : path_(target + ".replacement") {}
+  ScratchFile(const ScratchFile&) = delete;
+  ScratchFile& operator=(const ScratchFile&) = delete;
+  ~ScratchFile() {
+    if (file_) unlink(path_.c_str());
+  }
+
+  /// Makes the file, empty and locked. Returns 0 or an errno value.
+  int Open();
+
+  int Fd() const { return file_.Get(); }
+  const struct stat& Status() const { return status_; }
+  const char* Path() const { return path_.c_str(); }
+
+  /// The file has moved away from its scratch name.
+  void Forget() { file_.Reset(); }
+
+ private:
+  int OpenOnce(bool& isReady);
+
+  std::string path_;
+  FileDescriptor file_;
+  struct stat status_ {};
+};
+
+int ScratchFile::Open() {
+  bool isReady = false;
+  while (!isReady) {
+    const int error = OpenOnce(isReady);
+    if (error != 0) return error;
+  }
+  return 0;
+}
+
+int ScratchFile::OpenOnce(bool& isReady) {
+  const int flags = O_RDWR | O_CREAT | O_NOFOLLOW | O_NONBLOCK | O_NOCTTY | O_CLOEXEC;
+  FileDescriptor file(open(Path(), flags, 0600));
+  if (!file) return errno;
+  const int error = LockExclusively(file.Get());
+  if (error != 0) return error;
+
+  struct stat own;
+  struct stat named;
+  if (fstat(file.Get(), &own) != 0) return errno;
+  if (lstat(Path(), &named) != 0) return errno == ENOENT ? 0 : errno;
+  if (!IsSameFile(own, named)) return 0;
+  if (!S_ISREG(own.st_mode)) return EEXIST;
+  if (own.st_size != 0 || own.st_nlink != 1) {
+    return unlink(Path()) == 0 ? 0 : errno;
+  }
+  file_ = std::move(file);
+  status_ = own;
+  isReady = true;
+  return 0;
+}
+
+/// Renames unless something is at `to`. Returns 0 or an errno value.
+int RenameToFreeName(const char* from, const char* to) {
+  if (renameat2(AT_FDCWD, from, AT_FDCWD, to, RENAME_NOREPLACE) == 0) return 0;
+  if (errno != EINVAL && errno != ENOSYS) return errno;
+  // A file system without that flag.
+  if (link(from, to) != 0) return errno;
+  return unlink(from) == 0 ? 0 : errno;
+}
+
+}  // namespace
+
+int CreateWhole(const std::string& path, std::string_view content) {
+  ScratchFile scratch(path);
+  int error = scratch.Open();
+  if (error != 0) return error;
+  if (fchmod(scratch.Fd(), kNewFileMode) != 0) return errno;
+  error = WriteAll(scratch.Fd(), content);
+  if (error != 0) return error;
+  error = RenameToFreeName(scratch.Path(), path.c_str());
+  if (error == 0) scratch.Forget();
+  return error;
+}
+
+int ReplaceWhole(const std::string& path, std::string_view content, const struct stat& old) {
+  ScratchFile scratch(path);
+  int error = scratch.Open();
+  if (error != 0) return error;
+  const struct stat& own = scratch.Status();
+  const bool isOwnerDifferent = own.st_uid != old.st_uid || own.st_gid != old.st_gid;
+  if (isOwnerDifferent && fchown(scratch.Fd(), old.st_uid, old.st_gid) != 0) return errno;
+  if (fchmod(scratch.Fd(), old.st_mode & kPermissionBits) != 0) return errno;
+  error = WriteAll(scratch.Fd(), content);
+  if (error != 0) return error;
+  // No fsync: what these files hold is cheap to lose with the power, and waiting for the disk at
+  // each change is not.
+  if (rename(scratch.Path(), path.c_str()) != 0) return errno;
+  scratch.Forget();
+  return 0;
+}
+
+}  // namespace velaplatform

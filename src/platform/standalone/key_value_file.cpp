@@ -1,0 +1,123 @@
+#include <fcntl.h>
+#include <stdlib.h>
+#include <sys/stat.h>
+
+#include <cerrno>
+#include <memory>
+#include <string>
+
+#include "platform/standalone/bounded_copy.h"
+#include "platform/standalone/file_content.h"
+#include "platform/standalone/file_descriptor.h"
+#include "platform/standalone/file_lock.h"
+#include "platform/standalone/file_replacement.h"
+#include "platform/standalone/key_value_text.h"
+#include "platform/standalone/last_error.h"
+#include "platform/vlibc.h"
+
+namespace {
+
+using velaplatform::Fail;
+using velaplatform::FileDescriptor;
+
+struct FreeMemory {
+  void operator()(char* memory) const { free(memory); }
+};
+
+/// Replaces `path` by the file that the link it names leads to. Returns 0 or an errno value.
+int FollowLink(std::string& path) {
+  const std::unique_ptr<char, FreeMemory> target(realpath(path.c_str(), nullptr));
+  if (!target) return errno;
+  path = target.get();
+  return 0;
+}
+
+/// How far one attempt to set a value came.
+enum class Attempt { kDone, kAgain };
+
+int CreateWithValue(std::string& path, const char* key, const char* value, Attempt& attempt) {
+  const int error = velaplatform::CreateWhole(path, velaplatform::WithValue("", key, value));
+  if (error != EEXIST) return error;
+  // Another process was faster, or a link leads to a file that is not there.
+  struct stat named;
+  if (lstat(path.c_str(), &named) == 0 && S_ISLNK(named.st_mode)) {
+    const int linkError = FollowLink(path);
+    if (linkError != 0) return linkError;
+  }
+  attempt = Attempt::kAgain;
+  return 0;
+}
+
+/// With the lock held: whether the locked file is still the one at `path`. A link there is
+/// followed by changing `path`, for it is the file behind it that has to be replaced.
+int CheckIdentity(std::string& path, const struct stat& locked, Attempt& attempt) {
+  struct stat named;
+  attempt = Attempt::kAgain;
+  if (lstat(path.c_str(), &named) != 0) return errno == ENOENT ? 0 : errno;
+  if (S_ISLNK(named.st_mode)) return FollowLink(path);
+  if (velaplatform::IsSameFile(locked, named)) attempt = Attempt::kDone;
+  return 0;
+}
+
+int TrySetValue(std::string& path, const char* key, const char* value, Attempt& attempt) {
+  attempt = Attempt::kDone;
+  const FileDescriptor file(open(path.c_str(), O_RDWR | O_CLOEXEC | O_NONBLOCK | O_NOCTTY));
+  if (!file) {
+    return errno == ENOENT ? CreateWithValue(path, key, value, attempt) : errno;
+  }
+  int error = velaplatform::LockExclusively(file.Get());
+  if (error != 0) return error;
+
+  struct stat locked;
+  if (fstat(file.Get(), &locked) != 0) return errno;
+  if (!S_ISREG(locked.st_mode)) return EINVAL;
+  error = CheckIdentity(path, locked, attempt);
+  if (error != 0 || attempt == Attempt::kAgain) return error;
+
+  std::string text;
+  error = velaplatform::ReadToEnd(file.Get(), text);
+  if (error != 0) return error;
+  return velaplatform::ReplaceWhole(path, velaplatform::WithValue(text, key, value), locked);
+}
+
+}  // namespace
+
+int VLIBCFileGetKeyValue(const char* file, const char* key, char* out, size_t outSize,
+                         int /*flags*/) {
+  velaplatform::CopyCut("", out, outSize);
+  if (file == nullptr || key == nullptr) return Fail(EINVAL);
+  std::string text;
+  const int error = velaplatform::ReadFile(file, text);
+  if (error != 0) return Fail(error);
+  const auto value = velaplatform::FindValue(text, key);
+  if (!value) return 0;
+  velaplatform::CopyCut(*value, out, outSize);
+  return 1;
+}
+
+int VLIBCFileSetKeyValue(const char* file, const char* key, const char* value, int /*flags*/) {
+  if (file == nullptr || key == nullptr || value == nullptr) return Fail(EINVAL);
+  if (!velaplatform::IsStorable(key, value)) return Fail(EINVAL);
+  std::string path(file);
+  Attempt attempt = Attempt::kAgain;
+  while (attempt == Attempt::kAgain) {
+    const int error = TrySetValue(path, key, value, attempt);
+    if (error != 0) return Fail(error);
+  }
+  return 0;
+}
+
+int VLIBCFileCheckKeyValue(const char* file, const char* key, const char* value, int /*flags*/) {
+  if (file == nullptr || key == nullptr || value == nullptr) {
+    velaplatform::SetLastError(EINVAL);
+    return 0;
+  }
+  std::string text;
+  const int error = velaplatform::ReadFile(file, text);
+  if (error != 0) {
+    velaplatform::SetLastError(error);
+    return 0;
+  }
+  const auto found = velaplatform::FindValue(text, key);
+  return found && *found == value ? 1 : 0;
+}

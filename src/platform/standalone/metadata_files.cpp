@@ -1,0 +1,126 @@
+#include <fcntl.h>
+#include <limits.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <cstring>
+#include <initializer_list>
+#include <string_view>
+
+#include "platform/standalone/last_error.h"
+#include "platform/standalone/path_text.h"
+#include "platform/velaindex.h"
+
+namespace {
+
+using velaplatform::Fail;
+
+constexpr std::string_view kMetadataDirectory = "@eaDir";
+
+/// Writes the parts one behind the other to `out`, terminated. Returns false, with `out` as it was,
+/// when they do not fit.
+bool Join(std::initializer_list<std::string_view> parts, char* out, size_t outSize) {
+  size_t length = 0;
+  for (const std::string_view part : parts) length += part.size();
+  if (length >= outSize) return false;
+  for (const std::string_view part : parts) {
+    if (!part.empty()) memcpy(out, part.data(), part.size());
+    out += part.size();
+  }
+  *out = '\0';
+  return true;
+}
+
+/// The path of one derived file, for system calls.
+class DerivedPath {
+ public:
+  DerivedPath(const char* eaDir, const char* name)
+      : isValid_(name != nullptr && *name != '\0' && *eaDir != '\0' &&
+                 Join({eaDir, "/", name}, path_, sizeof(path_))) {}
+
+  /// False for a name that no file can have.
+  bool IsValid() const { return isValid_; }
+  const char* Get() const { return path_; }
+
+ private:
+  char path_[PATH_MAX];
+  bool isValid_;
+};
+
+bool IsRegularFile(const DerivedPath& path, int64_t* sizeOut) {
+  struct stat status;
+  if (!path.IsValid() || stat(path.Get(), &status) != 0 || !S_ISREG(status.st_mode)) return false;
+  if (sizeOut != nullptr) *sizeOut = status.st_size;
+  return true;
+}
+
+bool IsThere(const DerivedPath& path) {
+  struct stat status;
+  return lstat(path.Get(), &status) == 0;
+}
+
+/// Returns 0 when no file has the name any more, else an errno value.
+int Remove(const DerivedPath& path) {
+  if (!path.IsValid() || unlink(path.Get()) == 0 || errno == ENOENT) return 0;
+  const int error = errno;
+  // A read-only volume, for one, refuses the removal of what is not there as well.
+  return IsThere(path) ? error : 0;
+}
+
+}  // namespace
+
+int IndexIsPathSupportEAWrite(const char* dir) {
+  if (dir == nullptr || velaplatform::HasComponent(dir, kMetadataDirectory)) return 0;
+  if (IsDirExist(dir) == 0) return 0;
+  return faccessat(AT_FDCWD, dir, W_OK | X_OK, AT_EACCESS) == 0 ? 1 : 0;
+}
+
+int VELAEADirPath(int /*flags*/, const char* path, char* out, size_t outSize) {
+  if (path == nullptr || out == nullptr) return Fail(EINVAL);
+  const std::string_view whole(path);
+  const std::string_view file = velaplatform::LastComponentOf(whole);
+  if (file.empty()) return Fail(EINVAL);
+  if (velaplatform::HasComponent(whole, kMetadataDirectory)) return Fail(EINVAL);
+  const std::string_view directory = whole.substr(0, whole.size() - file.size());
+  if (!Join({directory, kMetadataDirectory, "/", file}, out, outSize)) return Fail(ENAMETOOLONG);
+  return 0;
+}
+
+const char* IsEAFileExist(const char* eaDir, int64_t* sizeOut, const char* name,
+                          const char* oldName) {
+  if (eaDir == nullptr) return nullptr;
+  if (IsRegularFile(DerivedPath(eaDir, name), sizeOut)) return name;
+  if (IsRegularFile(DerivedPath(eaDir, oldName), sizeOut)) return oldName;
+  return nullptr;
+}
+
+int IsEAFileExist2(const char* path, const char* name, const char* oldName) {
+  char eaDir[PATH_MAX];
+  if (VELAEADirPath(0, path, eaDir, sizeof(eaDir)) != 0) return 0;
+  return IsEAFileExist(eaDir, nullptr, name, oldName) != nullptr ? 1 : 0;
+}
+
+int GetEAFilePath(const char* path, const char* name, const char* oldName, char* out,
+                  size_t outSize) {
+  char eaDir[PATH_MAX];
+  if (VELAEADirPath(0, path, eaDir, sizeof(eaDir)) != 0) return -1;
+  const char* found = IsEAFileExist(eaDir, nullptr, name, oldName);
+  if (found == nullptr) return Fail(ENOENT);
+  if (out == nullptr) return Fail(EINVAL);
+  return Join({eaDir, "/", found}, out, outSize) ? 0 : Fail(ENAMETOOLONG);
+}
+
+int RemoveEAFile(const char* eaDir, const char* name, const char* oldName) {
+  if (eaDir == nullptr) return Fail(EINVAL);
+  const int error = Remove(DerivedPath(eaDir, name));
+  const int oldError = Remove(DerivedPath(eaDir, oldName));
+  if (error != 0) return Fail(error);
+  return oldError == 0 ? 0 : Fail(oldError);
+}
+
+int RemoveEAFile2(const char* path, const char* name, const char* oldName) {
+  char eaDir[PATH_MAX];
+  if (VELAEADirPath(0, path, eaDir, sizeof(eaDir)) != 0) return -1;
+  return RemoveEAFile(eaDir, name, oldName);
+}

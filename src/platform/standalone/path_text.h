@@ -1,0 +1,32 @@
+// Taking paths apart.
+#pragma once
+
+#include <string_view>
+
+namespace velaplatform {
+
+/// Returns the last component of `path`: what follows its last slash.
+constexpr std::string_view LastComponentOf(std::string_view path) {
+  const size_t slash = path.rfind('/');
+  return slash == std::string_view::npos ? path : path.substr(slash + 1);
+}
+
+/// Returns what follows the last dot of the last component, an empty end of `path` when there is no
+/// dot in it.
+constexpr std::string_view ExtensionOf(std::string_view path) {
+  const std::string_view name = LastComponentOf(path);
+  const size_t dot = name.rfind('.');
+  return dot == std::string_view::npos ? path.substr(path.size()) : name.substr(dot + 1);
+}
+
+/// Returns whether one of the components of `path` is `component`.
+constexpr bool HasComponent(std::string_view path, std::string_view component) {
+  for (;;) {
+    const size_t slash = path.find('/');
+    if (path.substr(0, slash) == component) return true;
+    if (slash == std::string_view::npos) return false;
+    path.remove_prefix(slash + 1);
+  }
+}
+
+}  // namespace velaplatform

@@ -1,0 +1,139 @@
+#include <fcntl.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <cerrno>
+#include <cstdarg>
+#include <cstring>
+#include <memory>
+#include <mutex>
+#include <utility>
+#include <vector>
+
+#include "platform/standalone/child_process.h"
+#include "platform/standalone/child_watchdog.h"
+#include "platform/standalone/file_descriptor.h"
+#include "platform/standalone/last_error.h"
+#include "platform/standalone/settings.h"
+#include "platform/vlibc.h"
+
+namespace {
+
+using velaplatform::ChildWatchdog;
+using velaplatform::FileDescriptor;
+
+/// A child with the stream that its output comes through.
+struct PipedChild {
+  FILE* stream = nullptr;
+  pid_t pid = -1;
+  std::unique_ptr<ChildWatchdog> watchdog;
+};
+
+/// All children whose streams are open.
+class PipedChildren {
+ public:
+  void Add(PipedChild child) {
+    const std::lock_guard<std::mutex> lock(mutex_);
+    children_.push_back(std::move(child));
+  }
+
+  /// Hands out the child of `stream`; one without a stream when it has none.
+  PipedChild Take(const FILE* stream) {
+    const std::lock_guard<std::mutex> lock(mutex_);
+    const auto found = std::find_if(children_.begin(), children_.end(),
+                                    [&](const auto& child) { return child.stream == stream; });
+    if (found == children_.end()) return {};
+    PipedChild child = std::move(*found);
+    children_.erase(found);
+    return child;
+  }
+
+ private:
+  std::mutex mutex_;
+  std::vector<PipedChild> children_;
+};
+
+/// Lives until the process is gone: a stream may still be open when the program ends.
+PipedChildren& OpenChildren() {
+  static auto* children = new PipedChildren;
+  return *children;
+}
+
+/// Ends a child that cannot be handed out.
+void Abandon(PipedChild& child) {
+  kill(child.pid, SIGKILL);
+  velaplatform::ReapChild(child.pid);
+}
+
+/// Returns 0 or an errno value.
+int Watch(PipedChild& child, const char* program) {
+  const std::chrono::seconds limit = velaplatform::CurrentSettings().toolTimeout;
+  if (limit.count() == 0) return 0;
+  child.watchdog = std::make_unique<ChildWatchdog>();
+  return child.watchdog->Start(child.pid, program, limit) ? 0 : EAGAIN;
+}
+
+/// Starts the program with its output in a pipe. Returns 0 or an errno value.
+int Open(const char* program, std::vector<char*>& arguments, bool joinError, PipedChild& child) {
+  int ends[2];
+  if (pipe2(ends, O_CLOEXEC) != 0) return errno;
+  FileDescriptor readEnd(ends[0]);
+  FileDescriptor writeEnd(ends[1]);
+  const velaplatform::ChildStreams streams{writeEnd.Get(), joinError ? writeEnd.Get() : -1};
+  int error = velaplatform::StartChild(program, arguments.data(), streams, child.pid);
+  if (error != 0) return error;
+  writeEnd.Reset();
+
+  error = Watch(child, program);
+  if (error == 0) {
+    child.stream = fdopen(readEnd.Get(), "r");
+    if (child.stream == nullptr) error = errno;
+  }
+  if (error != 0) {
+    child.watchdog.reset();
+    Abandon(child);
+    return error;
+  }
+  readEnd.Release();
+  return 0;
+}
+
+}  // namespace
+
+FILE* VLIBCPopen(const char* program, const char* mode, ...) {
+  if (program == nullptr || mode == nullptr || mode[0] != 'r') {
+    velaplatform::SetLastError(EINVAL);
+    return nullptr;
+  }
+  std::vector<char*> arguments{const_cast<char*>(program)};
+  va_list list;
+  va_start(list, mode);
+  while (char* argument = va_arg(list, char*)) arguments.push_back(argument);
+  va_end(list);
+  arguments.push_back(nullptr);
+
+  PipedChild child;
+  const bool joinError = strchr(mode + 1, 'E') != nullptr;
+  const int error = Open(program, arguments, joinError, child);
+  if (error != 0) {
+    velaplatform::SetLastError(error);
+    return nullptr;
+  }
+  FILE* stream = child.stream;
+  OpenChildren().Add(std::move(child));
+  return stream;
+}
+
+int VLIBCPclose(FILE* stream) {
+  const PipedChild child = OpenChildren().Take(stream);
+  if (stream == nullptr || child.stream == nullptr) return velaplatform::Fail(EINVAL);
+  // A child that still writes learns from the closed pipe that nobody listens. One that does not
+  // care goes on to its own end or its time limit.
+  fclose(stream);
+  velaplatform::AwaitChild(child.pid);
+  if (child.watchdog) child.watchdog->Stop();
+  const int status = velaplatform::ReapChild(child.pid);
+  if (status == -1) return velaplatform::Fail(ECHILD);
+  return WIFEXITED(status) ? WEXITSTATUS(status) : velaplatform::Fail(EINTR);
+}

@@ -1,0 +1,54 @@
+#include "platform/standalone/ppm_size.h"
+
+#include <csetjmp>
+#include <cstdio>
+#include <memory>
+#include <mutex>
+
+extern "C" {
+#include <netpbm/ppm.h>
+}
+
+namespace velaplatform {
+
+namespace {
+
+struct CloseFile {
+  void operator()(FILE* file) const { fclose(file); }
+};
+
+void DropMessage(const char* /*text*/) {}
+
+/// The library ends the process on any error unless it is given a place to jump to. Nothing that
+/// would have to be cleaned up may live between the two.
+bool ReadHeader(FILE* file, int& width, int& height) {
+  jmp_buf onError;
+  if (setjmp(onError) != 0) {
+    pm_setjmpbuf(nullptr);
+    return false;
+  }
+  pm_setjmpbuf(&onError);
+  pixval largest = 0;
+  int format = 0;
+  ppm_readppminit(file, &width, &height, &largest, &format);
+  pm_setjmpbuf(nullptr);
+  return true;
+}
+
+}  // namespace
+
+PixelSize ReadPpmSize(const char* path) {
+  // The library keeps its settings for the whole process.
+  static std::mutex mutex;
+  const std::lock_guard<std::mutex> lock(mutex);
+  const std::unique_ptr<FILE, CloseFile> file(fopen(path, "rbe"));
+  if (!file) return {};
+  pm_init("velathumb", 0);
+  pm_setusermessagefn(DropMessage);
+  int width = 0;
+  int height = 0;
+  if (!ReadHeader(file.get(), width, height)) return {};
+  return {width, height};
+}
+
+}  // namespace velaplatform

@@ -1,0 +1,117 @@
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <chrono>
+#include <future>
+#include <initializer_list>
+#include <system_error>
+#include <thread>
+#include <utility>
+
+#include "platform/standalone/child_process.h"
+#include "platform/standalone/last_error.h"
+#include "platform/standalone/settings.h"
+#include "platform/standalone/signal_block.h"
+#include "platform/velautils.h"
+
+namespace VELAUtils {
+
+namespace {
+
+constexpr int kNotStarted = 127;     // as a shell reports it
+constexpr int kEndedBySignal = 128;  // plus the signal's number
+constexpr int kStatusUnknown = 126;
+
+using Arguments = std::vector<std::string>;
+
+void Append(Arguments& arguments, std::initializer_list<const char*> more) {
+  for (const char* argument : more) {
+    if (argument == nullptr) return;
+    arguments.emplace_back(argument);
+  }
+}
+
+/// Returns pointers into `program` and `arguments` as exec takes them; argument zero is the program
+/// when there is none.
+std::vector<char*> MakeVector(std::string& program, Arguments& arguments) {
+  std::vector<char*> pointers;
+  pointers.reserve(arguments.size() + 2);
+  if (arguments.empty()) pointers.push_back(program.data());
+  for (std::string& argument : arguments) pointers.push_back(argument.data());
+  pointers.push_back(nullptr);
+  return pointers;
+}
+
+velaplatform::ChildStreams StreamsFor(bool keepOutput) {
+  if (!keepOutput) return {};
+  return {STDOUT_FILENO, STDERR_FILENO};
+}
+
+int ResultOf(int status) {
+  if (status == -1) return kStatusUnknown;
+  return WIFEXITED(status) ? WEXITSTATUS(status) : kEndedBySignal + WTERMSIG(status);
+}
+
+/// Waits for the child's end, within the time limit of all tools, and returns the run's result.
+int Finish(pid_t pid, const std::string& program) {
+  const std::chrono::seconds limit = velaplatform::CurrentSettings().toolTimeout;
+  if (limit.count() != 0 && !velaplatform::AwaitChildFor(pid, limit)) {
+    velaplatform::EndOverdueChild(pid, program.c_str(), limit);
+  }
+  return ResultOf(velaplatform::ReapChild(pid));
+}
+
+/// A run that nobody waits for: a thread does, so that the limit holds and no zombie stays. It also
+/// starts the child, which gets a signal when the thread that started it ends.
+void RunUnattended(std::string program, Arguments arguments, bool keepOutput,
+                   std::promise<int> started) {
+  pid_t pid = -1;
+  const int error = velaplatform::StartChild(program.c_str(), MakeVector(program, arguments).data(),
+                                             StreamsFor(keepOutput), pid);
+  started.set_value(error);
+  if (error == 0) Finish(pid, program);
+}
+
+/// Returns 0 or an errno value.
+int StartUnattended(const std::string& program, const Arguments& arguments, bool keepOutput) {
+  const velaplatform::SignalBlock noSignals;
+  try {
+    std::promise<int> started;
+    std::future<int> result = started.get_future();
+    std::thread(RunUnattended, program, arguments, keepOutput, std::move(started)).detach();
+    return result.get();
+  } catch (const std::system_error&) {
+    return EAGAIN;
+  }
+}
+
+}  // namespace
+
+ProcessRunner::ProcessRunner(const char* program, const char* arg0, const char* a1, const char* a2,
+                             const char* a3, const char* a4, const char* a5, const char* a6,
+                             const char* a7, const char* a8)
+    : program_(program == nullptr ? "" : program) {
+  Append(arguments_, {arg0, a1, a2, a3, a4, a5, a6, a7, a8});
+}
+
+void ProcessRunner::addArguments(const char* a1, const char* a2, const char* a3, const char* a4,
+                                 const char* a5, const char* a6, const char* a7, const char* a8,
+                                 const char* a9) {
+  Append(arguments_, {a1, a2, a3, a4, a5, a6, a7, a8, a9});
+}
+
+int ProcessRunner::run(bool wait, bool keepOutput) {
+  pid_t pid = -1;
+  const int error =
+      wait ? velaplatform::StartChild(program_.c_str(), MakeVector(program_, arguments_).data(),
+                                      StreamsFor(keepOutput), pid)
+           : StartUnattended(program_, arguments_, keepOutput);
+  if (error != 0) {
+    velaplatform::SetLastError(error);
+    return kNotStarted;
+  }
+  return wait ? Finish(pid, program_) : 0;
+}
+
+}  // namespace VELAUtils

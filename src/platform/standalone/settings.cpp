@@ -1,0 +1,110 @@
+#include "platform/standalone/settings.h"
+
+#include <sys/stat.h>
+
+#include <charconv>
+#include <ctime>
+#include <limits>
+#include <mutex>
+#include <optional>
+#include <string>
+#include <string_view>
+
+#include "platform/standalone/file_content.h"
+#include "platform/standalone/file_lock.h"
+#include "platform/standalone/key_value_text.h"
+
+namespace velaplatform {
+
+namespace {
+
+constexpr const char* kSettingsFile = "/etc/velainfo.conf";
+constexpr uint32_t kAllSizeClasses = 63;
+
+/// Returns the number that the whole text is in decimal; the largest one for a number beyond it.
+std::optional<uint32_t> ParseNumber(std::string_view text) {
+  uint32_t number = 0;
+  const char* end = text.data() + text.size();
+  const auto [stop, error] = std::from_chars(text.data(), end, number);
+  if (stop != end || error == std::errc::invalid_argument) return std::nullopt;
+  if (error == std::errc::result_out_of_range) return std::numeric_limits<uint32_t>::max();
+  return number;
+}
+
+std::optional<uint32_t> FindNumber(std::string_view text, std::string_view key) {
+  const auto value = FindValue(text, key);
+  return value ? ParseNumber(*value) : std::nullopt;
+}
+
+void ReadSizeMap(std::string_view text, std::string_view key, int32_t& sizeMap) {
+  const auto number = FindNumber(text, key);
+  if (number && *number <= kAllSizeClasses) sizeMap = static_cast<int32_t>(*number);
+}
+
+Settings ParseSettings(std::string_view text) {
+  Settings settings;
+  ReadSizeMap(text, "photo_thumb_size_map", settings.photoThumbSizeMap);
+  ReadSizeMap(text, "video_thumb_size_map", settings.videoThumbSizeMap);
+  if (const auto limit = FindNumber(text, "tool_timeout")) {
+    settings.toolTimeout = std::chrono::seconds(*limit);
+  }
+  return settings;
+}
+
+bool IsSameTime(const timespec& a, const timespec& b) {
+  return a.tv_sec == b.tv_sec && a.tv_nsec == b.tv_nsec;
+}
+
+bool IsSameVersion(const struct stat& a, const struct stat& b) {
+  return IsSameFile(a, b) && a.st_size == b.st_size && IsSameTime(a.st_mtim, b.st_mtim) &&
+         IsSameTime(a.st_ctim, b.st_ctim);
+}
+
+/// Times of files advance in steps of a timer tick, so a change within the same tick could not be
+/// told: only a file at rest for a while is known by its times.
+bool IsAtRest(const struct stat& file) {
+  timespec now;
+  if (clock_gettime(CLOCK_REALTIME_COARSE, &now) != 0) return false;
+  constexpr int64_t kRestMilliseconds = 100;
+  const int64_t age =
+      (now.tv_sec - file.st_ctim.tv_sec) * 1000 + (now.tv_nsec - file.st_ctim.tv_nsec) / 1000000;
+  return age > kRestMilliseconds;
+}
+
+/// The settings last read with the state of the file they come from: one look at the file's status
+/// tells whether they still hold.
+class SettingsCache {
+ public:
+  Settings Get();
+
+ private:
+  std::mutex mutex_;
+  bool isValid_ = false;
+  struct stat version_ {};
+  Settings settings_;
+};
+
+Settings SettingsCache::Get() {
+  struct stat now;
+  if (stat(kSettingsFile, &now) != 0) return Settings();
+  const std::lock_guard<std::mutex> lock(mutex_);
+  if (isValid_ && IsSameVersion(now, version_)) return settings_;
+
+  // The status is older than the text read below: a change between the two is seen next time.
+  const bool isAtRest = IsAtRest(now);
+  std::string text;
+  if (ReadFile(kSettingsFile, text) != 0) return Settings();
+  settings_ = ParseSettings(text);
+  version_ = now;
+  isValid_ = isAtRest;
+  return settings_;
+}
+
+}  // namespace
+
+Settings CurrentSettings() {
+  static SettingsCache cache;
+  return cache.Get();
+}
+
+}  // namespace velaplatform

@@ -1,0 +1,24 @@
+// Keeping signals away from a thread for a while.
+#pragma once
+
+#include <signal.h>
+
+namespace velaplatform {
+
+/// Blocks all signals for the calling thread as long as it lives.
+class SignalBlock {
+ public:
+  SignalBlock() {
+    sigset_t all;
+    sigfillset(&all);
+    pthread_sigmask(SIG_SETMASK, &all, &old_);
+  }
+  ~SignalBlock() { pthread_sigmask(SIG_SETMASK, &old_, nullptr); }
+  SignalBlock(const SignalBlock&) = delete;
+  SignalBlock& operator=(const SignalBlock&) = delete;
+
+ private:
+  sigset_t old_;
+};
+
+}  // namespace velaplatform

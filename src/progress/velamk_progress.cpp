@@ -1,0 +1,115 @@
+#include "progress/velamk_progress.h"
+
+#include <sys/time.h>
+#include <syslog.h>
+
+#include <algorithm>
+#include <cstdint>
+#include <cstdlib>
+#include <ctime>
+#include <limits>
+#include <string>
+
+#include "platform/velaindex.h"
+#include "platform/vlibc.h"
+
+namespace {
+
+constexpr char kLogSource[] = "velamk_progress";
+constexpr char kSystemSettings[] = "/etc/velainfo.conf";
+constexpr char kResumeTimeKey[] = "thumb_conv_resume_time";
+
+/// Returns the progress file of a media kind, null for an unknown one.
+const char* ProgressFile(int kind) {
+  switch (kind) {
+    case THUMB_TYPE_PHOTO:
+      return "/var/spool/conv_progress_photo";
+    case THUMB_TYPE_VIDEO:
+      return "/var/spool/conv_progress_video";
+    default:
+      return nullptr;
+  }
+}
+
+int ClampToInt(int64_t value) {
+  constexpr int64_t kLowest = std::numeric_limits<int>::min();
+  constexpr int64_t kHighest = std::numeric_limits<int>::max();
+  return static_cast<int>(std::clamp(value, kLowest, kHighest));
+}
+
+/// Reads a counter; what is missing or no number counts as 0.
+int ReadCounter(const char* file, const char* key) {
+  char text[4096] = "";
+  if (VLIBCFileGetKeyValue(file, key, text, sizeof text, 0) <= 0) {
+    return 0;
+  }
+  return ClampToInt(std::strtol(text, nullptr, 10));
+}
+
+struct Progress {
+  int total;
+  int completed;
+
+  double Ratio() const {
+    return total == 0 ? 0.0F : static_cast<float>(completed) / static_cast<float>(total);
+  }
+};
+
+Progress ReadProgress(int kind, const char* totalKey, const char* completedKey) {
+  const int total = GetConvProgress(kind, totalKey);
+  return {total, GetConvProgress(kind, completedKey)};
+}
+
+}  // namespace
+
+int GetConvProgress(int kind, const char* key) {
+  const char* file = ProgressFile(kind);
+  return file == nullptr || key == nullptr ? 0 : ReadCounter(file, key);
+}
+
+void AddConvProgress(int kind, const char* key, int delta) {
+  const char* file = ProgressFile(kind);
+  if (file == nullptr || key == nullptr) {
+    return;
+  }
+  const int64_t sum = int64_t{ReadCounter(file, key)} + delta;
+  const std::string text = std::to_string(ClampToInt(sum));
+  if (VLIBCFileSetKeyValue(file, key, text.c_str(), 0) < 0) {
+    syslog(LOG_ERR, "%s:%d VLIBCFileSetKeyValue fail: %s", kLogSource, 115, file);
+  }
+}
+
+void LogConvProgress() {
+  const Progress photo = ReadProgress(THUMB_TYPE_PHOTO, "total", "completed");
+  const Progress thumb = ReadProgress(THUMB_TYPE_PHOTO, "total_thumb", "completed_thumb");
+  const Progress video = ReadProgress(THUMB_TYPE_VIDEO, "total", "completed");
+  syslog(LOG_ERR, "%s:%d ========== Convert Progress ==========", kLogSource, 144);
+  syslog(LOG_ERR, "%s:%d total_photo: %d, complete_photo: %d, progress: %.2f", kLogSource, 145,
+         photo.total, photo.completed, photo.Ratio());
+  syslog(LOG_ERR, "%s:%d total_thumb: %d, complete_thumb: %d, progress: %.2f", kLogSource, 146,
+         thumb.total, thumb.completed, thumb.Ratio());
+  syslog(LOG_ERR, "%s:%d total_video: %d, complete_video: %d, progress: %.2f", kLogSource, 147,
+         video.total, video.completed, video.Ratio());
+}
+
+long GetThumbConvResumeTime() {
+  char text[1024] = "";
+  if (VLIBCFileGetKeyValue(kSystemSettings, kResumeTimeKey, text, sizeof text, 0) < 0) {
+    syslog(LOG_ERR, "%s:%d VLIBCFileGetKeyValue(%s) failed, velaerr=0x%04X", kLogSource, 176,
+           kResumeTimeKey, static_cast<unsigned>(VLIBCErrGet()));
+  }
+  return std::strtol(text, nullptr, 10);
+}
+
+int IsThumbConvResumeTimeReached() {
+  const long resume = GetThumbConvResumeTime();
+  return resume >= 0 && std::time(nullptr) >= resume ? 1 : 0;
+}
+
+int GetThumbConvResumeWait(timeval* out) {
+  const long resume = GetThumbConvResumeTime();
+  const long now = std::time(nullptr);
+  out->tv_sec = resume > now ? resume - now : 0;
+  out->tv_usec = 0;
+  return 0;
+}

@@ -1,0 +1,74 @@
+#include "source/orientation.h"
+
+#include <libexif/exif-data.h>
+#include <syslog.h>
+
+#include <cstdlib>
+#include <cstring>
+#include <memory>
+
+#include "platform/velaindex.h"
+#include "platform/vlibc.h"
+#include "source/tool_output.h"
+#include "thumb/log_source.h"
+
+namespace {
+
+constexpr char kExiftoolPath[] = "/usr/vela/bin/exiftool";
+constexpr char kRotationTag[] = "Rotation";
+constexpr char kUprightText[] = "top - left";
+
+struct ExifDataUnref {
+  void operator()(ExifData* data) const { exif_data_unref(data); }
+};
+
+/// Some builds of the library spell the upright orientation in their own way.
+std::string CanonicalText(const char* text) {
+  return std::strcmp(text, "Top-left") == 0 ? kUprightText : text;
+}
+
+/// Returns the library's text for the orientation of an image, empty when it states none; nothing
+/// is known of an image without EXIF data, which is logged.
+std::string ReadOrientationText(const std::string& path) {
+  const std::unique_ptr<ExifData, ExifDataUnref> data(exif_data_new_from_file(path.c_str()));
+  if (data == nullptr) {
+    syslog(LOG_ERR, "%s:%d %s (%d) File not readable or no EXIF data in file %s.\n", kLogSource,
+           696, kLogSource, 696, path.c_str());
+    return {};
+  }
+  char text[128] = "";
+  ExifEntry* entry = exif_content_get_entry(data->ifd[EXIF_IFD_0], EXIF_TAG_ORIENTATION);
+  if (entry != nullptr) {
+    exif_entry_get_value(entry, text, sizeof text);
+    StringTrim(text);
+  }
+  return CanonicalText(text);
+}
+
+/// Returns the value of the raw photo's rotation tag, empty when it has none.
+std::string ReadRotationTag(const std::string& rawPath) {
+  const std::string option = std::string("-") + kRotationTag;
+  ToolOutput output(VLIBCPopen(kExiftoolPath, "r", "-S", option.c_str(), rawPath.c_str(), nullptr));
+  if (!output.IsOpen()) {
+    syslog(LOG_ERR, "%s:%d [Error] VLIBCPopen: %s -S -%s %s", kLogSource, 196, kExiftoolPath,
+           kRotationTag, rawPath.c_str());
+    return {};
+  }
+  std::string value;
+  while (const auto line = output.ReadLine()) {
+    const auto tag = SplitTagLine(*line);
+    if (tag && tag->name == kRotationTag) {
+      value = tag->value;
+    }
+  }
+  return value;
+}
+
+}  // namespace
+
+int GetRawPreviewRotation(const std::string& rawPath, const std::string& previewPath) {
+  if (ReadOrientationText(previewPath) != kUprightText) {
+    return 0;
+  }
+  return static_cast<int>(std::strtol(ReadRotationTag(rawPath).c_str(), nullptr, 10));
+}

@@ -1,0 +1,16 @@
+// The turn that a photo's owner gave its thumbnails.
+#pragma once
+
+#include <string>
+
+#include "thumb/directory_job.h"
+
+/// Finds the turn (0, 90, 180 or 270 degrees clockwise) at which thumbnails made from `photoPath`
+/// match those that exist in its metadata directory `thumbDir`; 0 when that cannot be told. Leaves
+/// no trial image behind.
+int DetectThumbRotation(const DirectoryJob& job, const std::string& photoPath,
+                        const std::string& thumbDir);
+
+/// Returns the integer part of the mean absolute error between two images, or 65535 when it cannot
+/// be measured; a tool that cannot be started is logged.
+int CompareImagesMAE(const std::string& imageA, const std::string& imageB);

@@ -1,0 +1,26 @@
+#include <syslog.h>
+
+#include "ipc/velamk_ipc.h"
+#include "platform/velaindex.h"
+#include "storage/log_source.h"
+#include "storage/velamk_util.h"
+
+int IsMediaPortraitInDB(const char* path) {
+  VELA_MEDIA_INFO media = {};
+  if (GetMediaFromPluginDB(THUMB_TYPE_PHOTO, path, media) < 0) {
+    syslog(LOG_ERR, "%s:%d fail to get media from plugin db: %s", kMetadataLogSource, 128, path);
+    return 0;
+  }
+  return media.width < media.height ? 1 : 0;
+}
+
+int IsFilePortrait(const char* path) {
+  if (BlVELAIndexIsPhotoOnWebFile(path)) {
+    uint32_t width = 0;
+    uint32_t height = 0;
+    return VELAIndexImgResGet(path, &width, &height) == 0 && width < height ? 1 : 0;
+  }
+  VELA_RESOLUTION film = {};
+  VELAIDX_GetMediaResolution(path, &film);
+  return film.width < film.height ? 1 : 0;
+}

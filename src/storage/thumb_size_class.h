@@ -1,0 +1,39 @@
+// The fixed size classes of thumbnails, their file names and the size map.
+#pragma once
+
+#include <cstdint>
+
+/// Size classes. The values are bit positions in the size map and therefore out of size order.
+enum EA_THUMB_SIZE : int32_t {
+  EA_THUMB_SIZE_S = 0,
+  EA_THUMB_SIZE_M = 1,
+  EA_THUMB_SIZE_B = 2,
+  EA_THUMB_SIZE_L = 3,
+  EA_THUMB_SIZE_XL = 4,
+  EA_THUMB_SIZE_SM = 5,
+};
+
+/// One size class.
+struct EAThumbInfo {
+  int32_t size;            ///< an EA_THUMB_SIZE
+  const char* sizeString;  ///< width, the letter x, height
+  const char* name;        ///< file name of the thumbnail
+  const char* oldName;     ///< its older form, with a colon
+};
+
+/// Number of size classes.
+inline constexpr int kEAThumbCount = 6;
+
+/// The size classes by value.
+extern const EAThumbInfo rgEAThumbInfo[kEAThumbCount];
+
+/// Stores a pointer to rgEAThumbInfo in `out` and returns its row count, 6.
+int GetEAThumbInfoTable(const EAThumbInfo** out);
+
+/// Returns the size string of the class `value` (0 to 5; there is no upper bound check), or null
+/// for a negative value, which is logged.
+const char* GetEAThumbSizeString(int value);
+
+/// Returns 1 when the class of the thumbnail file name `name` (either form) is set in `sizeMap`,
+/// else 0; a name that belongs to no class is logged.
+int IsThumbInSizeMap(const char* name, int32_t sizeMap);

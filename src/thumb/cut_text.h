@@ -1,0 +1,13 @@
+// Text as a fixed-size buffer would hold it.
+#pragma once
+
+#include <cstddef>
+#include <string>
+
+/// Size in bytes, terminator included, of the buffers that hold a path or a formatted argument.
+inline constexpr std::size_t kPathBufferSize = 4096;
+
+/// Returns what a buffer of `bufferSize` bytes, terminator included, keeps of `text`.
+inline std::string CutText(const std::string& text, std::size_t bufferSize = kPathBufferSize) {
+  return text.substr(0, bufferSize - 1);
+}

@@ -1,0 +1,53 @@
+#include "thumb/directory_walk.h"
+
+#include <cstdio>
+
+#include "platform/velaindex.h"
+#include "profiles/thumbnail_profile.h"
+#include "thumb/directory_pass.h"
+
+namespace {
+
+constexpr int kWalkDescriptors = 100;
+
+/// The walk hands its callback no pointer of the caller's.
+std::string g_profile_path;
+
+bool Exists(const std::string& path) {
+  struct stat status = {};
+  return stat(path.c_str(), &status) == 0;
+}
+
+}  // namespace
+
+void RunDirectoryJob(const std::string& dirPath, const std::string& profileFilePath) {
+  ThumbnailProfileList profiles;
+  if (!Exists(dirPath) || !Exists(profileFilePath)) {
+    return;
+  }
+  if (IndexIsPathSupportEAWrite(dirPath.c_str()) == 0) {
+    return;
+  }
+  if (ParseThumbnailProfiles(profiles, profileFilePath, dirPath) == 0) {
+    std::fprintf(stderr, "Failed to parse %s", profileFilePath.c_str());
+    return;
+  }
+  CreateDirectoryThumbs({dirPath, profiles});
+}
+
+int RecursiveDirCallback(const char* path, const struct stat* /*status*/, int typeFlag,
+                         struct FTW* walk) {
+  if (typeFlag != FTW_D) {
+    return FTW_SKIP_SUBTREE;
+  }
+  if (EntryNameShouldIndex(path + walk->base) == 0) {
+    return FTW_SKIP_SUBTREE;
+  }
+  RunDirectoryJob(path, g_profile_path);
+  return FTW_CONTINUE;
+}
+
+void RunDirectoryTree(const std::string& dirPath, const std::string& profileFilePath) {
+  g_profile_path = profileFilePath;
+  nftw(dirPath.c_str(), RecursiveDirCallback, kWalkDescriptors, FTW_ACTIONRETVAL | FTW_MOUNT);
+}

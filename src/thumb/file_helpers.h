@@ -1,0 +1,16 @@
+// Small file-system helpers that the rooms share.
+#pragma once
+
+#include <string>
+
+/// Makes the directory `path` with mode 0777 unless it exists. Returns 1 when it exists or was made
+/// (anything else of that name counts as existing), else 0; errors other than a missing parent are
+/// logged.
+int checkCreateDir(const std::string& path);
+
+/// Removes every file that matches the shell pattern. Returns 0 when all matches were removed or
+/// nothing matched, -1 when a removal failed; the others are still removed.
+int RemoveFilesByPattern(const std::string& pattern);
+
+/// Returns a pattern that matches exactly `path`, whatever characters it holds.
+std::string EscapePattern(const std::string& path);

@@ -1,0 +1,25 @@
+// The paths that match a shell pattern.
+#pragma once
+
+#include <glob.h>
+
+#include <string>
+
+/// Expands a shell pattern; holds no path when nothing matches or the expansion fails. The paths
+/// are sorted and live as long as the object.
+class GlobMatches {
+ public:
+  explicit GlobMatches(const std::string& pattern) {
+    found_ = glob(pattern.c_str(), 0, nullptr, &matches_) == 0;
+  }
+  ~GlobMatches() { globfree(&matches_); }
+  GlobMatches(const GlobMatches&) = delete;
+  GlobMatches& operator=(const GlobMatches&) = delete;
+
+  const char* const* begin() const { return matches_.gl_pathv; }
+  const char* const* end() const { return begin() + (found_ ? matches_.gl_pathc : 0); }
+
+ private:
+  glob_t matches_ = {};
+  bool found_ = false;
+};

@@ -1,0 +1,35 @@
+#include "thumb/index_registration.h"
+
+#include <json/value.h>
+#include <syslog.h>
+
+#include <cstring>
+
+#include "platform/velaindex.h"
+#include "source/raw_image.h"
+#include "thumb/log_source.h"
+
+namespace {
+
+/// Fills path and pixel size of an image. Returns false when the size cannot be read, which is
+/// logged with the caller's `line`.
+bool DescribeImage(const std::string& path, int line, VELA_MEDIA_INFO& out) {
+  std::memset(&out, 0, sizeof out);
+  path.copy(out.path, sizeof out.path - 1);
+  if (GetImageResolution(path, out.width, out.height) == 1) {
+    return true;
+  }
+  syslog(LOG_ERR, "%s:%d [Error] GetImageResolution: %s", kLogSource, line, path.c_str());
+  return false;
+}
+
+}  // namespace
+
+void RegisterThumbConversion(const std::string& photoPath, const std::string& thumbPath) {
+  VELA_MEDIA_INFO photo;
+  VELA_MEDIA_INFO thumb;
+  if (!DescribeImage(photoPath, 469, photo) || !DescribeImage(thumbPath, 474, thumb)) {
+    return;
+  }
+  VELAIDX_IndexConvertAdd(photo, thumb, Json::Value(Json::objectValue));
+}

@@ -1,0 +1,8 @@
+// Tells the index of a made thumbnail.
+#pragma once
+
+#include <string>
+
+/// Registers the thumbnail made from a photo, both with their pixel size. When a size cannot be
+/// read nothing is registered, which is logged.
+void RegisterThumbConversion(const std::string& photoPath, const std::string& thumbPath);

@@ -1,0 +1,52 @@
+#include "thumb/phase_status.h"
+
+#include <sys/stat.h>
+
+#include "profiles/photo_thumb_plan.h"
+#include "profiles/thumbnail_profile.h"
+
+namespace {
+
+/// An image file of a single byte is none.
+constexpr off_t kSmallestThumb = 2;
+
+}  // namespace
+
+bool IsPhaseThumbOutdated(const DirectoryJob& job, int phase, const std::string& photoPath,
+                          const std::string& metadataDir) {
+  const int count = GetProfileCount(job.profiles, phase);
+  struct stat photo = {};
+  if (stat(photoPath.c_str(), &photo) != 0) {
+    return false;
+  }
+  for (int i = 0; i < count; ++i) {
+    std::string thumbPath;
+    struct stat thumb = {};
+    if (FindExistingThumb(*GetProfileAt(job.profiles, i, phase), metadataDir, thumbPath, thumb) &&
+        photo.st_mtim.tv_sec > thumb.st_mtim.tv_sec) {
+      return true;
+    }
+  }
+  return false;
+}
+
+bool IsPhaseThumbComplete(const DirectoryJob& job, int phase, const std::string& metadataDir) {
+  const int count = GetProfileCount(job.profiles, phase);
+  for (int i = 0; i < count; ++i) {
+    std::string thumbPath;
+    struct stat thumb = {};
+    if (!FindExistingThumb(*GetProfileAt(job.profiles, i, phase), metadataDir, thumbPath, thumb) ||
+        thumb.st_size < kSmallestThumb) {
+      return false;
+    }
+  }
+  return true;
+}
+
+int MarkAllProfilesFailed(const DirectoryJob& job, const std::string& metadataDir) {
+  return MarkPhaseFailed(job, kAllPhases, metadataDir);
+}
+
+int MarkPhaseFailed(const DirectoryJob& job, int phase, const std::string& metadataDir) {
+  return CreatePhaseFailMarkers(job, phase, metadataDir);
+}

@@ -1,0 +1,112 @@
+#include "thumb/process_control.h"
+
+#include <fcntl.h>
+#include <syslog.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <csignal>
+#include <cstdlib>
+#include <cstring>
+
+#include "convert/photo_convert_job.h"
+#include "platform/vlibc.h"
+#include "thumb/cut_text.h"
+#include "thumb/glob_matches.h"
+#include "thumb/log_source.h"
+
+namespace {
+
+constexpr char kPidFilePrefix[] = "/var/run/velathumb.";
+constexpr char kPidFileSuffix[] = ".pid";
+constexpr std::size_t kPidPathBufferSize = 4095;
+
+/// The path of this process's pid file, built without the C library's formatting so that the signal
+/// handler can use it.
+class OwnPidPath {
+ public:
+  OwnPidPath() noexcept {
+    Append(kPidFilePrefix);
+    AppendNumber(getpid());
+    Append(kPidFileSuffix);
+  }
+  const char* c_str() const noexcept { return text_; }
+
+ private:
+  void Append(const char* part) noexcept {
+    while (*part != '\0' && length_ < kPidPathBufferSize - 1) {
+      text_[length_++] = *part++;
+    }
+  }
+
+  void AppendNumber(pid_t number) noexcept {
+    char digits[16] = "";
+    char* first = digits + sizeof digits - 1;
+    do {
+      *--first = static_cast<char>('0' + number % 10);
+      number /= 10;
+    } while (number > 0);
+    Append(first);
+  }
+
+  char text_[kPidPathBufferSize] = "";
+  std::size_t length_ = 0;
+};
+
+constexpr const char* BaseName(const char* path) {
+  const char* name = path;
+  for (const char* c = path; *c != '\0'; ++c) {
+    if (*c == '/') {
+      name = c + 1;
+    }
+  }
+  return name;
+}
+
+/// Returns the process id that a pid file's name carries, 0 when it carries none.
+long PidOfFile(const char* path) {
+  std::string copy = CutText(path, kPidPathBufferSize);
+  char* rest = nullptr;
+  strtok_r(copy.data(), ".", &rest);
+  const char* number = strtok_r(nullptr, ".", &rest);
+  return number == nullptr ? 0 : std::strtol(number, nullptr, 10);
+}
+
+bool IsProcessThere(long pid) {
+  const auto id = static_cast<pid_t>(pid);
+  return id == pid && kill(id, 0) == 0;
+}
+
+}  // namespace
+
+std::string CreatePidFile() {
+  const OwnPidPath path;
+  const int descriptor = open(path.c_str(), O_WRONLY | O_CREAT | O_CLOEXEC, 0644);
+  if (descriptor < 0) {
+    syslog(LOG_ERR, "%s:%d Failed to open %s. (%s)", kLogSource, 1133, path.c_str(),
+           std::strerror(errno));
+  } else {
+    close(descriptor);
+  }
+  return path.c_str();
+}
+
+void KillThumbProcesses() {
+  for (const char* path : GlobMatches("/var/run/velathumb.*.pid")) {
+    const long pid = PidOfFile(path);
+    if (pid == 0 || IsProcessThere(pid)) {
+      continue;
+    }
+    if (unlink(path) != 0) {
+      syslog(LOG_ERR, "%s: %s(%d) - unlink(%s), %s\n", kLogSource, "KillThumbProcesses", 1161, path,
+             std::strerror(errno));
+    }
+  }
+}
+
+void OnSigTerm(int /*signal*/) {
+  const OwnPidPath path;
+  unlink(path.c_str());
+  VLIBCKill(BaseName(kConvertToolPath), 0);
+  _exit(1);
+}

@@ -1,0 +1,10 @@
+// The thumbnail maker: what the program itself is made of. The door of this room.
+#pragma once
+
+#include "thumb/directory_job.h"
+#include "thumb/directory_pass.h"
+#include "thumb/directory_walk.h"
+#include "thumb/file_helpers.h"
+#include "thumb/index_registration.h"
+#include "thumb/phase_status.h"
+#include "thumb/process_control.h"

@@ -1,0 +1,198 @@
+// Moving outputs into place.
+#include <gmock/gmock.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <cstring>
+#include <string>
+
+#include "convert/convert_fixture.h"
+#include "support/mounts.h"
+
+namespace vela_test {
+namespace {
+
+using ::testing::ElementsAre;
+using ::testing::IsEmpty;
+using ::testing::UnorderedElementsAre;
+
+std::string RenameLine(int width) {
+  return "velamk_photo_thumb:430 [Error] rename: " + TempPath(width) + ", " + ThumbPath(width);
+}
+
+std::string ChmodLine(int width, int error) {
+  return "velamk_photo_thumb:437 [Error] Failed to chmod [" + ThumbPath(width) + "], " +
+         std::strerror(error);
+}
+
+std::string SizeLine(int width, int size) {
+  return "velamk_photo_thumb:441 [Error] file size of dest path: " + std::to_string(size) + ", " +
+         ThumbPath(width);
+}
+
+/// The file-creation mask for as long as the object lives.
+class Mask {
+ public:
+  explicit Mask(mode_t mask) : before_(umask(mask)) {}
+  ~Mask() { umask(before_); }
+  Mask(const Mask&) = delete;
+  Mask& operator=(const Mask&) = delete;
+
+ private:
+  mode_t before_;
+};
+
+class Commit : public ConvertTest {
+ protected:
+  /// Runs a job of these widths with the converter doing as planned.
+  int Run(const StubPlan& plan, const std::vector<int>& widths = {1280, 320, 120}) {
+    Converter().Plan(plan);
+    PhotoConvertJob job = MakeJob(widths);
+    return RunPhotoConvertJob(job);
+  }
+
+  /// Commits one output, which the test has put in place.
+  static int CommitOne(int width = 320) {
+    struct stat photo = {};
+    EXPECT_EQ(stat(kPhoto, &photo), 0);
+    return CommitPhotoThumbs(MakeJob({width}), kPhoto, photo.st_blocks, photo.st_size);
+  }
+
+  /// Makes the output a link to a picture on a volume that takes no changes.
+  static void MakeOutputALink(const std::string& target) {
+    ASSERT_EQ(symlink(target.c_str(), TempPath(320).c_str()), 0);
+  }
+};
+
+TEST_F(Commit, MovesEveryOutputIntoPlace) {
+  EXPECT_EQ(Run(StubPlan().WriteOutput("first").WriteOutput("second").WriteOutput("third")), 0);
+  EXPECT_THAT(OutFiles(), UnorderedElementsAre("1280.jpg", "320.jpg", "120.jpg"));
+  EXPECT_EQ(ReadFile(ThumbPath(1280)), "first");
+  EXPECT_EQ(ReadFile(ThumbPath(320)), "second");
+  EXPECT_EQ(ReadFile(ThumbPath(120)), "third");
+  EXPECT_THAT(ErrorLines(), IsEmpty());
+}
+
+TEST_F(Commit, OpensThumbsToEverybodyWhateverTheMask) {
+  for (const mode_t mask : {mode_t{0}, mode_t{022}, mode_t{0777}}) {
+    const Mask guard(mask);
+    WriteFile(TempPath(320), "output");
+    ASSERT_EQ(chmod(TempPath(320).c_str(), 0600), 0);
+    EXPECT_EQ(CommitOne(), 0);
+    EXPECT_EQ(ModeOf(ThumbPath(320)), 0777) << mask;
+  }
+}
+
+TEST_F(Commit, ReplacesAnOldThumbWithoutTouchingIt) {
+  WriteFile(ThumbPath(320), "old thumb");
+  ASSERT_EQ(link(ThumbPath(320).c_str(), InOutDir("kept").c_str()), 0);
+  ASSERT_EQ(chmod(ThumbPath(320).c_str(), 0400), 0);
+  EXPECT_EQ(Run(StubPlan().WriteOutput("new thumb"), {320}), 0);
+  EXPECT_EQ(ReadFile(ThumbPath(320)), "new thumb");
+  EXPECT_EQ(ReadFile(InOutDir("kept")), "old thumb");
+  EXPECT_EQ(ModeOf(InOutDir("kept")), 0400);
+}
+
+TEST_F(Commit, AnOldThumbThatIsALinkIsReplacedItself) {
+  WriteFile("/tmp/elsewhere.jpg", "linked");
+  ASSERT_EQ(symlink("/tmp/elsewhere.jpg", ThumbPath(320).c_str()), 0);
+  EXPECT_EQ(Run(StubPlan().WriteOutput("new thumb"), {320}), 0);
+  EXPECT_EQ(ReadFile(ThumbPath(320)), "new thumb");
+  EXPECT_EQ(ReadFile("/tmp/elsewhere.jpg"), "linked");
+}
+
+TEST_F(Commit, AMissingOutputFailsAlone) {
+  EXPECT_EQ(Run(StubPlan().WriteOutputs(1).SkipOutputs(1).WriteOutputs()), -1);
+  EXPECT_THAT(OutFiles(), UnorderedElementsAre("1280.jpg", "120.jpg"));
+  EXPECT_THAT(ErrorLines(), ElementsAre(RenameLine(320)));
+}
+
+TEST_F(Commit, AMissingFirstOutputStopsNoOther) {
+  EXPECT_EQ(Run(StubPlan().SkipOutputs(1).WriteOutputs()), -1);
+  EXPECT_THAT(OutFiles(), UnorderedElementsAre("320.jpg", "120.jpg"));
+  EXPECT_THAT(ErrorLines(), ElementsAre(RenameLine(1280)));
+}
+
+TEST_F(Commit, AMissingOutputKeepsTheOldThumb) {
+  WriteFile(ThumbPath(320), "old thumb");
+  EXPECT_EQ(Run(StubPlan(), {320}), -1);
+  EXPECT_EQ(ReadFile(ThumbPath(320)), "old thumb");
+}
+
+TEST_F(Commit, AnOutputThatCannotBeMovedIsRemoved) {
+  MakeDirectories(ThumbPath(320));
+  EXPECT_EQ(Run(StubPlan().WriteOutputs()), -1);
+  EXPECT_THAT(OutFiles(), UnorderedElementsAre("1280.jpg", "320.jpg", "120.jpg"));
+  EXPECT_TRUE(IsDirectory(ThumbPath(320)));
+  EXPECT_THAT(ErrorLines(), ElementsAre(RenameLine(320)));
+}
+
+TEST_F(Commit, AThumbNeedsTwoBytes) {
+  EXPECT_EQ(
+      Run(StubPlan().WriteOutputsOfSize(1, 0).WriteOutputsOfSize(1, 1).WriteOutputsOfSize(1, 2)),
+      -1);
+  EXPECT_THAT(OutFiles(), ElementsAre("120.jpg"));
+  EXPECT_EQ(FileSize(ThumbPath(120)), 2);
+  EXPECT_THAT(ErrorLines(), ElementsAre(SizeLine(1280, 0), SizeLine(320, 1)));
+}
+
+TEST_F(Commit, ATinyOutputTakesTheOldThumbAlong) {
+  WriteFile(ThumbPath(320), "old thumb");
+  EXPECT_EQ(Run(StubPlan().WriteOutputsOfSize(1, 1), {320}), -1);
+  EXPECT_THAT(OutFiles(), IsEmpty());
+}
+
+TEST_F(Commit, AFailedChmodIsLoggedOnly) {
+  WriteFile("/tmp/sealed/picture.jpg", "picture");
+  ASSERT_EQ(chmod("/tmp/sealed/picture.jpg", 0644), 0);
+  const ReadOnlyMount sealed("/tmp/sealed");
+  MakeOutputALink("/tmp/sealed/picture.jpg");
+  EXPECT_EQ(CommitOne(), 0);
+  EXPECT_EQ(ReadFile(ThumbPath(320)), "picture");
+  EXPECT_EQ(ModeOf(ThumbPath(320)), 0644);
+  EXPECT_THAT(ErrorLines(), ElementsAre(ChmodLine(320, EROFS)));
+}
+
+TEST_F(Commit, AThumbThatCannotBeExaminedIsRemoved) {
+  MakeOutputALink("/tmp/nowhere.jpg");
+  EXPECT_EQ(CommitOne(), -1);
+  EXPECT_THAT(OutFiles(), IsEmpty());
+  EXPECT_THAT(ErrorLines(), ElementsAre(ChmodLine(320, ENOENT), SizeLine(320, 0)));
+}
+
+TEST_F(Commit, TheSizeIsThatBehindALink) {
+  WriteFile("/tmp/elsewhere.jpg", "x");
+  MakeOutputALink("/tmp/elsewhere.jpg");
+  EXPECT_EQ(CommitOne(), -1);
+  EXPECT_THAT(ErrorLines(), ElementsAre(SizeLine(320, 1)));
+  EXPECT_TRUE(Exists("/tmp/elsewhere.jpg"));
+  EXPECT_FALSE(Exists(ThumbPath(320)));
+}
+
+TEST_F(Commit, EveryFailureIsToldAndTheRestGoesOn) {
+  MakeDirectories(ThumbPath(800));
+  EXPECT_EQ(Run(StubPlan()
+                    .WriteOutputs(1)
+                    .WriteOutputs(1)
+                    .SkipOutputs(1)
+                    .WriteOutputsOfSize(1, 1)
+                    .WriteOutputs(),
+                {1280, 800, 640, 320, 120}),
+            -1);
+  EXPECT_THAT(OutFiles(), UnorderedElementsAre("1280.jpg", "800.jpg", "120.jpg"));
+  EXPECT_THAT(ErrorLines(), ElementsAre(RenameLine(800), RenameLine(640), SizeLine(320, 1)));
+}
+
+TEST_F(Commit, TwoOutputsOfOneNameFailAtTheSecond) {
+  PhotoConvertJob job = MakeJob({1280, 320});
+  job.settings[1].tempPath = TempPath(1280);
+  Converter().Plan(StubPlan().WriteOutput("first").WriteOutput("second"));
+  EXPECT_EQ(RunPhotoConvertJob(job), -1);
+  EXPECT_THAT(OutFiles(), ElementsAre("1280.jpg"));
+  EXPECT_THAT(ErrorLines(), ElementsAre("velamk_photo_thumb:430 [Error] rename: " + TempPath(1280) +
+                                        ", " + ThumbPath(320)));
+}
+
+}  // namespace
+}  // namespace vela_test

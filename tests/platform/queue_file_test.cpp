@@ -1,0 +1,196 @@
+// Appending to queue files.
+#include <fcntl.h>
+#include <sys/file.h>
+#include <sys/resource.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <csignal>
+#include <map>
+#include <string>
+#include <vector>
+
+#include "platform/forked_call.h"
+#include "platform/velaindex.h"
+#include "platform/vlibc.h"
+#include "support/files.h"
+#include "support/mounts.h"
+#include "support/privileges.h"
+#include "support/sandbox.h"
+
+namespace {
+
+using vela_test::ReadFile;
+using vela_test::WriteFile;
+
+constexpr const char* kQueue = "/var/spool/thumb_create.queue";
+
+class QueueFile : public vela_test::SandboxTest {};
+
+TEST_F(QueueFile, IsMadeWithMode0644) {
+  const mode_t mask = umask(077);
+  EXPECT_EQ(WriteIndexQueue("/photo/a", kQueue), 0);
+  umask(mask);
+  EXPECT_EQ(ReadFile(kQueue), "/photo/a\n");
+  EXPECT_EQ(vela_test::ModeOf(kQueue), 0644);
+}
+
+TEST_F(QueueFile, KeepsWhatItHoldsAndItsMode) {
+  WriteFile(kQueue, "/photo/a\n");
+  ASSERT_EQ(chmod(kQueue, 0600), 0);
+  EXPECT_EQ(WriteIndexQueue("/photo/b", kQueue), 0);
+  EXPECT_EQ(WriteIndexQueue("R:/photo/c \xff%s\t", kQueue), 0);
+  EXPECT_EQ(ReadFile(kQueue), "/photo/a\n/photo/b\nR:/photo/c \xff%s\t\n");
+  EXPECT_EQ(vela_test::ModeOf(kQueue), 0600);
+}
+
+TEST_F(QueueFile, EndsALineThatHasNoNewlineYet) {
+  WriteFile(kQueue, "/photo/a");
+  EXPECT_EQ(WriteIndexQueue("/photo/b", kQueue), 0);
+  EXPECT_EQ(ReadFile(kQueue), "/photo/a\n/photo/b\n");
+}
+
+TEST_F(QueueFile, RefusesPathsThatAreNoLine) {
+  EXPECT_EQ(WriteIndexQueue("/photo\n/a", kQueue), -1);
+  EXPECT_EQ(VLIBCErrGet(), EINVAL);
+  EXPECT_EQ(WriteIndexQueue("\n", kQueue), -1);
+  EXPECT_EQ(WriteIndexQueue("", kQueue), -1);
+  EXPECT_EQ(WriteIndexQueue(nullptr, kQueue), -1);
+  EXPECT_EQ(WriteIndexQueue("/photo/a", nullptr), -1);
+  EXPECT_FALSE(vela_test::Exists(kQueue));
+}
+
+TEST_F(QueueFile, FailsWhereItCannotBeWritten) {
+  EXPECT_EQ(WriteIndexQueue("/photo/a", "/var/spool/absent/queue"), -1);
+  EXPECT_EQ(VLIBCErrGet(), ENOENT);
+  EXPECT_EQ(WriteIndexQueue("/photo/a", "/var/spool"), -1);
+  ASSERT_EQ(mkfifo("/var/spool/fifo", 0600), 0);
+  EXPECT_EQ(WriteIndexQueue("/photo/a", "/var/spool/fifo"), -1);
+  WriteFile(kQueue, "");
+  ASSERT_EQ(chmod(kQueue, 0444), 0);
+  const vela_test::WithoutCapabilities ordinary;
+  EXPECT_EQ(WriteIndexQueue("/photo/a", kQueue), -1);
+  EXPECT_EQ(VLIBCErrGet(), EACCES);
+}
+
+TEST_F(QueueFile, HoldsNoPartOfALineThatDoesNotFit) {
+  WriteFile(kQueue, "/photo/a\n");
+  const int result = platform_test::RunForked([] {
+    signal(SIGXFSZ, SIG_IGN);
+    const rlimit limit{12, 12};
+    setrlimit(RLIMIT_FSIZE, &limit);
+    return WriteIndexQueue("/photo/b", kQueue) == -1 ? 0 : 1;
+  });
+  EXPECT_EQ(result, 0);
+  EXPECT_EQ(ReadFile(kQueue), "/photo/a\n");
+}
+
+TEST_F(QueueFile, FailsOnAFullVolume) {
+  vela_test::SmallVolume volume("/var/spool/small", 64 << 10);
+  const std::string queue = "/var/spool/small/queue";
+  const std::string content(vela_test::SmallVolume::PageSize() - 1, 'x');
+  WriteFile(queue, content + "\n");
+  volume.SetAvailable(0);
+  EXPECT_EQ(WriteIndexQueue("/photo/b", queue.c_str()), -1);
+  EXPECT_EQ(VLIBCErrGet(), ENOSPC);
+  EXPECT_EQ(ReadFile(queue), content + "\n");
+}
+
+TEST_F(QueueFile, WaitsForTheLock) {
+  WriteFile(kQueue, "");
+  const int holder = open(kQueue, O_RDWR | O_CLOEXEC);
+  ASSERT_GE(holder, 0);
+  ASSERT_EQ(flock(holder, LOCK_EX), 0);
+  const pid_t writer = platform_test::Fork([holder] {
+    close(holder);  // else the copy would keep the lock
+    return WriteIndexQueue("/photo/a", kQueue) == 0 ? 0 : 1;
+  });
+  usleep(100000);
+  EXPECT_EQ(ReadFile(kQueue), "");
+  close(holder);
+  EXPECT_EQ(platform_test::Join(writer), 0);
+  EXPECT_EQ(ReadFile(kQueue), "/photo/a\n");
+}
+
+TEST_F(QueueFile, IsMadeAnewWhenItWasRenamedAwayWhileWaiting) {
+  WriteFile(kQueue, "/photo/old\n");
+  const int holder = open(kQueue, O_RDWR | O_CLOEXEC);
+  ASSERT_GE(holder, 0);
+  ASSERT_EQ(flock(holder, LOCK_EX), 0);
+  const pid_t writer = platform_test::Fork([holder] {
+    close(holder);  // else the copy would keep the lock
+    return WriteIndexQueue("/photo/a", kQueue) == 0 ? 0 : 1;
+  });
+  usleep(100000);
+  const std::string away = std::string(kQueue) + ".tmp";
+  ASSERT_EQ(rename(kQueue, away.c_str()), 0);
+  close(holder);
+  EXPECT_EQ(platform_test::Join(writer), 0);
+  EXPECT_EQ(ReadFile(away), "/photo/old\n");
+  EXPECT_EQ(ReadFile(kQueue), "/photo/a\n");
+}
+
+TEST_F(QueueFile, IsTheNewOneWhenAnotherHasMadeItWhileWaiting) {
+  WriteFile(kQueue, "/photo/old\n");
+  const int holder = open(kQueue, O_RDWR | O_CLOEXEC);
+  ASSERT_GE(holder, 0);
+  ASSERT_EQ(flock(holder, LOCK_EX), 0);
+  const pid_t writer = platform_test::Fork([holder] {
+    close(holder);
+    return WriteIndexQueue("/photo/a", kQueue) == 0 ? 0 : 1;
+  });
+  usleep(100000);
+  const std::string away = std::string(kQueue) + ".tmp";
+  ASSERT_EQ(rename(kQueue, away.c_str()), 0);
+  WriteFile(kQueue, "/photo/new\n");
+  close(holder);
+  EXPECT_EQ(platform_test::Join(writer), 0);
+  EXPECT_EQ(ReadFile(away), "/photo/old\n");
+  EXPECT_EQ(ReadFile(kQueue), "/photo/new\n/photo/a\n");
+}
+
+TEST_F(QueueFile, GetsEveryLineOfManyWritersOnce) {
+  constexpr int kWriters = 6;
+  constexpr int kLines = 100;
+  std::vector<pid_t> writers;
+  for (int writer = 0; writer < kWriters; ++writer) {
+    writers.push_back(platform_test::Fork([writer] {
+      for (int line = 0; line < kLines; ++line) {
+        const std::string path = "/photo/" + std::to_string(writer) + "/" + std::to_string(line) +
+                                 std::string(static_cast<size_t>(line * 31 % 4000), 'x');
+        if (WriteIndexQueue(path.c_str(), kQueue) != 0) return 1;
+      }
+      return 0;
+    }));
+  }
+  // Somebody who works the queue off meanwhile, renaming it away under its lock.
+  std::map<std::string, int> seen;
+  const auto collect = [&seen](const std::string& file) {
+    for (const std::string& line : vela_test::ReadLines(file)) ++seen[line];
+  };
+  for (int round = 0; round < 40; ++round) {
+    const int queue = open(kQueue, O_RDWR | O_CLOEXEC);
+    if (queue >= 0) {
+      ASSERT_EQ(flock(queue, LOCK_EX), 0);
+      const std::string away = "/var/spool/away" + std::to_string(round);
+      ASSERT_EQ(rename(kQueue, away.c_str()), 0);
+      collect(away);
+      close(queue);
+    }
+    usleep(1000);
+  }
+  for (const pid_t writer : writers) EXPECT_EQ(platform_test::Join(writer), 0);
+  if (vela_test::Exists(kQueue)) collect(kQueue);
+  EXPECT_EQ(seen.size(), size_t{kWriters * kLines});
+  for (const auto& [line, count] : seen) EXPECT_EQ(count, 1) << line;
+}
+
+TEST_F(QueueFile, LeavesNoDescriptorOpen) {
+  const int before = platform_test::CountDescriptors();
+  for (int i = 0; i < 10; ++i) WriteIndexQueue("/photo/a", kQueue);
+  WriteIndexQueue("/photo/a", "/var/spool");
+  EXPECT_EQ(platform_test::CountDescriptors(), before);
+}
+
+}  // namespace

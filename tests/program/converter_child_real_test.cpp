@@ -1,0 +1,151 @@
+// What the converter gets from the program beside its arguments.
+#include <fcntl.h>
+#include <unistd.h>
+
+#include <climits>
+#include <thread>
+
+#include "program/real_program_test.h"
+#include "support/build_paths.h"
+#include "support/daemon_peer.h"
+#include "support/images.h"
+#include "support/stub_tool.h"
+
+namespace vela_test::real {
+
+namespace {
+
+using ConverterChild = RealProgramTest;
+
+/// What a link of the process table stands for; empty when it is gone.
+std::string LinkTarget(const std::string& path) {
+  char target[PATH_MAX];
+  const ssize_t length = readlink(path.c_str(), target, sizeof target);
+  return length > 0 ? std::string(target, static_cast<size_t>(length)) : std::string();
+}
+
+std::string ExecutableOf(pid_t pid) {
+  return LinkTarget("/proc/" + std::to_string(pid) + "/exe");
+}
+
+/// What the descriptors of a process stand for; empty when it is gone.
+std::vector<std::string> DescriptorTargets(pid_t pid) {
+  std::vector<std::string> targets;
+  const std::string directory = "/proc/" + std::to_string(pid) + "/fd";
+  for (const std::string& number : ListDirectory(directory)) {
+    const std::string target = LinkTarget(directory + "/" + number);
+    if (!target.empty()) {
+      targets.push_back(target);
+    }
+  }
+  return targets;
+}
+
+/// The converters that run now. A child that only prepares to become one still is the program; the
+/// pause is for one that becomes it at this moment.
+std::vector<pid_t> RunningConverters(const Program& program) {
+  std::vector<pid_t> converters;
+  for (const pid_t pid : ProcessesCalled("convert-thumb")) {
+    const std::string executable = ExecutableOf(pid);
+    if (!executable.empty() && executable != ExecutableOf(program.Pid())) {
+      converters.push_back(pid);
+    }
+  }
+  std::this_thread::sleep_for(std::chrono::milliseconds(1));
+  return converters;
+}
+
+/// Whether a converter would open such a thing by itself: the photo and its outputs, libraries and
+/// settings, and what is common to all processes.
+bool IsTheConvertersOwn(const std::string& target) {
+  if (target.compare(0, 1, "/") != 0) {
+    return false;
+  }
+  const std::string end = "/@eaDir";
+  const bool isLock = target.size() >= end.size() &&
+                      target.compare(target.size() - end.size(), end.size(), end) == 0;
+  return !isLock && target.compare(0, 4, "/var") != 0 && target != kProfiles;
+}
+
+}  // namespace
+
+TEST_F(ConverterChild, HasTheStandardDescriptorsOnly) {
+  DaemonPeer daemon;
+  const StubTool converter(kConverterPath);
+  converter.Plan(StubPlan().PassThrough(kRealConverter));
+  MakeJpeg(InPhotos("a.jpg"));
+  WriteFile(InPhotos("b.jpg"), "no photo");
+  MakeJpeg(InPhotos("c.jpg"));
+  Make({"R:" + std::string(kPhotos)});
+  Make();
+  const std::vector<StubCall> calls = converter.Calls();
+  ASSERT_EQ(calls.size(), 2U + 1U + 2U + 1U + 1U + 1U);
+  for (const StubCall& call : calls) {
+    ASSERT_EQ(call.descriptors.size(), 3U) << "call " << call.number;
+    for (int i = 0; i < 3; ++i) {
+      const OpenDescriptor& descriptor = call.descriptors[static_cast<size_t>(i)];
+      EXPECT_EQ(descriptor.number, i);
+      EXPECT_EQ(descriptor.target, "/dev/null");
+    }
+    EXPECT_EQ(call.blockedSignals, std::vector<int>());
+    EXPECT_EQ(call.ignoredSignals, std::vector<int>());
+  }
+}
+
+// Neither does it see what the program itself was started with.
+TEST_F(ConverterChild, HasNoneOfTheCallersDescriptors) {
+  const StubTool converter(kConverterPath);
+  converter.Plan(StubPlan().PassThrough(kRealConverter));
+  const std::string photo = MakeJpeg(InPhotos("a.jpg"));
+  const int file = open(photo.c_str(), O_RDONLY);
+  ASSERT_GE(file, 3);
+  ProgramOptions options;
+  options.keptDescriptors = {file};
+  Make({kPhotos}, options);
+  close(file);
+  for (const StubCall& call : converter.Calls()) {
+    EXPECT_EQ(call.descriptors.size(), 3U);
+  }
+  EXPECT_TRUE(HasThumbs(photo, OfPhase(kinds_, 1)));
+}
+
+TEST_F(ConverterChild, StandardDescriptorsAreThereWhenTheCallerClosedThem) {
+  const StubTool converter(kConverterPath);
+  converter.Plan(StubPlan().PassThrough(kRealConverter));
+  const std::string photo = MakeJpeg(InPhotos("a.jpg"));
+  ProgramOptions options;
+  options.closeInput = true;
+  options.closeOutput = true;
+  options.closeError = true;
+  Make({kPhotos}, options);
+  ASSERT_FALSE(converter.Calls().empty());
+  for (const StubCall& call : converter.Calls()) {
+    EXPECT_EQ(call.descriptors.size(), 3U);
+  }
+  EXPECT_TRUE(HasThumbs(photo, OfPhase(kinds_, 1)));
+}
+
+// The real converter, looked at from outside all the time it works.
+TEST_F(ConverterChild, RealConverterHoldsNothingOfTheProgram) {
+  JpegRecipe recipe;
+  recipe.width = 2400;
+  recipe.height = 1800;
+  for (int i = 0; i < 3; ++i) {
+    MakeJpeg(InPhotos(std::to_string(i) + ".jpg"), recipe);
+  }
+  Program program = StartProgram(VelathumbPath(), {kProfiles, kPhotos});
+  int looks = 0;
+  while (!program.Wait(std::chrono::milliseconds(0))) {
+    for (const pid_t pid : RunningConverters(program)) {
+      const std::vector<std::string> targets = DescriptorTargets(pid);
+      looks += targets.empty() ? 0 : 1;
+      for (const std::string& target : targets) {
+        EXPECT_TRUE(IsTheConvertersOwn(target)) << target;
+      }
+    }
+  }
+  EXPECT_EQ(program.Wait()->exitCode, 0);
+  EXPECT_GT(looks, 3);
+}
+
+}  // namespace vela_test::real

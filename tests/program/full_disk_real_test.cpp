@@ -1,0 +1,141 @@
+// A volume that fills up while photos are converted.
+#include <algorithm>
+#include <random>
+#include <thread>
+
+#include "program/real_program_test.h"
+#include "support/build_paths.h"
+#include "support/daemon_peer.h"
+#include "support/images.h"
+#include "support/mounts.h"
+#include "support/stub_tool.h"
+#include "support/system_log.h"
+
+namespace vela_test::real {
+
+namespace {
+
+/// Above what the program wants to be free before it converts a photo.
+constexpr uint64_t kRoomy = 1200ULL << 20U;
+
+class FullDisk : public RealProgramTest {
+ protected:
+  void SetUp() override {
+    RealProgramTest::SetUp();
+    volume_.emplace(kPhotos, kRoomy + (64ULL << 20U));
+  }
+
+  /// Detailed enough for thumbnails of many pages.
+  static std::string MakeDetailedPhoto(const std::string& name) {
+    Draw({"-size", "640x480", "-seed", "7", "plasma:red-blue", "-quality", "92", InPhotos(name)});
+    return InPhotos(name);
+  }
+
+  void MakeRoom() {
+    RemoveTree(InPhotos("@eaDir"));
+    volume_->SetAvailable(kRoomy);
+  }
+
+  /// No thumbnail of this phase at all: markers, or nothing where even they found no room.
+  static bool HasNoThumbs(const std::string& photo, const std::vector<Kind>& kinds) {
+    return std::none_of(kinds.begin(), kinds.end(),
+                        [&](const Kind& kind) { return Exists(ThumbOf(photo, kind)); });
+  }
+
+  std::optional<SmallVolume> volume_;
+};
+
+}  // namespace
+
+TEST_F(FullDisk, FullBeforeTheFirstOutput) {
+  const std::string photo = MakeDetailedPhoto("a.jpg");
+  MakeDetailedPhoto("b.jpg");
+  const StubTool converter(kConverterPath);
+  converter.Plan(StubPlan().FillVolume(kPhotos).PassThrough(kRealConverter));
+  const DaemonPeer daemon;
+  Make();
+  EXPECT_EQ(converter.Calls().size(), 1U);
+  EXPECT_TRUE(ThumbsBelow(kPhotos).empty());
+  // The next photo finds the volume too full to begin with.
+  EXPECT_EQ(ErrorLines(), std::vector<std::string>{
+                              "velathumb:893 Stopping creating thumbs as the disk space is near "
+                              "full, " +
+                              InPhotos("b.jpg")});
+  // Nothing is left for good: with room again, everything is made.
+  MakeRoom();
+  InstallRealConverter();
+  Make();
+  EXPECT_TRUE(HasThumbs(photo, OfPhase(kinds_, 0)));
+}
+
+TEST_F(FullDisk, FullBetweenTwoOutputs) {
+  WriteKinds(kProfiles, FullKinds());
+  const std::string photo = MakeDetailedPhoto("a.jpg");
+  const StubTool converter(kConverterPath);
+  converter.PlanCall(2, StubPlan().FillVolume(kPhotos).PassThrough(kRealConverter));
+  converter.Plan(StubPlan().PassThrough(kRealConverter));
+  Make();
+  EXPECT_EQ(converter.Calls().size(), 2U);
+  EXPECT_TRUE(HasThumbs(photo, OfPhase(FullKinds(), 0)));
+  EXPECT_TRUE(HasNoThumbs(photo, OfPhase(FullKinds(), 1)));
+  EXPECT_TRUE(OnlyWholeThumbsBelow(kPhotos));
+}
+
+// Room for one page more each time, so that the end of the room lies everywhere in the outputs.
+TEST_F(FullDisk, FullAnywhereInTheOutputs) {
+  WriteKinds(kProfiles, FullKinds());
+  const std::string photo = MakeDetailedPhoto("a.jpg");
+  const std::vector<Kind> phase0 = OfPhase(FullKinds(), 0);
+  StubTool converter(kConverterPath);
+  converter.PlanWhen(
+      photo,
+      StubPlan().CreateFile("/tmp/begun").WaitForFile("/tmp/go").PassThrough(kRealConverter));
+  converter.Plan(StubPlan().PassThrough(kRealConverter));
+  int made = 0;
+  int failed = 0;
+  for (uint64_t pages = 0; pages < 200 && made == 0; pages += pages < 4 ? 1 : 5) {
+    SCOPED_TRACE("room for " + std::to_string(pages) + " pages");
+    MakeRoom();
+    RemoveTree("/tmp/begun");
+    RemoveTree("/tmp/go");
+    Program program = StartProgram(VelathumbPath(), {kProfiles, kPhotos});
+    ASSERT_TRUE(WaitUntilExists("/tmp/begun"));
+    const auto before = PhotosBelow(kPhotos);
+    volume_->SetAvailable(pages * SmallVolume::PageSize());
+    WriteFile("/tmp/go", "");
+    const auto result = program.Wait();
+    ASSERT_TRUE(result);
+    EXPECT_EQ(result->exitCode, 0) << result->err;
+    EXPECT_TRUE(PhotosBelow(kPhotos) == before);
+    ASSERT_TRUE(OnlyWholeThumbsBelow(kPhotos));
+    ASSERT_TRUE(HasThumbs(photo, phase0) || HasNoThumbs(photo, phase0));
+    ++(HasNoThumbs(photo, phase0) ? failed : made);
+  }
+  EXPECT_GT(failed, 8);
+  EXPECT_EQ(made, 1);
+}
+
+TEST_F(FullDisk, FullAtRandomMomentsOfARun) {
+  for (int i = 0; i < 24; ++i) {
+    MakeJpeg(InPhotos(std::to_string(i) + ".jpg"));
+  }
+  const auto before = PhotosBelow(kPhotos);
+  const unsigned seed = std::random_device()();
+  std::mt19937 random(seed);
+  for (int trial = 0; trial < 15; ++trial) {
+    MakeRoom();
+    const int moment = std::uniform_int_distribution<int>(0, 300)(random);
+    SCOPED_TRACE("seed " + std::to_string(seed) + ", trial " + std::to_string(trial) + ", after " +
+                 std::to_string(moment) + " ms");
+    Program program = StartProgram(VelathumbPath(), {kProfiles, kPhotos});
+    std::this_thread::sleep_for(std::chrono::milliseconds(moment));
+    volume_->SetAvailable(0);
+    const auto result = program.Wait();
+    ASSERT_TRUE(result);
+    EXPECT_EQ(result->exitCode, 0) << result->err;
+    EXPECT_TRUE(PhotosBelow(kPhotos) == before);
+    ASSERT_TRUE(OnlyWholeThumbsBelow(kPhotos));
+  }
+}
+
+}  // namespace vela_test::real

@@ -1,0 +1,304 @@
+// The program ended by a signal at any moment of a run.
+#include <algorithm>
+#include <chrono>
+#include <csignal>
+#include <functional>
+#include <optional>
+#include <random>
+#include <thread>
+
+#include "program/real_program_test.h"
+#include "support/build_paths.h"
+#include "support/daemon_peer.h"
+#include "support/images.h"
+#include "support/stub_tool.h"
+
+namespace vela_test::real {
+
+namespace {
+
+using std::chrono::microseconds;
+using std::chrono::milliseconds;
+using std::chrono::steady_clock;
+
+constexpr const char* kTree = "R:/tmp/photos";
+constexpr const char* kConverterName = "convert-thumb";
+
+/// A quarter of the trials of a signal; four tests share them out.
+constexpr int kTrials = 50;
+
+/// What the program may take to end after SIGTERM.
+constexpr milliseconds kPromptEnd(1000);
+
+class Interruption : public RealProgramTest {
+ protected:
+  /// Copies of a photo in four directories, so that a signal also meets the change from one to the
+  /// next.
+  void MakePhotos(int perDirectory, const std::string& original = MakeJpeg("/tmp/small.jpg")) {
+    for (int i = 0; i < 4 * perDirectory; ++i) {
+      const std::string name = "d" + std::to_string(i % 4) + "/" + std::to_string(i) + ".jpg";
+      MakeDirectories(InPhotos(name.substr(0, 2)));
+      CopyFile(original, InPhotos(name));
+      photos_.push_back(InPhotos(name));
+    }
+    before_ = PhotosBelow(kPhotos);
+  }
+
+  /// A photo with much detail: the converter spends a good part of its time on writing.
+  static std::string MakeDetailedPhoto() {
+    Draw({"-size", "640x480", "-seed", "7", "plasma:red-blue", "-quality", "92",
+          "/tmp/detailed.jpg"});
+    return "/tmp/detailed.jpg";
+  }
+
+  /// As before the first run.
+  static void ForgetRuns() {
+    for (int i = 0; i < 4; ++i) {
+      RemoveTree(InPhotos("d" + std::to_string(i) + "/@eaDir"));
+    }
+    RemoveTree(kQueue);
+    RemoveTree("/var/spool/conv_progress_photo");
+  }
+
+  /// A run over the whole tree that has made its pid file.
+  static Program StartRun() {
+    Program program = StartProgram(VelathumbPath(), {kProfiles, kTree});
+    const std::string pidFile = PidFileOf(program);
+    const auto end = steady_clock::now() + std::chrono::seconds(10);
+    while (!Exists(pidFile) && steady_clock::now() < end) {
+      std::this_thread::sleep_for(microseconds(50));
+    }
+    EXPECT_TRUE(Exists(pidFile));
+    return program;
+  }
+
+  static std::string PidFileOf(const Program& program) {
+    return "/var/run/velathumb." + std::to_string(program.Pid()) + ".pid";
+  }
+
+  /// Sends SIGTERM, after which the program has to end at once and leave nothing running.
+  static void Terminate(Program& program) {
+    const auto sent = steady_clock::now();
+    program.Kill(SIGTERM);
+    const std::optional<ProgramResult> result = program.Wait(kPromptEnd);
+    ASSERT_TRUE(result) << "still there a second after the signal";
+    EXPECT_EQ(result->exitCode, 1);
+    EXPECT_EQ(result->signal, 0);
+    EXPECT_EQ(PidFiles(), std::vector<std::string>());
+    const auto left = sent + kPromptEnd - steady_clock::now();
+    EXPECT_TRUE(WaitUntilNoneIsCalled(
+        kConverterName, static_cast<int>(std::chrono::duration_cast<milliseconds>(left).count())));
+  }
+
+  void ExpectNoHarm() const {
+    EXPECT_TRUE(OnlyWholeThumbsBelow(kPhotos));
+    EXPECT_TRUE(PhotosBelow(kPhotos) == before_) << "the run touched a photo";
+  }
+
+  /// Whole trials with a moment each, until one fails. Half of the moments lie close to the start,
+  /// where processes and files come into being, half anywhere in the run.
+  void Repeat(int trials, milliseconds longest,
+              const std::function<void(microseconds moment)>& trial) {
+    const unsigned seed = std::random_device()();
+    std::mt19937 random(seed);
+    for (int i = 0; i < trials && !HasFailure(); ++i) {
+      const milliseconds limit = i % 2 == 0 ? milliseconds(25) : longest;
+      std::uniform_int_distribution<int> moments(0, static_cast<int>(microseconds(limit).count()));
+      const microseconds moment(moments(random));
+      SCOPED_TRACE("seed " + std::to_string(seed) + ", trial " + std::to_string(i) + ", after " +
+                   std::to_string(moment.count()) + " us");
+      trial(moment);
+    }
+  }
+
+  /// SIGTERM at random moments of runs that each begin with nothing made.
+  void TerminateRuns() {
+    kinds_ = FullKinds();
+    WriteKinds(kProfiles, kinds_);
+    MakePhotos(8, MakeDetailedPhoto());
+    Repeat(kTrials, milliseconds(400), [this](microseconds moment) {
+      ForgetRuns();
+      Program program = StartRun();
+      std::this_thread::sleep_for(moment);
+      Terminate(program);
+      ExpectNoHarm();
+    });
+  }
+
+  /// SIGKILL at random moments; the runs after it clean up and finish the work.
+  void KillRuns() {
+    MakePhotos(1);
+    Repeat(kTrials, milliseconds(120), [this](microseconds moment) {
+      ForgetRuns();
+      const std::string stale = KillOneRun(moment);
+      ExpectNoHarm();
+      AwaitChildrenOfKilledRun();
+      ExpectNoHarm();
+      EXPECT_TRUE(Exists(stale));
+      Make({kTree});
+      EXPECT_EQ(PidFiles(), std::vector<std::string>());
+      ExpectThumbs(0);
+      ExpectThumbs(1);
+      Make({kTree});
+      ExpectThumbs(2);
+      ExpectNoHarm();
+    });
+  }
+
+  /// Kills a run after `moment`; another one, earlier, when that was done before. Returns its pid
+  /// file.
+  static std::string KillOneRun(microseconds moment) {
+    for (;;) {
+      Program program = StartRun();
+      const std::string pidFile = PidFileOf(program);
+      std::this_thread::sleep_for(moment);
+      program.Kill(SIGKILL);
+      program.Wait();
+      // A run removes its pid file when it is done.
+      if (Exists(pidFile)) {
+        return pidFile;
+      }
+      ForgetRuns();
+      moment /= 2;
+    }
+  }
+
+  /// What the killed program had just started may hold its lock until it becomes the converter, and
+  /// ends by itself a little later.
+  static void AwaitChildrenOfKilledRun() {
+    EXPECT_TRUE(WaitUntilNoneIsCalled("velathumb", 10000));
+    EXPECT_TRUE(WaitUntilNoneIsCalled(kConverterName, 10000));
+  }
+
+  void ExpectThumbs(int phase) const {
+    for (const std::string& photo : photos_) {
+      EXPECT_TRUE(HasThumbs(photo, OfPhase(kinds_, phase)));
+    }
+  }
+
+  std::vector<std::string> photos_;
+  std::map<std::string, PhotoState> before_;
+};
+
+}  // namespace
+
+TEST_F(Interruption, SigtermAtRandomMoments1) {
+  TerminateRuns();
+}
+
+TEST_F(Interruption, SigtermAtRandomMoments2) {
+  TerminateRuns();
+}
+
+TEST_F(Interruption, SigtermAtRandomMoments3) {
+  TerminateRuns();
+}
+
+TEST_F(Interruption, SigtermAtRandomMoments4) {
+  TerminateRuns();
+}
+
+TEST_F(Interruption, SigkillAtRandomMoments1) {
+  KillRuns();
+}
+
+TEST_F(Interruption, SigkillAtRandomMoments2) {
+  KillRuns();
+}
+
+TEST_F(Interruption, SigkillAtRandomMoments3) {
+  KillRuns();
+}
+
+TEST_F(Interruption, SigkillAtRandomMoments4) {
+  KillRuns();
+}
+
+// A converter that was about to start when the signal came would otherwise be seen only by chance:
+// the real one is done too soon.
+TEST_F(Interruption, SigtermAroundTheStartOfAHangingConverter) {
+  MakePhotos(1);
+  const StubTool converter(kConverterPath);
+  converter.Plan(StubPlan().Sleep(60000));
+  Repeat(60, milliseconds(10), [](microseconds moment) {
+    ForgetRuns();
+    Program program = StartRun();
+    std::this_thread::sleep_for(moment);
+    Terminate(program);
+  });
+}
+
+TEST_F(Interruption, SigtermDuringAHangingConverter) {
+  MakePhotos(1);
+  const StubTool converter(kConverterPath);
+  converter.Plan(StubPlan().WriteOutputs(1).CreateFile("/tmp/hangs").Sleep(60000));
+  Program program = StartRun();
+  ASSERT_TRUE(WaitUntilExists("/tmp/hangs"));
+  Terminate(program);
+  ExpectNoHarm();
+  EXPECT_EQ(ThumbsBelow(kPhotos).size(), 0U);
+  // The directory is free for the next run.
+  InstallRealConverter();
+  Make({kTree});
+  Make({kTree});
+  for (int phase = 0; phase <= 2; ++phase) {
+    ExpectThumbs(phase);
+  }
+}
+
+TEST_F(Interruption, SigtermEndsTheConvertersOfOtherInstances) {
+  MakePhotos(1);
+  const StubTool converter(kConverterPath);
+  converter.PlanCall(1, StubPlan().CreateFile("/tmp/hangs1").Sleep(60000));
+  converter.PlanCall(2, StubPlan().CreateFile("/tmp/hangs2").Sleep(60000));
+  converter.Plan(StubPlan().PassThrough(kRealConverter));
+  Program other = StartProgram(VelathumbPath(), {kProfiles, InPhotos("d0")});
+  ASSERT_TRUE(WaitUntilExists("/tmp/hangs1"));
+  Program program = StartProgram(VelathumbPath(), {kProfiles, InPhotos("d1")});
+  ASSERT_TRUE(WaitUntilExists("/tmp/hangs2"));
+  program.Kill(SIGTERM);
+  const auto result = program.Wait(kPromptEnd);
+  ASSERT_TRUE(result);
+  EXPECT_EQ(result->exitCode, 1);
+  // The other one takes the end of its converter for a failure and goes on to its own end.
+  const auto otherResult = other.Wait(milliseconds(10000));
+  ASSERT_TRUE(otherResult);
+  EXPECT_EQ(otherResult->exitCode, 0);
+  EXPECT_TRUE(IsMarkedFailed(photos_[0], kinds_));
+  EXPECT_EQ(PidFiles(), std::vector<std::string>());
+}
+
+TEST_F(Interruption, SigtermWhileTheDaemonIsSilent) {
+  MakePhotos(1);
+  for (const char* command : {"GET_INDEX_VERSION", "POST_PHOTO_CONVERT"}) {
+    SCOPED_TRACE(command);
+    ForgetRuns();
+    DaemonPeer daemon;
+    daemon.Answer(command, DaemonReply::Silence());
+    Program program = StartRun();
+    const auto end = steady_clock::now() + std::chrono::seconds(10);
+    const auto isAsked = [&] {
+      const std::vector<std::string> commands = daemon.Commands();
+      return std::count(commands.begin(), commands.end(), command) > 0;
+    };
+    while (!isAsked() && steady_clock::now() < end) {
+      std::this_thread::sleep_for(milliseconds(1));
+    }
+    ASSERT_TRUE(isAsked());
+    Terminate(program);
+    ExpectNoHarm();
+  }
+}
+
+TEST_F(Interruption, SigtermBetweenTheBytesOfAnAnswer) {
+  MakePhotos(1);
+  DaemonPeer daemon;
+  daemon.Answer("GET_INDEX_VERSION", DaemonReply::BytesThenSilence("{\"version\""));
+  Program program = StartRun();
+  ASSERT_TRUE(daemon.WaitForRequests(1));
+  std::this_thread::sleep_for(milliseconds(20));
+  Terminate(program);
+  ExpectNoHarm();
+}
+
+}  // namespace vela_test::real

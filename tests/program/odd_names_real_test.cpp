@@ -1,0 +1,319 @@
+// Photos and directories whose names mean something to shells, to the C library or to the
+// converter. Every photo has a colour of its own, so that a thumbnail tells whose it is.
+#include <algorithm>
+#include <map>
+
+#include "program/real_program_test.h"
+#include "support/daemon_peer.h"
+#include "support/images.h"
+#include "support/system_log.h"
+
+namespace vela_test::real {
+
+namespace {
+
+/// Names without extension that the converter opens like any other: it gets each name as one
+/// argument, in an absolute path.
+std::vector<std::string> OpenableNames() {
+  return {"two words",
+          " leading space",
+          "trailing space ",
+          "'single'",
+          "\"double\"",
+          "it's",
+          "%",
+          "%%",
+          "100%",
+          "%d",
+          "%04d",
+          "%s%n",
+          "%f.%e",
+          "a:b",
+          "jpg:x",
+          "png:jpg:x",
+          "http:x",
+          "msl:x",
+          ":",
+          "new\nline",
+          "\n",
+          "tab\there",
+          "return\r",
+          "\x01\x7f",
+          "-dash",
+          "-",
+          "--version",
+          "-write",
+          "+append",
+          "\xff\xfe\x80",
+          "\xe9t\xe9",
+          "\xf0\x9f\x93\xb7",
+          "~",
+          "~root",
+          "$HOME",
+          "$(id)",
+          "`id`",
+          ";",
+          "a;b",
+          "a&b",
+          "a|b",
+          "|id",
+          "<in>out",
+          "back\\slash",
+          "\\",
+          "@file",
+          "@",
+          ".hidden",
+          "..",
+          "...",
+          "#1",
+          "!",
+          "(",
+          ")",
+          "a=b",
+          "a,b",
+          "10x10",
+          "^"};
+}
+
+/// Names that the converter takes for a list of file names, because of the wildcard in them: it
+/// reads the photo as text and then looks for files called like its bytes.
+std::vector<std::string> WildcardNames() {
+  return {"[1]", "a[1]", "x[0]",  "[a-z]", "a[2x2]", "a[",      "a]",      "*",    "a*",
+          "?",   "a?c",  "{a,b}", "{",     "}",      "%[fx:1]", "${HOME}", "x[0]y"};
+}
+
+std::string Longest(const std::string& extension) {
+  return std::string(255 - extension.size(), 'n') + extension;
+}
+
+class OddNames : public RealProgramTest {
+ protected:
+  /// Makes a photo in the next free colour.
+  std::string AddPhoto(const std::string& path) {
+    const int colour = static_cast<int>(colours_.size());
+    MakePlainPhoto(path, colour);
+    colours_[path] = colour;
+    return path;
+  }
+
+  void ExpectOwnPicture(const std::string& photo, const std::vector<Kind>& kinds) const {
+    EXPECT_TRUE(HasThumbs(photo, kinds));
+    for (const Kind& kind : kinds) {
+      EXPECT_EQ(PaletteIndexOf(ThumbOf(photo, kind)), colours_.at(photo))
+          << ::testing::PrintToString(photo) << " " << kind.name;
+    }
+  }
+
+  void ExpectOwnPictures(const std::vector<Kind>& kinds) const {
+    for (const auto& [photo, colour] : colours_) {
+      ExpectOwnPicture(photo, kinds);
+    }
+  }
+
+  /// Own picture for each photo whose name the converter can open, markers for the others.
+  void ExpectOwnPicturesBut(const std::vector<std::string>& failing) const {
+    for (const auto& [photo, colour] : colours_) {
+      if (std::count(failing.begin(), failing.end(), photo) == 0) {
+        ExpectOwnPicture(photo, kinds_);
+      } else {
+        EXPECT_TRUE(IsMarkedFailed(photo, kinds_));
+      }
+    }
+  }
+
+  std::map<std::string, int> colours_;  // path to palette index
+};
+
+}  // namespace
+
+TEST_F(OddNames, JpegsOfAnyOpenableName) {
+  for (const std::string& name : OpenableNames()) {
+    AddPhoto(InPhotos(name + ".jpg"));
+  }
+  AddPhoto(InPhotos(Longest(".jpg")));
+  const DaemonPeer daemon;
+  Make();
+  ExpectOwnPictures(OfPhase(kinds_, 0));
+  ExpectOwnPictures(OfPhase(kinds_, 1));
+  Make();
+  ExpectOwnPictures(kinds_);
+  EXPECT_EQ(Progress("completed"), static_cast<int>(colours_.size()));
+  EXPECT_EQ(Progress("completed_thumb"), 6 * static_cast<int>(colours_.size()));
+  EXPECT_EQ(ErrorLines(), std::vector<std::string>());
+  ExpectNothingLeftToMake();
+}
+
+TEST_F(OddNames, PngsOfAnyOpenableName) {
+  for (const std::string& name : OpenableNames()) {
+    AddPhoto(InPhotos(name + ".png"));
+  }
+  AddPhoto(InPhotos(Longest(".png")));
+  Make();
+  ExpectOwnPictures(OfPhase(kinds_, 0));
+  ExpectOwnPictures(OfPhase(kinds_, 1));
+}
+
+// What the index would not take for a photo gets no thumbnail, whatever its name would open.
+TEST_F(OddNames, NamesThatAreNoPhotos) {
+  MakeJpeg("/tmp/photo.jpg");
+  for (const char* name : {"x.jpg ", "x.jpg\n", "._x.jpg", "jpg", "x", ".jpg."}) {
+    CopyFile("/tmp/photo.jpg", InPhotos(name));
+  }
+  Make();
+  EXPECT_FALSE(Exists(InPhotos("@eaDir")));
+}
+
+// The photos that a wildcard would find lie beside it, before and behind it in the order.
+TEST_F(OddNames, WildcardsFailAndHoldNothingUp) {
+  std::vector<std::string> failing;
+  for (const std::string& name : WildcardNames()) {
+    failing.push_back(AddPhoto(InPhotos(name + ".jpg")));
+    failing.push_back(AddPhoto(InPhotos(name + ".png")));
+  }
+  for (const char* name : {"1", "a", "b", "a1", "abc", "x", "x0", "a2x2", "z", "!"}) {
+    AddPhoto(InPhotos(std::string(name) + ".jpg"));
+    AddPhoto(InPhotos(std::string(name) + ".png"));
+  }
+  Make();
+  Make();
+  ExpectOwnPicturesBut(failing);
+  const int failures = static_cast<int>(failing.size());
+  const int good = static_cast<int>(colours_.size()) - failures;
+  EXPECT_EQ(Progress("completed"), 2 * failures + good);
+  EXPECT_EQ(Progress("completed_thumb"), 6 * (2 * failures + good));
+}
+
+// Markers of one photo go away without those of another that its name would match as a pattern.
+TEST_F(OddNames, MarkersOfWildcardNamesAreTheirOwn) {
+  const std::vector<std::string> broken = {InPhotos("a[1].jpg"), InPhotos("a1.jpg"),
+                                           InPhotos("*.jpg"), InPhotos("back\\slash.jpg")};
+  for (const std::string& photo : broken) {
+    WriteFile(photo, "no photo");
+  }
+  Make();
+  for (const std::string& photo : broken) {
+    EXPECT_TRUE(IsMarkedFailed(photo, kinds_));
+  }
+  const std::string repaired = AddPhoto(broken.back());
+  Make();
+  Make();
+  ExpectOwnPicture(repaired, kinds_);
+  for (size_t i = 0; i + 1 < broken.size(); ++i) {
+    EXPECT_TRUE(IsMarkedFailed(broken[i], kinds_));
+  }
+}
+
+// Formats with several pages are opened by their name with a page number behind it, which is no
+// existing file: the converter then expands what it finds in the name.
+TEST_F(OddNames, PagedFormatsOfAnyNameWithoutMeaning) {
+  for (const std::string& name : OpenableNames()) {
+    if (name.find('%') == std::string::npos) {
+      AddPhoto(InPhotos(name + ".tif"));
+    }
+  }
+  AddPhoto(InPhotos(Longest(".tif")));
+  for (const char* name : {"100%", "a%", "two words", "a:b", "jpg:x", "-dash", "@file", "|id"}) {
+    AddPhoto(InPhotos(std::string(name) + ".gif"));
+    AddPhoto(InPhotos(std::string(name) + ".webp"));
+  }
+  Make();
+  Make();
+  ExpectOwnPictures(kinds_);
+}
+
+TEST_F(OddNames, PagedFormatsWithNumbersFail) {
+  std::vector<std::string> failing;
+  for (const char* name : {"%d", "%04d", "%%", "%x", "%[fx:1]"}) {
+    failing.push_back(AddPhoto(InPhotos(std::string(name) + ".gif")));
+    failing.push_back(AddPhoto(InPhotos(std::string(name) + ".tif")));
+  }
+  AddPhoto(InPhotos("a.gif"));
+  AddPhoto(InPhotos("z.tif"));
+  Make();
+  Make();
+  ExpectOwnPicturesBut(failing);
+}
+
+TEST_F(OddNames, DirectoriesOfAnyName) {
+  std::vector<std::string> directories;
+  std::vector<std::string> names = OpenableNames();
+  for (const std::string& name : WildcardNames()) {
+    names.push_back(name);
+  }
+  names.push_back(Longest(""));
+  names.erase(std::find(names.begin(), names.end(), ".."));
+  for (const std::string& name : names) {
+    directories.push_back(InPhotos(name));
+    MakeDirectories(directories.back());
+    AddPhoto(directories.back() + "/p.jpg");
+  }
+  const DaemonPeer daemon;
+  Make(directories);
+  ExpectOwnPictures(OfPhase(kinds_, 0));
+  ExpectOwnPictures(OfPhase(kinds_, 1));
+  // Each waits in the queue for its last phase, but those that a line cannot hold.
+  std::vector<std::string> queued;
+  std::vector<std::string> unqueued;
+  for (const std::string& directory : directories) {
+    if (directory.find('\n') == std::string::npos) {
+      queued.push_back(directory);
+    } else {
+      unqueued.push_back("velathumb:1112 Failed to write [" + directory + "] to thumb queue");
+    }
+  }
+  EXPECT_EQ(ReadLines(kQueue), queued);
+  EXPECT_EQ(ErrorLines(), unqueued);
+  Make(directories);
+  ExpectOwnPictures(kinds_);
+}
+
+TEST_F(OddNames, TreeOfOddDirectories) {
+  std::vector<std::string> names = OpenableNames();
+  for (const std::string& name : WildcardNames()) {
+    names.push_back(name);
+  }
+  std::vector<std::string> refused;
+  for (const std::string& name : names) {
+    if (name == "..") {
+      continue;
+    }
+    const std::string directory = InPhotos(name + "/below " + name);
+    MakeDirectories(directory);
+    if (std::string(".@#").find(name[0]) == std::string::npos) {
+      AddPhoto(directory + "/p.jpg");
+    } else {
+      refused.push_back(MakeJpeg(directory + "/p.jpg"));
+    }
+  }
+  Make({"R:" + std::string(kPhotos)});
+  Make({"R:" + std::string(kPhotos)});
+  ExpectOwnPictures(kinds_);
+  for (const std::string& photo : refused) {
+    EXPECT_FALSE(Exists(MetadataOf(photo))) << photo;
+  }
+}
+
+// A relative directory comes first in the converter's arguments, where some beginnings mean an
+// option, a list or a format.
+TEST_F(OddNames, RelativeDirectories) {
+  std::vector<std::string> directories;
+  std::vector<std::string> failing;
+  for (const char* name : {"plain", "./dot", "two words", "~", "~root", ":x", "%d", "[1]", "*",
+                           "--", "$HOME", "|id", ";", "a\\b", "(", "../photos/up"}) {
+    directories.emplace_back(name);
+    MakeDirectories(InPhotos(name));
+    AddPhoto(InPhotos(std::string(name) + "/p.jpg"));
+  }
+  for (const char* name : {"-d", "-write", "+d", "@d", "jpg:plain", "png:plain", "http:plain"}) {
+    directories.emplace_back(name);
+    MakeDirectories(InPhotos(name));
+    failing.push_back(AddPhoto(InPhotos(std::string(name) + "/p.jpg")));
+  }
+  ProgramOptions options;
+  options.workingDirectory = kPhotos;
+  Make(directories, options);
+  Make(directories, options);
+  ExpectOwnPicturesBut(failing);
+}
+
+}  // namespace vela_test::real

@@ -1,0 +1,166 @@
+// Thumbnails of camera raw photos, with the real tools.
+#include <gmock/gmock.h>
+
+#include "program/real_program_test.h"
+#include "support/build_paths.h"
+#include "support/daemon_peer.h"
+#include "support/images.h"
+#include "support/raw_photos.h"
+#include "support/stub_tool.h"
+#include "support/system_log.h"
+
+namespace vela_test::real {
+
+namespace {
+
+using ::testing::ElementsAre;
+using ::testing::IsEmpty;
+
+std::vector<std::vector<std::string>> ParametersOf(const StubTool& tool) {
+  std::vector<std::vector<std::string>> parameters;
+  for (const StubCall& call : tool.Calls()) {
+    parameters.push_back(call.Parameters());
+  }
+  return parameters;
+}
+
+class RawThumbs : public RealProgramTest {
+ protected:
+  void SetUp() override {
+    RealProgramTest::SetUp();
+    InstallRealExiftool();
+  }
+
+  /// A raw photo of the quadrants, larger than every thumbnail; its preview is as large as the
+  /// largest when it has one.
+  static RawRecipe Recipe(bool hasPreview) {
+    RawRecipe recipe;
+    recipe.width = 240;
+    recipe.height = 160;
+    if (hasPreview) {
+      recipe.preview.emplace();
+      recipe.preview->width = 120;
+      recipe.preview->height = 80;
+    }
+    return recipe;
+  }
+
+  static std::string MakeRaw(const RawRecipe& recipe, const std::string& name = "a.dng") {
+    MakeRawPhoto(InPhotos(name), recipe);
+    SetFileTimeFromNow(InPhotos(name), -60);
+    return InPhotos(name);
+  }
+
+  /// All thumbnails are there and show this; nothing else is left beside them.
+  void ExpectThumbs(const std::string& photo, const std::string& letters) const {
+    EXPECT_TRUE(HasThumbs(photo, kinds_));
+    for (const Kind& kind : kinds_) {
+      EXPECT_EQ(QuadrantLetters(ThumbOf(photo, kind)), letters) << kind.name;
+    }
+    EXPECT_EQ(ListDirectory(MetadataOf(photo)).size(), kinds_.size());
+  }
+
+  void ExpectMade(const RawRecipe& recipe, const std::string& letters) {
+    const std::string photo = MakeRaw(recipe);
+    Make();
+    EXPECT_TRUE(HasThumbs(photo, OfPhase(kinds_, 0)));
+    EXPECT_TRUE(HasThumbs(photo, OfPhase(kinds_, 1)));
+    EXPECT_EQ(ListDirectory(MetadataOf(photo)).size(), 4U);
+    EXPECT_EQ(Progress("completed"), 0);
+    EXPECT_EQ(Progress("completed_thumb"), 4);
+    Make();
+    ExpectThumbs(photo, letters);
+    EXPECT_EQ(Progress("completed"), 1);
+    EXPECT_EQ(Progress("completed_thumb"), 6);
+    ExpectNothingLeftToMake();
+  }
+};
+
+}  // namespace
+
+TEST_F(RawThumbs, AreMadeOfTheFullDecode) {
+  const DaemonPeer daemon;
+  const StubTool dcraw(kDcrawPath);
+  dcraw.Plan(StubPlan().PassThrough(HostPath(kDcrawPath)));
+  ExpectMade(Recipe(false), "RGBY");
+  const std::string photo = InPhotos("a.dng");
+  // Later phases do not decode again.
+  EXPECT_THAT(ParametersOf(dcraw),
+              ElementsAre(ElementsAre("-e", "-c", photo), ElementsAre("-w", "-c", photo),
+                          ElementsAre("-i", "-v", photo)));
+  EXPECT_THAT(ErrorLines(), IsEmpty());
+}
+
+TEST_F(RawThumbs, AreMadeOfThePreview) {
+  const DaemonPeer daemon;
+  const StubTool dcraw(kDcrawPath);
+  dcraw.Plan(StubPlan().PassThrough(HostPath(kDcrawPath)));
+  ExpectMade(Recipe(true), "RGBY");
+  const std::string photo = InPhotos("a.dng");
+  EXPECT_THAT(ParametersOf(dcraw),
+              ElementsAre(ElementsAre("-e", "-c", photo), ElementsAre("-i", "-v", photo)));
+  EXPECT_THAT(ErrorLines(), IsEmpty());
+}
+
+TEST_F(RawThumbs, StandAsThePhotoWasHeld) {
+  const DaemonPeer daemon;
+  for (const bool hasPreview : {false, true}) {
+    for (const int orientation : {1, 3, 6, 8}) {
+      RawRecipe recipe = Recipe(hasPreview);
+      recipe.orientation = orientation;
+      MakeRaw(recipe, std::to_string(orientation) + (hasPreview ? "p.dng" : ".dng"));
+    }
+  }
+  Make();
+  Make();
+  for (const char* name :
+       {"1.dng", "1p.dng", "3.dng", "3p.dng", "6.dng", "6p.dng", "8.dng", "8p.dng"}) {
+    SCOPED_TRACE(name);
+    ExpectThumbs(InPhotos(name), LettersAfterOrientation(name[0] - '0'));
+  }
+}
+
+TEST_F(RawThumbs, StandAsTheTagOfAnUprightPreviewSays) {
+  const DaemonPeer daemon;
+  RawRecipe recipe = Recipe(true);
+  recipe.rotation = 270;
+  ExpectMade(recipe, LettersAfterTurn(270));
+  EXPECT_THAT(ErrorLines(),
+              ElementsAre("velathumb:650 Failed to rotate " + MetadataOf(InPhotos("a.dng")) +
+                          "/VELAPHOTO_THUMB_RAW.jpg to 270 degree"));
+}
+
+TEST_F(RawThumbs, OfDamagedPhotosAreMarkedAndTheNextPhotoIsMade) {
+  const DaemonPeer daemon;
+  WriteFile(InPhotos("a.nef"), "no photo");
+  WriteFile(InPhotos("b.dng"), "");
+  const std::string good = MakeRaw(Recipe(false), "c.dng");
+  const std::string folder = SharedMediaDirectory();
+  const bool hasCamera = IsRegularFile(folder + "/camera_raw.crw");
+  if (hasCamera) {
+    CopyFile(folder + "/camera_raw.crw", InPhotos("d.crw"));
+    CopyFile(folder + "/tiny_preview.nef", InPhotos("e.nef"));
+    CopyFile(folder + "/broken_preview.dng", InPhotos("f.dng"));
+  }
+  const std::string last = MakeJpeg(InPhotos("z.jpg"));
+  for (const std::string& name : ListDirectory(kPhotos)) {
+    SetFileTimeFromNow(InPhotos(name), -60);
+  }
+  Make();
+  Make();
+  EXPECT_TRUE(IsMarkedFailed(InPhotos("a.nef"), kinds_));
+  EXPECT_TRUE(IsMarkedFailed(InPhotos("b.dng"), kinds_));
+  ExpectThumbs(good, "RGBY");
+  EXPECT_TRUE(HasThumbs(last, kinds_));
+  if (hasCamera) {
+    EXPECT_TRUE(HasThumbs(InPhotos("d.crw"), kinds_));
+  }
+  // Whatever became of the cut ones: what they were decoded to is gone.
+  for (const std::string& path : ListTree(kPhotos)) {
+    EXPECT_EQ(path.find("RAW"), std::string::npos) << path;
+    EXPECT_EQ(path.find("Temp_"), std::string::npos) << path;
+    EXPECT_EQ(path.find("VELAPHOTO.tmp"), std::string::npos) << path;
+  }
+}
+
+}  // namespace vela_test::real

@@ -1,0 +1,125 @@
+// Fixture for tests of the whole program with the real converter on real images.
+#pragma once
+
+#include <gtest/gtest.h>
+#include <sys/types.h>
+
+#include <cstdint>
+#include <map>
+#include <string>
+#include <vector>
+
+#include "support/files.h"
+#include "support/image_checks.h"
+#include "support/profile_file.h"
+#include "support/program.h"
+#include "support/sandbox.h"
+
+namespace vela_test::real {
+
+constexpr const char* kPhotos = "/tmp/photos";
+constexpr const char* kProfiles = "/tmp/profiles.conf";
+constexpr const char* kQueue = "/var/spool/thumb_create.queue";
+constexpr const char* kRealConverter = "/usr/bin/convert";
+
+/// One thumbnail that a profile file asks for.
+struct Kind {
+  const char* name;  ///< "XL", "M", ...
+  int box;           ///< pixels
+  bool fills;        ///< the shorter side fills the box; else the whole photo fits inside
+  int phase;
+};
+
+/// All six kinds in small boxes, two in each phase, XL the largest of phase 0.
+std::vector<Kind> SmallKinds();
+
+/// All six kinds as the sample profile has them.
+std::vector<Kind> FullKinds();
+
+/// Those of `kinds` that are of this phase.
+std::vector<Kind> OfPhase(const std::vector<Kind>& kinds, int phase);
+
+std::string WriteKinds(const std::string& path, const std::vector<Kind>& kinds);
+
+/// Paths that belong to a photo.
+std::string MetadataOf(const std::string& photo);
+std::string ThumbOf(const std::string& photo, const Kind& kind);
+std::string MarkerOf(const std::string& photo, const Kind& kind);
+
+/// What must not change in a photo.
+struct PhotoState {
+  std::string content;
+  FileTime modified;
+};
+bool operator==(const PhotoState& a, const PhotoState& b);
+void PrintTo(const PhotoState& state, std::ostream* out);
+
+/// Every file below `directory` that is not in a metadata directory, by its relative path.
+std::map<std::string, PhotoState> PhotosBelow(const std::string& directory);
+
+/// What tells a thumbnail from one that was made anew.
+struct ThumbState {
+  ino_t inode = 0;
+  FileTime modified;
+};
+bool operator==(const ThumbState& a, const ThumbState& b);
+void PrintTo(const ThumbState& state, std::ostream* out);
+
+/// Every thumbnail (under a final name) below `directory`, by its relative path.
+std::map<std::string, ThumbState> ThumbsBelow(const std::string& directory);
+
+/// Whether every thumbnail under a final name below `directory` is a whole JPEG.
+::testing::AssertionResult OnlyWholeThumbsBelow(const std::string& directory);
+
+/// Whether each kind's thumbnail of the photo is a whole JPEG without a failure marker beside it.
+::testing::AssertionResult HasThumbs(const std::string& photo, const std::vector<Kind>& kinds);
+
+/// Whether each kind has an empty failure marker and no thumbnail.
+::testing::AssertionResult IsMarkedFailed(const std::string& photo, const std::vector<Kind>& kinds);
+
+/// Photo progress: the value of a key, 0 when it is not there.
+int Progress(const std::string& key);
+
+/// Processes of the sandbox by their command name.
+std::vector<pid_t> ProcessesCalled(const std::string& name);
+
+/// Waits until there is no such process, at most `milliseconds`; whether none is left.
+bool WaitUntilNoneIsCalled(const std::string& name, int milliseconds);
+
+/// Pid files of the program that are there now.
+std::vector<std::string> PidFiles();
+
+/// Runs ImageMagick with these arguments; a failure fails the test.
+void Draw(const std::vector<std::string>& arguments);
+
+/// Colours that can be told from one another after any conversion; `index` below 125.
+Rgb PaletteColour(int index);
+
+/// Makes a photo of one palette colour under any name with the extension of a format.
+void MakePlainPhoto(const std::string& path, int paletteIndex, int width = 160, int height = 120);
+
+/// Index of the palette colour that the whole thumbnail shows, -1 when it shows several or is no
+/// whole JPEG.
+int PaletteIndexOf(const std::string& thumb);
+
+/// Every test starts with the real converter in place, the small kinds in kProfiles and an empty
+/// directory kPhotos.
+class RealProgramTest : public SandboxTest {
+ protected:
+  void SetUp() override;
+
+  /// Runs the program over the directory arguments. It must end with 0 and leave every photo below
+  /// kPhotos as it was, content and modification time.
+  void Make(const std::vector<std::string>& directories = {kPhotos},
+            const ProgramOptions& options = ProgramOptions());
+
+  /// Makes a run over everything below kPhotos, which must leave each thumbnail as it is.
+  void ExpectNothingLeftToMake(const std::vector<std::string>& directories = {kPhotos});
+
+  /// A path in kPhotos.
+  static std::string InPhotos(const std::string& name) { return std::string(kPhotos) + "/" + name; }
+
+  std::vector<Kind> kinds_;
+};
+
+}  // namespace vela_test::real

@@ -1,0 +1,351 @@
+// From a raw photo to an ordinary image, with recording stubs.
+#include <gmock/gmock.h>
+#include <signal.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <optional>
+#include <string>
+
+#include "source/raw_image.h"
+#include "source/source_fixture.h"
+#include "support/images.h"
+#include "support/mounts.h"
+
+namespace vela_test {
+namespace {
+
+using ::testing::ElementsAre;
+using ::testing::IsEmpty;
+
+const std::string kPreview = InThumbDir("VELAPHOTO_THUMB_RAW.jpg");
+const std::string kPpm = InThumbDir("RAW_TEMP.ppm");
+const std::string kDecodeFailure = "velathumb:660 Failed to convert raw /tmp/photos/a.dng to pnm";
+const std::string kTurned =
+    "velathumb:650 Failed to rotate /tmp/photos/@eaDir/a.dng/VELAPHOTO_THUMB_RAW.jpg to 90 degree";
+
+/// The bytes of a preview of this size.
+std::string PreviewOf(int width, int height, int orientation = 6) {
+  JpegRecipe recipe;
+  recipe.width = width;
+  recipe.height = height;
+  recipe.orientation = orientation;
+  recipe.exif = true;
+  const std::string bytes = ReadFile(MakeJpeg("/tmp/preview.jpg", recipe));
+  RemoveTree("/tmp/preview.jpg");
+  return bytes;
+}
+
+class RawConvert : public SourceTest {
+ protected:
+  void SetUp() override {
+    SourceTest::SetUp();
+    WriteFileOfSize(kRaw, 20000);
+    AddProfile(60, "VELAPHOTO_THUMB_M.jpg");
+    AddProfile(100, "VELAPHOTO_THUMB_XL.jpg");
+    dcraw_.emplace(kDcrawPath);
+    converter_.emplace(kConverterPath);
+    exiftool_.emplace(kExiftoolPath);
+    PlanPreview(StubPlan());
+    PlanDecode(StubPlan().Print("full decode"));
+  }
+
+  void PlanPreview(const StubPlan& plan) { dcraw_->PlanWhen("-e", plan); }
+  void PlanDecode(const StubPlan& plan) { dcraw_->PlanWhen("-w", plan); }
+  void PlanPreviewOf(int width, int height) {
+    PlanPreview(StubPlan().Print(PreviewOf(width, height)));
+  }
+  /// A preview that is large enough and upright, of a photo that was held otherwise.
+  void PlanTurnedPreview(const std::string& rotation) {
+    PlanPreview(StubPlan().Print(PreviewOf(100, 80, 1)));
+    exiftool_->Plan(StubPlan().Print("Rotation: " + rotation + "\n"));
+  }
+
+  std::string Convert() const { return ConvertRawToJpeg(Job(), kRaw, kThumbDir); }
+
+  /// The preview is what thumbnails are made from; the photo is not decoded.
+  void ExpectPreview() const {
+    EXPECT_EQ(Convert(), kPreview);
+    EXPECT_THAT(ThumbDirFiles(), ElementsAre("VELAPHOTO_THUMB_RAW.jpg"));
+    EXPECT_EQ(ParametersOf(dcraw_->Calls()), (ArgumentLists{{"-e", "-c", kRaw}}));
+  }
+
+  void ExpectFullDecode() const {
+    EXPECT_EQ(Convert(), kPpm);
+    EXPECT_THAT(ThumbDirFiles(), ElementsAre("RAW_TEMP.ppm"));
+    EXPECT_EQ(ReadFile(kPpm), "full decode");
+    EXPECT_EQ(ParametersOf(dcraw_->Calls()),
+              (ArgumentLists{{"-e", "-c", kRaw}, {"-w", "-c", kRaw}}));
+    EXPECT_THAT(exiftool_->Calls(), IsEmpty());
+    EXPECT_THAT(converter_->Calls(), IsEmpty());
+  }
+
+  void ExpectNothing() const {
+    EXPECT_EQ(Convert(), "");
+    EXPECT_THAT(ThumbDirFiles(), IsEmpty());
+  }
+
+  std::optional<StubTool> dcraw_;
+  std::optional<StubTool> converter_;
+  std::optional<StubTool> exiftool_;
+};
+
+class RawPreview : public RawConvert {};
+
+TEST_F(RawPreview, AsLargeAsTheLargestProfileIsEnough) {
+  PlanPreviewOf(100, 80);
+  ExpectPreview();
+  EXPECT_EQ(ReadFile(kPreview), PreviewOf(100, 80));
+  EXPECT_THAT(ErrorLines(), IsEmpty());
+}
+
+TEST_F(RawPreview, StandingIsMeasuredByItsHeight) {
+  PlanPreviewOf(80, 100);
+  ExpectPreview();
+}
+
+TEST_F(RawPreview, LargerIsEnough) {
+  PlanPreviewOf(160, 20);
+  ExpectPreview();
+}
+
+TEST_F(RawPreview, OnePixelSmallerIsNotEnough) {
+  PlanPreviewOf(99, 99);
+  ExpectFullDecode();
+  EXPECT_THAT(ErrorLines(), IsEmpty());
+}
+
+TEST_F(RawPreview, IsMeasuredAgainstAllPhases) {
+  PlanPreviewOf(100, 80);
+  ThumbnailProfileList list;
+  list.all.push_back(
+      std::make_unique<const ThumbnailProfile>(60, 90, "", "VELAPHOTO_THUMB_M.jpg", 0));
+  list.phase0.push_back(list.all.back().get());
+  list.all.push_back(
+      std::make_unique<const ThumbnailProfile>(101, 90, "", "VELAPHOTO_THUMB_B.jpg", 2));
+  list.phase2.push_back(list.all.back().get());
+  EXPECT_EQ(ConvertRawToJpeg({"/tmp/photos", list}, kRaw, kThumbDir), kPpm);
+}
+
+TEST_F(RawPreview, MissingLeadsToTheFullDecode) {
+  ExpectFullDecode();
+  EXPECT_THAT(ErrorLines(), IsEmpty());
+}
+
+TEST_F(RawPreview, UnreadableLeadsToTheFullDecode) {
+  PlanPreview(StubPlan().Print("no picture"));
+  ExpectFullDecode();
+}
+
+TEST_F(RawPreview, CutWithinItsHeaderLeadsToTheFullDecode) {
+  PlanPreview(StubPlan().Print(PreviewOf(100, 80).substr(0, 40)).DieBySignal(SIGSEGV));
+  ExpectFullDecode();
+}
+
+TEST_F(RawPreview, ThatCannotBeStoredLeadsToTheFullDecode) {
+  MakeDirectories(kPreview + "/in.the.way");
+  EXPECT_EQ(Convert(), kPpm);
+  EXPECT_THAT(ErrorLines(),
+              ElementsAre("velathumb:574 fopen failed, path=" + kPreview + ", errno=21"));
+}
+
+TEST_F(RawPreview, OfAnEarlierRunIsNotUsed) {
+  WriteFile(kPreview, PreviewOf(200, 100));
+  ExpectFullDecode();
+}
+
+TEST_F(RawPreview, IsTurnedInPlace) {
+  PlanTurnedPreview("90");
+  converter_->Plan(StubPlan().WriteFile(kPreview, "turned"));
+  ExpectPreview();
+  EXPECT_EQ(ReadFile(kPreview), "turned");
+  EXPECT_EQ(ParametersOf(exiftool_->Calls()), (ArgumentLists{{"-S", "-Rotation", kRaw}}));
+  ASSERT_EQ(ParametersOf(converter_->Calls()),
+            (ArgumentLists{{"-rotate", "90", kPreview, kPreview}}));
+  EXPECT_EQ(converter_->Calls().front().arguments.front(), kConverterPath);
+  // The line that announces a turn speaks of a failure; it always did.
+  EXPECT_THAT(ErrorLines(), ElementsAre(kTurned));
+}
+
+TEST_F(RawPreview, IsTurnedAsFarAsThePhotoSays) {
+  for (const char* degrees : {"180", "270", "1"}) {
+    PlanTurnedPreview(degrees);
+    EXPECT_EQ(Convert(), kPreview);
+    ASSERT_FALSE(converter_->Calls().empty());
+    EXPECT_THAT(converter_->Calls().back().Parameters(),
+                ElementsAre("-rotate", degrees, kPreview, kPreview));
+  }
+}
+
+TEST_F(RawPreview, IsNotTurnedByNothing) {
+  for (const char* degrees : {"0", "-90", "upright", " "}) {
+    PlanTurnedPreview(degrees);
+    EXPECT_EQ(Convert(), kPreview);
+  }
+  EXPECT_THAT(converter_->Calls(), IsEmpty());
+  EXPECT_THAT(ErrorLines(), IsEmpty());
+}
+
+TEST_F(RawPreview, ThatIsNotTurnedIsUsedAsItIsAndNothingIsSaid) {
+  PlanTurnedPreview("90");
+  for (const auto& plan : {StubPlan().Exit(1), StubPlan().DieBySignal(SIGSEGV)}) {
+    converter_->Plan(plan);
+    EXPECT_EQ(Convert(), kPreview);
+    EXPECT_EQ(ReadFile(kPreview), PreviewOf(100, 80, 1));
+  }
+  RemoveTool(kConverterPath);
+  EXPECT_EQ(Convert(), kPreview);
+  EXPECT_EQ(converter_->Calls().size(), 2U);
+  EXPECT_THAT(ErrorLines(), IsEmpty());
+}
+
+TEST_F(RawPreview, WithoutExifIsUsedAsItIs) {
+  PlanPreview(StubPlan().Print(ReadFile(MakePicture("/tmp/plain.jpg", 100, 80))));
+  ExpectPreview();
+  EXPECT_THAT(exiftool_->Calls(), IsEmpty());
+  EXPECT_THAT(ErrorLines(), ElementsAre("velathumb:696 velathumb (696) File not readable or no "
+                                        "EXIF data in file " +
+                                        kPreview + ".\n"));
+}
+
+TEST_F(RawPreview, IsUsedAsItIsWithoutExiftool) {
+  PlanTurnedPreview("90");
+  RemoveTool(kExiftoolPath);
+  ExpectPreview();
+  EXPECT_THAT(converter_->Calls(), IsEmpty());
+  EXPECT_THAT(ErrorLines(), ElementsAre("velathumb:196 [Error] VLIBCPopen: "
+                                        "/usr/vela/bin/exiftool -S -Rotation /tmp/photos/a.dng"));
+}
+
+class RawDecode : public RawConvert {};
+
+TEST_F(RawDecode, ThatGivesNothingIsAFailure) {
+  PlanDecode(StubPlan().PrintError("a.dng: unexpected end of file\n").Exit(1));
+  ExpectNothing();
+  EXPECT_THAT(ErrorLines(), ElementsAre(kDecodeFailure));
+}
+
+TEST_F(RawDecode, NeedsTheDecoder) {
+  RemoveTool(kDcrawPath);
+  ExpectNothing();
+  EXPECT_THAT(ErrorLines(), ElementsAre("velathumb:569 VLIBCPopen [/usr/bin/dcraw -e -c] failed",
+                                        "velathumb:569 VLIBCPopen [/usr/bin/dcraw -w -c] failed",
+                                        kDecodeFailure));
+}
+
+TEST_F(RawDecode, OfADecoderThatDiesHalfWayIsUsed) {
+  // What of it is a picture is for the converter to judge.
+  PlanDecode(StubPlan().Print("full decode").DieBySignal(SIGSEGV));
+  ExpectFullDecode();
+}
+
+TEST_F(RawDecode, IsNotTurned) {
+  PlanPreview(StubPlan().Print(PreviewOf(99, 80, 1)));
+  exiftool_->Plan(StubPlan().Print("Rotation: 90\n"));
+  ExpectFullDecode();
+}
+
+TEST_F(RawDecode, NeedsADirectory) {
+  RemoveTree("/tmp/photos/@eaDir");
+  PlanPreviewOf(100, 80);
+  EXPECT_EQ(Convert(), "");
+  EXPECT_THAT(
+      ErrorLines(),
+      ElementsAre("velathumb:574 fopen failed, path=" + kPreview + ", errno=2",
+                  "velathumb:574 fopen failed, path=" + kPpm + ", errno=2", kDecodeFailure));
+  EXPECT_FALSE(Exists("/tmp/photos/@eaDir"));
+}
+
+TEST_F(RawDecode, OnAFullVolumeLeavesNothing) {
+  SmallVolume volume(kThumbDir, 1U << 20U);
+  WriteFile(InThumbDir("other"), "x");
+  PlanPreviewOf(100, 80);
+  PlanDecode(StubPlan().FillVolume(kThumbDir).PrintRepeated(std::string(4096, 'x'), 600));
+  volume.SetAvailable(0);
+  EXPECT_EQ(Convert(), "");
+  EXPECT_THAT(ThumbDirFiles(), ElementsAre("other"));
+  const std::string full = ", No space left on device";
+  EXPECT_THAT(ErrorLines(),
+              ElementsAre("velathumb:590 write failed, path=" + kPreview + full,
+                          "velathumb:590 write failed, path=" + kPpm + full, kDecodeFailure));
+}
+
+TEST_F(RawDecode, TakesThePlaceThatTheStoredPartOfAPreviewHad) {
+  SmallVolume volume(kThumbDir, 1U << 20U);
+  WriteFile(InThumbDir("other"), "x");
+  volume.SetAvailable(2 * SmallVolume::PageSize());
+  PlanPreview(StubPlan().PrintRepeated(std::string(SmallVolume::PageSize() / 2, 'x'), 20));
+  EXPECT_EQ(Convert(), kPpm);
+  EXPECT_THAT(ThumbDirFiles(), ElementsAre("RAW_TEMP.ppm", "other"));
+}
+
+class RawFile : public RawConvert {
+ protected:
+  void ExpectRefused() const {
+    ExpectNothing();
+    EXPECT_THAT(dcraw_->Calls(), IsEmpty());
+    EXPECT_THAT(ErrorLines(), ElementsAre("velathumb:628 /tmp/photos/a.dng is not regular file"));
+  }
+};
+
+TEST_F(RawFile, ThatIsMissing) {
+  RemoveTree(kRaw);
+  ExpectRefused();
+}
+
+TEST_F(RawFile, ThatIsADirectory) {
+  RemoveTree(kRaw);
+  MakeDirectories(kRaw);
+  ExpectRefused();
+}
+
+TEST_F(RawFile, ThatIsAPipe) {
+  RemoveTree(kRaw);
+  ASSERT_EQ(mkfifo(kRaw, 0666), 0);
+  ExpectRefused();
+}
+
+TEST_F(RawFile, ThatIsALinkToAPhotoIsAPhoto) {
+  ASSERT_EQ(rename(kRaw, "/tmp/photos/real.dng"), 0);
+  ASSERT_EQ(symlink("/tmp/photos/real.dng", kRaw), 0);
+  ExpectFullDecode();
+}
+
+TEST_F(RawFile, WhoseBlocksGrowMeanwhileIsNotUsed) {
+  PlanDecode(StubPlan().Print("full decode").GrowBlocksOnly(kRaw, 8192));
+  ExpectNothing();
+  EXPECT_EQ(FileSize(kRaw), 20000);
+  EXPECT_THAT(ErrorLines(), IsEmpty());
+}
+
+TEST_F(RawFile, WhoseBlocksGrowDuringThePreviewIsNotUsed) {
+  PlanPreview(StubPlan().Print(PreviewOf(100, 80)).AppendToFile(kRaw, 8192));
+  ExpectNothing();
+  EXPECT_EQ(dcraw_->Calls().size(), 1U);
+}
+
+TEST_F(RawFile, WhoseBlocksGrowDuringTheTurnIsNotUsed) {
+  PlanTurnedPreview("90");
+  converter_->Plan(StubPlan().GrowBlocksOnly(kRaw, 8192));
+  ExpectNothing();
+}
+
+TEST_F(RawFile, WhoseBlocksShrinkIsNotUsed) {
+  PlanDecode(StubPlan().Print("full decode").WriteFile(kRaw, "x"));
+  ExpectNothing();
+}
+
+TEST_F(RawFile, WhoseBlocksStayIsUsedWhateverElseChanges) {
+  PlanDecode(StubPlan().Print("full decode").GrowSizeOnly(kRaw, 100000).SetFileTime(kRaw, 5));
+  ExpectFullDecode();
+  EXPECT_EQ(FileSize(kRaw), 120000);
+}
+
+TEST_F(RawFile, ThatGoesMeanwhileIsNotUsed) {
+  PlanDecode(StubPlan().Print("full decode").Remove(kRaw));
+  ExpectNothing();
+  EXPECT_THAT(ErrorLines(), IsEmpty());
+}
+
+}  // namespace
+}  // namespace vela_test

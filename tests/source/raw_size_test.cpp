@@ -1,0 +1,201 @@
+// The pixel size of photos, raw and not.
+#include <gmock/gmock.h>
+#include <signal.h>
+
+#include <cstdint>
+#include <string>
+#include <vector>
+
+#include "source/raw_image.h"
+#include "source/source_fixture.h"
+#include "support/images.h"
+#include "support/raw_photos.h"
+
+namespace vela_test {
+namespace {
+
+using ::testing::ElementsAre;
+using ::testing::IsEmpty;
+
+constexpr const char* kNone = "none, sizes untouched";
+
+/// Size as text, or what became of a failure.
+std::string Described(int result, uint32_t width, uint32_t height) {
+  const std::string size = std::to_string(width) + "x" + std::to_string(height);
+  if (result == 0) {
+    return size == "7x8" ? kNone : "none, but " + size;
+  }
+  return result == 1 ? size : "result " + std::to_string(result);
+}
+
+std::string RawSizeOf(const std::string& path) {
+  uint32_t width = 7;
+  uint32_t height = 8;
+  const int result = GetRawImageSize(path, width, height);
+  return Described(result, width, height);
+}
+
+std::string SizeOf(const std::string& path) {
+  uint32_t width = 7;
+  uint32_t height = 8;
+  const int result = GetImageResolution(path, width, height);
+  return Described(result, width, height);
+}
+
+class RawSize : public SourceTest {
+ protected:
+  /// The size that is read of a decoder doing this.
+  static std::string SizeAfter(const StubPlan& plan) {
+    const StubTool decoder(kDcrawPath);
+    decoder.Plan(plan);
+    return RawSizeOf(kRaw);
+  }
+  static std::string SizeIn(const std::string& printed) {
+    return SizeAfter(StubPlan().Print(printed));
+  }
+};
+
+TEST_F(RawSize, IsAskedOfTheDecoder) {
+  const StubTool decoder(kDcrawPath);
+  decoder.Plan(StubPlan().Print("Output size: 4000 x 3000\n"));
+  EXPECT_EQ(RawSizeOf(kRaw), "4000x3000");
+  ASSERT_EQ(ParametersOf(decoder.Calls()), (ArgumentLists{{"-i", "-v", kRaw}}));
+  EXPECT_EQ(decoder.Calls().front().arguments.front(), kDcrawPath);
+  EXPECT_THAT(ErrorLines(), IsEmpty());
+}
+
+TEST_F(RawSize, IsFoundAmongOtherLines) {
+  EXPECT_EQ(SizeIn("\n"
+                   "Filename: a.dng\n"
+                   "Thumb size:   160 x 120\n"
+                   "Full size:    640 x 480\n"
+                   "Image size:   630 x 470\n"
+                   "Output size:  600 x 400\n"
+                   "Raw colors: 3\n"),
+            "600x400");
+}
+
+TEST_F(RawSize, OfTheFirstGoodLineHolds) {
+  EXPECT_EQ(SizeIn("Output size: 3 x 4\nOutput size: 5 x 6\n"), "3x4");
+  EXPECT_EQ(SizeIn("Output size: wide\nOutput size: 5 x 6\n"), "5x6");
+}
+
+TEST_F(RawSize, IsNotThatOfOtherLines) {
+  EXPECT_EQ(SizeIn("Image size: 3 x 4\nFull size: 5 x 6\n"), kNone);
+  EXPECT_EQ(SizeIn(" Output size: 3 x 4\n"), kNone);
+  EXPECT_EQ(SizeIn("Output size : 3 x 4\n"), kNone);
+  EXPECT_EQ(SizeIn("output size: 3 x 4\n"), kNone);
+  EXPECT_EQ(SizeIn("Output size 3 x 4\n"), kNone);
+  EXPECT_EQ(SizeIn("The Output size: 3 x 4\n"), kNone);
+}
+
+TEST_F(RawSize, IsTwoNumbersWithAnX) {
+  EXPECT_EQ(SizeIn("Output size:3x4\n"), "3x4");
+  EXPECT_EQ(SizeIn("Output size:\t3 x 4 pixels\n"), "3x4");
+  EXPECT_EQ(SizeIn("Output size:\n"), kNone);
+  EXPECT_EQ(SizeIn("Output size: \n"), kNone);
+  EXPECT_EQ(SizeIn("Output size: 3\n"), kNone);
+  EXPECT_EQ(SizeIn("Output size: 3 x\n"), kNone);
+  EXPECT_EQ(SizeIn("Output size: 3 by 4\n"), kNone);
+  EXPECT_EQ(SizeIn("Output size: x 4\n"), kNone);
+}
+
+TEST_F(RawSize, IsOneThatAPictureCanHave) {
+  EXPECT_EQ(SizeIn("Output size: 4294967295 x 1\n"), "4294967295x1");
+  EXPECT_EQ(SizeIn("Output size: 4294967296 x 1\n"), kNone);
+  EXPECT_EQ(SizeIn("Output size: 1 x 99999999999999999999999\n"), kNone);
+  EXPECT_EQ(SizeIn("Output size: 0 x 4\n"), kNone);
+  EXPECT_EQ(SizeIn("Output size: 3 x 0\n"), kNone);
+  EXPECT_EQ(SizeIn("Output size: -3 x 4\n"), kNone);
+}
+
+TEST_F(RawSize, IsReadFromALineWithoutNewline) {
+  EXPECT_EQ(SizeIn("Output size: 30 x 40"), "30x40");
+}
+
+TEST_F(RawSize, IsFoundBehindALongLine) {
+  EXPECT_EQ(SizeIn("Owner: " + std::string(10000, 'x') + "\nOutput size: 3 x 4\n"), "3x4");
+}
+
+TEST_F(RawSize, OfTheRestOfALongLineIsReadAsALine) {
+  // What lies behind the first 255 bytes of a line is looked at as if it were one.
+  EXPECT_EQ(SizeIn(std::string(255, 'x') + "Output size: 3 x 4\n"), "3x4");
+  EXPECT_EQ(SizeIn(std::string(254, 'x') + "Output size: 3 x 4\n"), kNone);
+  EXPECT_EQ(SizeIn(std::string(256, 'x') + "Output size: 3 x 4\n"), kNone);
+}
+
+TEST_F(RawSize, IsMissingInAnEmptyOutput) {
+  EXPECT_EQ(SizeIn(""), kNone);
+  EXPECT_EQ(SizeAfter(StubPlan().Exit(1)), kNone);
+  EXPECT_THAT(ErrorLines(), IsEmpty());
+}
+
+TEST_F(RawSize, IsNotReadFromTheErrorOutput) {
+  EXPECT_EQ(SizeAfter(StubPlan().PrintError("Output size: 3 x 4\n")), kNone);
+}
+
+TEST_F(RawSize, OfADecoderThatFailsAfterwardsHolds) {
+  EXPECT_EQ(SizeAfter(StubPlan().Print("Output size: 3 x 4\n").Exit(1)), "3x4");
+  EXPECT_EQ(SizeAfter(StubPlan().Print("Output size: 3 x 4\n").DieBySignal(SIGSEGV)), "3x4");
+}
+
+TEST_F(RawSize, OfADecoderThatDiesHalfWay) {
+  EXPECT_EQ(SizeAfter(StubPlan().Print("Full size: 3 x 4\nOutput si").DieBySignal(SIGSEGV)), kNone);
+  EXPECT_THAT(ErrorLines(), IsEmpty());
+}
+
+TEST_F(RawSize, NeedsTheDecoder) {
+  RemoveTool(kDcrawPath);
+  EXPECT_EQ(RawSizeOf(kRaw), kNone);
+  EXPECT_THAT(
+      ErrorLines(),
+      ElementsAre("velathumb:83 [Error] VLIBCPopen: /usr/bin/dcraw -i -v /tmp/photos/a.dng"));
+}
+
+class PhotoSize : public SourceTest {};
+
+TEST_F(PhotoSize, OfARawPhotoIsThatOfItsFullDecode) {
+  RawRecipe recipe;
+  recipe.width = 96;
+  recipe.height = 64;
+  recipe.preview.emplace();
+  EXPECT_EQ(SizeOf(MakeRawPhoto(kRaw, recipe)), "96x64");
+  recipe.orientation = 6;
+  EXPECT_EQ(SizeOf(MakeRawPhoto(kRaw, recipe)), "64x96");
+}
+
+TEST_F(PhotoSize, OfABrokenRawPhoto) {
+  WriteFile(kRaw, "no photo");
+  EXPECT_EQ(SizeOf(kRaw), kNone);
+  EXPECT_EQ(SizeOf("/tmp/photos/missing.nef"), kNone);
+  EXPECT_THAT(ErrorLines(), IsEmpty());
+}
+
+TEST_F(PhotoSize, IsAskedOfTheDecoderForRawNamesOnly) {
+  const StubTool decoder(kDcrawPath);
+  decoder.Plan(StubPlan().Print("Output size: 3 x 4\n"));
+  for (const char* name : {"a.dng", "a.NEF", "a.b.Cr2"}) {
+    EXPECT_EQ(SizeOf(MakeJpeg(std::string("/tmp/photos/") + name)), "3x4");
+  }
+  for (const char* name : {"a.jpg", "a.dng.png", "dng"}) {
+    EXPECT_EQ(SizeOf(MakeJpeg(std::string("/tmp/photos/") + name)), "64x48");
+  }
+  EXPECT_EQ(decoder.Calls().size(), 3U);
+}
+
+TEST_F(PhotoSize, OfOtherPhotosIsThatOfTheirPixelsAsStored) {
+  JpegRecipe recipe;
+  recipe.orientation = 6;
+  EXPECT_EQ(SizeOf(MakeJpeg("/tmp/photos/a.jpg", recipe)), "64x48");
+}
+
+TEST_F(PhotoSize, OfWhatIsNoPhoto) {
+  WriteFile("/tmp/photos/a.jpg", "no photo");
+  EXPECT_EQ(SizeOf("/tmp/photos/a.jpg"), kNone);
+  EXPECT_EQ(SizeOf("/tmp/photos/missing.jpg"), kNone);
+  EXPECT_EQ(SizeOf("/tmp/photos"), kNone);
+  EXPECT_THAT(ErrorLines(), IsEmpty());
+}
+
+}  // namespace
+}  // namespace vela_test

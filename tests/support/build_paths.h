@@ -1,0 +1,20 @@
+// Where the sandbox shows what the build and the source tree hold.
+#pragma once
+
+#include <string>
+
+namespace vela_test {
+
+/// The program under test, `velathumb`.
+std::string VelathumbPath();
+
+/// The recording stub that stands for the external tools.
+std::string StubToolPath();
+
+/// The top folder of the source tree.
+std::string SourceDirectory();
+
+/// The folder with real camera files; empty when this machine has none.
+std::string SharedMediaDirectory();
+
+}  // namespace vela_test

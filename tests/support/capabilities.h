@@ -1,0 +1,17 @@
+// The calling thread's capabilities, as plain system calls.
+#pragma once
+
+#include <cstdint>
+
+namespace vela_test {
+
+/// The effective set, one bit a capability; `ok` tells whether it could be read.
+uint64_t EffectiveCapabilities(bool* ok);
+
+/// Replaces the effective set; the permitted set stays. Async-signal-safe. 0, or an errno.
+int SetEffectiveCapabilities(uint64_t effective);
+
+/// Empties all sets for good. Async-signal-safe. 0, or an errno.
+int GiveUpCapabilities();
+
+}  // namespace vela_test

@@ -1,0 +1,74 @@
+// The main function of every test program.
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+#include <limits.h>
+#include <unistd.h>
+
+#include <filesystem>
+#include <string>
+#include <system_error>
+#include <vector>
+
+#include "support/sandbox.h"
+
+namespace {
+
+constexpr const char* kOutputOption = "--gtest_output=";
+
+bool StartsWith(const std::string& text, const std::string& beginning) {
+  return text.compare(0, beginning.size(), beginning) == 0;
+}
+
+/// Listing tests, which the build does, needs no sandbox.
+bool OnlyTells(const std::vector<std::string>& arguments) {
+  for (const std::string& argument : arguments) {
+    if (StartsWith(argument, "--gtest_list_tests") || argument == "--help") {
+      return true;
+    }
+  }
+  return false;
+}
+
+std::string AbsolutePath(const std::string& path) {
+  if (StartsWith(path, "/")) {
+    return path;
+  }
+  char directory[PATH_MAX];
+  return getcwd(directory, sizeof directory) == nullptr ? path : directory + ("/" + path);
+}
+
+/// Points a result file named on the command line (xml:path or json:path) at the place where the
+/// sandbox shows its directory; returns that directory, empty when no result file is asked for.
+std::string RedirectResultFile(std::vector<std::string>* arguments) {
+  for (std::string& argument : *arguments) {
+    const size_t colon = argument.find(':');
+    if (!StartsWith(argument, kOutputOption) || colon == std::string::npos) {
+      continue;
+    }
+    const std::string path = AbsolutePath(argument.substr(colon + 1));
+    const size_t slash = path.rfind('/');
+    std::error_code error;  // a directory that cannot be made shows itself when it is mounted
+    std::filesystem::create_directories(path.substr(0, slash + 1), error);
+    argument = argument.substr(0, colon + 1) + vela_test::kWritablePlace + path.substr(slash);
+    return path.substr(0, slash + 1);
+  }
+  return "";
+}
+
+}  // namespace
+
+int main(int argc, char** argv) {
+  std::vector<std::string> arguments(argv, argv + argc);
+  if (!OnlyTells(arguments)) {
+    vela_test::EnterSandbox(RedirectResultFile(&arguments));
+  }
+  std::vector<char*> pointers;
+  pointers.reserve(arguments.size() + 1);
+  for (std::string& argument : arguments) {
+    pointers.push_back(argument.data());
+  }
+  pointers.push_back(nullptr);
+  int count = argc;
+  ::testing::InitGoogleMock(&count, pointers.data());
+  return RUN_ALL_TESTS();
+}

@@ -1,0 +1,22 @@
+// Tests run as user 0 of their sandbox, to whom no permission bit applies. This takes that away.
+#pragma once
+
+#include <cstdint>
+
+namespace vela_test {
+
+/// For as long as the object lives the calling thread has no capabilities, so that permission bits
+/// hold for it (a directory of mode 0555 refuses new files with EACCES). Processes that it starts
+/// with exec meanwhile get them back; see DropCapabilities in program.h for those.
+class WithoutCapabilities {
+ public:
+  WithoutCapabilities();
+  ~WithoutCapabilities();
+  WithoutCapabilities(const WithoutCapabilities&) = delete;
+  WithoutCapabilities& operator=(const WithoutCapabilities&) = delete;
+
+ private:
+  uint64_t effective_;
+};
+
+}  // namespace vela_test

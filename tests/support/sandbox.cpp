@@ -1,0 +1,225 @@
+#include "support/sandbox.h"
+
+#include <fcntl.h>
+#include <signal.h>
+#include <stdlib.h>
+#include <sys/mount.h>
+#include <sys/stat.h>
+#include <sys/syscall.h>
+#include <sys/wait.h>
+#include <time.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <iterator>
+#include <set>
+#include <string>
+#include <vector>
+
+#include "support/descriptor.h"
+#include "support/environment_failure.h"
+#include "support/farm.h"
+#include "support/namespaces.h"
+#include "support/private_place.h"
+#include "support/stub_files.h"
+#include "support/system_log.h"
+
+namespace vela_test {
+
+namespace {
+
+constexpr const char* kHost = "/.host";
+
+// Shown as themselves, not as links, so that /proc/<pid>/fd names them as programs expect.
+constexpr const char* kDevices[] = {"null", "zero", "full", "random", "urandom", "tty"};
+
+struct SandboxState {
+  bool inside = false;
+  pid_t testProcess = 0;  // the only one that may reset the sandbox
+  std::vector<Farm> farms;
+  std::vector<PrivatePlace> places;
+};
+
+SandboxState& State() {
+  static SandboxState* state = new SandboxState;  // lives as long as the process
+  return *state;
+}
+
+void MakeDirectory(const std::string& path) {
+  if (mkdir(path.c_str(), 0755) != 0 && errno != EEXIST) {
+    EnvironmentFailureWithErrno("cannot make " + path);
+  }
+}
+
+void Bind(const std::string& from, const std::string& to) {
+  if (mount(from.c_str(), to.c_str(), nullptr, MS_BIND | MS_REC, nullptr) != 0) {
+    EnvironmentFailureWithErrno("cannot show " + from + " at " + to);
+  }
+}
+
+/// Makes an empty memory volume the root directory; the machine's own is at kHost then.
+void ReplaceRoot() {
+  if (mount(nullptr, "/", nullptr, MS_REC | MS_PRIVATE, nullptr) != 0) {
+    EnvironmentFailureWithErrno("cannot make the mounts of the sandbox private");
+  }
+  const std::string newRoot = "/tmp";
+  if (mount("tmpfs", newRoot.c_str(), "tmpfs", MS_NOSUID, "mode=0755,size=64m") != 0) {
+    EnvironmentFailureWithErrno("cannot mount the root directory of the sandbox");
+  }
+  MakeDirectory(newRoot + kHost);
+  if (chdir(newRoot.c_str()) != 0 ||
+      syscall(SYS_pivot_root, newRoot.c_str(), (newRoot + kHost).c_str()) != 0 || chdir("/") != 0) {
+    EnvironmentFailureWithErrno("cannot change the root directory");
+  }
+  State().inside = true;
+}
+
+void ShowDevices() {
+  for (const char* device : kDevices) {
+    const std::string path = std::string("/dev/") + device;
+    const Descriptor file(open(path.c_str(), O_CREAT | O_WRONLY | O_CLOEXEC, 0666));
+    if (!file.IsOpen()) {
+      EnvironmentFailureWithErrno("cannot make " + path);
+    }
+    Bind(HostPath(path), path);
+  }
+}
+
+void PlantFarms() {
+  std::vector<Farm>& farms = State().farms;
+  std::set<std::string> devices = {"shm", "log"};
+  devices.insert(std::begin(kDevices), std::end(kDevices));
+  MakeDirectory("/var");
+  if (symlink("/run", "/var/run") != 0) {
+    EnvironmentFailureWithErrno("cannot make /var/run");
+  }
+  for (const char* path : {"/usr", "/usr/vela", "/var/spool", "/dev", "/dev/shm", "/tmp", "/run",
+                           "/proc", kWritablePlace}) {
+    MakeDirectory(path);
+  }
+  farms.emplace_back("/usr", std::set<std::string>{"bin", "vela"});
+  farms.emplace_back("/usr/bin", std::set<std::string>{});
+  farms.emplace_back("/etc", std::set<std::string>{}, "velainfo.conf");
+  farms.emplace_back("/var", std::set<std::string>{"run", "spool", "lib"});
+  farms.emplace_back("/var/lib", std::set<std::string>{}, "velaindex");
+  farms.emplace_back("/dev", devices);
+  farms.emplace_back("/", std::set<std::string>{"tmp", "run", "var", "usr", "etc", "dev", "proc",
+                                                ".host", ".writable", ".log"});
+}
+
+void MountPrivatePlaces() {
+  std::vector<PrivatePlace>& places = State().places;
+  // The limit of /tmp lets the program's own guard against nearly full volumes pass, which asks for
+  // 1 GiB. Memory is taken for what is written only.
+  places.emplace_back("/tmp", 01777, "2g");
+  places.emplace_back("/run", 0755, "64m");
+  places.emplace_back("/var/spool", 0755, "64m");
+  places.emplace_back("/usr/vela", 0755, "64m");
+  places.emplace_back("/dev/shm", 01777, "64m");
+}
+
+/// What belongs into the private places.
+void FillPrivatePlaces() {
+  MakeDirectory("/usr/vela/bin");
+  MakeStubDirectory();
+}
+
+void ProtectHost() {
+  mount_attr attributes{};
+  attributes.attr_set = MOUNT_ATTR_RDONLY;
+  if (mount_setattr(AT_FDCWD, kHost, AT_RECURSIVE, &attributes, sizeof attributes) != 0) {
+    EnvironmentFailureWithErrno("cannot protect the machine's files from the tests");
+  }
+}
+
+void MountProcesses() {
+  if (mount("proc", "/proc", "proc", MS_NOSUID | MS_NODEV | MS_NOEXEC, nullptr) != 0) {
+    EnvironmentFailureWithErrno("cannot mount /proc of the sandbox");
+  }
+}
+
+void BuildSandbox(const std::string& writableDirectory) {
+  const mode_t mask = umask(0);
+  ReplaceRoot();
+  PlantFarms();
+  ShowDevices();
+  MountPrivatePlaces();
+  FillPrivatePlaces();
+  MountProcesses();
+  if (!writableDirectory.empty()) {
+    Bind(HostPath(writableDirectory), kWritablePlace);
+  }
+  ProtectHost();
+  umask(mask);
+}
+
+/// Leaves nothing in the environment that names a place outside.
+void SetEnvironment() {
+  for (const char* name : {"TMPDIR", "TMP", "TEMP"}) {
+    unsetenv(name);
+  }
+  setenv("HOME", "/nonexistent", 1);  // tools that keep caches there do without
+}
+
+void EndOtherProcesses() {
+  constexpr int kTries = 10000;
+  for (int i = 0; i < kTries; ++i) {
+    // Everything but process 1 and the caller; the sandbox has its own process table.
+    if (kill(-1, SIGKILL) != 0 && errno == ESRCH) {
+      return;
+    }
+    while (waitpid(-1, nullptr, WNOHANG) > 0) {
+    }
+    const timespec pause = {0, 1000000};
+    nanosleep(&pause, nullptr);
+  }
+  EnvironmentFailure("processes of an earlier test do not end");
+}
+
+}  // namespace
+
+void EnterSandbox(const std::string& writableDirectory) {
+  SandboxState& state = State();
+  if (state.inside) {
+    return;
+  }
+  EnterNamespaces([&writableDirectory] { BuildSandbox(writableDirectory); });
+  state.testProcess = getpid();
+  SetEnvironment();
+  StartLogRecorder();
+}
+
+bool IsSandboxed() {
+  return State().inside;
+}
+
+void ResetSandbox() {
+  const SandboxState& state = State();
+  if (!state.inside) {
+    EnvironmentFailure("the sandbox has not been entered");
+  }
+  if (getpid() != state.testProcess) {
+    return;  // the child of a death test works in its parent's places
+  }
+  EndOtherProcesses();
+  if (chdir("/") != 0) {
+    EnvironmentFailureWithErrno("cannot change to /");
+  }
+  const mode_t mask = umask(0);
+  for (const PrivatePlace& place : state.places) {
+    place.Restore();
+  }
+  for (const Farm& farm : state.farms) {
+    farm.Restore();
+  }
+  FillPrivatePlaces();
+  umask(mask);
+  StartLogRecorder();
+  ClearLog();
+}
+
+std::string HostPath(const std::string& path) {
+  return State().inside ? kHost + path : path;
+}
+
+}  // namespace vela_test

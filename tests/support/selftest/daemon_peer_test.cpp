@@ -1,0 +1,190 @@
+// The daemon peer, seen from the other end of its socket.
+#include "support/daemon_peer.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+#include <poll.h>
+#include <sys/socket.h>
+#include <sys/un.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <chrono>
+#include <cstring>
+
+#include "support/descriptor.h"
+#include "support/files.h"
+#include "support/sandbox.h"
+#include "support/stub_tool.h"
+
+namespace vela_test {
+namespace {
+
+using ::testing::ElementsAre;
+using ::testing::IsEmpty;
+
+constexpr const char* kVersionRequest = "{\"command\":\"GET_INDEX_VERSION\",\"path\":\"/a\"}\n";
+
+class Client {
+ public:
+  Client() : socket_(socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0)) {
+    sockaddr_un address{};
+    address.sun_family = AF_UNIX;
+    std::strncpy(address.sun_path, kDaemonSocket, sizeof address.sun_path - 1);
+    EXPECT_EQ(0,
+              connect(socket_.Get(), reinterpret_cast<const sockaddr*>(&address), sizeof address));
+  }
+
+  void Send(const std::string& bytes) const {
+    send(socket_.Get(), bytes.data(), bytes.size(), MSG_NOSIGNAL);
+  }
+
+  /// Everything up to the end of the connection; the number of pieces it came in.
+  std::string ReadAll(int* pieces = nullptr) const {
+    std::string all;
+    char buffer[65536];
+    ssize_t count = 0;
+    while ((count = recv(socket_.Get(), buffer, sizeof buffer, 0)) > 0) {
+      all.append(buffer, static_cast<size_t>(count));
+      if (pieces != nullptr) {
+        ++*pieces;
+      }
+    }
+    return all;
+  }
+
+  bool SomethingComesWithin(int milliseconds) const {
+    pollfd waiting = {socket_.Get(), POLLIN, 0};
+    return poll(&waiting, 1, milliseconds) > 0;
+  }
+
+ private:
+  Descriptor socket_;
+};
+
+std::string Ask(const std::string& request) {
+  const Client client;
+  client.Send(request);
+  return client.ReadAll();
+}
+
+class DaemonPeerTest : public SandboxTest {};
+
+TEST_F(DaemonPeerTest, AnswersEveryCommandByDefault) {
+  const DaemonPeer daemon;
+  EXPECT_EQ("{\"success\":true,\"version\":0}\n", Ask(kVersionRequest));
+  EXPECT_EQ("{\"success\":true}\n", Ask("{\"command\":\"POST_PHOTO_CONVERT\",\"path\":\"/a\"}\n"));
+  EXPECT_EQ("{\"success\":true,\"result\":false}\n",
+            Ask("{\"command\":\"IS_DISABLE_CONVERT_PHOTO\"}\n"));
+  EXPECT_THAT(daemon.Commands(),
+              ElementsAre("GET_INDEX_VERSION", "POST_PHOTO_CONVERT", "IS_DISABLE_CONVERT_PHOTO"));
+}
+
+TEST_F(DaemonPeerTest, RecordsRawBytesAndTheirPlaceInTheOrder) {
+  const DaemonPeer daemon;
+  const uint64_t before = NextSequence();
+  const std::string request = "{\"path\":\"/\xff\\\"a\", \"command\" : \"X\"}\n";
+  Ask(request);
+  ASSERT_EQ(1U, daemon.Requests().size());
+  EXPECT_EQ(request, daemon.Requests()[0].bytes);
+  EXPECT_EQ("X", daemon.Requests()[0].command);
+  EXPECT_GT(daemon.Requests()[0].sequence, before);
+}
+
+TEST_F(DaemonPeerTest, RequestMayComeInPieces) {
+  const DaemonPeer daemon;
+  const Client client;
+  client.Send("{\"command\":");
+  EXPECT_FALSE(client.SomethingComesWithin(20));
+  client.Send("\"A\"}\n");
+  EXPECT_EQ("{\"success\":true}\n", client.ReadAll());
+  EXPECT_EQ("{\"command\":\"A\"}\n", daemon.Requests()[0].bytes);
+}
+
+TEST_F(DaemonPeerTest, AnswersCanBeSetByCommandAndInTurn) {
+  DaemonPeer daemon;
+  daemon.SetIndexVersion(3);
+  daemon.AnswerNext(DaemonReply::Line("first"));
+  daemon.AnswerNext(DaemonReply::Bytes("second"));
+  daemon.Answer("A", DaemonReply::Line("a"));
+  EXPECT_EQ("first\n", Ask(kVersionRequest));
+  EXPECT_EQ("second", Ask(kVersionRequest));
+  EXPECT_EQ("{\"success\":true,\"version\":3}\n", Ask(kVersionRequest));
+  EXPECT_EQ("a\n", Ask("{\"command\":\"A\"}\n"));
+}
+
+TEST_F(DaemonPeerTest, ClosesEarly) {
+  DaemonPeer daemon;
+  daemon.AnswerNext(DaemonReply::CloseAtOnce());
+  daemon.AnswerNext(DaemonReply::CloseAfterRequest());
+  EXPECT_EQ("", Ask(kVersionRequest));
+  EXPECT_THAT(daemon.Requests(), IsEmpty());
+  EXPECT_EQ("", Ask(kVersionRequest));
+  EXPECT_EQ(1U, daemon.Requests().size());
+  EXPECT_EQ(2U, daemon.Connections());
+}
+
+TEST_F(DaemonPeerTest, KeepsSilent) {
+  DaemonPeer daemon;
+  daemon.AnswerNext(DaemonReply::Silence());
+  daemon.AnswerNext(DaemonReply::BytesThenSilence("{\"succ"));
+  const Client silent;
+  silent.Send(kVersionRequest);
+  ASSERT_TRUE(daemon.WaitForRequests(1));
+  EXPECT_FALSE(silent.SomethingComesWithin(50));
+  const Client half;
+  half.Send(kVersionRequest);
+  EXPECT_TRUE(half.SomethingComesWithin(10000));
+  // Others are answered meanwhile.
+  EXPECT_EQ("{\"success\":true,\"version\":0}\n", Ask(kVersionRequest));
+}
+
+TEST_F(DaemonPeerTest, AnswersLateAndByteByByte) {
+  DaemonPeer daemon;
+  daemon.AnswerNext(DaemonReply::Line("late").After(50));
+  const auto start = std::chrono::steady_clock::now();
+  EXPECT_EQ("late\n", Ask(kVersionRequest));
+  EXPECT_GE(std::chrono::steady_clock::now() - start, std::chrono::milliseconds(50));
+  daemon.AnswerNext(DaemonReply::Line("slow").ByteByByte(10));
+  const Client client;
+  client.Send(kVersionRequest);
+  int pieces = 0;
+  EXPECT_EQ("slow\n", client.ReadAll(&pieces));
+  EXPECT_GT(pieces, 1);
+}
+
+TEST_F(DaemonPeerTest, SendsLargeAnswersWhole) {
+  DaemonPeer daemon;
+  const std::string large(5000000, 'x');
+  daemon.AnswerNext(DaemonReply::Bytes(large));
+  EXPECT_EQ(large, Ask(kVersionRequest));
+}
+
+TEST_F(DaemonPeerTest, ActsWhileTheOtherSideWaits) {
+  DaemonPeer daemon;
+  daemon.Answer("A", DaemonReply::Line("done").Meanwhile([](const DaemonRequest& request) {
+    WriteFile("/tmp/seen", request.command);
+  }));
+  EXPECT_EQ("done\n", Ask("{\"command\":\"A\"}\n"));
+  EXPECT_EQ("A", ReadFile("/tmp/seen"));
+}
+
+TEST_F(DaemonPeerTest, EndsCleanlyWithOpenConnections) {
+  const auto start = std::chrono::steady_clock::now();
+  {
+    DaemonPeer daemon;
+    daemon.AnswerNext(DaemonReply::Silence());
+    daemon.AnswerNext(DaemonReply::Line("late").After(100000));
+    const Client silent;
+    silent.Send(kVersionRequest);
+    const Client late;
+    late.Send(kVersionRequest);
+    const Client mute;
+    ASSERT_TRUE(daemon.WaitForRequests(2));
+  }
+  EXPECT_LT(std::chrono::steady_clock::now() - start, std::chrono::seconds(10));
+  EXPECT_FALSE(Exists(kDaemonSocket));
+}
+
+}  // namespace
+}  // namespace vela_test

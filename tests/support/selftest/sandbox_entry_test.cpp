@@ -1,0 +1,110 @@
+// How a test program enters the sandbox and how it ends, seen from outside with a program of its
+// own.
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+#include <signal.h>
+#include <sys/syscall.h>
+
+#include <cerrno>
+#include <chrono>
+#include <thread>
+
+#include "support/files.h"
+#include "support/program.h"
+#include "support/sandbox.h"
+#include "support/seccomp_fail.h"
+
+namespace vela_test {
+namespace {
+
+using ::testing::HasSubstr;
+using ::testing::StartsWith;
+
+class SandboxEntry : public SandboxTest {};
+
+std::vector<std::string> Arguments(const std::string& test) {
+  return {"--gtest_filter=Probe." + test};
+}
+
+ProgramResult RunProbe(const std::vector<std::string>& arguments,
+                       const ProgramOptions& options = ProgramOptions()) {
+  return RunProgram(HostPath(PROBE_FILE), arguments, options);
+}
+
+ProgramOptions WithoutNamespaces() {
+  ProgramOptions options;
+  options.beforeExec = {SeccompFail({SYS_unshare}, EPERM)};
+  return options;
+}
+
+size_t ProcessCount() {
+  size_t count = 0;
+  for (const std::string& name : ListDirectory("/proc")) {
+    count += name.find_first_not_of("0123456789") == std::string::npos ? 1 : 0;
+  }
+  return count;
+}
+
+bool AwaitProcessCount(size_t count) {
+  constexpr int kMilliseconds = 10000;
+  for (int i = 0; i < kMilliseconds && ProcessCount() != count; ++i) {
+    std::this_thread::sleep_for(std::chrono::milliseconds(1));
+  }
+  return ProcessCount() == count;
+}
+
+TEST_F(SandboxEntry, ExitStatusIsThatOfTheTests) {
+  EXPECT_EQ(0, RunProbe(Arguments("Passes")).exitCode);
+  EXPECT_EQ(1, RunProbe(Arguments("Fails")).exitCode);
+}
+
+TEST_F(SandboxEntry, SignalThatEndsTheTestsIsTold) {
+  const ProgramResult result = RunProbe(Arguments("IsKilled"));
+  EXPECT_EQ(128 + SIGKILL, result.exitCode);
+  EXPECT_EQ("test process ended by signal 9 (Killed)\n", result.err);
+}
+
+TEST_F(SandboxEntry, RunFailsInOneLineWhereThereIsNoSandbox) {
+  const ProgramResult result = RunProbe(Arguments("Passes"), WithoutNamespaces());
+  EXPECT_EQ(1, result.exitCode);
+  EXPECT_EQ("", result.out);
+  EXPECT_EQ(
+      "test environment: cannot make the user namespace of the sandbox: Operation not permitted\n",
+      result.err);
+}
+
+TEST_F(SandboxEntry, RunFailsInOneLineWhereNothingCanBeMounted) {
+  ProgramOptions options;
+  options.beforeExec = {SeccompFail({SYS_mount}, EACCES)};
+  const ProgramResult result = RunProbe(Arguments("Passes"), options);
+  EXPECT_EQ(1, result.exitCode);
+  EXPECT_THAT(result.err, StartsWith("test environment: cannot make the mounts"));
+  EXPECT_EQ(result.err.size() - 1, result.err.find('\n'));
+}
+
+TEST_F(SandboxEntry, ListingTestsNeedsNoSandbox) {
+  const ProgramResult result = RunProbe({"--gtest_list_tests"}, WithoutNamespaces());
+  EXPECT_EQ(0, result.exitCode);
+  EXPECT_THAT(result.out, HasSubstr("  Passes\n"));
+}
+
+TEST_F(SandboxEntry, ResultFileIsWrittenOutside) {
+  std::vector<std::string> arguments = Arguments("Passes");
+  arguments.push_back("--gtest_output=xml:/tmp/results/new/probe.xml");
+  EXPECT_EQ(0, RunProbe(arguments).exitCode);
+  EXPECT_THAT(ReadFile("/tmp/results/new/probe.xml"), HasSubstr("name=\"Passes\""));
+}
+
+TEST_F(SandboxEntry, EverythingEndsWithTheProgram) {
+  const size_t before = ProcessCount();
+  // The program, its process 1 and its test process.
+  const size_t meanwhile = before + 3;
+  Program program = StartProgram(HostPath(PROBE_FILE), Arguments("Sleeps"));
+  ASSERT_TRUE(AwaitProcessCount(meanwhile));
+  program.Kill(SIGKILL);
+  program.Wait();
+  EXPECT_TRUE(AwaitProcessCount(before));
+}
+
+}  // namespace
+}  // namespace vela_test

@@ -1,0 +1,86 @@
+// Recording stubs in place of the external tools.
+#pragma once
+
+#include <sys/types.h>
+
+#include <cstdint>
+#include <string>
+#include <vector>
+
+#include "support/stub_plan.h"
+
+namespace vela_test {
+
+constexpr const char* kConverterPath = "/usr/vela/bin/convert-thumb";
+constexpr const char* kExiftoolPath = "/usr/vela/bin/exiftool";
+constexpr const char* kDcrawPath = "/usr/bin/dcraw";
+constexpr const char* kComparePath = "/usr/bin/compare";
+
+/// A descriptor that a stub had when it started.
+struct OpenDescriptor {
+  int number = -1;
+  std::string target;  ///< path, or "pipe:[...]" and the like
+};
+
+/// One call of a stub.
+struct StubCall {
+  std::string tool;                    ///< name, such as "convert-thumb"
+  std::string path;                    ///< path it was started by
+  int number = 0;                      ///< 1 for the tool's first call in this test
+  std::vector<std::string> arguments;  ///< byte exact, argument zero included
+  std::vector<OpenDescriptor> descriptors;
+  std::string workingDirectory;
+  std::vector<int> blockedSignals;
+  std::vector<int> ignoredSignals;
+  mode_t umask = 0;
+  pid_t pid = 0;
+  pid_t parentPid = 0;
+  uint64_t startSequence = 0;    ///< place among all events, see NextSequence
+  uint64_t endSequence = 0;      ///< 0 when it did not come to its end
+  int64_t startNanoseconds = 0;  ///< on the steady clock
+  int64_t endNanoseconds = 0;    ///< on the steady clock, 0 when it did not come to its end
+
+  /// The arguments behind argument zero.
+  std::vector<std::string> Parameters() const;
+};
+
+/// A stub installed at the path of a tool. The record and the plans live until the sandbox is
+/// reset, not longer; the object only writes and reads them.
+class StubTool {
+ public:
+  /// Puts the stub at `path`, in place of what is there, with the plan StubPlan::Normal(). The
+  /// base name of `path` names the tool; one stub a name.
+  explicit StubTool(const std::string& path);
+
+  /// What every call does that no other plan is for.
+  void Plan(const StubPlan& plan) const;
+  /// What the call with this number (from 1) does; before PlanWhen.
+  void PlanCall(int number, const StubPlan& plan) const;
+  /// What calls do that have `argument` among their arguments; the latest that fits holds.
+  void PlanWhen(const std::string& argument, const StubPlan& plan);
+
+  /// This stub's calls, in the order of their start.
+  std::vector<StubCall> Calls() const;
+
+ private:
+  std::string tool_;
+  int conditions_ = 0;
+};
+
+/// The calls of all stubs, in the order of their start.
+std::vector<StubCall> AllStubCalls();
+
+/// Takes the next number from the counter that orders stub starts, stub ends, daemon requests and
+/// whatever the test itself numbers.
+uint64_t NextSequence();
+
+/// Symbolic links to the machine's real tools at the places where the program looks for them.
+void InstallRealConverter();
+void InstallRealExiftool();
+/// Both; dcraw and compare are at their places in a fresh sandbox.
+void InstallRealTools();
+
+/// Takes the tool away: starting it fails.
+void RemoveTool(const std::string& path);
+
+}  // namespace vela_test

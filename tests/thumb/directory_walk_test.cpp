@@ -1,0 +1,152 @@
+// The step of the recursive walk, and what is asked before a directory is worked on.
+#include "thumb/directory_walk.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <string>
+
+#include "support/files.h"
+#include "support/mounts.h"
+#include "support/system_log.h"
+#include "thumb/pass_test.h"
+
+namespace vela_test {
+namespace {
+
+using ::testing::ElementsAre;
+using ::testing::IsEmpty;
+
+/// What the platform's walk expects.
+constexpr int kContinue = 0;
+constexpr int kSkipSubtree = 2;
+
+constexpr const char* kProfileFile = "/tmp/profiles.conf";
+
+/// A directory that has been worked on shows it by a line about this link.
+void PutTrace(const std::string& dir) {
+  MakeDirectories(dir);
+  ASSERT_EQ(0, symlink("nowhere", (dir + "/trace.jpg").c_str()));
+}
+
+std::string TraceOf(const std::string& dir) {
+  return "velathumb:416 [Error] stat: " + dir + "/trace.jpg";
+}
+
+class WalkStep : public PassTest {
+ protected:
+  static int Step(const std::string& path, int typeFlag) {
+    FTW walk = {};
+    walk.base = static_cast<int>(path.rfind('/') + 1);
+    const struct stat status = {};
+    return RecursiveDirCallback(path.c_str(), &status, typeFlag, &walk);
+  }
+};
+
+TEST_F(WalkStep, GoesOnBehindADirectory) {
+  EXPECT_EQ(kContinue, Step(kDir, FTW_D));
+}
+
+TEST_F(WalkStep, GoesOnBehindADirectoryThatIsGone) {
+  EXPECT_EQ(kContinue, Step("/tmp/missing", FTW_D));
+  EXPECT_THAT(ErrorLines(), IsEmpty());
+}
+
+TEST_F(WalkStep, PassesOverEverythingElse) {
+  for (const int typeFlag : {FTW_F, FTW_DNR, FTW_NS, FTW_SL, FTW_SLN, FTW_DP}) {
+    EXPECT_EQ(kSkipSubtree, Step(kDir, typeFlag)) << typeFlag;
+  }
+}
+
+TEST_F(WalkStep, RefusesByTheLastNameOfThePath) {
+  for (const char* name : {"@eaDir", "@tmp", "#recycle", ".hidden", "lost+found"}) {
+    EXPECT_EQ(kSkipSubtree, Step(std::string(kDir) + "/" + name, FTW_D)) << name;
+    EXPECT_EQ(kContinue, Step(std::string("/tmp/") + name + "/photos", FTW_D)) << name;
+  }
+  EXPECT_EQ(kSkipSubtree, Step(".hidden", FTW_D));
+}
+
+TEST_F(WalkStep, WorksOnNothingButAcceptedDirectories) {
+  const std::string refused = std::string(kDir) + "/@tmp";
+  PutTrace(refused);
+  PutTrace(kDir);
+  Step(refused, FTW_D);
+  Step(kDir, FTW_F);
+  Step(kDir, FTW_DNR);
+  EXPECT_THAT(ErrorLines(), IsEmpty());
+}
+
+class DirectoryRun : public PassTest {
+ protected:
+  /// Runs it; returns what it wrote to standard error.
+  static std::string Run(const std::string& dir, const std::string& profiles = kProfileFile) {
+    ::testing::internal::CaptureStderr();
+    RunDirectoryJob(dir, profiles);
+    return ::testing::internal::GetCapturedStderr();
+  }
+};
+
+TEST_F(DirectoryRun, WorksOnTheDirectory) {
+  PutTrace(kDir);
+  EXPECT_EQ("", Run(kDir));
+  EXPECT_THAT(ErrorLines(), ElementsAre(TraceOf(kDir)));
+}
+
+TEST_F(DirectoryRun, TellsAProfileFileThatCannotBeLoaded) {
+  PutTrace(kDir);
+  WriteFile(kProfileFile, "neither section nor key\n");
+  EXPECT_EQ("Failed to parse /tmp/profiles.conf", Run(kDir));
+  MakeDirectories("/tmp/100%s");
+  EXPECT_EQ("Failed to parse /tmp/100%s", Run(kDir, "/tmp/100%s"));
+  EXPECT_THAT(ErrorLines(), IsEmpty());
+}
+
+TEST_F(DirectoryRun, PassesOverWhatIsMissingInSilence) {
+  EXPECT_EQ("", Run("/tmp/missing"));
+  EXPECT_EQ("", Run(""));
+  PutTrace(kDir);
+  EXPECT_EQ("", Run(kDir, "/tmp/missing.conf"));
+  EXPECT_EQ("", Run(kDir, ""));
+  EXPECT_THAT(ErrorLines(), IsEmpty());
+}
+
+TEST_F(DirectoryRun, AsksForThePermissionBeforeItReadsTheProfiles) {
+  WriteFile(kProfileFile, "neither section nor key\n");
+  const ReadOnlyMount mount(kDir);
+  EXPECT_EQ("", Run(kDir));
+}
+
+TEST_F(DirectoryRun, PassesOverDirectoriesThatMayHaveNoMetadata) {
+  PutTrace(kMetadata);
+  EXPECT_EQ("", Run(kMetadata));
+  EXPECT_EQ("", Run(kMetadataRoot));
+  WriteFile("/tmp/file", "");
+  EXPECT_EQ("", Run("/tmp/file"));
+  EXPECT_THAT(ErrorLines(), IsEmpty());
+}
+
+class TreeRun : public PassTest {};
+
+TEST_F(TreeRun, GivesEachDirectoryTheProfileFileOfTheLatestRun) {
+  PutTrace(kDir);
+  PutTrace(std::string(kDir) + "/sub");
+  WriteFile("/tmp/bad.conf", "neither section nor key\n");
+  ::testing::internal::CaptureStderr();
+  RunDirectoryTree(kDir, "/tmp/bad.conf");
+  EXPECT_EQ("Failed to parse /tmp/bad.confFailed to parse /tmp/bad.conf",
+            ::testing::internal::GetCapturedStderr());
+  EXPECT_THAT(ErrorLines(), IsEmpty());
+  RunDirectoryTree(kDir, kProfileFile);
+  EXPECT_THAT(ErrorLines(), ElementsAre(TraceOf(kDir), TraceOf(std::string(kDir) + "/sub")));
+}
+
+TEST_F(TreeRun, FailureOfTheWalkIsIgnored) {
+  RunDirectoryTree("/tmp/missing", kProfileFile);
+  RunDirectoryTree("", kProfileFile);
+  EXPECT_THAT(ErrorLines(), IsEmpty());
+}
+
+}  // namespace
+}  // namespace vela_test

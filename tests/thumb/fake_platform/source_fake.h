@@ -1,0 +1,71 @@
+// Plays the preparation of a photo: the decoding of camera raw photos and the search for the turn
+// that an owner gave a photo. For the one source file of a test program.
+#pragma once
+
+#include <functional>
+#include <string>
+#include <vector>
+
+#include "platform/velaindex.h"
+#include "profiles/thumbnail_profile.h"
+#include "source/raw_image.h"
+#include "source/rotation_check.h"
+#include "thumb/directory_job.h"
+
+namespace vela_test {
+
+/// Answers for as long as the object lives; without one no raw photo can be decoded and no photo is
+/// turned.
+class SourceFake {
+ public:
+  /// One question, with the two paths it was asked with and the number of profiles of its job.
+  struct Question {
+    std::string path;
+    std::string metadataDir;
+    size_t profiles;
+  };
+
+  SourceFake() { Current() = this; }
+  ~SourceFake() { Current() = nullptr; }
+  SourceFake(const SourceFake&) = delete;
+  SourceFake& operator=(const SourceFake&) = delete;
+
+  /// Makes the decoded copy and returns its path.
+  std::function<std::string(const std::string& metadataDir)> decode;
+  /// The turn of every photo, degrees.
+  int rotation = 0;
+
+  std::vector<Question> decodings;
+  std::vector<Question> rotations;
+
+  static SourceFake*& Current() {
+    static SourceFake* current = nullptr;
+    return current;
+  }
+};
+
+}  // namespace vela_test
+
+int GetImageResolution(const std::string& path, uint32_t& width, uint32_t& height) {
+  return VELAIndexImgResGet(path.c_str(), &width, &height) == 0 ? 1 : 0;
+}
+
+std::string ConvertRawToJpeg(const DirectoryJob& job, const std::string& rawPath,
+                             const std::string& thumbDir) {
+  vela_test::SourceFake* source = vela_test::SourceFake::Current();
+  if (source == nullptr) {
+    return "";
+  }
+  source->decodings.push_back({rawPath, thumbDir, job.profiles.all.size()});
+  return source->decode ? source->decode(thumbDir) : std::string();
+}
+
+int DetectThumbRotation(const DirectoryJob& job, const std::string& photoPath,
+                        const std::string& thumbDir) {
+  vela_test::SourceFake* source = vela_test::SourceFake::Current();
+  if (source == nullptr) {
+    return 0;
+  }
+  source->rotations.push_back({photoPath, thumbDir, job.profiles.all.size()});
+  return source->rotation;
+}
