@@ -244,6 +244,8 @@ TEST_F(ImageSize, PrintsNothing) {
       WriteFile("/tmp/broken.jpg", broken);
       SizeOf("/tmp/broken.jpg");
     }
+    WriteFile("/tmp/broken.ppm", "P6\nwide high\n");
+    SizeOf("/tmp/broken.ppm");
     fflush(stderr);
     return 0;
   });

@@ -221,9 +221,10 @@ TEST_F(OddNames, PagedFormatsOfAnyNameWithoutMeaning) {
   ExpectOwnPictures(kinds_);
 }
 
-TEST_F(OddNames, PagedFormatsWithNumbersFail) {
+TEST_F(OddNames, PagedFormatsThatWouldBeMisreadFail) {
   std::vector<std::string> failing;
-  for (const char* name : {"%d", "%04d", "%%", "%x", "%[fx:1]"}) {
+  for (const char* name :
+       {"%d", "%04d", "%%", "%x", "%[fx:1]", "[1]", "a[1]", "*", "a*", "?", "{a,b}"}) {
     failing.push_back(AddPhoto(InPhotos(std::string(name) + ".gif")));
     failing.push_back(AddPhoto(InPhotos(std::string(name) + ".tif")));
   }

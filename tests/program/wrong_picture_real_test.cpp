@@ -87,6 +87,13 @@ TEST_F(WrongPicture, NumbersInPagedNames) {
   ExpectOwnOrFailed("%d/p.tif", "0/p.tif");
 }
 
+// The converter leaves out the percent sign in front of a bracket.
+TEST_F(WrongPicture, PropertiesInPagedNames) {
+  ExpectOwnOrFailed("%[x].tif", "[x].tif");
+  ExpectOwnOrFailed("%[x]/p.tif", "[x]/p.tif");
+  ExpectOwnOrFailed("%[/p.gif", "[/p.gif");
+}
+
 TEST_F(WrongPicture, PrefixesInPagedNames) {
   ExpectOwnOrFailed("gif:z.gif", "z.gif");
   ExpectOwnOrFailed("gif:d/p.gif", "d/p.gif");

@@ -45,6 +45,7 @@ PixelSize ReadPpmSize(const char* path) {
   if (!file) return {};
   pm_init("velathumb", 0);
   pm_setusermessagefn(DropMessage);
+  pm_setusererrormsgfn(DropMessage);
   int width = 0;
   int height = 0;
   if (!ReadHeader(file.get(), width, height)) return {};
