@@ -177,6 +177,20 @@ TEST_F(StalePidFiles, RefusedProbeCountsAsGone) {
   EXPECT_FALSE(Exists(path));
 }
 
+TEST_F(StalePidFiles, NothingIsProbedForNamesWithoutNumber) {
+  // A probe of process 0 would reach the caller's own group and find it alive.
+  const std::string word = Put("word");
+  const std::string zero = Put("0");
+  const BeforeExec refuseKill = SeccompFail({SYS_kill}, EPERM);
+  EXPECT_EQ(0, ForkCall([&] {
+              const int result = refuseKill();
+              KillThumbProcesses();
+              return result;
+            }));
+  EXPECT_TRUE(Exists(word));
+  EXPECT_TRUE(Exists(zero));
+}
+
 TEST_F(StalePidFiles, OtherNamesAreLeftAlone) {
   const std::string gone = std::to_string(GonePid());
   for (const std::string& name : {"velathumb." + gone + ".pid.bak", "velathumb" + gone + ".pid",

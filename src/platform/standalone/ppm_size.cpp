@@ -17,6 +17,15 @@ struct CloseFile {
   void operator()(FILE* file) const { fclose(file); }
 };
 
+/// The library also reads related formats, and keeps memory of some that are damaged.
+bool IsBinaryPixmap(FILE* file) {
+  char magic[2] = "";
+  const bool isOne =
+      fread(magic, 1, sizeof(magic), file) == sizeof(magic) && magic[0] == 'P' && magic[1] == '6';
+  rewind(file);
+  return isOne;
+}
+
 void DropMessage(const char* /*text*/) {}
 
 /// The library ends the process on any error unless it is given a place to jump to. Nothing that
@@ -42,7 +51,7 @@ PixelSize ReadPpmSize(const char* path) {
   static std::mutex mutex;
   const std::lock_guard<std::mutex> lock(mutex);
   const std::unique_ptr<FILE, CloseFile> file(fopen(path, "rbe"));
-  if (!file) return {};
+  if (!file || !IsBinaryPixmap(file.get())) return {};
   pm_init("velathumb", 0);
   pm_setusermessagefn(DropMessage);
   pm_setusererrormsgfn(DropMessage);
