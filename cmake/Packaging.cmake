@@ -23,13 +23,7 @@ set(CPACK_DEBIAN_FILE_NAME DEB-DEFAULT)
 
 # The tools where the program looks for them. Only the package does this: an installation under
 # another prefix has no business in /usr/vela.
-set(VELA_TOOLS ${PROJECT_BINARY_DIR}/tools)
-file(MAKE_DIRECTORY ${VELA_TOOLS}/bin ${VELA_TOOLS}/lib)
-file(COPY_FILE ${PROJECT_SOURCE_DIR}/programs/convert-thumb/convert-thumb.sh
-     ${VELA_TOOLS}/bin/convert-thumb)
-file(CREATE_LINK /usr/bin/convert-im6.q16 ${VELA_TOOLS}/lib/convert-thumb SYMBOLIC)
-file(CREATE_LINK /usr/bin/exiftool ${VELA_TOOLS}/bin/exiftool SYMBOLIC)
-set(CPACK_INSTALLED_DIRECTORIES ${VELA_TOOLS} vela)
+set(CPACK_PRE_BUILD_SCRIPTS ${PROJECT_SOURCE_DIR}/cmake/PackageTools.cmake)
 
 install(FILES ${PROJECT_SOURCE_DIR}/README.md DESTINATION ${CMAKE_INSTALL_DOCDIR})
 install(FILES ${PROJECT_SOURCE_DIR}/LICENSE DESTINATION ${CMAKE_INSTALL_DOCDIR} RENAME copyright)

@@ -23,7 +23,7 @@ source_argument() {
 is_misread() {
   case $source in
     @*) return 0 ;;
-    *%[dox]*'[0]' | *%[0-9]*[dox]*'[0]' | *%%*'[0]') return 0 ;;
+    *%[dox]*'[0]' | *%[0-9]*[dox]*'[0]' | *%%*'[0]' | *%\[*'[0]') return 0 ;;
   esac
   name=${source##*/}
   case ${name%'[0]'} in
