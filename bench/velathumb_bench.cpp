@@ -67,7 +67,7 @@ void MeasureConversion() {
   }
   vela_test::InstallRealConverter();
   const CostPair cost = FastestOf(
-      3,
+      2,
       [&] {
         RemoveMetadata(directory);
         return TimedRun(subject);

@@ -44,18 +44,17 @@ class PhotoThumbs {
   /// Answers the usual case, a good thumbnail under its current name, from one look at the file.
   bool IsGoodFile(const char* name) {
     struct stat thumb = {};
-    return stat(DerivedFilePath(eaDir_, name).c_str(), &thumb) == 0 && S_ISREG(thumb.st_mode) &&
-           IsPhotoKnown() && !IsDerivedFileOutdated(photo_, thumb);
+    if (stat(DerivedFilePath(eaDir_, name).c_str(), &thumb) != 0 || !S_ISREG(thumb.st_mode)) {
+      return false;
+    }
+    known_ = known_ || stat(path_, &photo_) == 0;
+    return known_ && !IsDerivedFileOutdated(photo_, thumb);
   }
 
   bool IsOutdated(const char* name) {
-    // A photo that cannot be examined never has its thumbnails made again.
-    return IsPhotoKnown() && IsDerivedFileOutdated(photo_, DerivedFilePath(eaDir_, name));
-  }
-
-  bool IsPhotoKnown() {
     known_ = known_ || StatMediaFile(path_, photo_);
-    return known_;
+    // A photo that cannot be examined never has its thumbnails made again.
+    return known_ && IsDerivedFileOutdated(photo_, DerivedFilePath(eaDir_, name));
   }
 
   const char* path_;

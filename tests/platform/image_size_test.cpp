@@ -83,6 +83,9 @@ TEST_F(ImageSize, IsTheStoredOneWhateverTheOrientation) {
 
 TEST_F(ImageSize, NeedsTheHeaderOnly) {
   EXPECT_EQ(SizeOf(vela_test::MakeTruncatedJpeg("/tmp/cut.jpg", 256, 192)), "256x192");
+  const std::string png = vela_test::ReadFile(vela_test::MakeTransparentPng("/tmp/a.png", 52, 21));
+  WriteFile("/tmp/cut.png", png.substr(0, 60));
+  EXPECT_EQ(SizeOf("/tmp/cut.png"), "52x21");
 }
 
 TEST_F(ImageSize, IsToldByTheContentNotTheName) {

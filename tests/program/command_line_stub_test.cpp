@@ -225,6 +225,19 @@ TEST_F(CommandLine, ProfileFileThatCannotBeParsedIsToldForEachDirectory) {
   EXPECT_THAT(ErrorLines(), IsEmpty());
 }
 
+TEST_F(CommandLine, ItsMessageGoesNowhereWithoutStandardError) {
+  // The connection to the system log, which an unremovable pid file opens first, would otherwise
+  // have descriptor 2.
+  MakeDirectoryWithPhoto(kPhotos);
+  MakeDirectories("/var/run/velathumb.4000000.pid");
+  WriteFile(kProfiles, "neither section nor key\n");
+  ProgramOptions options;
+  options.closeError = true;
+  EXPECT_GOOD_END(Run({kPhotos}, options));
+  EXPECT_THAT(ErrorLines(), ElementsAre("velathumb: KillThumbProcesses(1161) - unlink(/var/run/"
+                                        "velathumb.4000000.pid), Is a directory\n"));
+}
+
 TEST_F(CommandLine, DirectoryInPlaceOfTheProfileFileCannotBeParsed) {
   MakeDirectoryWithPhoto(kPhotos);
   const ProgramResult result = RunWith({"/tmp", kPhotos});

@@ -98,16 +98,6 @@ TEST_P(ClosedDescriptors, NothingElseTakesTheirPlace) {
 
 INSTANTIATE_TEST_SUITE_P(Sets, ClosedDescriptors, ::testing::Range(1, 8));
 
-TEST_F(ConverterEnvironment, MessagesStayOutOfFilesWithoutStandardError) {
-  // Descriptor 2 must not be whatever was opened first when the message is written.
-  WriteFile(kProfiles, "neither section nor key\n");
-  ProgramOptions options;
-  options.closeInput = options.closeOutput = options.closeError = true;
-  EXPECT_EQ(0, Run({kPhotos}, options).exitCode);
-  EXPECT_EQ("neither section nor key\n", ReadFile(kProfiles));
-  EXPECT_THAT(ListDirectory("/run"), IsEmpty());
-}
-
 TEST_F(ConverterEnvironment, HasNoSignalsBlocked) {
   ProgramOptions options;
   options.beforeExec = {BlockSignal(SIGUSR1), BlockSignal(SIGPIPE)};

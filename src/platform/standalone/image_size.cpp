@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <cerrno>
 #include <cstdlib>
+#include <exception>
 #include <exiv2/exiv2.hpp>
 #include <exiv2/webpimage.hpp>
 #include <iterator>
@@ -72,12 +73,21 @@ bool IsPhotoType(int imageType) {
          std::end(kPhotoTypes);
 }
 
+/// A file that is damaged or cut behind its header still has the size that the header tells.
+void ReadHeader(Exiv2::Image& image) {
+  try {
+    image.readMetadata();
+  } catch (const std::exception&) {
+    return;
+  }
+}
+
 /// Returns an empty size when there is none to be read.
 PixelSize ReadPixelSize(const char* path) {
   const std::unique_ptr<Exiv2::Image> image = OpenImage(path);
   if (!image) return velaplatform::ReadPpmSize(path);
   if (!IsPhotoType(image->imageType())) return {};
-  image->readMetadata();
+  ReadHeader(*image);
   const PixelSize size{image->pixelWidth(), image->pixelHeight()};
   // The negative height of a bitmap says that its rows come from the top.
   const bool isBitmap = image->imageType() == Exiv2::ImageType::bmp;

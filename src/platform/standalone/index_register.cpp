@@ -54,9 +54,10 @@ int ToErrno(int sqliteCode) {
   }
 }
 
-/// Makes the database's directory, with its mode whatever the process's mask.
+/// Makes the database's directory, with its mode whatever the process's mask. Returns whether it is
+/// there, also when another process was faster.
 bool MakeDirectory() {
-  if (mkdir(velaplatform::kIndexDirectory, kDirectoryMode) != 0) return false;
+  if (mkdir(velaplatform::kIndexDirectory, kDirectoryMode) != 0) return errno == EEXIST;
   return chmod(velaplatform::kIndexDirectory, kDirectoryMode) == 0;
 }
 
