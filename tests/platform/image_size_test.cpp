@@ -1,4 +1,5 @@
 // Pixel sizes of photos, from their headers.
+#include <sys/resource.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
@@ -146,6 +147,18 @@ TEST_F(ImageSize, OfBitmapsOfAllVersions) {
       LittleEndian(40, 4) + LittleEndian(33, 4) + LittleEndian(static_cast<uint32_t>(-21), 4);
   WriteFile("/tmp/down.bmp", BitmapHeader(topDown));
   EXPECT_EQ(SizeOf("/tmp/down.bmp"), "33x21");
+}
+
+TEST_F(ImageSize, OfAHugePictureCostsNoMemory) {
+  WriteFile("/tmp/huge.bmp",
+            BitmapHeader(LittleEndian(40, 4) + LittleEndian(20000, 4) + LittleEndian(10000, 4)));
+  SizeOf("/tmp/huge.bmp");  // what the library sets up once is not counted
+  rusage before = {};
+  getrusage(RUSAGE_SELF, &before);
+  EXPECT_EQ(SizeOf("/tmp/huge.bmp"), "20000x10000");
+  rusage after = {};
+  getrusage(RUSAGE_SELF, &after);
+  EXPECT_LT(after.ru_maxrss - before.ru_maxrss, 1024) << "KiB more";
 }
 
 TEST_F(ImageSize, OfBitmapsThatHaveNone) {
