@@ -5,15 +5,10 @@
 
 #include "convert/velamk_photo_thumb.h"
 #include "platform/velaindex.h"
+#include "storage/fail_marker.h"
 #include "thumb/file_helpers.h"
 
 namespace {
-
-/// Returns the name of the failure marker of a thumbnail, empty when it has none.
-std::string FailMarkerPath(const std::string& thumbPath) {
-  const std::size_t dot = thumbPath.rfind('.');
-  return dot == std::string::npos ? std::string() : thumbPath.substr(0, dot) + ".fail";
-}
 
 bool StatFile(const std::string& path, struct stat& out) {
   return stat(path.c_str(), &out) == 0;

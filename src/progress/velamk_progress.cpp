@@ -5,6 +5,7 @@
 
 #include <algorithm>
 #include <cstdint>
+#include <cstdio>
 #include <cstdlib>
 #include <ctime>
 #include <limits>
@@ -12,24 +13,13 @@
 
 #include "platform/velaindex.h"
 #include "platform/vlibc.h"
+#include "progress/progress_summary.h"
 
 namespace {
 
 constexpr char kLogSource[] = "velamk_progress";
 constexpr char kSystemSettings[] = "/etc/velainfo.conf";
 constexpr char kResumeTimeKey[] = "thumb_conv_resume_time";
-
-/// Returns the progress file of a media kind, null for an unknown one.
-const char* ProgressFile(int kind) {
-  switch (kind) {
-    case THUMB_TYPE_PHOTO:
-      return "/var/spool/conv_progress_photo";
-    case THUMB_TYPE_VIDEO:
-      return "/var/spool/conv_progress_video";
-    default:
-      return nullptr;
-  }
-}
 
 int ClampToInt(int64_t value) {
   constexpr int64_t kLowest = std::numeric_limits<int>::min();
@@ -46,29 +36,38 @@ int ReadCounter(const char* file, const char* key) {
   return ClampToInt(std::strtol(text, nullptr, 10));
 }
 
-struct Progress {
-  int total;
-  int completed;
-
-  double Ratio() const {
-    return total == 0 ? 0.0F : static_cast<float>(completed) / static_cast<float>(total);
-  }
-};
-
-Progress ReadProgress(int kind, const char* totalKey, const char* completedKey) {
+ProgressCount ReadCount(int kind, const char* totalKey, const char* completedKey) {
   const int total = GetConvProgress(kind, totalKey);
   return {total, GetConvProgress(kind, completedKey)};
 }
 
+std::string FormatCount(const char* kind, const ProgressCount& count) {
+  char line[128] = "";
+  std::snprintf(line, sizeof line, "total_%s: %d, complete_%s: %d, progress: %.2f", kind,
+                count.total, kind, count.completed, double{count.Ratio()});
+  return line;
+}
+
 }  // namespace
 
+const char* ConvProgressFile(int kind) {
+  switch (kind) {
+    case THUMB_TYPE_PHOTO:
+      return "/var/spool/conv_progress_photo";
+    case THUMB_TYPE_VIDEO:
+      return "/var/spool/conv_progress_video";
+    default:
+      return nullptr;
+  }
+}
+
 int GetConvProgress(int kind, const char* key) {
-  const char* file = ProgressFile(kind);
+  const char* file = ConvProgressFile(kind);
   return file == nullptr || key == nullptr ? 0 : ReadCounter(file, key);
 }
 
 void AddConvProgress(int kind, const char* key, int delta) {
-  const char* file = ProgressFile(kind);
+  const char* file = ConvProgressFile(kind);
   if (file == nullptr || key == nullptr) {
     return;
   }
@@ -79,17 +78,23 @@ void AddConvProgress(int kind, const char* key, int delta) {
   }
 }
 
+ProgressSummary ReadProgressSummary() {
+  const ProgressCount photo = ReadCount(THUMB_TYPE_PHOTO, "total", "completed");
+  const ProgressCount thumb = ReadCount(THUMB_TYPE_PHOTO, "total_thumb", "completed_thumb");
+  return {photo, thumb, ReadCount(THUMB_TYPE_VIDEO, "total", "completed")};
+}
+
+std::vector<std::string> FormatProgressSummary(const ProgressSummary& summary) {
+  return {"========== Convert Progress ==========", FormatCount("photo", summary.photo),
+          FormatCount("thumb", summary.thumb), FormatCount("video", summary.video)};
+}
+
 void LogConvProgress() {
-  const Progress photo = ReadProgress(THUMB_TYPE_PHOTO, "total", "completed");
-  const Progress thumb = ReadProgress(THUMB_TYPE_PHOTO, "total_thumb", "completed_thumb");
-  const Progress video = ReadProgress(THUMB_TYPE_VIDEO, "total", "completed");
-  syslog(LOG_ERR, "%s:%d ========== Convert Progress ==========", kLogSource, 144);
-  syslog(LOG_ERR, "%s:%d total_photo: %d, complete_photo: %d, progress: %.2f", kLogSource, 145,
-         photo.total, photo.completed, photo.Ratio());
-  syslog(LOG_ERR, "%s:%d total_thumb: %d, complete_thumb: %d, progress: %.2f", kLogSource, 146,
-         thumb.total, thumb.completed, thumb.Ratio());
-  syslog(LOG_ERR, "%s:%d total_video: %d, complete_video: %d, progress: %.2f", kLogSource, 147,
-         video.total, video.completed, video.Ratio());
+  int line = 144;
+  for (const std::string& text : FormatProgressSummary(ReadProgressSummary())) {
+    syslog(LOG_ERR, "%s:%d %s", kLogSource, line, text.c_str());
+    ++line;
+  }
 }
 
 long GetThumbConvResumeTime() {

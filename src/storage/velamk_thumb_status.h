@@ -1,9 +1,51 @@
 // Thumbnail status: what is still to be done.
 #pragma once
 
+#include <ftw.h>
+#include <sys/stat.h>
+
 #include <cstdint>
+
+/// Photos with at least one missing thumbnail, and missing thumbnails, in the tree that
+/// GetDirThumbStatusRecursive went through last. One such scan at a time in a process.
+extern int g_incomplete_photo_num;
+extern int g_incomplete_thumb_num;
 
 /// Counts the thumbnails of the photo `path` that `sizeMap` asks for (-1: ask the index library)
 /// into `missingOut` (missing or outdated) and `presentOut`. Both are 0 when the photo does not
 /// exist or cannot be looked up; the latter is logged.
 void GetThumbStatus(const char* path, int* missingOut, int* presentOut, int32_t sizeMap);
+
+/// Counts the photos of the directory `dir` that lack thumbnails, and the thumbnails they lack;
+/// subdirectories are not entered. Both are 0 when there is no such directory or it cannot be
+/// opened; the latter is logged.
+void GetDirThumbStatus(const char* dir, int* photosOut, int* thumbsOut);
+
+/// Counts the same for the tree `dir`, other file systems and directories that wait in the photo
+/// queue left out. Returns 0, or -1 when the walk came to an early end.
+int GetDirThumbStatusRecursive(const char* dir, int* photosOut, int* thumbsOut);
+
+/// The step of that scan: adds a directory to the two counters above. Returns the walk's action
+/// code.
+int GetDirThumbStatusRecursive_Callback(const char* path, const struct stat* status, int typeFlag,
+                                        struct FTW* walk);
+
+/// Returns 1 when the video `path` lacks thumbnails or its converted film, else 0, also for what is
+/// no video and for a path of more than 4066 bytes, which is logged. Removes thumbnails that are
+/// outdated and thumbnails and films of the wrong orientation.
+int IsVideoWorkNeeded(const char* path);
+
+/// Returns the number of videos in the tree `dir` that need work and do not wait in the video
+/// queue; 0, logged, when the directory does not exist or cannot be opened. Once a waiting video
+/// has been met in a directory, the videos listed after it in that directory are not counted.
+/// Removes what IsVideoWorkNeeded removes.
+int CountVideoWork(const char* dir);
+
+/// Returns the number of videos that need work among the entries of the queue file `queueFile`; of
+/// the video queue without those that are being worked off. 0 when there is no such file or it
+/// cannot be opened; the latter is logged. Removes what IsVideoWorkNeeded removes.
+int CountVideoQueueWork(const char* queueFile);
+
+/// Returns the number of entries of the directory `path`, "." and ".." included; 0 when it is no
+/// directory or cannot be opened.
+int CountDirEntries(const char* path);

@@ -21,3 +21,35 @@ int IsFilePortrait(const char* path);
 /// names, each that is outdated or of the wrong orientation. Returns 1 when all are there and good,
 /// else 0.
 int CheckEAThumbs(const char* path, int32_t sizeMap);
+
+/// Returns 1 when the video `path` is to be turned by 90, 180 or 270 degrees for display, else 0,
+/// also when its metadata cannot be read, which is logged.
+int IsVideoRotated(const char* path);
+
+/// Returns 1 when the video `path` has one of the films that are made in its orientation (high,
+/// medium, low, mobile), of whatever size, else 0.
+int HasConvertedFilm(const char* path);
+
+/// Compares the derived file `name` (or `oldName`) of the media file `path` with the plugin
+/// daemon's record of it. Returns 1 when both are portrait or both are not, 0 when they differ, -1
+/// when there is no such file or `path` is null, which is logged.
+int IsEAFileOrientationMatched(const char* path, const char* name, const char* oldName);
+
+/// Returns 1 when one of the films that HasConvertedFilm looks for has the orientation of the video
+/// `path`, else 0.
+int HasMatchedConvertedFilm(const char* path);
+
+/// Tells whether the video `path` has a film for browsers: 1 or 0, -1 (logged) for a null path or a
+/// video without a metadata directory. Removes the Flash film of a rotated video, under both names,
+/// when only its orientation is wrong.
+int IsWebVideoConverted(const char* path);
+
+/// Tells whether the video `path` has a film for mobile devices: 1, 0 or -1 as
+/// IsWebVideoConverted. Removes the MPEG-4 conversion of a rotated video when only its orientation
+/// is wrong.
+int IsMobileVideoConverted(const char* path);
+
+/// Tells whether the video `path` has the films it needs, for mobile devices too when the system
+/// settings ask for them. Returns 1 (also when a check ends in an error), 0, or -1 for a null path,
+/// which is logged. Removes films as the two checks do.
+int IsVideoConverted(const char* path);

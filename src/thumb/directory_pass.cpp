@@ -1,27 +1,21 @@
 #include "thumb/directory_pass.h"
 
-#include <dirent.h>
 #include <sys/stat.h>
 #include <syslog.h>
 
 #include <algorithm>
 #include <cstring>
 #include <ctime>
-#include <memory>
 
 #include "platform/velaindex.h"
+#include "storage/creation_queue.h"
+#include "storage/directory_entries.h"
 #include "thumb/directory_lock.h"
 #include "thumb/file_helpers.h"
 #include "thumb/log_source.h"
 #include "thumb/photo_pass.h"
 
 namespace {
-
-constexpr char kQueueFile[] = "/var/spool/thumb_create.queue";
-
-struct DirectoryCloser {
-  void operator()(DIR* directory) const { closedir(directory); }
-};
 
 bool IsPhotoName(const char* name) {
   if (std::strcmp(name, ".") == 0 || std::strcmp(name, "..") == 0) {
@@ -62,7 +56,7 @@ bool MakePhotos(const DirectoryJob& job, const std::string& metadataRoot,
 }
 
 void QueueDirectory(const std::string& dir) {
-  if (WriteIndexQueue(dir.c_str(), kQueueFile) != 0) {
+  if (WriteIndexQueue(dir.c_str(), kPhotoQueue.file) != 0) {
     syslog(LOG_ERR, "%s:%d Failed to write [%s] to thumb queue", kLogSource, 1112, dir.c_str());
   }
 }
@@ -71,14 +65,14 @@ void QueueDirectory(const std::string& dir) {
 
 std::vector<std::string> ListDirectoryPhotos(const std::string& dir) {
   std::vector<std::string> names;
-  const std::unique_ptr<DIR, DirectoryCloser> directory(opendir(dir.c_str()));
-  if (directory == nullptr) {
+  DirectoryEntries entries(dir.c_str());
+  if (!entries.IsOpen()) {
     syslog(LOG_ERR, "%s:%d [Error] opendir: %s", kLogSource, 404, dir.c_str());
     return names;
   }
-  while (const dirent* entry = readdir(directory.get())) {
-    if (IsPhotoName(entry->d_name) && IsRegularFile(dir + "/" + entry->d_name)) {
-      names.emplace_back(entry->d_name);
+  while (const char* name = entries.NextName()) {
+    if (IsPhotoName(name) && IsRegularFile(dir + "/" + name)) {
+      names.emplace_back(name);
     }
   }
   std::sort(names.begin(), names.end());

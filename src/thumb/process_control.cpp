@@ -6,20 +6,18 @@
 
 #include <cerrno>
 #include <csignal>
-#include <cstdlib>
 #include <cstring>
 
 #include "convert/photo_convert_job.h"
 #include "platform/vlibc.h"
-#include "thumb/cut_text.h"
 #include "thumb/glob_matches.h"
 #include "thumb/log_source.h"
+#include "thumb/pid_file.h"
 
 namespace {
 
 constexpr char kPidFilePrefix[] = "/var/run/velathumb.";
 constexpr char kPidFileSuffix[] = ".pid";
-constexpr std::size_t kPidPathBufferSize = 4095;
 
 /// The path of this process's pid file, built without the C library's formatting so that the signal
 /// handler can use it.
@@ -63,15 +61,6 @@ constexpr const char* BaseName(const char* path) {
   return name;
 }
 
-/// Returns the process id that a pid file's name carries, 0 when it carries none.
-long PidOfFile(const char* path) {
-  std::string copy = CutText(path, kPidPathBufferSize);
-  char* rest = nullptr;
-  strtok_r(copy.data(), ".", &rest);
-  const char* number = strtok_r(nullptr, ".", &rest);
-  return number == nullptr ? 0 : std::strtol(number, nullptr, 10);
-}
-
 bool IsProcessThere(long pid) {
   const auto id = static_cast<pid_t>(pid);
   return id == pid && kill(id, 0) == 0;
@@ -92,7 +81,7 @@ std::string CreatePidFile() {
 }
 
 void KillThumbProcesses() {
-  for (const char* path : GlobMatches("/var/run/velathumb.*.pid")) {
+  for (const char* path : GlobMatches(kPidFilePattern)) {
     const long pid = PidOfFile(path);
     if (pid == 0 || IsProcessThere(pid)) {
       continue;

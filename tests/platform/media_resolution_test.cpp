@@ -9,6 +9,7 @@
 #include "platform/velaindex.h"
 #include "platform/vlibc.h"
 #include "support/files.h"
+#include "support/films.h"
 #include "support/images.h"
 #include "support/program.h"
 #include "support/sandbox.h"
@@ -68,12 +69,10 @@ TEST_F(MediaResolution, OfAFlashVideo) {
 }
 
 TEST_F(MediaResolution, IsTheCodedOneWhateverTheRotation) {
-  MakeVideo("/tmp/plain.mp4", "320x180");
-  const auto result =
-      vela_test::RunProgram("/usr/bin/ffmpeg", {"-v", "error", "-i", "/tmp/plain.mp4", "-c", "copy",
-                                                "-metadata:s:v:0", "rotate=90", "/tmp/turned.mp4"});
-  ASSERT_EQ(result.exitCode, 0) << result.err;
-  EXPECT_EQ(SizeOf("/tmp/turned.mp4"), "320x180");
+  vela_test::FilmRecipe recipe;
+  recipe.rotation = 90;
+  vela_test::MakeFilm("/tmp/turned.mp4", recipe);
+  EXPECT_EQ(SizeOf("/tmp/turned.mp4"), "64x48");
 }
 
 TEST_F(MediaResolution, IsToldByTheContentNotTheName) {
@@ -83,9 +82,10 @@ TEST_F(MediaResolution, IsToldByTheContentNotTheName) {
 }
 
 TEST_F(MediaResolution, FailsWithoutPicture) {
-  const auto result = vela_test::RunProgram(
-      "/usr/bin/ffmpeg", {"-v", "error", "-f", "lavfi", "-i", "sine=duration=0.2", "/tmp/a.mp4"});
-  ASSERT_EQ(result.exitCode, 0) << result.err;
+  vela_test::FilmRecipe recipe;
+  recipe.videoCodec.clear();
+  recipe.audioCodec = "aac";
+  vela_test::MakeFilm("/tmp/a.mp4", recipe);
   EXPECT_EQ(SizeOf("/tmp/a.mp4"), "failed");
 }
 

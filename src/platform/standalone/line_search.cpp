@@ -9,6 +9,7 @@
 #include "platform/standalone/bounded_copy.h"
 #include "platform/standalone/file_descriptor.h"
 #include "platform/standalone/last_error.h"
+#include "platform/standalone/line_index_cache.h"
 #include "platform/vlibc.h"
 
 namespace {
@@ -78,6 +79,27 @@ int FindLine(int fd, std::string_view wanted, bool& isFound) {
   return 0;
 }
 
+/// Searches the open file `fd`, found at `path`. Sets `isFound`. Returns 0 or an errno value.
+int FindLineInFile(const char* path, int fd, std::string_view wanted, bool& isFound) {
+  velaplatform::IndexLines(path, fd);
+  if (const auto known = velaplatform::FindLineInIndex(path, wanted)) {
+    isFound = *known;
+    return 0;
+  }
+  if (lseek(fd, 0, SEEK_SET) < 0 && errno != ESPIPE) return errno;
+  return FindLine(fd, wanted, isFound);
+}
+
+int SearchFile(const char* path, std::string_view wanted, bool& isFound) {
+  if (const auto known = velaplatform::FindLineInIndex(path, wanted)) {
+    isFound = *known;
+    return 0;
+  }
+  const velaplatform::FileDescriptor fd(open(path, O_RDONLY | O_CLOEXEC | O_NONBLOCK | O_NOCTTY));
+  if (!fd) return errno;
+  return FindLineInFile(path, fd.Get(), wanted, isFound);
+}
+
 }  // namespace
 
 int VLIBCFileGetLine(const char* file, const char* text, char* out, size_t outSize, int /*flags*/) {
@@ -86,10 +108,8 @@ int VLIBCFileGetLine(const char* file, const char* text, char* out, size_t outSi
   const std::string_view wanted(text);
   if (wanted.size() > INT_MAX) return Fail(EOVERFLOW);
 
-  const velaplatform::FileDescriptor fd(open(file, O_RDONLY | O_CLOEXEC | O_NONBLOCK | O_NOCTTY));
-  if (!fd) return Fail(errno);
   bool isFound = false;
-  const int error = FindLine(fd.Get(), wanted, isFound);
+  const int error = SearchFile(file, wanted, isFound);
   if (error != 0) return Fail(error);
   if (!isFound) return 0;
   velaplatform::CopyCut(wanted, out, outSize);

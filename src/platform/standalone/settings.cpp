@@ -3,7 +3,6 @@
 #include <sys/stat.h>
 
 #include <charconv>
-#include <ctime>
 #include <limits>
 #include <mutex>
 #include <optional>
@@ -11,7 +10,7 @@
 #include <string_view>
 
 #include "platform/standalone/file_content.h"
-#include "platform/standalone/file_lock.h"
+#include "platform/standalone/file_version.h"
 #include "platform/standalone/key_value_text.h"
 
 namespace velaplatform {
@@ -49,26 +48,6 @@ Settings ParseSettings(std::string_view text) {
     settings.toolTimeout = std::chrono::seconds(*limit);
   }
   return settings;
-}
-
-bool IsSameTime(const timespec& a, const timespec& b) {
-  return a.tv_sec == b.tv_sec && a.tv_nsec == b.tv_nsec;
-}
-
-bool IsSameVersion(const struct stat& a, const struct stat& b) {
-  return IsSameFile(a, b) && a.st_size == b.st_size && IsSameTime(a.st_mtim, b.st_mtim) &&
-         IsSameTime(a.st_ctim, b.st_ctim);
-}
-
-/// Times of files advance in steps of a timer tick, so a change within the same tick could not be
-/// told: only a file at rest for a while is known by its times.
-bool IsAtRest(const struct stat& file) {
-  timespec now;
-  if (clock_gettime(CLOCK_REALTIME_COARSE, &now) != 0) return false;
-  constexpr int64_t kRestMilliseconds = 100;
-  const int64_t age =
-      (now.tv_sec - file.st_ctim.tv_sec) * 1000 + (now.tv_nsec - file.st_ctim.tv_nsec) / 1000000;
-  return age > kRestMilliseconds;
 }
 
 /// The settings last read with the state of the file they come from: one look at the file's status

@@ -1,18 +1,19 @@
-#include "storage/velamk_thumb_status.h"
+#include "storage/photo_thumb_states.h"
 
 #include <sys/stat.h>
 #include <syslog.h>
 
+#include <algorithm>
 #include <string>
 
 #include "platform/velaindex.h"
+#include "storage/status_log_source.h"
 #include "storage/thumb_age.h"
-#include "storage/thumb_size_class.h"
+#include "storage/velamk_thumb_status.h"
 #include "thumb/cut_text.h"
 
 namespace {
 
-constexpr char kLogSource[] = "velamk_thumb_status";
 constexpr int32_t kUnknownSizeMap = -1;
 
 bool ResolveSizeMap(const char* path, int32_t& sizeMap) {
@@ -22,7 +23,7 @@ bool ResolveSizeMap(const char* path, int32_t& sizeMap) {
   if (VELAIDX_GetThumbSizeMap(path, THUMB_TYPE_PHOTO, &sizeMap) >= 0) {
     return true;
   }
-  syslog(LOG_ERR, "%s:%d [Error] get thumb size map: %s", kLogSource, 96, path);
+  syslog(LOG_ERR, "%s:%d [Error] get thumb size map: %s", kStatusLogSource, 96, path);
   return false;
 }
 
@@ -31,20 +32,24 @@ class PhotoThumbs {
  public:
   PhotoThumbs(const char* path, const char* eaDir) : path_(path), eaDir_(eaDir) {}
 
-  /// Tells whether the size class has a thumbnail that is up to date.
-  bool IsPresent(const EAThumbInfo& row) {
+  ThumbState StateOf(const EAThumbInfo& row) {
     if (IsGoodFile(row.name)) {
-      return true;
+      return ThumbState::kPresent;
     }
     const char* name = IsEAFileExist(eaDir_.c_str(), nullptr, row.name, row.oldName);
-    return name != nullptr && !IsOutdated(name);
+    if (name == nullptr) {
+      return ThumbState::kMissing;
+    }
+    return IsOutdated(name) ? ThumbState::kOutdated : ThumbState::kPresent;
   }
 
  private:
   /// Answers the usual case, a good thumbnail under its current name, from one look at the file.
   bool IsGoodFile(const char* name) {
+    const std::string path = eaDir_ + '/' + name;
     struct stat thumb = {};
-    if (stat(DerivedFilePath(eaDir_, name).c_str(), &thumb) != 0 || !S_ISREG(thumb.st_mode)) {
+    if (path.size() >= kPathBufferSize || stat(path.c_str(), &thumb) != 0 ||
+        !S_ISREG(thumb.st_mode)) {
       return false;
     }
     known_ = known_ || stat(path_, &photo_) == 0;
@@ -65,24 +70,41 @@ class PhotoThumbs {
 
 }  // namespace
 
-void GetThumbStatus(const char* path, int* missingOut, int* presentOut, int32_t sizeMap) {
-  *missingOut = 0;
-  *presentOut = 0;
+int PhotoThumbStates::Missing() const {
+  return static_cast<int>(std::count_if(states.begin(), states.end(), [](ThumbState state) {
+    return state == ThumbState::kMissing || state == ThumbState::kOutdated;
+  }));
+}
+
+int PhotoThumbStates::Present() const {
+  return static_cast<int>(std::count(states.begin(), states.end(), ThumbState::kPresent));
+}
+
+PhotoThumbStates ReadPhotoThumbStates(const char* path, int32_t sizeMap) {
+  PhotoThumbStates photo;
   if (IsFileExist(path) == 0) {
-    return;
+    return photo;
   }
   char eaDir[kPathBufferSize] = "";
   if (VELAEADirPath(0, path, eaDir, sizeof eaDir) != 0) {
-    syslog(LOG_ERR, "%s:%d [Error] get eadir: %s", kLogSource, 89, path);
-    return;
+    syslog(LOG_ERR, "%s:%d [Error] get eadir: %s", kStatusLogSource, 89, path);
+    return photo;
   }
   if (!ResolveSizeMap(path, sizeMap)) {
-    return;
+    return photo;
   }
+  photo.isKnown = true;
   PhotoThumbs thumbs(path, eaDir);
   for (const EAThumbInfo& row : rgEAThumbInfo) {
     if (IsThumbInSizeMap(row.name, sizeMap) != 0) {
-      ++*(thumbs.IsPresent(row) ? presentOut : missingOut);
+      photo.states[static_cast<size_t>(row.size)] = thumbs.StateOf(row);
     }
   }
+  return photo;
+}
+
+void GetThumbStatus(const char* path, int* missingOut, int* presentOut, int32_t sizeMap) {
+  const PhotoThumbStates photo = ReadPhotoThumbStates(path, sizeMap);
+  *missingOut = photo.Missing();
+  *presentOut = photo.Present();
 }

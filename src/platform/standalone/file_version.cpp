@@ -1,0 +1,32 @@
+#include "platform/standalone/file_version.h"
+
+#include <cstdint>
+#include <ctime>
+
+#include "platform/standalone/file_lock.h"
+
+namespace velaplatform {
+
+namespace {
+
+bool IsSameTime(const timespec& a, const timespec& b) {
+  return a.tv_sec == b.tv_sec && a.tv_nsec == b.tv_nsec;
+}
+
+}  // namespace
+
+bool IsSameVersion(const struct stat& a, const struct stat& b) {
+  return IsSameFile(a, b) && a.st_size == b.st_size && IsSameTime(a.st_mtim, b.st_mtim) &&
+         IsSameTime(a.st_ctim, b.st_ctim);
+}
+
+bool IsAtRest(const struct stat& file) {
+  timespec now;
+  if (clock_gettime(CLOCK_REALTIME_COARSE, &now) != 0) return false;
+  constexpr int64_t kRestMilliseconds = 100;
+  const int64_t age =
+      (now.tv_sec - file.st_ctim.tv_sec) * 1000 + (now.tv_nsec - file.st_ctim.tv_nsec) / 1000000;
+  return age > kRestMilliseconds;
+}
+
+}  // namespace velaplatform

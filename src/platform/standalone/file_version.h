@@ -1,0 +1,16 @@
+// Whether a file is still as it was when it was read.
+#pragma once
+
+#include <sys/stat.h>
+
+namespace velaplatform {
+
+/// Returns whether both records describe the same file in the same state.
+bool IsSameVersion(const struct stat& a, const struct stat& b);
+
+/// Returns whether the file has not changed for a while. Times of files advance in steps of a timer
+/// tick, so a change within the same tick could not be told: only a file at rest is known by its
+/// times.
+bool IsAtRest(const struct stat& file);
+
+}  // namespace velaplatform

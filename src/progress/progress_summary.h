@@ -1,0 +1,33 @@
+// The counters of conversion progress, together.
+#pragma once
+
+#include <string>
+#include <vector>
+
+/// Returns the path of the progress file of a media kind (a THUMB_TYPE), null for an unknown one.
+const char* ConvProgressFile(int kind);
+
+/// How far one kind of work has come.
+struct ProgressCount {
+  int total;
+  int completed;
+
+  /// Returns completed divided by total, from 0 to 1 unless the counters disagree; 0 without a
+  /// total.
+  float Ratio() const {
+    return total == 0 ? 0.0F : static_cast<float>(completed) / static_cast<float>(total);
+  }
+};
+
+/// All counters.
+struct ProgressSummary {
+  ProgressCount photo;
+  ProgressCount thumb;
+  ProgressCount video;
+};
+
+/// Reads the counters; what is missing or no number counts as 0.
+ProgressSummary ReadProgressSummary();
+
+/// Returns the summary as lines of text, a heading first.
+std::vector<std::string> FormatProgressSummary(const ProgressSummary& summary);

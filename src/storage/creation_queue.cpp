@@ -1,0 +1,79 @@
+#include "storage/creation_queue.h"
+
+#include <unistd.h>
+
+#include <cstdio>
+#include <cstdlib>
+#include <cstring>
+#include <memory>
+
+#include "platform/vlibc.h"
+#include "thumb/cut_text.h"
+
+namespace {
+
+/// What the callers of the line search have always passed as its flags.
+constexpr int kLineSearchFlags = 1028;
+
+struct StreamCloser {
+  void operator()(std::FILE* stream) const { std::fclose(stream); }
+};
+
+/// The lines of a file, one at a time, of any length.
+class LineReader {
+ public:
+  explicit LineReader(const char* file) : stream_(std::fopen(file, "re")) {}
+  ~LineReader() { std::free(line_); }
+  LineReader(const LineReader&) = delete;
+  LineReader& operator=(const LineReader&) = delete;
+
+  bool IsOpen() const { return stream_ != nullptr; }
+
+  /// Reads the next line, its newline included. Returns false at the end.
+  bool Next() {
+    length_ = getline(&line_, &capacity_, stream_.get());
+    return length_ >= 0;
+  }
+
+  size_t Length() const { return static_cast<size_t>(length_); }
+
+  std::string WithoutNewline() const {
+    const bool hasNewline = length_ > 0 && line_[length_ - 1] == '\n';
+    return std::string(line_, Length() - (hasNewline ? 1 : 0));
+  }
+
+ private:
+  std::unique_ptr<std::FILE, StreamCloser> stream_;
+  char* line_ = nullptr;
+  size_t capacity_ = 0;
+  ssize_t length_ = 0;
+};
+
+}  // namespace
+
+bool HasQueueLine(const char* queueFile, const char* text) {
+  char line[kPathBufferSize] = "";
+  const int length = VLIBCFileGetLine(queueFile, text, line, sizeof line, kLineSearchFlags);
+  return length > 0 && static_cast<size_t>(length) == std::strlen(text);
+}
+
+bool IsQueued(const CreationQueue& queue, const char* path) {
+  if (HasQueueLine(queue.tempFile, path)) {
+    return true;
+  }
+  return access(queue.file, R_OK) == 0 && HasQueueLine(queue.file, path);
+}
+
+bool ForEachQueueEntry(const char* queueFile,
+                       const std::function<void(const std::string&)>& visit) {
+  LineReader lines(queueFile);
+  if (!lines.IsOpen()) {
+    return false;
+  }
+  while (lines.Next()) {
+    if (lines.Length() < kPathBufferSize) {
+      visit(lines.WithoutNewline());
+    }
+  }
+  return true;
+}

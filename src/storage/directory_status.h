@@ -1,0 +1,15 @@
+// The photos of one directory and how their thumbnails are.
+#pragma once
+
+#include <functional>
+#include <string>
+
+#include "storage/photo_thumb_states.h"
+
+/// Takes the path of a photo and the states of its thumbnails.
+using PhotoStatusVisitor = std::function<void(const std::string&, const PhotoThumbStates&)>;
+
+/// Calls `visit` for each photo of the directory `dir`, subdirectories not entered, in the order in
+/// which the system lists them. Returns false when `dir` is no directory or cannot be opened; the
+/// latter is logged.
+bool ForEachPhotoStatus(const char* dir, const PhotoStatusVisitor& visit);

@@ -1,0 +1,13 @@
+// The directories of a tree that are indexed.
+#pragma once
+
+#include <functional>
+
+/// Takes the path of a directory, and false when it cannot be opened.
+using DirectoryVisitor = std::function<void(const char* path, bool isReadable)>;
+
+/// Calls `visit` for the directory `root` and every directory below it on the same file system
+/// whose name is to be indexed, a directory before its subdirectories; links are followed, each
+/// directory is visited once. Returns 0, or -1 (errno tells why) when the walk came to an early
+/// end. One walk at a time in a thread.
+int ForEachIndexedDirectory(const char* root, const DirectoryVisitor& visit);

@@ -1,0 +1,23 @@
+#include "storage/fail_marker.h"
+
+#include <sys/stat.h>
+
+#include "platform/velaindex.h"
+#include "thumb/cut_text.h"
+
+std::string FailMarkerPath(const std::string& thumbPath) {
+  const std::size_t dot = thumbPath.rfind('.');
+  return dot == std::string::npos ? std::string() : thumbPath.substr(0, dot) + ".fail";
+}
+
+std::optional<time_t> FindFailMarker(const char* path, const EAThumbInfo& row) {
+  const std::string name = FailMarkerPath(row.name);
+  const std::string oldName = FailMarkerPath(row.oldName);
+  char marker[kPathBufferSize] = "";
+  struct stat status = {};
+  if (GetEAFilePath(path, name.c_str(), oldName.c_str(), marker, sizeof marker) != 0 ||
+      stat(marker, &status) != 0) {
+    return std::nullopt;
+  }
+  return status.st_mtime;
+}

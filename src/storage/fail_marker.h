@@ -1,0 +1,16 @@
+// The empty file that stands for a thumbnail that could not be made.
+#pragma once
+
+#include <ctime>
+#include <optional>
+#include <string>
+
+#include "storage/thumb_size_class.h"
+
+/// Returns the path of the failure marker of the thumbnail `thumbPath`: its extension replaced.
+/// Empty for a path without an extension.
+std::string FailMarkerPath(const std::string& thumbPath);
+
+/// Returns when the failure marker of the size class `row` of the photo `path` was left (seconds
+/// since the epoch), nothing when there is none under either name.
+std::optional<time_t> FindFailMarker(const char* path, const EAThumbInfo& row);

@@ -1,0 +1,29 @@
+// How the thumbnails of one photo are, size class by size class.
+#pragma once
+
+#include <array>
+#include <cstdint>
+
+#include "storage/thumb_size_class.h"
+
+enum class ThumbState {
+  kNotWanted,  ///< the size map does not ask for it, or the photo could not be looked up
+  kPresent,
+  kMissing,   ///< there is no such file
+  kOutdated,  ///< older than the photo, or empty
+};
+
+/// The states of a photo's thumbnails by size class.
+struct PhotoThumbStates {
+  bool isKnown = false;  ///< false when the photo does not exist or could not be looked up
+  std::array<ThumbState, kEAThumbCount> states = {};
+
+  /// Returns how many thumbnails are missing or outdated.
+  int Missing() const;
+  /// Returns how many are present and up to date.
+  int Present() const;
+};
+
+/// Looks at the thumbnails of the photo `path` that `sizeMap` asks for (-1: ask the index library).
+/// A photo that cannot be looked up is logged.
+PhotoThumbStates ReadPhotoThumbStates(const char* path, int32_t sizeMap);

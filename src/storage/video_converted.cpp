@@ -1,0 +1,141 @@
+// Whether a video has the films that it needs.
+#include <syslog.h>
+
+#include <initializer_list>
+#include <string>
+
+#include "ipc/velamk_ipc.h"
+#include "platform/velaindex.h"
+#include "platform/vlibc.h"
+#include "storage/film_names.h"
+#include "storage/log_source.h"
+#include "storage/metadata_dir.h"
+#include "storage/velamk_util.h"
+
+namespace {
+
+constexpr int64_t kSmallestFilm = 2;
+/// Films made of a video of this many bits per second or more lose too much.
+constexpr uint32_t kHighBitrate = 4500000;
+
+bool IsFilmPresent(const std::string& eaDir, const FilmName& film) {
+  int64_t size = 0;
+  return IsEAFileExist(eaDir.c_str(), &size, film.name, film.oldName) != nullptr &&
+         size >= kSmallestFilm;
+}
+
+enum class FilmQuality { kGood, kPoor, kUnknown };
+
+/// Judges the H.264 and iPhone films of a video by its own record; a failed lookup is logged with
+/// the caller's `line`.
+FilmQuality JudgeFilm(const char* path, int line) {
+  VELA_MEDIA_INFO media = {};
+  if (GetMediaFromPluginDB(THUMB_TYPE_PHOTO, path, media) < 0) {
+    syslog(LOG_ERR, "%s:%d fail to get media from plugin db: %s", kMetadataLogSource, line, path);
+    return FilmQuality::kUnknown;
+  }
+  return media.bitrate < kHighBitrate ? FilmQuality::kGood : FilmQuality::kPoor;
+}
+
+/// Tells whether the film of a rotated video stands as the video does; one that does not is
+/// removed, so that it is made again.
+bool KeepMatchingFilm(const char* path, const FilmName& film) {
+  if (IsEAFileExist2(path, film.name, film.oldName) <= 0) {
+    return false;
+  }
+  if (IsEAFileOrientationMatched(path, film.name, film.oldName) == 1) {
+    return true;
+  }
+  RemoveEAFile2(path, film.name, film.oldName);
+  return false;
+}
+
+/// Judges a rotated video, for which `fallback` counts beside the films made in its orientation.
+bool IsRotatedVideoConverted(const char* path, const FilmName& fallback) {
+  if (HasConvertedFilm(path) != 0 && HasMatchedConvertedFilm(path) != 0) {
+    return true;
+  }
+  return KeepMatchingFilm(path, fallback);
+}
+
+bool IsUprightVideoOnWeb(const char* path, const std::string& eaDir) {
+  for (const FilmName& film :
+       {kHighFilm, kMediumFilm, kLowFilm, kMobileFilm, kIphoneFilm, kFlashFilm}) {
+    if (IsFilmPresent(eaDir, film)) {
+      return true;
+    }
+  }
+  return IsFilmPresent(eaDir, kH264Film) && JudgeFilm(path, 243) == FilmQuality::kGood;
+}
+
+/// Tells whether the H.264 film or the iPhone film of a video serves mobile devices.
+bool HasGoodPhoneFilm(const char* path, const std::string& eaDir) {
+  if (IsFilmPresent(eaDir, kH264Film)) {
+    const FilmQuality quality = JudgeFilm(path, 344);
+    // Without a record the iPhone film is not looked at either.
+    if (quality != FilmQuality::kPoor) {
+      return quality == FilmQuality::kGood;
+    }
+  }
+  return IsFilmPresent(eaDir, kIphoneFilm) && JudgeFilm(path, 357) == FilmQuality::kGood;
+}
+
+bool IsUprightVideoOnMobile(const char* path, const std::string& eaDir) {
+  return HasConvertedFilm(path) != 0 || HasGoodPhoneFilm(path, eaDir) ||
+         IsFilmPresent(eaDir, kMpeg4Film) || IsFilmPresent(eaDir, kConvertedMpeg4Film);
+}
+
+/// The lines with which a check logs a null path and a video without a metadata directory.
+struct CheckLines {
+  int badParameters;
+  int noMetadataDir;
+};
+
+/// Returns false, logged, when `path` is null or has no metadata directory.
+bool BeginCheck(const char* path, const CheckLines& lines, std::string& eaDir) {
+  if (path == nullptr) {
+    syslog(LOG_ERR, "%s:%d Bad parameters.", kMetadataLogSource, lines.badParameters);
+    return false;
+  }
+  return FindMetadataDir(path, lines.noMetadataDir, eaDir);
+}
+
+bool AreMobileFilmsWanted() {
+  return VLIBCFileCheckKeyValue("/etc/velainfo.conf", "enable_mobile_video", "yes", 0) != 0;
+}
+
+}  // namespace
+
+int IsWebVideoConverted(const char* path) {
+  std::string eaDir;
+  if (!BeginCheck(path, {460, 465}, eaDir)) {
+    return -1;
+  }
+  const bool isConverted = IsVideoRotated(path) != 0 ? IsRotatedVideoConverted(path, kFlashFilm)
+                                                     : IsUprightVideoOnWeb(path, eaDir);
+  return isConverted ? 1 : 0;
+}
+
+int IsMobileVideoConverted(const char* path) {
+  std::string eaDir;
+  if (!BeginCheck(path, {408, 413}, eaDir)) {
+    return -1;
+  }
+  const bool isConverted = IsVideoRotated(path) != 0
+                               ? IsRotatedVideoConverted(path, kConvertedMpeg4Film)
+                               : IsUprightVideoOnMobile(path, eaDir);
+  return isConverted ? 1 : 0;
+}
+
+int IsVideoConverted(const char* path) {
+  if (path == nullptr) {
+    syslog(LOG_ERR, "%s:%d Bad parameters.", kMetadataLogSource, 509);
+    return -1;
+  }
+  const bool mobileFilmsWanted = AreMobileFilmsWanted();
+  if (IsWebVideoConverted(path) == 0) {
+    return 0;
+  }
+  // A check that ends in an error counts as converted: nothing could be done about that video.
+  return !mobileFilmsWanted || IsMobileVideoConverted(path) != 0 ? 1 : 0;
+}

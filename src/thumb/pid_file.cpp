@@ -1,0 +1,15 @@
+#include "thumb/pid_file.h"
+
+#include <cstdlib>
+#include <cstring>
+#include <string>
+
+#include "thumb/cut_text.h"
+
+long PidOfFile(const char* path) {
+  std::string copy = CutText(path, kPidPathBufferSize);
+  char* rest = nullptr;
+  strtok_r(copy.data(), ".", &rest);
+  const char* number = strtok_r(nullptr, ".", &rest);
+  return number == nullptr ? 0 : std::strtol(number, nullptr, 10);
+}

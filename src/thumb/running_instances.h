@@ -1,0 +1,9 @@
+// Which instances are at work.
+#pragma once
+
+#include <sys/types.h>
+
+#include <vector>
+
+/// Returns the process ids of the velathumb processes that are running, by their pid files.
+std::vector<pid_t> RunningInstances();

@@ -1,0 +1,302 @@
+// Searching a large file for many lines: it is read once, and never taken for what it was before.
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <chrono>
+#include <cstdio>
+#include <string>
+#include <thread>
+#include <vector>
+
+#include "platform/forked_call.h"
+#include "platform/vlibc.h"
+#include "support/descriptor.h"
+#include "support/files.h"
+#include "support/privileges.h"
+#include "support/sandbox.h"
+
+namespace {
+
+using vela_test::AppendToFile;
+using vela_test::WriteFile;
+
+constexpr const char* kFile = "/var/spool/queue";
+
+int Find(const std::string& text, const std::string& file = kFile) {
+  return VLIBCFileGetLine(file.c_str(), text.c_str(), nullptr, 0, 1028);
+}
+
+bool Has(const std::string& text, const std::string& file = kFile) {
+  const int result = Find(text, file);
+  EXPECT_TRUE(result == 0 || result == static_cast<int>(text.size())) << text << ": " << result;
+  return result > 0;
+}
+
+std::string Line(int number) {
+  char line[32];
+  std::snprintf(line, sizeof(line), "/photo/%08d", number);
+  return line;
+}
+
+/// The text of a file of numbered lines.
+std::string Lines(int count) {
+  std::string content;
+  for (int i = 0; i < count; ++i) content += Line(i) + "\n";
+  return content;
+}
+
+/// Bytes that this process has read from files so far.
+long long BytesRead() {
+  long long bytes = -1;
+  std::sscanf(vela_test::ReadFile("/proc/self/io").c_str(), "rchar: %lld", &bytes);
+  return bytes;
+}
+
+/// Lets the file become old enough to be known again by its times.
+void Rest() {
+  std::this_thread::sleep_for(std::chrono::milliseconds(200));
+}
+
+void ChangeInPlace(off_t offset, const std::string& bytes) {
+  const vela_test::Descriptor file(open(kFile, O_WRONLY | O_CLOEXEC));
+  ASSERT_EQ(pwrite(file.Get(), bytes.data(), bytes.size(), offset),
+            static_cast<ssize_t>(bytes.size()));
+}
+
+constexpr int kLineCount = 20000;
+constexpr int kLineSize = 16;  // "/photo/00000000" and the newline
+
+/// A file that is large and at rest and has been searched already.
+class LargeFile : public vela_test::SandboxTest {
+ protected:
+  void SetUp() override {
+    SandboxTest::SetUp();
+    WriteFile(kFile, Lines(kLineCount));
+    Rest();
+    ASSERT_TRUE(Has(Line(0)));
+    ASSERT_FALSE(Has(Line(kLineCount)));
+  }
+};
+
+TEST_F(LargeFile, IsReadOnceForManySearches) {
+  WriteFile(kFile, Lines(kLineCount));
+  Rest();
+  const long long before = BytesRead();
+  for (int i = 0; i < kLineCount; i += 20) {
+    ASSERT_TRUE(Has(Line(i)));
+    ASSERT_FALSE(Has(Line(i) + "x"));
+    ASSERT_FALSE(Has(Line(i + kLineCount)));
+  }
+  const long long size = static_cast<long long>(kLineCount) * kLineSize;
+  EXPECT_LT(BytesRead() - before, 2 * size);
+}
+
+TEST_F(LargeFile, FindsWholeLinesOnly) {
+  EXPECT_TRUE(Has("/photo/00000000"));
+  EXPECT_TRUE(Has("/photo/00019999"));
+  EXPECT_FALSE(Has("/photo/0000000"));
+  EXPECT_FALSE(Has("photo/00000000"));
+  EXPECT_FALSE(Has("/photo/000000000"));
+  EXPECT_FALSE(Has("/photo/00000000\n"));
+  EXPECT_FALSE(Has("/photo/00000000\n/photo/00000001"));
+  EXPECT_FALSE(Has("/PHOTO/00000000"));
+  EXPECT_EQ(Find(""), 0);
+}
+
+TEST_F(LargeFile, CopiesTheLineAndReturnsItsLength) {
+  char out[8] = "xxxxxxx";
+  EXPECT_EQ(VLIBCFileGetLine(kFile, "/photo/00000001", out, sizeof(out), 0), 15);
+  EXPECT_STREQ(out, "/photo/");
+  EXPECT_EQ(VLIBCFileGetLine(kFile, "/photo/x", out, sizeof(out), 0), 0);
+  EXPECT_STREQ(out, "");
+}
+
+TEST_F(LargeFile, FindsALastLineWithoutNewline) {
+  AppendToFile(kFile, "last");
+  Rest();
+  EXPECT_TRUE(Has("last"));
+  EXPECT_TRUE(Has("last"));
+  EXPECT_FALSE(Has("las"));
+  EXPECT_FALSE(Has("lastx"));
+}
+
+TEST_F(LargeFile, FindsLinesOfAllLengthsAndBytes) {
+  std::string content = Lines(kLineCount) + "\n\nwith\r\n" + std::string("n\0l\n", 4);
+  std::vector<std::string> lines = {"/p/\xff\xfe \r\t%s\x01"};
+  for (const size_t length : {1U, 4095U, 4096U, 65535U, 65536U, 65537U, 131072U, 200000U}) {
+    lines.push_back(std::string(length, 'x') + "1");
+  }
+  for (const std::string& line : lines) content += line + "\n";
+  WriteFile(kFile, content);
+  Rest();
+  for (int round = 0; round < 2; ++round) {
+    for (const std::string& line : lines) {
+      EXPECT_TRUE(Has(line)) << line.size();
+      EXPECT_FALSE(Has(line + "1")) << line.size();
+      EXPECT_FALSE(Has(line.substr(0, line.size() - 1))) << line.size();
+    }
+    EXPECT_TRUE(Has("with\r"));
+    EXPECT_FALSE(Has("with"));
+    EXPECT_FALSE(Has("n"));
+    EXPECT_EQ(Find(""), 0);
+  }
+}
+
+TEST_F(LargeFile, ShowsAnAppendedLineAtOnce) {
+  AppendToFile(kFile, "/photo/new\n");
+  EXPECT_TRUE(Has("/photo/new"));
+  EXPECT_TRUE(Has(Line(0)));
+}
+
+TEST_F(LargeFile, ShowsAChangeOfTheSameSizeAtOnce) {
+  ChangeInPlace(5 * kLineSize, "/photo/changed!");
+  EXPECT_TRUE(Has("/photo/changed!"));
+  EXPECT_FALSE(Has(Line(5)));
+  EXPECT_TRUE(Has(Line(6)));
+}
+
+TEST_F(LargeFile, ShowsAChangeWhoseTimeWasSetBack) {
+  const vela_test::FileTime time = vela_test::ModificationTime(kFile);
+  ChangeInPlace(5 * kLineSize, "/photo/changed!");
+  vela_test::SetFileTime(kFile, time.seconds, time.nanoseconds);
+  ASSERT_EQ(vela_test::ModificationTime(kFile), time);
+  EXPECT_TRUE(Has("/photo/changed!"));
+  EXPECT_FALSE(Has(Line(5)));
+}
+
+TEST_F(LargeFile, ShowsEveryOneOfManyQuickChanges) {
+  for (int i = 0; i < 50; ++i) {
+    const std::string line = "/photo/turn" + std::to_string(1000 + i);
+    ChangeInPlace(5 * kLineSize, line);
+    ASSERT_TRUE(Has(line));
+    ASSERT_FALSE(Has("/photo/turn" + std::to_string(999 + i)));
+  }
+}
+
+TEST_F(LargeFile, ShowsTheFileThatHasTakenItsPlace) {
+  std::string content = Lines(kLineCount);
+  content.replace(0, 15, "/photo/replaced");
+  WriteFile("/var/spool/replacement", content);
+  const vela_test::FileTime time = vela_test::ModificationTime(kFile);
+  vela_test::SetFileTime("/var/spool/replacement", time.seconds, time.nanoseconds);
+  ASSERT_EQ(rename("/var/spool/replacement", kFile), 0);
+  EXPECT_TRUE(Has("/photo/replaced"));
+  EXPECT_FALSE(Has(Line(0)));
+}
+
+TEST_F(LargeFile, ShowsWhatIsLeftOfACutOne) {
+  ASSERT_EQ(truncate(kFile, (kLineCount - 1) * kLineSize), 0);
+  EXPECT_FALSE(Has(Line(kLineCount - 1)));
+  ASSERT_EQ(truncate(kFile, kLineSize), 0);
+  EXPECT_TRUE(Has(Line(0)));
+  EXPECT_FALSE(Has(Line(1)));
+  ASSERT_EQ(truncate(kFile, 0), 0);
+  EXPECT_FALSE(Has(Line(0)));
+}
+
+TEST_F(LargeFile, IsGoneOnceItIsRemoved) {
+  ASSERT_EQ(unlink(kFile), 0);
+  EXPECT_EQ(Find(Line(0)), -1);
+  EXPECT_EQ(VLIBCErrGet(), ENOENT);
+  WriteFile(kFile, "/other\n");
+  EXPECT_FALSE(Has(Line(0)));
+}
+
+TEST_F(LargeFile, CannotBeSearchedAnyMoreOnceItMayNotBeRead) {
+  ASSERT_EQ(chmod(kFile, 0), 0);
+  const vela_test::WithoutCapabilities ordinary;
+  EXPECT_EQ(Find(Line(0)), -1);
+  EXPECT_EQ(VLIBCErrGet(), EACCES);
+  EXPECT_EQ(Find("/nowhere"), -1);
+}
+
+TEST_F(LargeFile, IsOneOfMany) {
+  std::vector<std::string> files;
+  for (int i = 0; i < 9; ++i) {
+    files.push_back(std::string(kFile) + std::to_string(i));
+    WriteFile(files.back(), Lines(5000) + "/only/in/" + std::to_string(i) + "\n");
+  }
+  Rest();
+  for (int round = 0; round < 3; ++round) {
+    for (int i = 0; i < 9; ++i) {
+      for (int line = 0; line < 9; ++line) {
+        EXPECT_EQ(Has("/only/in/" + std::to_string(line), files[i]), i == line);
+      }
+    }
+  }
+}
+
+TEST_F(LargeFile, MayBeSearchedFromSeveralThreadsWhileItChanges) {
+  constexpr int kThreads = 4;
+  std::vector<int> misses(kThreads, 0);
+  std::vector<std::thread> threads;
+  threads.reserve(kThreads);
+  for (int thread = 0; thread < kThreads; ++thread) {
+    threads.emplace_back([thread, &misses] {
+      for (int i = 0; i < 300; ++i) {
+        // Line 5 changes, all others stay.
+        if (Find(Line(10 + i)) != 15 || Find("/nowhere") != 0) ++misses[thread];
+      }
+    });
+  }
+  for (int i = 0; i < 5; ++i) {
+    ChangeInPlace(5 * kLineSize, "/photo/change" + std::to_string(10 + i));
+    std::this_thread::sleep_for(std::chrono::milliseconds(30));
+  }
+  for (std::thread& thread : threads) thread.join();
+  EXPECT_EQ(misses, std::vector<int>(kThreads, 0));
+}
+
+TEST_F(LargeFile, LeavesNoDescriptorOpen) {
+  const int before = platform_test::CountDescriptors();
+  for (int i = 0; i < 10; ++i) {
+    Has(Line(i));
+    Has("/nowhere");
+    AppendToFile(kFile, "x\n");
+    Has(Line(i));
+  }
+  EXPECT_EQ(platform_test::CountDescriptors(), before);
+}
+
+class SearchedFile : public vela_test::SandboxTest {};
+
+TEST_F(SearchedFile, IsSearchedRightAtEverySizeAroundTheOneWhereItCountsAsLarge) {
+  for (const int size : {65535, 65536, 65537, 131072}) {
+    std::string content = Lines(size / kLineSize + 1);
+    content.resize(static_cast<size_t>(size) - 4);
+    WriteFile(kFile, content + "\nend");
+    for (int round = 0; round < 2; ++round) {
+      EXPECT_TRUE(Has("end")) << size;
+      EXPECT_TRUE(Has(Line(0))) << size;
+      EXPECT_FALSE(Has("en")) << size;
+      Rest();
+    }
+  }
+}
+
+TEST_F(SearchedFile, MayHaveMoreLinesThanAreWorthRemembering) {
+  std::string content((size_t{8} << 20) + 10, '\n');
+  content.replace(0, 6, "first\n");
+  WriteFile(kFile, content + "/last\n");
+  Rest();
+  for (int round = 0; round < 2; ++round) {
+    EXPECT_TRUE(Has("first"));
+    EXPECT_TRUE(Has("/last"));
+    EXPECT_FALSE(Has("/las"));
+  }
+}
+
+TEST_F(SearchedFile, IsNotTakenForOneOfAnotherNameWithTheSameContent) {
+  WriteFile(kFile, Lines(kLineCount));
+  Rest();
+  ASSERT_TRUE(Has(Line(0)));
+  ASSERT_EQ(link(kFile, "/var/spool/second"), 0);
+  EXPECT_TRUE(Has(Line(0), "/var/spool/second"));
+  ASSERT_EQ(unlink(kFile), 0);
+  EXPECT_EQ(Find(Line(0)), -1);
+  EXPECT_TRUE(Has(Line(1), "/var/spool/second"));
+}
+
+}  // namespace

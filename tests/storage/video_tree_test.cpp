@@ -1,0 +1,279 @@
+// The videos of a tree that need work and do not wait in the video queue.
+#include <dirent.h>
+#include <gmock/gmock.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <string>
+#include <vector>
+
+#include "storage/deep_files.h"
+#include "storage/photo_tree.h"
+#include "storage/velamk_thumb_status.h"
+#include "support/descriptor.h"
+#include "support/files.h"
+#include "support/mounts.h"
+#include "support/privileges.h"
+#include "support/sandbox.h"
+#include "support/system_log.h"
+
+namespace vela_test {
+namespace {
+
+using ::testing::ElementsAre;
+using ::testing::IsEmpty;
+using ::testing::SizeIs;
+
+constexpr const char* kTop = "/tmp/films";
+constexpr const char* kQueue = "/var/spool/flv_create.queue";
+constexpr const char* kQueueInWork = "/var/spool/flv_create.queue.tmp";
+
+std::string In(const std::string& name) {
+  return std::string(kTop) + "/" + name;
+}
+
+/// Makes a video that needs work: it has no thumbnails.
+void MakeVideo(const std::string& path) {
+  WriteFile(path, "video");
+}
+
+int Count(const std::string& dir = kTop) {
+  return CountVideoWork(dir.c_str());
+}
+
+/// The names in a directory in the order in which the system lists them.
+std::vector<std::string> Listing(const std::string& dir) {
+  std::vector<std::string> names;
+  const DirectoryStream stream(opendir(dir.c_str()));
+  while (const dirent* entry = readdir(stream.get())) {
+    if (entry->d_name[0] != '.') {
+      names.emplace_back(entry->d_name);
+    }
+  }
+  return names;
+}
+
+/// The path of the regular file that the system lists first in a directory.
+std::string FirstVideoIn(const std::string& dir) {
+  for (const std::string& name : Listing(dir)) {
+    if (IsRegularFile(dir + "/" + name)) {
+      return dir + "/" + name;
+    }
+  }
+  ADD_FAILURE() << "no file in " << dir;
+  return "";
+}
+
+class VideoTree : public SandboxTest {
+ protected:
+  void SetUp() override {
+    SandboxTest::SetUp();
+    MakeDirectories(kTop);
+  }
+};
+
+TEST_F(VideoTree, CountsAllDirectories) {
+  for (const char* name : {"a.mp4", "B.AVI", "x/a.mp4", "x/y/a.mkv", "z/a.mp4"}) {
+    MakeVideo(In(name));
+  }
+  EXPECT_EQ(Count(), 5);
+  EXPECT_THAT(ErrorLines(), IsEmpty());
+}
+
+TEST_F(VideoTree, OnlyVideosThatNeedWorkCount) {
+  WriteFile("/etc/velainfo.conf", "video_thumb_size_map=\"1\"\n");
+  for (const char* name : {"ready.mp4", "bare.mp4", "a.jpg", "a.txt", "mp4"}) {
+    MakeVideo(In(name));
+  }
+  // Text is no film that would have to be converted. Without a daemon every video counts as
+  // landscape, and so does a thumbnail that cannot be read.
+  SetFileTime(In("ready.mp4"), kMediaTime);
+  MakeThumbs(kTop, "ready.mp4", kBitS);
+  EXPECT_EQ(Count(), 1);
+  RemoveTree(In("bare.mp4"));
+  EXPECT_EQ(Count(), 0);
+}
+
+TEST_F(VideoTree, NamesThatAreNotIndexedDoNotCount) {
+  for (const char* name : {".a.mp4", "@a.mp4", "#a.mp4", ".x/a.mp4", "@eaDir/a.mp4",
+                           "#recycle/a.mp4", "lost+found/a.mp4"}) {
+    MakeVideo(In(name));
+  }
+  EXPECT_EQ(Count(), 0);
+  MakeVideo(In("lost/a#.mp4"));
+  EXPECT_EQ(Count(), 1);
+}
+
+TEST_F(VideoTree, TheTopIsReadWhateverItsName) {
+  MakeVideo("/tmp/@films/a.mp4");
+  EXPECT_EQ(Count("/tmp/@films"), 1);
+}
+
+TEST_F(VideoTree, ADirectoryCalledAsAVideoIsEntered) {
+  MakeVideo(In("film.mp4/a.mp4"));
+  EXPECT_EQ(Count(), 1);
+}
+
+TEST_F(VideoTree, WhatIsNoDirectoryIsLogged) {
+  MakeVideo("/tmp/a.mp4");
+  EXPECT_EQ(Count("/tmp/nowhere"), 0);
+  EXPECT_EQ(Count("/tmp/a.mp4"), 0);
+  EXPECT_THAT(ErrorLines(),
+              ElementsAre("velamk_thumb_status:332 [Error] dir doesn't exist: /tmp/nowhere",
+                          "velamk_thumb_status:332 [Error] dir doesn't exist: /tmp/a.mp4"));
+}
+
+TEST_F(VideoTree, ADirectoryThatCannotBeOpenedIsLoggedAndStopsNoOther) {
+  for (const char* name : {"a/1.mp4", "closed/1.mp4", "z/1.mp4"}) {
+    MakeVideo(In(name));
+  }
+  ASSERT_EQ(chmod(In("closed").c_str(), 0), 0);
+  const WithoutCapabilities ordinary;
+  EXPECT_EQ(Count(), 2);
+  EXPECT_EQ(Count(In("closed")), 0);
+  const std::string line = "velamk_thumb_status:338 [Error] opendir: /tmp/films/closed";
+  EXPECT_THAT(ErrorLines(), ElementsAre(line, line));
+}
+
+TEST_F(VideoTree, RemovesThumbsThatAreNoGood) {
+  MakeVideo(In("a.mp4"));
+  SetFileTime(In("a.mp4"), kMediaTime);
+  MakeThumbs(kTop, "a.mp4", 63, -1);
+  EXPECT_EQ(Count(), 1);
+  EXPECT_THAT(ListDirectory(In("@eaDir/a.mp4")), IsEmpty());
+}
+
+TEST_F(VideoTree, LinksAreFollowed) {
+  MakeVideo("/tmp/elsewhere/a.mp4");
+  ASSERT_EQ(symlink("/tmp/elsewhere", In("link").c_str()), 0);
+  ASSERT_EQ(symlink("/tmp/elsewhere/a.mp4", In("link.mp4").c_str()), 0);
+  ASSERT_EQ(symlink("/tmp/nowhere", In("dangling.mp4").c_str()), 0);
+  EXPECT_EQ(Count(), 2);
+}
+
+TEST_F(VideoTree, ADirectoryBesideALinkToItCountsUnderBothNames) {
+  MakeVideo(In("a/1.mp4"));
+  ASSERT_EQ(symlink("a", In("b").c_str()), 0);
+  EXPECT_EQ(Count(), 2);
+}
+
+TEST_F(VideoTree, OtherFileSystemsAreEntered) {
+  const SmallVolume volume(In("volume"), 1 << 20);
+  MakeVideo(In("volume/a.mp4"));
+  EXPECT_EQ(Count(), 1);
+}
+
+TEST_F(VideoTree, ALoopOfLinksEnds) {
+  MakeVideo(In("a/1.mp4"));
+  MakeVideo(In("a/b/1.mp4"));
+  ASSERT_EQ(symlink("/tmp/films", In("a/b/top").c_str()), 0);
+  ASSERT_EQ(symlink(".", In("a/here").c_str()), 0);
+  ASSERT_EQ(symlink("itself", In("a/itself").c_str()), 0);
+  EXPECT_EQ(Count(), 2);
+}
+
+TEST_F(VideoTree, ADeepTreeIsCountedToItsEnd) {
+  const DeepTree tree(kTop, "d", 500, "a.mp4");
+  EXPECT_EQ(Count(), 500);
+}
+
+TEST_F(VideoTree, NamesOfTheLongestKindAndOfAnyBytesCount) {
+  const std::string longest(255, 'n');
+  MakeVideo(In(longest) + "/" + std::string(251, 'n') + ".mp4");
+  MakeVideo(In("\xff\xfe %s\n:\"/\x01.mp4"));
+  EXPECT_EQ(Count(), 2);
+}
+
+TEST_F(VideoTree, AVideoWhosePathIsTooLongIsLoggedAndStopsNoOther) {
+  const std::string dir = DirectoryOfLength(4060);
+  MakeVideo(dir + "/b.mp4");   // 4066 bytes
+  MakeVideo(dir + "/ab.mp4");  // one more
+  EXPECT_EQ(Count(dir), 1);
+  EXPECT_THAT(ErrorLines(),
+              ElementsAre("velamk_thumb_status:295 [Error] path is too long and can't create "
+                          "thumbnail: " +
+                          dir + "/ab.mp4"));
+}
+
+TEST_F(VideoTree, ADirectoryThatLeavesNoRoomForNamesEndsTheWay) {
+  // Of 4094 bytes, so that every name behind it is cut away and leads back to the directory.
+  const std::string dir = DirectoryOfLength(4094);
+  const FileInDirectory a(dir, "a.mp4");
+  const FileInDirectory b(dir, "b.mp4");
+  EXPECT_EQ(Count(dir), 0);
+  EXPECT_THAT(ErrorLines(), IsEmpty());
+}
+
+class QueuedVideo : public VideoTree, public ::testing::WithParamInterface<const char*> {
+ protected:
+  void SetUp() override {
+    VideoTree::SetUp();
+    for (const char* name : {"a.mp4", "b.mp4", "c.mp4"}) {
+      MakeVideo(In(name));
+    }
+  }
+
+  static void Queue(const std::string& content) { WriteFile(GetParam(), content); }
+};
+
+TEST_P(QueuedVideo, VideosListedBehindAQueuedOneDoNotCount) {
+  const std::vector<std::string> names = Listing(kTop);
+  ASSERT_THAT(names, SizeIs(3));
+  for (int place = 0; place < 3; ++place) {
+    Queue("/other\n" + In(names[place]) + "\n/more\n");
+    EXPECT_EQ(Count(), place) << names[place];
+  }
+}
+
+TEST_P(QueuedVideo, AQueuedVideoDoesNotHideThoseOfOtherDirectories) {
+  for (const char* name : {"x/1.mp4", "x/2.mp4", "x/y/1.mp4", "z/1.mp4"}) {
+    MakeVideo(In(name));
+  }
+  Queue(FirstVideoIn(kTop) + "\n");
+  EXPECT_EQ(Count(), 4) << "those below";
+  Queue(FirstVideoIn(In("x")) + "\n");
+  EXPECT_EQ(Count(), 5) << "three at the top, one each in x/y and z";
+}
+
+TEST_P(QueuedVideo, OnlyTheWholePathCounts) {
+  Queue(
+      "/tmp/films/a.mp4x\n/tmp/films/b.mp\n /tmp/films/c.mp4\n/tmp/films/c.mp4 \nR:/tmp/films\n"
+      "R:/tmp/films/a.mp4\n/tmp/films\na.mp4\n");
+  EXPECT_EQ(Count(), 3);
+}
+
+TEST_P(QueuedVideo, TheLastLineNeedsNoNewline) {
+  Queue("/other\n" + FirstVideoIn(kTop));
+  EXPECT_EQ(Count(), 0);
+}
+
+TEST_P(QueuedVideo, AQueuedVideoThatNeedsNoWorkChangesNothing) {
+  WriteFile("/etc/velainfo.conf", "video_thumb_size_map=\"1\"\n");
+  const std::string first = FirstVideoIn(kTop);
+  SetFileTime(first, kMediaTime);
+  MakeThumbs(kTop, first.substr(first.rfind('/') + 1), kBitS);
+  Queue(first + "\n");
+  EXPECT_EQ(Count(), 2);
+}
+
+TEST_P(QueuedVideo, AnUnreadableQueueHoldsNothing) {
+  Queue(FirstVideoIn(kTop) + "\n");
+  ASSERT_EQ(chmod(GetParam(), 0), 0);
+  EXPECT_EQ(Count(), 0) << "as user 0, whom no permission bit stops";
+  const WithoutCapabilities ordinary;
+  EXPECT_EQ(Count(), 3);
+}
+
+TEST_P(QueuedVideo, ThePhotoQueueDoesNotMatter) {
+  WriteFile("/var/spool/thumb_create.queue", FirstVideoIn(kTop) + "\n/tmp/films\n");
+  WriteFile("/var/spool/thumb_create.queue.tmp", FirstVideoIn(kTop) + "\n");
+  EXPECT_EQ(Count(), 3);
+}
+
+INSTANTIATE_TEST_SUITE_P(Files, QueuedVideo, ::testing::Values(kQueue, kQueueInWork),
+                         [](const ::testing::TestParamInfo<const char*>& file) {
+                           return file.param == std::string(kQueue) ? "Main" : "InWork";
+                         });
+
+}  // namespace
+}  // namespace vela_test

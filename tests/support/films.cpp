@@ -1,0 +1,127 @@
+#include "support/films.h"
+
+#include <cstdint>
+#include <vector>
+
+#include "support/environment_failure.h"
+#include "support/files.h"
+#include "support/program.h"
+#include "support/quadrants.h"
+#include "support/sandbox.h"
+
+namespace vela_test {
+
+namespace {
+
+using Arguments = std::vector<std::string>;
+
+void Append(Arguments& arguments, const Arguments& more) {
+  arguments.insert(arguments.end(), more.begin(), more.end());
+}
+
+/// The best picture an encoder can give does not matter here, its time does.
+Arguments SpeedOf(const std::string& videoCodec) {
+  if (videoCodec == "libx264" || videoCodec == "libx265") return {"-preset", "ultrafast"};
+  if (videoCodec == "libaom-av1") return {"-usage", "realtime", "-cpu-used", "8"};
+  if (videoCodec.rfind("libvpx", 0) == 0) return {"-deadline", "realtime", "-cpu-used", "8"};
+  return {};
+}
+
+Arguments PictureInput(const FilmRecipe& recipe) {
+  const std::string size = std::to_string(recipe.width) + "x" + std::to_string(recipe.height);
+  return {"-f", "rawvideo", "-pixel_format", "rgb24", "-video_size", size, "-framerate",
+          "25", "-i",       "pipe:0"};
+}
+
+Arguments PictureOutput(const FilmRecipe& recipe) {
+  Arguments arguments = {
+      "-filter:v", "loop=loop=-1:size=1", "-codec:v", recipe.videoCodec, "-pix_fmt", "yuv420p"};
+  Append(arguments, SpeedOf(recipe.videoCodec));
+  return arguments;
+}
+
+Arguments FfmpegArguments(const std::string& path, const FilmRecipe& recipe) {
+  Arguments arguments = {"-v", "error", "-y"};
+  if (!recipe.videoCodec.empty()) Append(arguments, PictureInput(recipe));
+  if (!recipe.audioCodec.empty()) Append(arguments, {"-f", "lavfi", "-i", "sine=frequency=440"});
+  if (!recipe.videoCodec.empty()) Append(arguments, PictureOutput(recipe));
+  if (!recipe.audioCodec.empty()) Append(arguments, {"-codec:a", recipe.audioCodec});
+  if (recipe.headerFirst) Append(arguments, {"-movflags", "+faststart"});
+  if (!recipe.format.empty()) Append(arguments, {"-f", recipe.format});
+  // "file:" keeps a leading dash from being an option and a colon from being a protocol.
+  Append(arguments, {"-threads", "1", "-t", std::to_string(recipe.seconds), "file:" + path});
+  return arguments;
+}
+
+/// The four factors of the matrix that turns the picture: x' = a x + c y, y' = b x + d y, with y
+/// downwards.
+struct Turn {
+  int a;
+  int b;
+  int c;
+  int d;
+};
+
+Turn TurnBy(int rotation) {
+  switch (rotation) {
+    case 90:
+      return {0, 1, -1, 0};
+    case 180:
+      return {-1, 0, 0, -1};
+    case 270:
+      return {0, -1, 1, 0};
+    default:
+      EnvironmentFailure("no film is turned by " + std::to_string(rotation) + " degrees");
+  }
+}
+
+std::string BigEndian(uint32_t value) {
+  std::string bytes;
+  for (const int shift : {24, 16, 8, 0}) bytes += static_cast<char>(value >> shift & 0xff);
+  return bytes;
+}
+
+std::string FixedPoint(int value) {
+  return BigEndian(static_cast<uint32_t>(value) << 16);
+}
+
+/// Sets the matrix in the first track's header, which is the picture's: how ffmpeg is told about a
+/// rotation differs from one version to the next.
+void SetRotation(const std::string& path, int rotation) {
+  constexpr size_t kNameSize = 4;
+  constexpr size_t kMatrixOffset = 40;  // in a header of version 0
+  const Turn turn = TurnBy(rotation);
+  const std::string matrix = FixedPoint(turn.a) + FixedPoint(turn.b) + BigEndian(0) +
+                             FixedPoint(turn.c) + FixedPoint(turn.d) + BigEndian(0);
+  std::string film = ReadFile(path);
+  const size_t header = film.find("tkhd");
+  const size_t content = header + kNameSize;
+  if (header == std::string::npos || content + kMatrixOffset + matrix.size() > film.size() ||
+      film[content] != 0) {
+    EnvironmentFailure("cannot turn the film " + path);
+  }
+  film.replace(content + kMatrixOffset, matrix.size(), matrix);
+  WriteFile(path, film);
+}
+
+}  // namespace
+
+std::string MakeFilm(const std::string& path, const FilmRecipe& recipe) {
+  ProgramOptions options;
+  if (!recipe.videoCodec.empty()) options.input = QuadrantPixels(recipe.width, recipe.height);
+  const ProgramResult result =
+      RunProgram(HostPath("/usr/bin/ffmpeg"), FfmpegArguments(path, recipe), options);
+  if (result.exitCode != 0) {
+    EnvironmentFailure("cannot make the film " + path + ": " + result.err);
+  }
+  if (recipe.rotation != 0) SetRotation(path, recipe.rotation);
+  return path;
+}
+
+std::string MakeCutFilm(const std::string& path, size_t bytes, const FilmRecipe& recipe) {
+  MakeFilm(path, recipe);
+  WriteFile(path, ReadFile(path).substr(0, bytes));
+  return path;
+}
+
+}  // namespace vela_test
