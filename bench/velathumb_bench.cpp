@@ -3,6 +3,7 @@
 // Measures velathumb against the least that could do the same, each in the same run, and prints
 // the ratios. Works in a sandbox; the scratch directory (on a real disk) takes its files.
 
+#include <algorithm>
 #include <cstdio>
 #include <fstream>
 #include <string>
@@ -155,6 +156,45 @@ void MeasureMemory() {
   vela_test::RemoveTree(directory);
 }
 
+/// Makes a tree of directories whose photos are all up to date.
+void MakeTree(const std::string& root, int directories, int photos) {
+  for (int i = 0; i < directories; ++i) {
+    const std::string directory = root + "/" + std::to_string(i);
+    MakePhotoFiles(directory, photos);
+    MakeThumbFiles(directory, photos);
+  }
+}
+
+/// A queue of many directories, none of which is looked at.
+void WriteLongQueue(int lines) {
+  std::ofstream queue("/var/spool/thumb_create.queue");
+  for (int i = 0; i < lines; ++i) {
+    queue << "/volume1/photo/somewhere else/" << i << '\n';
+  }
+}
+
+/// The status of a large tree against a listing of the same files.
+void MeasureScan() {
+  constexpr int kDirectories = 1000;
+  constexpr int kPhotos = 100;
+  constexpr int kAll = kDirectories * kPhotos;
+  const std::string root = kScratch + "/tree";
+  MakeTree(root, kDirectories, kPhotos);
+  double peak = 0;
+  const auto runSubject = [&] {
+    return TimedRun({HostPath(VELATHUMB_STATUS), "--recursive", root},
+                    [&peak](int pid) { peak = std::max(peak, MemoryOf(pid).peak); });
+  };
+  const auto runFloor = [&] { return TimedRun({"/usr/bin/find", root, "-type", "f"}); };
+  const CostPair alone = FastestOf(3, runSubject, runFloor);
+  Report("status scan, a photo", alone.subject, alone.floor, kAll, "");
+  std::printf("%-34s %9.1f MiB\n", "peak memory of the scan", peak);
+  WriteLongQueue(1000000);
+  const CostPair queued = FastestOf(3, runSubject, runFloor);
+  Report("with 1,000,000 lines in the queue", queued.subject, queued.floor, kAll, "");
+  vela_test::RemoveTree(root);
+}
+
 }  // namespace
 
 }  // namespace vela_bench
@@ -170,6 +210,7 @@ int main(int argc, char** argv) {
   vela_bench::MeasureStart();
   vela_bench::MeasureNothingToDo();
   vela_bench::MeasureMemory();
+  vela_bench::MeasureScan();
   vela_bench::MeasureConversion();
   return 0;
 }

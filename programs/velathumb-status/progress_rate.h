@@ -1,0 +1,30 @@
+// How fast a counter advances.
+#pragma once
+
+#include <chrono>
+#include <deque>
+#include <optional>
+
+/// The rate of a counter over the last half minute.
+class ProgressRate {
+ public:
+  using Clock = std::chrono::steady_clock;
+
+  /// Notes that the counter stood at `completed` at `time`; times do not go back. A counter that
+  /// went back begins anew.
+  void Note(Clock::time_point time, int completed);
+
+  /// Returns the rate per second, nothing while it is not known.
+  std::optional<double> PerSecond() const;
+
+  /// Returns the time until the counter reaches `total`, nothing while that is not known.
+  std::optional<std::chrono::seconds> TimeLeft(int total) const;
+
+ private:
+  struct Sample {
+    Clock::time_point time;
+    int completed;
+  };
+
+  std::deque<Sample> samples_;
+};

@@ -1,0 +1,99 @@
+#include "progress_watch.h"
+
+#include <json/writer.h>
+#include <sys/ioctl.h>
+#include <unistd.h>
+
+#include <chrono>
+#include <ostream>
+#include <string>
+#include <thread>
+
+#include "json_report.h"
+#include "progress_bar.h"
+#include "progress_rate.h"
+#include "progress_report.h"
+
+namespace {
+
+constexpr std::chrono::milliseconds kInterval(500);
+constexpr int kUsualWidth = 80;
+
+int TerminalWidth() {
+  winsize size = {};
+  return ioctl(STDOUT_FILENO, TIOCGWINSZ, &size) == 0 && size.ws_col > 0 ? size.ws_col
+                                                                         : kUsualWidth;
+}
+
+/// Draws the line over the one before, which it can only while neither wraps.
+void DrawBar(std::ostream& out, const std::string& line, int width) {
+  out << '\r' << line.substr(0, static_cast<size_t>(width - 1)) << "\033[K" << std::flush;
+}
+
+Json::Value DescribeMoment(const ProgressState& state, const FollowedCount& followed,
+                           const ProgressRate& rate) {
+  Json::Value moment = DescribeProgress(state);
+  const auto perSecond = rate.PerSecond();
+  const auto left = rate.TimeLeft(followed.count.total);
+  moment["unit"] = followed.unit;
+  moment["rate"] = perSecond ? Json::Value(*perSecond) : Json::Value();
+  moment["seconds_left"] = left ? Json::Value(Json::Int64{left->count()}) : Json::Value();
+  return moment;
+}
+
+/// Shows one moment after the other.
+class ProgressView {
+ public:
+  ProgressView(std::ostream& out, bool isTerminal, bool asJson)
+      : out_(out), isTerminal_(isTerminal), asJson_(asJson) {}
+
+  void Show(const ProgressState& state) {
+    const FollowedCount followed = ChooseCount(state.summary);
+    rate_.Note(ProgressRate::Clock::now(), followed.count.completed);
+    if (!asJson_ && isTerminal_) {
+      const int width = TerminalWidth();
+      DrawBar(out_, FormatProgressBar(followed, rate_, width), width);
+      return;
+    }
+    std::string counts = ToJsonLine(DescribeProgress(state));
+    if (counts == lastCounts_) {
+      return;
+    }
+    lastCounts_ = std::move(counts);
+    out_ << (asJson_ ? ToJsonLine(DescribeMoment(state, followed, rate_))
+                     : FormatProgressBar(followed, rate_, kUsualWidth))
+         << std::endl;
+  }
+
+  void End(const ProgressState& state) {
+    if (asJson_) {
+      return;
+    }
+    if (isTerminal_) {
+      out_ << '\n';
+    }
+    WriteProgressText(out_, state);
+  }
+
+ private:
+  std::ostream& out_;
+  const bool isTerminal_;
+  const bool asJson_;
+  ProgressRate rate_;
+  std::string lastCounts_;
+};
+
+}  // namespace
+
+bool WatchProgress(std::ostream& out, bool isTerminal, bool asJson) {
+  ProgressView view(out, isTerminal, asJson);
+  ProgressState state = ReadProgressState();
+  view.Show(state);
+  while (!state.instances.empty() && out.good()) {
+    std::this_thread::sleep_for(kInterval);
+    state = ReadProgressState();
+    view.Show(state);
+  }
+  view.End(state);
+  return state.HasWork();
+}

@@ -1,0 +1,84 @@
+#include "queue_report.h"
+
+#include <cerrno>
+#include <cstring>
+#include <functional>
+#include <ostream>
+
+#include "platform/velaindex.h"
+#include "storage/creation_queue.h"
+#include "storage/velamk_thumb_status.h"
+#include "text_encoding.h"
+
+namespace {
+
+struct QueueFile {
+  const char* kind;
+  const char* path;
+  bool isVideo;
+};
+
+/// What is being worked off comes first.
+constexpr QueueFile kQueueFiles[] = {{"photo", kPhotoQueue.tempFile, false},
+                                     {"photo", kPhotoQueue.file, false},
+                                     {"video", kVideoQueue.tempFile, true},
+                                     {"video", kVideoQueue.file, true}};
+
+/// Calls `visit` with each entry of the file that is there. Returns their number.
+int64_t ReadQueue(const QueueFile& queue, const ScanErrorHandler& onError,
+                  const std::function<void(const std::string&)>& visit) {
+  int64_t count = 0;
+  const bool isRead = ForEachQueueEntry(queue.path, [&](const std::string& entry) {
+    if (!entry.empty()) {
+      ++count;
+      visit(entry);
+    }
+  });
+  if (!isRead && errno != ENOENT) {
+    onError(queue.path, std::strerror(errno));
+  }
+  return count;
+}
+
+}  // namespace
+
+bool WriteQueueText(std::ostream& out, const QueueQuestion& question,
+                    const ScanErrorHandler& onError) {
+  int64_t all = 0;
+  for (const QueueFile& queue : kQueueFiles) {
+    out << queue.kind << " queue " << queue.path << '\n';
+    const int64_t count = ReadQueue(queue, onError, [&out](const std::string& entry) {
+      out << "    " << ToPlainLine(entry) << '\n';
+    });
+    out << "    " << count << (count == 1 ? " entry" : " entries");
+    if (question.countVideoWork && queue.isVideo) {
+      out << ", videos that need work: " << CountVideoQueueWork(queue.path);
+    }
+    out << '\n';
+    all += count;
+  }
+  return all > 0;
+}
+
+bool WriteQueueJson(JsonReport& report, const QueueQuestion& question,
+                    const ScanErrorHandler& onError) {
+  int64_t all = 0;
+  report.BeginList("queues");
+  for (const QueueFile& queue : kQueueFiles) {
+    Json::Value object;
+    object["kind"] = queue.kind;
+    object["file"] = queue.path;
+    object["videos_needing_work"] = question.countVideoWork && queue.isVideo
+                                        ? Json::Value(CountVideoQueueWork(queue.path))
+                                        : Json::Value();
+    report.BeginElement(object, "entries");
+    all += ReadQueue(queue, onError, [&report](const std::string& entry) {
+      Json::Value line;
+      PutBytes(line, "path", entry);
+      report.InnerElement(line);
+    });
+    report.EndElement();
+  }
+  report.EndList();
+  return all > 0;
+}

@@ -1,0 +1,33 @@
+#include "size_class_text.h"
+
+#include <functional>
+
+#include "thumb_size_order.h"
+
+namespace {
+
+constexpr const char* kNames[kEAThumbCount] = {"S", "M", "B", "L", "XL", "SM"};
+
+std::vector<std::string> Select(const std::function<bool(size_t)>& isWanted) {
+  std::vector<std::string> names;
+  for (const EA_THUMB_SIZE size : kThumbSizesSmallestFirst) {
+    if (isWanted(static_cast<size_t>(size))) {
+      names.emplace_back(kNames[size]);
+    }
+  }
+  return names;
+}
+
+}  // namespace
+
+const char* SizeClassName(const EAThumbInfo& row) {
+  return kNames[row.size];
+}
+
+std::vector<std::string> SizeClassesInState(const PhotoReport& photo, ThumbState state) {
+  return Select([&](size_t size) { return photo.thumbs.states[size] == state; });
+}
+
+std::vector<std::string> FailedSizeClasses(const PhotoReport& photo) {
+  return Select([&](size_t size) { return photo.failures[size].has_value(); });
+}

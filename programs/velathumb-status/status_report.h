@@ -1,0 +1,71 @@
+// What is known of photos, directories and all of them together.
+#pragma once
+
+#include <array>
+#include <cstdint>
+#include <ctime>
+#include <optional>
+#include <string>
+
+#include "storage/photo_thumb_states.h"
+
+/// One photo.
+struct PhotoReport {
+  std::string path;
+  PhotoThumbStates thumbs;
+  /// When the making of a size class failed (seconds since the epoch), by size class. Only looked
+  /// for when the photo lacks a thumbnail.
+  std::array<std::optional<time_t>, kEAThumbCount> failures = {};
+
+  /// Returns the file name.
+  std::string Name() const;
+
+  /// Returns the number of failure markers.
+  int FailureCount() const;
+};
+
+/// Numbers of one directory or of many.
+struct StatusCounts {
+  int64_t photos = 0;
+  int64_t incompletePhotos = 0;   ///< with a thumbnail missing or outdated
+  int64_t presentThumbs = 0;      ///< up to date
+  int64_t missingThumbs = 0;      ///< missing or outdated
+  int64_t failureMarkers = 0;     ///< thumbnails that could not be made
+  std::optional<int64_t> videos;  ///< videos that need work; nothing when not asked for
+
+  void Add(const PhotoReport& photo);
+  void Add(const StatusCounts& other);
+  bool HasWork() const { return incompletePhotos > 0 || videos.value_or(0) > 0; }
+};
+
+/// One directory, its subdirectories aside.
+struct DirectoryReport {
+  std::string path;
+  bool isQueued = false;  ///< waits in the photo queue
+  StatusCounts counts;
+};
+
+/// All directories of a scan.
+struct StatusTotals {
+  int64_t directories = 0;
+  int64_t queuedDirectories = 0;
+  StatusCounts all;     ///< of all directories
+  StatusCounts queued;  ///< of those that wait in the photo queue
+
+  void Add(const DirectoryReport& directory);
+};
+
+/// Takes what a scan finds, in its order: the beginning of a directory, its photos, its end; the
+/// totals come last.
+class StatusSink {
+ public:
+  StatusSink() = default;
+  StatusSink(const StatusSink&) = delete;
+  StatusSink& operator=(const StatusSink&) = delete;
+  virtual ~StatusSink() = default;
+
+  virtual void BeginDirectory(const std::string& /*path*/, bool /*isQueued*/) {}
+  virtual void TakePhoto(const PhotoReport& /*photo*/) {}
+  virtual void EndDirectory(const DirectoryReport& /*directory*/) {}
+  virtual void TakeTotals(const StatusTotals& /*totals*/) {}
+};

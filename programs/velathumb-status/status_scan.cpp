@@ -1,0 +1,166 @@
+#include "status_scan.h"
+
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <cerrno>
+#include <cstring>
+#include <filesystem>
+#include <set>
+#include <system_error>
+#include <utility>
+
+#include "platform/velaindex.h"
+#include "storage/creation_queue.h"
+#include "storage/directory_status.h"
+#include "storage/directory_tree.h"
+#include "storage/fail_marker.h"
+#include "storage/video_level.h"
+
+namespace {
+
+/// Tells whether the path depends on more than its components: on the working directory or on what
+/// a dot stands for.
+bool IsIndirect(const std::filesystem::path& path) {
+  return path.is_relative() || std::any_of(path.begin(), path.end(), [](const auto& component) {
+           return component == "." || component == "..";
+         });
+}
+
+/// Returns the path as the queues name it: absolute, without dots and needless slashes.
+std::string AbsolutePath(const std::string& given) {
+  const std::filesystem::path path(given);
+  std::error_code error;
+  const auto plain =
+      IsIndirect(path) ? std::filesystem::canonical(path, error) : path.lexically_normal();
+  if (error) {
+    return given;
+  }
+  // A slash at the end makes an empty last component.
+  const bool endsInSlash = plain.has_relative_path() && !plain.has_filename();
+  return (endsInSlash ? plain.parent_path() : plain).string();
+}
+
+PhotoReport ReportPhoto(const std::string& path, const PhotoThumbStates& thumbs) {
+  PhotoReport photo;
+  photo.path = path;
+  photo.thumbs = thumbs;
+  if (thumbs.Missing() > 0) {
+    for (const EAThumbInfo& row : rgEAThumbInfo) {
+      photo.failures[static_cast<size_t>(row.size)] = FindFailMarker(path.c_str(), row);
+    }
+  }
+  return photo;
+}
+
+class StatusScan {
+ public:
+  StatusScan(const ScanOptions& options, StatusSink& sink, const ScanErrorHandler& onError)
+      : options_(options), sink_(sink), onError_(onError) {
+    if (options.checkVideos) {
+      totals_.all.videos = 0;
+      totals_.queued.videos = 0;
+    }
+  }
+
+  void ScanRoot(const std::string& directory);
+  void End() { sink_.TakeTotals(totals_); }
+
+ private:
+  void ScanTree(const std::string& root);
+  void ScanDirectory(const std::string& path);
+  bool IsFirstVisit(const struct stat& directory);
+
+  const ScanOptions options_;
+  StatusSink& sink_;
+  const ScanErrorHandler& onError_;
+  StatusTotals totals_;
+  std::set<std::pair<dev_t, ino_t>> visited_;
+};
+
+bool StatusScan::IsFirstVisit(const struct stat& directory) {
+  return visited_.emplace(directory.st_dev, directory.st_ino).second;
+}
+
+void StatusScan::ScanDirectory(const std::string& path) {
+  struct stat status = {};
+  if (stat(path.c_str(), &status) != 0) {
+    onError_(path, std::strerror(errno));
+    return;
+  }
+  if (!S_ISDIR(status.st_mode)) {
+    onError_(path, std::strerror(ENOTDIR));
+    return;
+  }
+  if (!IsFirstVisit(status)) {
+    return;
+  }
+  DirectoryReport directory;
+  directory.path = path;
+  directory.isQueued = IsQueued(kPhotoQueue, path.c_str());
+  sink_.BeginDirectory(path, directory.isQueued);
+  const bool isRead = ForEachPhotoStatus(
+      path.c_str(), [&](const std::string& photoPath, const PhotoThumbStates& thumbs) {
+        if (thumbs.isKnown) {
+          const PhotoReport photo = ReportPhoto(photoPath, thumbs);
+          directory.counts.Add(photo);
+          sink_.TakePhoto(photo);
+        }
+      });
+  if (options_.checkVideos) {
+    int videos = 0;
+    const auto skip = [](const std::string&) {};
+    if (isRead) {
+      ReadVideoLevel(path.c_str(), skip, videos);
+    }
+    directory.counts.videos = videos;
+  }
+  totals_.Add(directory);
+  sink_.EndDirectory(directory);
+  if (!isRead) {
+    onError_(path, "cannot be opened");
+  } else if (faccessat(AT_FDCWD, path.c_str(), X_OK, AT_EACCESS) != 0) {
+    // The names are there, but nothing can be said of what they stand for.
+    onError_(path, std::strerror(errno));
+  }
+}
+
+void StatusScan::ScanTree(const std::string& root) {
+  if (IsDirExist(root.c_str()) == 0) {
+    ScanDirectory(root);
+    return;
+  }
+  bool isEntered = false;
+  const int result =
+      ForEachIndexedDirectory(root.c_str(), [&](const char* path, bool /*isReadable*/) {
+        isEntered = true;
+        ScanDirectory(path);
+      });
+  if (result != 0) {
+    onError_(root, std::string("not all of it was looked at: ") + std::strerror(errno));
+  } else if (!isEntered) {
+    onError_(root, "is left out of a tree because of its name");
+  }
+}
+
+void StatusScan::ScanRoot(const std::string& directory) {
+  const std::string path = AbsolutePath(directory);
+  if (options_.recursive) {
+    ScanTree(path);
+  } else {
+    ScanDirectory(path);
+  }
+}
+
+}  // namespace
+
+void ScanStatus(const std::vector<std::string>& directories, const ScanOptions& options,
+                StatusSink& sink, const ScanErrorHandler& onError) {
+  StatusScan scan(options, sink, onError);
+  for (const std::string& directory : directories) {
+    scan.ScanRoot(directory);
+  }
+  scan.End();
+}

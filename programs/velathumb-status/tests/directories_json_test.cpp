@@ -1,0 +1,235 @@
+// The answer about directories in JSON.
+#include <gmock/gmock.h>
+#include <json/value.h>
+
+#include <string>
+#include <vector>
+
+#include "status_program.h"
+#include "storage/photo_tree.h"
+#include "support/files.h"
+#include "support/sandbox.h"
+
+namespace vela_test {
+namespace {
+
+using ::testing::ElementsAre;
+using ::testing::UnorderedElementsAre;
+using ::testing::UnorderedElementsAreArray;
+
+constexpr const char* kTop = "/tmp/photos";
+constexpr int kAllSizes = 63;
+
+const std::vector<std::string> kCountKeys = {"failure_markers", "incomplete_photos",
+                                             "missing_thumbs",  "photos",
+                                             "present_thumbs",  "videos_needing_work"};
+
+std::vector<std::string> With(std::vector<std::string> keys, const std::vector<std::string>& more) {
+  keys.insert(keys.end(), more.begin(), more.end());
+  return keys;
+}
+
+std::vector<std::string> Texts(const Json::Value& list) {
+  std::vector<std::string> texts;
+  for (const Json::Value& text : list) {
+    texts.push_back(text.asString());
+  }
+  return texts;
+}
+
+std::string Decoded(const Json::Value& base64) {
+  const std::string alphabet = "ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz0123456789+/";
+  const std::string text = base64.asString();
+  EXPECT_EQ(text.size() % 4, 0U) << text;
+  std::string bytes;
+  unsigned bits = 0;
+  int bitCount = 0;
+  for (const char c : text.substr(0, text.find('='))) {
+    const size_t value = alphabet.find(c);
+    EXPECT_NE(value, std::string::npos) << text;
+    bits = bits << 6 | static_cast<unsigned>(value & 63);
+    bitCount += 6;
+    if (bitCount >= 8) {
+      bitCount -= 8;
+      bytes += static_cast<char>(bits >> bitCount & 0xff);
+    }
+  }
+  return bytes;
+}
+
+class JsonDirectories : public SandboxTest {
+ protected:
+  void SetUp() override {
+    SandboxTest::SetUp();
+    MakeDirectories(kTop);
+  }
+
+  static void MakePhotoWith(const std::string& name, int sizes) {
+    MakePhoto(std::string(kTop) + "/" + name);
+    MakeThumbs(kTop, name, sizes);
+  }
+
+  static std::string Derived(const std::string& photo, const std::string& name) {
+    return std::string(kTop) + "/@eaDir/" + photo + "/" + name;
+  }
+};
+
+TEST_F(JsonDirectories, HaveTheDocumentedMembers) {
+  MakePhotoWith("a.jpg", 0);
+  const Json::Value answer = AskForJson({kTop});
+  EXPECT_THAT(answer.getMemberNames(),
+              UnorderedElementsAre("format", "directories", "totals", "errors"));
+  EXPECT_EQ(answer["format"], Json::Value(1));
+  EXPECT_EQ(answer["errors"], Json::Value(Json::arrayValue));
+  ASSERT_TRUE(answer["directories"].isArray());
+  ASSERT_EQ(answer["directories"].size(), 1U);
+  EXPECT_THAT(answer["directories"][0].getMemberNames(),
+              UnorderedElementsAreArray(With(kCountKeys, {"path", "queued"})));
+  EXPECT_THAT(
+      answer["totals"].getMemberNames(),
+      UnorderedElementsAreArray(With(kCountKeys, {"directories", "queued_directories", "queued"})));
+  EXPECT_THAT(answer["totals"]["queued"].getMemberNames(), UnorderedElementsAreArray(kCountKeys));
+}
+
+TEST_F(JsonDirectories, HaveTheCountsAsNumbers) {
+  MakePhotoWith("complete.jpg", kAllSizes);
+  MakePhotoWith("lacking.jpg", kBitS | kBitM);
+  SetFileTime(Derived("lacking.jpg", "VELAPHOTO_THUMB_M.jpg"), kMediaTime - 1);
+  WriteFile(Derived("lacking.jpg", "VELAPHOTO_THUMB_B.fail"), "");
+  const Json::Value directory = AskForJson({kTop})["directories"][0];
+  EXPECT_EQ(directory["path"], Json::Value(kTop));
+  EXPECT_EQ(directory["queued"], Json::Value(false));
+  EXPECT_EQ(directory["photos"], Json::Value(2));
+  EXPECT_EQ(directory["incomplete_photos"], Json::Value(1));
+  EXPECT_EQ(directory["present_thumbs"], Json::Value(7));
+  EXPECT_EQ(directory["missing_thumbs"], Json::Value(5));
+  EXPECT_EQ(directory["failure_markers"], Json::Value(1));
+  EXPECT_EQ(directory["videos_needing_work"], Json::Value());
+}
+
+TEST_F(JsonDirectories, TotalsTellTheQueuedOnesApart) {
+  MakePhoto("/tmp/free/a.jpg");
+  MakePhoto("/tmp/waiting/a.jpg");
+  MakePhoto("/tmp/waiting/b.jpg");
+  MakeThumbs("/tmp/waiting", "b.jpg", kAllSizes);
+  WriteFile("/tmp/waiting/@eaDir/a.jpg/VELAPHOTO_THUMB_S.fail", "");
+  WriteFile("/var/spool/thumb_create.queue", "/tmp/waiting\n");
+  const Json::Value answer = AskForJson({"/tmp/free", "/tmp/waiting"});
+  EXPECT_EQ(answer["directories"][0]["queued"], Json::Value(false));
+  EXPECT_EQ(answer["directories"][1]["queued"], Json::Value(true));
+  const Json::Value totals = answer["totals"];
+  EXPECT_EQ(totals["directories"], Json::Value(2));
+  EXPECT_EQ(totals["queued_directories"], Json::Value(1));
+  EXPECT_EQ(totals["photos"], Json::Value(3));
+  EXPECT_EQ(totals["incomplete_photos"], Json::Value(2));
+  EXPECT_EQ(totals["present_thumbs"], Json::Value(6));
+  EXPECT_EQ(totals["missing_thumbs"], Json::Value(12));
+  EXPECT_EQ(totals["failure_markers"], Json::Value(1));
+  EXPECT_EQ(totals["queued"]["photos"], Json::Value(2));
+  EXPECT_EQ(totals["queued"]["incomplete_photos"], Json::Value(1));
+  EXPECT_EQ(totals["queued"]["present_thumbs"], Json::Value(6));
+  EXPECT_EQ(totals["queued"]["missing_thumbs"], Json::Value(6));
+  EXPECT_EQ(totals["queued"]["failure_markers"], Json::Value(1));
+}
+
+TEST_F(JsonDirectories, PhotosAreListedWithTheStateOfEachSize) {
+  MakePhotoWith("complete.jpg", kAllSizes);
+  MakePhotoWith("a.jpg", kBitXL | kBitSM | kBitB);
+  SetFileTime(Derived("a.jpg", "VELAPHOTO_THUMB_B.jpg"), kMediaTime - 1);
+  WriteFile(Derived("a.jpg", "VELAPHOTO:THUMB_L.fail"), "");
+  const Json::Value list = AskForJson({"--photos", kTop})["directories"][0]["photo_list"];
+  ASSERT_TRUE(list.isArray());
+  ASSERT_EQ(list.size(), 1U);
+  EXPECT_THAT(list[0].getMemberNames(),
+              UnorderedElementsAre("name", "present", "missing", "outdated", "failed"));
+  EXPECT_EQ(list[0]["name"], Json::Value("a.jpg"));
+  EXPECT_THAT(Texts(list[0]["present"]), ElementsAre("SM", "XL"));
+  EXPECT_THAT(Texts(list[0]["missing"]), ElementsAre("S", "M", "L"));
+  EXPECT_THAT(Texts(list[0]["outdated"]), ElementsAre("B"));
+  EXPECT_THAT(Texts(list[0]["failed"]), ElementsAre("L"));
+}
+
+TEST_F(JsonDirectories, ThePhotoListIsThereButEmptyWithoutIncompletePhotos) {
+  MakePhotoWith("complete.jpg", kAllSizes);
+  MakePhoto("/tmp/first/a.jpg");
+  const Json::Value directories = AskForJson({"--photos", "/tmp/first", kTop})["directories"];
+  EXPECT_EQ(directories[0]["photo_list"].size(), 1U);
+  EXPECT_EQ(directories[1]["photo_list"], Json::Value(Json::arrayValue));
+}
+
+TEST_F(JsonDirectories, NamesWithAMeaningInJsonStayThemselves) {
+  const std::string name = "quote\" back\\ new\nline tab\t bell\x07 \x7f <b>&.jpg";
+  MakePhotoWith(name, 0);
+  const std::string dir = "/tmp/odd \"\\\n\x01";
+  MakeDirectories(dir);
+  const Json::Value answer = AskForJson({"-p", kTop, dir});
+  EXPECT_EQ(answer["directories"][0]["photo_list"][0]["name"].asString(), name);
+  EXPECT_FALSE(answer["directories"][0]["photo_list"][0].isMember("name_base64"));
+  EXPECT_EQ(answer["directories"][1]["path"].asString(), dir);
+  EXPECT_FALSE(answer["directories"][1].isMember("path_base64"));
+}
+
+TEST_F(JsonDirectories, ValidUtf8StaysItself) {
+  const std::string name = "gr\xc3\xbc\xc3\x9f \xe2\x82\xac \xf0\x9f\x93\xb7.jpg";
+  MakePhotoWith(name, 0);
+  const Json::Value photo = AskForJson({"-p", kTop})["directories"][0]["photo_list"][0];
+  EXPECT_EQ(photo["name"].asString(), name);
+  EXPECT_FALSE(photo.isMember("name_base64"));
+}
+
+TEST_F(JsonDirectories, NamesThatAreNoUtf8StandThereExactlyInBase64) {
+  const std::string dir = "/tmp/\xff\xfe dir";
+  const std::string names[] = {"cut \xc3.jpg", "surrogate \xed\xa0\x80.jpg",
+                               "overlong \xc0\xaf.jpg", "latin \xe4\xf6\"\n.jpg"};
+  for (const std::string& name : names) {
+    MakePhoto(dir + "/" + name);
+  }
+  const Json::Value directory = AskForJson({"-p", dir})["directories"][0];
+  EXPECT_EQ(Decoded(directory["path_base64"]), dir);
+  EXPECT_EQ(directory["path"], Json::Value("/tmp/\xef\xbf\xbd\xef\xbf\xbd dir"));
+  std::vector<std::string> decoded;
+  for (const Json::Value& photo : directory["photo_list"]) {
+    decoded.push_back(Decoded(photo["name_base64"]));
+    EXPECT_NE(photo["name"].asString().find("\xef\xbf\xbd"), std::string::npos);
+  }
+  EXPECT_THAT(decoded, UnorderedElementsAreArray(names));
+}
+
+TEST_F(JsonDirectories, AreOneWholeObjectWithTheErrorWhenADirectoryIsMissing) {
+  const std::string missing = "/tmp/none \xff\"\n";
+  const ProgramResult result = RunStatus({"--json", missing, kTop});
+  EXPECT_EQ(result.exitCode, 2);
+  const Json::Value answer = ReadJson(result.out);
+  ASSERT_EQ(answer["errors"].size(), 1U);
+  EXPECT_THAT(answer["errors"][0].getMemberNames(),
+              UnorderedElementsAre("path", "path_base64", "message"));
+  EXPECT_EQ(Decoded(answer["errors"][0]["path_base64"]), missing);
+  EXPECT_EQ(answer["errors"][0]["message"], Json::Value("No such file or directory"));
+  ASSERT_EQ(answer["directories"].size(), 1U);
+  EXPECT_EQ(answer["directories"][0]["path"], Json::Value(kTop));
+}
+
+TEST_F(JsonDirectories, AreEmptyWhenNoDirectoryCouldBeLookedAt) {
+  const Json::Value answer = AskForJson({"/tmp/none"});
+  EXPECT_EQ(answer["directories"], Json::Value(Json::arrayValue));
+  EXPECT_EQ(answer["totals"]["directories"], Json::Value(0));
+  EXPECT_EQ(answer["totals"]["photos"], Json::Value(0));
+}
+
+TEST_F(JsonDirectories, StandBesideTheOtherAnswersInOneObject) {
+  const Json::Value answer = AskForJson({"--queue", "--progress", "--resume-time", kTop});
+  EXPECT_THAT(answer.getMemberNames(),
+              UnorderedElementsAre("format", "directories", "totals", "queues", "progress",
+                                   "resume", "errors"));
+}
+
+TEST_F(JsonDirectories, AreTheSameEachTime) {
+  MakePhotoWith("a.jpg", kBitS);
+  MakePhotoWith("b.jpg", kBitM);
+  const ProgramResult first = RunStatus({"--json", "-p", "-r", kTop});
+  EXPECT_EQ(first.out, RunStatus({"--json", "-p", "-r", kTop}).out);
+  EXPECT_EQ(first.exitCode, 1);
+}
+
+}  // namespace
+}  // namespace vela_test

@@ -1,0 +1,101 @@
+#include "html_page_photos.h"
+
+#include <gtest/gtest.h>
+#include <limits.h>
+
+#include "html_page.h"
+#include "platform/velaindex.h"
+#include "support/files.h"
+
+namespace vela_test {
+
+namespace {
+
+std::string MetadataDirectoryOf(const PhotoReport& photo) {
+  char directory[PATH_MAX] = "";
+  EXPECT_EQ(VELAEADirPath(0, photo.path.c_str(), directory, sizeof directory), 0);
+  return directory;
+}
+
+DirectoryReport DirectoryReportOf(const PageDirectory& directory) {
+  DirectoryReport report;
+  report.path = directory.path;
+  report.isQueued = directory.isQueued;
+  for (const PhotoReport& photo : directory.photos) {
+    report.counts.Add(photo);
+  }
+  report.counts.videos = directory.videos;
+  return report;
+}
+
+}  // namespace
+
+PhotoReport CompletePhoto(const std::string& name) {
+  PhotoReport photo;
+  photo.path = "/tmp/photos/" + name;
+  photo.thumbs.isKnown = true;
+  photo.thumbs.states.fill(ThumbState::kPresent);
+  return photo;
+}
+
+PhotoReport PhotoInState(const std::string& name, ThumbState state,
+                         const std::vector<EA_THUMB_SIZE>& sizes) {
+  PhotoReport photo = CompletePhoto(name);
+  for (const EA_THUMB_SIZE size : sizes) {
+    photo.thumbs.states[static_cast<size_t>(size)] = state;
+  }
+  return photo;
+}
+
+void MarkFailed(PhotoReport& photo, const std::vector<EA_THUMB_SIZE>& sizes, time_t time) {
+  for (const EA_THUMB_SIZE size : sizes) {
+    photo.failures[static_cast<size_t>(size)] = time;
+  }
+}
+
+std::vector<EA_THUMB_SIZE> AllSizes() {
+  return {EA_THUMB_SIZE_S, EA_THUMB_SIZE_SM, EA_THUMB_SIZE_M,
+          EA_THUMB_SIZE_B, EA_THUMB_SIZE_L,  EA_THUMB_SIZE_XL};
+}
+
+std::string ThumbOf(const PhotoReport& photo, EA_THUMB_SIZE size) {
+  return MetadataDirectoryOf(photo) + '/' + rgEAThumbInfo[size].name;
+}
+
+std::string OldThumbOf(const PhotoReport& photo, EA_THUMB_SIZE size) {
+  return MetadataDirectoryOf(photo) + '/' + rgEAThumbInfo[size].oldName;
+}
+
+void Report(StatusSink& sink, const std::vector<PageDirectory>& directories) {
+  StatusTotals totals;
+  for (const PageDirectory& directory : directories) {
+    sink.BeginDirectory(directory.path, directory.isQueued);
+    for (const PhotoReport& photo : directory.photos) {
+      sink.TakePhoto(photo);
+    }
+    const DirectoryReport report = DirectoryReportOf(directory);
+    totals.Add(report);
+    sink.EndDirectory(report);
+  }
+  sink.TakeTotals(totals);
+}
+
+void WritePage(const std::vector<PageDirectory>& directories) {
+  MakeDirectories(kPageDirectory);
+  HtmlPage page(kPage);
+  Report(page, directories);
+  ASSERT_EQ(page.Finish(), 0);
+}
+
+std::string PageOf(const std::vector<PageDirectory>& directories) {
+  WritePage(directories);
+  return ReadFile(kPage);
+}
+
+std::string PageOfPhotos(const std::vector<PhotoReport>& photos) {
+  PageDirectory directory;
+  directory.photos = photos;
+  return PageOf({directory});
+}
+
+}  // namespace vela_test

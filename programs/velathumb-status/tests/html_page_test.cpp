@@ -1,0 +1,722 @@
+// What the page of the status says, and how its file comes to be.
+#include "html_page.h"
+
+#include <fcntl.h>
+#include <gmock/gmock.h>
+#include <signal.h>
+#include <stdlib.h>
+#include <sys/stat.h>
+#include <sys/syscall.h>
+#include <sys/wait.h>
+#include <time.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <cerrno>
+#include <set>
+#include <string>
+#include <vector>
+
+#include "html_counts.h"
+#include "html_page_photos.h"
+#include "smallest_thumb.h"
+#include "support/files.h"
+#include "support/mounts.h"
+#include "support/privileges.h"
+#include "support/program.h"
+#include "support/sandbox.h"
+#include "support/seccomp_fail.h"
+
+namespace vela_test {
+namespace {
+
+using ::testing::AllOf;
+using ::testing::ElementsAre;
+using ::testing::EndsWith;
+using ::testing::HasSubstr;
+using ::testing::IsEmpty;
+using ::testing::Not;
+using ::testing::StartsWith;
+
+using HtmlPageTest = SandboxTest;
+
+size_t CountOf(const std::string& part, const std::string& text) {
+  size_t count = 0;
+  for (size_t at = text.find(part); at != std::string::npos; at = text.find(part, at + 1)) {
+    ++count;
+  }
+  return count;
+}
+
+/// What stands between the first `begin` and the next `end`.
+std::string Between(const std::string& text, const std::string& begin, const std::string& end) {
+  const size_t from = text.find(begin);
+  EXPECT_NE(from, std::string::npos) << begin;
+  const size_t to = text.find(end, from);
+  EXPECT_NE(to, std::string::npos) << end;
+  return text.substr(from, to - from);
+}
+
+/// The only tile of a page with one photo.
+std::string TileOf(const PhotoReport& photo) {
+  const std::string page = PageOfPhotos({photo});
+  EXPECT_EQ(CountOf("<li class=\"tile", page), 1u);
+  return Between(page, "<li class=\"tile", "</li>");
+}
+
+/// How a page embeds this file, in the words of a tool that encodes it.
+std::string EmbeddedForm(const std::string& content) {
+  WriteFile("/tmp/content", content);
+  const ProgramResult result = RunProgram("/usr/bin/base64", {"-w0", "/tmp/content"});
+  EXPECT_EQ(result.exitCode, 0);
+  return "src=\"data:image/jpeg;base64," + result.out + '"';
+}
+
+/// Points in time are told for a place five hours east.
+class TimeZone {
+ public:
+  TimeZone() {
+    setenv("TZ", "TEST-5", 1);
+    tzset();
+  }
+  ~TimeZone() {
+    unsetenv("TZ");
+    tzset();
+  }
+  TimeZone(const TimeZone&) = delete;
+  TimeZone& operator=(const TimeZone&) = delete;
+};
+
+constexpr time_t kTime = 1700000000;  // 2023-11-14 22:13:20 in Greenwich
+constexpr const char* kTimeText =
+    "<time datetime=\"2023-11-15T03:13:20+0500\">2023-11-15 03:13</time>";
+
+// The document
+
+TEST_F(HtmlPageTest, IsOneWholeDocumentThatLetsNothingRunOrLoad) {
+  const PhotoReport photo = CompletePhoto("a.jpg");
+  WriteFile(ThumbOf(photo, EA_THUMB_SIZE_S), "thumb");
+  const std::string page = PageOfPhotos({photo, CompletePhoto("b.jpg")});
+  EXPECT_THAT(page, StartsWith("<!DOCTYPE html>\n<html lang=\"en\">\n<head>\n<meta "
+                               "charset=\"utf-8\">\n<meta http-equiv=\"Content-Security-Policy\" "
+                               "content=\"default-src 'none'; img-src data:; style-src "
+                               "'unsafe-inline'; base-uri 'none'; form-action 'none'\">\n"));
+  EXPECT_THAT(page, EndsWith("</body>\n</html>\n"));
+  EXPECT_THAT(page, HasSubstr("<meta name=\"viewport\" content=\"width=device-width, "
+                              "initial-scale=1\">"));
+  EXPECT_THAT(page, HasSubstr("<title>Thumbnail status</title>"));
+  for (const char* part : {"http:", "https:", "<script", "javascript", "<link", "@import", "url(",
+                           "href", "srcset", "<iframe", "<object"}) {
+    EXPECT_THAT(page, Not(HasSubstr(part)));
+  }
+  EXPECT_EQ(CountOf("src=", page), 1u);
+  EXPECT_EQ(CountOf("src=\"data:image/jpeg;base64,", page), 1u);
+}
+
+TEST_F(HtmlPageTest, ElementsAreClosedInTheirOrder) {
+  PhotoReport failed = PhotoInState("b.jpg", ThumbState::kMissing, AllSizes());
+  MarkFailed(failed, AllSizes(), kTime);
+  WritePage(
+      {{"/tmp/photos", true, {CompletePhoto("a.jpg"), failed}, 2}, {"/tmp/empty", false, {}}});
+  const std::string page = ReadFile(kPage);
+  const std::set<std::string> withoutEnd = {"meta", "img", "input", "!DOCTYPE"};
+  std::vector<std::string> open;
+  for (size_t at = page.find('<'); at != std::string::npos; at = page.find('<', at + 1)) {
+    const bool isEnd = page[at + 1] == '/';
+    const size_t from = at + (isEnd ? 2 : 1);
+    const std::string name = page.substr(from, page.find_first_of(" >", from) - from);
+    if (isEnd) {
+      ASSERT_FALSE(open.empty()) << name;
+      ASSERT_EQ(open.back(), name);
+      open.pop_back();
+    } else if (withoutEnd.count(name) == 0) {
+      open.push_back(name);
+    }
+  }
+  EXPECT_THAT(open, IsEmpty());
+}
+
+TEST_F(HtmlPageTest, TheSummaryTellsTheTotals) {
+  PhotoReport missing = PhotoInState("b.jpg", ThumbState::kMissing,
+                                     {EA_THUMB_SIZE_M, EA_THUMB_SIZE_L, EA_THUMB_SIZE_XL});
+  MarkFailed(missing, {EA_THUMB_SIZE_XL}, kTime);
+  const PhotoReport outdated =
+      PhotoInState("c.jpg", ThumbState::kOutdated, {EA_THUMB_SIZE_S, EA_THUMB_SIZE_B});
+  const std::string page = PageOf({{"/tmp/photos", true, {CompletePhoto("a.jpg"), missing}, 3},
+                                   {"/tmp/more", false, {outdated}, 4}});
+  const std::string header = Between(page, "<header>", "</header>");
+  EXPECT_THAT(header, HasSubstr("<p class=\"lead\">2 directories, <time "));
+  EXPECT_THAT(header, HasSubstr("<b>72%</b> of 18 thumbnails present"));
+  EXPECT_THAT(header, HasSubstr("</i>Present 13 (72%)"));
+  EXPECT_THAT(header, HasSubstr("</i>Missing or outdated 4 (22%)"));
+  EXPECT_THAT(header, HasSubstr("</i>Failed 1 (6%)"));
+  EXPECT_THAT(header, HasSubstr("<dt>Photos</dt><dd>3</dd>"));
+  EXPECT_THAT(header, HasSubstr("<dt>Photos that need work</dt><dd>2</dd>"));
+  EXPECT_THAT(header, HasSubstr("<dt>Directories</dt><dd>2</dd>"));
+  EXPECT_THAT(header, HasSubstr("<dt>Queued directories</dt><dd>1</dd>"));
+  EXPECT_THAT(header, HasSubstr("<dt>Videos that need work</dt><dd>7</dd>"));
+}
+
+TEST_F(HtmlPageTest, TheBarHasAPartForEachShareAndSaysSo) {
+  PhotoReport photo = PhotoInState("a.jpg", ThumbState::kMissing,
+                                   {EA_THUMB_SIZE_S, EA_THUMB_SIZE_M, EA_THUMB_SIZE_L});
+  MarkFailed(photo, {EA_THUMB_SIZE_M}, kTime);
+  const std::string page = PageOfPhotos({photo});
+  const std::string parts =
+      " role=\"img\" aria-label=\"Thumbnails: 3 present, 2 missing, 1 failed\">"
+      "<span class=\"present\" style=\"flex-grow:3\"></span>"
+      "<span class=\"missing\" style=\"flex-grow:2\"></span>"
+      "<span class=\"failed\" style=\"flex-grow:1\"></span></div>";
+  EXPECT_THAT(page, HasSubstr("<div class=\"bar\"" + parts));
+  EXPECT_THAT(page, HasSubstr("<div class=\"bar thin\"" + parts));
+}
+
+TEST_F(HtmlPageTest, AShareOfNothingHasNoPart) {
+  const std::string page = PageOfPhotos({CompletePhoto("a.jpg")});
+  EXPECT_THAT(page, HasSubstr("aria-label=\"Thumbnails: 6 present, 0 missing, 0 failed\">"
+                              "<span class=\"present\" style=\"flex-grow:6\"></span></div>"));
+}
+
+TEST_F(HtmlPageTest, VideosThatWereNotAskedForAreNotTold) {
+  EXPECT_THAT(PageOfPhotos({CompletePhoto("a.jpg")}), Not(HasSubstr("ideos")));
+}
+
+TEST_F(HtmlPageTest, EveryDirectoryHasASectionInTheOrderOfTheScan) {
+  PhotoReport photo =
+      PhotoInState("c.jpg", ThumbState::kMissing, {EA_THUMB_SIZE_S, EA_THUMB_SIZE_M});
+  MarkFailed(photo, {EA_THUMB_SIZE_M}, kTime);
+  const std::string page =
+      PageOf({{"/photos/b", true, {CompletePhoto("a.jpg"), CompletePhoto("b.jpg"), photo}, 1},
+              {"/photos/a", false, {CompletePhoto("d.jpg")}, 0}});
+  const size_t second = page.find("<section aria-labelledby=\"d2\">");
+  ASSERT_NE(second, std::string::npos);
+  const std::string first = Between(page.substr(0, second), "<section", "</section>");
+  EXPECT_THAT(first, StartsWith("<section aria-labelledby=\"d1\">\n<h2><bdi id=\"d1\">/photos/b"
+                                "</bdi><span class=\"queued\">Queued</span></h2>\n"));
+  EXPECT_THAT(first, HasSubstr("<p class=\"counts\"><span>3 photos</span><span>1 needs work</span>"
+                               "<span>16 thumbnails present</span><span>1 missing</span>"
+                               "<span>1 failed</span><span>1 video needs work</span></p>"));
+  EXPECT_EQ(CountOf("<li class=\"tile", first), 3u);
+  const std::string last = Between(page.substr(second), "<section", "</section>");
+  EXPECT_THAT(last, HasSubstr("<bdi id=\"d2\">/photos/a</bdi></h2>"));
+  EXPECT_THAT(last, HasSubstr("<p class=\"counts\"><span>1 photo</span>"
+                              "<span>6 thumbnails present</span></p>"));
+  EXPECT_EQ(CountOf("<li class=\"tile", last), 1u);
+}
+
+TEST_F(HtmlPageTest, PhotosStayInTheirOrder) {
+  const std::string page =
+      PageOfPhotos({CompletePhoto("b"), CompletePhoto("a"), CompletePhoto("c")});
+  EXPECT_LT(page.find("<bdi>b</bdi>"), page.find("<bdi>a</bdi>"));
+  EXPECT_LT(page.find("<bdi>a</bdi>"), page.find("<bdi>c</bdi>"));
+}
+
+TEST_F(HtmlPageTest, ADirectoryWithoutPhotosSaysSo) {
+  const std::string page = PageOf({{"/photos/a", false, {}}});
+  EXPECT_THAT(page, HasSubstr("There are no thumbnails to make."));
+  const std::string section = Between(page, "<section", "</section>");
+  EXPECT_THAT(section, HasSubstr("<span>0 photos</span>"));
+  EXPECT_THAT(section, HasSubstr("<p class=\"empty\">No photos</p>"));
+  EXPECT_THAT(page, Not(HasSubstr("class=\"bar")));
+}
+
+TEST_F(HtmlPageTest, WithoutADirectoryThereIsAPage) {
+  const std::string page = PageOf({});
+  EXPECT_THAT(page, HasSubstr("0 directories"));
+  EXPECT_THAT(page, Not(HasSubstr("<section")));
+}
+
+// Tiles
+
+TEST_F(HtmlPageTest, ACompletePhotoHasNoMark) {
+  const PhotoReport photo = CompletePhoto("a.jpg");
+  WriteFile(ThumbOf(photo, EA_THUMB_SIZE_S), "thumb");
+  EXPECT_EQ(TileOf(photo),
+            "<li class=\"tile done\">\n<div class=\"pic\"><img " + EmbeddedForm("thumb") +
+                " alt=\"Thumbnail of a.jpg\" width=\"160\" height=\"120\" loading=\"lazy\" "
+                "decoding=\"async\"></div>\n<p class=\"name\" title=\"a.jpg\"><bdi>a.jpg</bdi>"
+                "</p>\n");
+}
+
+TEST_F(HtmlPageTest, SizesThatAreNotWantedAreNotMissed) {
+  EXPECT_THAT(TileOf(PhotoInState("a.jpg", ThumbState::kNotWanted, AllSizes())),
+              AllOf(StartsWith("<li class=\"tile done\">"), Not(HasSubstr("note"))));
+}
+
+TEST_F(HtmlPageTest, AMissingThumbIsNamedWithItsSize) {
+  const std::string tile = TileOf(PhotoInState(
+      "a.jpg", ThumbState::kMissing, {EA_THUMB_SIZE_M, EA_THUMB_SIZE_SM, EA_THUMB_SIZE_XL}));
+  EXPECT_THAT(tile, StartsWith("<li class=\"tile missing\">"));
+  EXPECT_THAT(tile, HasSubstr("<strong class=\"mark\">Missing</strong>"));
+  EXPECT_THAT(tile, HasSubstr("<p class=\"note\">Missing: SM\u00a0(240×240), M\u00a0(320×320), "
+                              "XL\u00a0(1280×1280)</p>"));
+  EXPECT_THAT(tile, Not(HasSubstr("Outdated")));
+}
+
+TEST_F(HtmlPageTest, AnOutdatedThumbIsNamedAsSuch) {
+  const std::string tile =
+      TileOf(PhotoInState("a.jpg", ThumbState::kOutdated, {EA_THUMB_SIZE_L, EA_THUMB_SIZE_S}));
+  EXPECT_THAT(tile, StartsWith("<li class=\"tile missing\">"));
+  EXPECT_THAT(tile, HasSubstr("<strong class=\"mark\">Outdated</strong>"));
+  EXPECT_THAT(tile,
+              HasSubstr("<p class=\"note\">Outdated: S\u00a0(120×120), L\u00a0(800×800)</p>"));
+  EXPECT_THAT(tile, Not(HasSubstr("Missing")));
+}
+
+TEST_F(HtmlPageTest, AFailedSizeIsTheReasonOfAFailedTile) {
+  const TimeZone zone;
+  PhotoReport photo =
+      PhotoInState("a.jpg", ThumbState::kMissing, {EA_THUMB_SIZE_XL, EA_THUMB_SIZE_B});
+  photo.thumbs.states[EA_THUMB_SIZE_S] = ThumbState::kOutdated;
+  MarkFailed(photo, {EA_THUMB_SIZE_XL}, kTime);
+  const std::string tile = TileOf(photo);
+  EXPECT_THAT(tile, StartsWith("<li class=\"tile failed\">"));
+  EXPECT_THAT(tile, HasSubstr("<strong class=\"mark\">Failed</strong>"));
+  EXPECT_THAT(tile, HasSubstr("<p class=\"note\">Could not be made: XL\u00a0(1280×1280), since " +
+                              std::string(kTimeText) + "</p>"));
+  EXPECT_THAT(tile, HasSubstr("<p class=\"note\">Missing: B\u00a0(640×640)</p>"));
+  EXPECT_THAT(tile, HasSubstr("<p class=\"note\">Outdated: S\u00a0(120×120)</p>"));
+}
+
+TEST_F(HtmlPageTest, SizesThatFailedAtOneTimeStandTogether) {
+  const TimeZone zone;
+  PhotoReport photo =
+      PhotoInState("a.jpg", ThumbState::kMissing,
+                   {EA_THUMB_SIZE_XL, EA_THUMB_SIZE_L, EA_THUMB_SIZE_B, EA_THUMB_SIZE_M});
+  MarkFailed(photo, {EA_THUMB_SIZE_XL, EA_THUMB_SIZE_M}, kTime);
+  MarkFailed(photo, {EA_THUMB_SIZE_L}, kTime - 60);
+  const std::string tile = TileOf(photo);
+  EXPECT_THAT(tile, HasSubstr("Could not be made: M\u00a0(320×320), XL\u00a0(1280×1280), since " +
+                              std::string(kTimeText)));
+  EXPECT_THAT(tile, HasSubstr("Could not be made: L\u00a0(800×800), since <time "
+                              "datetime=\"2023-11-15T03:12:20+0500\">2023-11-15 03:12</time>"));
+  EXPECT_EQ(CountOf("Could not be made", tile), 2u);
+}
+
+TEST_F(HtmlPageTest, APhotoThatFailedAltogetherCouldNotBeConverted) {
+  const TimeZone zone;
+  PhotoReport photo = PhotoInState("a.jpg", ThumbState::kMissing, AllSizes());
+  photo.thumbs.states[EA_THUMB_SIZE_SM] = ThumbState::kNotWanted;
+  MarkFailed(photo, AllSizes(), kTime + 100);
+  MarkFailed(photo, {EA_THUMB_SIZE_B}, kTime);
+  photo.failures[EA_THUMB_SIZE_SM].reset();
+  const std::string tile = TileOf(photo);
+  EXPECT_THAT(tile, StartsWith("<li class=\"tile failed\">"));
+  EXPECT_THAT(tile, HasSubstr("<span class=\"none\">No thumbnail</span>"));
+  EXPECT_THAT(tile, HasSubstr("<p class=\"note\">The photo could not be converted, since " +
+                              std::string(kTimeText) + "</p>"));
+  EXPECT_EQ(CountOf("class=\"note\"", tile), 1u);
+}
+
+TEST_F(HtmlPageTest, APhotoWithAnyThumbCouldBeConverted) {
+  PhotoReport photo = PhotoInState("a.jpg", ThumbState::kMissing, AllSizes());
+  photo.thumbs.states[EA_THUMB_SIZE_S] = ThumbState::kNotWanted;
+  MarkFailed(photo, AllSizes(), kTime);
+  WriteFile(ThumbOf(photo, EA_THUMB_SIZE_S), "thumb");
+  const std::string tile = TileOf(photo);
+  EXPECT_THAT(tile, Not(HasSubstr("could not be converted")));
+  EXPECT_THAT(tile, HasSubstr("Could not be made: SM"));
+}
+
+TEST_F(HtmlPageTest, APhotoWithASizeThatWasNotTriedMayStillBeConverted) {
+  PhotoReport photo = PhotoInState("a.jpg", ThumbState::kMissing, AllSizes());
+  MarkFailed(photo, AllSizes(), kTime);
+  photo.failures[EA_THUMB_SIZE_L].reset();
+  EXPECT_THAT(TileOf(photo), Not(HasSubstr("could not be converted")));
+}
+
+TEST_F(HtmlPageTest, AMarkerBesideAPresentThumbIsNoFailure) {
+  PhotoReport photo = PhotoInState("a.jpg", ThumbState::kMissing, {EA_THUMB_SIZE_L});
+  MarkFailed(photo, {EA_THUMB_SIZE_S}, kTime);
+  const std::string tile = TileOf(photo);
+  EXPECT_THAT(tile, StartsWith("<li class=\"tile missing\">"));
+  EXPECT_THAT(tile, Not(HasSubstr("Could not be made")));
+  EXPECT_THAT(ReadFile(kPage), HasSubstr("5 present, 1 missing, 0 failed"));
+}
+
+TEST_F(HtmlPageTest, APhotoThatCouldNotBeLookedUpSaysSo) {
+  PhotoReport photo = PhotoInState("a.jpg", ThumbState::kNotWanted, AllSizes());
+  photo.thumbs.isKnown = false;
+  const std::string tile = TileOf(photo);
+  EXPECT_THAT(tile, StartsWith("<li class=\"tile unknown\">"));
+  EXPECT_THAT(tile, HasSubstr("<strong class=\"mark\">Unknown</strong>"));
+  EXPECT_THAT(tile, HasSubstr("The photo could not be looked up"));
+}
+
+// Names
+
+struct NameCase {
+  const char* name;
+  const char* html;
+};
+
+class HtmlPageName : public SandboxTest, public ::testing::WithParamInterface<NameCase> {};
+
+TEST_P(HtmlPageName, IsEscapedInTextAndAttributes) {
+  const std::string html = GetParam().html;
+  PhotoReport photo = CompletePhoto(GetParam().name);
+  const std::string withoutThumb = TileOf(photo);
+  EXPECT_THAT(withoutThumb,
+              HasSubstr("<p class=\"name\" title=\"" + html + "\"><bdi>" + html + "</bdi></p>"));
+  WriteFile(ThumbOf(photo, EA_THUMB_SIZE_S), "thumb");
+  EXPECT_THAT(TileOf(photo), HasSubstr("\" alt=\"Thumbnail of " + html + "\" width=\"160\""));
+}
+
+TEST_P(HtmlPageName, IsEscapedAsADirectory) {
+  EXPECT_THAT(PageOf({{std::string("/photos/") + GetParam().name, false, {}}}),
+              HasSubstr("<bdi id=\"d1\">/photos/" + std::string(GetParam().html) + "</bdi>"));
+}
+
+INSTANTIATE_TEST_SUITE_P(
+    Hostile, HtmlPageName,
+    ::testing::Values(
+        NameCase{"plain name.jpg", "plain name.jpg"}, NameCase{"ÄÖ 日本.jpg", "ÄÖ 日本.jpg"},
+        NameCase{"<script>alert(1)", "&lt;script&gt;alert(1)"},
+        NameCase{"\"><img src=x onerror=alert(1)>", "&quot;&gt;&lt;img src=x onerror=alert(1)&gt;"},
+        NameCase{"' onload='x", "&apos; onload=&apos;x"},
+        NameCase{"a&lt;b&amp;", "a&amp;lt;b&amp;amp;"}, NameCase{"two\nlines", "two\nlines"},
+        NameCase{"--><b>", "--&gt;&lt;b&gt;"}, NameCase{"bad\xff\xfe.jpg", "bad\uFFFD\uFFFD.jpg"},
+        NameCase{"cut\xe6\x97", "cut\uFFFD\uFFFD"}, NameCase{"bell\a", "bell&#x7;"}));
+
+TEST_F(HtmlPageTest, OnlyTheLastComponentNamesAPhoto) {
+  PhotoReport photo = CompletePhoto("a.jpg");
+  photo.path = "/photos/2024/b.jpg";
+  EXPECT_THAT(TileOf(photo), HasSubstr("<bdi>b.jpg</bdi>"));
+}
+
+// Thumbnails
+
+TEST_F(HtmlPageTest, TheSmallestThumbThatExistsIsShown) {
+  const PhotoReport photo = CompletePhoto("a.jpg");
+  for (const EA_THUMB_SIZE size : AllSizes()) {
+    WriteFile(ThumbOf(photo, size), std::string("content of ") + rgEAThumbInfo[size].sizeString);
+  }
+  for (const char* size : {"120x120", "240x240", "320x320", "640x640", "800x800", "1280x1280"}) {
+    const std::string content = std::string("content of ") + size;
+    EXPECT_THAT(TileOf(photo), HasSubstr(EmbeddedForm(content))) << size;
+    for (const EA_THUMB_SIZE other : AllSizes()) {
+      if (std::string(rgEAThumbInfo[other].sizeString) == size) {
+        RemoveTree(ThumbOf(photo, other));
+      }
+    }
+  }
+  EXPECT_THAT(TileOf(photo), HasSubstr("No thumbnail"));
+}
+
+TEST_F(HtmlPageTest, AThumbUnderItsOlderNameIsShown) {
+  const PhotoReport photo = CompletePhoto("a.jpg");
+  WriteFile(OldThumbOf(photo, EA_THUMB_SIZE_M), "older");
+  WriteFile(ThumbOf(photo, EA_THUMB_SIZE_L), "large");
+  EXPECT_THAT(TileOf(photo), HasSubstr(EmbeddedForm("older")));
+}
+
+TEST_F(HtmlPageTest, AThumbThatIsTooShortIsPassedOver) {
+  const PhotoReport photo = CompletePhoto("a.jpg");
+  WriteFile(ThumbOf(photo, EA_THUMB_SIZE_S), "");
+  WriteFile(ThumbOf(photo, EA_THUMB_SIZE_SM), "1");
+  EXPECT_THAT(TileOf(photo), HasSubstr("No thumbnail"));
+  WriteFile(ThumbOf(photo, EA_THUMB_SIZE_M), "22");
+  EXPECT_THAT(TileOf(photo), HasSubstr(EmbeddedForm("22")));
+}
+
+TEST_F(HtmlPageTest, AThumbThatIsNoFileIsPassedOver) {
+  const PhotoReport photo = CompletePhoto("a.jpg");
+  MakeDirectories(ThumbOf(photo, EA_THUMB_SIZE_S));
+  ASSERT_EQ(mkfifo(ThumbOf(photo, EA_THUMB_SIZE_SM).c_str(), 0666), 0);
+  EXPECT_THAT(TileOf(photo), HasSubstr("No thumbnail"));
+}
+
+TEST_F(HtmlPageTest, AThumbThatCannotBeReadIsPassedOver) {
+  const PhotoReport photo = CompletePhoto("a.jpg");
+  WriteFile(ThumbOf(photo, EA_THUMB_SIZE_S), "secret");
+  WriteFile(ThumbOf(photo, EA_THUMB_SIZE_L), "open");
+  ASSERT_EQ(chmod(ThumbOf(photo, EA_THUMB_SIZE_S).c_str(), 0), 0);
+  std::string tile;
+  {
+    const WithoutCapabilities unprivileged;
+    tile = TileOf(photo);
+  }
+  EXPECT_THAT(tile, HasSubstr(EmbeddedForm("open")));
+}
+
+TEST_F(HtmlPageTest, AThumbOfTheGreatestSizeIsShownAndALargerOneIsNot) {
+  const PhotoReport photo = CompletePhoto("a.jpg");
+  WriteFileOfSize(ThumbOf(photo, EA_THUMB_SIZE_S), kLargestEmbeddedThumb + 1);
+  EXPECT_THAT(TileOf(photo), HasSubstr("<span class=\"none\">No thumbnail</span>"));
+  WriteFileOfSize(ThumbOf(photo, EA_THUMB_SIZE_S), 4 * 1024 * 1024);
+  const std::string form = EmbeddedForm(std::string(4 * 1024 * 1024, 'x'));
+  EXPECT_TRUE(TileOf(photo).find(form) != std::string::npos);
+}
+
+TEST_F(HtmlPageTest, ALargePageIsWhole) {
+  std::vector<PhotoReport> photos;
+  for (int i = 0; i < 40; ++i) {
+    photos.push_back(CompletePhoto(std::to_string(i)));
+    WriteFile(ThumbOf(photos.back(), EA_THUMB_SIZE_S),
+              std::string(static_cast<size_t>(i) * 3000 + 2, static_cast<char>('a' + i % 26)));
+  }
+  const std::string page = PageOf({{"/a", false, photos}, {"/b", false, photos}});
+  for (const PhotoReport& photo : photos) {
+    const std::string form = EmbeddedForm(ReadFile(ThumbOf(photo, EA_THUMB_SIZE_S)));
+    EXPECT_EQ(CountOf(form, page), 2u) << photo.path;
+  }
+  EXPECT_THAT(page, EndsWith("</html>\n"));
+}
+
+// The file
+
+TEST_F(HtmlPageTest, NothingIsSeenBeforeThePageIsFinished) {
+  MakeDirectories(kPageDirectory);
+  HtmlPage page(kPage);
+  Report(page, {{"/a", false, {CompletePhoto("a.jpg")}}});
+  EXPECT_THAT(ListDirectory(kPageDirectory), IsEmpty());
+  EXPECT_EQ(page.Finish(), 0);
+  EXPECT_THAT(ListDirectory(kPageDirectory), ElementsAre("status.html"));
+}
+
+TEST_F(HtmlPageTest, APageThatIsNotFinishedLeavesNothingBehind) {
+  WriteFile(kPage, "old");
+  {
+    HtmlPage page(kPage);
+    Report(page, {{"/a", false, {CompletePhoto("a.jpg")}}});
+  }
+  EXPECT_EQ(ReadFile(kPage), "old");
+  EXPECT_THAT(ListDirectory(kPageDirectory), ElementsAre("status.html"));
+}
+
+TEST_F(HtmlPageTest, AProgramThatIsKilledLeavesNothingBehind) {
+  MakeDirectories(kPageDirectory);
+  const pid_t child = fork();
+  if (child == 0) {
+    HtmlPage page(kPage);
+    Report(page, {{"/a", false, {CompletePhoto("a.jpg")}}});
+    kill(getpid(), SIGKILL);
+  }
+  int status = 0;
+  ASSERT_EQ(waitpid(child, &status, 0), child);
+  ASSERT_TRUE(WIFSIGNALED(status));
+  EXPECT_THAT(ListDirectory(kPageDirectory), IsEmpty());
+}
+
+TEST_F(HtmlPageTest, TheFileIsReplacedAsAWhole) {
+  WriteFile(kPage, "old");
+  ASSERT_EQ(link(kPage, "/tmp/page/kept"), 0);
+  PageOfPhotos({CompletePhoto("a.jpg")});
+  EXPECT_EQ(ReadFile("/tmp/page/kept"), "old");
+  EXPECT_THAT(ReadFile(kPage), StartsWith("<!DOCTYPE html>"));
+}
+
+TEST_F(HtmlPageTest, TheFileHasThePermissionsOfANewFile) {
+  const mode_t mask = umask(027);
+  PageOfPhotos({CompletePhoto("a.jpg")});
+  umask(0);
+  EXPECT_EQ(ModeOf(kPage), 0640);
+  PageOfPhotos({CompletePhoto("a.jpg")});
+  umask(mask);
+  EXPECT_EQ(ModeOf(kPage), 0666);
+}
+
+TEST_F(HtmlPageTest, ASymbolicLinkIsReplacedAndItsFileStays) {
+  WriteFile("/tmp/elsewhere", "old");
+  MakeDirectories(kPageDirectory);
+  ASSERT_EQ(symlink("/tmp/elsewhere", kPage), 0);
+  PageOfPhotos({CompletePhoto("a.jpg")});
+  struct stat status = {};
+  ASSERT_EQ(lstat(kPage, &status), 0);
+  EXPECT_TRUE(S_ISREG(status.st_mode));
+  EXPECT_EQ(ReadFile("/tmp/elsewhere"), "old");
+}
+
+TEST_F(HtmlPageTest, ADanglingLinkIsReplaced) {
+  MakeDirectories(kPageDirectory);
+  ASSERT_EQ(symlink("/tmp/nowhere", kPage), 0);
+  EXPECT_THAT(PageOfPhotos({CompletePhoto("a.jpg")}), StartsWith("<!DOCTYPE html>"));
+  EXPECT_FALSE(Exists("/tmp/nowhere"));
+}
+
+TEST_F(HtmlPageTest, APathWithoutADirectoryIsOneOfTheWorkingDirectory) {
+  MakeDirectories("/tmp/here");
+  ASSERT_EQ(chdir("/tmp/here"), 0);
+  HtmlPage page("status.html");
+  Report(page, {});
+  EXPECT_EQ(page.Finish(), 0);
+  EXPECT_THAT(ListDirectory("/tmp/here"), ElementsAre("status.html"));
+}
+
+TEST_F(HtmlPageTest, TheNameMayHaveTheGreatestLength) {
+  const std::string name(255, 'n');
+  MakeDirectories(kPageDirectory);
+  HtmlPage page(std::string(kPageDirectory) + '/' + name);
+  Report(page, {});
+  EXPECT_EQ(page.Finish(), 0);
+  EXPECT_THAT(ListDirectory(kPageDirectory), ElementsAre(name));
+}
+
+TEST_F(HtmlPageTest, DescriptorsAreNotHandedToOtherPrograms) {
+  MakeDirectories(kPageDirectory);
+  const std::vector<std::string> before = ListDirectory("/proc/self/fd");
+  HtmlPage page(kPage);
+  int opened = 0;
+  for (const std::string& number : ListDirectory("/proc/self/fd")) {
+    const int flags = fcntl(std::stoi(number), F_GETFD);
+    if (std::count(before.begin(), before.end(), number) == 0 && flags >= 0) {
+      ++opened;
+      EXPECT_NE(flags & FD_CLOEXEC, 0) << number;
+    }
+  }
+  EXPECT_GT(opened, 0);
+}
+
+// Failures
+
+/// What Finish says of a page at `path` after a scan.
+int FinishPageAt(const std::string& path) {
+  HtmlPage page(path);
+  Report(page, {{"/a", false, {CompletePhoto("a.jpg")}}});
+  return page.Finish();
+}
+
+TEST_F(HtmlPageTest, AMissingDirectoryIsAnError) {
+  EXPECT_EQ(FinishPageAt("/tmp/missing/status.html"), ENOENT);
+  EXPECT_FALSE(Exists("/tmp/missing"));
+}
+
+TEST_F(HtmlPageTest, AnEmptyPathIsAnError) {
+  MakeDirectories("/tmp/here");
+  ASSERT_EQ(chdir("/tmp/here"), 0);
+  EXPECT_EQ(FinishPageAt(""), ENOENT);
+  EXPECT_THAT(ListDirectory("/tmp/here"), IsEmpty());
+}
+
+TEST_F(HtmlPageTest, ADirectoryThatCannotBeWrittenIsAnError) {
+  WriteFile(kPage, "old");
+  ASSERT_EQ(chmod(kPageDirectory, 0555), 0);
+  int error = 0;
+  {
+    const WithoutCapabilities unprivileged;
+    error = FinishPageAt(kPage);
+  }
+  EXPECT_EQ(error, EACCES);
+  EXPECT_EQ(ReadFile(kPage), "old");
+}
+
+TEST_F(HtmlPageTest, AReadOnlyVolumeIsAnError) {
+  WriteFile(kPage, "old");
+  const ReadOnlyMount readOnly(kPageDirectory);
+  EXPECT_EQ(FinishPageAt(kPage), EROFS);
+  EXPECT_EQ(ReadFile(kPage), "old");
+}
+
+TEST_F(HtmlPageTest, ADirectoryIsNotReplaced) {
+  MakeDirectories(kPage);
+  EXPECT_EQ(FinishPageAt(kPage), EISDIR);
+  EXPECT_TRUE(IsDirectory(kPage));
+  EXPECT_THAT(ListDirectory(kPageDirectory), ElementsAre("status.html"));
+}
+
+TEST_F(HtmlPageTest, WhatIsNoFileIsNotReplaced) {
+  MakeDirectories(kPageDirectory);
+  ASSERT_EQ(mkfifo(kPage, 0666), 0);
+  ASSERT_EQ(symlink("/dev/null", "/tmp/page/link"), 0);
+  EXPECT_EQ(FinishPageAt(kPage), EEXIST);
+  EXPECT_EQ(FinishPageAt("/tmp/page/link"), EEXIST);
+  struct stat status = {};
+  ASSERT_EQ(lstat(kPage, &status), 0);
+  EXPECT_TRUE(S_ISFIFO(status.st_mode));
+  ASSERT_EQ(lstat("/tmp/page/link", &status), 0);
+  EXPECT_TRUE(S_ISLNK(status.st_mode));
+  EXPECT_THAT(ListDirectory(kPageDirectory), ElementsAre("link", "status.html"));
+}
+
+TEST_F(HtmlPageTest, AVolumeThatIsFullDuringTheScanIsAnErrorAndTheOldFileStays) {
+  SmallVolume volume(kPageDirectory, 1024 * 1024);
+  WriteFile(kPage, "old");
+  const PhotoReport photo = CompletePhoto("a.jpg");
+  WriteFileOfSize(ThumbOf(photo, EA_THUMB_SIZE_S), 200 * 1024);
+  HtmlPage page(kPage);
+  volume.SetAvailable(0);
+  Report(page, {{"/a", false, {photo, photo}}});
+  // Space that comes too late does not make half a page a whole one.
+  volume.SetAvailable(512 * SmallVolume::PageSize());
+  EXPECT_EQ(page.Finish(), ENOSPC);
+  EXPECT_EQ(ReadFile(kPage), "old");
+  EXPECT_THAT(ListDirectory(kPageDirectory), ElementsAre("status.html"));
+}
+
+TEST_F(HtmlPageTest, AVolumeThatIsFullAtTheEndIsAnErrorAndTheOldFileStays) {
+  SmallVolume volume(kPageDirectory, 4 * 1024 * 1024);
+  WriteFile(kPage, "old");
+  const PhotoReport photo = CompletePhoto("a.jpg");
+  WriteFileOfSize(ThumbOf(photo, EA_THUMB_SIZE_S), 200 * 1024);
+  HtmlPage page(kPage);
+  Report(page, {{"/a", false, {photo, photo}}});
+  volume.SetAvailable(0);
+  EXPECT_EQ(page.Finish(), ENOSPC);
+  EXPECT_EQ(ReadFile(kPage), "old");
+  EXPECT_THAT(ListDirectory(kPageDirectory), ElementsAre("status.html"));
+}
+
+/// What Finish says of a page at kPage in a process in which system calls fail.
+int FinishWithRefusedCalls(const BeforeExec& refuse) {
+  const pid_t child = fork();
+  if (child == 0) {
+    _exit(refuse() == 0 ? FinishPageAt(kPage) : 255);
+  }
+  int status = 0;
+  EXPECT_EQ(waitpid(child, &status, 0), child);
+  EXPECT_TRUE(WIFEXITED(status));
+  return WEXITSTATUS(status);
+}
+
+TEST_F(HtmlPageTest, AFileSystemWithoutUnnamedFilesWillDo) {
+  WriteFile(kPage, "old");
+  const BeforeExec refuse = [] {
+    const int error = SeccompFail(OpensWithFlags(O_TMPFILE, EOPNOTSUPP))();
+    const bool isRefused = open(kPageDirectory, O_TMPFILE | O_RDWR | O_CLOEXEC, 0600) < 0;
+    return isRefused ? error : EEXIST;
+  };
+  EXPECT_EQ(FinishWithRefusedCalls(refuse), 0);
+  EXPECT_THAT(ReadFile(kPage), AllOf(StartsWith("<!DOCTYPE html>"), EndsWith("</html>\n")));
+  EXPECT_THAT(ListDirectory(kPageDirectory), ElementsAre("status.html"));
+}
+
+TEST_F(HtmlPageTest, AFileThatCannotBeMadeSafeIsAnErrorAndTheOldFileStays) {
+  WriteFile(kPage, "old");
+  EXPECT_EQ(FinishWithRefusedCalls(SeccompFail({SYS_fsync}, EIO)), EIO);
+  EXPECT_EQ(ReadFile(kPage), "old");
+  EXPECT_THAT(ListDirectory(kPageDirectory), ElementsAre("status.html"));
+}
+
+TEST_F(HtmlPageTest, AFileThatCannotBeRenamedIsAnErrorAndTheOldFileStays) {
+  WriteFile(kPage, "old");
+  EXPECT_EQ(FinishWithRefusedCalls(SeccompFail(RenameCalls(), EPERM)), EPERM);
+  EXPECT_EQ(ReadFile(kPage), "old");
+  EXPECT_THAT(ListDirectory(kPageDirectory), ElementsAre("status.html"));
+}
+
+// Numbers
+
+TEST(HtmlCounts, DigitsStandInGroupsOfThree) {
+  EXPECT_EQ(GroupDigits(0), "0");
+  EXPECT_EQ(GroupDigits(999), "999");
+  EXPECT_EQ(GroupDigits(1000), "1,000");
+  EXPECT_EQ(GroupDigits(100000), "100,000");
+  EXPECT_EQ(GroupDigits(1234567), "1,234,567");
+}
+
+TEST(HtmlCounts, OneIsOne) {
+  EXPECT_EQ(CountText(0, "photo", "photos"), "0 photos");
+  EXPECT_EQ(CountText(1, "photo", "photos"), "1 photo");
+  EXPECT_EQ(CountText(2000, "photo", "photos"), "2,000 photos");
+}
+
+TEST(HtmlCounts, OnlyAllIsAHundredPercentAndOnlyNothingIsZero) {
+  EXPECT_EQ(PercentText(0, 7), "0%");
+  EXPECT_EQ(PercentText(7, 7), "100%");
+  EXPECT_EQ(PercentText(1, 100000), "1%");
+  EXPECT_EQ(PercentText(99999, 100000), "99%");
+  EXPECT_EQ(PercentText(2, 3), "67%");
+}
+
+}  // namespace
+}  // namespace vela_test

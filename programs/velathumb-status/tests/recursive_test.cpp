@@ -1,0 +1,251 @@
+// Whole trees.
+#include <gmock/gmock.h>
+#include <sys/resource.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <sstream>
+#include <string>
+#include <vector>
+
+#include "status_program.h"
+#include "status_text.h"
+#include "storage/deep_files.h"
+#include "storage/photo_tree.h"
+#include "support/files.h"
+#include "support/mounts.h"
+#include "support/sandbox.h"
+
+namespace vela_test {
+namespace {
+
+using ::testing::ElementsAre;
+using ::testing::EndsWith;
+using ::testing::HasSubstr;
+using ::testing::UnorderedElementsAre;
+
+constexpr const char* kTop = "/tmp/photos";
+constexpr const char* kQueueFile = "/var/spool/thumb_create.queue";
+
+std::string In(const std::string& name) {
+  return std::string(kTop) + "/" + name;
+}
+
+class TreeAnswer : public SandboxTest {
+ protected:
+  void SetUp() override {
+    SandboxTest::SetUp();
+    MakeDirectories(kTop);
+  }
+
+  static StatusText Ask(std::vector<std::string> arguments = {kTop}) {
+    arguments.insert(arguments.begin(), "--recursive");
+    const ProgramResult result = RunStatus(arguments);
+    EXPECT_EQ(result.err, "");
+    return ReadStatusText(result.out);
+  }
+
+  /// What the library says of the tree.
+  static PhotoWork LibraryWork(const std::string& dir = kTop) {
+    PhotoWork work;
+    EXPECT_EQ(GetDirThumbStatusRecursive(dir.c_str(), &work.photos, &work.thumbs), 0);
+    return work;
+  }
+};
+
+TEST_F(TreeAnswer, HasALineForEachDirectory) {
+  MakePhoto(In("a.jpg"));
+  MakePhoto(In("one/a.jpg"));
+  MakePhoto(In("one/deep/a.jpg"));
+  MakePhoto(In("one/deep/b.jpg"));
+  MakeDirectories(In("empty"));
+  const StatusText answer = Ask();
+  EXPECT_THAT(answer.Names(), UnorderedElementsAre(kTop, In("one"), In("one/deep"), In("empty")));
+  EXPECT_EQ(answer.totals.numbers, (StatusNumbers{4, 4, 0, 24, 0}));
+  EXPECT_EQ(answer.totals.name, "in 4 directories");
+}
+
+TEST_F(TreeAnswer, TellsADirectoryBeforeWhatIsBelowIt) {
+  MakeDirectories(In("one/deep"));
+  EXPECT_THAT(Ask().Names(), ElementsAre(kTop, In("one"), In("one/deep")));
+}
+
+TEST_F(TreeAnswer, LeavesOutNamesThatAreNotIndexed) {
+  for (const char* name : {".hidden", "@eaDir", "@tmp", "#recycle", "lost+found", "good/@eaDir"}) {
+    MakePhoto(In(name) + "/a.jpg");
+  }
+  const StatusText answer = Ask();
+  EXPECT_THAT(answer.Names(), UnorderedElementsAre(kTop, In("good")));
+  EXPECT_EQ(answer.totals.numbers.photos, 0);
+}
+
+TEST_F(TreeAnswer, LeavesOutOtherFileSystems) {
+  const SmallVolume volume(In("other"), 1 << 20);
+  MakePhoto(In("other/a.jpg"));
+  MakePhoto(In("same/a.jpg"));
+  EXPECT_THAT(Ask().Names(), UnorderedElementsAre(kTop, In("same")));
+  EXPECT_THAT(Ask({In("other")}).Names(), ElementsAre(In("other")));
+}
+
+TEST_F(TreeAnswer, CountsALoopOfLinksOnce) {
+  MakePhoto(In("one/a.jpg"));
+  ASSERT_EQ(symlink(kTop, In("one/up").c_str()), 0);
+  ASSERT_EQ(symlink(".", In("self").c_str()), 0);
+  const StatusText answer = Ask();
+  EXPECT_THAT(answer.Names(), UnorderedElementsAre(kTop, In("one")));
+  EXPECT_EQ(answer.totals.numbers.photos, 1);
+  EXPECT_EQ(LibraryWork(), (PhotoWork{1, 6}));
+}
+
+TEST_F(TreeAnswer, CountsNestedAndRepeatedRootsOnce) {
+  MakePhoto(In("a.jpg"));
+  MakePhoto(In("one/a.jpg"));
+  MakePhoto(In("one/deep/a.jpg"));
+  const StatusText down = Ask({kTop, In("one"), kTop});
+  EXPECT_THAT(down.Names(), UnorderedElementsAre(kTop, In("one"), In("one/deep")));
+  EXPECT_EQ(down.totals.numbers.photos, 3);
+  const StatusText up = Ask({In("one/deep"), kTop});
+  EXPECT_THAT(up.Names(), UnorderedElementsAre(kTop, In("one"), In("one/deep")));
+  EXPECT_EQ(up.totals.numbers.photos, 3);
+}
+
+TEST_F(TreeAnswer, AgreesWithTheLibraryWithoutWaitingDirectories) {
+  for (const char* name : {"a.jpg", "one/a.jpg", "one/b.jpg", "one/deep/a.jpg", "two/a.jpg"}) {
+    MakePhoto(In(name));
+  }
+  MakeThumbs(In("two"), "a.jpg", kBitS | kBitM);
+  WriteFile(kQueueFile, In("one") + "\n" + In("none") + "\nR:" + In("two") + "\n");
+  const StatusText answer = Ask();
+  EXPECT_EQ(answer.totals.numbers, (StatusNumbers{5, 5, 2, 28, 0}));
+  EXPECT_EQ(answer.totals.queued, "1");
+  PhotoWork free = {0, 0};
+  for (const StatusLine& line : answer.directories) {
+    EXPECT_EQ(line.queued, line.name == In("one") ? "yes" : "no") << line.name;
+    if (line.queued == "no") {
+      free.photos += static_cast<int>(line.numbers.toDo);
+      free.thumbs += static_cast<int>(line.numbers.missing);
+    }
+  }
+  EXPECT_EQ(LibraryWork(), free);
+  EXPECT_EQ(free, (PhotoWork{3, 16}));
+}
+
+TEST_F(TreeAnswer, JsonTotalsLessTheQueuedOnesAreTheLibrarys) {
+  for (const char* name : {"a.jpg", "one/a.jpg", "one/b.jpg", "one/deep/a.jpg"}) {
+    MakePhoto(In(name));
+  }
+  WriteFile(std::string(kQueueFile) + ".tmp", In("one") + "\n");
+  const Json::Value totals = AskForJson({"-r", kTop})["totals"];
+  const PhotoWork work = LibraryWork();
+  EXPECT_EQ(work, (PhotoWork{2, 12}));
+  EXPECT_EQ(totals["incomplete_photos"].asInt() - totals["queued"]["incomplete_photos"].asInt(),
+            work.photos);
+  EXPECT_EQ(totals["missing_thumbs"].asInt() - totals["queued"]["missing_thumbs"].asInt(),
+            work.thumbs);
+}
+
+TEST_F(TreeAnswer, AnUnreadableDirectoryIsAnErrorAndTheRestIsAnswered) {
+  MakePhoto(In("a.jpg"));
+  MakePhoto(In("closed/a.jpg"));
+  MakePhoto(In("open/a.jpg"));
+  ASSERT_EQ(chmod(In("closed").c_str(), 0), 0);
+  const ProgramResult result = RunStatusAsOrdinaryUser({"-r", kTop});
+  EXPECT_EQ(result.exitCode, 2);
+  EXPECT_EQ(result.err, "velathumb-status: /tmp/photos/closed: cannot be opened\n");
+  EXPECT_EQ(ReadStatusText(result.out).totals.numbers, (StatusNumbers{2, 2, 0, 12, 0}));
+}
+
+TEST_F(TreeAnswer, AnUnreadableRootIsAnError) {
+  ASSERT_EQ(chmod(kTop, 0), 0);
+  const ProgramResult result = RunStatusAsOrdinaryUser({"-r", kTop});
+  EXPECT_EQ(result.exitCode, 2);
+  EXPECT_EQ(result.err, "velathumb-status: /tmp/photos: cannot be opened\n");
+}
+
+TEST_F(TreeAnswer, ATreeWhoseSubdirectoriesCannotBeLookedAtIsAnError) {
+  MakePhoto(In("below/a.jpg"));
+  ASSERT_EQ(chmod(kTop, 0444), 0);
+  const ProgramResult result = RunStatusAsOrdinaryUser({"-r", kTop});
+  EXPECT_EQ(result.exitCode, 2);
+  EXPECT_EQ(result.err, "velathumb-status: /tmp/photos: Permission denied\n");
+}
+
+TEST_F(TreeAnswer, ARootThatIsLeftOutForItsNameIsAnError) {
+  MakePhoto("/tmp/@eaDir/a.jpg");
+  MakePhoto(In("a.jpg"));
+  const ProgramResult result = RunStatus({"-r", "/tmp/@eaDir", kTop});
+  EXPECT_EQ(result.exitCode, 2);
+  EXPECT_EQ(result.err,
+            "velathumb-status: /tmp/@eaDir: is left out of a tree because of its name\n");
+  EXPECT_THAT(ReadStatusText(result.out).Names(), ElementsAre(kTop));
+}
+
+TEST_F(TreeAnswer, AMissingRootAndAFileAreErrors) {
+  MakePhoto(In("a.jpg"));
+  const ProgramResult result = RunStatus({"-r", "/tmp/none", In("a.jpg"), kTop});
+  EXPECT_EQ(result.exitCode, 2);
+  EXPECT_EQ(result.err,
+            "velathumb-status: /tmp/none: No such file or directory\n"
+            "velathumb-status: /tmp/photos/a.jpg: Not a directory\n");
+  EXPECT_THAT(ReadStatusText(result.out).Names(), ElementsAre(kTop));
+}
+
+TEST_F(TreeAnswer, DirectoriesTooDeepForPathsAreErrorsAndTheRestIsAnswered) {
+  MakePhoto("/tmp/other/a.jpg");
+  // 11 bytes and 201 for each level: the twentieth is the last that a path leads to.
+  const DeepTree tree(kTop, std::string(200, 'd'), 25, "a.jpg");
+  const ProgramResult result = RunStatus({"-r", kTop, "/tmp/other"});
+  EXPECT_EQ(result.exitCode, 2);
+  std::istringstream errors(result.err);
+  int count = 0;
+  for (std::string line; std::getline(errors, line); ++count) {
+    EXPECT_THAT(line, EndsWith("dddd: File name too long"));
+  }
+  EXPECT_EQ(count, 5);
+  const StatusText answer = ReadStatusText(result.out);
+  EXPECT_EQ(answer.Names().front(), kTop);
+  EXPECT_EQ(answer.Names().back(), "/tmp/other");
+  EXPECT_EQ(answer.totals.name, "in 22 directories");
+  EXPECT_EQ(answer.totals.numbers.photos, 21);
+}
+
+TEST_F(TreeAnswer, AWalkThatEndsEarlyIsAnError) {
+  std::string path = kTop;
+  for (int level = 0; level < 40; ++level) {
+    path += "/d";
+  }
+  MakeDirectories(path);
+  ProgramOptions options;
+  options.beforeExec = {LimitResource(RLIMIT_NOFILE, 20)};
+  const ProgramResult result = RunStatus({"-r", kTop}, options);
+  EXPECT_EQ(result.exitCode, 2);
+  EXPECT_THAT(result.err, HasSubstr("velathumb-status: /tmp/photos: not all of it was looked at: "
+                                    "Too many open files\n"));
+  EXPECT_EQ(ReadStatusText(result.out).Names().front(), kTop);
+}
+
+TEST_F(TreeAnswer, RelativeRootsAndThoseWithDotsAreTakenAsWhatTheyAre) {
+  MakePhoto(In("below/a.jpg"));
+  ProgramOptions options;
+  options.workingDirectory = In("below");
+  for (const char* name : {".", "..", "../below/", "../../photos/."}) {
+    const ProgramResult result = RunStatus({"-r", name}, options);
+    EXPECT_EQ(result.err, "") << name;
+    EXPECT_EQ(ReadStatusText(result.out).totals.numbers.photos, 1) << name;
+  }
+  EXPECT_THAT(Ask({"/tmp/photos/."}).Names(), ElementsAre(kTop, In("below")));
+  EXPECT_THAT(Ask({"/tmp//photos//"}).Names(), ElementsAre(kTop, In("below")));
+}
+
+TEST_F(TreeAnswer, NamesPhotosOfEachDirectory) {
+  WriteFile("/etc/velainfo.conf", "photo_thumb_size_map=\"16\"\n");
+  MakePhoto(In("a.jpg"));
+  MakePhoto(In("one/b.jpg"));
+  const StatusText answer = Ask({"--photos", kTop});
+  ASSERT_THAT(answer.Names(), ElementsAre(kTop, In("one")));
+  EXPECT_THAT(answer.directories[0].photos, ElementsAre("a.jpg: missing XL"));
+  EXPECT_THAT(answer.directories[1].photos, ElementsAre("b.jpg: missing XL"));
+}
+
+}  // namespace
+}  // namespace vela_test

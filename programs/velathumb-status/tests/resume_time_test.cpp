@@ -1,0 +1,98 @@
+// Until when conversion is held back.
+#include <gmock/gmock.h>
+#include <json/value.h>
+
+#include <ctime>
+#include <string>
+
+#include "status_program.h"
+#include "support/files.h"
+#include "support/sandbox.h"
+
+namespace vela_test {
+namespace {
+
+using ::testing::AllOf;
+using ::testing::Ge;
+using ::testing::HasSubstr;
+using ::testing::Le;
+using ::testing::MatchesRegex;
+using ::testing::UnorderedElementsAre;
+
+class ResumeAnswer : public SandboxTest {
+ protected:
+  static void Store(long time) {
+    WriteFile("/etc/velainfo.conf", "thumb_conv_resume_time=\"" + std::to_string(time) + "\"\n");
+  }
+
+  static ProgramResult AskIn(const std::string& timeZone) {
+    ProgramOptions options;
+    options.addedEnvironment = {"TZ=" + timeZone};
+    return RunStatus({"--resume-time"}, options);
+  }
+};
+
+TEST_F(ResumeAnswer, SaysWhenNothingHoldsBack) {
+  for (const long time : {0L, 1700000000L}) {
+    Store(time);
+    const ProgramResult result = RunStatus({"--resume-time"});
+    EXPECT_EQ(result.exitCode, 0);
+    EXPECT_EQ(result.out, "conversion is not held back\n");
+  }
+}
+
+TEST_F(ResumeAnswer, TellsTheTimeInTheUsersZone) {
+  Store(4102444800);  // 2100-01-01 00:00:00 UTC
+  EXPECT_THAT(AskIn("UTC0").out, MatchesRegex("conversion is held back until "
+                                              "2100-01-01 00:00:00 \\+0000, for [0-9]+ s\n"));
+  EXPECT_THAT(AskIn("XYZ-2").out, HasSubstr("until 2100-01-01 02:00:00 +0200, for "));
+}
+
+TEST_F(ResumeAnswer, IsNoWork) {
+  Store(4102444800);
+  EXPECT_EQ(RunStatus({"--resume-time"}).exitCode, 0);
+  EXPECT_EQ(RunStatus({"--resume-time", "--json"}).exitCode, 0);
+}
+
+TEST_F(ResumeAnswer, SaysThatThereIsNoEnd) {
+  Store(-1);
+  EXPECT_EQ(RunStatus({"--resume-time"}).out,
+            "conversion is held back without an end (resume time -1)\n");
+}
+
+TEST_F(ResumeAnswer, JsonHasTheDocumentedMembers) {
+  const long before = std::time(nullptr);
+  Store(before + 1000);
+  const Json::Value answer = AskForJson({"--resume-time"});
+  const long after = std::time(nullptr);
+  EXPECT_THAT(answer.getMemberNames(), UnorderedElementsAre("format", "resume", "errors"));
+  const Json::Value resume = answer["resume"];
+  EXPECT_THAT(resume.getMemberNames(),
+              UnorderedElementsAre("resume_time", "reached", "wait_seconds"));
+  EXPECT_EQ(resume["resume_time"].asInt64(), before + 1000);
+  EXPECT_EQ(resume["reached"], Json::Value(false));
+  EXPECT_THAT(resume["wait_seconds"].asInt64(), AllOf(Le(1000), Ge(1000 - (after - before))));
+}
+
+TEST_F(ResumeAnswer, JsonOfAReachedTimeWaitsForNothing) {
+  Store(1700000000);
+  const Json::Value resume = AskForJson({"--resume-time"})["resume"];
+  EXPECT_EQ(resume["resume_time"], Json::Value(1700000000));
+  EXPECT_EQ(resume["reached"], Json::Value(true));
+  EXPECT_EQ(resume["wait_seconds"], Json::Value(0));
+}
+
+TEST_F(ResumeAnswer, JsonOfANegativeTimeIsNotReached) {
+  Store(-5);
+  const Json::Value resume = AskForJson({"--resume-time"})["resume"];
+  EXPECT_EQ(resume["resume_time"], Json::Value(-5));
+  EXPECT_EQ(resume["reached"], Json::Value(false));
+  EXPECT_EQ(resume["wait_seconds"], Json::Value(0));
+}
+
+TEST_F(ResumeAnswer, WithoutSettingsNothingHoldsBack) {
+  EXPECT_EQ(RunStatus({"--resume-time"}).out, "conversion is not held back\n");
+}
+
+}  // namespace
+}  // namespace vela_test

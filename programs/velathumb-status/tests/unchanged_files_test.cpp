@@ -1,0 +1,117 @@
+// Asking changes nothing.
+#include <fcntl.h>
+#include <gmock/gmock.h>
+#include <sys/stat.h>
+
+#include <ostream>
+#include <string>
+#include <vector>
+
+#include "running_conversion.h"
+#include "status_program.h"
+#include "storage/photo_tree.h"
+#include "support/files.h"
+#include "support/sandbox.h"
+
+namespace vela_test {
+namespace {
+
+using ::testing::IsEmpty;
+
+/// All there is of a file that a change would show in.
+struct FileState {
+  std::string path;
+  ino_t inode;
+  off_t size;
+  mode_t mode;
+  timespec modified;
+  timespec changed;
+};
+
+bool IsSameTime(const timespec& a, const timespec& b) {
+  return a.tv_sec == b.tv_sec && a.tv_nsec == b.tv_nsec;
+}
+
+bool operator==(const FileState& a, const FileState& b) {
+  return a.path == b.path && a.inode == b.inode && a.size == b.size && a.mode == b.mode &&
+         IsSameTime(a.modified, b.modified) && IsSameTime(a.changed, b.changed);
+}
+
+void PrintTo(const FileState& file, std::ostream* out) {
+  *out << file.path << ", inode " << file.inode << ", " << file.size << " bytes, modified "
+       << file.modified.tv_sec << "." << file.modified.tv_nsec << ", changed "
+       << file.changed.tv_sec << "." << file.changed.tv_nsec;
+}
+
+FileState StateOf(const std::string& path) {
+  struct stat status = {};
+  EXPECT_EQ(lstat(path.c_str(), &status), 0) << path;
+  return {path, status.st_ino, status.st_size, status.st_mode, status.st_mtim, status.st_ctim};
+}
+
+/// Every place that the program could write to.
+std::vector<FileState> AllFiles() {
+  std::vector<FileState> files;
+  for (const std::string place : {"/tmp", "/var/spool", "/run", "/usr/vela", "/etc"}) {
+    files.push_back(StateOf(place));
+    for (const std::string& name : ListTree(place)) {
+      files.push_back(StateOf(place + "/" + name));
+    }
+  }
+  return files;
+}
+
+class UnchangedFiles : public SandboxTest {
+ protected:
+  void SetUp() override {
+    SandboxTest::SetUp();
+    MakePhoto("/tmp/photos/a.jpg");
+    MakeThumbs("/tmp/photos", "a.jpg", kBitS | kBitM);
+    SetFileTime("/tmp/photos/@eaDir/a.jpg/VELAPHOTO_THUMB_S.jpg", kMediaTime - 1);
+    WriteFile("/tmp/photos/@eaDir/a.jpg/VELAPHOTO_THUMB_B.fail", "");
+    WriteFile("/tmp/photos/film.mp4", "film");
+    MakePhoto("/tmp/photos/below/b.jpg");
+    WriteFile("/etc/velainfo.conf", "thumb_conv_resume_time=\"5\"\n");
+  }
+
+  static void AskEverything() {
+    for (const char* format : {"--progress", "--json"}) {
+      EXPECT_EQ(RunStatus({format, "--recursive", "--photos", "/tmp/photos"}).exitCode, 1);
+      RunStatus({format, "--queue", "--progress", "--resume-time"});
+    }
+    RunStatus({"--photos", "/tmp/photos", "/tmp/none"});
+    RunStatus({"--queue"});
+  }
+};
+
+TEST_F(UnchangedFiles, AreLeftByEveryQuestionWithoutQueuesAndProgress) {
+  const std::vector<FileState> before = AllFiles();
+  AskEverything();
+  RunStatus({"--watch"});
+  EXPECT_EQ(AllFiles(), before);
+  EXPECT_THAT(ListDirectory("/var/spool"), IsEmpty());
+}
+
+TEST_F(UnchangedFiles, AreLeftByEveryQuestionWithQueuesAndProgress) {
+  for (const char* name : {"thumb_create.queue", "thumb_create.queue.tmp", "flv_create.queue",
+                           "flv_create.queue.tmp"}) {
+    WriteFile(std::string("/var/spool/") + name, "/tmp/photos\nR:/tmp/photos/below\n");
+  }
+  WriteFile("/var/spool/conv_progress_photo", "total=\"5\"\ncompleted=\"2\"\n");
+  WriteFile("/var/spool/conv_progress_video", "total=\"5\"\n");
+  WriteFile("/var/run/velathumb.4000000.pid", "");
+  const std::vector<FileState> before = AllFiles();
+  AskEverything();
+  RunStatus({"--watch"});
+  EXPECT_EQ(AllFiles(), before);
+}
+
+TEST_F(UnchangedFiles, AreLeftWhileAnInstanceRuns) {
+  const RunningConversion conversion;
+  const std::vector<FileState> before = AllFiles();
+  AskEverything();
+  EXPECT_EQ(AllFiles(), before);
+}
+
+}  // namespace
+}  // namespace vela_test

@@ -1,0 +1,18 @@
+# Completion of velathumb-status for bash.
+
+_velathumb_status() {
+  local current=${COMP_WORDS[COMP_CWORD]} previous=${COMP_WORDS[COMP_CWORD - 1]}
+  local options='--photos --recursive --check-videos --html --queue --progress --resume-time
+    --watch --json --help --version'
+  compopt -o filenames 2>/dev/null
+  if [[ $previous == --html ]]; then
+    mapfile -t COMPREPLY < <(compgen -f -- "$current")
+  elif [[ $current == -* ]]; then
+    compopt +o filenames 2>/dev/null
+    mapfile -t COMPREPLY < <(compgen -W "$options" -- "$current")
+  else
+    mapfile -t COMPREPLY < <(compgen -d -- "$current")
+  fi
+}
+
+complete -F _velathumb_status velathumb-status
