@@ -4,7 +4,8 @@
 
 #include <cerrno>
 #include <ctime>
-#include <utility>
+#include <filesystem>
+#include <system_error>
 
 #include "html_style.h"
 #include "html_tile.h"
@@ -16,6 +17,13 @@ namespace {
 std::string DirectoryOf(const std::string& path) {
   const size_t slash = path.rfind('/');
   return slash == std::string::npos ? "." : path.substr(0, slash + 1);
+}
+
+/// Returns the file that a link leads to: the page is to stand there, and the link to stay.
+std::string ResolvedTarget(const std::string& path) {
+  std::error_code error;
+  const auto target = std::filesystem::canonical(path, error);
+  return error ? path : target.string();
 }
 
 /// Returns an errno value when something stands at `path` that is no file. A device, above all,
@@ -129,8 +137,8 @@ constexpr const char* kPageEnd =
 
 }  // namespace
 
-HtmlPage::HtmlPage(std::string path)
-    : path_(std::move(path)),
+HtmlPage::HtmlPage(const std::string& path)
+    : path_(ResolvedTarget(path)),
       error_(ErrorOfTarget(path_)),
       body_(DirectoryOf(path_), PageFile::Kind::kScratch),
       photos_(DirectoryOf(path_), PageFile::Kind::kScratch) {}
@@ -140,7 +148,7 @@ HtmlPage::~HtmlPage() = default;
 /// A page that has failed takes nothing more; a scan must not end because memory is short for it.
 template <typename Step>
 void HtmlPage::Do(const Step& step) {
-  if (FirstError() != 0) {
+  if (Error() != 0) {
     return;
   }
   try {
@@ -150,7 +158,7 @@ void HtmlPage::Do(const Step& step) {
   }
 }
 
-int HtmlPage::FirstError() const {
+int HtmlPage::Error() const {
   for (const int error : {error_, body_.Error(), photos_.Error()}) {
     if (error != 0) {
       return error;
@@ -159,7 +167,7 @@ int HtmlPage::FirstError() const {
   return 0;
 }
 
-void HtmlPage::BeginDirectory(const std::string& /*path*/, bool /*isQueued*/) {
+void HtmlPage::BeginDirectory() {
   Do([&] {
     photos_.Clear();
     directoryShares_ = ThumbShares();
@@ -200,5 +208,5 @@ int HtmlPage::Finish() {
     page.Append(kPageEnd);
     error_ = page.MoveTo(path_);
   });
-  return FirstError();
+  return Error();
 }

@@ -14,14 +14,17 @@ class HtmlPage : public StatusSink {
  public:
   /// The page is to stand at `path`: a new file, or in place of a file or of a symbolic link to
   /// one. Anything else there (a directory, a device) stays and makes Finish fail.
-  explicit HtmlPage(std::string path);
+  explicit HtmlPage(const std::string& path);
   /// Leaves nothing behind of a page that was not finished.
   ~HtmlPage() override;
 
-  void BeginDirectory(const std::string& path, bool isQueued) override;
+  void BeginDirectory() override;
   void TakePhoto(const PhotoReport& photo) override;
   void EndDirectory(const DirectoryReport& directory) override;
   void TakeTotals(const StatusTotals& totals) override;
+
+  /// Returns the first error so far, an errno value, 0 when there was none.
+  int Error() const;
 
   /// Puts the finished page in place of what stands there. Returns 0, or an errno value when
   /// something could not be written; the old file then stays.
@@ -30,7 +33,6 @@ class HtmlPage : public StatusSink {
  private:
   template <typename Step>
   void Do(const Step& step);
-  int FirstError() const;
 
   const std::string path_;
   int error_;  // of the page itself; those of its files are theirs

@@ -7,8 +7,8 @@
 
 #include "html_counts.h"
 #include "size_class_text.h"
+#include "storage/thumb_size_class.h"
 #include "text_encoding.h"
-#include "thumb_size_order.h"
 
 namespace {
 
@@ -32,13 +32,8 @@ std::string SizeList(const std::function<bool(size_t)>& isWanted) {
   return list;
 }
 
-bool IsLacking(const PhotoReport& photo, size_t size) {
-  const ThumbState state = photo.thumbs.states[size];
-  return state == ThumbState::kMissing || state == ThumbState::kOutdated;
-}
-
 bool HasFailed(const PhotoReport& photo, size_t size) {
-  return IsLacking(photo, size) && photo.failures[size].has_value();
+  return photo.thumbs.IsLacking(size) && photo.failures[size].has_value();
 }
 
 /// Whether nothing at all has come of the photo, and everything was tried.
@@ -90,7 +85,7 @@ std::string LackNote(const PhotoReport& photo, ThumbState state, const char* lab
 }
 
 std::string Notes(const PhotoReport& photo, const std::string& thumb) {
-  if (!photo.thumbs.isKnown) {
+  if (photo.thumbs.lookup != PhotoLookup::kDone) {
     return Note("The photo could not be looked up");
   }
   if (IsUnconvertible(photo, thumb)) {
@@ -109,7 +104,7 @@ struct Mark {
 Mark MarkOf(const PhotoReport& photo) {
   const ThumbShares shares = SharesOf(photo);
   const auto& states = photo.thumbs.states;
-  if (!photo.thumbs.isKnown) {
+  if (photo.thumbs.lookup != PhotoLookup::kDone) {
     return {"unknown", "Unknown"};
   }
   if (shares.failed > 0) {

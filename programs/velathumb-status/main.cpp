@@ -4,6 +4,7 @@
 
 #include <unistd.h>
 
+#include <cerrno>
 #include <cstdlib>
 #include <cstring>
 #include <exception>
@@ -22,6 +23,7 @@
 #include "status_scan.h"
 #include "text_encoding.h"
 #include "text_report.h"
+#include "video_check_fault.h"
 
 namespace {
 
@@ -35,8 +37,8 @@ class SinkList : public StatusSink {
   void Append(StatusSink* sink) { sinks_.push_back(sink); }
   bool HasWork() const { return hasWork_; }
 
-  void BeginDirectory(const std::string& path, bool isQueued) override {
-    for (StatusSink* sink : sinks_) sink->BeginDirectory(path, isQueued);
+  void BeginDirectory() override {
+    for (StatusSink* sink : sinks_) sink->BeginDirectory();
   }
   void TakePhoto(const PhotoReport& photo) override {
     for (StatusSink* sink : sinks_) sink->TakePhoto(photo);
@@ -65,10 +67,12 @@ class StatusRun {
  private:
   void Watch();
   void Answer();
+  bool CanCheckVideos();
   void AnswerDirectories();
   void AnswerQueues();
   void AnswerProgress();
   void AnswerResumeTime();
+  void TakePageError(int error);
   void TakeError(const std::string& path, const std::string& message);
   void TakeWork(bool hasWork) { hasWork_ = hasWork_ || hasWork; }
   ScanErrorHandler ErrorHandler() {
@@ -76,7 +80,7 @@ class StatusRun {
         [this](const std::string& path, const std::string& message) { TakeError(path, message); };
   }
 
-  const Options options_;
+  Options options_;
   JsonReport json_;
   Json::Value errors_{Json::arrayValue};
   bool hasWork_ = false;
@@ -90,7 +94,23 @@ void StatusRun::TakeError(const std::string& path, const std::string& message) {
   errors_.append(error);
 }
 
+bool StatusRun::CanCheckVideos() {
+  const std::string fault = FindVideoCheckFault();
+  if (!fault.empty()) {
+    TakeError("--check-videos", fault);
+  }
+  return fault.empty();
+}
+
 void StatusRun::AnswerDirectories() {
+  std::unique_ptr<HtmlPage> page;
+  if (!options_.htmlFile.empty()) {
+    page = std::make_unique<HtmlPage>(options_.htmlFile);
+    if (page->Error() != 0) {
+      TakePageError(page->Error());
+      return;
+    }
+  }
   SinkList sinks;
   std::unique_ptr<StatusSink> answer;
   if (options_.json) {
@@ -99,18 +119,20 @@ void StatusRun::AnswerDirectories() {
     answer = std::make_unique<TextReport>(std::cout, options_.photos);
   }
   sinks.Append(answer.get());
-  std::unique_ptr<HtmlPage> page;
-  if (!options_.htmlFile.empty()) {
-    page = std::make_unique<HtmlPage>(options_.htmlFile);
+  if (page != nullptr) {
     sinks.Append(page.get());
   }
   ScanStatus(options_.directories, {options_.recursive, options_.checkVideos}, sinks,
              ErrorHandler());
   TakeWork(sinks.HasWork());
-  const int error = page == nullptr ? 0 : page->Finish();
-  if (error != 0) {
-    TakeError(options_.htmlFile, std::strerror(error));
+  if (page != nullptr && page->Finish() != 0) {
+    TakePageError(page->Error());
   }
+}
+
+void StatusRun::TakePageError(int error) {
+  // What stands there and is no file is never replaced.
+  TakeError(options_.htmlFile, error == EEXIST ? "is no regular file" : std::strerror(error));
 }
 
 void StatusRun::AnswerQueues() {
@@ -144,6 +166,7 @@ void StatusRun::Watch() {
 }
 
 void StatusRun::Answer() {
+  options_.checkVideos = options_.checkVideos && CanCheckVideos();
   if (!options_.directories.empty()) AnswerDirectories();
   if (options_.queue) AnswerQueues();
   if (options_.progress) AnswerProgress();

@@ -2,6 +2,7 @@
 
 #include <CLI/CLI.hpp>
 
+#include <cstring>
 #include <iostream>
 
 namespace {
@@ -27,8 +28,9 @@ void AddOptions(CLI::App& app, Options& options) {
   app.add_flag("-r,--recursive", options.recursive, "look below the directories too")
       ->needs(directories);
   app.add_flag("--check-videos", options.checkVideos,
-               "look at videos too; this REMOVES thumbnails of videos that are outdated or of the "
-               "wrong orientation, and films of the wrong orientation");
+               "look at videos too, with the index service; this REMOVES thumbnails of videos that "
+               "are outdated or of the wrong orientation, and the Flash film or MPEG-4 conversion "
+               "of a rotated video that stands wrong");
   app.add_option("--html", options.htmlFile, "write a page with all photos to FILE")
       ->check(FindNameFault, "")
       ->type_name("FILE")
@@ -59,6 +61,19 @@ std::string FindContradiction(const Options& options) {
   return {};
 }
 
+/// Returns the arguments such that the library takes each literally: a value that begins with a
+/// bracket would be a list to it.
+std::vector<std::string> LiteralArguments(int argc, char** argv) {
+  std::vector<std::string> arguments;
+  // From the last to the first, as the library wants them.
+  for (int i = argc - 1; i > 0; --i) {
+    const std::string argument = argv[i];
+    const bool isListLike = !argument.empty() && std::strchr("[{%", argument.front()) != nullptr;
+    arguments.push_back(isListLike ? "./" + argument : argument);
+  }
+  return arguments;
+}
+
 }  // namespace
 
 ParseOutcome ParseOptions(int argc, char** argv, Options& options) {
@@ -67,7 +82,7 @@ ParseOutcome ParseOptions(int argc, char** argv, Options& options) {
     app.footer(kFooter);
     AddOptions(app, options);
     try {
-      app.parse(argc, argv);
+      app.parse(LiteralArguments(argc, argv));
     } catch (const CLI::ParseError& error) {
       return app.exit(error) == 0 ? ParseOutcome::kDone : ParseOutcome::kWrong;
     }

@@ -6,6 +6,7 @@
 #include <ostream>
 #include <string>
 
+#include "platform/velaindex.h"
 #include "progress/velamk_progress.h"
 #include "thumb/running_instances.h"
 
@@ -74,6 +75,11 @@ Json::Value DescribeProgress(const ProgressState& state) {
 
 ResumeState ReadResumeState() {
   ResumeState state;
+  if (IsFileExist("/etc/velainfo.conf") == 0) {
+    // Nothing holds conversion back where there are no settings; asking would only fill the log.
+    state.isReached = true;
+    return state;
+  }
   state.resumeTime = GetThumbConvResumeTime();
   state.isReached = IsThumbConvResumeTimeReached() == 1;
   timeval wait = {};

@@ -49,6 +49,11 @@ class ProgressView {
 
   void Show(const ProgressState& state) {
     const FollowedCount followed = ChooseCount(state.summary);
+    if (followed.unit != unit_) {
+      // Two counters have no rate in common.
+      rate_ = ProgressRate();
+      unit_ = followed.unit;
+    }
     rate_.Note(ProgressRate::Clock::now(), followed.count.completed);
     if (!asJson_ && isTerminal_) {
       const int width = TerminalWidth();
@@ -80,6 +85,7 @@ class ProgressView {
   const bool isTerminal_;
   const bool asJson_;
   ProgressRate rate_;
+  std::string unit_;
   std::string lastCounts_;
 };
 

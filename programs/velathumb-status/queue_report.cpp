@@ -28,13 +28,14 @@ constexpr QueueFile kQueueFiles[] = {{"photo", kPhotoQueue.tempFile, false},
 int64_t ReadQueue(const QueueFile& queue, const ScanErrorHandler& onError,
                   const std::function<void(const std::string&)>& visit) {
   int64_t count = 0;
-  const bool isRead = ForEachQueueEntry(queue.path, [&](const std::string& entry) {
+  errno = 0;
+  const QueueRead read = ForEachQueueEntry(queue.path, [&](const std::string& entry) {
     if (!entry.empty()) {
       ++count;
       visit(entry);
     }
   });
-  if (!isRead && errno != ENOENT) {
+  if (read != QueueRead::kWhole && errno != ENOENT) {
     onError(queue.path, std::strerror(errno));
   }
   return count;

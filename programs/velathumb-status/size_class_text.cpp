@@ -2,7 +2,7 @@
 
 #include <functional>
 
-#include "thumb_size_order.h"
+#include "storage/thumb_size_class.h"
 
 namespace {
 

@@ -7,37 +7,20 @@
 
 #include <cerrno>
 #include <cstdint>
+#include <string_view>
 
 #include "platform/velaindex.h"
-#include "thumb_size_order.h"
+#include "storage/thumb_size_class.h"
+#include "thumb/descriptor.h"
 
 namespace {
 
-/// No picture is shorter than the mark that every JPEG begins with.
-constexpr off_t kSmallestThumb = 2;
-
-class ReadDescriptor {
- public:
-  /// A pipe put in a thumbnail's place must not stop the scan.
-  explicit ReadDescriptor(const char* path)
-      : number_(open(path, O_RDONLY | O_CLOEXEC | O_NONBLOCK)) {}
-  ~ReadDescriptor() {
-    if (number_ >= 0) {
-      close(number_);
-    }
-  }
-  ReadDescriptor(const ReadDescriptor&) = delete;
-  ReadDescriptor& operator=(const ReadDescriptor&) = delete;
-
-  int Get() const { return number_; }
-
- private:
-  const int number_;
-};
+/// Everybody may write into a metadata directory: what does not begin as every JPEG does is not for
+/// the page, nor is what a link leads to.
+constexpr std::string_view kJpegBegin = "\xff\xd8\xff";
 
 bool IsEmbeddable(const struct stat& file) {
-  return S_ISREG(file.st_mode) && file.st_size >= kSmallestThumb &&
-         static_cast<uint64_t>(file.st_size) <= kLargestEmbeddedThumb;
+  return S_ISREG(file.st_mode) && static_cast<uint64_t>(file.st_size) <= kLargestEmbeddedThumb;
 }
 
 /// Returns at most `size` bytes from the beginning, nothing after a read error.
@@ -62,12 +45,15 @@ std::string ReadBytes(int file, size_t size) {
 }
 
 std::string ReadThumb(const char* path) {
-  const ReadDescriptor file(path);
+  // A pipe put in a thumbnail's place must not stop the scan.
+  const Descriptor file(open(path, O_RDONLY | O_CLOEXEC | O_NONBLOCK | O_NOFOLLOW));
   struct stat status = {};
-  if (file.Get() < 0 || fstat(file.Get(), &status) != 0 || !IsEmbeddable(status)) {
+  if (!file.IsOpen() || fstat(file.Get(), &status) != 0 || !IsEmbeddable(status)) {
     return std::string();
   }
-  return ReadBytes(file.Get(), static_cast<size_t>(status.st_size));
+  std::string bytes = ReadBytes(file.Get(), static_cast<size_t>(status.st_size));
+  const bool isJpeg = bytes.compare(0, kJpegBegin.size(), kJpegBegin) == 0;
+  return isJpeg ? bytes : std::string();
 }
 
 }  // namespace

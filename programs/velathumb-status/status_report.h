@@ -13,8 +13,8 @@
 struct PhotoReport {
   std::string path;
   PhotoThumbStates thumbs;
-  /// When the making of a size class failed (seconds since the epoch), by size class. Only looked
-  /// for when the photo lacks a thumbnail.
+  /// When the making of a missing or outdated thumbnail failed (seconds since the epoch), by size
+  /// class.
   std::array<std::optional<time_t>, kEAThumbCount> failures = {};
 
   /// Returns the file name.
@@ -64,7 +64,7 @@ class StatusSink {
   StatusSink& operator=(const StatusSink&) = delete;
   virtual ~StatusSink() = default;
 
-  virtual void BeginDirectory(const std::string& /*path*/, bool /*isQueued*/) {}
+  virtual void BeginDirectory() {}
   virtual void TakePhoto(const PhotoReport& /*photo*/) {}
   virtual void EndDirectory(const DirectoryReport& /*directory*/) {}
   virtual void TakeTotals(const StatusTotals& /*totals*/) {}

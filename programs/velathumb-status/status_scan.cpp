@@ -49,7 +49,10 @@ PhotoReport ReportPhoto(const std::string& path, const PhotoThumbStates& thumbs)
   photo.thumbs = thumbs;
   if (thumbs.Missing() > 0) {
     for (const EAThumbInfo& row : rgEAThumbInfo) {
-      photo.failures[static_cast<size_t>(row.size)] = FindFailMarker(path.c_str(), row);
+      const auto size = static_cast<size_t>(row.size);
+      if (photo.thumbs.IsLacking(size)) {
+        photo.failures[size] = FindFailMarker(path.c_str(), row);
+      }
     }
   }
   return photo;
@@ -71,6 +74,7 @@ class StatusScan {
  private:
   void ScanTree(const std::string& root);
   void ScanDirectory(const std::string& path);
+  bool ScanPhotos(DirectoryReport& directory);
   bool IsFirstVisit(const struct stat& directory);
 
   const ScanOptions options_;
@@ -82,6 +86,26 @@ class StatusScan {
 
 bool StatusScan::IsFirstVisit(const struct stat& directory) {
   return visited_.emplace(directory.st_dev, directory.st_ino).second;
+}
+
+bool StatusScan::ScanPhotos(DirectoryReport& directory) {
+  std::vector<PhotoReport> photos;
+  const bool isRead = ForEachPhotoStatus(
+      directory.path.c_str(), [&](const std::string& path, const PhotoThumbStates& thumbs) {
+        if (thumbs.lookup != PhotoLookup::kAbsent) {
+          photos.push_back(ReportPhoto(path, thumbs));
+        }
+      });
+  std::sort(photos.begin(), photos.end(),
+            [](const PhotoReport& a, const PhotoReport& b) { return a.path < b.path; });
+  for (const PhotoReport& photo : photos) {
+    if (photo.thumbs.lookup == PhotoLookup::kFailed) {
+      onError_(photo.path, "its thumbnails cannot be looked up");
+    }
+    directory.counts.Add(photo);
+    sink_.TakePhoto(photo);
+  }
+  return isRead;
 }
 
 void StatusScan::ScanDirectory(const std::string& path) {
@@ -100,15 +124,8 @@ void StatusScan::ScanDirectory(const std::string& path) {
   DirectoryReport directory;
   directory.path = path;
   directory.isQueued = IsQueued(kPhotoQueue, path.c_str());
-  sink_.BeginDirectory(path, directory.isQueued);
-  const bool isRead = ForEachPhotoStatus(
-      path.c_str(), [&](const std::string& photoPath, const PhotoThumbStates& thumbs) {
-        if (thumbs.isKnown) {
-          const PhotoReport photo = ReportPhoto(photoPath, thumbs);
-          directory.counts.Add(photo);
-          sink_.TakePhoto(photo);
-        }
-      });
+  sink_.BeginDirectory();
+  const bool isRead = ScanPhotos(directory);
   if (options_.checkVideos) {
     int videos = 0;
     const auto skip = [](const std::string&) {};

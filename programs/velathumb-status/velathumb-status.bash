@@ -2,10 +2,11 @@
 
 _velathumb_status() {
   local current=${COMP_WORDS[COMP_CWORD]} previous=${COMP_WORDS[COMP_CWORD - 1]}
-  local options='--photos --recursive --check-videos --html --queue --progress --resume-time
+  local options='-p -r -q -w -j -h --photos --recursive --check-videos --html --queue --progress --resume-time
     --watch --json --help --version'
   compopt -o filenames 2>/dev/null
-  if [[ $previous == --html ]]; then
+  # Bash takes the equals sign for a word of its own.
+  if [[ $previous == --html || ($previous == '=' && ${COMP_WORDS[COMP_CWORD - 2]} == --html) ]]; then
     mapfile -t COMPREPLY < <(compgen -f -- "$current")
   elif [[ $current == -* ]]; then
     compopt +o filenames 2>/dev/null

@@ -1,7 +1,10 @@
 #include "storage/creation_queue.h"
 
+#include <fcntl.h>
+#include <sys/stat.h>
 #include <unistd.h>
 
+#include <cerrno>
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
@@ -22,18 +25,21 @@ struct StreamCloser {
 /// The lines of a file, one at a time, of any length.
 class LineReader {
  public:
-  explicit LineReader(const char* file) : stream_(std::fopen(file, "re")) {}
+  /// Takes regular files only: others could keep the reader waiting for ever.
+  explicit LineReader(const char* file);
   ~LineReader() { std::free(line_); }
   LineReader(const LineReader&) = delete;
   LineReader& operator=(const LineReader&) = delete;
 
   bool IsOpen() const { return stream_ != nullptr; }
 
-  /// Reads the next line, its newline included. Returns false at the end.
+  /// Reads the next line, its newline included. Returns false at the end and when that failed.
   bool Next() {
     length_ = getline(&line_, &capacity_, stream_.get());
     return length_ >= 0;
   }
+
+  bool HasFailed() const { return std::ferror(stream_.get()) != 0; }
 
   size_t Length() const { return static_cast<size_t>(length_); }
 
@@ -49,12 +55,29 @@ class LineReader {
   ssize_t length_ = 0;
 };
 
+LineReader::LineReader(const char* file) {
+  const int descriptor = open(file, O_RDONLY | O_CLOEXEC | O_NONBLOCK | O_NOCTTY);
+  if (descriptor < 0) {
+    return;
+  }
+  struct stat status = {};
+  if (fstat(descriptor, &status) == 0 && S_ISREG(status.st_mode)) {
+    stream_.reset(fdopen(descriptor, "r"));
+  } else {
+    errno = S_ISDIR(status.st_mode) ? EISDIR : EINVAL;
+  }
+  if (stream_ == nullptr) {
+    close(descriptor);
+  }
+}
+
 }  // namespace
 
 bool HasQueueLine(const char* queueFile, const char* text) {
   char line[kPathBufferSize] = "";
   const int length = VLIBCFileGetLine(queueFile, text, line, sizeof line, kLineSearchFlags);
-  return length > 0 && static_cast<size_t>(length) == std::strlen(text);
+  // The platform promises no more than to give a line that equals the text when there is one.
+  return length > 0 && std::strlen(line) == std::strlen(text);
 }
 
 bool IsQueued(const CreationQueue& queue, const char* path) {
@@ -64,16 +87,16 @@ bool IsQueued(const CreationQueue& queue, const char* path) {
   return access(queue.file, R_OK) == 0 && HasQueueLine(queue.file, path);
 }
 
-bool ForEachQueueEntry(const char* queueFile,
-                       const std::function<void(const std::string&)>& visit) {
+QueueRead ForEachQueueEntry(const char* queueFile,
+                            const std::function<void(const std::string&)>& visit) {
   LineReader lines(queueFile);
   if (!lines.IsOpen()) {
-    return false;
+    return QueueRead::kNotOpened;
   }
   while (lines.Next()) {
     if (lines.Length() < kPathBufferSize) {
       visit(lines.WithoutNewline());
     }
   }
-  return true;
+  return lines.HasFailed() ? QueueRead::kBrokenOff : QueueRead::kWhole;
 }

@@ -26,6 +26,14 @@ bool HasQueueLine(const char* queueFile, const char* text);
 /// Returns true when one of the queue's two files holds a line equal to `path`.
 bool IsQueued(const CreationQueue& queue, const char* path);
 
+/// How the reading of a queue file has ended; errno tells why unless it was whole.
+enum class QueueRead {
+  kWhole,
+  kNotOpened,  ///< not there, no regular file, or not readable
+  kBrokenOff,  ///< by an error on the way
+};
+
 /// Reads a queue file and calls `visit` with each entry, without its newline; lines of 4096 bytes
-/// or more (newline included) are passed over. Returns false when the file cannot be opened.
-bool ForEachQueueEntry(const char* queueFile, const std::function<void(const std::string&)>& visit);
+/// or more (newline included) are passed over.
+QueueRead ForEachQueueEntry(const char* queueFile,
+                            const std::function<void(const std::string&)>& visit);

@@ -28,7 +28,7 @@ bool ForEachPhotoStatus(const char* dir, const PhotoStatusVisitor& visit) {
   }
   const int32_t sizeMap = DirectorySizeMap(dir);
   while (const char* name = entries.NextName()) {
-    if (EntryNameShouldIndex(name) == 0) {
+    if (EntryNameShouldIndex(name) != 1) {
       continue;
     }
     const std::string path = DirectoryEntryPath(dir, name);

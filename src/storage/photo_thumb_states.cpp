@@ -71,9 +71,11 @@ class PhotoThumbs {
 }  // namespace
 
 int PhotoThumbStates::Missing() const {
-  return static_cast<int>(std::count_if(states.begin(), states.end(), [](ThumbState state) {
-    return state == ThumbState::kMissing || state == ThumbState::kOutdated;
-  }));
+  int missing = 0;
+  for (size_t size = 0; size < states.size(); ++size) {
+    missing += IsLacking(size) ? 1 : 0;
+  }
+  return missing;
 }
 
 int PhotoThumbStates::Present() const {
@@ -85,6 +87,7 @@ PhotoThumbStates ReadPhotoThumbStates(const char* path, int32_t sizeMap) {
   if (IsFileExist(path) == 0) {
     return photo;
   }
+  photo.lookup = PhotoLookup::kFailed;
   char eaDir[kPathBufferSize] = "";
   if (VELAEADirPath(0, path, eaDir, sizeof eaDir) != 0) {
     syslog(LOG_ERR, "%s:%d [Error] get eadir: %s", kStatusLogSource, 89, path);
@@ -93,7 +96,7 @@ PhotoThumbStates ReadPhotoThumbStates(const char* path, int32_t sizeMap) {
   if (!ResolveSizeMap(path, sizeMap)) {
     return photo;
   }
-  photo.isKnown = true;
+  photo.lookup = PhotoLookup::kDone;
   PhotoThumbs thumbs(path, eaDir);
   for (const EAThumbInfo& row : rgEAThumbInfo) {
     if (IsThumbInSizeMap(row.name, sizeMap) != 0) {

@@ -2,6 +2,7 @@
 #pragma once
 
 #include <array>
+#include <cstddef>
 #include <cstdint>
 
 #include "storage/thumb_size_class.h"
@@ -13,10 +14,22 @@ enum class ThumbState {
   kOutdated,  ///< older than the photo, or empty
 };
 
+/// How the look at a photo has ended.
+enum class PhotoLookup {
+  kAbsent,  ///< there is no such file
+  kFailed,  ///< its thumbnails cannot be looked up
+  kDone,
+};
+
 /// The states of a photo's thumbnails by size class.
 struct PhotoThumbStates {
-  bool isKnown = false;  ///< false when the photo does not exist or could not be looked up
+  PhotoLookup lookup = PhotoLookup::kAbsent;
   std::array<ThumbState, kEAThumbCount> states = {};
+
+  /// Returns whether the thumbnail of the size class `size` is missing or outdated.
+  bool IsLacking(size_t size) const {
+    return states[size] == ThumbState::kMissing || states[size] == ThumbState::kOutdated;
+  }
 
   /// Returns how many thumbnails are missing or outdated.
   int Missing() const;

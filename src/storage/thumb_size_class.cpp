@@ -47,10 +47,7 @@ const char* GetEAThumbSizeString(int value) {
 }
 
 int IsThumbInSizeMap(const char* name, int32_t sizeMap) {
-  constexpr EA_THUMB_SIZE kOrder[kEAThumbCount] = {EA_THUMB_SIZE_S, EA_THUMB_SIZE_SM,
-                                                   EA_THUMB_SIZE_M, EA_THUMB_SIZE_B,
-                                                   EA_THUMB_SIZE_L, EA_THUMB_SIZE_XL};
-  for (const EA_THUMB_SIZE size : kOrder) {
+  for (const EA_THUMB_SIZE size : kThumbSizesSmallestFirst) {
     if (IsNameOf(rgEAThumbInfo[size], name)) {
       return (sizeMap & (1 << size)) != 0 ? 1 : 0;
     }

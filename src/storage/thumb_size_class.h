@@ -27,6 +27,11 @@ inline constexpr int kEAThumbCount = 6;
 /// The size classes by value.
 extern const EAThumbInfo rgEAThumbInfo[kEAThumbCount];
 
+/// The size classes from the smallest to the largest; their values are in another order.
+inline constexpr EA_THUMB_SIZE kThumbSizesSmallestFirst[kEAThumbCount] = {
+    EA_THUMB_SIZE_S, EA_THUMB_SIZE_SM, EA_THUMB_SIZE_M,
+    EA_THUMB_SIZE_B, EA_THUMB_SIZE_L,  EA_THUMB_SIZE_XL};
+
 /// Stores a pointer to rgEAThumbInfo in `out` and returns its row count, 6.
 int GetEAThumbInfoTable(const EAThumbInfo** out);
 

@@ -38,7 +38,8 @@ int IsVideoWorkNeeded(const char* path);
 /// Returns the number of videos in the tree `dir` that need work and do not wait in the video
 /// queue; 0, logged, when the directory does not exist or cannot be opened. Once a waiting video
 /// has been met in a directory, the videos listed after it in that directory are not counted.
-/// Removes what IsVideoWorkNeeded removes.
+/// A directory met again below itself, through a link, is not entered again; one met by several
+/// ways counts for each. Removes what IsVideoWorkNeeded removes.
 int CountVideoWork(const char* dir);
 
 /// Returns the number of videos that need work among the entries of the queue file `queueFile`; of

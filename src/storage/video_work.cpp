@@ -37,7 +37,7 @@ bool ListEntries(const char* dir, std::vector<std::string>& names) {
     return false;
   }
   while (const char* name = entries.NextName()) {
-    if (EntryNameShouldIndex(name) != 0) {
+    if (EntryNameShouldIndex(name) == 1) {
       names.emplace_back(name);
     }
   }
@@ -125,8 +125,7 @@ bool ReadVideoLevel(const char* dir, const SubdirectoryVisitor& onSubdirectory, 
   if (!ListEntries(dir, names)) {
     return false;
   }
-  // Kept for the whole level: the service takes a level's videos in the order of listing, so those
-  // behind a waiting one are reached with it.
+  // Kept for the whole level on purpose: what is listed behind a waiting video does not count.
   bool seenQueued = false;
   for (const std::string& name : names) {
     const std::string path = DirectoryEntryPath(dir, name.c_str());
@@ -150,12 +149,12 @@ int CountVideoQueueWork(const char* queueFile) {
   }
   const bool isMainQueue = std::strcmp(queueFile, kVideoQueue.file) == 0;
   int count = 0;
-  const bool isRead = ForEachQueueEntry(queueFile, [&](const std::string& entry) {
+  const QueueRead read = ForEachQueueEntry(queueFile, [&](const std::string& entry) {
     if (!isMainQueue || !HasQueueLine(kVideoQueue.tempFile, entry.c_str())) {
       count += CountEntryWork(entry);
     }
   });
-  if (!isRead) {
+  if (read == QueueRead::kNotOpened) {
     syslog(LOG_ERR, "%s:%d [Error] fopen: %s", kStatusLogSource, 416, queueFile);
   }
   return count;

@@ -288,6 +288,36 @@ TEST_F(SearchedFile, MayHaveMoreLinesThanAreWorthRemembering) {
   }
 }
 
+TEST_F(SearchedFile, WithTooManyLinesIsReadOnceForEachQuestionAfterTheFirst) {
+  const std::string content((size_t{8} << 20) + 10, '\n');
+  WriteFile(kFile, content + "/last\n");
+  Rest();
+  ASSERT_FALSE(Has("/nowhere"));
+  const auto size = static_cast<long long>(content.size());
+  for (int question = 0; question < 3; ++question) {
+    const long long before = BytesRead();
+    EXPECT_TRUE(Has("/last"));
+    EXPECT_FALSE(Has("/nowhere"));
+    const long long read = BytesRead() - before;
+    EXPECT_GE(read, 2 * size) << "bytes are not counted";
+    EXPECT_LT(read, 2 * size + size / 4);
+  }
+}
+
+TEST_F(SearchedFile, WithTooManyLinesIsRememberedOnceTheyAreFewer) {
+  const std::string content((size_t{8} << 20) + 10, '\n');
+  WriteFile(kFile, content);
+  Rest();
+  ASSERT_FALSE(Has("/nowhere"));
+  WriteFile(kFile, Lines(kLineCount));
+  Rest();
+  ASSERT_TRUE(Has(Line(7)));
+  const long long before = BytesRead();
+  EXPECT_FALSE(Has("/nowhere"));
+  EXPECT_TRUE(Has(Line(8)));
+  EXPECT_LT(BytesRead() - before, kLineCount * kLineSize / 4);
+}
+
 TEST_F(SearchedFile, IsNotTakenForOneOfAnotherNameWithTheSameContent) {
   WriteFile(kFile, Lines(kLineCount));
   Rest();

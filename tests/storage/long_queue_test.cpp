@@ -1,11 +1,13 @@
-// The tree scan with a photo queue of a million lines.
+// The scans of trees with queues of a million lines.
 #include <gmock/gmock.h>
 
 #include <chrono>
 #include <cstdio>
+#include <ostream>
 #include <string>
 #include <thread>
 
+#include "storage/creation_queue.h"
 #include "storage/velamk_thumb_status.h"
 #include "support/files.h"
 #include "support/sandbox.h"
@@ -13,13 +15,8 @@
 namespace vela_test {
 namespace {
 
-constexpr const char* kQueue = "/var/spool/thumb_create.queue";
 constexpr int kQueueLines = 1000000;
-constexpr int kDirectories = 1000;
-
-std::string DirectoryName(int number) {
-  return "/tmp/photos/d" + std::to_string(number);
-}
+constexpr int kWaiting = 10;  // entries of the tree in a queue
 
 /// Bytes that this process has read from files so far.
 long long BytesRead() {
@@ -28,60 +25,135 @@ long long BytesRead() {
   return bytes;
 }
 
-int ScanForPhotos() {
-  int photos = -77;
-  int thumbs = -77;
-  EXPECT_EQ(GetDirThumbStatusRecursive("/tmp/photos", &photos, &thumbs), 0);
-  return photos;
+/// Lets a file become old enough to be known again by its times.
+void Rest() {
+  std::this_thread::sleep_for(std::chrono::milliseconds(200));
 }
 
-/// A queue of a million lines, ten directories of the tree among them, last touched a
-/// moment ago.
-class LongQueue : public SandboxTest {
- protected:
-  void SetUp() override {
-    SandboxTest::SetUp();
-    WriteFile("/etc/velainfo.conf", "photo_thumb_size_map=\"1\"\n");
-    for (int i = 0; i < kDirectories; ++i) {
-      WriteFile(DirectoryName(i) + "/a.jpg", "photo");
-    }
-    std::string content;
-    for (int i = 0; i < kQueueLines; ++i) {
-      const bool isOfTree = i % (kQueueLines / 10) == 17;
-      content += isOfTree ? DirectoryName(i / (kQueueLines / 10) * 100)
-                          : "/tmp/other/photos/" + std::to_string(i);
-      content += '\n';
-    }
-    WriteFile(kQueue, content);
-    std::this_thread::sleep_for(std::chrono::milliseconds(200));
-  }
+std::string OtherEntry(int number) {
+  return "/tmp/other/media/" + std::to_string(number);
+}
+
+/// A scan and the tree that it goes through: one file that needs work in each directory.
+struct ScanCase {
+  const char* title;
+  const char* queueFile;
+  int directories;
+  bool isVideo;
 };
 
-TEST_F(LongQueue, IsReadOnceAndNotForEachDirectory) {
+/// Instead of the addresses of its members, which the test would be known by.
+void PrintTo(const ScanCase& scan, std::ostream* out) {
+  *out << scan.title;
+}
+
+class LongQueue : public SandboxTest, public ::testing::WithParamInterface<ScanCase> {
+ protected:
+  /// Makes a queue with ten entries of the tree in it, last touched a moment ago.
+  void SetUp() override {
+    SandboxTest::SetUp();
+    WriteFile("/etc/velainfo.conf", "photo_thumb_size_map=\"1\"\nvideo_thumb_size_map=\"1\"\n");
+    for (int i = 0; i < GetParam().directories; ++i) {
+      WriteFile(DirectoryName(i) + (GetParam().isVideo ? "/a.mp4" : "/a.jpg"), "media");
+    }
+    constexpr int kDistance = kQueueLines / kWaiting;
+    std::string content;
+    for (int i = 0; i < kQueueLines; ++i) {
+      const bool isOfTree = i % kDistance == 17;
+      content +=
+          isOfTree ? Entry(i / kDistance * GetParam().directories / kWaiting) : OtherEntry(i);
+      content += '\n';
+    }
+    WriteFile(Queue(), content);
+    Rest();
+  }
+
+  static const char* Queue() { return GetParam().queueFile; }
+
+  static std::string DirectoryName(int number) { return "/tmp/tree/d" + std::to_string(number); }
+
+  /// What the service would find in the queue for the directory.
+  static std::string Entry(int number) {
+    return DirectoryName(number) + (GetParam().isVideo ? "/a.mp4" : "");
+  }
+
+  static int CountWork() {
+    if (GetParam().isVideo) {
+      return CountVideoWork("/tmp/tree");
+    }
+    int photos = -77;
+    int thumbs = -77;
+    EXPECT_EQ(GetDirThumbStatusRecursive("/tmp/tree", &photos, &thumbs), 0);
+    return photos;
+  }
+
+  /// The work in the tree without what so many entries keep.
+  static int WorkBut(int waiting) { return GetParam().directories - waiting; }
+};
+
+TEST_P(LongQueue, IsReadOnceAndNotForEachQuestion) {
   const long long before = BytesRead();
-  EXPECT_EQ(ScanForPhotos(), kDirectories - 10);
+  EXPECT_EQ(CountWork(), WorkBut(kWaiting));
   const long long read = BytesRead() - before;
-  EXPECT_GE(read, FileSize(kQueue)) << "bytes are not counted";
-  EXPECT_LT(read, FileSize(kQueue) + FileSize(kQueue) / 4);
+  EXPECT_GE(read, FileSize(Queue())) << "bytes are not counted";
+  EXPECT_LT(read, FileSize(Queue()) + FileSize(Queue()) / 4);
 }
 
-TEST_F(LongQueue, IsNotReadAgainForAnotherScan) {
-  ScanForPhotos();
+TEST_P(LongQueue, IsNotReadAgainForAnotherScan) {
+  CountWork();
   const long long before = BytesRead();
-  EXPECT_EQ(ScanForPhotos(), kDirectories - 10);
-  EXPECT_LT(BytesRead() - before, FileSize(kQueue) / 4);
+  EXPECT_EQ(CountWork(), WorkBut(kWaiting));
+  EXPECT_LT(BytesRead() - before, FileSize(Queue()) / 4);
 }
 
-TEST_F(LongQueue, AChangeBetweenTwoScansIsSeen) {
-  EXPECT_EQ(ScanForPhotos(), kDirectories - 10);
-  AppendToFile(kQueue, DirectoryName(1) + "\n");
-  std::this_thread::sleep_for(std::chrono::milliseconds(200));
-  EXPECT_EQ(ScanForPhotos(), kDirectories - 11);
-  WriteFile("/var/spool/emptied", DirectoryName(1) + "\n" + DirectoryName(2) + "\n");
-  ASSERT_EQ(std::rename("/var/spool/emptied", kQueue), 0);
-  EXPECT_EQ(ScanForPhotos(), kDirectories - 2);
-  WriteFile(kQueue, DirectoryName(1) + "\n" + "/tmp/photos/dd" + "\n");
-  EXPECT_EQ(ScanForPhotos(), kDirectories - 1);
+TEST_P(LongQueue, AChangeBetweenTwoScansIsSeen) {
+  EXPECT_EQ(CountWork(), WorkBut(kWaiting));
+  AppendToFile(Queue(), Entry(1) + "\n");
+  Rest();
+  EXPECT_EQ(CountWork(), WorkBut(kWaiting + 1));
+  WriteFile("/var/spool/emptied", Entry(1) + "\n" + Entry(2) + "\n");
+  ASSERT_EQ(std::rename("/var/spool/emptied", Queue()), 0);
+  EXPECT_EQ(CountWork(), WorkBut(2));
+  WriteFile(Queue(), Entry(1) + "\n" + "/tmp/tree/dd" + "\n");
+  EXPECT_EQ(CountWork(), WorkBut(1));
+}
+
+INSTANTIATE_TEST_SUITE_P(
+    Queues, LongQueue,
+    ::testing::Values(ScanCase{"WaitingPhotos", kPhotoQueue.file, 1000, false},
+                      ScanCase{"PhotosInWork", kPhotoQueue.tempFile, 1000, false},
+                      ScanCase{"WaitingVideos", kVideoQueue.file, 200, true},
+                      ScanCase{"VideosInWork", kVideoQueue.tempFile, 200, true}),
+    [](const ::testing::TestParamInfo<ScanCase>& scan) { return std::string(scan.param.title); });
+
+class LongVideoQueues : public SandboxTest {};
+
+TEST_F(LongVideoQueues, AreEachReadOnceForTheWorkInThem) {
+  constexpr int kWaitingLines = 200000;
+  std::string inWork;
+  for (int i = 0; i < kQueueLines; ++i) {
+    inWork += OtherEntry(i) + '\n';
+  }
+  std::string waiting;
+  for (int i = 0; i < kWaitingLines; ++i) {
+    waiting += OtherEntry(-1 - i) + '\n';
+  }
+  for (const char* name : {"/tmp/both.mp4\n", "/tmp/second.mp4\n"}) {
+    inWork += name;
+  }
+  for (const std::string name : {"/tmp/both.mp4", "/tmp/a.mp4", "/tmp/b.mp4"}) {
+    WriteFile(name, "video");
+    waiting += name + '\n';
+  }
+  WriteFile(kVideoQueue.tempFile, inWork);
+  WriteFile(kVideoQueue.file, waiting);
+  Rest();
+  const long long size = FileSize(kVideoQueue.tempFile) + FileSize(kVideoQueue.file);
+  const long long before = BytesRead();
+  EXPECT_EQ(CountVideoQueueWork(kVideoQueue.file), 2);
+  const long long read = BytesRead() - before;
+  EXPECT_GE(read, size) << "bytes are not counted";
+  EXPECT_LT(read, size + size / 4);
 }
 
 }  // namespace

@@ -2,6 +2,8 @@
 #include <gmock/gmock.h>
 #include <sys/stat.h>
 
+#include <cerrno>
+#include <ostream>
 #include <string>
 #include <vector>
 
@@ -10,6 +12,11 @@
 #include "support/privileges.h"
 #include "support/sandbox.h"
 #include "support/system_log.h"
+
+/// Instead of the addresses of its members, which the test would be known by.
+static void PrintTo(const CreationQueue& queue, std::ostream* out) {
+  *out << queue.file;
+}
 
 namespace vela_test {
 namespace {
@@ -23,8 +30,9 @@ class QueueFile : public SandboxTest {
  protected:
   static std::vector<std::string> Entries() {
     std::vector<std::string> entries;
-    EXPECT_TRUE(ForEachQueueEntry(
-        kFile, [&entries](const std::string& entry) { entries.push_back(entry); }));
+    EXPECT_EQ(ForEachQueueEntry(kFile,
+                                [&entries](const std::string& entry) { entries.push_back(entry); }),
+              QueueRead::kWhole);
     return entries;
   }
 };
@@ -49,11 +57,22 @@ TEST_F(QueueFile, LongLinesArePassedOver) {
 
 TEST_F(QueueFile, OneThatCannotBeOpenedIsToldApartFromAnEmptyOne) {
   const auto visit = [](const std::string&) { ADD_FAILURE() << "no entry is there"; };
-  EXPECT_FALSE(ForEachQueueEntry(kFile, visit));
+  EXPECT_EQ(ForEachQueueEntry(kFile, visit), QueueRead::kNotOpened);
+  EXPECT_EQ(errno, ENOENT);
   WriteFile(kFile, "/a\n");
   ASSERT_EQ(chmod(kFile, 0), 0);
   const WithoutCapabilities ordinary;
-  EXPECT_FALSE(ForEachQueueEntry(kFile, visit));
+  EXPECT_EQ(ForEachQueueEntry(kFile, visit), QueueRead::kNotOpened);
+  EXPECT_EQ(errno, EACCES);
+}
+
+TEST_F(QueueFile, OnlyARegularFileIsRead) {
+  const auto visit = [](const std::string&) { ADD_FAILURE() << "no entry is there"; };
+  ASSERT_EQ(mkfifo(kFile, 0600), 0);
+  EXPECT_EQ(ForEachQueueEntry(kFile, visit), QueueRead::kNotOpened);
+  EXPECT_EQ(errno, EINVAL);
+  EXPECT_EQ(ForEachQueueEntry("/var/spool", visit), QueueRead::kNotOpened);
+  EXPECT_EQ(errno, EISDIR);
 }
 
 TEST_F(QueueFile, LeavesNoDescriptorOpen) {

@@ -16,6 +16,7 @@ namespace {
 
 using ::testing::ElementsAre;
 using ::testing::IsEmpty;
+using ::testing::IsSupersetOf;
 using ::testing::UnorderedElementsAre;
 using ::testing::UnorderedElementsAreArray;
 
@@ -67,18 +68,29 @@ TEST_F(Completion, ProposesTheOptionThatBeginsSo) {
   EXPECT_THAT(Complete({"--nothing"}), IsEmpty());
 }
 
-TEST_F(Completion, ProposesAllOptionsOfTheHelp) {
+/// The options of the help, in both their forms.
+std::vector<std::string> OptionsOfTheHelp() {
   std::vector<std::string> options;
   std::istringstream help(RunStatus({"--help"}).out);
   for (std::string line; std::getline(help, line);) {
-    const size_t begin = line.find("--");
-    const bool isOption = line.find_first_not_of(' ') != std::string::npos &&
-                          line[line.find_first_not_of(' ')] == '-';
-    if (isOption && begin != std::string::npos) {
-      options.push_back(line.substr(begin, line.find(' ', begin) - begin));
+    std::istringstream words(line);
+    std::string forms;
+    words >> forms;
+    if (line.compare(0, 3, "  -") != 0) {
+      continue;
+    }
+    std::istringstream list(forms);
+    for (std::string form; std::getline(list, form, ',');) {
+      options.push_back(form);
     }
   }
-  EXPECT_EQ(options.size(), 11U);
+  return options;
+}
+
+TEST_F(Completion, ProposesAllOptionsOfTheHelp) {
+  const std::vector<std::string> options = OptionsOfTheHelp();
+  EXPECT_EQ(options.size(), 17U);
+  EXPECT_THAT(options, IsSupersetOf({"-p", "--photos", "--html", "-w"}));
   EXPECT_THAT(Complete({"-"}), UnorderedElementsAreArray(options));
 }
 

@@ -261,7 +261,7 @@ TEST_F(HtmlPageInBrowser, APageWithTwoThousandPhotosIsShown) {
 
 TEST_F(HtmlPageInBrowser, AThumbThatIsNoPictureIsToldByItsName) {
   const PhotoReport photo = CompletePhoto("broken.jpg");
-  WriteFile(ThumbOf(photo, EA_THUMB_SIZE_S), "no picture");
+  WriteFile(ThumbOf(photo, EA_THUMB_SIZE_S), ThumbBytes("no picture"));
   WritePage({{"/photos", false, {photo}}});
   EXPECT_THAT(AskPage(kPage, {"all('img')[0].naturalWidth", "all('img')[0].alt"}),
               ElementsAre("0", PercentEncoded("Thumbnail of broken.jpg")));

@@ -33,7 +33,7 @@ DirectoryReport DirectoryReportOf(const PageDirectory& directory) {
 PhotoReport CompletePhoto(const std::string& name) {
   PhotoReport photo;
   photo.path = "/tmp/photos/" + name;
-  photo.thumbs.isKnown = true;
+  photo.thumbs.lookup = PhotoLookup::kDone;
   photo.thumbs.states.fill(ThumbState::kPresent);
   return photo;
 }
@@ -66,10 +66,14 @@ std::string OldThumbOf(const PhotoReport& photo, EA_THUMB_SIZE size) {
   return MetadataDirectoryOf(photo) + '/' + rgEAThumbInfo[size].oldName;
 }
 
+std::string ThumbBytes(const std::string& text) {
+  return "\xff\xd8\xff" + text;
+}
+
 void Report(StatusSink& sink, const std::vector<PageDirectory>& directories) {
   StatusTotals totals;
   for (const PageDirectory& directory : directories) {
-    sink.BeginDirectory(directory.path, directory.isQueued);
+    sink.BeginDirectory();
     for (const PhotoReport& photo : directory.photos) {
       sink.TakePhoto(photo);
     }

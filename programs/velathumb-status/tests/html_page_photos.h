@@ -34,6 +34,9 @@ std::string ThumbOf(const PhotoReport& photo, EA_THUMB_SIZE size);
 /// The same under its older name.
 std::string OldThumbOf(const PhotoReport& photo, EA_THUMB_SIZE size);
 
+/// What a thumbnail may hold: the beginning of every JPEG and the text behind it.
+std::string ThumbBytes(const std::string& text);
+
 /// One directory and its photos.
 struct PageDirectory {
   std::string path = "/tmp/photos";

@@ -13,6 +13,7 @@
 
 #include <algorithm>
 #include <cerrno>
+#include <ostream>
 #include <set>
 #include <string>
 #include <vector>
@@ -95,7 +96,7 @@ constexpr const char* kTimeText =
 
 TEST_F(HtmlPageTest, IsOneWholeDocumentThatLetsNothingRunOrLoad) {
   const PhotoReport photo = CompletePhoto("a.jpg");
-  WriteFile(ThumbOf(photo, EA_THUMB_SIZE_S), "thumb");
+  WriteFile(ThumbOf(photo, EA_THUMB_SIZE_S), ThumbBytes("thumb"));
   const std::string page = PageOfPhotos({photo, CompletePhoto("b.jpg")});
   EXPECT_THAT(page, StartsWith("<!DOCTYPE html>\n<html lang=\"en\">\n<head>\n<meta "
                                "charset=\"utf-8\">\n<meta http-equiv=\"Content-Security-Policy\" "
@@ -230,9 +231,10 @@ TEST_F(HtmlPageTest, WithoutADirectoryThereIsAPage) {
 
 TEST_F(HtmlPageTest, ACompletePhotoHasNoMark) {
   const PhotoReport photo = CompletePhoto("a.jpg");
-  WriteFile(ThumbOf(photo, EA_THUMB_SIZE_S), "thumb");
+  WriteFile(ThumbOf(photo, EA_THUMB_SIZE_S), ThumbBytes("thumb"));
   EXPECT_EQ(TileOf(photo),
-            "<li class=\"tile done\">\n<div class=\"pic\"><img " + EmbeddedForm("thumb") +
+            "<li class=\"tile done\">\n<div class=\"pic\"><img " +
+                EmbeddedForm(ThumbBytes("thumb")) +
                 " alt=\"Thumbnail of a.jpg\" width=\"160\" height=\"120\" loading=\"lazy\" "
                 "decoding=\"async\"></div>\n<p class=\"name\" title=\"a.jpg\"><bdi>a.jpg</bdi>"
                 "</p>\n");
@@ -312,7 +314,7 @@ TEST_F(HtmlPageTest, APhotoWithAnyThumbCouldBeConverted) {
   PhotoReport photo = PhotoInState("a.jpg", ThumbState::kMissing, AllSizes());
   photo.thumbs.states[EA_THUMB_SIZE_S] = ThumbState::kNotWanted;
   MarkFailed(photo, AllSizes(), kTime);
-  WriteFile(ThumbOf(photo, EA_THUMB_SIZE_S), "thumb");
+  WriteFile(ThumbOf(photo, EA_THUMB_SIZE_S), ThumbBytes("thumb"));
   const std::string tile = TileOf(photo);
   EXPECT_THAT(tile, Not(HasSubstr("could not be converted")));
   EXPECT_THAT(tile, HasSubstr("Could not be made: SM"));
@@ -336,7 +338,7 @@ TEST_F(HtmlPageTest, AMarkerBesideAPresentThumbIsNoFailure) {
 
 TEST_F(HtmlPageTest, APhotoThatCouldNotBeLookedUpSaysSo) {
   PhotoReport photo = PhotoInState("a.jpg", ThumbState::kNotWanted, AllSizes());
-  photo.thumbs.isKnown = false;
+  photo.thumbs.lookup = PhotoLookup::kFailed;
   const std::string tile = TileOf(photo);
   EXPECT_THAT(tile, StartsWith("<li class=\"tile unknown\">"));
   EXPECT_THAT(tile, HasSubstr("<strong class=\"mark\">Unknown</strong>"));
@@ -346,9 +348,15 @@ TEST_F(HtmlPageTest, APhotoThatCouldNotBeLookedUpSaysSo) {
 // Names
 
 struct NameCase {
+  const char* title;
   const char* name;
   const char* html;
 };
+
+/// Instead of the addresses of its members, which the test would be known by.
+void PrintTo(const NameCase& names, std::ostream* out) {
+  *out << names.title;
+}
 
 class HtmlPageName : public SandboxTest, public ::testing::WithParamInterface<NameCase> {};
 
@@ -358,7 +366,7 @@ TEST_P(HtmlPageName, IsEscapedInTextAndAttributes) {
   const std::string withoutThumb = TileOf(photo);
   EXPECT_THAT(withoutThumb,
               HasSubstr("<p class=\"name\" title=\"" + html + "\"><bdi>" + html + "</bdi></p>"));
-  WriteFile(ThumbOf(photo, EA_THUMB_SIZE_S), "thumb");
+  WriteFile(ThumbOf(photo, EA_THUMB_SIZE_S), ThumbBytes("thumb"));
   EXPECT_THAT(TileOf(photo), HasSubstr("\" alt=\"Thumbnail of " + html + "\" width=\"160\""));
 }
 
@@ -369,14 +377,19 @@ TEST_P(HtmlPageName, IsEscapedAsADirectory) {
 
 INSTANTIATE_TEST_SUITE_P(
     Hostile, HtmlPageName,
-    ::testing::Values(
-        NameCase{"plain name.jpg", "plain name.jpg"}, NameCase{"ÄÖ 日本.jpg", "ÄÖ 日本.jpg"},
-        NameCase{"<script>alert(1)", "&lt;script&gt;alert(1)"},
-        NameCase{"\"><img src=x onerror=alert(1)>", "&quot;&gt;&lt;img src=x onerror=alert(1)&gt;"},
-        NameCase{"' onload='x", "&apos; onload=&apos;x"},
-        NameCase{"a&lt;b&amp;", "a&amp;lt;b&amp;amp;"}, NameCase{"two\nlines", "two\nlines"},
-        NameCase{"--><b>", "--&gt;&lt;b&gt;"}, NameCase{"bad\xff\xfe.jpg", "bad\uFFFD\uFFFD.jpg"},
-        NameCase{"cut\xe6\x97", "cut\uFFFD\uFFFD"}, NameCase{"bell\a", "bell&#x7;"}));
+    ::testing::Values(NameCase{"Plain", "plain name.jpg", "plain name.jpg"},
+                      NameCase{"OtherAlphabets", "ÄÖ 日本.jpg", "ÄÖ 日本.jpg"},
+                      NameCase{"Element", "<script>alert(1)", "&lt;script&gt;alert(1)"},
+                      NameCase{"EndOfAttribute", "\"><img src=x onerror=alert(1)>",
+                               "&quot;&gt;&lt;img src=x onerror=alert(1)&gt;"},
+                      NameCase{"Apostrophe", "' onload='x", "&apos; onload=&apos;x"},
+                      NameCase{"Reference", "a&lt;b&amp;", "a&amp;lt;b&amp;amp;"},
+                      NameCase{"TwoLines", "two\nlines", "two\nlines"},
+                      NameCase{"EndOfComment", "--><b>", "--&gt;&lt;b&gt;"},
+                      NameCase{"BadBytes", "bad\xff\xfe.jpg", "bad\uFFFD\uFFFD.jpg"},
+                      NameCase{"CutCharacter", "cut\xe6\x97", "cut\uFFFD\uFFFD"},
+                      NameCase{"Control", "bell\a", "bell&#x7;"}),
+    [](const ::testing::TestParamInfo<NameCase>& test) { return std::string(test.param.title); });
 
 TEST_F(HtmlPageTest, OnlyTheLastComponentNamesAPhoto) {
   PhotoReport photo = CompletePhoto("a.jpg");
@@ -389,11 +402,10 @@ TEST_F(HtmlPageTest, OnlyTheLastComponentNamesAPhoto) {
 TEST_F(HtmlPageTest, TheSmallestThumbThatExistsIsShown) {
   const PhotoReport photo = CompletePhoto("a.jpg");
   for (const EA_THUMB_SIZE size : AllSizes()) {
-    WriteFile(ThumbOf(photo, size), std::string("content of ") + rgEAThumbInfo[size].sizeString);
+    WriteFile(ThumbOf(photo, size), ThumbBytes(rgEAThumbInfo[size].sizeString));
   }
   for (const char* size : {"120x120", "240x240", "320x320", "640x640", "800x800", "1280x1280"}) {
-    const std::string content = std::string("content of ") + size;
-    EXPECT_THAT(TileOf(photo), HasSubstr(EmbeddedForm(content))) << size;
+    EXPECT_THAT(TileOf(photo), HasSubstr(EmbeddedForm(ThumbBytes(size)))) << size;
     for (const EA_THUMB_SIZE other : AllSizes()) {
       if (std::string(rgEAThumbInfo[other].sizeString) == size) {
         RemoveTree(ThumbOf(photo, other));
@@ -405,18 +417,40 @@ TEST_F(HtmlPageTest, TheSmallestThumbThatExistsIsShown) {
 
 TEST_F(HtmlPageTest, AThumbUnderItsOlderNameIsShown) {
   const PhotoReport photo = CompletePhoto("a.jpg");
-  WriteFile(OldThumbOf(photo, EA_THUMB_SIZE_M), "older");
-  WriteFile(ThumbOf(photo, EA_THUMB_SIZE_L), "large");
-  EXPECT_THAT(TileOf(photo), HasSubstr(EmbeddedForm("older")));
+  WriteFile(OldThumbOf(photo, EA_THUMB_SIZE_M), ThumbBytes("older"));
+  WriteFile(ThumbOf(photo, EA_THUMB_SIZE_L), ThumbBytes("large"));
+  EXPECT_THAT(TileOf(photo), HasSubstr(EmbeddedForm(ThumbBytes("older"))));
 }
 
 TEST_F(HtmlPageTest, AThumbThatIsTooShortIsPassedOver) {
   const PhotoReport photo = CompletePhoto("a.jpg");
   WriteFile(ThumbOf(photo, EA_THUMB_SIZE_S), "");
-  WriteFile(ThumbOf(photo, EA_THUMB_SIZE_SM), "1");
+  WriteFile(ThumbOf(photo, EA_THUMB_SIZE_SM), "\xff");
+  WriteFile(ThumbOf(photo, EA_THUMB_SIZE_M), "\xff\xd8");
   EXPECT_THAT(TileOf(photo), HasSubstr("No thumbnail"));
-  WriteFile(ThumbOf(photo, EA_THUMB_SIZE_M), "22");
-  EXPECT_THAT(TileOf(photo), HasSubstr(EmbeddedForm("22")));
+  WriteFile(ThumbOf(photo, EA_THUMB_SIZE_B), ThumbBytes(""));
+  EXPECT_THAT(TileOf(photo), HasSubstr(EmbeddedForm(ThumbBytes(""))));
+}
+
+TEST_F(HtmlPageTest, WhatDoesNotBeginAsAJpegIsPassedOver) {
+  const PhotoReport photo = CompletePhoto("a.jpg");
+  const std::string others[] = {"root:x:0:0", "\x89PNG\r\n", "\xff\xd8 \xff", " \xff\xd8\xff",
+                                std::string("\0\xff\xd8\xff", 4)};
+  for (const std::string& other : others) {
+    WriteFile(ThumbOf(photo, EA_THUMB_SIZE_S), other);
+    EXPECT_THAT(TileOf(photo), HasSubstr("No thumbnail")) << other;
+  }
+  WriteFile(ThumbOf(photo, EA_THUMB_SIZE_XL), ThumbBytes("large"));
+  EXPECT_THAT(TileOf(photo), HasSubstr(EmbeddedForm(ThumbBytes("large"))));
+}
+
+TEST_F(HtmlPageTest, WhatALinkLeadsToIsPassedOver) {
+  const PhotoReport photo = CompletePhoto("a.jpg");
+  WriteFile("/tmp/secret.jpg", ThumbBytes("secret"));
+  WriteFile(ThumbOf(photo, EA_THUMB_SIZE_L), ThumbBytes("open"));
+  ASSERT_EQ(symlink("/tmp/secret.jpg", ThumbOf(photo, EA_THUMB_SIZE_S).c_str()), 0);
+  ASSERT_EQ(symlink("/tmp/secret.jpg", OldThumbOf(photo, EA_THUMB_SIZE_M).c_str()), 0);
+  EXPECT_THAT(TileOf(photo), HasSubstr(EmbeddedForm(ThumbBytes("open"))));
 }
 
 TEST_F(HtmlPageTest, AThumbThatIsNoFileIsPassedOver) {
@@ -428,32 +462,33 @@ TEST_F(HtmlPageTest, AThumbThatIsNoFileIsPassedOver) {
 
 TEST_F(HtmlPageTest, AThumbThatCannotBeReadIsPassedOver) {
   const PhotoReport photo = CompletePhoto("a.jpg");
-  WriteFile(ThumbOf(photo, EA_THUMB_SIZE_S), "secret");
-  WriteFile(ThumbOf(photo, EA_THUMB_SIZE_L), "open");
+  WriteFile(ThumbOf(photo, EA_THUMB_SIZE_S), ThumbBytes("secret"));
+  WriteFile(ThumbOf(photo, EA_THUMB_SIZE_L), ThumbBytes("open"));
   ASSERT_EQ(chmod(ThumbOf(photo, EA_THUMB_SIZE_S).c_str(), 0), 0);
   std::string tile;
   {
     const WithoutCapabilities unprivileged;
     tile = TileOf(photo);
   }
-  EXPECT_THAT(tile, HasSubstr(EmbeddedForm("open")));
+  EXPECT_THAT(tile, HasSubstr(EmbeddedForm(ThumbBytes("open"))));
 }
 
 TEST_F(HtmlPageTest, AThumbOfTheGreatestSizeIsShownAndALargerOneIsNot) {
   const PhotoReport photo = CompletePhoto("a.jpg");
-  WriteFileOfSize(ThumbOf(photo, EA_THUMB_SIZE_S), kLargestEmbeddedThumb + 1);
+  const std::string largest = ThumbBytes(std::string(4 * 1024 * 1024 - 3, 'x'));
+  WriteFile(ThumbOf(photo, EA_THUMB_SIZE_S), largest + 'x');
   EXPECT_THAT(TileOf(photo), HasSubstr("<span class=\"none\">No thumbnail</span>"));
-  WriteFileOfSize(ThumbOf(photo, EA_THUMB_SIZE_S), 4 * 1024 * 1024);
-  const std::string form = EmbeddedForm(std::string(4 * 1024 * 1024, 'x'));
-  EXPECT_TRUE(TileOf(photo).find(form) != std::string::npos);
+  WriteFile(ThumbOf(photo, EA_THUMB_SIZE_S), largest);
+  EXPECT_TRUE(TileOf(photo).find(EmbeddedForm(largest)) != std::string::npos);
 }
 
 TEST_F(HtmlPageTest, ALargePageIsWhole) {
   std::vector<PhotoReport> photos;
   for (int i = 0; i < 40; ++i) {
     photos.push_back(CompletePhoto(std::to_string(i)));
-    WriteFile(ThumbOf(photos.back(), EA_THUMB_SIZE_S),
-              std::string(static_cast<size_t>(i) * 3000 + 2, static_cast<char>('a' + i % 26)));
+    WriteFile(
+        ThumbOf(photos.back(), EA_THUMB_SIZE_S),
+        ThumbBytes(std::string(static_cast<size_t>(i) * 3000, static_cast<char>('a' + i % 26))));
   }
   const std::string page = PageOf({{"/a", false, photos}, {"/b", false, photos}});
   for (const PhotoReport& photo : photos) {
@@ -516,15 +551,24 @@ TEST_F(HtmlPageTest, TheFileHasThePermissionsOfANewFile) {
   EXPECT_EQ(ModeOf(kPage), 0666);
 }
 
-TEST_F(HtmlPageTest, ASymbolicLinkIsReplacedAndItsFileStays) {
-  WriteFile("/tmp/elsewhere", "old");
-  MakeDirectories(kPageDirectory);
-  ASSERT_EQ(symlink("/tmp/elsewhere", kPage), 0);
-  PageOfPhotos({CompletePhoto("a.jpg")});
+bool IsLink(const std::string& path) {
   struct stat status = {};
-  ASSERT_EQ(lstat(kPage, &status), 0);
-  EXPECT_TRUE(S_ISREG(status.st_mode));
-  EXPECT_EQ(ReadFile("/tmp/elsewhere"), "old");
+  EXPECT_EQ(lstat(path.c_str(), &status), 0) << path;
+  return S_ISLNK(status.st_mode);
+}
+
+TEST_F(HtmlPageTest, ALinkStaysAndWhatItLeadsToIsReplaced) {
+  WriteFile("/tmp/elsewhere/page.html", "old");
+  MakeDirectories(kPageDirectory);
+  ASSERT_EQ(symlink("/tmp/page/second", kPage), 0);
+  ASSERT_EQ(symlink("../elsewhere/page.html", "/tmp/page/second"), 0);
+  PageOfPhotos({CompletePhoto("a.jpg")});
+  EXPECT_TRUE(IsLink(kPage));
+  EXPECT_TRUE(IsLink("/tmp/page/second"));
+  EXPECT_FALSE(IsLink("/tmp/elsewhere/page.html"));
+  EXPECT_THAT(ReadFile("/tmp/elsewhere/page.html"), StartsWith("<!DOCTYPE html>"));
+  EXPECT_THAT(ListDirectory("/tmp/elsewhere"), ElementsAre("page.html"));
+  EXPECT_THAT(ListDirectory(kPageDirectory), ElementsAre("second", "status.html"));
 }
 
 TEST_F(HtmlPageTest, ADanglingLinkIsReplaced) {
@@ -632,7 +676,7 @@ TEST_F(HtmlPageTest, AVolumeThatIsFullDuringTheScanIsAnErrorAndTheOldFileStays) 
   SmallVolume volume(kPageDirectory, 1024 * 1024);
   WriteFile(kPage, "old");
   const PhotoReport photo = CompletePhoto("a.jpg");
-  WriteFileOfSize(ThumbOf(photo, EA_THUMB_SIZE_S), 200 * 1024);
+  WriteFile(ThumbOf(photo, EA_THUMB_SIZE_S), ThumbBytes(std::string(200 * 1024, 'x')));
   HtmlPage page(kPage);
   volume.SetAvailable(0);
   Report(page, {{"/a", false, {photo, photo}}});
@@ -647,7 +691,7 @@ TEST_F(HtmlPageTest, AVolumeThatIsFullAtTheEndIsAnErrorAndTheOldFileStays) {
   SmallVolume volume(kPageDirectory, 4 * 1024 * 1024);
   WriteFile(kPage, "old");
   const PhotoReport photo = CompletePhoto("a.jpg");
-  WriteFileOfSize(ThumbOf(photo, EA_THUMB_SIZE_S), 200 * 1024);
+  WriteFile(ThumbOf(photo, EA_THUMB_SIZE_S), ThumbBytes(std::string(200 * 1024, 'x')));
   HtmlPage page(kPage);
   Report(page, {{"/a", false, {photo, photo}}});
   volume.SetAvailable(0);

@@ -119,6 +119,25 @@ TEST_F(CommandLine, ADirectoryThatLooksLikeAnOptionStandsBehindTwoDashes) {
   EXPECT_EQ(answer["directories"][0]["path"], Json::Value("/tmp/-r"));
 }
 
+TEST_F(CommandLine, ADirectoryMayBeCalledAnything) {
+  ProgramOptions options;
+  options.workingDirectory = "/tmp/odd";
+  for (const std::string name : {"[x]", "[a,b]", "[]", "{}", "{a}", "%%", "%%[", "\"a\"", "'a'"}) {
+    MakePhoto("/tmp/odd/" + name + "/a.jpg");
+    for (const std::vector<std::string>& before : {std::vector<std::string>{}, {"--"}}) {
+      std::vector<std::string> arguments = {"--json"};
+      arguments.insert(arguments.end(), before.begin(), before.end());
+      arguments.push_back(name);
+      const Json::Value answer = ReadJson(RunStatus(arguments, options).out);
+      ASSERT_EQ(answer["directories"].size(), 1U) << name;
+      EXPECT_EQ(answer["directories"][0]["path"], Json::Value("/tmp/odd/" + name));
+      EXPECT_EQ(answer["directories"][0]["photos"], Json::Value(1)) << name;
+    }
+  }
+  EXPECT_EQ(RunStatus({"--html", "[page]", "{}", "[x]"}, options).exitCode, 1);
+  EXPECT_TRUE(IsRegularFile("/tmp/odd/[page]"));
+}
+
 TEST_F(CommandLine, SeveralQuestionsAreAllAnswered) {
   MakePhoto(std::string(kTop) + "/a.jpg");
   WriteFile("/var/spool/flv_create.queue", "/tmp/film.mp4\n");

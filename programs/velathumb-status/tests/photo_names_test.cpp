@@ -1,6 +1,8 @@
 // The photos that lack something, named.
 #include <gmock/gmock.h>
+#include <json/value.h>
 
+#include <algorithm>
 #include <string>
 #include <vector>
 
@@ -79,6 +81,41 @@ TEST_F(PhotoNames, MarkersOfCompletePhotosAreNotTold) {
   const StatusText answer = ReadStatusText(result.out);
   EXPECT_THAT(answer.directories.at(0).photos, IsEmpty());
   EXPECT_EQ(answer.totals.numbers.failed, 0);
+}
+
+TEST_F(PhotoNames, MarkersBesidePresentThumbsAreNoFailures) {
+  MakePhotoWith("a.jpg", kAllSizes - kBitM - kBitL);
+  SetFileTime(Derived("a.jpg", "VELAPHOTO_THUMB_XL.jpg"), kMediaTime - 1);
+  for (const char* marker : {"VELAPHOTO_THUMB_B.fail", "VELAPHOTO:THUMB_S.fail",
+                             "VELAPHOTO_THUMB_M.fail", "VELAPHOTO_THUMB_XL.fail"}) {
+    WriteFile(Derived("a.jpg", marker), "");
+  }
+  EXPECT_THAT(Named(), ElementsAre("a.jpg: missing M, L; outdated XL; failed M, XL"));
+  EXPECT_EQ(ReadStatusText(RunStatus({kTop}).out).totals.numbers, (StatusNumbers{1, 1, 3, 3, 2}));
+  const Json::Value answer = AskForJson({"--photos", kTop});
+  EXPECT_EQ(answer["totals"]["failure_markers"], Json::Value(2));
+  const Json::Value failed = answer["directories"][0]["photo_list"][0]["failed"];
+  ASSERT_EQ(failed.size(), 2U);
+  EXPECT_EQ(failed[0], Json::Value("M"));
+  EXPECT_EQ(failed[1], Json::Value("XL"));
+}
+
+TEST_F(PhotoNames, MarkersOfSizesThatAreNotWantedAreNoFailures) {
+  WriteFile("/etc/velainfo.conf", "photo_thumb_size_map=\"1\"\n");
+  MakePhotoWith("a.jpg", 0);
+  WriteFile(Derived("a.jpg", "VELAPHOTO_THUMB_B.fail"), "");
+  EXPECT_THAT(Named(), ElementsAre("a.jpg: missing S"));
+}
+
+TEST_F(PhotoNames, ComeInTheirOrder) {
+  WriteFile("/etc/velainfo.conf", "photo_thumb_size_map=\"1\"\n");
+  std::vector<std::string> expected;
+  for (const char* name : {"B", "a", "\xc3\xa4", "c 10", "c 9", "Z", "0"}) {
+    MakePhotoWith(std::string(name) + ".jpg", 0);
+    expected.push_back(std::string(name) + ".jpg: missing S");
+  }
+  std::sort(expected.begin(), expected.end());
+  EXPECT_EQ(Named(), expected);
 }
 
 TEST_F(PhotoNames, OutdatedThumbsUnderOlderNamesAreTold) {

@@ -3,6 +3,7 @@
 #include <json/value.h>
 #include <sys/stat.h>
 
+#include <chrono>
 #include <sstream>
 #include <string>
 #include <vector>
@@ -151,6 +152,24 @@ TEST_F(QueueAnswer, AnUnreadableFileIsAnErrorAndTheOthersAreAnswered) {
   EXPECT_EQ(result.exitCode, 2);
   EXPECT_EQ(result.err, std::string("velathumb-status: ") + kPhotoWork + ": Permission denied\n");
   EXPECT_THAT(result.out, HasSubstr("    /tmp/waiting\n"));
+}
+
+TEST_F(QueueAnswer, WhatIsNoFileIsAnErrorAtOnceAndTheOthersAreAnswered) {
+  ASSERT_EQ(mkfifo(kPhotoWork, 0666), 0);
+  MakeDirectories(kVideoWork);
+  WriteFile(kPhotoWaiting, "/tmp/waiting\n");
+  ProgramOptions options;
+  options.timeLimit = std::chrono::seconds(20);
+  const ProgramResult result = RunStatus({"--queue"}, options);
+  ASSERT_FALSE(result.timedOut);
+  EXPECT_EQ(result.exitCode, 2);
+  EXPECT_EQ(result.err, std::string("velathumb-status: ") + kPhotoWork +
+                            ": Invalid argument\nvelathumb-status: " + kVideoWork +
+                            ": Is a directory\n");
+  EXPECT_THAT(result.out, HasSubstr("    /tmp/waiting\n"));
+  const Json::Value answer = ReadJson(RunStatus({"--queue", "--json"}, options).out);
+  EXPECT_EQ(answer["errors"].size(), 2U);
+  EXPECT_THAT(PathsOf(answer["queues"][1]), ElementsAre("/tmp/waiting"));
 }
 
 }  // namespace

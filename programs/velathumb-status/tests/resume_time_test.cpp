@@ -8,6 +8,7 @@
 #include "status_program.h"
 #include "support/files.h"
 #include "support/sandbox.h"
+#include "support/system_log.h"
 
 namespace vela_test {
 namespace {
@@ -15,6 +16,7 @@ namespace {
 using ::testing::AllOf;
 using ::testing::Ge;
 using ::testing::HasSubstr;
+using ::testing::IsEmpty;
 using ::testing::Le;
 using ::testing::MatchesRegex;
 using ::testing::UnorderedElementsAre;
@@ -91,7 +93,11 @@ TEST_F(ResumeAnswer, JsonOfANegativeTimeIsNotReached) {
 }
 
 TEST_F(ResumeAnswer, WithoutSettingsNothingHoldsBack) {
-  EXPECT_EQ(RunStatus({"--resume-time"}).out, "conversion is not held back\n");
+  const ProgramResult result = RunStatus({"--resume-time"});
+  EXPECT_EQ(result.exitCode, 0);
+  EXPECT_EQ(result.out, "conversion is not held back\n");
+  EXPECT_EQ(AskForJson({"--resume-time"})["resume"]["reached"], Json::Value(true));
+  EXPECT_THAT(ErrorLines(), IsEmpty());
 }
 
 }  // namespace

@@ -64,6 +64,28 @@ TEST(ToPlainLineText, EscapesControlCharactersAndTheBackslashOnly) {
   EXPECT_EQ(ToPlainLine(""), "");
 }
 
+TEST(ToPlainLineText, EscapesTheControlsFrom80To9fAsCharactersAndAsBytes) {
+  EXPECT_EQ(ToPlainLine("a\xc2\x9b"
+                        "31mb"),
+            "a\\xc2\\x9b31mb");
+  EXPECT_EQ(ToPlainLine("\xc2\x80\xc2\x9f"), "\\xc2\\x80\\xc2\\x9f");
+  EXPECT_EQ(ToPlainLine("\x9b"
+                        "31m\x80\x9f"),
+            "\\x9b31m\\x80\\x9f");
+}
+
+TEST(ToPlainLineText, LeavesOtherCharactersAlthoughTheyHoldSuchBytes) {
+  for (const char* text : {"\xc2\xa0", "\xc3\x9b", "\xe2\x80\x93", "\xe6\x97\xa5\xe6\x9c\xac",
+                           "\xf0\x9f\x93\xb7", "\xed\x95\x9c"}) {
+    EXPECT_EQ(ToPlainLine(text), text);
+  }
+}
+
+TEST(ToPlainLineText, LeavesBytesThatAreNeitherCharactersNorControls) {
+  EXPECT_EQ(ToPlainLine("\xa0\xc2 \xff\xfe\xe4.jpg"), "\xa0\xc2 \xff\xfe\xe4.jpg");
+  EXPECT_EQ(ToPlainLine("cut \xe2\xac"), "cut \xe2\xac");
+}
+
 TEST(PutBytesInJson, AddsTheExactBytesOnlyWhenTheyAreNoUtf8) {
   Json::Value object;
   PutBytes(object, "name", "\xc3\xa4");

@@ -113,5 +113,29 @@ TEST_F(UnchangedFiles, AreLeftWhileAnInstanceRuns) {
   EXPECT_EQ(AllFiles(), before);
 }
 
+TEST_F(UnchangedFiles, AreLeftByAPageThatStandsElsewhere) {
+  MakeThumbs("/tmp/photos/below", "b.jpg", kBitS);
+  const std::vector<FileState> before = AllFiles();
+  const std::string page = "/dev/shm/page.html";
+  EXPECT_EQ(RunStatus({"--html", page, "--recursive", "/tmp/photos"}).exitCode, 1);
+  EXPECT_EQ(RunStatus({"--html", page, "--json", "-rp", "/tmp/photos"}).exitCode, 1);
+  EXPECT_EQ(AllFiles(), before);
+  EXPECT_TRUE(IsRegularFile(page));
+  EXPECT_EQ(RunStatus({"--html", "/tmp/photos", "/tmp/photos"}).exitCode, 2);
+  EXPECT_EQ(RunStatus({"--html", "/tmp/none/page.html", "/tmp/photos"}).exitCode, 2);
+  EXPECT_EQ(AllFiles(), before);
+}
+
+TEST_F(UnchangedFiles, AreLeftBesideAPage) {
+  RunStatus({"--html", "/tmp/photos/page.html", "-r", "/tmp/photos"});
+  const std::vector<std::string> tree = ListTree("/tmp/photos");
+  const FileState photo = StateOf("/tmp/photos/a.jpg");
+  const FileState metadata = StateOf("/tmp/photos/@eaDir/a.jpg");
+  RunStatus({"--html", "/tmp/photos/page.html", "-r", "/tmp/photos"});
+  EXPECT_EQ(ListTree("/tmp/photos"), tree);
+  EXPECT_EQ(StateOf("/tmp/photos/a.jpg"), photo);
+  EXPECT_EQ(StateOf("/tmp/photos/@eaDir/a.jpg"), metadata);
+}
+
 }  // namespace
 }  // namespace vela_test

@@ -5,6 +5,7 @@
 #include <signal.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <chrono>
 #include <sstream>
 #include <string>
@@ -138,6 +139,35 @@ TEST_F(Watching, WithoutTotalsTellsCountAndRate) {
   AddThumbs(0, 100);
   ASSERT_TRUE(WaitForOutput(watch, "\n100 thumbnails"));
   EXPECT_THAT(LinesOf(watch.Output()).back(), ContainsRegex("^100 thumbnails  [0-9]+\\.[0-9]/s$"));
+}
+
+TEST_F(Watching, TheRateBeginsAnewWithAnotherUnit) {
+  AddConvProgress(THUMB_TYPE_PHOTO, "total", 1000);
+  RunningConversion conversion;
+  Program watch = Start({"--watch", "--json"});
+  ASSERT_TRUE(WaitForOutput(watch, "\"unit\":\"photos\""));
+  AddConvProgress(THUMB_TYPE_PHOTO, "completed", 10);
+  ASSERT_TRUE(WaitForOutput(watch, "\"completed\":10,"));
+  // The total comes last: it is what makes thumbnails the unit.
+  AddThumbs(0, 4000);
+  AddThumbs(5000, 0);
+  ASSERT_TRUE(WaitForOutput(watch, "\"unit\":\"thumbnails\""));
+  AddThumbs(0, 10);
+  ASSERT_TRUE(WaitForOutput(watch, "\"completed\":4010,"));
+  const std::vector<std::string> lines = LinesOf(watch.Output());
+  std::vector<std::string> units;
+  double fastest = 0;
+  for (const std::string& line : lines) {
+    const Json::Value moment = ReadJson(line);
+    const bool isFirstOfUnit = units.empty() || units.back() != moment["unit"].asString();
+    EXPECT_EQ(moment["rate"].isNull(), isFirstOfUnit) << line;
+    units.push_back(moment["unit"].asString());
+    fastest = std::max(fastest, moment["rate"].isNull() ? 0 : moment["rate"].asDouble());
+  }
+  EXPECT_EQ(units.front(), "photos");
+  EXPECT_EQ(units.back(), "thumbnails");
+  // Ten in at least the half second between two looks.
+  EXPECT_LE(fastest, 25);
 }
 
 TEST_F(Watching, JsonIsOneObjectALine) {

@@ -3,6 +3,7 @@
 #include <fcntl.h>
 
 #include <array>
+#include <cerrno>
 #include <mutex>
 #include <string>
 
@@ -21,12 +22,14 @@ struct IndexedFile {
   std::string path;
   struct stat version = {};
   LineIndex index;
+  bool isTooLong = false;  // for an index; known, so that it is not tried again
 };
 
 /// Holds an index for each of the few files that one process asks about, the oldest giving way.
 class LineIndexCache {
  public:
   std::optional<bool> Find(const char* path, std::string_view text);
+  bool IsTooLong(const char* path, const struct stat& now);
   void Add(IndexedFile&& file);
 
  private:
@@ -49,12 +52,18 @@ std::optional<bool> LineIndexCache::Find(const char* path, std::string_view text
   if (stat(path, &now) != 0 || now.st_size < kSmallestIndexedFile) return std::nullopt;
   const std::lock_guard<std::mutex> lock(mutex_);
   const IndexedFile* file = Current(path, now);
-  if (file == nullptr) return std::nullopt;
+  if (file == nullptr || file->isTooLong) return std::nullopt;
   if (!file->index.MayHold(text)) return false;
 
   const FileDescriptor fd(open(path, O_RDONLY | O_CLOEXEC | O_NONBLOCK | O_NOCTTY));
   if (!fd || fstat(fd.Get(), &now) != 0 || !IsSameVersion(file->version, now)) return std::nullopt;
   return file->index.Holds(fd.Get(), text);
+}
+
+bool LineIndexCache::IsTooLong(const char* path, const struct stat& now) {
+  const std::lock_guard<std::mutex> lock(mutex_);
+  const IndexedFile* file = Current(path, now);
+  return file != nullptr && file->isTooLong;
 }
 
 void LineIndexCache::Add(IndexedFile&& file) {
@@ -84,7 +93,11 @@ void IndexLines(const char* path, int fd) {
   IndexedFile file;
   if (fstat(fd, &file.version) != 0 || !S_ISREG(file.version.st_mode)) return;
   if (file.version.st_size < kSmallestIndexedFile || !IsAtRest(file.version)) return;
-  if (lseek(fd, 0, SEEK_SET) != 0 || file.index.Read(fd) != 0) return;
+  if (Cache().IsTooLong(path, file.version) || lseek(fd, 0, SEEK_SET) != 0) return;
+  const int error = file.index.Read(fd);
+  if (error != 0 && error != ENOMEM) return;
+  file.isTooLong = error == ENOMEM;
+  if (file.isTooLong) file.index = LineIndex();
   file.path = path;
   Cache().Add(std::move(file));
 }

@@ -1,0 +1,146 @@
+// The check of videos when it cannot be made: nothing is removed then.
+#include <gmock/gmock.h>
+#include <json/value.h>
+
+#include <cerrno>
+#include <string>
+#include <vector>
+
+#include "missing_video_library.h"
+#include "status_program.h"
+#include "status_text.h"
+#include "storage/media_fixture.h"
+#include "support/daemon_peer.h"
+#include "support/files.h"
+#include "support/films.h"
+#include "support/sandbox.h"
+
+namespace vela_test {
+namespace {
+
+using ::testing::ElementsAre;
+using ::testing::HasSubstr;
+using ::testing::IsEmpty;
+using ::testing::Not;
+
+constexpr const char* kTop = "/tmp/films";
+constexpr const char* kVideo = "/tmp/films/a.mp4";
+constexpr const char* kThumb = "/tmp/films/@eaDir/a.mp4/VELAPHOTO_THUMB_M.jpg";
+constexpr const char* kVideoQueue = "/var/spool/flv_create.queue";
+constexpr const char* kNoService =
+    "velathumb-status: --check-videos: the index service does not answer; no video was checked\n";
+constexpr const char* kNoLibrary =
+    "velathumb-status: --check-videos: the library that reads videos is not installed; no video "
+    "was checked\n";
+
+/// A video with an outdated thumbnail, which the check removes.
+class VideoCheckFault : public SandboxTest {
+ protected:
+  void SetUp() override {
+    SandboxTest::SetUp();
+    WriteFile(kVideo, "video");
+    SetFileTime(kVideo, kMediaTime);
+    WriteFile(kThumb, "thumb");
+    SetFileTime(kThumb, kMediaTime - 1);
+    WriteFile(kVideoQueue, std::string(kVideo) + "\n");
+  }
+
+  /// Asks in every way; each time there is this one message and nothing is removed.
+  static void ExpectNothingChecked(const std::string& message) {
+    const std::vector<std::string> before = ListTree("/tmp");
+    const ProgramResult directory = RunStatus({"--check-videos", kTop});
+    EXPECT_EQ(directory.exitCode, 2);
+    EXPECT_EQ(directory.err, message);
+    EXPECT_EQ(ReadStatusText(directory.out).totals.videos, "-");
+    const ProgramResult queue = RunStatus({"--check-videos", "--queue"});
+    EXPECT_EQ(queue.exitCode, 2);
+    EXPECT_EQ(queue.err, message);
+    EXPECT_THAT(queue.out, HasSubstr(std::string("    ") + kVideo + "\n    1 entry\n"));
+    EXPECT_THAT(queue.out, Not(HasSubstr("videos that need work")));
+    ExpectNothingCheckedInJson();
+    EXPECT_EQ(ListTree("/tmp"), before);
+  }
+
+  /// Proves that something would be removed.
+  static void ExpectChecked() {
+    const ProgramResult result = RunStatus({"--check-videos", "--queue", "-r", kTop});
+    EXPECT_EQ(result.exitCode, 1);
+    EXPECT_EQ(result.err, "");
+    EXPECT_FALSE(Exists(kThumb));
+  }
+
+ private:
+  static void ExpectNothingCheckedInJson() {
+    const ProgramResult result =
+        RunStatus({"--json", "--check-videos", "--recursive", "--queue", kTop});
+    EXPECT_EQ(result.exitCode, 2);
+    const Json::Value answer = ReadJson(result.out);
+    EXPECT_EQ(answer["directories"][0]["videos_needing_work"], Json::Value());
+    EXPECT_EQ(answer["totals"]["videos_needing_work"], Json::Value());
+    ASSERT_EQ(answer["queues"].size(), 4U);
+    EXPECT_EQ(answer["queues"][3]["videos_needing_work"], Json::Value());
+    EXPECT_EQ(answer["queues"][3]["entries"].size(), 1U);
+    EXPECT_EQ(answer["errors"].size(), 1U);
+  }
+};
+
+TEST_F(VideoCheckFault, WithoutTheIndexServiceNothingIsRemoved) {
+  ExpectNothingChecked(kNoService);
+  const DaemonPeer service;
+  ExpectChecked();
+}
+
+TEST_F(VideoCheckFault, AServiceThatFailsIsNone) {
+  DaemonPeer service;
+  service.Answer("GET_INDEX_VERSION", DaemonReply::CloseAfterRequest());
+  ExpectNothingChecked(kNoService);
+  EXPECT_THAT(service.Commands(),
+              ElementsAre("GET_INDEX_VERSION", "GET_INDEX_VERSION", "GET_INDEX_VERSION"));
+  service.SetIndexVersion(0);
+  ExpectChecked();
+}
+
+TEST_F(VideoCheckFault, WithoutTheVideoLibraryNothingIsRemoved) {
+  DaemonPeer service;
+  {
+    const MissingVideoLibrary missing;
+    ExpectNothingChecked(kNoLibrary);
+    EXPECT_THAT(service.Commands(), IsEmpty());
+  }
+  ExpectChecked();
+}
+
+TEST_F(VideoCheckFault, OtherQuestionsNeedNoVideoLibrary) {
+  const MissingVideoLibrary missing;
+  const ProgramResult result = RunStatus({"--queue", "--progress", "--resume-time", "-rp", kTop});
+  EXPECT_EQ(result.exitCode, 1);
+  EXPECT_EQ(result.err, "");
+}
+
+/// What a new process is told about the videos, see video_probe.
+std::string Probe(const std::vector<std::string>& files) {
+  const ProgramResult result = RunProgram(HostPath(VIDEO_PROBE_FILE), files);
+  EXPECT_EQ(result.exitCode, 0) << result.err;
+  return result.out;
+}
+
+TEST_F(VideoCheckFault, WithoutTheVideoLibraryEveryQuestionFailsForWantOfIt) {
+  const std::string film = MakeFilm("/tmp/films/b.mp4");
+  const std::vector<std::string> files = {film, kVideo, film};
+  const std::string noLibrary = "-1:" + std::to_string(ELIBACC) + ' ';
+  const std::string noFile = "-1:" + std::to_string(ENOENT) + ' ';
+  const std::string noVideo = "-1:" + std::to_string(EINVAL) + ' ';
+  {
+    const MissingVideoLibrary missing;
+    std::string expected;
+    for (size_t i = 0; i < files.size(); ++i) {
+      expected += noLibrary + noLibrary + noLibrary + '\n';
+    }
+    EXPECT_EQ(Probe(files), expected);
+    EXPECT_EQ(Probe({"/tmp/none.mp4"}), noFile + noFile + noFile + '\n');
+  }
+  EXPECT_EQ(Probe({film, kVideo}), "0:0 0:0 0:0 \n" + noVideo + noVideo + noVideo + '\n');
+}
+
+}  // namespace
+}  // namespace vela_test

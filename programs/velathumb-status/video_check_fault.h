@@ -1,0 +1,8 @@
+// Whether videos can be checked at all.
+#pragma once
+
+#include <string>
+
+/// Returns why no video can be checked now, empty when they can. Without the index service every
+/// video counts as landscape, and the check would remove the thumbnails of all others.
+std::string FindVideoCheckFault();
