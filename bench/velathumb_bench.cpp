@@ -10,6 +10,7 @@
 #include <vector>
 
 #include "answering_daemon.h"
+#include "daemon_bench.h"
 #include "photo_tree.h"
 #include "support/build_paths.h"
 #include "support/files.h"
@@ -173,25 +174,42 @@ void WriteLongQueue(int lines) {
   }
 }
 
-/// The status of a large tree against a listing of the same files.
+/// Runs the status scan of a tree; `peak` receives its peak memory in MiB.
+Cost RunScan(const std::string& root, double& peak) {
+  return TimedRun({HostPath(VELATHUMB_STATUS), "--recursive", root},
+                  [&peak](int pid) { peak = std::max(peak, MemoryOf(pid).peak); });
+}
+
+void ReportScanMemory(const char* what, double peak) {
+  std::printf("%-34s %9.1f MiB\n", what, peak);
+}
+
+/// The status of a large tree against a listing of the same files, and whether its memory grows
+/// with the photos.
 void MeasureScan() {
   constexpr int kDirectories = 1000;
   constexpr int kPhotos = 100;
   constexpr int kAll = kDirectories * kPhotos;
+  const std::string small = kScratch + "/small";
+  MakeTree(small, kDirectories / 10, kPhotos);
+  double peak = 0;
+  RunScan(small, peak);
+  ReportScanMemory("status scan, peak, 10,000 photos", peak);
+  vela_test::RemoveTree(small);
+
   const std::string root = kScratch + "/tree";
   MakeTree(root, kDirectories, kPhotos);
-  double peak = 0;
-  const auto runSubject = [&] {
-    return TimedRun({HostPath(VELATHUMB_STATUS), "--recursive", root},
-                    [&peak](int pid) { peak = std::max(peak, MemoryOf(pid).peak); });
-  };
   const auto runFloor = [&] { return TimedRun({"/usr/bin/find", root, "-type", "f"}); };
+  peak = 0;
+  const auto runSubject = [&] { return RunScan(root, peak); };
   const CostPair alone = FastestOf(3, runSubject, runFloor);
+  ReportScanMemory("status scan, peak, 100,000 photos", peak);
   Report("status scan, a photo", alone.subject, alone.floor, kAll, "");
-  std::printf("%-34s %9.1f MiB\n", "peak memory of the scan", peak);
   WriteLongQueue(1000000);
   const CostPair queued = FastestOf(3, runSubject, runFloor);
   Report("with 1,000,000 lines in the queue", queued.subject, queued.floor, kAll, "");
+  ReportScanMemory("peak with the queue's index", peak);
+  vela_test::RemoveTree("/var/spool/thumb_create.queue");
   vela_test::RemoveTree(root);
 }
 
@@ -209,6 +227,7 @@ int main(int argc, char** argv) {
   std::printf("%-34s %12s %12s\n", "", "velathumb", "floor");
   vela_bench::MeasureStart();
   vela_bench::MeasureNothingToDo();
+  vela_bench::MeasureDaemon();
   vela_bench::MeasureMemory();
   vela_bench::MeasureScan();
   vela_bench::MeasureConversion();

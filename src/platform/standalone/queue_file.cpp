@@ -23,15 +23,18 @@ constexpr int kFlags = O_RDWR | O_APPEND | O_CLOEXEC | O_NONBLOCK | O_NOCTTY;
 /// Opens the queue file, which is made when missing, with its mode whatever the process's mask.
 /// Returns 0 or an errno value.
 int OpenQueue(const char* path, FileDescriptor& file) {
-  file.Reset(open(path, kFlags));
-  if (file) return 0;
-  if (errno != ENOENT) return errno;
-  file.Reset(open(path, kFlags | O_CREAT | O_EXCL, kQueueMode));
-  if (file) return fchmod(file.Get(), kQueueMode) == 0 ? 0 : errno;
-  if (errno != EEXIST) return errno;
-  // Made by another writer just now; a link that leads nowhere stays as it is.
-  file.Reset(open(path, kFlags));
-  return file ? 0 : errno;
+  for (;;) {
+    file.Reset(open(path, kFlags));
+    if (file) return 0;
+    if (errno != ENOENT) return errno;
+    file.Reset(open(path, kFlags | O_CREAT | O_EXCL, kQueueMode));
+    if (file) return fchmod(file.Get(), kQueueMode) == 0 ? 0 : errno;
+    if (errno != EEXIST) return errno;
+    // A link that leads nowhere stays as it is. Else made by another writer just now, and it may be
+    // renamed away again as soon.
+    struct stat status;
+    if (lstat(path, &status) == 0 && S_ISLNK(status.st_mode)) return ENOENT;
+  }
 }
 
 /// A locked queue file.

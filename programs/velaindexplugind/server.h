@@ -1,0 +1,105 @@
+// The daemon's side of all connections.
+#pragma once
+
+#include <systemd/sd-event.h>
+
+#include <chrono>
+#include <cstdint>
+#include <functional>
+#include <memory>
+#include <string>
+#include <unordered_map>
+
+#include "connection.h"
+#include "event_source.h"
+#include "request_handler.h"
+#include "request_log.h"
+#include "worker_pool.h"
+
+/// How much the server lets happen at once, and for how long.
+struct ServerLimits {
+  int workers = 4;                         ///< threads that read media files
+  size_t clients = 2048;                   ///< connections; more wait in the socket's queue
+  std::chrono::seconds clientTimeout{30};  ///< for a client that keeps still
+};
+
+/// Takes connections and requests and answers them. Everything but the carrying out of requests
+/// happens on the event loop's thread.
+class Server {
+ public:
+  Server(sd_event* loop, const ServerLimits& limits, const RequestHandler& handler,
+         RequestLog& log);
+  ~Server();
+  Server(const Server&) = delete;
+  Server& operator=(const Server&) = delete;
+
+  /// Begins to take connections from the listening socket. Returns 0 or an errno value; throws
+  /// std::system_error when threads cannot be started.
+  int Start(int listener);
+
+  /// Takes new settings for the requests to come.
+  void SetSettings(const Settings& settings) { settings_ = settings; }
+
+  /// Takes no more connections, after those that wait already where `takesWaiting` says so, and
+  /// lets those go that have not sent a request. Calls `onIdle` as soon as the last one is
+  /// answered; the listening socket may be closed after the call.
+  void BeginStop(bool takesWaiting, std::function<void()> onIdle);
+
+  /// Requests that are being carried out.
+  size_t JobsInHand() const { return jobsInHand_; }
+
+ private:
+  using Clock = Connection::Clock;
+  struct Client;
+
+  static int OnListener(sd_event_source* source, int fd, uint32_t events, void* server);
+  static int OnPauseEnd(sd_event_source* source, uint64_t time, void* server);
+  static int OnClient(sd_event_source* source, int fd, uint32_t events, void* client);
+  static int OnDone(sd_event_source* source, int fd, uint32_t events, void* server);
+  static int OnSweep(sd_event_source* source, uint64_t time, void* server);
+
+  int WatchListener(int listener);
+  bool AcceptSome();
+  void PauseAccepting(int error);
+  void ResumeAccepting();
+  void LetUnheardGo();
+  void Welcome(Descriptor socket);
+  void Serve(Client& client, uint32_t events);
+  void Step(Client& client, uint32_t events);
+  void Receive(Client& client);
+  void Dispatch(Client& client);
+  void GiveToWorkers(Client& client, Request request);
+  void TakeDoneJobs();
+  void TakeDoneJob(Job& job);
+  void Refuse(Client& client, const std::string& error, bool drains);
+  void Finish(Client& client, const Request* request, Answer answer, bool drains);
+  void SendReply(Client& client);
+  void Watch(Client& client);
+  void Sweep();
+  void ArmSweep();
+  void Drop(const Client& client);
+  void ReportIdle();
+
+  sd_event* const loop_;
+  const ServerLimits limits_;
+  const RequestHandler& handler_;
+  RequestLog& log_;
+  Settings settings_;
+  std::function<void()> onIdle_;  ///< set while the server stops
+
+  DoneJobs done_;
+  size_t jobsInHand_ = 0;
+  std::unordered_map<uint64_t, std::unique_ptr<Client>> clients_;
+  uint64_t lastClient_ = 0;
+  int listener_ = -1;
+  EventSource listenerSource_;
+  EventSource pauseSource_;
+  EventSource doneSource_;
+  EventSource sweepSource_;
+  bool isSweepArmed_ = false;
+
+  // The last to come and the first to go: their threads use what is above.
+  std::unique_ptr<WorkerPool> files_;
+  std::unique_ptr<WorkerPool> indexReads_;
+  std::unique_ptr<WorkerPool> indexWrites_;
+};

@@ -1,0 +1,8 @@
+// The daemon as a service: its beginning, its signals and its end.
+#pragma once
+
+#include "options.h"
+
+/// Runs the daemon until a signal ends it. Returns the exit status: 0, or 1 when it could not
+/// start, which is then logged.
+int RunService(const Options& options);

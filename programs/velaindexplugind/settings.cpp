@@ -1,0 +1,49 @@
+#include "settings.h"
+
+#include <array>
+#include <cerrno>
+#include <cstring>
+#include <optional>
+
+#include "platform/vlibc.h"
+#include "whole_number.h"
+
+namespace {
+
+constexpr char kSettingsFile[] = "/etc/velainfo.conf";
+
+/// Long enough for all values that mean something here; a longer one is cut and means nothing.
+using Value = std::array<char, 64>;
+
+/// Returns whether the key is there; a file that is missing has none.
+bool FindValue(const char* key, Value& value, std::string& warning) {
+  const int found = VLIBCFileGetKeyValue(kSettingsFile, key, value.data(), value.size(), 0);
+  if (found < 0 && VLIBCErrGet() != ENOENT) {
+    warning = std::string(kSettingsFile) + ": " + std::strerror(VLIBCErrGet());
+  }
+  return found > 0;
+}
+
+bool IsYes(const char* key, std::string& warning) {
+  Value value;
+  return FindValue(key, value, warning) && std::strcmp(value.data(), "yes") == 0;
+}
+
+int32_t ReadIndexVersion(std::string& warning) {
+  Value value;
+  if (!FindValue("index_version", value, warning)) return 0;
+  const std::optional<int32_t> number = ParseWholeNumber(value.data());
+  if (!number) warning = "index_version is no number from 0 to 2147483647, 0 is used";
+  return number.value_or(0);
+}
+
+}  // namespace
+
+Settings ReadSettings(std::string& warning) {
+  warning.clear();
+  Settings settings;
+  settings.indexVersion = ReadIndexVersion(warning);
+  settings.isPhotoConvertDisabled = IsYes("disable_convert_photo", warning);
+  settings.isVideoConvertDisabled = IsYes("disable_convert_video", warning);
+  return settings;
+}

@@ -1,0 +1,176 @@
+#include "index_daemon.h"
+
+#include <json/reader.h>
+#include <json/writer.h>
+#include <poll.h>
+#include <sqlite3.h>
+#include <sys/socket.h>
+#include <sys/un.h>
+
+#include <array>
+#include <chrono>
+#include <csignal>
+#include <cstring>
+#include <functional>
+#include <thread>
+#include <utility>
+
+#include "ipc/velamk_ipc.h"
+#include "support/files.h"
+
+namespace vela_test {
+
+namespace {
+
+constexpr int kReceiveMilliseconds = 60000;
+
+/// Waits, as long as it may take on a busy machine.
+bool WaitUntil(const std::function<bool()>& condition) {
+  const auto end = std::chrono::steady_clock::now() + std::chrono::seconds(60);
+  while (!condition()) {
+    if (std::chrono::steady_clock::now() > end) return false;
+    std::this_thread::sleep_for(std::chrono::milliseconds(5));
+  }
+  return true;
+}
+
+}  // namespace
+
+std::string IndexDaemonPath() {
+  return HostPath(VELAINDEXPLUGIND_FILE);
+}
+
+IndexDaemon::IndexDaemon(std::vector<std::string> arguments, const ProgramOptions& options)
+    : program_(StartProgram(IndexDaemonPath(), arguments, options)) {
+  // A connection would take part in what the test counts.
+  EXPECT_TRUE(WaitForLog("event=settings")) << program_.Error();
+}
+
+ProgramResult IndexDaemon::End(int signal) {
+  program_.Kill(signal);
+  return program_.Wait().value_or(ProgramResult());
+}
+
+size_t IndexDaemon::Descriptors() const {
+  return ListDirectory("/proc/" + std::to_string(program_.Pid()) + "/fd").size();
+}
+
+bool IndexDaemon::WaitForDescriptors(size_t count) const {
+  return WaitUntil([&] { return Descriptors() == count; });
+}
+
+bool IndexDaemon::WaitForLog(const std::string& text) const {
+  return WaitUntil([&] { return program_.Error().find(text) != std::string::npos; });
+}
+
+Descriptor ConnectToDaemon() {
+  sockaddr_un address{};
+  address.sun_family = AF_UNIX;
+  std::strncpy(address.sun_path, PluginDaemonSocketPath, sizeof address.sun_path - 1);
+  Descriptor connection(socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0));
+  const auto* generic = reinterpret_cast<const sockaddr*>(&address);
+  if (connect(connection.Get(), generic, sizeof address) != 0) return Descriptor();
+  return connection;
+}
+
+void SendBytes(const Descriptor& connection, const std::string& bytes) {
+  size_t sent = 0;
+  while (sent < bytes.size()) {
+    const ssize_t count =
+        send(connection.Get(), bytes.data() + sent, bytes.size() - sent, MSG_NOSIGNAL);
+    if (count < 0) return;
+    sent += static_cast<size_t>(count);
+  }
+}
+
+std::string ReceiveAll(const Descriptor& connection, bool* isEnded) {
+  std::string bytes;
+  std::array<char, 4096> chunk;
+  ssize_t got = 1;
+  while (got > 0) {
+    pollfd waiting = {connection.Get(), POLLIN, 0};
+    if (poll(&waiting, 1, kReceiveMilliseconds) != 1) break;
+    got = recv(connection.Get(), chunk.data(), chunk.size(), 0);
+    if (got > 0) bytes.append(chunk.data(), static_cast<size_t>(got));
+  }
+  if (isEnded != nullptr) *isEnded = got <= 0;
+  return bytes;
+}
+
+std::string AskWithBytes(const std::string& line) {
+  const Descriptor connection = ConnectToDaemon();
+  EXPECT_TRUE(connection.IsOpen());
+  SendBytes(connection, line + "\n");
+  bool isEnded = false;
+  const std::string reply = ReceiveAll(connection, &isEnded);
+  EXPECT_TRUE(isEnded) << "the daemon does not close the connection";
+  return reply;
+}
+
+Json::Value ParseReply(const std::string& bytes) {
+  Json::Value reply;
+  const size_t newline = bytes.find('\n');
+  EXPECT_EQ(newline + 1, bytes.size()) << "not one line: " << bytes;
+  const std::unique_ptr<Json::CharReader> reader(Json::CharReaderBuilder().newCharReader());
+  std::string errors;
+  EXPECT_TRUE(reader->parse(bytes.data(), bytes.data() + bytes.size(), &reply, &errors))
+      << bytes << errors;
+  if (!reply.isObject()) {
+    ADD_FAILURE() << "no object: " << bytes;
+    reply = Json::Value(Json::objectValue);
+  }
+  return reply;
+}
+
+Json::Value Ask(const Json::Value& request) {
+  Json::StreamWriterBuilder builder;
+  builder["indentation"] = "";
+  builder["emitUTF8"] = true;
+  return ParseReply(AskWithBytes(Json::writeString(builder, request)));
+}
+
+Json::Value PathRequest(const std::string& command, const std::string& path) {
+  Json::Value request(Json::objectValue);
+  request["command"] = command;
+  request["path"] = path;
+  return request;
+}
+
+Json::Value AskForMedia(const std::string& path, int type) {
+  Json::Value request = PathRequest("GET_MEDIA_FROM_PLUGIN_DB", path);
+  request["type"] = type;
+  const Json::Value reply = Ask(request);
+  return reply["success"] == Json::Value(true) ? reply["media"] : Json::Value();
+}
+
+Json::Value AskForVersion(const std::string& path) {
+  return Ask(PathRequest("GET_INDEX_VERSION", path))["version"];
+}
+
+bool SetVersion(const std::string& path, const Json::Value& version) {
+  Json::Value request = PathRequest("SET_INDEX_VERSION", path);
+  request["version"] = version;
+  return Ask(request)["success"] == Json::Value(true);
+}
+
+std::vector<std::string> Query(const std::string& sql, const std::string& database) {
+  sqlite3* opened = nullptr;
+  EXPECT_EQ(sqlite3_open_v2(database.c_str(), &opened, SQLITE_OPEN_READWRITE, nullptr), SQLITE_OK);
+  const std::unique_ptr<sqlite3, int (*)(sqlite3*)> owner(opened, sqlite3_close);
+  sqlite3_busy_timeout(opened, 10000);
+  std::vector<std::string> rows;
+  const auto takeRow = [](void* result, int count, char** values, char** /*names*/) {
+    std::string row;
+    for (int i = 0; i < count; ++i) {
+      if (i > 0) row += '|';
+      row += values[i] == nullptr ? "NULL" : values[i];
+    }
+    static_cast<std::vector<std::string>*>(result)->push_back(row);
+    return 0;
+  };
+  EXPECT_EQ(sqlite3_exec(opened, sql.c_str(), takeRow, &rows, nullptr), SQLITE_OK)
+      << sqlite3_errmsg(opened) << ": " << sql;
+  return rows;
+}
+
+}  // namespace vela_test

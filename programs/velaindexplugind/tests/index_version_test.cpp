@@ -1,0 +1,216 @@
+// Index versions, switches and posts.
+#include <csignal>
+#include <ctime>
+#include <string>
+#include <vector>
+
+#include "index_daemon.h"
+#include "ipc/velamk_ipc.h"
+#include "support/files.h"
+
+namespace vela_test {
+namespace {
+
+using Rows = std::vector<std::string>;
+
+constexpr const char* kSettings = "/etc/velainfo.conf";
+
+class IndexVersionTest : public IndexDaemonTest {};
+class SwitchTest : public IndexDaemonTest {};
+class PostTest : public IndexDaemonTest {};
+
+ProgramResult RunDaemonCommand(const std::vector<std::string>& arguments) {
+  return RunProgram(IndexDaemonPath(), arguments);
+}
+
+TEST_F(IndexVersionTest, IsNoughtWithoutSettings) {
+  RemoveTree(kSettings);
+  const IndexDaemon daemon;
+  EXPECT_EQ(GetIndexVersion("/photos/a.jpg"), 0);
+}
+
+TEST_F(IndexVersionTest, IsThatOfTheSettings) {
+  WriteFile(kSettings, "index_version=\"7\"\n");
+  const IndexDaemon daemon;
+  EXPECT_EQ(GetIndexVersion("/photos/a.jpg"), 7);
+}
+
+TEST_F(IndexVersionTest, IsNoughtWhenTheSettingIsNoWholeNumber) {
+  for (const char* value : {"2147483648", "-1", "1.5", "3x", "x", "", " "}) {
+    WriteFile(kSettings, std::string("index_version=\"") + value + "\"\n");
+    IndexDaemon daemon;
+    EXPECT_EQ(GetIndexVersion("/photos/a.jpg"), 0) << value;
+    EXPECT_NE(daemon.End(SIGTERM).err.find("index_version is no number"), std::string::npos);
+  }
+}
+
+TEST_F(IndexVersionTest, MayBeTheLargestNumber) {
+  WriteFile(kSettings, "index_version=\"2147483647\"\n");
+  const IndexDaemon daemon;
+  EXPECT_EQ(GetIndexVersion("/photos/a.jpg"), 2147483647);
+}
+
+TEST_F(IndexVersionTest, OfTheNearestDirectoryHolds) {
+  WriteFile(kSettings, "index_version=\"7\"\n");
+  const IndexDaemon daemon;
+  ASSERT_TRUE(SetVersion("/photos", 1));
+  ASSERT_TRUE(SetVersion("/photos/2024/raw", 3));
+  EXPECT_EQ(GetIndexVersion("/photos"), 1);
+  EXPECT_EQ(GetIndexVersion("/photos/a.jpg"), 1);
+  EXPECT_EQ(GetIndexVersion("/photos/2024/a.jpg"), 1);
+  EXPECT_EQ(GetIndexVersion("/photos/2024/raw/b/c/a.jpg"), 3);
+  EXPECT_EQ(GetIndexVersion("/photos/2024/rawer/a.jpg"), 1);
+  EXPECT_EQ(GetIndexVersion("/photos2/a.jpg"), 7);
+  EXPECT_EQ(GetIndexVersion("/"), 7);
+}
+
+TEST_F(IndexVersionTest, OfADirectoryMayBeNought) {
+  WriteFile(kSettings, "index_version=\"7\"\n");
+  const IndexDaemon daemon;
+  ASSERT_TRUE(SetVersion("/photos", 0));
+  EXPECT_EQ(GetIndexVersion("/photos/a.jpg"), 0);
+}
+
+TEST_F(IndexVersionTest, OfTheRootIsForAll) {
+  const IndexDaemon daemon;
+  ASSERT_TRUE(SetVersion("/", 4));
+  EXPECT_EQ(GetIndexVersion("/photos/a.jpg"), 4);
+  EXPECT_EQ(GetIndexVersion("/"), 4);
+}
+
+TEST_F(IndexVersionTest, PathsMayBeWrittenInSeveralWays) {
+  const IndexDaemon daemon;
+  ASSERT_TRUE(SetVersion("//photos/./new/", 4));
+  EXPECT_EQ(GetIndexVersion("/photos/new/a.jpg"), 4);
+  EXPECT_EQ(GetIndexVersion("/photos//new//a.jpg"), 4);
+  EXPECT_EQ(GetIndexVersion("/photos/new/../old/a.jpg"), 0);
+  ASSERT_TRUE(SetVersion("/photos/new", Json::Value()));
+  EXPECT_EQ(GetIndexVersion("/photos/new/a.jpg"), 0);
+}
+
+TEST_F(IndexVersionTest, ThatIsRemovedGivesWayToTheNextAbove) {
+  const IndexDaemon daemon;
+  ASSERT_TRUE(SetVersion("/photos", 1));
+  ASSERT_TRUE(SetVersion("/photos/new", 2));
+  ASSERT_TRUE(SetVersion("/photos/new", Json::Value()));
+  EXPECT_EQ(GetIndexVersion("/photos/new/a.jpg"), 1);
+  EXPECT_TRUE(SetVersion("/photos/none", Json::Value())) << "there was none to remove";
+}
+
+TEST_F(IndexVersionTest, OfADirectorySurvivesARestart) {
+  {
+    IndexDaemon daemon;
+    ASSERT_TRUE(SetVersion("/photos \xff\n", 5));
+    daemon.End(SIGKILL);
+  }
+  const IndexDaemon daemon;
+  EXPECT_EQ(GetIndexVersion("/photos \xff\n/a.jpg"), 5);
+}
+
+TEST_F(IndexVersionTest, IsSetFromTheCommandLine) {
+  const IndexDaemon daemon;
+  EXPECT_EQ(RunDaemonCommand({"--set-index-version", "/photos/a=b=12"}).exitCode, 0);
+  EXPECT_EQ(GetIndexVersion("/photos/a=b/x.jpg"), 12);
+  EXPECT_EQ(RunDaemonCommand({"--unset-index-version", "/photos/a=b"}).exitCode, 0);
+  EXPECT_EQ(GetIndexVersion("/photos/a=b/x.jpg"), 0);
+}
+
+TEST_F(IndexVersionTest, CommandLineTellsThatNobodyAnswers) {
+  const ProgramResult result = RunDaemonCommand({"--set-index-version", "/photos=1"});
+  EXPECT_EQ(result.exitCode, 1);
+  EXPECT_EQ(result.err, "velaindexplugind: no daemon answers at /tmp/velaindexplugind_sock\n");
+}
+
+TEST_F(IndexVersionTest, CommandLineTellsWhyTheDaemonRefuses) {
+  const IndexDaemon daemon;
+  const ProgramResult result =
+      RunDaemonCommand({"--unset-index-version", "/" + std::string(5000, 'x')});
+  EXPECT_EQ(result.exitCode, 1);
+  EXPECT_EQ(result.err, "velaindexplugind: path is longer than 4095 bytes\n");
+}
+
+TEST_F(IndexVersionTest, CommandLineRefusesWrongUse) {
+  const std::vector<std::vector<std::string>> wrong = {
+      {"--set-index-version", "/photos"},
+      {"--set-index-version", "/photos="},
+      {"--set-index-version", "/photos=-1"},
+      {"--set-index-version", "/photos=2147483648"},
+      {"--set-index-version", "photos=1"},
+      {"--set-index-version", "=1"},
+      {"--unset-index-version", "photos"},
+      {"--unset-index-version", ""},
+      {"--set-index-version", "/a=1", "--unset-index-version", "/a"},
+      {"--workers", "0"},
+      {"--client-timeout", "0"},
+      {"--database", ""},
+      {"--no-such-option"},
+      {"word"}};
+  for (const auto& arguments : wrong) {
+    const ProgramResult result = RunDaemonCommand(arguments);
+    EXPECT_EQ(result.exitCode, 2) << arguments.back();
+    EXPECT_NE(result.err, "") << arguments.back();
+  }
+}
+
+TEST_F(SwitchTest, IsOffUnlessTheSettingIsYes) {
+  for (const char* value : {"no", "", "YES", "yes ", "1", "true", "yess"}) {
+    WriteFile(kSettings, std::string("disable_convert_photo=\"") + value +
+                             "\"\ndisable_convert_video=\"" + value + "\"\n");
+    IndexDaemon daemon;
+    EXPECT_FALSE(IsDisableConvertPhoto()) << value;
+    EXPECT_FALSE(IsDisableConvertVideo()) << value;
+    EXPECT_EQ(daemon.End(SIGTERM).exitCode, 0);
+  }
+}
+
+TEST_F(SwitchTest, EachKindHasItsOwn) {
+  WriteFile(kSettings, "disable_convert_photo=\"yes\"\n");
+  {
+    IndexDaemon daemon;
+    EXPECT_TRUE(IsDisableConvertPhoto());
+    EXPECT_FALSE(IsDisableConvertVideo());
+    EXPECT_EQ(daemon.End(SIGTERM).exitCode, 0);
+  }
+  WriteFile(kSettings, "disable_convert_video=\"yes\"\n");
+  const IndexDaemon daemon;
+  EXPECT_FALSE(IsDisableConvertPhoto());
+  EXPECT_TRUE(IsDisableConvertVideo());
+}
+
+TEST_F(SwitchTest, SettingsAreReadAnewAtHangUpOnly) {
+  WriteFile(kSettings, "");
+  IndexDaemon daemon;
+  WriteFile(kSettings,
+            "disable_convert_photo=\"yes\"\ndisable_convert_video=\"yes\"\nindex_version=\"9\"\n");
+  EXPECT_FALSE(IsDisableConvertPhoto());
+  EXPECT_EQ(GetIndexVersion("/a"), 0);
+  daemon.Process().Kill(SIGHUP);
+  ASSERT_TRUE(daemon.WaitForLog("index_version=9"));
+  EXPECT_TRUE(IsDisableConvertPhoto());
+  EXPECT_TRUE(IsDisableConvertVideo());
+  EXPECT_EQ(GetIndexVersion("/a"), 9);
+}
+
+TEST_F(PostTest, IsStoredWithItsKindAndTime) {
+  const IndexDaemon daemon;
+  const std::time_t before = std::time(nullptr);
+  PostPhotoConvert("/photos/a \xff.jpg");
+  PostVideoConvert("/photos/b.mp4");
+  const std::time_t after = std::time(nullptr);
+  EXPECT_EQ(Query("SELECT hex(path), kind FROM posted ORDER BY kind"),
+            (Rows{"2F70686F746F732F6120FF2E6A7067|1", "2F70686F746F732F622E6D7034|2"}));
+  EXPECT_EQ(Query("SELECT count(*) FROM posted WHERE posted_at BETWEEN " + std::to_string(before) +
+                  " AND " + std::to_string(after)),
+            Rows{"2"});
+}
+
+TEST_F(PostTest, LatestTakesThePlaceOfTheEarlier) {
+  const IndexDaemon daemon;
+  PostPhotoConvert("/photos/a.jpg");
+  Query("UPDATE posted SET posted_at = 5");
+  PostPhotoConvert("/photos/a.jpg");
+  EXPECT_EQ(Query("SELECT count(*), min(posted_at) > 5 FROM posted"), Rows{"1|1"});
+}
+
+}  // namespace
+}  // namespace vela_test

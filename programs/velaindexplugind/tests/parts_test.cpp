@@ -1,0 +1,60 @@
+// The small parts by themselves.
+#include <gtest/gtest.h>
+
+#include <chrono>
+#include <optional>
+#include <string>
+
+#include "index_path.h"
+#include "rate_limit.h"
+#include "whole_number.h"
+
+namespace vela_test {
+namespace {
+
+TEST(PlainPathTest, HasOneFormForAllSpellings) {
+  EXPECT_EQ(PlainPath("/"), "/");
+  EXPECT_EQ(PlainPath("//"), "/");
+  EXPECT_EQ(PlainPath("///a"), "/a");
+  EXPECT_EQ(PlainPath("//a"), "/a");
+  EXPECT_EQ(PlainPath("/a/"), "/a");
+  EXPECT_EQ(PlainPath("/a//b/./c/."), "/a/b/c");
+  EXPECT_EQ(PlainPath("/a/../b"), "/b");
+  EXPECT_EQ(PlainPath("/.."), "/");
+  EXPECT_EQ(PlainPath("/a/b/.."), "/a");
+  EXPECT_EQ(PlainPath("/a \xff\n"), "/a \xff\n");
+  EXPECT_EQ(PlainPath("/...a"), "/...a");
+}
+
+TEST(ParentOfTest, GoesUpToTheRootAndEnds) {
+  EXPECT_EQ(ParentOf("/a/bc/d"), "/a/bc");
+  EXPECT_EQ(ParentOf("/a"), "/");
+  EXPECT_EQ(ParentOf("/"), "");
+}
+
+TEST(ParseWholeNumberTest, TakesDigitsOnly) {
+  EXPECT_EQ(ParseWholeNumber("0"), 0);
+  EXPECT_EQ(ParseWholeNumber("2147483647"), 2147483647);
+  EXPECT_EQ(ParseWholeNumber("007"), 7);
+  for (const char* wrong : {"", " 1", "1 ", "+1", "-1", "-0", "1.0", "0x1", "2147483648", "1e3"}) {
+    EXPECT_EQ(ParseWholeNumber(wrong), std::nullopt) << wrong;
+  }
+}
+
+TEST(RateLimitTest, LetsABurstPassInEachStretch) {
+  const RateLimit::Clock::time_point begin = RateLimit::Clock::now();
+  RateLimit limit(2, std::chrono::seconds(10));
+  int heldBack = 0;
+  EXPECT_TRUE(limit.Pass(begin, heldBack));
+  EXPECT_TRUE(limit.Pass(begin, heldBack));
+  EXPECT_FALSE(limit.Pass(begin, heldBack));
+  EXPECT_FALSE(limit.Pass(begin + std::chrono::seconds(9), heldBack));
+  EXPECT_EQ(heldBack, 0);
+  EXPECT_TRUE(limit.Pass(begin + std::chrono::seconds(10), heldBack));
+  EXPECT_EQ(heldBack, 2);
+  EXPECT_TRUE(limit.Pass(begin + std::chrono::seconds(11), heldBack));
+  EXPECT_EQ(heldBack, 0);
+}
+
+}  // namespace
+}  // namespace vela_test

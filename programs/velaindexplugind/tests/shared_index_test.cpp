@@ -1,0 +1,169 @@
+// The index database: shared with other programs, and never damaged.
+#include <gmock/gmock.h>
+#include <sys/stat.h>
+
+#include <chrono>
+#include <csignal>
+#include <cstdio>
+#include <ctime>
+#include <string>
+#include <thread>
+#include <vector>
+
+#include "index_daemon.h"
+#include "ipc/velamk_ipc.h"
+#include "platform/velaindex.h"
+#include "support/files.h"
+#include "support/images.h"
+#include "support/quiet_thread.h"
+
+namespace vela_test {
+namespace {
+
+using ::testing::HasSubstr;
+using Rows = std::vector<std::string>;
+
+class SharedIndexTest : public IndexDaemonTest {
+ protected:
+  static VELA_MEDIA_INFO Media(const std::string& path) {
+    VELA_MEDIA_INFO media = {};
+    std::snprintf(media.path, sizeof media.path, "%s", path.c_str());
+    media.width = 4;
+    media.height = 3;
+    return media;
+  }
+
+  /// What velathumb does when it has made a thumbnail. Returns 0 when all went well.
+  static int RegisterConversion(const std::string& path) {
+    return VELAIDX_IndexConvertAdd(Media(path), Media(path + ".thumb"), Json::Value());
+  }
+};
+
+TEST_F(SharedIndexTest, IsMadeWithItsDirectory) {
+  ProgramOptions options;
+  options.umask = 077;
+  const IndexDaemon daemon({}, options);
+  EXPECT_EQ(ModeOf("/var/lib/velaindex"), 0755);
+  EXPECT_EQ(Query("PRAGMA journal_mode"), Rows{"wal"});
+  EXPECT_EQ(Query("SELECT version FROM velaindexplugind_schema"), Rows{"1"});
+  EXPECT_EQ(Query("PRAGMA user_version"), Rows{"0"}) << "that is for others to set";
+}
+
+TEST_F(SharedIndexTest, MayLieElsewhere) {
+  const IndexDaemon daemon({"--database", "/tmp/some/where/index.db"});
+  PostPhotoConvert("/a.jpg");
+  EXPECT_EQ(Query("SELECT count(*) FROM posted", "/tmp/some/where/index.db"), Rows{"1"});
+  EXPECT_FALSE(Exists("/var/lib/velaindex"));
+}
+
+TEST_F(SharedIndexTest, IsUsedTogetherWithWhoRegistersConversions) {
+  ASSERT_EQ(RegisterConversion("/before.jpg"), 0);
+  ASSERT_EQ(Query("PRAGMA user_version"), Rows{"1"});
+  const IndexDaemon daemon;
+  ASSERT_EQ(RegisterConversion("/after.jpg"), 0);
+  PostPhotoConvert("/after.jpg");
+  EXPECT_EQ(Query("PRAGMA user_version"), Rows{"1"});
+  EXPECT_EQ(Query("SELECT count(*) FROM conversion"), Rows{"2"});
+  EXPECT_EQ(Query("SELECT count(*) FROM posted"), Rows{"1"});
+}
+
+TEST_F(SharedIndexTest, LeavesOtherProgramsTheirMakingOfTables) {
+  const IndexDaemon daemon;
+  PostPhotoConvert("/a.jpg");
+  ASSERT_EQ(RegisterConversion("/a.jpg"), 0);
+  EXPECT_EQ(Query("SELECT count(*) FROM conversion"), Rows{"1"});
+  PostPhotoConvert("/b.jpg");
+  EXPECT_EQ(Query("SELECT count(*) FROM posted"), Rows{"2"});
+}
+
+TEST_F(SharedIndexTest, AllWritersGetTheirTurn) {
+  const IndexDaemon daemon;
+  constexpr int kEach = 100;
+  int failures = 0;
+  std::thread other = StartQuietThread([&] {
+    for (int i = 0; i < kEach; ++i) {
+      failures += RegisterConversion("/" + std::to_string(i)) == 0 ? 0 : 1;
+    }
+  });
+  for (int i = 0; i < kEach; ++i) PostPhotoConvert(("/" + std::to_string(i)).c_str());
+  other.join();
+  EXPECT_EQ(failures, 0);
+  EXPECT_EQ(Query("SELECT (SELECT count(*) FROM conversion), (SELECT count(*) FROM posted)"),
+            Rows{"100|100"});
+}
+
+TEST_F(SharedIndexTest, OfANewerVersionIsLeftAlone) {
+  {
+    IndexDaemon daemon;
+    EXPECT_EQ(daemon.End(SIGTERM).exitCode, 0);
+  }
+  Query("UPDATE velaindexplugind_schema SET version = 2");
+  const ProgramResult result = RunProgram(IndexDaemonPath(), {});
+  EXPECT_EQ(result.exitCode, 1);
+  EXPECT_THAT(result.err, HasSubstr("those of a newer velaindexplugind"));
+  EXPECT_FALSE(Exists(PluginDaemonSocketPath));
+  EXPECT_EQ(Query("SELECT version FROM velaindexplugind_schema"), Rows{"2"});
+}
+
+TEST_F(SharedIndexTest, ThatIsNoDatabaseKeepsTheDaemonFromStarting) {
+  WriteFile(kIndexDatabase, std::string(8192, 'x'));
+  const ProgramResult result = RunProgram(IndexDaemonPath(), {});
+  EXPECT_EQ(result.exitCode, 1);
+  EXPECT_THAT(result.err, HasSubstr("not a database"));
+  EXPECT_EQ(ReadFile(kIndexDatabase), std::string(8192, 'x'));
+}
+
+TEST_F(SharedIndexTest, ThatCannotBeMadeKeepsTheDaemonFromStarting) {
+  const ProgramResult result = RunProgram(IndexDaemonPath(), {"--database", "/proc/none/index.db"});
+  EXPECT_EQ(result.exitCode, 1);
+  EXPECT_THAT(result.err, HasSubstr("/proc/none/index.db"));
+}
+
+TEST_F(SharedIndexTest, ThatIsRemovedIsMadeAnew) {
+  const IndexDaemon daemon;
+  PostPhotoConvert("/a.jpg");
+  EXPECT_EQ(GetIndexVersion("/a"), 0);
+  RemoveTree("/var/lib/velaindex");
+  PostPhotoConvert("/b.jpg");
+  EXPECT_EQ(Query("SELECT CAST(path AS TEXT) FROM posted"), Rows{"/b.jpg"});
+  EXPECT_EQ(GetIndexVersion("/a"), 0);
+}
+
+TEST_F(SharedIndexTest, ThatIsReplacedIsUsed) {
+  {
+    IndexDaemon daemon({"--database", "/tmp/new/index.db"});
+    ASSERT_TRUE(SetVersion("/photos", 8));
+    EXPECT_EQ(daemon.End(SIGTERM).exitCode, 0);
+  }
+  Query("PRAGMA wal_checkpoint(TRUNCATE)", "/tmp/new/index.db");
+  const IndexDaemon daemon;
+  ASSERT_EQ(GetIndexVersion("/photos/a.jpg"), 0);
+  for (const char* end : {"", "-wal", "-shm"}) RemoveTree(kIndexDatabase + std::string(end));
+  CopyFile("/tmp/new/index.db", kIndexDatabase);
+  EXPECT_EQ(GetIndexVersion("/photos/a.jpg"), 8);
+}
+
+TEST_F(SharedIndexTest, IsWholeAfterTheDaemonIsKilled) {
+  for (int round = 0; round < 10; ++round) {
+    IndexDaemon daemon;
+    std::vector<std::string> answered;
+    std::thread client = StartQuietThread([&] {
+      for (int i = 0; i < 100000; ++i) {
+        const std::string path = "/" + std::to_string(round) + "/" + std::to_string(i);
+        Json::Value packet = PathRequest("POST_PHOTO_CONVERT", path);
+        if (AutoSendRecvPacket(PluginDaemonSocketPath, -1, packet, 30) != 0) return;
+        if (packet["success"] == Json::Value(true)) answered.push_back(path);
+      }
+    });
+    std::this_thread::sleep_for(std::chrono::milliseconds(10 + 7 * round));
+    daemon.End(SIGKILL);
+    client.join();
+    EXPECT_EQ(Query("PRAGMA integrity_check"), Rows{"ok"});
+    const std::string count = "SELECT count(*) FROM posted WHERE CAST(path AS TEXT) LIKE '/" +
+                              std::to_string(round) + "/%'";
+    EXPECT_GE(std::stoul(Query(count).at(0)), answered.size()) << "an answered post is lost";
+  }
+}
+
+}  // namespace
+}  // namespace vela_test

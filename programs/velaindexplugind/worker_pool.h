@@ -1,0 +1,75 @@
+// Threads for work that may have to wait for a disk.
+#pragma once
+
+#include <condition_variable>
+#include <cstdint>
+#include <functional>
+#include <list>
+#include <mutex>
+#include <thread>
+#include <vector>
+
+#include "answer.h"
+#include "request.h"
+#include "settings.h"
+#include "thumb/descriptor.h"
+
+/// One request on its way through a pool.
+struct Job {
+  uint64_t client = 0;  ///< who asked
+  Request request;
+  Settings settings;
+  Answer answer;
+};
+
+/// Jobs that are done, handed back to the thread that gave them out. Nothing here takes memory, so
+/// that no job can get lost for the want of it.
+class DoneJobs {
+ public:
+  /// Returns 0 or an errno value.
+  int Open();
+
+  /// Readable when there are jobs to take.
+  int Fd() const { return signal_.Get(); }
+
+  /// Adds the one job of the list.
+  void Add(std::list<Job>& job);
+
+  /// Takes all jobs that are there.
+  std::list<Job> Take();
+
+ private:
+  Descriptor signal_;
+  std::mutex mutex_;
+  std::list<Job> jobs_;
+};
+
+/// A fixed number of threads that carry jobs out in the order they come in.
+class WorkerPool {
+ public:
+  using Work = std::function<void(Job&)>;
+
+  /// Starts the threads. They inherit the caller's signal mask. `work` must not throw. Throws
+  /// std::system_error when a thread cannot be started.
+  WorkerPool(int threads, Work work, DoneJobs& done);
+
+  /// Lets the jobs in hand come to their end; those that have not been begun are dropped.
+  ~WorkerPool();
+  WorkerPool(const WorkerPool&) = delete;
+  WorkerPool& operator=(const WorkerPool&) = delete;
+
+  /// Adds the one job of the list.
+  void Add(std::list<Job>& job);
+
+ private:
+  void Run();
+  void Stop();
+
+  const Work work_;
+  DoneJobs& done_;
+  std::mutex mutex_;
+  std::condition_variable change_;
+  std::list<Job> waiting_;
+  bool isStopping_ = false;
+  std::vector<std::thread> threads_;
+};

@@ -1,0 +1,54 @@
+#include "conversion_pause.h"
+
+#include <json/value.h>
+#include <sys/time.h>
+
+#include <algorithm>
+
+#include "ipc/velamk_ipc.h"
+#include "platform/velaindex.h"
+#include "progress/velamk_progress.h"
+
+namespace {
+
+/// The resume time may be brought forward, and a switch be turned, at any moment.
+constexpr std::chrono::seconds kLongestWait(5);
+
+std::chrono::seconds WaitForResumeTime() {
+  timeval wait = {};
+  GetThumbConvResumeWait(&wait);
+  // A negative resume time is never reached but has no wait either.
+  return std::clamp(std::chrono::seconds(wait.tv_sec), std::chrono::seconds(1), kLongestWait);
+}
+
+/// A machine without settings has no resume time; asking for it would only fill the log.
+bool IsResumeTimeReached() {
+  return IsFileExist("/etc/velainfo.conf") == 0 || IsThumbConvResumeTimeReached() == 1;
+}
+
+bool IsTrue(const Json::Value& packet, const char* name) {
+  const Json::Value value = packet.isObject() ? packet[name] : Json::Value();
+  return value.isConvertibleTo(Json::booleanValue) && value.asBool();
+}
+
+/// Asks what IsDisableConvertPhoto asks, but does not wait half an hour for a daemon that keeps
+/// still: the runner hears no signal meanwhile.
+bool IsSwitchedOff() {
+  constexpr int kLongestAnswer = 3;
+  Json::Value packet(Json::objectValue);
+  packet["command"] = "IS_DISABLE_CONVERT_PHOTO";
+  AutoSendRecvPacket(PluginDaemonSocketPath, -1, packet, kLongestAnswer);
+  return IsTrue(packet, "success") && IsTrue(packet, "result");
+}
+
+}  // namespace
+
+std::optional<ConversionPause> FindConversionPause() {
+  if (!IsResumeTimeReached()) {
+    return ConversionPause{"conversion is held back by its resume time", WaitForResumeTime()};
+  }
+  if (IsSwitchedOff()) {
+    return ConversionPause{"the index service has switched photo conversion off", kLongestWait};
+  }
+  return std::nullopt;
+}

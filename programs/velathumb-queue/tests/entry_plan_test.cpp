@@ -1,0 +1,136 @@
+// Which entry comes next, and what an entry stands for.
+#include "entry_plan.h"
+
+#include <gmock/gmock.h>
+#include <unistd.h>
+
+#include <chrono>
+#include <optional>
+#include <string>
+
+#include "support/files.h"
+#include "support/sandbox.h"
+
+namespace vela_test {
+namespace {
+
+using std::chrono::seconds;
+using ::testing::Optional;
+
+class EntryTargetTest : public SandboxTest {};
+
+TEST_F(EntryTargetTest, OfAPlainEntryIsTheDirectory) {
+  const EntryTarget target = TargetOf("/tmp");
+  EXPECT_EQ(target.directory, "/tmp");
+  EXPECT_FALSE(target.isTree);
+}
+
+TEST_F(EntryTargetTest, OfATreeEntryIsTheTree) {
+  const EntryTarget target = TargetOf("R:/tmp");
+  EXPECT_EQ(target.directory, "/tmp");
+  EXPECT_TRUE(target.isTree);
+}
+
+TEST_F(EntryTargetTest, AColonBelongsToAPlainEntryAndEndsATree) {
+  EXPECT_EQ(TargetOf("/no:where").directory, "/no:where");
+  EXPECT_EQ(TargetOf("R:/no:where").directory, "/no");
+  EXPECT_EQ(TargetOf("R::/no:where").directory, "/no");
+  EXPECT_EQ(TargetOf("R:").directory, "");
+  EXPECT_FALSE(TargetOf("r:/no").isTree);
+}
+
+TEST_F(EntryTargetTest, IsTheSameByWhateverName) {
+  MakeDirectories("/tmp/photos/here");
+  ASSERT_EQ(symlink("photos", "/tmp/alias"), 0);
+  for (const char* entry : {"/tmp/photos/here", "/tmp/alias/here", "/tmp//photos/./here/",
+                            "R:/tmp/alias/here", "/tmp/photos/here/../here"}) {
+    EXPECT_EQ(TargetOf(entry).directory, "/tmp/photos/here") << entry;
+  }
+}
+
+TEST_F(EntryTargetTest, WithoutADirectoryIsTheNameWithoutSlashesAtItsEnd) {
+  EXPECT_EQ(TargetOf("/no/where//").directory, "/no/where");
+  EXPECT_EQ(TargetOf("/").directory, "/");
+}
+
+TEST(Overlap, IsHavingADirectoryInCommon) {
+  const struct {
+    EntryTarget a;
+    EntryTarget b;
+    bool doOverlap;
+  } cases[] = {
+      {{"/a", false}, {"/a", false}, true},    {{"/a", false}, {"/b", false}, false},
+      {{"/a", false}, {"/a/b", false}, false}, {{"/a", true}, {"/a/b", false}, true},
+      {{"/a", true}, {"/a", false}, true},     {{"/a", true}, {"/a/b", true}, true},
+      {{"/a", true}, {"/ab", false}, false},   {{"/a", true}, {"/ab", true}, false},
+      {{"/a/b", true}, {"/a", false}, false},  {{"/", true}, {"/a/b", false}, true},
+      {{"/", false}, {"/a", true}, false},     {{"/a", true}, {"/b", true}, false},
+  };
+  for (const auto& [a, b, doOverlap] : cases) {
+    EXPECT_EQ(DoOverlap(a, b), doOverlap) << a.directory << ' ' << b.directory;
+    EXPECT_EQ(DoOverlap(b, a), doOverlap) << b.directory << ' ' << a.directory;
+  }
+}
+
+class EntryPlanTest : public SandboxTest {
+ protected:
+  const EntryPlan::Clock::time_point now_ = EntryPlan::Clock::now();
+};
+
+TEST_F(EntryPlanTest, WithoutEntriesIsFinished) {
+  EntryPlan plan({});
+  EXPECT_TRUE(plan.IsFinished());
+  EXPECT_EQ(plan.Start(now_), std::nullopt);
+  EXPECT_EQ(plan.NextStart(), std::nullopt);
+}
+
+TEST_F(EntryPlanTest, HandsEntriesOutInTheirOrder) {
+  EntryPlan plan({"/b", "/a", "/c"});
+  for (const size_t number : {0U, 1U, 2U}) {
+    EXPECT_THAT(plan.Start(now_), Optional(number));
+  }
+  EXPECT_EQ(plan.Start(now_), std::nullopt);
+  EXPECT_EQ(plan.Entry(1), "/a");
+  plan.Finish(1);
+  plan.Finish(0);
+  EXPECT_FALSE(plan.IsFinished());
+  plan.Finish(2);
+  EXPECT_TRUE(plan.IsFinished());
+}
+
+TEST_F(EntryPlanTest, LeavesOutWhatOverlapsWithWorkUntilThatIsDone) {
+  EntryPlan plan({"R:/a", "/a/b", "/b", "R:/a/b/c"});
+  EXPECT_THAT(plan.Start(now_), Optional(0U));
+  EXPECT_THAT(plan.Start(now_), Optional(2U));
+  EXPECT_EQ(plan.Start(now_), std::nullopt);
+  plan.Finish(0);
+  EXPECT_THAT(plan.Start(now_), Optional(1U));
+  EXPECT_THAT(plan.Start(now_), Optional(3U));
+}
+
+TEST_F(EntryPlanTest, WhatIsPutOffWaitsForItsTimeAndHoldsNobodyBack) {
+  EntryPlan plan({"/a", "R:/a"});
+  EXPECT_THAT(plan.Start(now_), Optional(0U));
+  plan.PutOff(0, now_ + seconds(5));
+  EXPECT_THAT(plan.Start(now_), Optional(1U));
+  EXPECT_THAT(plan.NextStart(), Optional(now_ + seconds(5)));
+  plan.Finish(1);
+  EXPECT_EQ(plan.Start(now_ + seconds(4)), std::nullopt);
+  EXPECT_THAT(plan.Start(now_ + seconds(5)), Optional(0U));
+  EXPECT_EQ(plan.NextStart(), std::nullopt);
+  EXPECT_FALSE(plan.IsFinished());
+}
+
+TEST_F(EntryPlanTest, ManyEntriesThatOverlapAreAllHandedOut) {
+  constexpr size_t kCount = 5000;
+  EntryPlan plan(std::vector<std::string>(kCount, "/same"));
+  for (size_t i = 0; i < kCount; ++i) {
+    ASSERT_THAT(plan.Start(now_), Optional(i));
+    ASSERT_EQ(plan.Start(now_), std::nullopt);
+    plan.Finish(i);
+  }
+  EXPECT_TRUE(plan.IsFinished());
+}
+
+}  // namespace
+}  // namespace vela_test

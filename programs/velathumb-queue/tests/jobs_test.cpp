@@ -1,0 +1,157 @@
+// Several velathumbs at a time.
+#include <fcntl.h>
+#include <gmock/gmock.h>
+#include <sys/file.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <chrono>
+#include <map>
+#include <string>
+#include <thread>
+#include <vector>
+
+#include "queue_fixture.h"
+#include "support/descriptor.h"
+#include "support/files.h"
+#include "support/stub_tool.h"
+
+namespace vela_test {
+namespace {
+
+using std::chrono::milliseconds;
+using std::chrono::seconds;
+using ::testing::ElementsAre;
+using ::testing::SizeIs;
+using ::testing::UnorderedElementsAre;
+
+/// How many calls there were at once, at most; 0 when one did not come to its end.
+int MostAtOnce(const std::vector<StubCall>& calls) {
+  int most = 0;
+  for (const StubCall& call : calls) {
+    if (call.endSequence == 0) {
+      return 0;
+    }
+    const auto others = std::count_if(calls.begin(), calls.end(), [&](const StubCall& other) {
+      return other.startSequence <= call.startSequence && other.endSequence > call.startSequence;
+    });
+    most = std::max(most, static_cast<int>(others));
+  }
+  return most;
+}
+
+bool WereAtWorkTogether(const StubCall& a, const StubCall& b) {
+  return a.startSequence < b.endSequence && b.startSequence < a.endSequence;
+}
+
+/// Whether a digit is in both.
+bool HaveCommon(const std::string& a, const std::string& b) {
+  return std::any_of(a.begin(), a.end(),
+                     [&](char c) { return c != ' ' && b.find(c) != std::string::npos; });
+}
+
+class JobsTest : public QueueTest {
+ protected:
+  static void ExpectEnd(Program& runner) {
+    const auto result = runner.Wait(seconds(20));
+    ASSERT_TRUE(result);
+    EXPECT_EQ(result->exitCode, 0);
+    ExpectNothingWaits();
+  }
+
+  RecordingVelathumb velathumb_;
+};
+
+TEST_F(JobsTest, OneAtATimeUnlessToldOtherwise) {
+  velathumb_.Stub().Plan(StubPlan().Sleep(20));
+  Enqueue({"/tmp/a", "/tmp/b", "/tmp/c"});
+  EXPECT_EQ(velathumb_.Run().exitCode, 0);
+  EXPECT_EQ(MostAtOnce(velathumb_.Stub().Calls()), 1);
+  EXPECT_THAT(velathumb_.Entries(), ElementsAre("/tmp/a", "/tmp/b", "/tmp/c"));
+}
+
+TEST_F(JobsTest, AsManyAsToldAtATime) {
+  velathumb_.Stub().Plan(StubPlan().WaitForFile("/tmp/go"));
+  Enqueue({"/tmp/a", "/tmp/b", "/tmp/c", "/tmp/d", "/tmp/e", "/tmp/f"});
+  Program runner = velathumb_.Start({"--jobs", "3"});
+  ASSERT_TRUE(velathumb_.WaitForStarts(3));
+  std::this_thread::sleep_for(milliseconds(300));
+  EXPECT_THAT(velathumb_.Entries(), UnorderedElementsAre("/tmp/a", "/tmp/b", "/tmp/c"));
+  WriteFile("/tmp/go", "");
+  ExpectEnd(runner);
+  EXPECT_THAT(velathumb_.Entries(), SizeIs(6));
+  EXPECT_EQ(MostAtOnce(velathumb_.Stub().Calls()), 3);
+}
+
+TEST_F(JobsTest, NeverTwoThatStandForACommonDirectory) {
+  MakeDirectories("/tmp/a/b/c");
+  MakeDirectories("/tmp/ab");
+  ASSERT_EQ(symlink("a/b", "/tmp/alias"), 0);
+  velathumb_.Stub().Plan(StubPlan().Sleep(60));
+  // Which of the four directories each entry stands for.
+  const std::map<std::string, std::string> directories = {
+      {"R:/tmp/a", "1 2 3"}, {"/tmp/a/b", "2"}, {"/tmp/alias", "2"},    {"R:/tmp/alias", "2 3"},
+      {"/tmp/ab", "4"},      {"/tmp/a", "1"},   {"R::/tmp/a", "1 2 3"}, {"/tmp/alias/c", "3"},
+      {"R:/tmp/a/b", "2 3"}, {"/tmp/ab/", "4"}, {"R:/tmp/ab:x", "4"},   {"/tmp/a/b/c", "3"},
+  };
+  for (const auto& [entry, numbers] : directories) {
+    Enqueue({entry});
+  }
+  EXPECT_EQ(velathumb_.Run({"--jobs", "8"}).exitCode, 0);
+  const std::vector<StubCall> calls = velathumb_.Stub().Calls();
+  ASSERT_THAT(calls, SizeIs(directories.size()));
+  EXPECT_GE(MostAtOnce(calls), 2);
+  for (const StubCall& a : calls) {
+    for (const StubCall& b : calls) {
+      const std::string first = a.Parameters().back();
+      const std::string second = b.Parameters().back();
+      if (a.number < b.number && HaveCommon(directories.at(first), directories.at(second))) {
+        EXPECT_FALSE(WereAtWorkTogether(a, b)) << first << ' ' << second;
+      }
+    }
+  }
+}
+
+TEST_F(JobsTest, ADirectoryThatSomebodyWorksOnWaitsAndIsDoneAfterwards) {
+  const StubTool converter(kConverterPath);
+  const std::string locked = MakePhoto("/tmp/p/locked/a.jpg");
+  const std::string inTree = MakePhoto("/tmp/p/tree/below/b.jpg");
+  const std::string free = MakePhoto("/tmp/p/free/c.jpg");
+  MakeDirectories("/tmp/p/locked/@eaDir");
+  MakeDirectories("/tmp/p/tree/below/@eaDir");
+  Descriptor first(open("/tmp/p/locked/@eaDir", O_RDONLY | O_CLOEXEC));
+  Descriptor second(open("/tmp/p/tree/below/@eaDir", O_RDONLY | O_CLOEXEC));
+  ASSERT_EQ(flock(first.Get(), LOCK_EX), 0);
+  ASSERT_EQ(flock(second.Get(), LOCK_EX), 0);
+  Enqueue({"/tmp/p/locked", "R:/tmp/p/tree", "/tmp/p/free"});
+  Program runner = StartRunner();
+  EXPECT_TRUE(WaitUntilExists("/tmp/p/free/@eaDir/c.jpg/VELAPHOTO_THUMB_S.jpg"));
+  std::this_thread::sleep_for(milliseconds(300));
+  EXPECT_FALSE(HasThumb(locked));
+  EXPECT_FALSE(HasThumb(inTree));
+  EXPECT_FALSE(runner.Wait(milliseconds(0)));
+  first.Close();
+  second.Close();
+  ExpectEnd(runner);
+  EXPECT_TRUE(HasThumb(locked));
+  EXPECT_TRUE(HasThumb(inTree));
+  EXPECT_TRUE(HasThumb(free));
+}
+
+TEST_F(JobsTest, ASecondRunnerIsRefused) {
+  velathumb_.Stub().Plan(StubPlan().WaitForFile("/tmp/go"));
+  Enqueue({"/tmp/a"});
+  Program runner = velathumb_.Start();
+  ASSERT_TRUE(velathumb_.WaitForStarts(1));
+  Enqueue({"/tmp/b"});
+  const ProgramResult second = velathumb_.Run();
+  EXPECT_EQ(second.exitCode, 1);
+  EXPECT_EQ(second.err, "velathumb-queue: another velathumb-queue is running\n");
+  EXPECT_EQ(ReadFile(kQueueFile), "/tmp/b\n");
+  WriteFile("/tmp/go", "");
+  ExpectEnd(runner);
+  EXPECT_THAT(velathumb_.Entries(), ElementsAre("/tmp/a", "/tmp/b"));
+}
+
+}  // namespace
+}  // namespace vela_test

@@ -1,0 +1,123 @@
+#include "queue_fixture.h"
+
+#include <signal.h>
+
+#include <cerrno>
+#include <chrono>
+#include <functional>
+#include <thread>
+
+#include "platform/velaindex.h"
+#include "queue_program.h"
+#include "support/files.h"
+#include "support/images.h"
+#include "support/profile_file.h"
+
+namespace vela_test {
+
+namespace {
+
+constexpr const char* kRecorderPath = "/usr/vela/bin/velathumb-recorder";
+
+std::vector<std::string> RecorderArguments(const std::vector<std::string>& more) {
+  std::vector<std::string> arguments = {"--velathumb", kRecorderPath, "--profile", kProfiles};
+  arguments.insert(arguments.end(), more.begin(), more.end());
+  return arguments;
+}
+
+bool WaitUntil(const std::function<bool()>& isTrue, int milliseconds) {
+  const auto end = std::chrono::steady_clock::now() + std::chrono::milliseconds(milliseconds);
+  while (!isTrue()) {
+    if (std::chrono::steady_clock::now() > end) {
+      return false;
+    }
+    std::this_thread::sleep_for(std::chrono::milliseconds(5));
+  }
+  return true;
+}
+
+}  // namespace
+
+QueueTest::QueueTest() {
+  ResetQueueSandbox();
+}
+
+void ResetQueueSandbox() {
+  ResetSandbox();
+  WriteProfileFile(kProfiles, {{"thumb_s", 120, 70, std::nullopt, "VELAPHOTO_THUMB_S.jpg", 0}});
+  WriteFile("/etc/velainfo.conf", "photo_thumb_size_map=\"1\"\n");
+}
+
+void Enqueue(const std::vector<std::string>& entries) {
+  for (const std::string& entry : entries) {
+    EXPECT_EQ(WriteIndexQueue(entry.c_str(), kQueueFile), 0) << entry;
+  }
+}
+
+std::string Lines(const std::vector<std::string>& entries) {
+  std::string text;
+  for (const std::string& entry : entries) {
+    text += entry + '\n';
+  }
+  return text;
+}
+
+void ExpectNothingWaits() {
+  for (const char* file : {kQueueFile, kTakenFile, kJournalFile}) {
+    EXPECT_FALSE(Exists(file)) << file;
+  }
+}
+
+ProgramResult RunRunner(const std::vector<std::string>& more) {
+  return RunProgram(QueueProgramPath(), QueueArguments(kProfiles, more));
+}
+
+Program StartRunner(const std::vector<std::string>& more) {
+  return StartProgram(QueueProgramPath(), QueueArguments(kProfiles, more));
+}
+
+std::string MakePhoto(const std::string& path) {
+  MakeDirectories(path.substr(0, path.rfind('/')));
+  MakeJpeg(path);
+  SetFileTimeFromNow(path, -60);
+  return path;
+}
+
+bool HasThumb(const std::string& photo) {
+  const size_t slash = photo.rfind('/');
+  return IsRegularFile(photo.substr(0, slash) + "/@eaDir" + photo.substr(slash) +
+                       "/VELAPHOTO_THUMB_S.jpg");
+}
+
+bool WaitUntilEnded(pid_t process, int milliseconds) {
+  return WaitUntil([process] { return kill(process, 0) != 0 && errno == ESRCH; }, milliseconds);
+}
+
+RecordingVelathumb::RecordingVelathumb() : stub_(kRecorderPath) {
+  stub_.Plan(StubPlan());
+}
+
+std::vector<std::string> RecordingVelathumb::Entries() const {
+  std::vector<std::string> entries;
+  for (const StubCall& call : stub_.Calls()) {
+    const std::vector<std::string> parameters = call.Parameters();
+    EXPECT_EQ(parameters.size(), 2U);
+    EXPECT_EQ(parameters.front(), kProfiles);
+    entries.push_back(parameters.back());
+  }
+  return entries;
+}
+
+bool RecordingVelathumb::WaitForStarts(size_t count) const {
+  return WaitUntil([&] { return stub_.Calls().size() >= count; }, 10000);
+}
+
+ProgramResult RecordingVelathumb::Run(const std::vector<std::string>& more) const {
+  return RunProgram(QueueProgramPath(), RecorderArguments(more));
+}
+
+Program RecordingVelathumb::Start(const std::vector<std::string>& more) const {
+  return StartProgram(QueueProgramPath(), RecorderArguments(more));
+}
+
+}  // namespace vela_test

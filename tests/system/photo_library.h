@@ -1,0 +1,51 @@
+// The photos and videos that the programs work on, and what has become of them.
+#pragma once
+
+#include <set>
+#include <string>
+#include <vector>
+
+namespace vela_test {
+
+/// What is there of a photo's six thumbnails.
+struct PhotoState {
+  int thumbs = 0;                   ///< whole JPEGs
+  int markers = 0;                  ///< failure markers in place of one
+  std::vector<std::string> others;  ///< whatever else is in its metadata directory
+};
+
+constexpr int kThumbsOfAPhoto = 6;
+
+/// Small photos of several kinds in directories and a tree, a damaged one in a directory of its
+/// own, and two videos.
+class PhotoLibrary {
+ public:
+  /// Makes `count` photos, one of them raw and one damaged, and the videos.
+  explicit PhotoLibrary(int count);
+
+  /// Makes one more directory with `count` photos, one of them raw.
+  void AddDirectory(int count);
+
+  /// What to put into the queue so that everything is worked on.
+  std::vector<std::string> Entries() const { return entries_; }
+
+  const std::set<std::string>& Photos() const { return photos_; }
+  const std::string& Damaged() const { return damaged_; }
+  const std::vector<std::string>& Videos() const { return videos_; }
+
+  /// Dates every `step`-th photo now, later than its thumbnails; the damaged one is left out.
+  void Touch(int step);
+
+ private:
+  void MakePhotos(const std::vector<std::string>& directories, int count);
+
+  std::vector<std::string> entries_;
+  std::set<std::string> photos_;
+  std::string damaged_;
+  std::vector<std::string> videos_;
+};
+
+/// Looks at a photo's thumbnails; an unreadable one is told as a failure of the test.
+PhotoState StateOf(const std::string& photo);
+
+}  // namespace vela_test
