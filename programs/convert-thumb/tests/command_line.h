@@ -1,0 +1,37 @@
+// Builds the command lines that velathumb gives to the converter.
+#pragma once
+
+#include <string>
+#include <vector>
+
+namespace vela_test {
+
+/// The options of one thumbnail.
+struct ThumbOptions {
+  int width = 160;
+  int height = 160;
+  bool fill = false;
+  int quality = 85;
+  bool stripProfiles = true;
+  bool flatten = false;
+  bool autoOrient = true;
+  int rotate = 0;       ///< degrees, 0: none
+  std::string unsharp;  ///< empty: none
+  bool convertToSrgb = true;
+};
+
+struct ThumbOutput {
+  ThumbOptions options;
+  std::string path;  ///< as the argument reads
+};
+
+struct CommandLine {
+  std::string source;            ///< as the argument reads
+  std::string scratchDirectory;  ///< empty: none
+  std::vector<ThumbOutput> outputs;
+
+  /// What stands behind argument zero.
+  std::vector<std::string> Arguments() const;
+};
+
+}  // namespace vela_test

@@ -1,0 +1,116 @@
+#include "converter_fixture.h"
+
+#include <gtest/gtest.h>
+
+#include <cstdlib>
+
+#include "support/files.h"
+#include "support/image_checks.h"
+
+namespace vela_test {
+namespace {
+
+std::string OutputPath(const std::string& prefix, size_t place) {
+  return prefix + std::to_string(place) + ".jpg";
+}
+
+void ExpectSuccess(const ProgramResult& result) {
+  EXPECT_EQ(result.exitCode, 0) << result.err;
+}
+
+}  // namespace
+
+std::string ConvertThumbPath() {
+  return HostPath(CONVERT_THUMB_FILE);
+}
+
+Likeness Compare(const std::string& one, const std::string& other) {
+  const ImageIdentity first = Identify(one);
+  const ImageIdentity second = Identify(other);
+  Likeness likeness;
+  likeness.sameSize =
+      first.width > 0 && first.width == second.width && first.height == second.height;
+  if (!likeness.sameSize) {
+    return likeness;
+  }
+  const ProgramResult result =
+      RunProgram("/usr/bin/compare-im6.q16", {"-metric", "PSNR", one, other, "null:"});
+  if (result.err.compare(0, 3, "inf") == 0) {
+    likeness.decibels = 1000;
+  } else {
+    likeness.decibels = std::strtod(result.err.c_str(), nullptr);
+  }
+  return likeness;
+}
+
+void ConverterTest::SetUp() {
+  SandboxTest::SetUp();
+  MakeDirectories(directory_);
+}
+
+std::string ConverterTest::MakePhoto(const std::string& name, int width, int height,
+                                     const std::vector<std::string>& options) const {
+  const std::string path = directory_ + "/" + name;
+  const std::string size = std::to_string(width) + "x" + std::to_string(height);
+  std::vector<std::string> arguments = {"-seed", "20", "-size", size, "plasma:sienna-steelblue"};
+  arguments.insert(arguments.end(), options.begin(), options.end());
+  arguments.push_back("jpg:" + path);
+  const ProgramResult made = RunProgram(kImageMagick, arguments);
+  EXPECT_EQ(made.exitCode, 0) << made.err;
+  return path;
+}
+
+CommandLine ConverterTest::Line(const std::string& source, const std::vector<ThumbOptions>& outputs,
+                                const std::string& prefix) const {
+  CommandLine line;
+  line.source = source;
+  line.scratchDirectory = directory_;
+  for (size_t i = 0; i < outputs.size(); ++i) {
+    line.outputs.push_back({outputs[i], OutputPath(directory_ + "/" + prefix, i)});
+  }
+  return line;
+}
+
+void ConverterTest::ExpectSamePictures(const std::string& source,
+                                       const std::vector<ThumbOptions>& outputs, double leastMean,
+                                       double least) const {
+  ExpectSuccess(RunProgram(ConvertThumbPath(), Line(source, outputs, "ours").Arguments()));
+  ExpectSuccess(RunProgram(kImageMagick, Line(source, outputs, "theirs").Arguments()));
+  double sum = 0;
+  for (size_t i = 0; i < outputs.size(); ++i) {
+    const std::string ours = OutputPath(directory_ + "/ours", i);
+    const std::string theirs = OutputPath(directory_ + "/theirs", i);
+    EXPECT_TRUE(IsWholeJpeg(ours));
+    const Likeness likeness = Compare(ours, theirs);
+    EXPECT_TRUE(likeness.sameSize) << i;
+    EXPECT_GE(likeness.decibels, least) << source << " " << outputs[i].width;
+    EXPECT_EQ(ReadJpegMetadata(ours).icc, ReadJpegMetadata(theirs).icc);
+    sum += likeness.decibels;
+  }
+  EXPECT_GE(sum / static_cast<double>(outputs.size()), leastMean) << source;
+}
+
+void ConverterTest::ExpectSameVerdict(const std::string& source,
+                                      const std::vector<ThumbOptions>& outputs) const {
+  const ProgramResult ours =
+      RunProgram(ConvertThumbPath(), Line(source, outputs, "ours").Arguments());
+  const ProgramResult theirs =
+      RunProgram(kImageMagick, Line(source, outputs, "theirs").Arguments());
+  EXPECT_EQ(ours.exitCode, theirs.exitCode) << source << ": " << ours.err << theirs.err;
+}
+
+std::vector<ThumbOptions> UsualOutputs() {
+  std::vector<ThumbOptions> outputs;
+  for (const int side : {1280, 640, 320, 120}) {
+    ThumbOptions options;
+    options.width = side;
+    options.height = side;
+    options.flatten = true;
+    options.unsharp = "0x0.6+0.7+0.01";
+    outputs.push_back(options);
+  }
+  outputs.front().quality = 90;
+  return outputs;
+}
+
+}  // namespace vela_test

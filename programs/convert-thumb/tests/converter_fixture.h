@@ -1,0 +1,53 @@
+// Runs the converter and ImageMagick with the same command lines and compares what they make.
+#pragma once
+
+#include <string>
+#include <vector>
+
+#include "command_line.h"
+#include "support/program.h"
+#include "support/sandbox.h"
+
+namespace vela_test {
+
+/// The converter under test.
+std::string ConvertThumbPath();
+
+/// ImageMagick's own program.
+constexpr const char* kImageMagick = "/usr/bin/convert-im6.q16";
+
+/// How alike two pictures are.
+struct Likeness {
+  bool sameSize = false;
+  double decibels = 0;  ///< peak signal-to-noise ratio; 1000 for the same pixels
+};
+Likeness Compare(const std::string& one, const std::string& other);
+
+class ConverterTest : public SandboxTest {
+ protected:
+  /// Room for sources and outputs.
+  const std::string directory_ = "/tmp/converter";
+  void SetUp() override;
+
+  /// Makes a photo-like JPEG: detail at every scale, the same for the same `options` and size.
+  /// `options`: further ones of ImageMagick. Returns its path.
+  std::string MakePhoto(const std::string& name, int width, int height,
+                        const std::vector<std::string>& options = {}) const;
+
+  /// The line with the outputs' paths in a directory of their own.
+  CommandLine Line(const std::string& source, const std::vector<ThumbOptions>& outputs,
+                   const std::string& prefix) const;
+
+  /// Runs both with these outputs; expects success of both, the same sizes, and on the whole set
+  /// (as well as each output by itself) at least these likenesses.
+  void ExpectSamePictures(const std::string& source, const std::vector<ThumbOptions>& outputs,
+                          double leastMean = 40, double least = 36) const;
+
+  /// Runs both; expects the same verdict.
+  void ExpectSameVerdict(const std::string& source, const std::vector<ThumbOptions>& outputs) const;
+};
+
+/// The thumbnails of a photo as they usually are, from the largest.
+std::vector<ThumbOptions> UsualOutputs();
+
+}  // namespace vela_test

@@ -1,0 +1,153 @@
+// What the converter leaves to ImageMagick, and how.
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <memory>
+
+#include "converter_fixture.h"
+#include "support/files.h"
+#include "support/image_checks.h"
+#include "support/images.h"
+#include "support/stub_tool.h"
+
+namespace vela_test {
+namespace {
+
+using ::testing::ElementsAreArray;
+using ::testing::SizeIs;
+using ::testing::StartsWith;
+
+constexpr char kLinkedImageMagick[] = "/usr/vela/lib/convert-thumb";
+
+class HandOver : public ConverterTest {
+ protected:
+  void LinkImageMagick() const {
+    MakeDirectories("/usr/vela/lib");
+    ASSERT_EQ(symlink(kImageMagick, kLinkedImageMagick), 0);
+  }
+
+  void InstallStub() {
+    MakeDirectories("/usr/vela/lib");
+    stub_ = std::make_unique<StubTool>(kLinkedImageMagick);
+  }
+
+  /// The parameters that ImageMagick got in the only call.
+  std::vector<std::string> HandedParameters() const {
+    const std::vector<StubCall> calls = stub_->Calls();
+    EXPECT_THAT(calls, SizeIs(1));
+    return calls.empty() ? std::vector<std::string>() : calls.front().Parameters();
+  }
+
+  std::unique_ptr<StubTool> stub_;
+};
+
+TEST_F(HandOver, PassesUnknownArgumentsOnAsTheyAre) {
+  InstallStub();
+  const std::vector<std::string> arguments = {"/a.jpg", "-blur", "0x1", "/b%d.png"};
+  RunProgram(ConvertThumbPath(), arguments);
+  EXPECT_THAT(HandedParameters(), ElementsAreArray(arguments));
+}
+
+TEST_F(HandOver, StaysTheSameProcessUnderTheSameName) {
+  InstallStub();
+  Program program = StartProgram(ConvertThumbPath(), {"/a.jpg", "-blur", "0x1", "/b.png"});
+  const pid_t pid = program.Pid();
+  program.Wait();
+  const std::vector<StubCall> calls = stub_->Calls();
+  ASSERT_THAT(calls, SizeIs(1));
+  EXPECT_EQ(calls.front().pid, pid);
+  EXPECT_EQ(calls.front().tool, "convert-thumb");
+  EXPECT_EQ(calls.front().arguments.front(), "convert-thumb");
+}
+
+TEST_F(HandOver, PassesOtherFormatsOn) {
+  InstallStub();
+  const std::string image = MakeImage(directory_ + "/a.png");
+  const CommandLine line{image + "[0]", directory_, {{{}, directory_ + "/o.jpg"}}};
+  RunProgram(ConvertThumbPath(), line.Arguments());
+  EXPECT_THAT(HandedParameters(), ElementsAreArray(line.Arguments()));
+}
+
+TEST_F(HandOver, PassesFourColourPhotosOn) {
+  InstallStub();
+  JpegRecipe recipe;
+  recipe.colour = JpegColour::kCmyk;
+  const std::string photo = MakeJpeg(directory_ + "/a.jpg", recipe);
+  const CommandLine line{photo, "", {{{}, directory_ + "/o.jpg"}}};
+  RunProgram(ConvertThumbPath(), line.Arguments());
+  EXPECT_THAT(HandedParameters(), ElementsAreArray(line.Arguments()));
+}
+
+TEST_F(HandOver, PassesTheSourceOnOpenWhenItsNameWouldBeMisread) {
+  InstallStub();
+  const std::string source = directory_ + "/a[*]%d:.png";
+  CopyFile(MakeImage(directory_ + "/a.png"), source);
+  const CommandLine line{source + "[0]", directory_, {{{}, directory_ + "/o.jpg"}}};
+  RunProgram(ConvertThumbPath(), line.Arguments());
+  const std::vector<std::string> handed = HandedParameters();
+  ASSERT_THAT(handed, SizeIs(line.Arguments().size()));
+  EXPECT_THAT(handed[2], StartsWith("/proc/self/fd/"));
+  EXPECT_THAT(handed[2], ::testing::EndsWith("[0]"));
+  bool open = false;
+  const StubCall call = stub_->Calls().front();
+  for (const OpenDescriptor& descriptor : call.descriptors) {
+    open = open || descriptor.target == source;
+  }
+  EXPECT_TRUE(open);
+}
+
+TEST_F(HandOver, PassesNoOtherDescriptorOn) {
+  InstallStub();
+  const std::string image = MakeImage(directory_ + "/a.png");
+  const CommandLine line{image, "", {{{}, directory_ + "/o.jpg"}}};
+  RunProgram(ConvertThumbPath(), line.Arguments());
+  ASSERT_THAT(stub_->Calls(), SizeIs(1));
+  const StubCall call = stub_->Calls().front();
+  for (const OpenDescriptor& descriptor : call.descriptors) {
+    EXPECT_LE(descriptor.number, 2) << descriptor.target;
+  }
+}
+
+TEST_F(HandOver, FailsWhenThereIsNoImageMagick) {
+  RemoveTool(kImageMagick);
+  const ProgramResult result = RunProgram(ConvertThumbPath(), {"-version"});
+  EXPECT_EQ(result.exitCode, 1);
+  EXPECT_THAT(result.err, StartsWith("convert-thumb: "));
+}
+
+TEST_F(HandOver, ImageMagickReadsSourcesWithOddNames) {
+  LinkImageMagick();
+  for (const char* name : {"a[1].png", "*.png", "{a}.png", "a:b.png", "%d.png", "@a.png"}) {
+    const std::string source = directory_ + "/" + name;
+    CopyFile(MakeImage(directory_ + "/plain.png", 300, 200), source);
+    const CommandLine line{source + "[0]", directory_, {{{}, directory_ + "/o.jpg"}}};
+    const ProgramResult result = RunProgram(ConvertThumbPath(), line.Arguments());
+    EXPECT_EQ(result.exitCode, 0) << name << result.err;
+    EXPECT_EQ(QuadrantLetters(directory_ + "/o.jpg"), "RGBY") << name;
+    RemoveTree(directory_ + "/o.jpg");
+  }
+}
+
+TEST_F(HandOver, ImageMagickIsFoundWithoutItsLink) {
+  const std::string image = MakeImage(directory_ + "/a.png", 300, 200);
+  const CommandLine line{image, "", {{{}, directory_ + "/o.jpg"}}};
+  EXPECT_EQ(RunProgram(ConvertThumbPath(), line.Arguments()).exitCode, 0);
+  EXPECT_EQ(QuadrantLetters(directory_ + "/o.jpg"), "RGBY");
+}
+
+TEST_F(HandOver, TurnsAPhotoInPlace) {
+  LinkImageMagick();
+  for (const char* name : {"plain.jpg", "odd[1]*.jpg"}) {
+    const std::string photo = directory_ + "/" + name;
+    MakeJpeg(photo);
+    const ProgramResult result = RunProgram(ConvertThumbPath(), {"-rotate", "90", photo, photo});
+    EXPECT_EQ(result.exitCode, 0) << name << result.err;
+    EXPECT_EQ(QuadrantLetters(photo), LettersAfterTurn(90)) << name;
+  }
+}
+
+}  // namespace
+}  // namespace vela_test

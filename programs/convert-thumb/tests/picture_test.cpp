@@ -1,0 +1,189 @@
+// The single steps on small pictures.
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <numeric>
+
+#include "resize.h"
+#include "sample_loops.h"
+#include "thumbnail_size.h"
+#include "turn.h"
+#include "unsharp.h"
+
+namespace {
+
+using ::testing::ElementsAre;
+
+/// One row of numbers a row, such as {{1, 2}, {3, 4}}.
+Picture GreyPicture(const std::vector<std::vector<uint16_t>>& rows) {
+  Picture picture(static_cast<int>(rows.front().size()), static_cast<int>(rows.size()), 1);
+  for (size_t y = 0; y < rows.size(); ++y) {
+    std::copy(rows[y].begin(), rows[y].end(), picture.Row(static_cast<int>(y)));
+  }
+  return picture;
+}
+
+void ExpectSize(PictureSize size, int width, int height) {
+  EXPECT_EQ(size.width, width);
+  EXPECT_EQ(size.height, height);
+}
+
+TEST(ThumbnailSizes, FitTheBox) {
+  ExpectSize(ThumbnailSize({4000, 3000}, {1280, 1280, false}), 1280, 960);
+  ExpectSize(ThumbnailSize({3000, 4000}, {1280, 1280, false}), 960, 1280);
+  ExpectSize(ThumbnailSize({4000, 3000}, {100, 1000, false}), 100, 75);
+}
+
+TEST(ThumbnailSizes, FillTheBox) {
+  ExpectSize(ThumbnailSize({4000, 3000}, {120, 120, true}), 160, 120);
+  ExpectSize(ThumbnailSize({3000, 4000}, {120, 120, true}), 120, 160);
+}
+
+TEST(ThumbnailSizes, NeverGrowAndNeverVanish) {
+  ExpectSize(ThumbnailSize({100, 50}, {1280, 1280, false}), 100, 50);
+  ExpectSize(ThumbnailSize({100, 50}, {1280, 1280, true}), 100, 50);
+  ExpectSize(ThumbnailSize({30000, 10}, {1280, 1280, false}), 1280, 1);
+  ExpectSize(ThumbnailSize({1, 1}, {65535, 65535, true}), 1, 1);
+}
+
+TEST(Contributions, SumUpToOne) {
+  for (const FilterKind kind : {FilterKind::kLanczos, FilterKind::kMitchell}) {
+    for (const int grid : {0, 50}) {
+      for (const Contribution& contribution : MakeContributions(97, 10, grid, kind)) {
+        EXPECT_NEAR(std::accumulate(contribution.weights.begin(), contribution.weights.end(), 0.0),
+                    1.0, 1e-5);
+        EXPECT_GE(contribution.first, 0);
+        EXPECT_LE(contribution.End(), 97);
+      }
+    }
+  }
+}
+
+TEST(Resizing, KeepsAPlainColour) {
+  Picture picture(90, 70, 3);
+  for (size_t i = 0; i < picture.samples.size(); ++i) {
+    picture.samples[i] = static_cast<uint16_t>(10000 * (1 + i % 3));
+  }
+  PictureRows rows(picture);
+  const auto scaled = Resize(rows, {{31, 17}, FilterKind::kLanczos, false});
+  ASSERT_TRUE(scaled);
+  ASSERT_EQ(scaled->samples.size(), 31U * 17 * 3);
+  for (size_t i = 0; i < scaled->samples.size(); ++i) {
+    EXPECT_NEAR(scaled->samples[i], 10000 * (1 + static_cast<int>(i % 3)), 1);
+  }
+}
+
+TEST(Resizing, MirrorsLikeThePicture) {
+  Picture picture(41, 23, 1);
+  for (size_t i = 0; i < picture.samples.size(); ++i) {
+    picture.samples[i] = static_cast<uint16_t>(i * 2654435761U >> 8);
+  }
+  Picture mirrored = picture;
+  Straighten(mirrored, 3);
+  PictureRows rows(picture);
+  PictureRows mirroredRows(mirrored);
+  const ResizePlan plan{{13, 7}, FilterKind::kMitchell, false};
+  const auto scaled = Resize(rows, plan);
+  auto scaledMirrored = Resize(mirroredRows, plan);
+  ASSERT_TRUE(scaled && scaledMirrored);
+  Straighten(*scaledMirrored, 3);
+  for (size_t i = 0; i < scaled->samples.size(); ++i) {
+    EXPECT_NEAR(scaled->samples[i], scaledMirrored->samples[i], 2);
+  }
+}
+
+TEST(Resizing, ThinsOutWhatShrinksByMuch) {
+  EXPECT_TRUE(IsThinnedOut({4000, 3000}, {1000, 750}));
+  EXPECT_FALSE(IsThinnedOut({4000, 3000}, {1280, 960}));
+  EXPECT_FALSE(IsThinnedOut({4000, 3000}, {25, 19}));
+}
+
+/// Rows that end too early.
+class BrokenRows final : public RowSource {
+ public:
+  int Width() const override { return 10; }
+  int Height() const override { return 10; }
+  int Channels() const override { return 1; }
+  bool ReadRow(float* row) override {
+    std::fill(row, row + 10, 0.0F);
+    return ++read_ < 6;
+  }
+
+ private:
+  int read_ = 0;
+};
+
+TEST(Resizing, FailsWhenARowCannotBeRead) {
+  for (const int side : {10, 5}) {
+    BrokenRows rows;
+    EXPECT_FALSE(Resize(rows, {{side, side}, FilterKind::kLanczos, false}));
+  }
+}
+
+TEST(Sharpening, LeavesAPlainColourAlone) {
+  Picture picture(20, 10, 3);
+  std::fill(picture.samples.begin(), picture.samples.end(), uint16_t{30000});
+  Sharpen(picture, {0, 2, 1, 0});
+  for (const uint16_t sample : picture.samples) {
+    EXPECT_NEAR(sample, 30000, 1);
+  }
+}
+
+TEST(Sharpening, LeavesSmallDifferencesAlone) {
+  Picture picture = GreyPicture({{30000, 30100, 30000}, {30100, 30000, 30100}});
+  const Picture before = picture;
+  Sharpen(picture, {0, 1, 5, 0.01});
+  EXPECT_EQ(picture.samples, before.samples);
+  Sharpen(picture, {0, 1, 5, 0});
+  EXPECT_NE(picture.samples, before.samples);
+}
+
+TEST(Sharpening, SteepensEdges) {
+  Picture picture = GreyPicture({{20000, 20000, 20000, 40000, 40000, 40000}});
+  Sharpen(picture, {0, 1, 1, 0});
+  EXPECT_LT(picture.Row(0)[2], 20000);
+  EXPECT_GT(picture.Row(0)[3], 40000);
+}
+
+TEST(Turning, MovesEverySample) {
+  const Picture picture = GreyPicture({{1, 2, 3}, {4, 5, 6}});
+  const auto turned = [&](int quarterTurns) {
+    Picture copy = picture;
+    Turn(copy, quarterTurns);
+    return copy;
+  };
+  EXPECT_THAT(turned(0).samples, ElementsAre(1, 2, 3, 4, 5, 6));
+  EXPECT_THAT(turned(1).samples, ElementsAre(4, 1, 5, 2, 6, 3));
+  EXPECT_EQ(turned(1).width, 2);
+  EXPECT_THAT(turned(2).samples, ElementsAre(6, 5, 4, 3, 2, 1));
+  EXPECT_THAT(turned(3).samples, ElementsAre(3, 6, 2, 5, 1, 4));
+}
+
+TEST(Turning, KeepsTheSamplesOfAPixelTogether) {
+  Picture picture(2, 1, 3);
+  picture.samples = {1, 2, 3, 4, 5, 6};
+  Straighten(picture, 2);
+  EXPECT_THAT(picture.samples, ElementsAre(4, 5, 6, 1, 2, 3));
+  Turn(picture, 1);
+  EXPECT_THAT(picture.samples, ElementsAre(4, 5, 6, 1, 2, 3));
+  EXPECT_EQ(picture.height, 2);
+}
+
+TEST(Loops, RoundToTheNearestJpegSample) {
+  std::vector<uint16_t> samples(65536);
+  std::iota(samples.begin(), samples.end(), uint16_t{0});
+  std::vector<uint8_t> rounded(samples.size());
+  RoundRow(samples.data(), rounded.data(), samples.size());
+  for (int i = 0; i < 65536; ++i) {
+    ASSERT_EQ(rounded[static_cast<size_t>(i)], (i + 128) / 257) << i;
+  }
+}
+
+TEST(Loops, CutWhatLiesOutside) {
+  std::vector<float> samples = {-5, 0, 100, 65535, 70000};
+  Clamp(samples.data(), samples.size());
+  EXPECT_THAT(samples, ElementsAre(0, 0, 100, 65535, 65535));
+}
+
+}  // namespace

@@ -1,0 +1,123 @@
+#include "plan_parser.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "command_line.h"
+
+namespace vela_test {
+namespace {
+
+using ::testing::SizeIs;
+
+TEST(PlanParser, ReadsAnyNumberOfOutputs) {
+  for (size_t count = 1; count <= 6; ++count) {
+    CommandLine line;
+    line.source = "/photos/a.jpg";
+    for (size_t i = 0; i < count; ++i) {
+      line.outputs.push_back({ThumbOptions(), "/out/" + std::to_string(i) + ".jpg"});
+    }
+    const auto plan = ParseConversion(line.Arguments());
+    ASSERT_TRUE(plan) << count;
+    EXPECT_EQ(plan->source, "/photos/a.jpg");
+    ASSERT_THAT(plan->outputs, SizeIs(count));
+    for (size_t i = 0; i < count; ++i) {
+      EXPECT_EQ(plan->outputs[i].path, "/out/" + std::to_string(i) + ".jpg");
+    }
+  }
+}
+
+TEST(PlanParser, KeepsTheOrderOfTheOptions) {
+  ThumbOptions options;
+  options.width = 320;
+  options.height = 240;
+  options.quality = 77;
+  options.flatten = true;
+  options.rotate = 270;
+  options.unsharp = "0x0.6+0.7+0.01";
+  const auto plan =
+      ParseConversion(CommandLine{"/p.jpg", "/scratch", {{options, "/o.jpg"}}}.Arguments());
+  ASSERT_TRUE(plan);
+  const OutputPlan& output = plan->outputs.front();
+  EXPECT_EQ(output.box.width, 320);
+  EXPECT_EQ(output.box.height, 240);
+  EXPECT_EQ(output.quality, 77);
+  ASSERT_THAT(output.steps, SizeIs(5));
+  EXPECT_EQ(output.steps[0].kind, Step::Kind::kFlatten);
+  EXPECT_EQ(output.steps[1].kind, Step::Kind::kAutoOrient);
+  EXPECT_EQ(output.steps[2].kind, Step::Kind::kTurn);
+  EXPECT_EQ(output.steps[2].quarterTurns, 3);
+  EXPECT_EQ(output.steps[3].kind, Step::Kind::kSharpen);
+  EXPECT_DOUBLE_EQ(output.steps[3].unsharp.sigma, 0.6);
+  EXPECT_EQ(output.steps[4].kind, Step::Kind::kConvertToSrgb);
+}
+
+TEST(PlanParser, TakesThePageSelectionOffTheSource) {
+  const auto plan =
+      ParseConversion(CommandLine{"/a/x[1]*?.tif[0]", "", {{{}, "/o.jpg"}}}.Arguments());
+  ASSERT_TRUE(plan);
+  EXPECT_EQ(plan->source, "/a/x[1]*?.tif");
+  EXPECT_EQ(SourceFile("[0]"), "[0]");
+  EXPECT_EQ(SourceFile("/a[0]/b"), "/a[0]/b");
+}
+
+TEST(PlanParser, RefusesALineWithAnythingMissing) {
+  const CommandLine line{"/p.jpg", "/scratch", {{{}, "/1.jpg"}, {{}, "/2.jpg"}, {{}, "/3.jpg"}}};
+  const std::vector<std::string> whole = line.Arguments();
+  ASSERT_TRUE(ParseConversion(whole));
+  for (size_t i = 0; i < whole.size(); ++i) {
+    std::vector<std::string> less = whole;
+    less.erase(less.begin() + static_cast<std::ptrdiff_t>(i));
+    // Turning upright is the only argument of this line that stands for itself alone.
+    EXPECT_EQ(ParseConversion(less).has_value(), whole[i] == "-auto-orient")
+        << i << " " << whole[i];
+  }
+}
+
+TEST(PlanParser, RefusesALineThatIsCut) {
+  const CommandLine line{"/p.jpg", "/scratch", {{{}, "/1.jpg"}, {{}, "/2.jpg"}, {{}, "/3.jpg"}}};
+  std::vector<std::string> cut = line.Arguments();
+  while (!cut.empty()) {
+    cut.pop_back();
+    EXPECT_FALSE(ParseConversion(cut)) << cut.size();
+  }
+}
+
+TEST(PlanParser, RefusesWhatItDoesNotKnow) {
+  const std::vector<std::string> begin = {"/p.jpg", "-thumbnail", "10x10>", "-quality", "80"};
+  const std::vector<std::vector<std::string>> unknown = {{"-blur", "0x1"},
+                                                         {"-colorspace", "Gray"},
+                                                         {"-rotate", "45"},
+                                                         {"+profile", "*"},
+                                                         {"-define", "png:x=1"},
+                                                         {"-thumbnail", "5x5>"},
+                                                         {"-unsharp", "nothing"},
+                                                         {"-strip"},
+                                                         {"+clone"},
+                                                         {"-write", "/x.jpg"},
+                                                         {"-quality", "0"},
+                                                         {"-quality", "101"}};
+  for (const auto& options : unknown) {
+    std::vector<std::string> line = begin;
+    line.insert(line.end(), options.begin(), options.end());
+    line.emplace_back("/o.jpg");
+    EXPECT_FALSE(ParseConversion(line)) << options.front() << " " << options.back();
+  }
+  EXPECT_FALSE(ParseConversion({"-rotate", "90", "/a.jpg", "/a.jpg"}));
+  EXPECT_FALSE(ParseConversion({}));
+}
+
+TEST(PlanParser, RefusesStepsInFrontOfTheScaling) {
+  EXPECT_FALSE(ParseConversion(
+      {"/p.jpg", "-auto-orient", "-thumbnail", "10x10>", "-quality", "80", "/o.jpg"}));
+}
+
+TEST(SourceArgument, IsTheFirstThatIsNoOption) {
+  EXPECT_EQ(FindSourceArgument({"-define", "registry:temporary-path=/x", "/a.jpg", "/b.jpg"}), 2U);
+  EXPECT_EQ(FindSourceArgument({"-rotate", "90", "/a.jpg", "/a.jpg"}), 2U);
+  EXPECT_EQ(FindSourceArgument({"/a.jpg"}), 0U);
+  EXPECT_EQ(FindSourceArgument({}), 0U);
+}
+
+}  // namespace
+}  // namespace vela_test
