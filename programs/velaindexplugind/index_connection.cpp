@@ -2,7 +2,6 @@
 
 #include <thread>
 
-#include "index_directory.h"
 #include "index_tables.h"
 
 namespace {
@@ -80,11 +79,6 @@ int EndOf(int stepCode) {
   return stepCode == SQLITE_DONE || stepCode == SQLITE_ROW ? SQLITE_OK : stepCode;
 }
 
-bool IsBusy(int code) {
-  constexpr int kPrimaryCode = 0xff;
-  return (code & kPrimaryCode) == SQLITE_BUSY;
-}
-
 }  // namespace
 
 IndexResult IndexConnection::Tell(int code) const {
@@ -105,7 +99,7 @@ int IndexConnection::ExecuteOnceFree(const char* sql) {
   constexpr std::chrono::milliseconds kPause(5);
   const auto end = std::chrono::steady_clock::now() + kOpenPatience;
   int code = Execute(sql);
-  while (IsBusy(code) && std::chrono::steady_clock::now() < end) {
+  while (IndexResult{code, {}}.IsBusy() && std::chrono::steady_clock::now() < end) {
     std::this_thread::sleep_for(kPause);
     code = Execute(sql);
   }
@@ -121,7 +115,7 @@ int IndexConnection::Prepare(const char* sql, Statement& statement) {
 }
 
 int IndexConnection::OpenFile(const std::string& file) {
-  constexpr int kFlags = SQLITE_OPEN_READWRITE | SQLITE_OPEN_CREATE | SQLITE_OPEN_NOMUTEX;
+  constexpr int kFlags = SQLITE_OPEN_READWRITE | SQLITE_OPEN_NOMUTEX;
   sqlite3* database = nullptr;
   const int code = sqlite3_open_v2(file.c_str(), &database, kFlags, nullptr);
   database_.reset(database);
@@ -205,12 +199,10 @@ int IndexConnection::PrepareAll() {
   return code;
 }
 
-IndexResult IndexConnection::Open(const std::string& file) {
-  int code = OpenFile(file);
-  if (code != SQLITE_OK) {
-    MakeDirectoryOf(file);
-    code = OpenFile(file);
-  }
+IndexResult IndexConnection::Open(const IndexFile& file) {
+  // The library would make it with a mode that depends on the process's mask.
+  MakeIndexFile(file);
+  int code = OpenFile(file.path);
   if (code == SQLITE_OK) code = Configure();
   if (code == SQLITE_OK) code = EnsureTables();
   if (code == SQLITE_OK) code = PrepareAll();
@@ -225,6 +217,24 @@ bool IndexConnection::IsCurrent() const {
 
 void IndexConnection::SetPatience(std::chrono::milliseconds patience) {
   sqlite3_busy_timeout(database_.get(), static_cast<int>(patience.count()));
+}
+
+IndexResult IndexConnection::TransactOnce(const std::function<IndexResult()>& change) {
+  const int begun = Execute("BEGIN IMMEDIATE");
+  if (begun != SQLITE_OK) return Tell(begun);
+  IndexResult result = change();
+  if (result.IsOk()) result = Tell(Execute("COMMIT"));
+  if (!result.IsOk()) Execute("ROLLBACK");
+  return result;
+}
+
+IndexResult IndexConnection::Transact(bool isDurable, const std::function<IndexResult()>& change) {
+  if (!isDurable) return TransactOnce(change);
+  const int code = Execute("PRAGMA synchronous = FULL");
+  if (code != SQLITE_OK) return Tell(code);
+  IndexResult result = TransactOnce(change);
+  Execute("PRAGMA synchronous = NORMAL");
+  return result;
 }
 
 IndexResult IndexConnection::FindMedia(std::string_view path, std::optional<StoredMedia>& media) {
@@ -256,18 +266,10 @@ IndexResult IndexConnection::StorePosted(std::string_view path, int kind, int64_
 
 IndexResult IndexConnection::StoreVersion(std::string_view directory,
                                           std::optional<int32_t> version) {
-  // Unlike all else here this cannot be had again from somewhere when the power fails.
-  int code = Execute("PRAGMA synchronous = FULL");
-  if (code != SQLITE_OK) return Tell(code);
-  {
-    Bindings bindings((version ? storeVersion_ : removeVersion_).get());
-    bindings.Add(directory);
-    if (version) bindings.Add(*version);
-    code = EndOf(bindings.Step());
-  }
-  const IndexResult result = Tell(code);
-  Execute("PRAGMA synchronous = NORMAL");
-  return result;
+  Bindings bindings((version ? storeVersion_ : removeVersion_).get());
+  bindings.Add(directory);
+  if (version) bindings.Add(*version);
+  return Tell(EndOf(bindings.Step()));
 }
 
 IndexResult IndexConnection::FindVersion(std::string_view directory,

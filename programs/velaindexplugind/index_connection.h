@@ -5,11 +5,13 @@
 
 #include <chrono>
 #include <cstdint>
+#include <functional>
 #include <memory>
 #include <optional>
 #include <string>
 #include <string_view>
 
+#include "index_file.h"
 #include "media_record.h"
 
 /// How an operation on the index ended: an SQLite result code and what to tell about it.
@@ -18,6 +20,12 @@ struct IndexResult {
   std::string message;  ///< empty when all went well
 
   bool IsOk() const { return code == SQLITE_OK; }
+
+  /// Whether another writer kept the operation from its turn.
+  bool IsBusy() const {
+    constexpr int kPrimaryCode = 0xff;
+    return (code & kPrimaryCode) == SQLITE_BUSY;
+  }
 };
 
 /// A record with the time it was read at.
@@ -31,13 +39,17 @@ class IndexConnection {
  public:
   /// Opens the database; makes it and its directory when missing, and the daemon's tables. Tables
   /// of a newer version are an error.
-  IndexResult Open(const std::string& file);
+  IndexResult Open(const IndexFile& file);
 
   /// Returns whether the open file is still the one at its path.
   bool IsCurrent() const;
 
   /// How long the operations that follow wait for another program's transaction.
   void SetPatience(std::chrono::milliseconds patience);
+
+  /// Carries out the operations of `change` in one transaction: all that they store is stored, or
+  /// nothing when one of them fails. With `isDurable` it is on the disk when this returns.
+  IndexResult Transact(bool isDurable, const std::function<IndexResult()>& change);
 
   IndexResult FindMedia(std::string_view path, std::optional<StoredMedia>& media);
   IndexResult StoreMedia(std::string_view path, const StoredMedia& media);
@@ -47,8 +59,7 @@ class IndexConnection {
   /// 2 video.
   IndexResult StorePosted(std::string_view path, int kind, int64_t postedAt);
 
-  /// Stores the version that is set for the directory itself; no version removes it. It is on the
-  /// disk when this returns.
+  /// Stores the version that is set for the directory itself; no version removes it.
   IndexResult StoreVersion(std::string_view directory, std::optional<int32_t> version);
 
   /// Finds the version set for the directory itself.
@@ -72,6 +83,7 @@ class IndexConnection {
   int Prepare(const char* sql, Statement& statement);
   int Execute(const char* sql);
   int ExecuteOnceFree(const char* sql);
+  IndexResult TransactOnce(const std::function<IndexResult()>& change);
   IndexResult Tell(int code) const;
 
   std::unique_ptr<sqlite3, Close> database_;

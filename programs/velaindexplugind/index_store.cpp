@@ -1,14 +1,21 @@
 #include "index_store.h"
 
+#include <algorithm>
 #include <utility>
 
 #include "index_path.h"
 
 namespace {
 
-/// How long an operation waits for other writers, in this program and in others.
-constexpr std::chrono::milliseconds kPatience(5000);
+/// How long what can be had again waits for other writers, in this program and in others.
 constexpr std::chrono::milliseconds kShortPatience(250);
+
+/// What is left until `end`, nothing when it has passed.
+std::chrono::milliseconds LeftUntil(IndexStore::Clock::time_point end) {
+  const auto left = end - IndexStore::Clock::now();
+  return std::max(std::chrono::duration_cast<std::chrono::milliseconds>(left),
+                  std::chrono::milliseconds(0));
+}
 
 }  // namespace
 
@@ -42,11 +49,11 @@ IndexResult IndexStore::Read(const Operation& operation) {
   return result;
 }
 
-IndexResult IndexStore::Write(std::chrono::milliseconds patience, const Operation& operation) {
-  const std::unique_lock<std::timed_mutex> lock(writeMutex_, patience);
+IndexResult IndexStore::Write(Clock::time_point end, const Operation& operation) {
+  const std::unique_lock<std::timed_mutex> lock(writeMutex_, end);
   if (!lock.owns_lock()) return {SQLITE_BUSY, sqlite3_errstr(SQLITE_BUSY)};
   return Read([&](IndexConnection& connection) {
-    connection.SetPatience(patience);
+    connection.SetPatience(LeftUntil(end));
     return operation(connection);
   });
 }
@@ -60,7 +67,7 @@ IndexResult IndexStore::FindMedia(std::string_view path, std::optional<StoredMed
 }
 
 IndexResult IndexStore::StoreMedia(std::string_view path, const StoredMedia& media) {
-  return Write(kShortPatience,
+  return Write(Clock::now() + kShortPatience,
                [&](IndexConnection& connection) { return connection.StoreMedia(path, media); });
 }
 
@@ -68,19 +75,13 @@ IndexResult IndexStore::RemoveMedia(std::string_view path) {
   std::optional<StoredMedia> media;
   IndexResult result = FindMedia(path, media);
   if (!result.IsOk() || !media) return result;
-  return Write(kShortPatience,
+  return Write(Clock::now() + kShortPatience,
                [&](IndexConnection& connection) { return connection.RemoveMedia(path); });
 }
 
-IndexResult IndexStore::StorePosted(std::string_view path, int kind, int64_t postedAt) {
-  return Write(kPatience, [&](IndexConnection& connection) {
-    return connection.StorePosted(path, kind, postedAt);
-  });
-}
-
-IndexResult IndexStore::StoreVersion(std::string_view directory, std::optional<int32_t> version) {
-  return Write(kPatience, [&](IndexConnection& connection) {
-    return connection.StoreVersion(directory, version);
+IndexResult IndexStore::Change(Clock::time_point end, bool isDurable, const Operation& change) {
+  return Write(end, [&](IndexConnection& connection) {
+    return connection.Transact(isDurable, [&] { return change(connection); });
   });
 }
 

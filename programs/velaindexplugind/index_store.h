@@ -7,18 +7,21 @@
 #include <memory>
 #include <mutex>
 #include <optional>
-#include <string>
 #include <string_view>
 #include <vector>
 
 #include "index_connection.h"
+#include "index_file.h"
 
 /// The index. All operations may be called from any thread; each works with a connection of its
 /// own, so that a reader does not wait for a writer. A database that is removed or replaced is
 /// opened anew at the next operation, as is one that gave an error.
 class IndexStore {
  public:
-  explicit IndexStore(std::string file) : file_(std::move(file)) {}
+  using Clock = std::chrono::steady_clock;
+  using Operation = std::function<IndexResult(IndexConnection&)>;
+
+  explicit IndexStore(IndexFile file) : file_(std::move(file)) {}
 
   /// Opens the database for the first time.
   IndexResult Open();
@@ -31,25 +34,22 @@ class IndexStore {
   /// Removes the record of `path`, when there is one.
   IndexResult RemoveMedia(std::string_view path);
 
-  /// Stores that the conversion of `path` is over. `kind` is 1 photo, 2 video.
-  IndexResult StorePosted(std::string_view path, int kind, int64_t postedAt);
-
-  /// Sets the version of a directory (a plain path), or removes it.
-  IndexResult StoreVersion(std::string_view directory, std::optional<int32_t> version);
+  /// Carries out `change` in one transaction, which begins as soon as no other one is there, in
+  /// this program and in others; busy when that is not before `end`. With `isDurable` all is on the
+  /// disk when this returns.
+  IndexResult Change(Clock::time_point end, bool isDurable, const Operation& change);
 
   /// Finds the version set for the plain path itself or the nearest directory above it.
   IndexResult FindNearestVersion(std::string_view path, std::optional<int32_t>& version);
 
  private:
-  using Operation = std::function<IndexResult(IndexConnection&)>;
-
   IndexResult Read(const Operation& operation);
-  IndexResult Write(std::chrono::milliseconds patience, const Operation& operation);
+  IndexResult Write(Clock::time_point end, const Operation& operation);
   std::unique_ptr<IndexConnection> TakeIdle();
   IndexResult Acquire(std::unique_ptr<IndexConnection>& connection);
   void Release(std::unique_ptr<IndexConnection> connection);
 
-  const std::string file_;
+  const IndexFile file_;
   std::mutex idleMutex_;
   std::vector<std::unique_ptr<IndexConnection>> idle_;
   /// The library lets one writer in and has the others sleep; these need not.

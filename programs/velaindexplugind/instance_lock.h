@@ -1,10 +1,15 @@
-// Keeps a second daemon away from the index.
+// Keeps a second daemon away from the index and from the socket.
 #pragma once
 
 #include <string>
 
+#include "index_file.h"
 #include "thumb/descriptor.h"
 
-/// Takes the lock beside the index database `database`, for as long as `lock` lives. Makes the
-/// database's directory when missing. Returns what went wrong, empty when nothing did.
-std::string LockInstance(const std::string& database, Descriptor& lock);
+/// Takes the lock beside the index database, for as long as `lock` lives. Makes the database's
+/// directory when missing. Returns what went wrong, empty when nothing did.
+std::string LockIndex(const IndexFile& database, Descriptor& lock);
+
+/// Takes the lock of who makes a socket at `path`, for as long as `lock` lives. Returns what went
+/// wrong, empty when nothing did.
+std::string LockSocket(const std::string& path, Descriptor& lock);

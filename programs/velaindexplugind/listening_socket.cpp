@@ -1,21 +1,28 @@
 #include "listening_socket.h"
 
 #include <fcntl.h>
-#include <grp.h>
+#include <pwd.h>
 #include <sys/socket.h>
 #include <sys/stat.h>
 #include <sys/un.h>
 #include <systemd/sd-daemon.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <cerrno>
+#include <cstddef>
+#include <cstdio>
+#include <cstdlib>
 #include <cstring>
-#include <vector>
+
+#include "instance_lock.h"
+#include "log.h"
 
 namespace {
 
 constexpr int kBacklog = 4096;
 constexpr mode_t kSocketMode = 0660;
+constexpr int kBindTries = 100;
 
 std::string ErrorAt(const std::string& what, int error) {
   return what + ": " + std::strerror(error);
@@ -46,12 +53,38 @@ int TryConnect(const sockaddr_un& address) {
   return isConnected || errno == EAGAIN ? 0 : errno;
 }
 
+std::string NameOf(uid_t user) {
+  const passwd* entry = getpwuid(user);
+  return entry == nullptr ? std::to_string(user) : entry->pw_name;
+}
+
+/// A directory may be full, and to empty it is to follow its owner wherever he leads.
+bool MoveAside(const std::string& path) {
+  std::string place = path + ".XXXXXX";
+  if (mkdtemp(place.data()) == nullptr) return false;
+  if (rename(path.c_str(), (place + "/moved").c_str()) == 0) return true;
+  const int error = errno;
+  rmdir(place.c_str());
+  errno = error;
+  return false;
+}
+
+/// The socket's directory is open to all: whoever is there first must not keep root's daemon out,
+/// nor answer in its place.
+std::string Evict(const std::string& path, uid_t owner) {
+  LogLine(LogLevel::kWarning, "socket").Add("replaced", path).Add("owner", NameOf(owner)).Write();
+  if (unlink(path.c_str()) == 0 || errno == ENOENT) return {};
+  if (errno == EISDIR && MoveAside(path)) return {};
+  return ErrorAt(path, errno);
+}
+
 /// Makes room at the path, at the cost of nothing that is of use to anybody.
 std::string ClearPath(const std::string& path, const sockaddr_un& address) {
   struct stat status;
   if (lstat(path.c_str(), &status) != 0) {
     return errno == ENOENT ? std::string() : ErrorAt(path, errno);
   }
+  if (geteuid() == 0 && status.st_uid != 0) return Evict(path, status.st_uid);
   if (!S_ISSOCK(status.st_mode)) return path + " is something else than a socket";
   const int error = TryConnect(address);
   if (error == 0) return "another instance listens at " + path;
@@ -59,26 +92,13 @@ std::string ClearPath(const std::string& path, const sockaddr_un& address) {
   return unlink(path.c_str()) == 0 || errno == ENOENT ? std::string() : ErrorAt(path, errno);
 }
 
-/// Returns what went wrong, empty when nothing did.
-std::string FindGroup(const std::string& name, gid_t& id) {
-  // Who starts it by hand as an ordinary user keeps it to himself.
-  id = geteuid() == 0 ? 0 : getegid();
-  if (name.empty()) return {};
-  std::vector<char> text(16384);
-  group entry{};
-  group* found = nullptr;
-  int error = getgrnam_r(name.c_str(), &entry, text.data(), text.size(), &found);
-  while (error == ERANGE) {
-    text.resize(text.size() * 2);
-    error = getgrnam_r(name.c_str(), &entry, text.data(), text.size(), &found);
-  }
-  if (found == nullptr) return "there is no group " + name;
-  id = entry.gr_gid;
-  return {};
+/// Who starts it by hand as an ordinary user keeps it to himself.
+gid_t StandardGroup() {
+  return geteuid() == 0 ? 0 : getegid();
 }
 
 /// Nobody can connect before the owners are right.
-int Bind(int fd, const sockaddr_un& address) {
+int BindClosed(int fd, const sockaddr_un& address) {
   const mode_t mask = umask(0177);
   const int error = bind(fd, Generic(address), sizeof address) == 0 ? 0 : errno;
   umask(mask);
@@ -104,25 +124,43 @@ std::string ListeningSocket::TakeFromManager(bool& isTaken) {
   return {};
 }
 
-std::string ListeningSocket::Make(const std::string& path, const std::string& group) {
-  gid_t groupId = 0;
-  std::string problem = FindGroup(group, groupId);
-  if (!problem.empty()) return problem;
+std::string ListeningSocket::Address() const {
+  sockaddr_un address{};
+  socklen_t size = sizeof address;
+  auto* generic = reinterpret_cast<sockaddr*>(&address);
+  if (getsockname(socket_.Get(), generic, &size) != 0) return {};
+  const size_t length = std::min<size_t>(size, sizeof address) - offsetof(sockaddr_un, sun_path);
+  const std::string name(address.sun_path, length);
+  // A name that is in no directory begins with NUL and may have more of them.
+  if (!name.empty() && name[0] == '\0') return '@' + name.substr(1);
+  return name.substr(0, name.find('\0'));
+}
+
+std::string ListeningSocket::Bind(const std::string& path) {
   sockaddr_un address;
   if (!MakeAddress(path, address)) return ErrorAt(path, ENAMETOOLONG);
-  problem = ClearPath(path, address);
-  if (!problem.empty()) return problem;
   socket_ = MakeSocket();
   if (!socket_.IsOpen()) return ErrorAt("socket", errno);
-  const int error = Bind(socket_.Get(), address);
-  if (error == EADDRINUSE) return "another instance is starting at " + path;
-  if (error != 0) return ErrorAt(path, error);
+  // Another user can be quicker than the daemon, but not each time.
+  int error = EADDRINUSE;
+  for (int i = 0; i < kBindTries && error == EADDRINUSE; ++i) {
+    const std::string problem = ClearPath(path, address);
+    if (!problem.empty()) return problem;
+    error = BindClosed(socket_.Get(), address);
+  }
+  return error == 0 ? std::string() : ErrorAt(path, error);
+}
+
+std::string ListeningSocket::Make(const std::string& path, std::optional<gid_t> group) {
+  std::string problem = LockSocket(path, lock_);
+  if (problem.empty()) problem = Bind(path);
+  if (!problem.empty()) return problem;
   struct stat status;
   if (lstat(path.c_str(), &status) != 0) return ErrorAt(path, errno);
   path_ = path;
   device_ = status.st_dev;
   inode_ = status.st_ino;
-  const bool isReady = lchown(path.c_str(), geteuid(), groupId) == 0 &&
+  const bool isReady = lchown(path.c_str(), geteuid(), group.value_or(StandardGroup())) == 0 &&
                        chmod(path.c_str(), kSocketMode) == 0 &&
                        listen(socket_.Get(), kBacklog) == 0;
   return isReady ? std::string() : ErrorAt(path, errno);
@@ -135,5 +173,6 @@ bool ListeningSocket::Unlink() {
       lstat(path_.c_str(), &status) == 0 && status.st_dev == device_ && status.st_ino == inode_;
   if (isOwn) unlink(path_.c_str());
   path_.clear();
+  lock_.Close();
   return true;
 }

@@ -1,5 +1,6 @@
 #include "log.h"
 
+#include <sys/stat.h>
 #include <unistd.h>
 
 #include <array>
@@ -63,10 +64,13 @@ std::string TimeNow() {
   return text.data();
 }
 
+/// The variable is inherited by programs whose standard error leads elsewhere, too.
 bool IsJournal() {
   static const bool isJournal = [] {
     const char* stream = std::getenv("JOURNAL_STREAM");
-    return stream != nullptr && *stream != '\0';
+    struct stat status;
+    if (stream == nullptr || fstat(STDERR_FILENO, &status) != 0) return false;
+    return stream == std::to_string(status.st_dev) + ':' + std::to_string(status.st_ino);
   }();
   return isJournal;
 }

@@ -6,9 +6,9 @@
 #include <optional>
 #include <utility>
 
+#include "index_answer.h"
 #include "index_path.h"
 #include "media_reader.h"
-#include "platform/velaindex.h"
 #include "reply.h"
 
 namespace {
@@ -26,12 +26,6 @@ Answer Done(std::string line) {
 
 Answer Failed(const std::string& error) {
   return {FailureReply(error), Outcome::kFailed, error};
-}
-
-Answer FromIndex(const IndexResult& result) {
-  if (result.IsOk()) return Done(SuccessReply());
-  const std::string error = "index database: " + result.message;
-  return {FailureReply(error), Outcome::kFault, error};
 }
 
 std::string ErrorText(int error) {
@@ -115,15 +109,7 @@ Answer RequestHandler::GetMedia(const std::string& path) const {
 Answer RequestHandler::GetIndexVersion(const std::string& path, int32_t standard) const {
   std::optional<int32_t> version;
   const IndexResult result = index_.FindNearestVersion(PlainPath(path), version);
-  return result.IsOk() ? Done(VersionReply(version.value_or(standard))) : FromIndex(result);
-}
-
-Answer RequestHandler::SetIndexVersion(const Request& request) const {
-  return FromIndex(index_.StoreVersion(PlainPath(request.path), request.version));
-}
-
-Answer RequestHandler::Post(const std::string& path, int kind) const {
-  return FromIndex(index_.StorePosted(path, kind, std::time(nullptr)));
+  return result.IsOk() ? Done(VersionReply(version.value_or(standard))) : IndexAnswer(result);
 }
 
 Answer RequestHandler::Handle(const Request& request, const Settings& settings) const {
@@ -132,16 +118,14 @@ Answer RequestHandler::Handle(const Request& request, const Settings& settings) 
       return GetMedia(request.path);
     case Command::kGetIndexVersion:
       return GetIndexVersion(request.path, settings.indexVersion);
-    case Command::kSetIndexVersion:
-      return SetIndexVersion(request);
     case Command::kIsPhotoConvertDisabled:
       return Done(ResultReply(settings.isPhotoConvertDisabled));
     case Command::kIsVideoConvertDisabled:
       return Done(ResultReply(settings.isVideoConvertDisabled));
+    case Command::kSetIndexVersion:
     case Command::kPostPhotoConvert:
-      return Post(request.path, THUMB_TYPE_PHOTO);
     case Command::kPostVideoConvert:
-      return Post(request.path, THUMB_TYPE_VIDEO);
+      break;
   }
   return {};
 }

@@ -12,14 +12,14 @@
 enum class WorkPlace {
   kAtOnce,      ///< needs nothing that could make it wait
   kIndexRead,   ///< reads the index
-  kIndexWrite,  ///< writes to it, and may have to wait for other programs that do
+  kIndexWrite,  ///< writes to it; for IndexWriter
   kFiles,       ///< needs media files, on whatever disk
 };
 
 /// Returns the place for a command.
 WorkPlace PlaceOf(Command command);
 
-/// Carries requests out, from any thread.
+/// Carries requests out, from any thread; all but those that write to the index.
 class RequestHandler {
  public:
   explicit RequestHandler(IndexStore& index) : index_(index) {}
@@ -31,8 +31,6 @@ class RequestHandler {
   Answer GetMedia(const std::string& path) const;
   Answer ReadAnew(const std::string& path) const;
   Answer GetIndexVersion(const std::string& path, int32_t standard) const;
-  Answer SetIndexVersion(const Request& request) const;
-  Answer Post(const std::string& path, int kind) const;
 
   IndexStore& index_;
 };

@@ -1,10 +1,10 @@
 #include "request_log.h"
 
-#include <sys/socket.h>
-
 #include <cstring>
+#include <optional>
 
 #include "log.h"
+#include "peer.h"
 
 namespace {
 
@@ -37,10 +37,8 @@ LogLevel LevelOf(const Answer& answer) {
 }
 
 void AddPeer(LogLine& line, int socket) {
-  ucred peer{};
-  socklen_t size = sizeof peer;
-  if (socket < 0 || getsockopt(socket, SOL_SOCKET, SO_PEERCRED, &peer, &size) != 0) return;
-  line.Add("pid", peer.pid).Add("uid", peer.uid);
+  const std::optional<ucred> peer = PeerOf(socket);
+  if (peer) line.Add("pid", peer->pid).Add("uid", peer->uid);
 }
 
 }  // namespace

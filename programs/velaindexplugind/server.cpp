@@ -10,6 +10,7 @@
 #include <utility>
 #include <vector>
 
+#include "peer.h"
 #include "reply.h"
 
 namespace {
@@ -26,18 +27,23 @@ constexpr uint64_t kSweepInterval = 250000;  // microseconds
 /// Clients that are being served come before new ones.
 constexpr int64_t kListenerPriority = SD_EVENT_PRIORITY_NORMAL + 1;
 
+/// How many requests go into one transaction; other programs must not wait for too long.
+constexpr size_t kWriteBatch = 256;
+
 /// The connection that was waiting is gone; the next one may be well.
 bool IsPassing(int error) {
   return error == ECONNABORTED || error == EINTR || error == EPROTO || error == EPERM;
 }
 
-/// Carries a job out whatever happens.
-void CarryOut(const RequestHandler& handler, Job& job) {
-  try {
-    job.answer = handler.Handle(job.request, job.settings);
-  } catch (...) {
-    // An empty line stands for the want of memory.
-    job.answer.line.clear();
+/// Carries jobs out whatever happens.
+void CarryOut(const RequestHandler& handler, std::list<Job>& jobs) {
+  for (Job& job : jobs) {
+    try {
+      job.answer = handler.Handle(job.request, job.settings);
+    } catch (...) {
+      // An empty line stands for the want of memory.
+      job.answer.line.clear();
+    }
   }
 }
 
@@ -66,11 +72,12 @@ struct Server::Client {
   Connection connection;
   const Clock::time_point begin;
   EventSource source;
+  WorkerPool* pool = nullptr;  ///< that has its request in hand
 };
 
 Server::Server(sd_event* loop, const ServerLimits& limits, const RequestHandler& handler,
-               RequestLog& log)
-    : loop_(loop), limits_(limits), handler_(handler), log_(log) {}
+               const IndexWriter& writer, RequestLog& log)
+    : loop_(loop), limits_(limits), handler_(handler), writer_(writer), log_(log) {}
 
 Server::~Server() = default;
 
@@ -90,10 +97,11 @@ int Server::Start(int listener) {
   const int result = sd_event_add_io(loop_, &source, done_.Fd(), EPOLLIN, OnDone, this);
   doneSource_.reset(source);
   if (result < 0) return -result;
-  const auto work = [this](Job& job) { CarryOut(handler_, job); };
-  files_ = std::make_unique<WorkerPool>(limits_.workers, work, done_);
-  indexReads_ = std::make_unique<WorkerPool>(1, work, done_);
-  indexWrites_ = std::make_unique<WorkerPool>(1, work, done_);
+  const auto work = [this](std::list<Job>& jobs) { CarryOut(handler_, jobs); };
+  const auto write = [this](std::list<Job>& jobs) { writer_.CarryOut(jobs); };
+  files_ = std::make_unique<WorkerPool>(limits_.workers, 1, work, done_);
+  indexReads_ = std::make_unique<WorkerPool>(1, 1, work, done_);
+  indexWrites_ = std::make_unique<WorkerPool>(1, kWriteBatch, write, done_);
   return WatchListener(listener);
 }
 
@@ -128,7 +136,7 @@ int Server::OnSweep(sd_event_source* /*source*/, uint64_t /*time*/, void* server
 /// Returns whether there may be more to accept at once.
 bool Server::AcceptSome() {
   for (int i = 0; i < kAcceptBatch; ++i) {
-    if (clients_.size() >= limits_.clients) {
+    if (clients_.size() + abandonedJobs_ >= limits_.clients) {
       sd_event_source_set_enabled(listenerSource_.get(), SD_EVENT_OFF);
       return false;
     }
@@ -226,6 +234,11 @@ void Server::Dispatch(Client& client) {
   const std::string mistake = ParseRequest(client.connection.Line(), request);
   if (!mistake.empty()) {
     Refuse(client, mistake, false);
+    return;
+  }
+  const std::string objection = ObjectionTo(request.command, PeerOf(client.connection.Fd()));
+  if (!objection.empty()) {
+    Finish(client, &request, {FailureReply(objection), Outcome::kRefused, objection}, false);
   } else if (PlaceOf(request.command) == WorkPlace::kAtOnce) {
     Finish(client, &request, handler_.Handle(request, settings_), false);
   } else {
@@ -239,10 +252,12 @@ void Server::GiveToWorkers(Client& client, Request request) {
   job.front().client = client.id;
   job.front().request = std::move(request);
   job.front().settings = settings_;
+  job.front().arrival = Clock::now();
   client.connection.BeginWork();
   Watch(client);
   WorkerPool* const indexPool = (place == WorkPlace::kIndexRead ? indexReads_ : indexWrites_).get();
-  (place == WorkPlace::kFiles ? files_.get() : indexPool)->Add(job);
+  client.pool = place == WorkPlace::kFiles ? files_.get() : indexPool;
+  client.pool->Add(job);
   ++jobsInHand_;
 }
 
@@ -256,8 +271,12 @@ void Server::TakeDoneJobs() {
 
 void Server::TakeDoneJob(Job& job) {
   const auto found = clients_.find(job.client);
-  if (found == clients_.end()) return;
+  if (found == clients_.end()) {
+    ReleaseAbandoned();
+    return;
+  }
   Client& client = *found->second;
+  client.pool = nullptr;
   try {
     Finish(client, &job.request, std::move(job.answer), false);
   } catch (const std::exception&) {
@@ -326,10 +345,26 @@ void Server::Sweep() {
 }
 
 void Server::Drop(const Client& client) {
+  if (client.pool != nullptr) Abandon(client);
   clients_.erase(client.id);
   // A pause for want of something else goes on.
   if (!pauseSource_) ResumeAccepting();
   ReportIdle();
+}
+
+/// Nobody waits for the answer any more. What a client wanted stored is stored nevertheless. A job
+/// that stays counts as a client: there could be any number of them otherwise.
+void Server::Abandon(const Client& client) {
+  if (client.pool != indexWrites_.get() && client.pool->Remove(client.id)) {
+    --jobsInHand_;
+  } else {
+    ++abandonedJobs_;
+  }
+}
+
+void Server::ReleaseAbandoned() {
+  --abandonedJobs_;
+  if (!pauseSource_) ResumeAccepting();
 }
 
 /// What has come in before the end is answered still.

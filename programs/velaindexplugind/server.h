@@ -12,6 +12,7 @@
 
 #include "connection.h"
 #include "event_source.h"
+#include "index_writer.h"
 #include "request_handler.h"
 #include "request_log.h"
 #include "worker_pool.h"
@@ -28,7 +29,7 @@ struct ServerLimits {
 class Server {
  public:
   Server(sd_event* loop, const ServerLimits& limits, const RequestHandler& handler,
-         RequestLog& log);
+         const IndexWriter& writer, RequestLog& log);
   ~Server();
   Server(const Server&) = delete;
   Server& operator=(const Server&) = delete;
@@ -78,17 +79,21 @@ class Server {
   void Sweep();
   void ArmSweep();
   void Drop(const Client& client);
+  void Abandon(const Client& client);
+  void ReleaseAbandoned();
   void ReportIdle();
 
   sd_event* const loop_;
   const ServerLimits limits_;
   const RequestHandler& handler_;
+  const IndexWriter& writer_;
   RequestLog& log_;
   Settings settings_;
   std::function<void()> onIdle_;  ///< set while the server stops
 
   DoneJobs done_;
   size_t jobsInHand_ = 0;
+  size_t abandonedJobs_ = 0;  ///< of those in hand; their clients have gone
   std::unordered_map<uint64_t, std::unique_ptr<Client>> clients_;
   uint64_t lastClient_ = 0;
   int listener_ = -1;

@@ -6,13 +6,18 @@
 
 #include <time.h>
 #include <algorithm>
+#include <chrono>
 #include <csignal>
 #include <cstring>
 #include <exception>
+#include <memory>
+#include <optional>
 #include <string>
 
 #include "event_source.h"
+#include "group.h"
 #include "index_store.h"
+#include "index_writer.h"
 #include "instance_lock.h"
 #include "ipc/velamk_ipc.h"
 #include "listening_socket.h"
@@ -26,6 +31,9 @@ namespace {
 
 constexpr int kStarted = 0;
 constexpr int kNotStarted = 1;
+
+/// How old a request that writes to the index may become before it is its turn.
+constexpr std::chrono::milliseconds kWritePatience(5000);
 
 /// How long requests in hand have to come to their end.
 constexpr uint64_t kStopTime = 5000000;  // microseconds
@@ -60,8 +68,7 @@ void TellManagerReload() {
 
 class Service {
  public:
-  explicit Service(const Options& options)
-      : options_(options), index_(options.database), handler_(index_), log_(options.logRequests) {}
+  explicit Service(const Options& options) : options_(options), log_(options.logRequests) {}
 
   /// Returns what went wrong, empty when nothing did.
   std::string Start();
@@ -74,6 +81,8 @@ class Service {
   static int OnReloadSignal(sd_event_source* source, const signalfd_siginfo* info, void* service);
   static int OnStopTime(sd_event_source* source, uint64_t time, void* service);
 
+  std::string FindOptionsGroup();
+  std::string OpenIndex();
   std::string OpenSocket();
   std::string StartServer();
   int WatchSignals();
@@ -82,21 +91,42 @@ class Service {
   void EndLoop() { sd_event_exit(loop_.get(), 0); }
 
   const Options& options_;
+  std::optional<gid_t> group_;
   Descriptor lock_;
   ListeningSocket socket_;
-  IndexStore index_;
-  RequestHandler handler_;
+  std::unique_ptr<IndexStore> index_;
+  std::unique_ptr<RequestHandler> handler_;
+  std::unique_ptr<IndexWriter> writer_;
   RequestLog log_;
   EventLoop loop_;
   std::unique_ptr<Server> server_;
   bool isStopping_ = false;
 };
 
+std::string Service::FindOptionsGroup() {
+  if (options_.group.empty()) return {};
+  gid_t id = 0;
+  std::string problem = FindGroup(options_.group, id);
+  if (problem.empty()) group_ = id;
+  return problem;
+}
+
+std::string Service::OpenIndex() {
+  const IndexFile file = {options_.database, group_};
+  std::string problem = LockIndex(file, lock_);
+  if (!problem.empty()) return problem;
+  index_ = std::make_unique<IndexStore>(file);
+  handler_ = std::make_unique<RequestHandler>(*index_);
+  writer_ = std::make_unique<IndexWriter>(*index_, kWritePatience);
+  const IndexResult opened = index_->Open();
+  return opened.IsOk() ? std::string() : file.path + ": " + opened.message;
+}
+
 std::string Service::OpenSocket() {
   bool isTaken = false;
   const std::string problem = socket_.TakeFromManager(isTaken);
   if (!problem.empty() || isTaken) return problem;
-  return socket_.Make(PluginDaemonSocketPath, options_.group);
+  return socket_.Make(PluginDaemonSocketPath, group_);
 }
 
 void Service::LoadSettings(const char* event) {
@@ -151,22 +181,20 @@ std::string Service::StartServer() {
   limits.workers = options_.workers;
   limits.clients = MakeRoomForClients(options_.maxClients, options_.workers);
   limits.clientTimeout = std::chrono::seconds(options_.clientTimeout);
-  server_ = std::make_unique<Server>(loop, limits, handler_, log_);
+  server_ = std::make_unique<Server>(loop, limits, *handler_, *writer_, log_);
   const int error = server_->Start(socket_.Fd());
   return error == 0 ? std::string() : std::string("event loop: ") + std::strerror(error);
 }
 
 std::string Service::Start() {
-  std::string problem = LockInstance(options_.database, lock_);
-  if (!problem.empty()) return problem;
-  const IndexResult opened = index_.Open();
-  if (!opened.IsOk()) return options_.database + ": " + opened.message;
-  problem = OpenSocket();
+  std::string problem = FindOptionsGroup();
+  if (problem.empty()) problem = OpenIndex();
+  if (problem.empty()) problem = OpenSocket();
   if (problem.empty()) problem = StartServer();
   if (!problem.empty()) return problem;
   LogLine(LogLevel::kInfo, "start")
       .Add("version", VELA_VERSION)
-      .Add("socket", PluginDaemonSocketPath)
+      .Add("socket", socket_.Address())
       .Add("database", options_.database)
       .Add("workers", options_.workers)
       .Write();

@@ -2,8 +2,10 @@
 
 #include <sys/eventfd.h>
 
+#include <algorithm>
 #include <cerrno>
 #include <exception>
+#include <iterator>
 #include <utility>
 
 int DoneJobs::Open() {
@@ -11,10 +13,10 @@ int DoneJobs::Open() {
   return signal_.IsOpen() ? 0 : errno;
 }
 
-void DoneJobs::Add(std::list<Job>& job) {
+void DoneJobs::Add(std::list<Job>& jobs) {
   {
     const std::lock_guard<std::mutex> lock(mutex_);
-    jobs_.splice(jobs_.end(), job);
+    jobs_.splice(jobs_.end(), jobs);
   }
   // Can fail only when the counter is full, and then the other side is sure to wake up.
   eventfd_write(signal_.Get(), 1);
@@ -29,8 +31,8 @@ std::list<Job> DoneJobs::Take() {
   return jobs;
 }
 
-WorkerPool::WorkerPool(int threads, Work work, DoneJobs& done)
-    : work_(std::move(work)), done_(done) {
+WorkerPool::WorkerPool(int threads, size_t batch, Work work, DoneJobs& done)
+    : batch_(batch), work_(std::move(work)), done_(done) {
   try {
     for (int i = 0; i < threads; ++i) threads_.emplace_back(&WorkerPool::Run, this);
   } catch (const std::exception&) {
@@ -61,16 +63,32 @@ void WorkerPool::Add(std::list<Job>& job) {
   change_.notify_one();
 }
 
+bool WorkerPool::Remove(uint64_t client) {
+  std::list<Job> removed;
+  const std::lock_guard<std::mutex> lock(mutex_);
+  const auto found = std::find_if(waiting_.begin(), waiting_.end(),
+                                  [client](const Job& job) { return job.client == client; });
+  if (found == waiting_.end()) return false;
+  removed.splice(removed.end(), waiting_, found);
+  return true;
+}
+
+std::list<Job> WorkerPool::TakeWaiting() {
+  std::list<Job> jobs;
+  const auto count = static_cast<std::ptrdiff_t>(std::min(batch_, waiting_.size()));
+  jobs.splice(jobs.end(), waiting_, waiting_.begin(), std::next(waiting_.begin(), count));
+  return jobs;
+}
+
 void WorkerPool::Run() {
   std::unique_lock<std::mutex> lock(mutex_);
   for (;;) {
     change_.wait(lock, [this] { return isStopping_ || !waiting_.empty(); });
     if (isStopping_) return;
-    std::list<Job> job;
-    job.splice(job.end(), waiting_, waiting_.begin());
+    std::list<Job> jobs = TakeWaiting();
     lock.unlock();
-    work_(job.front());
-    done_.Add(job);
+    work_(jobs);
+    done_.Add(jobs);
     lock.lock();
   }
 }

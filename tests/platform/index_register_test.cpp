@@ -131,18 +131,32 @@ TEST_F(IndexRegister, MakesDirectoryAndFile) {
     const mode_t mask = umask(0);
     EXPECT_EQ(AddPath("/photo/a.jpg"), 0);
     umask(mask);
-    EXPECT_EQ(ModeOf(kDirectory), 0755);
-    EXPECT_EQ(ModeOf(kDatabase), 0644);
+    EXPECT_EQ(ModeOf(kDirectory), 0750);
+    for (const char* suffix : {"", "-wal", "-shm"}) {
+      EXPECT_EQ(ModeOf(std::string(kDatabase) + suffix), 0640) << suffix;
+    }
   });
 }
 
-TEST_F(IndexRegister, MakesTheDirectoryWithItsModeWhateverTheMask) {
+TEST_F(IndexRegister, LeavesTheModesOfWhatIsThere) {
+  InOwnProcess([] {
+    vela_test::WriteFile(kDatabase, "");
+    EXPECT_EQ(chmod(kDirectory, 0711), 0);
+    EXPECT_EQ(chmod(kDatabase, 0604), 0);
+    EXPECT_EQ(AddPath("/photo/a.jpg"), 0);
+    EXPECT_EQ(ModeOf(kDirectory), 0711);
+    EXPECT_EQ(ModeOf(kDatabase), 0604);
+  });
+}
+
+TEST_F(IndexRegister, MakesBothWithTheirModesWhateverTheMask) {
   InOwnProcess([] {
     vela_test::RemoveTree(kDirectory);
     const mode_t mask = umask(077);
     EXPECT_EQ(AddPath("/photo/a.jpg"), 0);
     umask(mask);
-    EXPECT_EQ(ModeOf(kDirectory), 0755);
+    EXPECT_EQ(ModeOf(kDirectory), 0750);
+    EXPECT_EQ(ModeOf(kDatabase), 0640);
   });
 }
 

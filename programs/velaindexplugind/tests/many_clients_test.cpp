@@ -99,7 +99,7 @@ TEST_F(ManyClientsTest, AllAreAnswered) {
 TEST_F(ManyClientsTest, ThoseThatStopHalfWayDoNotDelayOthers) {
   const IndexDaemon daemon;
   const std::string half = kVersionRequest.substr(0, 20);
-  for (const size_t count : {200, 1000}) {
+  for (const size_t count : {200U, 1000U}) {
     const std::vector<Descriptor> silent = Connect(count / 2, "");
     const std::vector<Descriptor> halfWay = Connect(count / 2, half);
     const auto begin = std::chrono::steady_clock::now();
@@ -215,6 +215,98 @@ TEST_F(ManyClientsTest, ThatGoWhileTheirRequestIsInHandAreForgotten) {
   // What they asked is done nevertheless.
   PostPhotoConvert("/b.jpg");
   EXPECT_EQ(Query("SELECT count(*) FROM posted"), std::vector<std::string>{"3"});
+}
+
+TEST_F(ManyClientsTest, WaitForALockedIndexTogetherAndNotOneAfterTheOther) {
+  const IndexDaemon daemon;
+  const IndexHolder holder;
+  const auto begin = std::chrono::steady_clock::now();
+  const std::vector<Descriptor> posting =
+      Connect(6, R"({"command":"POST_PHOTO_CONVERT","path":"/a.jpg"})"
+                 "\n");
+  for (const Descriptor& connection : posting) {
+    const Json::Value reply = ParseReply(ReceiveAll(connection));
+    EXPECT_EQ(reply["success"], Json::Value(false));
+    EXPECT_EQ(reply["error"], "index database: other writers kept it for too long");
+  }
+  const auto took = std::chrono::steady_clock::now() - begin;
+  EXPECT_GT(took, std::chrono::milliseconds(4500));
+  EXPECT_LT(took, std::chrono::seconds(20));
+}
+
+TEST_F(ManyClientsTest, HaveWhatTheyPostWrittenTogether) {
+  constexpr size_t kPosts = 60;
+  constexpr int64_t kPageSize = 4096;
+  const IndexDaemon daemon;
+  Ask(PathRequest("POST_PHOTO_CONVERT", "/first.jpg"));
+  IndexHolder holder;
+  std::vector<Descriptor> posting;
+  for (size_t i = 0; i < kPosts; ++i) {
+    posting.push_back(ConnectToDaemon());
+    SendBytes(posting.back(),
+              R"({"command":"POST_PHOTO_CONVERT","path":"/)" + std::to_string(i) + "\"}\n");
+  }
+  // An answer tells that the requests before have been taken in.
+  EXPECT_EQ(GetIndexVersion("/a"), 0);
+  const std::string log = kIndexDatabase + std::string("-wal");
+  const int64_t before = FileSize(log);
+  holder.Release();
+  for (const Descriptor& connection : posting) {
+    EXPECT_EQ(ParseReply(ReceiveAll(connection))["success"], Json::Value(true));
+  }
+  EXPECT_EQ(Query("SELECT count(*) FROM posted"),
+            std::vector<std::string>{std::to_string(kPosts + 1)});
+  // Each transaction writes a page at least.
+  EXPECT_LT(FileSize(log) - before, static_cast<int64_t>(kPosts / 2) * kPageSize);
+}
+
+TEST_F(ManyClientsTest, ThatGoBeforeTheirRequestIsInHandKeepTheirPlaceUntilItIsDone) {
+  const IndexDaemon daemon({"--max-clients", "4"});
+  Ask(PathRequest("POST_PHOTO_CONVERT", "/first.jpg"));
+  const size_t before = daemon.Descriptors();
+  IndexHolder holder;
+  {
+    const std::vector<Descriptor> posting =
+        Connect(4, R"({"command":"POST_PHOTO_CONVERT","path":"/a.jpg"})"
+                   "\n");
+    EXPECT_TRUE(daemon.WaitForDescriptors(before + 4));
+  }
+  EXPECT_TRUE(daemon.WaitForDescriptors(before));
+  const std::vector<Descriptor> next = Connect(1, kVersionRequest + "\n");
+  EXPECT_FALSE(HasReply(next[0], 300));
+  holder.Release();
+  EXPECT_EQ(ParseReply(ReceiveAll(next[0]))["version"], 0);
+}
+
+TEST_F(ManyClientsTest, ThatGoWithoutTheirRecordsHaveNoFilesReadForThem) {
+  constexpr int kPhotos = 40;
+  const IndexDaemon daemon({"--workers", "1"});
+  for (int i = 0; i <= kPhotos; ++i) {
+    const std::string path = "/tmp/" + std::to_string(i) + ".jpg";
+    MakeJpeg(path);
+    SetFileTimeFromNow(path, -3600);
+  }
+  Ask(PathRequest("POST_PHOTO_CONVERT", "/first.jpg"));
+  AskForMedia("/tmp/0.jpg");
+  const size_t before = daemon.Descriptors();
+  IndexHolder holder;  // makes each record take its time
+  {
+    std::vector<Descriptor> asking;
+    for (int i = 1; i <= kPhotos; ++i) {
+      asking.push_back(ConnectToDaemon());
+      SendBytes(asking.back(), R"({"command":"GET_MEDIA_FROM_PLUGIN_DB","type":1,"path":"/tmp/)" +
+                                   std::to_string(i) + ".jpg\"}\n");
+    }
+    EXPECT_EQ(GetIndexVersion("/a"), 0);
+  }
+  // The one in hand may have files open.
+  const auto end = std::chrono::steady_clock::now() + std::chrono::seconds(60);
+  while (daemon.Descriptors() > before + 8 && std::chrono::steady_clock::now() < end) {
+    std::this_thread::sleep_for(std::chrono::milliseconds(2));
+  }
+  holder.Release();
+  EXPECT_EQ(AskForMedia("/tmp/0.jpg")["width"], 64);
+  EXPECT_LE(std::stoi(Query("SELECT count(*) FROM media").at(0)), 1 + kPhotos / 4);
 }
 
 TEST_F(ManyClientsTest, BeyondTheLimitWaitUntilThereIsRoom) {

@@ -1,12 +1,15 @@
 // The small parts by themselves.
 #include <gtest/gtest.h>
+#include <unistd.h>
 
 #include <chrono>
 #include <optional>
 #include <string>
 
 #include "index_path.h"
+#include "peer.h"
 #include "rate_limit.h"
+#include "request.h"
 #include "whole_number.h"
 
 namespace vela_test {
@@ -38,6 +41,22 @@ TEST(ParseWholeNumberTest, TakesDigitsOnly) {
   EXPECT_EQ(ParseWholeNumber("007"), 7);
   for (const char* wrong : {"", " 1", "1 ", "+1", "-1", "-0", "1.0", "0x1", "2147483648", "1e3"}) {
     EXPECT_EQ(ParseWholeNumber(wrong), std::nullopt) << wrong;
+  }
+}
+
+TEST(ObjectionToTest, KeepsVersionsFromOtherUsers) {
+  const uid_t own = geteuid();
+  EXPECT_EQ(ObjectionTo(Command::kSetIndexVersion, ucred{1, 0, 5}), "");
+  EXPECT_EQ(ObjectionTo(Command::kSetIndexVersion, ucred{1, own, 5}), "");
+  EXPECT_NE(ObjectionTo(Command::kSetIndexVersion, ucred{1, own + 1, getegid()}), "");
+  EXPECT_NE(ObjectionTo(Command::kSetIndexVersion, std::nullopt), "");
+}
+
+TEST(ObjectionToTest, LeavesAllElseToEverybody) {
+  for (const Command command :
+       {Command::kGetMedia, Command::kGetIndexVersion, Command::kIsPhotoConvertDisabled,
+        Command::kIsVideoConvertDisabled, Command::kPostPhotoConvert, Command::kPostVideoConvert}) {
+    EXPECT_EQ(ObjectionTo(command, ucred{1, geteuid() + 1, 5}), "") << CommandWord(command);
   }
 }
 

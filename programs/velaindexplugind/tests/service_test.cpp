@@ -3,6 +3,7 @@
 #include <gmock/gmock.h>
 #include <grp.h>
 #include <sqlite3.h>
+#include <sys/file.h>
 #include <sys/socket.h>
 #include <sys/stat.h>
 #include <sys/un.h>
@@ -14,6 +15,7 @@
 #include <csignal>
 #include <cstring>
 #include <fstream>
+#include <functional>
 #include <string>
 #include <vector>
 
@@ -37,16 +39,43 @@ size_t LineCount(const std::string& text) {
   return static_cast<size_t>(std::count(text.begin(), text.end(), '\n'));
 }
 
-/// A socket that listens at the daemon's path.
-Descriptor ListenAtSocket() {
+sockaddr_un AddressOf(const char* path) {
   sockaddr_un address{};
   address.sun_family = AF_UNIX;
-  std::strncpy(address.sun_path, PluginDaemonSocketPath, sizeof address.sun_path - 1);
+  std::strncpy(address.sun_path, path, sizeof address.sun_path - 1);
+  return address;
+}
+
+Descriptor ListenAt(const char* path) {
+  const sockaddr_un address = AddressOf(path);
   Descriptor made(socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0));
   const auto* generic = reinterpret_cast<const sockaddr*>(&address);
   EXPECT_EQ(bind(made.Get(), generic, sizeof address), 0);
   EXPECT_EQ(listen(made.Get(), 100), 0);
   return made;
+}
+
+/// A socket that listens at the daemon's path.
+Descriptor ListenAtSocket() {
+  return ListenAt(PluginDaemonSocketPath);
+}
+
+Descriptor ConnectTo(const char* path) {
+  const sockaddr_un address = AddressOf(path);
+  Descriptor made(socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0));
+  const auto* generic = reinterpret_cast<const sockaddr*>(&address);
+  EXPECT_EQ(connect(made.Get(), generic, sizeof address), 0);
+  return made;
+}
+
+/// Starts the daemon as a service manager does that listens for it.
+Program StartGiven(const Descriptor& given) {
+  const std::string number = std::to_string(given.Get());
+  ProgramOptions options;
+  options.keptDescriptors = {given.Get()};
+  const std::string script = "exec 3<&" + number + " " + (number == "3" ? "" : number + "<&-") +
+                             "; LISTEN_FDS=1 LISTEN_PID=$$ exec \"$0\"";
+  return StartProgram("/bin/bash", {"-c", script, IndexDaemonPath()}, options);
 }
 
 /// Whether the sandbox has other users and groups than user 0: it has when it was made by root.
@@ -59,18 +88,22 @@ bool HasOtherUsers() {
   return count > 65535;
 }
 
-/// The errno value that a connection of another user fails with, 0 when it succeeds.
-int ConnectAs(uid_t user, gid_t group) {
+bool BecomeOther(uid_t user, gid_t group) {
+  return setgroups(0, nullptr) == 0 && setgid(group) == 0 && setuid(user) == 0;
+}
+
+/// What `action` returns when another user carries it out, 0 to 254.
+int RunAs(uid_t user, gid_t group, const std::function<int()>& action) {
   const pid_t child = fork();
-  if (child == 0) {
-    const bool isOther = setgroups(0, nullptr) == 0 && setgid(group) == 0 && setuid(user) == 0;
-    if (!isOther) _exit(255);
-    const bool isConnected = ConnectToDaemon().IsOpen();
-    _exit(isConnected ? 0 : errno);
-  }
+  if (child == 0) _exit(BecomeOther(user, group) ? action() : 255);
   int status = 0;
   EXPECT_EQ(waitpid(child, &status, 0), child);
   return WEXITSTATUS(status);
+}
+
+/// The errno value that a connection of another user fails with, 0 when it succeeds.
+int ConnectAs(uid_t user, gid_t group) {
+  return RunAs(user, group, [] { return ConnectToDaemon().IsOpen() ? 0 : errno; });
 }
 
 TEST_F(ServiceTest, EndsCleanlyAtSignals) {
@@ -178,6 +211,135 @@ TEST_F(ServiceTest, SomethingElseThanASocketIsLeftAlone) {
   EXPECT_TRUE(Exists(PluginDaemonSocketPath));
 }
 
+TEST_F(ServiceTest, RootReplacesWhateverAnotherUserHasPutThere) {
+  if (!HasOtherUsers()) {
+    // In a sandbox of one user everything is root's own, and stays.
+    const Descriptor own = ListenAtSocket();
+    EXPECT_EQ(RunDaemon().exitCode, 1);
+    EXPECT_TRUE(ConnectToDaemon().IsOpen());
+    return;
+  }
+  const std::vector<std::function<Descriptor()>> puts = {
+      [] { return ListenAtSocket(); },
+      [] {
+        WriteFile(PluginDaemonSocketPath, "x");
+        return Descriptor();
+      },
+      [] {
+        EXPECT_EQ(symlink("/tmp/elsewhere", PluginDaemonSocketPath), 0);
+        return Descriptor();
+      },
+      [] {
+        WriteFile(std::string(PluginDaemonSocketPath) + "/sub/file", "x");
+        return Descriptor();
+      }};
+  for (size_t i = 0; i < puts.size(); ++i) {
+    const Descriptor open = puts[i]();
+    ASSERT_EQ(lchown(PluginDaemonSocketPath, 1, 1), 0);
+    IndexDaemon daemon;
+    EXPECT_EQ(GetIndexVersion("/a"), 0) << i;
+    EXPECT_THAT(daemon.End(SIGTERM).err,
+                HasSubstr("level=warning event=socket replaced=/tmp/velaindexplugind_sock "
+                          "owner=daemon"));
+  }
+}
+
+TEST_F(ServiceTest, SocketThatAnotherListensAtIsLeftAlone) {
+  const Descriptor other = ListenAtSocket();
+  const ProgramResult result = RunDaemon();
+  EXPECT_EQ(result.exitCode, 1);
+  EXPECT_THAT(result.err, HasSubstr("another instance listens at /tmp/velaindexplugind_sock"));
+  EXPECT_TRUE(ConnectToDaemon().IsOpen());
+}
+
+TEST_F(ServiceTest, RefusesToStartWhileAnotherPreparesItsSocket) {
+  const char* const file = "/run/velaindexplugind.lock";
+  const Descriptor lock(open(file, O_RDWR | O_CREAT | O_CLOEXEC, 0600));
+  ASSERT_EQ(flock(lock.Get(), LOCK_EX | LOCK_NB), 0);
+  const ProgramResult result = RunDaemon();
+  EXPECT_EQ(result.exitCode, 1);
+  EXPECT_THAT(result.err, HasSubstr("another instance listens at /tmp/velaindexplugind_sock"));
+  EXPECT_FALSE(Exists(PluginDaemonSocketPath));
+}
+
+TEST_F(ServiceTest, OneOfTwoThatStartTogetherGetsTheSocket) {
+  for (int round = 0; round < 5; ++round) {
+    {
+      IndexDaemon daemon;
+      daemon.End(SIGKILL);
+    }
+    Program first = StartProgram(IndexDaemonPath(), {"--database", "/tmp/first/index.db"});
+    Program second = StartProgram(IndexDaemonPath(), {"--database", "/tmp/second/index.db"});
+    const auto isDecided = [](const Program& program) {
+      const std::string log = program.Error();
+      return log.find("event=settings") != std::string::npos ||
+             log.find("level=error") != std::string::npos;
+    };
+    for (int i = 0; i < 6000 && !(isDecided(first) && isDecided(second)); ++i) usleep(10000);
+    const bool isFirst = first.Error().find("event=settings") != std::string::npos;
+    Program& winner = isFirst ? first : second;
+    Program& loser = isFirst ? second : first;
+    EXPECT_EQ(GetIndexVersion("/a"), 0);
+    EXPECT_EQ(loser.Wait()->exitCode, 1);
+    winner.Kill(SIGTERM);
+    EXPECT_EQ(winner.Wait()->exitCode, 0);
+  }
+}
+
+TEST_F(ServiceTest, OrdinaryUserMayRunItForHimself) {
+  ProgramOptions options;
+  if (!HasOtherUsers()) {
+    // The only user of the sandbox, with no more rights than any other.
+    options.beforeExec = {DropCapabilities()};
+    MakeDirectories("/tmp/own");
+    const IndexDaemon daemon({"--database", "/tmp/own/index.db"}, options);
+    EXPECT_TRUE(SetVersion("/a", 3));
+    EXPECT_EQ(GetIndexVersion("/a"), 3);
+    return;
+  }
+  options.beforeExec = {[] { return BecomeOther(1, 1) ? 0 : EPERM; }};
+  const std::vector<std::string> arguments = {"--database", "/tmp/own/index.db"};
+  MakeDirectories("/tmp/own");
+  const IndexDaemon daemon(arguments, options);
+  EXPECT_EQ(RunAs(1, 1, [] { return GetIndexVersion("/a"); }), 0);
+  EXPECT_EQ(RunAs(1, 1, [] { return SetVersion("/a", 3) ? 0 : 1; }), 0);
+  EXPECT_EQ(GetIndexVersion("/a"), 3);
+  MakeDirectories("/tmp/more");
+  const ProgramResult second =
+      RunProgram(IndexDaemonPath(), {"--database", "/tmp/more/index.db"}, options);
+  EXPECT_EQ(second.exitCode, 1);
+  EXPECT_THAT(second.err, HasSubstr("another instance listens"));
+}
+
+TEST_F(ServiceTest, OnlyTheDaemonsUserSetsIndexVersions) {
+  if (!HasOtherUsers()) {
+    const IndexDaemon daemon;
+    EXPECT_TRUE(SetVersion("/photos", 5));
+    EXPECT_EQ(GetIndexVersion("/photos/a.jpg"), 5);
+    return;
+  }
+  IndexDaemon daemon({"--group", "daemon"});
+  const auto set = [] {
+    Json::Value request = PathRequest("SET_INDEX_VERSION", "/photos");
+    request["version"] = 4;
+    const Json::Value reply = Ask(request);
+    const bool isRight =
+        reply["error"] == "only root and the daemon's own user may set index versions";
+    return reply["success"] == Json::Value(false) && isRight ? 0 : 1;
+  };
+  EXPECT_EQ(RunAs(65534, 1, set), 0);
+  EXPECT_EQ(GetIndexVersion("/photos/a.jpg"), 0);
+  EXPECT_EQ(RunAs(65534, 1,
+                  [] {
+                    const Json::Value reply = Ask(PathRequest("POST_PHOTO_CONVERT", "/a.jpg"));
+                    return reply["success"] == Json::Value(true) ? 0 : 1;
+                  }),
+            0);
+  EXPECT_TRUE(SetVersion("/photos", 5));
+  EXPECT_THAT(daemon.End(SIGTERM).err, HasSubstr("command=SET_INDEX_VERSION path=/photos "
+                                                 "outcome=refused"));
+}
+
 TEST_F(ServiceTest, SocketOfAnotherIsNotRemovedAtTheEnd) {
   IndexDaemon daemon;
   RemoveTree(PluginDaemonSocketPath);
@@ -209,6 +371,10 @@ TEST_F(ServiceTest, GroupIsTheOneThatIsNamed) {
     ASSERT_EQ(lstat(PluginDaemonSocketPath, &status), 0);
     EXPECT_EQ(status.st_mode & 07777, 0660U);
     EXPECT_EQ(status.st_gid, 1U);
+    for (const char* made : {"/var/lib/velaindex", kIndexDatabase}) {
+      ASSERT_EQ(stat(made, &status), 0);
+      EXPECT_EQ(status.st_gid, 1U) << made;
+    }
     EXPECT_EQ(ConnectAs(65534, 1), 0);
     EXPECT_EQ(ConnectAs(65534, 65534), EACCES);
   } else {
@@ -226,15 +392,10 @@ TEST_F(ServiceTest, GroupThatNobodyKnowsIsAnError) {
 
 TEST_F(ServiceTest, TakesTheSocketThatItIsGiven) {
   const Descriptor given = ListenAtSocket();
-  const std::string number = std::to_string(given.Get());
-  ProgramOptions options;
-  options.keptDescriptors = {given.Get()};
-  const std::string script = "exec 3<&" + number + " " + (number == "3" ? "" : number + "<&-") +
-                             "; LISTEN_FDS=1 LISTEN_PID=$$ exec \"$0\"";
   // Who comes before it has started is answered, too.
   const Descriptor early = ConnectToDaemon();
   SendBytes(early, "{\"command\":\"GET_INDEX_VERSION\",\"path\":\"/a\"}\n");
-  Program program = StartProgram("/bin/bash", {"-c", script, IndexDaemonPath()}, options);
+  Program program = StartGiven(given);
   EXPECT_EQ(ParseReply(ReceiveAll(early))["version"], 0);
   EXPECT_EQ(GetIndexVersion("/a"), 0);
   program.Kill(SIGTERM);
@@ -253,14 +414,35 @@ TEST_F(ServiceTest, HasADefiniteLogFormat) {
 }
 
 TEST_F(ServiceTest, MarksLinesForTheJournal) {
-  ProgramOptions options;
-  options.addedEnvironment = {"JOURNAL_STREAM=1:2"};
-  IndexDaemon daemon({}, options);
+  const std::string script = "JOURNAL_STREAM=$(stat -L -c %d:%i /proc/self/fd/2) exec \"$0\"";
+  Program daemon = StartProgram("/bin/bash", {"-c", script, IndexDaemonPath()});
+  ASSERT_TRUE(WaitUntilExists(PluginDaemonSocketPath));
+  while (!ConnectToDaemon().IsOpen()) usleep(1000);
   AskWithBytes("x");
-  const std::string log = daemon.End(SIGTERM).err;
+  daemon.Kill(SIGTERM);
+  const std::string log = daemon.Wait()->err;
   EXPECT_THAT(log, HasSubstr("<6>level=info event=start"));
   EXPECT_THAT(log, HasSubstr("<4>level=warning event=request"));
   EXPECT_THAT(log, Not(HasSubstr("time=")));
+}
+
+TEST_F(ServiceTest, MarksNoLinesWhenItsErrorStreamIsNotTheJournals) {
+  ProgramOptions options;
+  options.addedEnvironment = {"JOURNAL_STREAM=1:2"};
+  IndexDaemon daemon({}, options);
+  const std::string log = daemon.End(SIGTERM).err;
+  EXPECT_THAT(log, HasSubstr("time=2"));
+  EXPECT_THAT(log, Not(HasSubstr("<6>")));
+}
+
+TEST_F(ServiceTest, TellsTheSocketThatItWasGiven) {
+  const Descriptor given = ListenAt("/tmp/another_sock");
+  Program program = StartGiven(given);
+  const Descriptor early = ConnectTo("/tmp/another_sock");
+  SendBytes(early, "{\"command\":\"GET_INDEX_VERSION\",\"path\":\"/a\"}\n");
+  EXPECT_EQ(ParseReply(ReceiveAll(early))["version"], 0);
+  program.Kill(SIGTERM);
+  EXPECT_THAT(program.Wait()->err, HasSubstr(" socket=/tmp/another_sock "));
 }
 
 TEST_F(ServiceTest, SaysNothingOfOrdinaryRequestsUnlessAsked) {

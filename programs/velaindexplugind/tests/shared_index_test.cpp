@@ -43,10 +43,34 @@ TEST_F(SharedIndexTest, IsMadeWithItsDirectory) {
   ProgramOptions options;
   options.umask = 077;
   const IndexDaemon daemon({}, options);
-  EXPECT_EQ(ModeOf("/var/lib/velaindex"), 0755);
   EXPECT_EQ(Query("PRAGMA journal_mode"), Rows{"wal"});
   EXPECT_EQ(Query("SELECT version FROM velaindexplugind_schema"), Rows{"1"});
   EXPECT_EQ(Query("PRAGMA user_version"), Rows{"0"}) << "that is for others to set";
+}
+
+TEST_F(SharedIndexTest, IsForItsOwnerAndGroupWhateverTheMask) {
+  for (const mode_t mask : {0U, 077U}) {
+    RemoveTree("/var/lib/velaindex");
+    ProgramOptions options;
+    options.umask = mask;
+    IndexDaemon daemon({}, options);
+    PostPhotoConvert("/a.jpg");
+    EXPECT_EQ(ModeOf("/var/lib/velaindex"), 0750);
+    for (const char* end : {"", "-wal", "-shm"}) {
+      EXPECT_EQ(ModeOf(kIndexDatabase + std::string(end)), 0640) << end << " mask " << mask;
+    }
+    daemon.End(SIGTERM);
+  }
+}
+
+TEST_F(SharedIndexTest, ThatIsThereKeepsItsModes) {
+  ASSERT_EQ(RegisterConversion("/before.jpg"), 0);
+  ASSERT_EQ(chmod("/var/lib/velaindex", 0711), 0);
+  ASSERT_EQ(chmod(kIndexDatabase, 0604), 0);
+  const IndexDaemon daemon;
+  PostPhotoConvert("/a.jpg");
+  EXPECT_EQ(ModeOf("/var/lib/velaindex"), 0711);
+  EXPECT_EQ(ModeOf(kIndexDatabase), 0604);
 }
 
 TEST_F(SharedIndexTest, MayLieElsewhere) {

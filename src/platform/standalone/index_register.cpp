@@ -1,3 +1,4 @@
+#include <fcntl.h>
 #include <sqlite3.h>
 #include <sys/stat.h>
 #include <unistd.h>
@@ -12,6 +13,7 @@
 #include <thread>
 
 #include "platform/standalone/deadline.h"
+#include "platform/standalone/file_descriptor.h"
 #include "platform/standalone/index_schema.h"
 #include "platform/standalone/last_error.h"
 #include "platform/velaindex.h"
@@ -20,7 +22,9 @@ namespace {
 
 using velaplatform::Fail;
 
-constexpr mode_t kDirectoryMode = 0755;
+/// The index tells the names of everybody's photos, also of those in closed directories.
+constexpr mode_t kDirectoryMode = 0750;
+constexpr mode_t kFileMode = 0640;
 
 struct CloseDatabase {
   void operator()(sqlite3* database) const { sqlite3_close_v2(database); }
@@ -59,6 +63,19 @@ int ToErrno(int sqliteCode) {
 bool MakeDirectory() {
   if (mkdir(velaplatform::kIndexDirectory, kDirectoryMode) != 0) return errno == EEXIST;
   return chmod(velaplatform::kIndexDirectory, kDirectoryMode) == 0;
+}
+
+int CreateNewFile() {
+  return open(velaplatform::kIndexDatabase, O_RDWR | O_CREAT | O_EXCL | O_CLOEXEC, kFileMode);
+}
+
+/// Makes the database's file, empty, when it is missing, with its mode whatever the process's mask:
+/// the library would leave that to the mask. A failure shows when the file is opened.
+void MakeFile() {
+  int made = CreateNewFile();
+  if (made < 0 && errno == ENOENT && MakeDirectory()) made = CreateNewFile();
+  const velaplatform::FileDescriptor file(made);
+  if (made >= 0) fchmod(made, kFileMode);
 }
 
 std::string_view PathOf(const VELA_MEDIA_INFO& media) {
@@ -123,7 +140,7 @@ int IndexDatabase::Run(const StatementHandle& statement) {
 }
 
 int IndexDatabase::OpenFile() {
-  constexpr int kFlags = SQLITE_OPEN_READWRITE | SQLITE_OPEN_CREATE | SQLITE_OPEN_NOMUTEX;
+  constexpr int kFlags = SQLITE_OPEN_READWRITE | SQLITE_OPEN_NOMUTEX;
   sqlite3* database = nullptr;
   const int code = sqlite3_open_v2(velaplatform::kIndexDatabase, &database, kFlags, nullptr);
   database_.reset(database);
@@ -193,8 +210,8 @@ int IndexDatabase::EnsureTables() {
 }
 
 int IndexDatabase::Open() {
+  MakeFile();
   int error = OpenFile();
-  if (error != 0 && MakeDirectory()) error = OpenFile();
   if (error == 0) error = Configure();
   if (error == 0) error = PrepareStatements();
   if (error == 0) error = EnsureTables();

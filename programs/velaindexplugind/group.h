@@ -1,0 +1,9 @@
+// Groups by their names.
+#pragma once
+
+#include <sys/types.h>
+
+#include <string>
+
+/// Finds the number of the group `name`. Returns what went wrong, empty when nothing did.
+std::string FindGroup(const std::string& name, gid_t& id);

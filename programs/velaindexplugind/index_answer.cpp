@@ -1,0 +1,11 @@
+#include "index_answer.h"
+
+#include <string>
+
+#include "reply.h"
+
+Answer IndexAnswer(const IndexResult& result) {
+  if (result.IsOk()) return {SuccessReply(), Outcome::kDone, {}};
+  const std::string error = "index database: " + result.message;
+  return {FailureReply(error), Outcome::kFault, error};
+}

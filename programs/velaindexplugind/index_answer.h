@@ -1,0 +1,8 @@
+// Answers that tell how an operation on the index ended.
+#pragma once
+
+#include "answer.h"
+#include "index_connection.h"
+
+/// Returns the plain success, or the index's fault. Throws only std::bad_alloc.
+Answer IndexAnswer(const IndexResult& result);

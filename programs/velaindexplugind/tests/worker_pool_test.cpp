@@ -1,0 +1,86 @@
+// Threads for work that may have to wait.
+#include "worker_pool.h"
+
+#include <gtest/gtest.h>
+#include <poll.h>
+
+#include <future>
+#include <list>
+#include <utility>
+#include <vector>
+
+namespace vela_test {
+namespace {
+
+using Sizes = std::vector<size_t>;
+
+/// A pool of one thread whose first piece of work lasts until it is let go on.
+class HeldPool {
+ public:
+  explicit HeldPool(size_t batch)
+      : pool_(
+            1, batch,
+            [this](std::list<Job>& jobs) {
+              sizes_.push_back(jobs.size());
+              if (sizes_.size() > 1) return;
+              begun_.set_value();
+              goOn_.get_future().wait();
+            },
+            OpenJobs(done_)) {
+    Add(0);
+    begun_.get_future().wait();
+  }
+
+  void Add(uint64_t client) {
+    std::list<Job> job(1);
+    job.front().client = client;
+    pool_.Add(job);
+  }
+
+  bool Remove(uint64_t client) { return pool_.Remove(client); }
+
+  /// Lets the work go on. Returns whose jobs are done as soon as there are so many.
+  std::vector<uint64_t> GoOn(size_t count) {
+    goOn_.set_value();
+    std::vector<uint64_t> clients;
+    pollfd waiting = {done_.Fd(), POLLIN, 0};
+    while (clients.size() < count && poll(&waiting, 1, 60000) == 1) {
+      for (const Job& job : done_.Take()) clients.push_back(job.client);
+    }
+    return clients;
+  }
+
+  /// How many jobs each piece of work had; after GoOn.
+  const Sizes& WorkSizes() const { return sizes_; }
+
+ private:
+  static DoneJobs& OpenJobs(DoneJobs& done) {
+    EXPECT_EQ(done.Open(), 0);
+    return done;
+  }
+
+  DoneJobs done_;
+  std::promise<void> begun_;
+  std::promise<void> goOn_;
+  Sizes sizes_;
+  WorkerPool pool_;
+};
+
+TEST(WorkerPoolTest, RemovesWhatWaitsAndNothingElse) {
+  HeldPool pool(1);
+  for (const uint64_t client : {1U, 2U, 3U}) pool.Add(client);
+  EXPECT_FALSE(pool.Remove(0)) << "it is in hand";
+  EXPECT_TRUE(pool.Remove(2));
+  EXPECT_FALSE(pool.Remove(2));
+  EXPECT_EQ(pool.GoOn(3), (std::vector<uint64_t>{0, 1, 3}));
+}
+
+TEST(WorkerPoolTest, GivesWhatWaitsTogether) {
+  HeldPool pool(4);
+  for (const uint64_t client : {1U, 2U, 3U, 4U, 5U, 6U}) pool.Add(client);
+  EXPECT_EQ(pool.GoOn(7), (std::vector<uint64_t>{0, 1, 2, 3, 4, 5, 6}));
+  EXPECT_EQ(pool.WorkSizes(), (Sizes{1, 4, 2}));
+}
+
+}  // namespace
+}  // namespace vela_test
