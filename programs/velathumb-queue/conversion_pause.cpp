@@ -8,9 +8,12 @@
 #include "ipc/velamk_ipc.h"
 #include "platform/velaindex.h"
 #include "progress/velamk_progress.h"
+#include "run_log.h"
 
 namespace {
 
+/// How long the answer that conversion may run is good for: entries can follow each other fast.
+constexpr std::chrono::seconds kAnswerLife(1);
 /// The resume time may be brought forward, and a switch be turned, at any moment.
 constexpr std::chrono::seconds kLongestWait(5);
 
@@ -51,4 +54,29 @@ std::optional<ConversionPause> FindConversionPause() {
     return ConversionPause{"the index service has switched photo conversion off", kLongestWait};
   }
   return std::nullopt;
+}
+
+bool PauseGate::MayStart() {
+  const auto asked = Clock::now();
+  if (pausedUntil_ && asked < *pausedUntil_) {
+    return false;
+  }
+  if (asked < mayStartUntil_) {
+    return true;
+  }
+  const auto pause = FindConversionPause();
+  const auto now = Clock::now();
+  if (!pause) {
+    // An answer that took its time is good for longer, or nothing else would be done.
+    mayStartUntil_ = now + kAnswerLife + 10 * (now - asked);
+    pausedUntil_.reset();
+    reason_.clear();
+    return true;
+  }
+  if (pause->reason != reason_) {
+    WriteLog(LogLevel::kInfo, "waiting: " + pause->reason);
+    reason_ = pause->reason;
+  }
+  pausedUntil_ = now + pause->askAgain;
+  return false;
 }

@@ -3,13 +3,16 @@
 // Works the photo queue off.
 
 #include <fcntl.h>
+#include <sys/stat.h>
 #include <unistd.h>
 
 #include <cerrno>
 #include <exception>
 #include <string>
+#include <utility>
 #include <vector>
 
+#include "entry_check.h"
 #include "options.h"
 #include "platform/velaindex.h"
 #include "platform/vlibc.h"
@@ -21,7 +24,7 @@
 namespace {
 
 constexpr int kDone = 0;
-constexpr int kStopped = 1;
+constexpr int kLeft = 1;
 constexpr int kError = 2;
 
 constexpr char kLockFile[] = "/var/run/velathumb-queue.lock";
@@ -30,12 +33,26 @@ int ToExitStatus(RunEnd end) {
   switch (end) {
     case RunEnd::kEmpty:
       return kDone;
+    case RunEnd::kLeft:
     case RunEnd::kStopped:
-      return kStopped;
+      return kLeft;
     case RunEnd::kFailed:
       break;
   }
   return kError;
+}
+
+/// Makes the entries that are to be added mean the same to everybody. Returns false, told in the
+/// log, when one cannot be added.
+bool CheckAdditions(std::vector<std::string>& entries) {
+  for (std::string& entry : entries) {
+    const std::string fault = CheckAddition(entry);
+    if (!fault.empty()) {
+      WriteLog(LogLevel::kError, "cannot add " + entry + ": " + fault);
+      return false;
+    }
+  }
+  return true;
 }
 
 /// Returns false, told in the log, when an entry cannot be appended.
@@ -52,27 +69,51 @@ bool AppendEntries(const std::vector<std::string>& entries) {
 
 /// A lock that no child shares: that of a runner that is killed is free at once, also when it was
 /// about to start a velathumb.
-bool LockForProcess(int descriptor) {
+bool LockForProcess(int descriptor, bool wait) {
   struct flock whole = {};
   whole.l_type = F_WRLCK;
   whole.l_whence = SEEK_SET;
-  return fcntl(descriptor, F_SETLK, &whole) == 0;
+  return fcntl(descriptor, wait ? F_SETLKW : F_SETLK, &whole) == 0;
 }
 
-int RunAlone(const RunSettings& settings) {
-  if (!AppendEntries(settings.additions)) {
+bool IsAtLockPath(int descriptor) {
+  struct stat open = {};
+  struct stat named = {};
+  return fstat(descriptor, &open) == 0 && stat(kLockFile, &named) == 0 &&
+         open.st_dev == named.st_dev && open.st_ino == named.st_ino;
+}
+
+/// Takes the lock that one runner at a time has; the file may be removed while somebody waits.
+/// Returns no open descriptor, with errno set, when it cannot be had.
+Descriptor TakeRunnerLock(bool wait) {
+  for (;;) {
+    Descriptor lock(open(kLockFile, O_RDWR | O_CREAT | O_CLOEXEC | O_NOCTTY, 0644));
+    if (!lock.IsOpen() || !LockForProcess(lock.Get(), wait)) {
+      const int error = errno;
+      lock.Close();
+      errno = error;
+      return lock;
+    }
+    if (IsAtLockPath(lock.Get())) {
+      return lock;
+    }
+  }
+}
+
+int RunAlone(RunSettings settings) {
+  if (!CheckAdditions(settings.additions) || !AppendEntries(settings.additions)) {
     return kError;
   }
-  const Descriptor lock(open(kLockFile, O_RDWR | O_CREAT | O_CLOEXEC | O_NOCTTY, 0644));
-  if (!lock.IsOpen()) {
-    WriteLog(LogLevel::kError, std::string("cannot open ") + kLockFile + ": " + ErrnoText(errno));
-    return kError;
+  const Descriptor lock = TakeRunnerLock(settings.wait);
+  if (lock.IsOpen()) {
+    return ToExitStatus(RunQueue(settings));
   }
-  if (!LockForProcess(lock.Get())) {
-    WriteLog(LogLevel::kError, "another velathumb-queue is running");
-    return kStopped;
+  if (errno == EAGAIN || errno == EACCES) {
+    WriteLog(LogLevel::kInfo, "another velathumb-queue is running and has the work");
+    return kLeft;
   }
-  return ToExitStatus(RunQueue(settings));
+  WriteLog(LogLevel::kError, std::string("cannot lock ") + kLockFile + ": " + ErrnoText(errno));
+  return kError;
 }
 
 }  // namespace
@@ -88,7 +129,7 @@ int main(int argc, char** argv) {
       break;
   }
   try {
-    return RunAlone(settings);
+    return RunAlone(std::move(settings));
   } catch (const std::exception& error) {
     WriteLog(LogLevel::kError, error.what());
     return kError;

@@ -17,8 +17,8 @@ constexpr char kDescription[] =
     "Works the queue of directories off that wait for thumbnails: runs velathumb for each.";
 
 constexpr char kFooter[] =
-    "Exit status: 0 nothing waits any more, 1 ended by a signal or another velathumb-queue is\n"
-    "running, 2 error. What was not done waits for the next run.";
+    "Exit status: 0 nothing waits any more, 1 something was left for a later run: ended by a\n"
+    "signal, could not be worked on, or another velathumb-queue is running; 2 error.";
 
 void AddOptions(CLI::App& app, RunSettings& settings) {
   app.add_flag("-f,--follow", settings.follow, "stay and wait for new entries");
@@ -37,6 +37,8 @@ void AddOptions(CLI::App& app, RunSettings& settings) {
   app.add_option("--velathumb", settings.program.path, "the velathumb to run")
       ->type_name("FILE")
       ->capture_default_str();
+  app.add_flag("--wait", settings.wait,
+               "when another velathumb-queue is running, wait for its end");
   app.add_flag("--check-videos", settings.checkVideos,
                "count the videos that wait in their queue for the progress totals; this REMOVES "
                "bad thumbnails and films of these videos");

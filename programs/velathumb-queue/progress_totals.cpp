@@ -4,7 +4,6 @@
 #include <cstdint>
 #include <limits>
 
-#include "counted_directories.h"
 #include "entry_plan.h"
 #include "platform/velaindex.h"
 #include "platform/vlibc.h"
@@ -12,35 +11,21 @@
 #include "progress/velamk_progress.h"
 #include "run_log.h"
 #include "storage/creation_queue.h"
+#include "storage/directory_status.h"
+#include "storage/directory_tree.h"
+#include "storage/fail_marker.h"
 #include "storage/velamk_thumb_status.h"
 
-namespace {
-
-struct Outstanding {
-  int64_t photos = 0;
-  int64_t thumbs = 0;
+struct ProgressTotals::Sums {
+  int64_t photos = 0;  ///< that lack thumbnails
+  int64_t thumbs = 0;  ///< that they lack
+  /// Of these, what an earlier queue of this run has already counted as done because it failed.
+  int64_t failedPhotos = 0;
+  int64_t failedThumbs = 0;
+  std::set<Place> directories;
 };
 
-Outstanding CountEntries(const std::vector<std::string>& entries) {
-  Outstanding sum;
-  CountedDirectories counted(entries);
-  for (const std::string& entry : entries) {
-    const EntryTarget target = TargetOf(entry);
-    if (!counted.Add(entry, target)) {
-      continue;
-    }
-    int photos = 0;
-    int thumbs = 0;
-    if (target.isTree) {
-      GetDirThumbStatusRecursive(target.directory.c_str(), &photos, &thumbs);
-    } else {
-      GetDirThumbStatus(target.directory.c_str(), &photos, &thumbs);
-    }
-    sum.photos += photos;
-    sum.thumbs += thumbs;
-  }
-  return sum;
-}
+namespace {
 
 void SetCounter(int kind, const char* key, int64_t value) {
   constexpr int64_t kHighest = std::numeric_limits<int>::max();
@@ -51,25 +36,89 @@ void SetCounter(int kind, const char* key, int64_t value) {
   }
 }
 
-void SetTotal(int kind, const char* totalKey, const char* completedKey, int64_t outstanding) {
-  SetCounter(kind, totalKey, int64_t{GetConvProgress(kind, completedKey)} + outstanding);
+/// Sets the total to what is done, `recounted` of it taken back, and what is outstanding.
+void SetTotal(int kind, const char* totalKey, const char* completedKey, int64_t outstanding,
+              int64_t recounted = 0) {
+  const int64_t completed = std::max<int64_t>(0, GetConvProgress(kind, completedKey) - recounted);
+  if (recounted > 0) {
+    SetCounter(kind, completedKey, completed);
+  }
+  SetCounter(kind, totalKey, completed + outstanding);
 }
 
 int64_t CountWaitingVideos() {
   return int64_t{CountVideoQueueWork(kVideoQueue.tempFile)} + CountVideoQueueWork(kVideoQueue.file);
 }
 
+int CountFailures(const std::string& path, const PhotoThumbStates& thumbs) {
+  int failures = 0;
+  for (const EAThumbInfo& row : rgEAThumbInfo) {
+    const bool isLacking = thumbs.IsLacking(static_cast<size_t>(row.size));
+    failures += isLacking && FindFailMarker(path.c_str(), row) ? 1 : 0;
+  }
+  return failures;
+}
+
 }  // namespace
 
-void SetProgressTotals(const std::vector<std::string>& entries, const TotalsQuestion& question) {
-  if (question.beginAnew) {
-    SetCounter(THUMB_TYPE_PHOTO, "completed", 0);
-    SetCounter(THUMB_TYPE_PHOTO, "completed_thumb", 0);
+void ProgressTotals::CountDirectory(const char* path, Sums& sums) const {
+  struct stat status = {};
+  if (stat(path, &status) != 0) {
+    return;
   }
-  const Outstanding outstanding = CountEntries(entries);
-  SetTotal(THUMB_TYPE_PHOTO, "total", "completed", outstanding.photos);
-  SetTotal(THUMB_TYPE_PHOTO, "total_thumb", "completed_thumb", outstanding.thumbs);
-  if (question.countVideos) {
+  const Place place = {status.st_dev, status.st_ino};
+  if (!sums.directories.insert(place).second) {
+    return;
+  }
+  const bool wasCounted = counted_.count(place) != 0;
+  ForEachPhotoStatus(path, [&](const std::string& photo, const PhotoThumbStates& thumbs) {
+    const int missing = thumbs.Missing();
+    if (missing == 0) {
+      return;
+    }
+    ++sums.photos;
+    sums.thumbs += missing;
+    const int failures = wasCounted ? CountFailures(photo, thumbs) : 0;
+    sums.failedPhotos += failures > 0 ? 1 : 0;
+    sums.failedThumbs += failures;
+  });
+}
+
+void ProgressTotals::CountEntry(const std::string& entry, const StopQuestion& shouldStop,
+                                Sums& sums) const {
+  const EntryTarget target = TargetOf(entry);
+  if (!target.isTree) {
+    CountDirectory(target.directory.c_str(), sums);
+    return;
+  }
+  ForEachIndexedDirectory(target.directory.c_str(), [&](const char* path, bool isReadable) {
+    if (isReadable && !shouldStop()) {
+      CountDirectory(path, sums);
+    }
+  });
+}
+
+void ProgressTotals::BeginAnew() {
+  counted_.clear();
+  SetCounter(THUMB_TYPE_PHOTO, "completed", 0);
+  SetCounter(THUMB_TYPE_PHOTO, "completed_thumb", 0);
+}
+
+void ProgressTotals::Set(const std::vector<std::string>& entries, const StopQuestion& shouldStop) {
+  Sums sums;
+  for (const std::string& entry : entries) {
+    if (shouldStop()) {
+      return;
+    }
+    CountEntry(entry, shouldStop, sums);
+  }
+  if (shouldStop()) {
+    return;
+  }
+  counted_.insert(sums.directories.begin(), sums.directories.end());
+  SetTotal(THUMB_TYPE_PHOTO, "total", "completed", sums.photos, sums.failedPhotos);
+  SetTotal(THUMB_TYPE_PHOTO, "total_thumb", "completed_thumb", sums.thumbs, sums.failedThumbs);
+  if (countVideos_) {
     SetTotal(THUMB_TYPE_VIDEO, "total", "completed", CountWaitingVideos());
   }
 }

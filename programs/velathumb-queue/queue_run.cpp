@@ -6,6 +6,7 @@
 #include <cerrno>
 #include <chrono>
 #include <csignal>
+#include <functional>
 #include <map>
 #include <optional>
 #include <string>
@@ -13,8 +14,10 @@
 
 #include "conversion_pause.h"
 #include "directory_probe.h"
+#include "entry_check.h"
 #include "entry_plan.h"
 #include "event_wait.h"
+#include "profile_check.h"
 #include "progress_totals.h"
 #include "run_log.h"
 #include "taken_queue.h"
@@ -26,10 +29,10 @@ using Clock = EntryPlan::Clock;
 
 /// How long an entry waits whose directory somebody else works on.
 constexpr std::chrono::seconds kLockedPause(2);
-/// How long the answer that conversion may run is good for: entries can follow each other fast.
-constexpr std::chrono::seconds kAnswerLife(1);
 /// How long it waits after its velathumb was killed, times the number of tries.
 constexpr milliseconds kRetryPause(200);
+/// How long it is before a file of the queue that somebody holds is looked at again.
+constexpr milliseconds kBusyPause(200);
 /// After so many tries velathumb itself is at fault with this entry.
 constexpr int kMostTries = 25;
 /// velathumb enters a directory again when more is to be made in it: twice, for a photo that
@@ -39,19 +42,23 @@ constexpr int kMostRounds = 16;
 /// Works one taken queue off.
 class Batch {
  public:
-  Batch(const RunSettings& settings, TakenQueue& taken, EventWait& events)
-      : settings_(settings), taken_(taken), events_(events), plan_(taken.Entries()) {}
+  Batch(const RunSettings& settings, TakenQueue& taken, EventWait& events, PauseGate& gate)
+      : settings_(settings), taken_(taken), events_(events), gate_(gate), plan_(taken.Entries()) {}
 
-  /// Returns kEmpty when all entries are done.
+  /// Returns kEmpty when all entries are done or left for later.
   RunEnd Run();
 
+  /// Returns how many entries were left for later.
+  int LeftCount() const { return left_; }
+
  private:
-  bool MayStart();
   void StartEntries();
   bool StartEntry(size_t number);
   void ReapChildren();
   void TakeEnd(size_t number, int status);
+  void TakeSuccess(size_t number);
   void Retry(size_t number);
+  void Leave(size_t number, const std::string& reason);
   void Finish(size_t number);
   void StopChildren();
   std::optional<milliseconds> TimeToWait() const;
@@ -59,40 +66,21 @@ class Batch {
   const RunSettings& settings_;
   TakenQueue& taken_;
   EventWait& events_;
+  PauseGate& gate_;
   EntryPlan plan_;
   std::map<pid_t, size_t> children_;
   std::map<size_t, int> tries_;
-  Clock::time_point mayStartUntil_;
-  std::optional<Clock::time_point> pausedUntil_;
-  std::string pauseReason_;
+  int left_ = 0;
   bool hasFailed_ = false;
 };
 
-bool Batch::MayStart() {
-  const auto now = Clock::now();
-  if (pausedUntil_ && now < *pausedUntil_) {
-    return false;
-  }
-  if (now < mayStartUntil_) {
-    return true;
-  }
-  const auto pause = FindConversionPause();
-  if (!pause) {
-    pausedUntil_.reset();
-    pauseReason_.clear();
-    mayStartUntil_ = now + kAnswerLife;
-    return true;
-  }
-  if (pause->reason != pauseReason_) {
-    WriteLog(LogLevel::kInfo, "waiting: " + pause->reason);
-    pauseReason_ = pause->reason;
-  }
-  pausedUntil_ = Clock::now() + pause->askAgain;
-  return false;
-}
-
 bool Batch::StartEntry(size_t number) {
   const std::string& entry = plan_.Entry(number);
+  const std::string hindrance = FindHindrance(entry);
+  if (!hindrance.empty()) {
+    Leave(number, hindrance);
+    return !hasFailed_;
+  }
   if (IsLockedElsewhere(TargetOf(entry))) {
     plan_.PutOff(number, Clock::now() + kLockedPause);
     return true;
@@ -110,12 +98,28 @@ bool Batch::StartEntry(size_t number) {
 }
 
 void Batch::StartEntries() {
-  while (static_cast<int>(children_.size()) < settings_.jobs && MayStart()) {
+  while (static_cast<int>(children_.size()) < settings_.jobs && gate_.MayStart()) {
     const auto number = plan_.Start(Clock::now());
     if (!number || !StartEntry(*number)) {
       return;
     }
   }
+}
+
+void Batch::Leave(size_t number, const std::string& reason) {
+  const std::string& entry = plan_.Entry(number);
+  WriteLog(LogLevel::kWarning, "left for a later run, " + reason + ": " + entry);
+  const int error = taken_.Leave(entry);
+  if (error != 0) {
+    // Not done and not kept: the queue in hand must stay.
+    WriteLog(LogLevel::kError, "cannot keep it: " + ErrnoText(error));
+    plan_.PutOff(number, Clock::now());
+    hasFailed_ = true;
+    return;
+  }
+  ++left_;
+  tries_.erase(number);
+  plan_.Finish(number);
 }
 
 void Batch::Finish(size_t number) {
@@ -134,13 +138,25 @@ void Batch::Retry(size_t number) {
     plan_.PutOff(number, Clock::now() + tries * kRetryPause);
     return;
   }
-  WriteLog(LogLevel::kError, "giving up, velathumb was ended each time: " + plan_.Entry(number));
-  Finish(number);
+  Leave(number, "velathumb was ended each time");
+}
+
+/// velathumb ends with 0 also when it passed over a directory or stopped in it.
+void Batch::TakeSuccess(size_t number) {
+  const std::string& entry = plan_.Entry(number);
+  const std::string hindrance = FindHindrance(entry);
+  if (!hindrance.empty()) {
+    Leave(number, hindrance);
+  } else if (IsLockedElsewhere(TargetOf(entry))) {
+    plan_.PutOff(number, Clock::now() + kLockedPause);
+  } else {
+    Finish(number);
+  }
 }
 
 void Batch::TakeEnd(size_t number, int status) {
   if (WIFEXITED(status) && WEXITSTATUS(status) == 0) {
-    Finish(number);
+    TakeSuccess(number);
     return;
   }
   if (!events_.IsStopping()) {
@@ -173,7 +189,7 @@ void Batch::StopChildren() {
 }
 
 std::optional<milliseconds> Batch::TimeToWait() const {
-  std::optional<Clock::time_point> wake = pausedUntil_;
+  std::optional<Clock::time_point> wake = gate_.AskAgain();
   const bool hasRoom = static_cast<int>(children_.size()) < settings_.jobs;
   if (!wake && hasRoom) {
     wake = plan_.NextStart();
@@ -205,21 +221,34 @@ RunEnd Batch::Run() {
 /// Takes one queue after the other.
 class QueueRun {
  public:
-  explicit QueueRun(const RunSettings& settings) : settings_(settings), taken_(PhotoQueuePaths()) {}
+  explicit QueueRun(const RunSettings& settings)
+      : settings_(settings), taken_(PhotoQueuePaths()), totals_(settings.checkVideos) {}
 
   RunEnd Run();
 
  private:
+  RunEnd RunRounds();
+  RunEnd RunRound(bool& isIdle);
   RunEnd WorkOff(TakenQueue::Outcome outcome);
+  bool WaitForPermission();
+  void SetTotals(TakenQueue::Outcome outcome);
   bool HasSeenAll();
+  RunEnd LeaveAll();
+  int AskUntilFree(const std::function<int()>& act);
+  RunEnd FinishTaken();
+  bool PutBackLeft();
   void WaitForEntries();
 
   const RunSettings& settings_;
   TakenQueue taken_;
+  ProgressTotals totals_;
   EventWait events_;
+  PauseGate gate_;
   bool isIdle_ = true;                    // nothing was in hand before
+  bool hasLeft_ = false;                  // entries for a later run
   std::unordered_set<std::string> seen_;  // since nothing waited last
   int rounds_ = 0;                        // without a new one among them
+  Clock::time_point putBack_;
 };
 
 /// Returns whether all entries that were taken have been there before.
@@ -229,33 +258,138 @@ bool QueueRun::HasSeenAll() {
   return seen_.size() == before;
 }
 
-RunEnd QueueRun::WorkOff(TakenQueue::Outcome outcome) {
-  const size_t count = taken_.Entries().size();
-  WriteLog(LogLevel::kInfo,
-           (outcome == TakenQueue::Outcome::kResumed ? "going on with " : "took ") +
-               std::to_string(count) + (count == 1 ? " entry" : " entries"));
-  const bool beginAnew = isIdle_ && outcome == TakenQueue::Outcome::kTaken;
-  SetProgressTotals(taken_.Entries(), {beginAnew, settings_.checkVideos});
-  isIdle_ = false;
-  const RunEnd end = Batch(settings_, taken_, events_).Run();
-  if (end != RunEnd::kEmpty) {
-    return end;
+/// Returns false when the wait was ended by a signal.
+bool QueueRun::WaitForPermission() {
+  while (!events_.IsStopping() && !gate_.MayStart()) {
+    const auto left = std::chrono::ceil<milliseconds>(*gate_.AskAgain() - Clock::now());
+    events_.Wait(std::max(left, milliseconds(0)));
   }
-  const int error = taken_.Finish();
+  return !events_.IsStopping();
+}
+
+void QueueRun::SetTotals(TakenQueue::Outcome outcome) {
+  if (isIdle_ && outcome == TakenQueue::Outcome::kTaken) {
+    totals_.BeginAnew();
+  }
+  isIdle_ = false;
+  totals_.Set(taken_.Entries(), [this] {
+    events_.Wait(milliseconds(0));
+    return events_.IsStopping();
+  });
+}
+
+/// Repeats what finds a file held by somebody. Returns its last result: EWOULDBLOCK when the wait
+/// was ended by a signal.
+int QueueRun::AskUntilFree(const std::function<int()>& act) {
+  int error = act();
+  while (error == EWOULDBLOCK && !events_.IsStopping()) {
+    events_.Wait(kBusyPause);
+    error = act();
+  }
+  return error;
+}
+
+RunEnd QueueRun::FinishTaken() {
+  const int error = AskUntilFree([this] { return taken_.Finish(); });
   if (error == 0) {
     return RunEnd::kEmpty;
+  }
+  if (error == EWOULDBLOCK) {
+    return RunEnd::kStopped;
   }
   WriteLog(LogLevel::kError, "cannot remove the queue that is done: " + ErrnoText(error));
   return RunEnd::kFailed;
 }
 
+RunEnd QueueRun::WorkOff(TakenQueue::Outcome outcome) {
+  const size_t count = taken_.Entries().size();
+  WriteLog(LogLevel::kInfo,
+           (outcome == TakenQueue::Outcome::kResumed ? "going on with " : "took ") +
+               std::to_string(count) + (count == 1 ? " entry" : " entries"));
+  if (!WaitForPermission()) {
+    return RunEnd::kStopped;
+  }
+  SetTotals(outcome);
+  Batch batch(settings_, taken_, events_, gate_);
+  const RunEnd end = batch.Run();
+  hasLeft_ = hasLeft_ || batch.LeftCount() > 0;
+  return end == RunEnd::kEmpty ? FinishTaken() : end;
+}
+
+RunEnd QueueRun::LeaveAll() {
+  WriteLog(LogLevel::kWarning, "entries come back again and again, left for a later run");
+  hasLeft_ = true;
+  for (const std::string& entry : taken_.Entries()) {
+    const int error = taken_.Leave(entry);
+    if (error != 0) {
+      WriteLog(LogLevel::kError, "cannot keep an entry: " + ErrnoText(error));
+      return RunEnd::kFailed;
+    }
+  }
+  return FinishTaken();
+}
+
+/// Returns false when that failed, which is told in the log.
+bool QueueRun::PutBackLeft() {
+  putBack_ = Clock::now();
+  const int error = AskUntilFree([this] { return taken_.PutBackLeft(); });
+  if (error != 0 && error != EWOULDBLOCK) {
+    WriteLog(LogLevel::kError, "cannot put back what was left: " + ErrnoText(error));
+  }
+  return error == 0 || error == EWOULDBLOCK;
+}
+
 void QueueRun::WaitForEntries() {
   // The watch tells of every new queue; the limit is for a file system that tells nothing.
   constexpr milliseconds kLongestWait = std::chrono::minutes(1);
+  constexpr std::chrono::hours kLater(1);
   isIdle_ = true;
   rounds_ = 0;
   seen_.clear();
   events_.Wait(kLongestWait);
+  if (Clock::now() - putBack_ >= kLater) {
+    PutBackLeft();
+  }
+}
+
+/// Takes what waits and works it off. Sets `isIdle` when nothing waits.
+RunEnd QueueRun::RunRound(bool& isIdle) {
+  if (!IsProfileUsable(settings_.program.profileFile)) {
+    return RunEnd::kFailed;
+  }
+  const TakenQueue::Outcome outcome = taken_.Take();
+  switch (outcome) {
+    case TakenQueue::Outcome::kFailed:
+      return RunEnd::kFailed;
+    case TakenQueue::Outcome::kBusy:
+      events_.Wait(kBusyPause);
+      return RunEnd::kEmpty;
+    case TakenQueue::Outcome::kNothing:
+      isIdle = true;
+      return RunEnd::kEmpty;
+    case TakenQueue::Outcome::kResumed:
+    case TakenQueue::Outcome::kTaken:
+      break;
+  }
+  rounds_ = HasSeenAll() ? rounds_ + 1 : 0;
+  return rounds_ > kMostRounds ? LeaveAll() : WorkOff(outcome);
+}
+
+RunEnd QueueRun::RunRounds() {
+  while (!events_.IsStopping()) {
+    bool isIdle = false;
+    const RunEnd end = RunRound(isIdle);
+    if (end != RunEnd::kEmpty) {
+      return end;
+    }
+    if (isIdle && !settings_.follow) {
+      return hasLeft_ ? RunEnd::kLeft : RunEnd::kEmpty;
+    }
+    if (isIdle) {
+      WaitForEntries();
+    }
+  }
+  return RunEnd::kStopped;
 }
 
 RunEnd QueueRun::Run() {
@@ -264,32 +398,7 @@ RunEnd QueueRun::Run() {
     WriteLog(LogLevel::kError, "cannot watch the queue: " + ErrnoText(error));
     return RunEnd::kFailed;
   }
-  while (!events_.IsStopping()) {
-    const TakenQueue::Outcome outcome = taken_.Take();
-    if (outcome == TakenQueue::Outcome::kFailed) {
-      return RunEnd::kFailed;
-    }
-    if (outcome == TakenQueue::Outcome::kNothing) {
-      if (!settings_.follow) {
-        return RunEnd::kEmpty;
-      }
-      WaitForEntries();
-      continue;
-    }
-    rounds_ = HasSeenAll() ? rounds_ + 1 : 0;
-    const RunEnd end = WorkOff(outcome);
-    if (end != RunEnd::kEmpty) {
-      return end;
-    }
-    if (rounds_ >= kMostRounds) {
-      WriteLog(LogLevel::kWarning, "entries come back again and again; left for the next run");
-      if (!settings_.follow) {
-        return RunEnd::kEmpty;
-      }
-      WaitForEntries();
-    }
-  }
-  return RunEnd::kStopped;
+  return PutBackLeft() ? RunRounds() : RunEnd::kFailed;
 }
 
 }  // namespace

@@ -11,6 +11,7 @@ struct RunSettings {
   ChildProgram program;
   int jobs = 1;                        ///< velathumb processes at a time
   bool follow = false;                 ///< stay and wait for new entries
+  bool wait = false;                   ///< for the end of another runner
   bool checkVideos = false;            ///< count waiting videos for the totals
   std::vector<std::string> additions;  ///< entries to append to the queue first
 };
@@ -18,6 +19,7 @@ struct RunSettings {
 /// How a run ended.
 enum class RunEnd {
   kEmpty,    ///< nothing waits any more
+  kLeft,     ///< nothing waits but what could not be worked on
   kStopped,  ///< by a signal; entries may be left for the next run
   kFailed,   ///< told in the log; entries may be left for the next run
 };

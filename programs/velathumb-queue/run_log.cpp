@@ -1,5 +1,6 @@
 #include "run_log.h"
 
+#include <sys/stat.h>
 #include <unistd.h>
 
 #include <cstdio>
@@ -20,6 +21,14 @@ const char* JournalPrefix(LogLevel level) {
   return "";
 }
 
+/// Tells whether standard error leads to the journal, and not only that of a program above.
+bool IsJournal() {
+  const char* stream = std::getenv("JOURNAL_STREAM");
+  struct stat status = {};
+  return stream != nullptr && fstat(STDERR_FILENO, &status) == 0 &&
+         std::to_string(status.st_dev) + ':' + std::to_string(status.st_ino) == stream;
+}
+
 std::string EscapeControls(const std::string& text) {
   std::string line;
   for (const char c : text) {
@@ -38,7 +47,7 @@ std::string EscapeControls(const std::string& text) {
 }  // namespace
 
 void WriteLog(LogLevel level, const std::string& message) {
-  static const bool isJournal = std::getenv("JOURNAL_STREAM") != nullptr;
+  static const bool isJournal = IsJournal();
   const std::string line = (isJournal ? JournalPrefix(level) : std::string("velathumb-queue: ")) +
                            EscapeControls(message) + '\n';
   // In one piece, so that lines of several processes do not mix; nobody to tell when it fails.

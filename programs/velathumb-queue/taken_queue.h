@@ -1,6 +1,8 @@
 // The photo queue's entries that are being worked off, safe against a crash at any moment.
 #pragma once
 
+#include <sys/types.h>
+
 #include <ctime>
 #include <string>
 #include <unordered_set>
@@ -11,6 +13,7 @@ struct QueuePaths {
   std::string queue;    ///< new entries are appended to it
   std::string taken;    ///< what it was called when it was taken
   std::string journal;  ///< entries of `taken` that are done, one a line
+  std::string later;    ///< entries that could not be worked on, for a later run
 };
 
 /// The paths of the photo queue.
@@ -26,6 +29,7 @@ class TakenQueue {
     kNothing,  ///< no entries wait
     kResumed,  ///< entries that an earlier run has left
     kTaken,    ///< new entries
+    kBusy,     ///< somebody holds the queue; to be asked again
     kFailed,   ///< told in the log
   };
 
@@ -38,7 +42,16 @@ class TakenQueue {
   /// Notes that the entry is done: a later run does not repeat it. Returns 0 or an errno value.
   int MarkDone(const std::string& entry);
 
-  /// Forgets the taken entries, all of which are done. Returns 0 or an errno value.
+  /// Keeps an entry for a later run, which is then done for this one. Returns 0 or an errno value.
+  int Leave(const std::string& entry);
+
+  /// Puts the entries that were left for later back into the queue. Returns 0 or an errno value,
+  /// EWOULDBLOCK while somebody holds the queue.
+  int PutBackLeft();
+
+  /// Forgets the taken entries, all of which are done; were any appended since they were read, the
+  /// next take goes on with those. Returns 0 or an errno value, EWOULDBLOCK while somebody holds
+  /// the file.
   int Finish();
 
  private:
@@ -49,4 +62,5 @@ class TakenQueue {
 
   const QueuePaths paths_;
   std::vector<std::string> entries_;
+  off_t readSize_ = 0;
 };

@@ -119,7 +119,8 @@ ProgramResult Machine::RunRunner(const std::vector<std::string>& more) {
 
 bool Machine::HasQueue() {
   return Exists("/var/spool/thumb_create.queue") || Exists("/var/spool/thumb_create.queue.tmp") ||
-         Exists("/var/spool/thumb_create.queue.done");
+         Exists("/var/spool/thumb_create.queue.done") ||
+         Exists("/var/spool/thumb_create.queue.later");
 }
 
 }  // namespace vela_test

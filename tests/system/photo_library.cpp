@@ -57,6 +57,15 @@ PhotoLibrary::PhotoLibrary(int count) {
   videos_ = {MakeFilm(top + "/2019/film.mp4"), MakeFilm(top + "/tree/a/film.mkv")};
 }
 
+bool PhotoLibrary::IsLone(const std::string& photo) const {
+  return ParentOf(photo) == loneEntry_;
+}
+
+void PhotoLibrary::AddLoneDirectory(int count) {
+  loneEntry_ = std::string(kTop) + "/lone";
+  MakePhotos({loneEntry_}, count);
+}
+
 void PhotoLibrary::AddDirectory(int count) {
   const std::string directory = std::string(kTop) + "/late";
   MakePhotos({directory}, count);
@@ -79,7 +88,7 @@ void PhotoLibrary::MakePhotos(const std::vector<std::string>& directories, int c
 void PhotoLibrary::Touch(int step) {
   int number = 0;
   for (const std::string& photo : photos_) {
-    if (++number % step == 0 && photo != damaged_) {
+    if (++number % step == 0 && photo != damaged_ && !IsLone(photo)) {
       SetFileTimeFromNow(photo, 0);
     }
   }

@@ -26,20 +26,29 @@ class PhotoLibrary {
   /// Makes one more directory with `count` photos, one of them raw.
   void AddDirectory(int count);
 
-  /// What to put into the queue so that everything is worked on.
+  /// Makes a directory with `count` photos, one of them raw, that is not among the entries.
+  void AddLoneDirectory(int count);
+
+  /// What to put into the queue so that everything but the lone directory is worked on.
   std::vector<std::string> Entries() const { return entries_; }
+
+  /// The directory that is not among these.
+  const std::string& LoneEntry() const { return loneEntry_; }
+  bool IsLone(const std::string& photo) const;
 
   const std::set<std::string>& Photos() const { return photos_; }
   const std::string& Damaged() const { return damaged_; }
   const std::vector<std::string>& Videos() const { return videos_; }
 
-  /// Dates every `step`-th photo now, later than its thumbnails; the damaged one is left out.
+  /// Dates every `step`-th photo now, later than its thumbnails; the damaged one and those of
+  /// the lone directory are left out.
   void Touch(int step);
 
  private:
   void MakePhotos(const std::vector<std::string>& directories, int count);
 
   std::vector<std::string> entries_;
+  std::string loneEntry_;
   std::set<std::string> photos_;
   std::string damaged_;
   std::vector<std::string> videos_;

@@ -62,6 +62,7 @@ TEST_F(FollowTest, TakesNoQueueFromUnderTheHandsOfWhoeverMakesIt) {
 TEST_F(FollowTest, ReactsToAQueueThatIsPutInPlaceByRenaming) {
   Program runner = velathumb_.Start({"-f"});
   EXPECT_FALSE(runner.Wait(milliseconds(200)));
+  MakeEntryDirectories({"/tmp/a"});
   WriteFile("/var/spool/prepared", "/tmp/a\n");
   ASSERT_EQ(rename("/var/spool/prepared", kQueueFile), 0);
   EXPECT_TRUE(velathumb_.WaitForStarts(1));
@@ -69,6 +70,7 @@ TEST_F(FollowTest, ReactsToAQueueThatIsPutInPlaceByRenaming) {
 }
 
 TEST_F(FollowTest, BeginsWithWhatWaits) {
+  MakeEntryDirectories({"/tmp/old"});
   WriteFile(kTakenFile, "/tmp/old\n");
   Enqueue({"/tmp/new"});
   Program runner = velathumb_.Start({"--follow"});
@@ -98,6 +100,11 @@ TEST_F(FollowTest, EveryEntryOfManyAppendersReachesVelathumb) {
   constexpr int kAppenders = 4;
   constexpr int kEntries = 60;
   std::vector<pid_t> appenders;
+  for (int i = 0; i < kAppenders; ++i) {
+    for (int j = 0; j < kEntries; ++j) {
+      MakeDirectories("/tmp/" + std::to_string(i) + '/' + std::to_string(j));
+    }
+  }
   for (int i = 0; i < kAppenders; ++i) {
     appenders.push_back(StartAppender(i, kEntries));
   }

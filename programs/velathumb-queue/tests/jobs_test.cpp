@@ -90,9 +90,9 @@ TEST_F(JobsTest, NeverTwoThatStandForACommonDirectory) {
   velathumb_.Stub().Plan(StubPlan().Sleep(60));
   // Which of the four directories each entry stands for.
   const std::map<std::string, std::string> directories = {
-      {"R:/tmp/a", "1 2 3"}, {"/tmp/a/b", "2"}, {"/tmp/alias", "2"},    {"R:/tmp/alias", "2 3"},
-      {"/tmp/ab", "4"},      {"/tmp/a", "1"},   {"R::/tmp/a", "1 2 3"}, {"/tmp/alias/c", "3"},
-      {"R:/tmp/a/b", "2 3"}, {"/tmp/ab/", "4"}, {"R:/tmp/ab:x", "4"},   {"/tmp/a/b/c", "3"},
+      {"R:/tmp/a", "1 2 3"}, {"/tmp/a/b", "2"},     {"/tmp/alias", "2"},    {"R:/tmp/alias", "2 3"},
+      {"/tmp/ab", "4"},      {"/tmp/a", "1"},       {"R::/tmp/a", "1 2 3"}, {"/tmp/alias/c", "3"},
+      {"R:/tmp/a/b", "2 3"}, {"/tmp/a/../ab", "4"}, {"R:/tmp/ab:x", "4"},   {"/tmp/a/b/c", "3"},
   };
   for (const auto& [entry, numbers] : directories) {
     Enqueue({entry});
@@ -146,11 +146,64 @@ TEST_F(JobsTest, ASecondRunnerIsRefused) {
   Enqueue({"/tmp/b"});
   const ProgramResult second = velathumb_.Run();
   EXPECT_EQ(second.exitCode, 1);
-  EXPECT_EQ(second.err, "velathumb-queue: another velathumb-queue is running\n");
+  EXPECT_EQ(second.err, "velathumb-queue: another velathumb-queue is running and has the work\n");
   EXPECT_EQ(ReadFile(kQueueFile), "/tmp/b\n");
   WriteFile("/tmp/go", "");
   ExpectEnd(runner);
   EXPECT_THAT(velathumb_.Entries(), ElementsAre("/tmp/a", "/tmp/b"));
+}
+
+TEST_F(JobsTest, ADirectoryThatSomebodyHasTakenMeanwhileIsDoneAgainAfterwards) {
+  velathumb_.Stub().PlanCall(1, StubPlan().WaitForFile("/tmp/go"));
+  MakeDirectories("/tmp/a/@eaDir");
+  Enqueue({"/tmp/a"});
+  Program runner = velathumb_.Start();
+  ASSERT_TRUE(velathumb_.WaitForStarts(1));
+  Descriptor metadata(open("/tmp/a/@eaDir", O_RDONLY | O_CLOEXEC));
+  ASSERT_EQ(flock(metadata.Get(), LOCK_EX), 0);
+  WriteFile("/tmp/go", "");
+  EXPECT_FALSE(runner.Wait(milliseconds(500)));
+  EXPECT_FALSE(Exists(kJournalFile));
+  metadata.Close();
+  ExpectEnd(runner);
+  EXPECT_THAT(velathumb_.Entries(), ElementsAre("/tmp/a", "/tmp/a"));
+}
+
+TEST_F(JobsTest, ASecondRunnerThatWaitsGoesOnAfterTheFirst) {
+  velathumb_.Stub().PlanCall(1, StubPlan().WaitForFile("/tmp/never"));
+  Enqueue({"/tmp/a"});
+  Program first = velathumb_.Start();
+  ASSERT_TRUE(velathumb_.WaitForStarts(1));
+  Program second = velathumb_.Start({"--wait"});
+  EXPECT_FALSE(second.Wait(milliseconds(300)));
+  EXPECT_THAT(velathumb_.Entries(), SizeIs(1));
+  first.Kill(SIGTERM);
+  EXPECT_TRUE(first.Wait(seconds(5)));
+  ExpectEnd(second);
+  EXPECT_THAT(velathumb_.Entries(), ElementsAre("/tmp/a", "/tmp/a"));
+}
+
+TEST_F(JobsTest, ARunnerThatWaitedForALockFileThatIsGoneWaitsForTheNewOne) {
+  velathumb_.Stub().PlanCall(1, StubPlan().WaitForFile("/tmp/never"));
+  Enqueue({"/tmp/a"});
+  Program first = velathumb_.Start();
+  ASSERT_TRUE(velathumb_.WaitForStarts(1));
+  Program second = velathumb_.Start({"--wait"});
+  EXPECT_FALSE(second.Wait(milliseconds(300)));
+  RemoveTree("/run/velathumb-queue.lock");
+  const Descriptor made(open("/run/velathumb-queue.lock", O_RDWR | O_CREAT | O_CLOEXEC, 0644));
+  struct flock whole = {};
+  whole.l_type = F_WRLCK;
+  whole.l_whence = SEEK_SET;
+  ASSERT_EQ(fcntl(made.Get(), F_SETLK, &whole), 0);
+  first.Kill(SIGTERM);
+  EXPECT_TRUE(first.Wait(seconds(5)));
+  EXPECT_FALSE(second.Wait(milliseconds(300)));
+  EXPECT_THAT(velathumb_.Entries(), SizeIs(1));
+  whole.l_type = F_UNLCK;
+  ASSERT_EQ(fcntl(made.Get(), F_SETLK, &whole), 0);
+  ExpectEnd(second);
+  EXPECT_THAT(velathumb_.Entries(), SizeIs(2));
 }
 
 }  // namespace

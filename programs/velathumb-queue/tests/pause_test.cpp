@@ -1,11 +1,17 @@
 // Conversion that is held back.
+#include "conversion_pause.h"
+
 #include <gmock/gmock.h>
+#include <signal.h>
 
 #include <chrono>
 #include <ctime>
+#include <mutex>
 #include <string>
 #include <thread>
 
+#include "platform/velaindex.h"
+#include "progress/velamk_progress.h"
 #include "queue_fixture.h"
 #include "support/daemon_peer.h"
 #include "support/files.h"
@@ -137,6 +143,48 @@ TEST_F(PauseTest, ADaemonThatKeepsStillDoesNotKeepTheRunnerFromEnding) {
   ASSERT_TRUE(daemon.WaitForRequests(1));
   runner.Kill(SIGTERM);
   ExpectEnd(runner, 1);
+}
+
+TEST_F(PauseTest, AnAnswerThatCameAtOnceIsGoodForASecond) {
+  DaemonPeer daemon;
+  daemon.Answer(kSwitch, SwitchedOff(false));
+  PauseGate gate;
+  EXPECT_TRUE(gate.MayStart());
+  EXPECT_TRUE(gate.MayStart());
+  EXPECT_EQ(daemon.Requests().size(), 1U);
+  std::this_thread::sleep_for(std::chrono::milliseconds(1500));
+  EXPECT_TRUE(gate.MayStart());
+  EXPECT_EQ(daemon.Requests().size(), 2U);
+}
+
+TEST_F(PauseTest, AnAnswerThatTookLongIsGoodForLonger) {
+  DaemonPeer daemon;
+  daemon.Answer(kSwitch, SwitchedOff(false).After(300));
+  PauseGate gate;
+  EXPECT_TRUE(gate.MayStart());
+  std::this_thread::sleep_for(std::chrono::milliseconds(1500));
+  EXPECT_TRUE(gate.MayStart());
+  EXPECT_EQ(daemon.Requests().size(), 1U);
+}
+
+TEST_F(PauseTest, ARunnerThatIsStoppedBeforeItCountsLeavesTheTotals) {
+  AddConvProgress(THUMB_TYPE_PHOTO, "total", 1000);
+  Enqueue({"/tmp/a"});
+  pid_t runnerProcess = 0;
+  std::mutex isStarted;
+  isStarted.lock();
+  DaemonPeer daemon;
+  daemon.Answer(kSwitch, SwitchedOff(false).Meanwhile([&](const DaemonRequest&) {
+    const std::lock_guard<std::mutex> wait(isStarted);
+    kill(runnerProcess, SIGTERM);
+  }));
+  Program runner = velathumb_.Start();
+  runnerProcess = runner.Pid();
+  isStarted.unlock();
+  ExpectEnd(runner, 1);
+  EXPECT_THAT(velathumb_.Entries(), IsEmpty());
+  EXPECT_EQ(GetConvProgress(THUMB_TYPE_PHOTO, "total"), 1000);
+  EXPECT_EQ(ReadFile(kTakenFile), "/tmp/a\n");
 }
 
 }  // namespace

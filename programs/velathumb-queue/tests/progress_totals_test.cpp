@@ -1,5 +1,8 @@
 // The totals that the counters of progress count towards.
+#include "progress_totals.h"
+
 #include <gmock/gmock.h>
+#include <sys/mount.h>
 #include <unistd.h>
 
 #include <string>
@@ -63,6 +66,7 @@ TEST_F(TotalsTest, ARunThatGoesOnKeepsTheCounters) {
   MakePhoto("/tmp/p/a.jpg");
   MakePhoto("/tmp/q/b.jpg");
   SetUpCounters(50, 70);
+  MakeEntryDirectories({"/tmp/p", "/tmp/q"});
   WriteFile(kTakenFile, "/tmp/p\n/tmp/q\n");
   WriteFile(kJournalFile, "/tmp/p\n");
   EXPECT_EQ(velathumb.Run().exitCode, 0);
@@ -114,6 +118,45 @@ TEST_F(TotalsTest, EachDirectoryCountsOnceByWhateverNames) {
   }
 }
 
+TEST_F(TotalsTest, ADirectoryThatIsMountedTwiceCountsOnce) {
+  const RecordingVelathumb velathumb;
+  MakePhoto("/tmp/p/a.jpg");
+  MakeDirectories("/tmp/again");
+  ASSERT_EQ(mount("/tmp/p", "/tmp/again", nullptr, MS_BIND, nullptr), 0);
+  Enqueue({"/tmp/p", "/tmp/again"});
+  EXPECT_EQ(velathumb.Run().exitCode, 0);
+  ExpectCounters(0, 1, 0, 1);
+  EXPECT_EQ(velathumb.Entries().size(), 2U);
+}
+
+TEST_F(TotalsTest, ADirectoryOfATreeCountsAlsoWhenItWaitsInTheQueueItself) {
+  RecordingVelathumb velathumb;
+  velathumb.Stub().PlanCall(1, StubPlan().WaitForFile("/tmp/go"));
+  MakePhoto("/tmp/p/a.jpg");
+  MakePhoto("/tmp/p/d/b.jpg");
+  WriteFile(kTakenFile, "R:/tmp/p\n");
+  Enqueue({"/tmp/p/d"});
+  Program runner = velathumb.Start();
+  ASSERT_TRUE(velathumb.WaitForStarts(1));
+  ExpectCounters(0, 2, 0, 2);
+  WriteFile("/tmp/go", "");
+  EXPECT_TRUE(runner.Wait());
+}
+
+TEST_F(TotalsTest, AScanThatIsGivenUpSetsNothing) {
+  for (int i = 0; i < 20; ++i) {
+    MakePhoto("/tmp/p/" + std::to_string(i) + "/a.jpg");
+  }
+  SetUpCounters(50, 70);
+  int questions = 0;
+  ProgressTotals totals(false);
+  totals.Set({"R:/tmp/p", "/tmp/p/3"}, [&] { return ++questions >= 10; });
+  ExpectCounters(50, 1000, 70, 1000);
+  EXPECT_GE(questions, 10) << "asked for each entry only, not for each directory of a tree";
+  totals.Set({"R:/tmp/p", "/tmp/p/3"}, [] { return false; });
+  ExpectCounters(50, 70, 70, 90);
+}
+
 /// All six classes, in three phases.
 class AllPhasesTest : public TotalsTest {
  protected:
@@ -151,13 +194,34 @@ TEST_F(AllPhasesTest, APhotoThatFailsCountsAsDone) {
   EXPECT_EQ(ListDirectory("/tmp/q/@eaDir/bad.jpg").size(), 6U);
 }
 
-TEST_F(AllPhasesTest, APhotoThatFailsAgainWhenItsDirectoryComesBackIsPartOfBoth) {
+TEST_F(AllPhasesTest, APhotoThatFailsAgainWhenItsDirectoryComesBackCountsOnce) {
   MakePhoto("/tmp/p/a.jpg");
   MakePhoto("/tmp/p/bad.jpg");
   converter_.PlanWhen("/tmp/p/bad.jpg", StubPlan().Exit(1));
   Enqueue({"/tmp/p"});
   EXPECT_EQ(RunRunner().exitCode, 0);
+  // One that failed in the round before is not one more.
+  ExpectCounters(2, 2, 12, 12);
+}
+
+TEST_F(AllPhasesTest, OneDamagedPhotoOfThreeIsOneOfThreeInTheEnd) {
+  for (const char* photo : {"/tmp/p/a.jpg", "/tmp/p/bad.jpg", "/tmp/p/c.jpg"}) {
+    MakePhoto(photo);
+  }
+  converter_.PlanWhen("/tmp/p/bad.jpg", StubPlan().Exit(1));
+  Enqueue({"/tmp/p"});
+  EXPECT_EQ(RunRunner().exitCode, 0);
   ExpectCounters(3, 3, 18, 18);
+}
+
+TEST_F(AllPhasesTest, APhotoThatFailedInAnEarlierRunIsOneToDo) {
+  MakePhoto("/tmp/p/bad.jpg");
+  converter_.PlanWhen("/tmp/p/bad.jpg", StubPlan().Exit(1));
+  for (int run = 0; run < 2; ++run) {
+    Enqueue({"/tmp/p"});
+    EXPECT_EQ(RunRunner().exitCode, 0);
+    ExpectCounters(1, 1, 6, 6);
+  }
 }
 
 TEST_F(AllPhasesTest, AfterAKilledVelathumbTheNextTakeSetsTheTotalsRight) {

@@ -7,6 +7,7 @@
 #include <functional>
 #include <thread>
 
+#include "entry_plan.h"
 #include "platform/velaindex.h"
 #include "queue_program.h"
 #include "support/files.h"
@@ -18,12 +19,6 @@ namespace vela_test {
 namespace {
 
 constexpr const char* kRecorderPath = "/usr/vela/bin/velathumb-recorder";
-
-std::vector<std::string> RecorderArguments(const std::vector<std::string>& more) {
-  std::vector<std::string> arguments = {"--velathumb", kRecorderPath, "--profile", kProfiles};
-  arguments.insert(arguments.end(), more.begin(), more.end());
-  return arguments;
-}
 
 bool WaitUntil(const std::function<bool()>& isTrue, int milliseconds) {
   const auto end = std::chrono::steady_clock::now() + std::chrono::milliseconds(milliseconds);
@@ -48,10 +43,21 @@ void ResetQueueSandbox() {
   WriteFile("/etc/velainfo.conf", "photo_thumb_size_map=\"1\"\n");
 }
 
-void Enqueue(const std::vector<std::string>& entries) {
+void MakeEntryDirectories(const std::vector<std::string>& entries) {
+  for (const std::string& entry : entries) {
+    MakeDirectories(TargetOf(entry).directory);
+  }
+}
+
+void AppendToQueue(const std::vector<std::string>& entries) {
   for (const std::string& entry : entries) {
     EXPECT_EQ(WriteIndexQueue(entry.c_str(), kQueueFile), 0) << entry;
   }
+}
+
+void Enqueue(const std::vector<std::string>& entries) {
+  MakeEntryDirectories(entries);
+  AppendToQueue(entries);
 }
 
 std::string Lines(const std::vector<std::string>& entries) {
@@ -63,7 +69,7 @@ std::string Lines(const std::vector<std::string>& entries) {
 }
 
 void ExpectNothingWaits() {
-  for (const char* file : {kQueueFile, kTakenFile, kJournalFile}) {
+  for (const char* file : {kQueueFile, kTakenFile, kJournalFile, kLaterFile}) {
     EXPECT_FALSE(Exists(file)) << file;
   }
 }
@@ -112,12 +118,18 @@ bool RecordingVelathumb::WaitForStarts(size_t count) const {
   return WaitUntil([&] { return stub_.Calls().size() >= count; }, 10000);
 }
 
+std::vector<std::string> RecordingVelathumb::Arguments(const std::vector<std::string>& more) const {
+  std::vector<std::string> arguments = {"--velathumb", kRecorderPath, "--profile", kProfiles};
+  arguments.insert(arguments.end(), more.begin(), more.end());
+  return arguments;
+}
+
 ProgramResult RecordingVelathumb::Run(const std::vector<std::string>& more) const {
-  return RunProgram(QueueProgramPath(), RecorderArguments(more));
+  return RunProgram(QueueProgramPath(), Arguments(more));
 }
 
 Program RecordingVelathumb::Start(const std::vector<std::string>& more) const {
-  return StartProgram(QueueProgramPath(), RecorderArguments(more));
+  return StartProgram(QueueProgramPath(), Arguments(more));
 }
 
 }  // namespace vela_test

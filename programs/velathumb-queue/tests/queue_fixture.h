@@ -13,6 +13,7 @@ namespace vela_test {
 constexpr const char* kQueueFile = "/var/spool/thumb_create.queue";
 constexpr const char* kTakenFile = "/var/spool/thumb_create.queue.tmp";
 constexpr const char* kJournalFile = "/var/spool/thumb_create.queue.done";
+constexpr const char* kLaterFile = "/var/spool/thumb_create.queue.later";
 constexpr const char* kProfiles = "/tmp/profiles.conf";
 
 /// Every test starts with one profile (S, phase 0) and with settings that ask for that class only.
@@ -26,7 +27,13 @@ class QueueTest : public SandboxTest {
 /// Resets the sandbox and writes that profile and these settings.
 void ResetQueueSandbox();
 
-/// Appends the entries to the queue as velathumb does.
+/// Makes the directories that the entries stand for.
+void MakeEntryDirectories(const std::vector<std::string>& entries);
+
+/// Appends the entries to the queue as velathumb does, whatever they stand for.
+void AppendToQueue(const std::vector<std::string>& entries);
+
+/// Makes the directories and appends the entries.
 void Enqueue(const std::vector<std::string>& entries);
 
 /// The entries as lines of a file.
@@ -60,6 +67,9 @@ class RecordingVelathumb {
 
   /// Waits until it has been started `count` times, at most 10 s; whether it was.
   bool WaitForStarts(size_t count) const;
+
+  /// The options that make the runner use this velathumb.
+  std::vector<std::string> Arguments(const std::vector<std::string>& more = {}) const;
 
   /// Runs the runner, or starts it, with this velathumb.
   ProgramResult Run(const std::vector<std::string>& more = {}) const;

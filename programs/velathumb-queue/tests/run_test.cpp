@@ -43,6 +43,7 @@ TEST_F(QueueRunTest, TakesEachEntryOnceInTheOrderOfFirstAppearance) {
 
 TEST_F(QueueRunTest, PassesOverLinesThatAreTooLong) {
   const RecordingVelathumb velathumb;
+  MakeEntryDirectories({"/tmp/a"});
   WriteFile(kQueueFile, '/' + std::string(4095, 'x') + "\n/tmp/a\n");
   EXPECT_EQ(velathumb.Run().exitCode, 0);
   EXPECT_THAT(velathumb.Entries(), ElementsAre("/tmp/a"));
@@ -124,6 +125,7 @@ TEST_F(QueueRunTest, NewEntriesDoNotPassForOnesThatComeBack) {
     velathumb.Stub().PlanWhen(entries.back(), StubPlan().WriteFile(kQueueFile, next));
   }
   entries.push_back("/tmp/30");
+  MakeEntryDirectories(entries);
   Enqueue({"/tmp/0"});
   const ProgramResult result = velathumb.Run();
   EXPECT_EQ(result.exitCode, 0);
@@ -132,15 +134,20 @@ TEST_F(QueueRunTest, NewEntriesDoNotPassForOnesThatComeBack) {
   ExpectNothingWaits();
 }
 
-TEST_F(QueueRunTest, EntriesThatComeBackWithoutEndAreLeftForTheNextRun) {
+TEST_F(QueueRunTest, EntriesThatComeBackWithoutEndAreKeptForALaterRun) {
   RecordingVelathumb velathumb;
   velathumb.Stub().Plan(StubPlan().WriteFile(kQueueFile, "/tmp/a\n"));
   Enqueue({"/tmp/a"});
   const ProgramResult result = velathumb.Run();
-  EXPECT_EQ(result.exitCode, 0);
+  EXPECT_EQ(result.exitCode, 1);
   EXPECT_THAT(result.err, HasSubstr("again and again"));
   EXPECT_THAT(velathumb.Entries(), AllOf(SizeIs(Lt(30)), Each("/tmp/a")));
-  EXPECT_EQ(ReadFile(kQueueFile), "/tmp/a\n");
+  EXPECT_EQ(ReadFile(kLaterFile), "/tmp/a\n");
+  EXPECT_FALSE(Exists(kQueueFile));
+  EXPECT_FALSE(Exists(kTakenFile));
+  velathumb.Stub().Plan(StubPlan());
+  EXPECT_EQ(velathumb.Run().exitCode, 0);
+  ExpectNothingWaits();
 }
 
 }  // namespace

@@ -1,0 +1,61 @@
+#include "entry_check.h"
+
+#include <cerrno>
+#include <cstdint>
+#include <cstring>
+#include <filesystem>
+#include <system_error>
+
+#include "entry_plan.h"
+#include "platform/velaindex.h"
+#include "platform/vlibc.h"
+#include "storage/creation_queue.h"
+
+namespace {
+
+/// velathumb stops where less is free.
+constexpr uint64_t kLeastFree = uint64_t{1} << 30;
+
+bool IsTree(const std::string& entry) {
+  return entry.rfind(kTreeEntryPrefix, 0) == 0;
+}
+
+std::string FindTreeFault(const std::string& path) {
+  if (path.find(':') != std::string::npos) {
+    return "a tree's path cannot hold a colon; add its directories one by one";
+  }
+  const std::string name = path.substr(path.rfind('/') + 1);
+  return EntryNameShouldIndex(name.c_str()) == 1 ? "" : "velathumb leaves out a tree of this name";
+}
+
+}  // namespace
+
+std::string CheckAddition(std::string& entry) {
+  const bool isTree = IsTree(entry);
+  const std::string given = isTree ? entry.substr(std::strlen(kTreeEntryPrefix)) : entry;
+  if (given.find('\n') != std::string::npos) {
+    return "an entry cannot hold a newline";
+  }
+  if (given.empty() || IsDirExist(given.c_str()) == 0) {
+    return "there is no such directory";
+  }
+  std::error_code error;
+  std::string path =
+      given.front() == '/' ? given : std::filesystem::canonical(given, error).string();
+  if (error) {
+    return error.message();
+  }
+  while (path.size() > 1 && path.back() == '/') {
+    path.pop_back();
+  }
+  entry = isTree ? kTreeEntryPrefix + path : path;
+  return isTree ? FindTreeFault(path) : std::string();
+}
+
+std::string FindHindrance(const std::string& entry) {
+  const std::string directory = TargetOf(entry).directory;
+  if (IsDirExist(directory.c_str()) == 0) {
+    return "there is no such directory";
+  }
+  return VLIBGetFsAvailSize(directory.c_str()) < kLeastFree ? "its volume is nearly full" : "";
+}
