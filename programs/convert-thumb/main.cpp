@@ -12,11 +12,11 @@
 #include <string>
 #include <vector>
 
-#include "file_descriptor.h"
 #include "image_magick.h"
 #include "jpeg_reader.h"
 #include "memory_limit.h"
 #include "plan_parser.h"
+#include "thumb/descriptor.h"
 #include "thumbnails.h"
 
 namespace {
@@ -44,8 +44,7 @@ bool IsJpeg(int descriptor) {
 
 int Convert(const ConversionPlan& plan, const std::vector<std::string>& arguments) {
   // Opening must not wait when the source is a pipe.
-  const FileDescriptor file(
-      open(plan.source.c_str(), O_RDONLY | O_CLOEXEC | O_NOCTTY | O_NONBLOCK));
+  const Descriptor file(open(plan.source.c_str(), O_RDONLY | O_CLOEXEC | O_NOCTTY | O_NONBLOCK));
   if (!file.IsOpen()) {
     std::fprintf(stderr, "convert-thumb: cannot open %s: %s\n", plan.source.c_str(),
                  std::strerror(errno));

@@ -5,7 +5,7 @@
 
 #include <cerrno>
 
-#include "file_descriptor.h"
+#include "thumb/descriptor.h"
 
 namespace {
 
@@ -31,7 +31,7 @@ int OpenForWriting(const std::string& path) {
 }  // namespace
 
 bool WriteOutputFile(const std::string& path, const unsigned char* bytes, size_t size) {
-  FileDescriptor file(OpenForWriting(path));
+  Descriptor file(OpenForWriting(path));
   if (!file.IsOpen()) {
     return false;
   }

@@ -16,10 +16,6 @@ namespace {
 /// velathumb stops where less is free.
 constexpr uint64_t kLeastFree = uint64_t{1} << 30;
 
-bool IsTree(const std::string& entry) {
-  return entry.rfind(kTreeEntryPrefix, 0) == 0;
-}
-
 std::string FindTreeFault(const std::string& path) {
   if (path.find(':') != std::string::npos) {
     return "a tree's path cannot hold a colon; add its directories one by one";
@@ -31,7 +27,7 @@ std::string FindTreeFault(const std::string& path) {
 }  // namespace
 
 std::string CheckAddition(std::string& entry) {
-  const bool isTree = IsTree(entry);
+  const bool isTree = IsTreeEntry(entry);
   const std::string given = isTree ? entry.substr(std::strlen(kTreeEntryPrefix)) : entry;
   if (given.find('\n') != std::string::npos) {
     return "an entry cannot hold a newline";

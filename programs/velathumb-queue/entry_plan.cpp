@@ -42,7 +42,7 @@ bool IsInTree(const std::string& directory, const std::string& root) {
 }  // namespace
 
 EntryTarget TargetOf(const std::string& entry) {
-  const bool isTree = entry.compare(0, std::strlen(kTreeEntryPrefix), kTreeEntryPrefix) == 0;
+  const bool isTree = IsTreeEntry(entry);
   return {Canonical(isTree ? TreeDirectory(entry) : entry), isTree};
 }
 

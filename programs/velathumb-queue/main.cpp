@@ -3,7 +3,6 @@
 // Works the photo queue off.
 
 #include <fcntl.h>
-#include <sys/stat.h>
 #include <unistd.h>
 
 #include <cerrno>
@@ -13,6 +12,7 @@
 #include <vector>
 
 #include "entry_check.h"
+#include "file_place.h"
 #include "options.h"
 #include "platform/velaindex.h"
 #include "platform/vlibc.h"
@@ -76,13 +76,6 @@ bool LockForProcess(int descriptor, bool wait) {
   return fcntl(descriptor, wait ? F_SETLKW : F_SETLK, &whole) == 0;
 }
 
-bool IsAtLockPath(int descriptor) {
-  struct stat open = {};
-  struct stat named = {};
-  return fstat(descriptor, &open) == 0 && stat(kLockFile, &named) == 0 &&
-         open.st_dev == named.st_dev && open.st_ino == named.st_ino;
-}
-
 /// Takes the lock that one runner at a time has; the file may be removed while somebody waits.
 /// Returns no open descriptor, with errno set, when it cannot be had.
 Descriptor TakeRunnerLock(bool wait) {
@@ -94,7 +87,7 @@ Descriptor TakeRunnerLock(bool wait) {
       errno = error;
       return lock;
     }
-    if (IsAtLockPath(lock.Get())) {
+    if (IsAtPath(lock.Get(), kLockFile)) {
       return lock;
     }
   }

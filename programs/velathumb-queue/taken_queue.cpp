@@ -13,6 +13,7 @@
 #include <fstream>
 #include <system_error>
 
+#include "file_place.h"
 #include "platform/velaindex.h"
 #include "platform/vlibc.h"
 #include "run_log.h"
@@ -59,7 +60,7 @@ bool IsHeld(const std::string& path) {
 
 /// Returns what an entry is known by: the same for spellings of its path.
 std::string KeyOf(const std::string& entry) {
-  const size_t begin = entry.rfind(kTreeEntryPrefix, 0) == 0 ? std::strlen(kTreeEntryPrefix) : 0;
+  const size_t begin = IsTreeEntry(entry) ? std::strlen(kTreeEntryPrefix) : 0;
   return entry.substr(0, begin) + WithoutIdleParts(entry.substr(begin));
 }
 
@@ -78,13 +79,6 @@ int AppendLine(const std::string& path, const std::string& text) {
     return 0;
   }
   return ftruncate(file.Get(), end) == 0 ? ENOSPC : errno;
-}
-
-bool IsAtPath(int descriptor, const std::string& path) {
-  struct stat open = {};
-  struct stat named = {};
-  return fstat(descriptor, &open) == 0 && stat(path.c_str(), &named) == 0 &&
-         open.st_dev == named.st_dev && open.st_ino == named.st_ino;
 }
 
 }  // namespace

@@ -73,6 +73,10 @@ LineReader::LineReader(const char* file) {
 
 }  // namespace
 
+bool IsTreeEntry(const std::string& entry) {
+  return entry.compare(0, std::strlen(kTreeEntryPrefix), kTreeEntryPrefix) == 0;
+}
+
 bool HasQueueLine(const char* queueFile, const char* text) {
   char line[kPathBufferSize] = "";
   const int length = VLIBCFileGetLine(queueFile, text, line, sizeof line, kLineSearchFlags);

@@ -20,6 +20,9 @@ inline constexpr CreationQueue kVideoQueue = {"/var/spool/flv_create.queue",
 /// Begins an entry that stands for a directory with everything below it.
 inline constexpr char kTreeEntryPrefix[] = "R:";
 
+/// Returns true when the entry stands for a directory with everything below it.
+bool IsTreeEntry(const std::string& entry);
+
 /// Returns true when the queue file holds a line equal to `text`.
 bool HasQueueLine(const char* queueFile, const char* text);
 

@@ -91,7 +91,7 @@ std::string TreeOf(const std::string& entry) {
 }
 
 int CountEntryWork(const std::string& entry) {
-  if (entry.compare(0, std::strlen(kTreeEntryPrefix), kTreeEntryPrefix) == 0) {
+  if (IsTreeEntry(entry)) {
     return CountVideoWork(TreeOf(entry).c_str());
   }
   return IsVideoWorkNeeded(entry.c_str());

@@ -23,11 +23,11 @@ class Descriptor {
   int Get() const { return number_; }
   bool IsOpen() const { return number_ >= 0; }
 
-  void Close() {
-    if (number_ >= 0) {
-      close(number_);
-    }
+  /// Returns false when what was written may not have arrived.
+  bool Close() {
+    const bool isClosed = number_ < 0 || close(number_) == 0;
     number_ = -1;
+    return isClosed;
   }
 
  private:
