@@ -11,6 +11,14 @@ function(vela_add_test_program name)
   target_link_libraries(${name} PRIVATE vela_test_support velathumb_library)
   target_compile_options(${name} PRIVATE ${VELA_TEST_OPTIONS})
   target_precompile_headers(${name} REUSE_FROM vela_test_headers)
-  add_dependencies(${name} velathumb vela_stub_tool)
-  gtest_discover_tests(${name} TEST_PREFIX ${name}. DISCOVERY_TIMEOUT 60 PROPERTIES TIMEOUT 600)
+  add_dependencies(${name} velathumb convert-thumb vela_stub_tool)
+  gtest_discover_tests(${name} TEST_PREFIX ${name}. DISCOVERY_TIMEOUT 60
+                       PROPERTIES TIMEOUT 600 ${VELA_TEST_PROPERTIES})
+endfunction()
+
+# Registers the tests of `name` that match `filter` once more, with ImageMagick as the real converter.
+function(vela_add_imagemagick_tests name filter)
+  gtest_discover_tests(${name} TEST_PREFIX imagemagick.${name}. TEST_LIST ${name}_imagemagick
+                       TEST_FILTER ${filter} DISCOVERY_TIMEOUT 60
+                       PROPERTIES TIMEOUT 600 ENVIRONMENT VELA_TEST_CONVERTER=imagemagick)
 endfunction()

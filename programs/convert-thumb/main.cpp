@@ -2,22 +2,28 @@
 
 #include <fcntl.h>
 #include <sys/stat.h>
-#include <unistd.h>
 
 #include <cerrno>
-#include <cstdio>
 #include <cstring>
 #include <exception>
+#include <memory>
+#include <new>
 #include <optional>
 #include <string>
 #include <vector>
 
-#include "image_magick.h"
-#include "jpeg_reader.h"
-#include "memory_limit.h"
-#include "plan_parser.h"
+#include "command_line/plan_parser.h"
+#include "confinement/confinement.h"
+#include "confinement/memory_limit.h"
+#include "confinement/resource_limits.h"
+#include "confinement/writable_places.h"
+#include "decoding/photo_opener.h"
+#include "encoding/unfinished_outputs.h"
+#include "failure_line.h"
+#include "imagemagick/image_magick.h"
 #include "thumb/descriptor.h"
 #include "thumbnails.h"
+#include "turning/jpeg_turn.h"
 
 namespace {
 
@@ -35,33 +41,37 @@ bool IsRegularFile(int descriptor) {
   return fstat(descriptor, &status) == 0 && S_ISREG(status.st_mode);
 }
 
-bool IsJpeg(int descriptor) {
-  constexpr unsigned char kBeginning[] = {0xFF, 0xD8, 0xFF};
-  unsigned char bytes[sizeof kBeginning];
-  return pread(descriptor, bytes, sizeof bytes, 0) == sizeof bytes &&
-         std::memcmp(bytes, kBeginning, sizeof bytes) == 0;
-}
-
 int Convert(const ConversionPlan& plan, const std::vector<std::string>& arguments) {
   // Opening must not wait when the source is a pipe.
   const Descriptor file(open(plan.source.c_str(), O_RDONLY | O_CLOEXEC | O_NOCTTY | O_NONBLOCK));
   if (!file.IsOpen()) {
-    std::fprintf(stderr, "convert-thumb: cannot open %s: %s\n", plan.source.c_str(),
-                 std::strerror(errno));
+    TellFailure("cannot open %s: %s", plan.source.c_str(), std::strerror(errno));
     return kFailed;
   }
-  if (!IsRegularFile(file.Get()) || !IsJpeg(file.Get())) {
+  if (!IsRegularFile(file.Get())) {
     return LeaveToImageMagick(arguments);
   }
   const size_t memoryLimit = ConversionMemoryLimit();
-  JpegReader reader(file.Get(), memoryLimit);
-  if (!reader.ReadHeader()) {
+  const std::unique_ptr<PhotoReader> reader = OpenPhoto(file.Get(), plan, memoryLimit);
+  if (reader == nullptr) {
     return LeaveToImageMagick(arguments);
   }
-  return MakeThumbnails(reader, plan, memoryLimit) ? kDone : kFailed;
+  ConfineToThisProgram();
+  return MakeThumbnails(*reader, plan, memoryLimit) ? kDone : kFailed;
+}
+
+int TurnFile(const TurnPlan& plan, const std::vector<std::string>& arguments) {
+  const FileTurn turn = TurnJpegFile(plan.path, plan.quarterTurns, ConversionMemoryLimit());
+  if (turn == FileTurn::kImpossible) {
+    return LeaveToImageMagick(arguments);
+  }
+  return turn == FileTurn::kDone ? kDone : kFailed;
 }
 
 int Run(const std::vector<std::string>& arguments) {
+  if (const std::optional<TurnPlan> turn = ParseTurn(arguments)) {
+    return TurnFile(*turn, arguments);
+  }
   const std::optional<ConversionPlan> plan = ParseConversion(arguments);
   return plan ? Convert(*plan, arguments) : LeaveToImageMagick(arguments);
 }
@@ -69,10 +79,20 @@ int Run(const std::vector<std::string>& arguments) {
 }  // namespace
 
 int main(int argc, char** argv) {
+  int status = kFailed;
   try {
-    return Run(std::vector<std::string>(argv + (argc > 0 ? 1 : 0), argv + argc));
+    const std::vector<std::string> arguments(argv + (argc > 0 ? 1 : 0), argv + argc);
+    EndCleanlyOnFatalSignals();
+    LimitResources(ConversionMemoryLimit());
+    Confine(FindWritablePlaces(arguments));
+    status = Run(arguments);
+  } catch (const std::bad_alloc&) {
+    TellFailure("out of memory");
   } catch (const std::exception& error) {
-    std::fprintf(stderr, "convert-thumb: %s\n", error.what());
-    return kFailed;
+    TellFailure("%s", error.what());
   }
+  if (status != kDone) {
+    RemoveNotedOutputs();
+  }
+  return status;
 }

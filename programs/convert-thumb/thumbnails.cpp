@@ -1,34 +1,43 @@
 #include "thumbnails.h"
 
-#include <atomic>
-#include <cstdio>
-#include <exception>
+#include <algorithm>
 #include <optional>
 #include <string>
-#include <system_error>
-#include <thread>
 #include <utility>
 
-#include "jpeg_writer.h"
-#include "output_file.h"
-#include "resize.h"
-#include "rows_ahead.h"
-#include "turn.h"
-#include "unsharp.h"
+#include "decoding/rows_ahead.h"
+#include "encoding/jpeg_writer.h"
+#include "encoding/output_file.h"
+#include "failure_line.h"
+#include "picture/colour_conversion.h"
+#include "picture/picture_maker.h"
+#include "picture/resize.h"
+#include "picture/turn.h"
+#include "picture/unsharp.h"
+#include "thumbnail_stream.h"
+#include "worker_threads.h"
 
 namespace {
 
 /// A picture on its way to an output.
 struct Thumbnail {
   Picture picture;
+  ColourSpace space = ColourSpace::kRgb;
   int orientation = 1;  ///< EXIF orientation that it still has to be turned by
   bool withProfile = true;
 };
 
+/// The profile of the old space is of no use in the new one.
+void ConvertToSrgb(Thumbnail& thumbnail) {
+  thumbnail.withProfile = thumbnail.withProfile && thumbnail.space == ColourSpace::kRgb;
+  ConvertToRgb(thumbnail.picture, thumbnail.space);
+  thumbnail.space = ColourSpace::kRgb;
+}
+
 void Apply(const Step& step, Thumbnail& thumbnail) {
   switch (step.kind) {
     case Step::Kind::kFlatten:
-      // A JPEG covers the background as it is.
+      // What is transparent has been laid on its background while it was read.
       break;
     case Step::Kind::kAutoOrient:
       Straighten(thumbnail.picture, thumbnail.orientation);
@@ -41,9 +50,7 @@ void Apply(const Step& step, Thumbnail& thumbnail) {
       Sharpen(thumbnail.picture, step.unsharp);
       break;
     case Step::Kind::kConvertToSrgb:
-      // Colour is not converted, but a grey picture becomes one of another kind, and the profile of
-      // its old kind is of no use to it.
-      thumbnail.withProfile = thumbnail.withProfile && thumbnail.picture.channels == 3;
+      ConvertToSrgb(thumbnail);
       break;
   }
 }
@@ -54,48 +61,46 @@ void ApplySteps(const OutputPlan& output, Thumbnail& thumbnail) {
   }
 }
 
-bool Write(const Thumbnail& thumbnail, const JpegTraits& traits, const OutputPlan& output) {
-  const std::optional<EncodedJpeg> jpeg =
-      EncodeJpeg(thumbnail.picture, traits, output.quality, thumbnail.withProfile);
+bool Write(const std::optional<EncodedJpeg>& jpeg, const OutputPlan& output) {
   if (!jpeg || !WriteOutputFile(output.path, jpeg->bytes.get(), jpeg->size)) {
-    std::fprintf(stderr, "convert-thumb: cannot write %s\n", output.path.c_str());
+    TellFailure("cannot write %s", output.path.c_str());
     return false;
   }
   return true;
 }
 
-void TellUndecodable(const JpegReader& reader) {
-  std::fprintf(stderr, "convert-thumb: cannot decode the photo: %s\n", reader.Error());
+void TellUndecodable(const PhotoReader& reader) {
+  TellFailure("cannot decode the photo: %s", reader.Error());
 }
 
-/// Whether the first thumbnail, and beside it a turned copy and what the encoder holds of it, fit.
-bool FitsInMemory(const RowSource& rows, const ResizePlan& resize, size_t memoryLimit) {
-  constexpr size_t kBytesBesides = 4;
+/// What a turned copy of a thumbnail and what the encoder holds of it take, bytes a sample.
+constexpr size_t kBytesBesides = 4;
+
+/// Bytes besides the decoder's that the first thumbnail takes.
+size_t MemoryOfFirst(const PhotoReader& reader, const ResizePlan& resize) {
   const size_t samples = static_cast<size_t>(resize.size.width) *
                          static_cast<size_t>(resize.size.height) *
-                         static_cast<size_t>(rows.Channels());
-  return ResizeMemory(rows, resize) + samples * kBytesBesides <= memoryLimit;
+                         static_cast<size_t>(reader.Channels());
+  return ResizeMemory({reader.Width(), reader.Height()}, reader.Channels(), resize) +
+         samples * kBytesBesides;
 }
 
-/// Scales a photo whose decoding has been started; empty, with one line on standard error, when
-/// that fails.
-std::optional<Picture> ScalePhoto(JpegReader& reader, const ResizePlan& resize, size_t memoryLimit,
-                                  const std::string& path) {
+/// The same when all thumbnails are made at the same time: none is larger than the first.
+size_t MemoryOfAll(const PhotoReader& reader, const ResizePlan& resize,
+                   const ConversionPlan& plan) {
+  return MemoryOfFirst(reader, resize) * plan.outputs.size();
+}
+
+/// Scales a photo whose decoding has been started; false when a row cannot be decoded or `out`
+/// refuses one.
+bool ScalePhoto(PhotoReader& reader, const ResizePlan& resize, RowSink& out) {
   RowsAhead rows(reader);
-  if (!FitsInMemory(rows, resize, memoryLimit)) {
-    std::fprintf(stderr, "convert-thumb: %s would take too much memory\n", path.c_str());
-    return std::nullopt;
-  }
-  std::optional<Picture> picture = Resize(rows, resize);
-  if (!picture) {
-    TellUndecodable(reader);
-  }
-  return picture;
+  return Resize(rows, resize, out);
 }
 
-/// The first thumbnail, from the photo; empty, with one line on standard error, when there is none.
-std::optional<Thumbnail> MakeFirst(JpegReader& reader, const OutputPlan& output,
-                                   size_t memoryLimit) {
+/// Starts decoding the photo for the first thumbnail and says how to scale it; empty, with one line
+/// on standard error, when it cannot be decoded.
+std::optional<ResizePlan> StartFirst(PhotoReader& reader, const OutputPlan& output) {
   const PictureSize fullSize = reader.FullSize();
   ResizePlan resize;
   resize.size = ThumbnailSize(fullSize, output.box);
@@ -103,89 +108,89 @@ std::optional<Thumbnail> MakeFirst(JpegReader& reader, const OutputPlan& output,
     TellUndecodable(reader);
     return std::nullopt;
   }
-  resize.filter = reader.Channels() == 1 ? FilterKind::kMitchell : FilterKind::kLanczos;
+  const PhotoTraits& traits = reader.Traits();
+  resize.filter =
+      traits.palette || traits.transparent ? FilterKind::kMitchell : FilterKind::kLanczos;
   // A reduced photo has been thinned out by its decoder, which does it better.
   resize.coarse = !reader.IsReduced() && IsThinnedOut(fullSize, resize.size);
-  std::optional<Picture> picture = ScalePhoto(reader, resize, memoryLimit, output.path);
-  if (!picture) {
-    return std::nullopt;
-  }
-  Thumbnail thumbnail{std::move(*picture), reader.Traits().orientation, true};
-  ApplySteps(output, thumbnail);
-  return thumbnail;
+  resize.columnsFirst = !reader.IsReduced() && IsScaledDownFirst(fullSize, resize.size);
+  return resize;
 }
 
 /// A later thumbnail, from the first.
-Thumbnail MakeLater(const Thumbnail& first, const OutputPlan& output) {
-  const PictureSize from = {first.picture.width, first.picture.height};
-  ResizePlan resize;
-  resize.size = ThumbnailSize(from, output.box);
-  resize.filter = FilterKind::kMitchell;
-  resize.coarse = IsThinnedOut(from, resize.size);
+Thumbnail MakeLater(const Thumbnail& first, const OutputPlan& output, bool exact) {
   PictureRows rows(first.picture);
+  const ResizePlan resize =
+      LaterResizePlan({first.picture.width, first.picture.height}, output.box, exact);
   // Rows in memory can always be read.
-  Thumbnail thumbnail{*Resize(rows, resize), first.orientation, first.withProfile};
+  Thumbnail thumbnail{*Resize(rows, resize), first.space, first.orientation, first.withProfile};
   ApplySteps(output, thumbnail);
   return thumbnail;
 }
 
-/// Finishes the outputs, by two threads: each takes the next output that nobody has taken.
-class OutputWork {
- public:
-  OutputWork(const ConversionPlan& plan, const Thumbnail& first, const JpegTraits& traits)
-      : plan_(plan), first_(first), traits_(traits) {}
+bool WriteThumbnail(const Thumbnail& thumbnail, const PhotoTraits& traits,
+                    const OutputPlan& output) {
+  return Write(EncodeJpeg(thumbnail.picture, traits, output.quality, thumbnail.withProfile),
+               output);
+}
 
-  bool Run() {
-    std::thread second;
-    if (plan_.outputs.size() > 1 && std::thread::hardware_concurrency() > 1) {
-      second = StartSecondThread();
-    }
-    TakeOutputs();
-    if (second.joinable()) {
-      second.join();
-    }
-    return !failed_;
+/// Every step works on a whole picture.
+bool MakeWholePictures(PhotoReader& reader, const ResizePlan& resize, const ConversionPlan& plan) {
+  const PhotoTraits& traits = reader.Traits();
+  PictureMaker maker(resize.size, reader.Channels());
+  if (!ScalePhoto(reader, resize, maker)) {
+    TellUndecodable(reader);
+    return false;
   }
+  Thumbnail first{maker.Take(), traits.space, traits.orientation, true};
+  ApplySteps(plan.outputs.front(), first);
+  return DoInTwoThreads(plan.outputs.size(), [&](size_t i) {
+    const OutputPlan& output = plan.outputs[i];
+    return i == 0 ? WriteThumbnail(first, traits, output)
+                  : WriteThumbnail(MakeLater(first, output, !reader.IsReduced()), traits, output);
+  });
+}
 
- private:
-  std::thread StartSecondThread() {
-    try {
-      return std::thread([this] { TakeOutputs(); });
-    } catch (const std::system_error&) {
-      // One thread does all the work as well.
-      return std::thread();
-    }
+/// Every step works on the rows that the photo has been decoded to.
+bool MakeWhileDecoding(PhotoReader& reader, const ResizePlan& resize, const ConversionPlan& plan) {
+  ThumbnailStream stream(resize.size, reader.Channels(), plan, reader.Traits(),
+                         !reader.IsReduced());
+  const bool decoded = ScalePhoto(reader, resize, stream);
+  if (!decoded && !stream.HasFailed()) {
+    TellUndecodable(reader);
+    return false;
   }
-
-  void TakeOutputs() noexcept {
-    for (size_t i = next_++; i < plan_.outputs.size() && !failed_; i = next_++) {
-      if (!Finish(i)) {
-        failed_ = true;
-      }
-    }
+  if (!decoded || !stream.Complete()) {
+    TellFailure("out of memory");
+    return false;
   }
-
-  bool Finish(size_t place) {
-    try {
-      const OutputPlan& output = plan_.outputs[place];
-      return place == 0 ? Write(first_, traits_, output)
-                        : Write(MakeLater(first_, output), traits_, output);
-    } catch (const std::exception& error) {
-      std::fprintf(stderr, "convert-thumb: %s\n", error.what());
-      return false;
-    }
-  }
-
-  const ConversionPlan& plan_;
-  const Thumbnail& first_;
-  const JpegTraits& traits_;
-  std::atomic<size_t> next_{0};
-  std::atomic<bool> failed_{false};
-};
+  return DoInTwoThreads(plan.outputs.size(),
+                        [&](size_t i) { return Write(stream.Finish(i), plan.outputs[i]); });
+}
 
 }  // namespace
 
-bool MakeThumbnails(JpegReader& reader, const ConversionPlan& plan, size_t memoryLimit) {
-  const std::optional<Thumbnail> first = MakeFirst(reader, plan.outputs.front(), memoryLimit);
-  return first && OutputWork(plan, *first, reader.Traits()).Run();
+bool CanMakeThumbnails(const PhotoTraits& traits, const ConversionPlan& plan) {
+  const std::vector<Step>& steps = plan.outputs.front().steps;
+  const bool flattened = !steps.empty() && steps.front().kind == Step::Kind::kFlatten;
+  const bool converted = std::any_of(steps.begin(), steps.end(), [](const Step& step) {
+    return step.kind == Step::Kind::kConvertToSrgb;
+  });
+  const bool storable = traits.space == ColourSpace::kGrey || traits.space == ColourSpace::kRgb;
+  return (flattened || !traits.transparent) && (converted || storable);
+}
+
+bool MakeThumbnails(PhotoReader& reader, const ConversionPlan& plan, size_t memoryLimit) {
+  const std::optional<ResizePlan> resize = StartFirst(reader, plan.outputs.front());
+  if (!resize) {
+    return false;
+  }
+  if (MemoryOfFirst(reader, *resize) > memoryLimit) {
+    TellFailure("%s would take too much memory", plan.outputs.front().path.c_str());
+    return false;
+  }
+  const bool streamed = ThumbnailStream::Serves(plan, reader.Traits()) &&
+                        MemoryOfAll(reader, *resize, plan) <= memoryLimit;
+  return streamed ? MakeWhileDecoding(reader, *resize, plan)
+                  : MakeWholePictures(reader, *resize, plan);
 }

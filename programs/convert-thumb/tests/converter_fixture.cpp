@@ -2,6 +2,7 @@
 
 #include <gtest/gtest.h>
 
+#include <cstdio>
 #include <cstdlib>
 
 #include "support/files.h"
@@ -9,6 +10,8 @@
 
 namespace vela_test {
 namespace {
+
+constexpr char kHiddenImageMagick[] = "/usr/bin/away";
 
 std::string OutputPath(const std::string& prefix, size_t place) {
   return prefix + std::to_string(place) + ".jpg";
@@ -43,6 +46,14 @@ Likeness Compare(const std::string& one, const std::string& other) {
   return likeness;
 }
 
+WithoutImageMagick::WithoutImageMagick() {
+  EXPECT_EQ(std::rename(kImageMagick, kHiddenImageMagick), 0);
+}
+
+WithoutImageMagick::~WithoutImageMagick() {
+  EXPECT_EQ(std::rename(kHiddenImageMagick, kImageMagick), 0);
+}
+
 void ConverterTest::SetUp() {
   SandboxTest::SetUp();
   MakeDirectories(directory_);
@@ -50,11 +61,18 @@ void ConverterTest::SetUp() {
 
 std::string ConverterTest::MakePhoto(const std::string& name, int width, int height,
                                      const std::vector<std::string>& options) const {
-  const std::string path = directory_ + "/" + name;
+  return MakePicture("jpg:" + name, width, height, options);
+}
+
+std::string ConverterTest::MakePicture(const std::string& name, int width, int height,
+                                       const std::vector<std::string>& options) const {
+  const size_t colon = name.find(':');
+  const std::string prefix = colon == std::string::npos ? "" : name.substr(0, colon + 1);
+  const std::string path = directory_ + "/" + name.substr(prefix.size());
   const std::string size = std::to_string(width) + "x" + std::to_string(height);
   std::vector<std::string> arguments = {"-seed", "20", "-size", size, "plasma:sienna-steelblue"};
   arguments.insert(arguments.end(), options.begin(), options.end());
-  arguments.push_back("jpg:" + path);
+  arguments.push_back(prefix + path);
   const ProgramResult made = RunProgram(kImageMagick, arguments);
   EXPECT_EQ(made.exitCode, 0) << made.err;
   return path;
@@ -76,6 +94,31 @@ void ConverterTest::ExpectSamePictures(const std::string& source,
                                        double least) const {
   ExpectSuccess(RunProgram(ConvertThumbPath(), Line(source, outputs, "ours").Arguments()));
   ExpectSuccess(RunProgram(kImageMagick, Line(source, outputs, "theirs").Arguments()));
+  CompareOutputs(source, outputs, leastMean, least);
+}
+
+void ConverterTest::ExpectOwnPictures(const std::string& source,
+                                      const std::vector<ThumbOptions>& outputs, double leastMean,
+                                      double least) const {
+  ExpectSuccess(RunProgram(kImageMagick, Line(source, outputs, "theirs").Arguments()));
+  {
+    const WithoutImageMagick without;
+    ExpectSuccess(RunProgram(ConvertThumbPath(), Line(source, outputs, "ours").Arguments()));
+  }
+  CompareOutputs(source, outputs, leastMean, least);
+}
+
+void ConverterTest::ExpectHandedOver(const std::string& source,
+                                     const std::vector<ThumbOptions>& outputs) const {
+  const std::vector<std::string> arguments = Line(source, outputs, "ours").Arguments();
+  ExpectSuccess(RunProgram(ConvertThumbPath(), arguments));
+  const WithoutImageMagick without;
+  EXPECT_EQ(RunProgram(ConvertThumbPath(), arguments).exitCode, 1) << source;
+}
+
+void ConverterTest::CompareOutputs(const std::string& source,
+                                   const std::vector<ThumbOptions>& outputs, double leastMean,
+                                   double least) const {
   double sum = 0;
   for (size_t i = 0; i < outputs.size(); ++i) {
     const std::string ours = OutputPath(directory_ + "/ours", i);

@@ -23,6 +23,15 @@ struct Likeness {
 };
 Likeness Compare(const std::string& one, const std::string& other);
 
+/// Takes ImageMagick away for as long as it lives.
+class WithoutImageMagick {
+ public:
+  WithoutImageMagick();
+  ~WithoutImageMagick();
+  WithoutImageMagick(const WithoutImageMagick&) = delete;
+  WithoutImageMagick& operator=(const WithoutImageMagick&) = delete;
+};
+
 class ConverterTest : public SandboxTest {
  protected:
   /// Room for sources and outputs.
@@ -34,6 +43,10 @@ class ConverterTest : public SandboxTest {
   std::string MakePhoto(const std::string& name, int width, int height,
                         const std::vector<std::string>& options = {}) const;
 
+  /// The same picture in the format of the name's extension, or of `name`'s prefix ("png8:a.png").
+  std::string MakePicture(const std::string& name, int width, int height,
+                          const std::vector<std::string>& options = {}) const;
+
   /// The line with the outputs' paths in a directory of their own.
   CommandLine Line(const std::string& source, const std::vector<ThumbOptions>& outputs,
                    const std::string& prefix) const;
@@ -43,8 +56,19 @@ class ConverterTest : public SandboxTest {
   void ExpectSamePictures(const std::string& source, const std::vector<ThumbOptions>& outputs,
                           double leastMean = 40, double least = 36) const;
 
+  /// The same without ImageMagick in reach of the converter, which has to do all by itself.
+  void ExpectOwnPictures(const std::string& source, const std::vector<ThumbOptions>& outputs,
+                         double leastMean = 40, double least = 36) const;
+
+  /// Runs the converter with and without ImageMagick in its reach; expects success only with.
+  void ExpectHandedOver(const std::string& source, const std::vector<ThumbOptions>& outputs) const;
+
   /// Runs both; expects the same verdict.
   void ExpectSameVerdict(const std::string& source, const std::vector<ThumbOptions>& outputs) const;
+
+ private:
+  void CompareOutputs(const std::string& source, const std::vector<ThumbOptions>& outputs,
+                      double leastMean, double least) const;
 };
 
 /// The thumbnails of a photo as they usually are, from the largest.

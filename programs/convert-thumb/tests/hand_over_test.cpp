@@ -11,6 +11,7 @@
 #include "support/files.h"
 #include "support/image_checks.h"
 #include "support/images.h"
+#include "support/stub_files.h"
 #include "support/stub_tool.h"
 
 namespace vela_test {
@@ -34,6 +35,13 @@ class HandOver : public ConverterTest {
     stub_ = std::make_unique<StubTool>(kLinkedImageMagick);
   }
 
+  /// Runs the converter so that stubs, which record their calls, can do so.
+  static ProgramOptions Recorded() {
+    ProgramOptions options;
+    options.addedEnvironment = {std::string("TMPDIR=") + kStubDirectory};
+    return options;
+  }
+
   /// The parameters that ImageMagick got in the only call.
   std::vector<std::string> HandedParameters() const {
     const std::vector<StubCall> calls = stub_->Calls();
@@ -47,13 +55,14 @@ class HandOver : public ConverterTest {
 TEST_F(HandOver, PassesUnknownArgumentsOnAsTheyAre) {
   InstallStub();
   const std::vector<std::string> arguments = {"/a.jpg", "-blur", "0x1", "/b%d.png"};
-  RunProgram(ConvertThumbPath(), arguments);
+  RunProgram(ConvertThumbPath(), arguments, Recorded());
   EXPECT_THAT(HandedParameters(), ElementsAreArray(arguments));
 }
 
 TEST_F(HandOver, StaysTheSameProcessUnderTheSameName) {
   InstallStub();
-  Program program = StartProgram(ConvertThumbPath(), {"/a.jpg", "-blur", "0x1", "/b.png"});
+  Program program =
+      StartProgram(ConvertThumbPath(), {"/a.jpg", "-blur", "0x1", "/b.png"}, Recorded());
   const pid_t pid = program.Pid();
   program.Wait();
   const std::vector<StubCall> calls = stub_->Calls();
@@ -63,30 +72,47 @@ TEST_F(HandOver, StaysTheSameProcessUnderTheSameName) {
   EXPECT_EQ(calls.front().arguments.front(), "convert-thumb");
 }
 
+TEST_F(HandOver, PassesWhatNamesNoFileOnAsItIs) {
+  InstallStub();
+  const std::vector<std::string> arguments = {"-size", "10x10", "gradient:red-blue", "/tmp/b.png"};
+  RunProgram(ConvertThumbPath(), arguments, Recorded());
+  EXPECT_THAT(HandedParameters(), ElementsAreArray(arguments));
+}
+
+TEST_F(HandOver, RefusesAPhotoOfAnOddNameThatIsGone) {
+  InstallStub();
+  const ProgramResult result = RunProgram(ConvertThumbPath(), {"/tmp/*.png", "/tmp/o.png"});
+  EXPECT_EQ(result.exitCode, 1);
+  EXPECT_THAT(result.err, StartsWith("convert-thumb: /tmp/*.png: "));
+  EXPECT_THAT(stub_->Calls(), SizeIs(0));
+}
+
 TEST_F(HandOver, PassesOtherFormatsOn) {
   InstallStub();
-  const std::string image = MakeImage(directory_ + "/a.png");
-  const CommandLine line{image + "[0]", directory_, {{{}, directory_ + "/o.jpg"}}};
-  RunProgram(ConvertThumbPath(), line.Arguments());
+  const std::string image = MakeImage(directory_ + "/a.bmp");
+  const CommandLine line{image + "[0]", kStubDirectory, {{{}, directory_ + "/o.jpg"}}};
+  RunProgram(ConvertThumbPath(), line.Arguments(), Recorded());
   EXPECT_THAT(HandedParameters(), ElementsAreArray(line.Arguments()));
 }
 
-TEST_F(HandOver, PassesFourColourPhotosOn) {
+TEST_F(HandOver, PassesFourColourPhotosOnThatStaySo) {
   InstallStub();
   JpegRecipe recipe;
   recipe.colour = JpegColour::kCmyk;
   const std::string photo = MakeJpeg(directory_ + "/a.jpg", recipe);
-  const CommandLine line{photo, "", {{{}, directory_ + "/o.jpg"}}};
-  RunProgram(ConvertThumbPath(), line.Arguments());
+  ThumbOptions options;
+  options.convertToSrgb = false;
+  const CommandLine line{photo, "", {{options, directory_ + "/o.jpg"}}};
+  RunProgram(ConvertThumbPath(), line.Arguments(), Recorded());
   EXPECT_THAT(HandedParameters(), ElementsAreArray(line.Arguments()));
 }
 
 TEST_F(HandOver, PassesTheSourceOnOpenWhenItsNameWouldBeMisread) {
   InstallStub();
-  const std::string source = directory_ + "/a[*]%d:.png";
-  CopyFile(MakeImage(directory_ + "/a.png"), source);
-  const CommandLine line{source + "[0]", directory_, {{{}, directory_ + "/o.jpg"}}};
-  RunProgram(ConvertThumbPath(), line.Arguments());
+  const std::string source = directory_ + "/a[*]%d:.bmp";
+  CopyFile(MakeImage(directory_ + "/a.bmp"), source);
+  const CommandLine line{source + "[0]", kStubDirectory, {{{}, directory_ + "/o.jpg"}}};
+  RunProgram(ConvertThumbPath(), line.Arguments(), Recorded());
   const std::vector<std::string> handed = HandedParameters();
   ASSERT_THAT(handed, SizeIs(line.Arguments().size()));
   EXPECT_THAT(handed[2], StartsWith("/proc/self/fd/"));
@@ -101,9 +127,9 @@ TEST_F(HandOver, PassesTheSourceOnOpenWhenItsNameWouldBeMisread) {
 
 TEST_F(HandOver, PassesNoOtherDescriptorOn) {
   InstallStub();
-  const std::string image = MakeImage(directory_ + "/a.png");
+  const std::string image = MakeImage(directory_ + "/a.bmp");
   const CommandLine line{image, "", {{{}, directory_ + "/o.jpg"}}};
-  RunProgram(ConvertThumbPath(), line.Arguments());
+  RunProgram(ConvertThumbPath(), line.Arguments(), Recorded());
   ASSERT_THAT(stub_->Calls(), SizeIs(1));
   const StubCall call = stub_->Calls().front();
   for (const OpenDescriptor& descriptor : call.descriptors) {

@@ -1,4 +1,4 @@
-#include "option_values.h"
+#include "command_line/option_values.h"
 
 #include <gtest/gtest.h>
 

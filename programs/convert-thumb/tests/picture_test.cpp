@@ -5,11 +5,11 @@
 
 #include <numeric>
 
-#include "resize.h"
-#include "sample_loops.h"
-#include "thumbnail_size.h"
-#include "turn.h"
-#include "unsharp.h"
+#include "picture/resize.h"
+#include "picture/sample_loops.h"
+#include "picture/thumbnail_size.h"
+#include "picture/turn.h"
+#include "picture/unsharp.h"
 
 namespace {
 
@@ -83,7 +83,7 @@ TEST(Resizing, MirrorsLikeThePicture) {
   Straighten(mirrored, 3);
   PictureRows rows(picture);
   PictureRows mirroredRows(mirrored);
-  const ResizePlan plan{{13, 7}, FilterKind::kMitchell, false};
+  const ResizePlan plan{{13, 7}, FilterKind::kMitchell, false, false};
   const auto scaled = Resize(rows, plan);
   auto scaledMirrored = Resize(mirroredRows, plan);
   ASSERT_TRUE(scaled && scaledMirrored);
@@ -98,6 +98,82 @@ TEST(Resizing, ThinsOutWhatShrinksByMuch) {
   EXPECT_FALSE(IsThinnedOut({4000, 3000}, {1280, 960}));
   EXPECT_FALSE(IsThinnedOut({4000, 3000}, {25, 19}));
 }
+
+/// The picture's samples of one channel, as a picture of their own.
+Picture ChannelOf(const Picture& picture, int channel) {
+  Picture grey(picture.width, picture.height, 1);
+  const size_t channels = static_cast<size_t>(picture.channels);
+  for (size_t i = 0; i < grey.samples.size(); ++i) {
+    grey.samples[i] = picture.samples[i * channels + static_cast<size_t>(channel)];
+  }
+  return grey;
+}
+
+Picture NoisyPicture(int width, int height, int channels) {
+  Picture picture(width, height, channels);
+  for (size_t i = 0; i < picture.samples.size(); ++i) {
+    picture.samples[i] = static_cast<uint16_t>(i * 2654435761U >> 8);
+  }
+  return picture;
+}
+
+Picture Scaled(const Picture& picture, const ResizePlan& plan) {
+  PictureRows rows(picture);
+  return Resize(rows, plan).value_or(Picture());
+}
+
+void ExpectNear(const Picture& picture, const Picture& expected, int tolerance) {
+  ASSERT_EQ(picture.width, expected.width);
+  ASSERT_EQ(picture.height, expected.height);
+  ASSERT_EQ(picture.samples.size(), expected.samples.size());
+  for (size_t i = 0; i < expected.samples.size(); ++i) {
+    ASSERT_NEAR(picture.samples[i], expected.samples[i], tolerance) << i;
+  }
+}
+
+/// Number of samples a pixel.
+class Channels : public ::testing::TestWithParam<int> {};
+
+TEST_P(Channels, AreScaledAlike) {
+  const Picture picture = NoisyPicture(101, 67, GetParam());
+  for (const FilterKind filter : {FilterKind::kLanczos, FilterKind::kMitchell}) {
+    for (const PictureSize size : {PictureSize{29, 19}, {100, 66}, {1, 67}, {101, 1}}) {
+      const ResizePlan plan{size, filter, false, false};
+      const Picture scaled = Scaled(picture, plan);
+      for (int channel = 0; channel < GetParam(); ++channel) {
+        ExpectNear(ChannelOf(scaled, channel), Scaled(ChannelOf(picture, channel), plan), 1);
+      }
+    }
+  }
+}
+
+TEST_P(Channels, AreSharpenedAlike) {
+  const Picture picture = NoisyPicture(37, 23, GetParam());
+  const UnsharpMask mask{0, 0.8, 0.5, 0.01};
+  Picture sharpened = picture;
+  Sharpen(sharpened, mask);
+  EXPECT_NE(sharpened.samples, picture.samples);
+  for (int channel = 0; channel < GetParam(); ++channel) {
+    Picture expected = ChannelOf(picture, channel);
+    Sharpen(expected, mask);
+    ExpectNear(ChannelOf(sharpened, channel), expected, 1);
+  }
+}
+
+TEST_P(Channels, AreTurnedAlike) {
+  const Picture picture = NoisyPicture(7, 5, GetParam());
+  for (int orientation = 1; orientation <= 8; ++orientation) {
+    Picture upright = picture;
+    Straighten(upright, orientation);
+    for (int channel = 0; channel < GetParam(); ++channel) {
+      Picture expected = ChannelOf(picture, channel);
+      Straighten(expected, orientation);
+      ExpectNear(ChannelOf(upright, channel), expected, 0);
+    }
+  }
+}
+
+INSTANTIATE_TEST_SUITE_P(OneToFour, Channels, ::testing::Values(1, 3, 4));
 
 /// Rows that end too early.
 class BrokenRows final : public RowSource {
@@ -171,8 +247,8 @@ TEST(Turning, KeepsTheSamplesOfAPixelTogether) {
 }
 
 TEST(Loops, RoundToTheNearestJpegSample) {
-  std::vector<uint16_t> samples(65536);
-  std::iota(samples.begin(), samples.end(), uint16_t{0});
+  std::vector<float> samples(65536);
+  std::iota(samples.begin(), samples.end(), 0.0F);
   std::vector<uint8_t> rounded(samples.size());
   RoundRow(samples.data(), rounded.data(), samples.size());
   for (int i = 0; i < 65536; ++i) {
@@ -181,9 +257,28 @@ TEST(Loops, RoundToTheNearestJpegSample) {
 }
 
 TEST(Loops, CutWhatLiesOutside) {
-  std::vector<float> samples = {-5, 0, 100, 65535, 70000};
-  Clamp(samples.data(), samples.size());
-  EXPECT_THAT(samples, ElementsAre(0, 0, 100, 65535, 65535));
+  std::vector<float> samples(PaddedSize(5));
+  const std::vector<float> values = {-5, 0, 100, 65535, 70000};
+  std::copy(values.begin(), values.end(), samples.begin());
+  const WeightedRow row{samples.data(), 1};
+  std::vector<float> cut(samples.size());
+  SumRows(&row, 1, cut.data(), cut.size());
+  cut.resize(values.size());
+  EXPECT_THAT(cut, ElementsAre(0, 0, 100, 65535, 65535));
+}
+
+TEST(Loops, LayRowsSideBySideAndBack) {
+  const size_t stride = PaddedSize(40);
+  std::vector<float> rows(stride * kBlockRows);
+  std::iota(rows.begin(), rows.end(), 0.0F);
+  std::vector<float> lanes(rows.size());
+  RowsToLanes(rows.data(), stride, lanes.data());
+  for (size_t i = 0; i < rows.size(); ++i) {
+    ASSERT_EQ(lanes[i % stride * kBlockRows + i / stride], rows[i]) << i;
+  }
+  std::vector<float> back(rows.size());
+  LanesToRows(lanes.data(), stride, back.data());
+  EXPECT_EQ(back, rows);
 }
 
 }  // namespace

@@ -1,4 +1,4 @@
-#include "plan_parser.h"
+#include "command_line/plan_parser.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -117,6 +117,24 @@ TEST(SourceArgument, IsTheFirstThatIsNoOption) {
   EXPECT_EQ(FindSourceArgument({"-rotate", "90", "/a.jpg", "/a.jpg"}), 2U);
   EXPECT_EQ(FindSourceArgument({"/a.jpg"}), 0U);
   EXPECT_EQ(FindSourceArgument({}), 0U);
+}
+
+TEST(PlanParser, ReadsATurnInPlace) {
+  const auto plan = ParseTurn({"-rotate", "270", "/a %d.jpg", "/a %d.jpg"});
+  ASSERT_TRUE(plan);
+  EXPECT_EQ(plan->path, "/a %d.jpg");
+  EXPECT_EQ(plan->quarterTurns, 3);
+}
+
+TEST(PlanParser, ReadsNoOtherTurn) {
+  EXPECT_FALSE(ParseTurn({}));
+  EXPECT_FALSE(ParseTurn({"-rotate", "90", "/a.jpg"}));
+  EXPECT_FALSE(ParseTurn({"-rotate", "90", "/a.jpg", "/b.jpg"}));
+  EXPECT_FALSE(ParseTurn({"-rotate", "90", "/a.jpg", "/a.jpg", "/a.jpg"}));
+  EXPECT_FALSE(ParseTurn({"-flip", "90", "/a.jpg", "/a.jpg"}));
+  for (const char* degrees : {"", "0", "360", "45", "-90", "90.0", "90x"}) {
+    EXPECT_FALSE(ParseTurn({"-rotate", degrees, "/a.jpg", "/a.jpg"})) << degrees;
+  }
 }
 
 }  // namespace

@@ -6,13 +6,13 @@
 #include <string>
 #include <vector>
 
-#include "missing_video_library.h"
 #include "status_program.h"
 #include "status_text.h"
 #include "storage/media_fixture.h"
 #include "support/daemon_peer.h"
 #include "support/files.h"
 #include "support/films.h"
+#include "support/missing_library.h"
 #include "support/sandbox.h"
 
 namespace vela_test {
@@ -103,7 +103,7 @@ TEST_F(VideoCheckFault, AServiceThatFailsIsNone) {
 TEST_F(VideoCheckFault, WithoutTheVideoLibraryNothingIsRemoved) {
   DaemonPeer service;
   {
-    const MissingVideoLibrary missing;
+    const MissingLibrary missing("libavformat");
     ExpectNothingChecked(kNoLibrary);
     EXPECT_THAT(service.Commands(), IsEmpty());
   }
@@ -111,7 +111,7 @@ TEST_F(VideoCheckFault, WithoutTheVideoLibraryNothingIsRemoved) {
 }
 
 TEST_F(VideoCheckFault, OtherQuestionsNeedNoVideoLibrary) {
-  const MissingVideoLibrary missing;
+  const MissingLibrary missing("libavformat");
   const ProgramResult result = RunStatus({"--queue", "--progress", "--resume-time", "-rp", kTop});
   EXPECT_EQ(result.exitCode, 1);
   EXPECT_EQ(result.err, "");
@@ -131,7 +131,7 @@ TEST_F(VideoCheckFault, WithoutTheVideoLibraryEveryQuestionFailsForWantOfIt) {
   const std::string noFile = "-1:" + std::to_string(ENOENT) + ' ';
   const std::string noVideo = "-1:" + std::to_string(EINVAL) + ' ';
   {
-    const MissingVideoLibrary missing;
+    const MissingLibrary missing("libavformat");
     std::string expected;
     for (size_t i = 0; i < files.size(); ++i) {
       expected += noLibrary + noLibrary + noLibrary + '\n';

@@ -1,0 +1,176 @@
+#include "confinement/system_calls.h"
+
+#include <sched.h>
+#include <sys/ioctl.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <cstddef>
+#include <cstdint>
+#include <initializer_list>
+
+#include <seccomp.h>
+
+namespace {
+
+constexpr uint32_t kRefuse = SCMP_ACT_ERRNO(EPERM);
+/// The answer that makes the C library use the older call, whose flags can be examined.
+constexpr uint32_t kUnknown = SCMP_ACT_ERRNO(ENOSYS);
+
+/// Younger than the library may be; these numbers are the same for all processors.
+constexpr int kPidfdGetfd = 438;
+constexpr int kMountSetattr = 442;
+constexpr int kFchmodat2 = 452;
+constexpr int kSetxattrat = 463;
+constexpr int kRemovexattrat = 466;
+constexpr int kOpenTreeAttr = 467;
+constexpr int kFileSetattr = 469;
+
+constexpr int kNetwork[] = {SCMP_SYS(socket), SCMP_SYS(connect), SCMP_SYS(bind),
+                            SCMP_SYS(listen), SCMP_SYS(accept),  SCMP_SYS(accept4)};
+
+constexpr int kOtherProcesses[] = {
+// A sanitizer looks for leaks through this.
+#if !defined(CONVERT_THUMB_SANITIZED)
+    SCMP_SYS(ptrace),
+#endif
+    SCMP_SYS(process_vm_readv),
+    SCMP_SYS(process_vm_writev),
+    kPidfdGetfd,
+    SCMP_SYS(pidfd_send_signal),
+    SCMP_SYS(rt_sigqueueinfo),
+    SCMP_SYS(rt_tgsigqueueinfo),
+    SCMP_SYS(kcmp)};
+
+constexpr int kSystem[] = {SCMP_SYS(mount),
+                           SCMP_SYS(umount),
+                           SCMP_SYS(umount2),
+                           SCMP_SYS(move_mount),
+                           SCMP_SYS(open_tree),
+                           kOpenTreeAttr,
+                           SCMP_SYS(fsopen),
+                           SCMP_SYS(fsmount),
+                           SCMP_SYS(fsconfig),
+                           SCMP_SYS(fspick),
+                           kMountSetattr,
+                           SCMP_SYS(pivot_root),
+                           SCMP_SYS(chroot),
+                           SCMP_SYS(setns),
+                           SCMP_SYS(unshare),
+                           SCMP_SYS(init_module),
+                           SCMP_SYS(finit_module),
+                           SCMP_SYS(delete_module),
+                           SCMP_SYS(kexec_load),
+                           SCMP_SYS(kexec_file_load),
+                           SCMP_SYS(reboot),
+                           SCMP_SYS(swapon),
+                           SCMP_SYS(swapoff),
+                           SCMP_SYS(acct),
+                           SCMP_SYS(quotactl),
+                           SCMP_SYS(syslog),
+                           SCMP_SYS(iopl),
+                           SCMP_SYS(ioperm),
+                           SCMP_SYS(sethostname),
+                           SCMP_SYS(setdomainname),
+                           SCMP_SYS(settimeofday),
+                           SCMP_SYS(clock_settime),
+                           SCMP_SYS(clock_adjtime),
+                           SCMP_SYS(adjtimex),
+                           SCMP_SYS(bpf),
+                           SCMP_SYS(perf_event_open),
+                           SCMP_SYS(userfaultfd),
+                           SCMP_SYS(io_uring_setup),
+                           SCMP_SYS(io_uring_enter),
+                           SCMP_SYS(io_uring_register),
+                           SCMP_SYS(fanotify_init),
+                           SCMP_SYS(open_by_handle_at),
+                           SCMP_SYS(add_key),
+                           SCMP_SYS(request_key),
+                           SCMP_SYS(keyctl)};
+
+/// Landlock does not watch over these, or not in its first versions.
+constexpr int kFileAttributes[] = {
+    SCMP_SYS(chmod),        SCMP_SYS(fchmod),    SCMP_SYS(fchmodat),     kFchmodat2,
+    SCMP_SYS(chown),        SCMP_SYS(fchown),    SCMP_SYS(lchown),       SCMP_SYS(fchownat),
+    SCMP_SYS(utime),        SCMP_SYS(utimes),    SCMP_SYS(futimesat),    SCMP_SYS(utimensat),
+    SCMP_SYS(setxattr),     SCMP_SYS(lsetxattr), SCMP_SYS(fsetxattr),    kSetxattrat,
+    SCMP_SYS(removexattr),  SCMP_SYS(mknod),     SCMP_SYS(lremovexattr), SCMP_SYS(mknodat),
+    SCMP_SYS(fremovexattr), SCMP_SYS(symlink),   kRemovexattrat,         SCMP_SYS(symlinkat),
+    kFileSetattr,           SCMP_SYS(link),      SCMP_SYS(linkat),       SCMP_SYS(truncate)};
+
+constexpr int kPrograms[] = {SCMP_SYS(execve), SCMP_SYS(execveat)};
+
+/// Rules of the kernel's filter of system calls, which lets pass what no rule is about. A call that
+/// this kind of processor does not have needs none.
+class SystemCallFilter {
+ public:
+  SystemCallFilter() : context_(seccomp_init(SCMP_ACT_ALLOW)) {}
+  ~SystemCallFilter() {
+    if (context_ != nullptr) {
+      seccomp_release(context_);
+    }
+  }
+  SystemCallFilter(const SystemCallFilter&) = delete;
+  SystemCallFilter& operator=(const SystemCallFilter&) = delete;
+
+  template <size_t count>
+  void Refuse(const int (&calls)[count]) {
+    for (const int call : calls) {
+      Add(kRefuse, call);
+    }
+  }
+
+  void Add(uint32_t action, int call) { Add(action, call, nullptr, 0); }
+  void RefuseWhen(int call, scmp_arg_cmp argument) { Add(kRefuse, call, &argument, 1); }
+
+  void Load() {
+    if (context_ == nullptr) {
+      return;
+    }
+    // Other calling conventions have other numbers; none of the programs uses them.
+    seccomp_attr_set(context_, SCMP_FLTATR_ACT_BADARCH, kRefuse);
+    // This process has no secrets from itself that would be worth to decode slower for.
+    seccomp_attr_set(context_, SCMP_FLTATR_CTL_SSB, 1);
+    seccomp_load(context_);
+  }
+
+ private:
+  void Add(uint32_t action, int call, const scmp_arg_cmp* arguments, unsigned count) {
+    if (context_ != nullptr) {
+      seccomp_rule_add_array(context_, action, call, count, arguments);
+    }
+  }
+
+  scmp_filter_ctx context_;
+};
+
+scmp_arg_cmp Compare(unsigned place, scmp_compare comparison, uint64_t first, uint64_t second = 0) {
+  return {place, comparison, first, second};
+}
+
+}  // namespace
+
+void RefuseForeignSystemCalls() {
+  SystemCallFilter filter;
+  filter.Refuse(kNetwork);
+  filter.Refuse(kOtherProcesses);
+  filter.Refuse(kSystem);
+  filter.Refuse(kFileAttributes);
+  // A namespace of its own would give privileges back.
+  filter.RefuseWhen(SCMP_SYS(clone), Compare(0, SCMP_CMP_MASKED_EQ, CLONE_NEWUSER, CLONE_NEWUSER));
+  filter.Add(kUnknown, SCMP_SYS(clone3));
+  // Types into the terminal that the program was started from.
+  filter.RefuseWhen(SCMP_SYS(ioctl), Compare(1, SCMP_CMP_MASKED_EQ, UINT32_MAX, TIOCSTI));
+  filter.Load();
+}
+
+void RefuseOtherPrograms() {
+  const auto self = static_cast<uint64_t>(getpid());
+  SystemCallFilter filter;
+  filter.Refuse(kPrograms);
+  for (const int call : {SCMP_SYS(kill), SCMP_SYS(tgkill)}) {
+    filter.RefuseWhen(call, Compare(0, SCMP_CMP_NE, self));
+  }
+  filter.Add(kRefuse, SCMP_SYS(tkill));
+  filter.Load();
+}

@@ -1,0 +1,6 @@
+// Tells where a GIF's first frame lies, which libvips does not.
+#pragma once
+
+/// Whether the first frame of the file under `descriptor` takes up the whole picture. False also
+/// when that cannot be told. Leaves the place where the descriptor reads alone.
+bool FirstFrameFillsGif(int descriptor);

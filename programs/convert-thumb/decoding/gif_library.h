@@ -1,0 +1,26 @@
+// What is used of giflib, which is loaded for a GIF and not with the program.
+#pragma once
+
+#include <gif_lib.h>
+
+/// The functions of giflib that are used.
+class GifLibrary {
+ public:
+  /// Returns the library, loaded by the first call; null when it, or a function of it, is missing.
+  static const GifLibrary* Get();
+
+  decltype(&::DGifOpen) open = nullptr;
+  decltype(&::DGifCloseFile) close = nullptr;
+  decltype(&::DGifGetRecordType) getRecordType = nullptr;
+  decltype(&::DGifGetImageDesc) getImage = nullptr;
+  decltype(&::DGifGetExtension) getExtension = nullptr;
+  decltype(&::DGifGetExtensionNext) getExtensionNext = nullptr;
+
+ private:
+  GifLibrary();
+
+  template <typename Function>
+  void Find(void* library, const char* name, Function& function);
+
+  bool isLoaded_ = false;
+};

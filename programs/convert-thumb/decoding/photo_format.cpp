@@ -1,0 +1,51 @@
+#include "decoding/photo_format.h"
+
+#include <unistd.h>
+
+#include <cstddef>
+#include <string>
+#include <string_view>
+
+namespace {
+
+using std::literals::string_view_literals::operator""sv;
+
+constexpr size_t kBeginning = 16;
+
+struct Signature {
+  size_t offset;
+  std::string_view bytes;
+  PhotoFormat format;
+};
+
+constexpr Signature kSignatures[] = {
+    {0, "\xFF\xD8\xFF"sv, PhotoFormat::kJpeg},
+    {0, "\x89PNG\r\n\x1A\n"sv, PhotoFormat::kPng},
+    {0, "II*\0"sv, PhotoFormat::kTiff},
+    {0, "MM\0*"sv, PhotoFormat::kTiff},
+    {0, "P5"sv, PhotoFormat::kPnm},
+    {0, "P6"sv, PhotoFormat::kPnm},
+    {0, "GIF87a"sv, PhotoFormat::kGif},
+    {0, "GIF89a"sv, PhotoFormat::kGif},
+    {8, "WEBPVP8"sv, PhotoFormat::kWebp},
+    {4, "ftypheic"sv, PhotoFormat::kHeif},
+    {4, "ftypheix"sv, PhotoFormat::kHeif},
+    {4, "ftypmif1"sv, PhotoFormat::kHeif},
+    {4, "ftypavif"sv, PhotoFormat::kHeif},
+    {4, "jP  \r\n\x87\n"sv, PhotoFormat::kJpeg2000},
+};
+
+}  // namespace
+
+PhotoFormat FormatOf(int descriptor) {
+  char buffer[kBeginning];
+  const ssize_t count = pread(descriptor, buffer, sizeof buffer, 0);
+  const std::string_view beginning(buffer, count > 0 ? static_cast<size_t>(count) : 0);
+  for (const Signature& signature : kSignatures) {
+    if (beginning.size() >= signature.offset &&
+        beginning.compare(signature.offset, signature.bytes.size(), signature.bytes) == 0) {
+      return signature.format;
+    }
+  }
+  return PhotoFormat::kUnknown;
+}

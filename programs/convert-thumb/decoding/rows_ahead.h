@@ -1,0 +1,49 @@
+// Decodes a photo in a thread of its own, a few rows ahead of the one that scales it.
+#pragma once
+
+#include <condition_variable>
+#include <cstddef>
+#include <cstdint>
+#include <mutex>
+#include <thread>
+#include <vector>
+
+#include "decoding/photo_reader.h"
+#include "picture/row_source.h"
+
+class RowsAhead final : public RowSource {
+ public:
+  /// The rows of a reader that has been started. Until this object ends, nobody else may use the
+  /// reader but to ask for its sizes.
+  explicit RowsAhead(PhotoReader& reader);
+  ~RowsAhead() override;
+  RowsAhead(const RowsAhead&) = delete;
+  RowsAhead& operator=(const RowsAhead&) = delete;
+
+  int Width() const override { return reader_.Width(); }
+  int Height() const override { return reader_.Height(); }
+  int Channels() const override { return reader_.Channels(); }
+  bool ReadRow(float* row) override;
+
+ private:
+  void StartThread();
+  void DecodeBatches() noexcept;
+  bool WaitForRoom(int batch);
+  bool DecodeBatch(int batch);
+  bool WaitForBatch(int batch);
+  uint8_t* Row(int y);
+
+  PhotoReader& reader_;
+  size_t rowSize_;   ///< samples
+  size_t rowBytes_;  ///< as decoded
+  std::vector<uint8_t> rows_;
+  int next_ = 0;  ///< row to be read
+
+  std::mutex mutex_;  ///< of all below but the thread itself
+  std::condition_variable changed_;
+  int decoded_ = 0;   ///< batches that can be read
+  int released_ = 0;  ///< batches that have been read
+  bool failed_ = false;
+  bool stopped_ = false;
+  std::thread thread_;
+};

@@ -1,0 +1,107 @@
+#include "decoding/vips_library.h"
+
+#include <dlfcn.h>
+#include <gmodule.h>
+
+#include <cstdlib>
+#include <string>
+
+namespace {
+
+constexpr char kLibraryName[] = "libvips.so.42";
+constexpr char kProgramName[] = "convert-thumb";
+/// Where libvips looks for modules; scanning them takes longer than a thumbnail.
+constexpr char kModulesVariable[] = "VIPSHOME";
+constexpr char kNoDirectory[] = "/dev/null";
+
+/// Damage is told by the results of calls.
+void IgnoreMessage(const gchar*, GLogLevelFlags, const gchar*, gpointer) {}
+
+/// The directory of the file that `function` comes from, with its last slash.
+std::string DirectoryOf(const void* function) {
+  Dl_info info = {};
+  if (dladdr(function, &info) == 0 || info.dli_fname == nullptr) {
+    return "";
+  }
+  const std::string file = info.dli_fname;
+  return file.substr(0, file.rfind('/') + 1);
+}
+
+}  // namespace
+
+template <typename Function>
+void VipsLibrary::Find(const char* name, Function& function) {
+  // Also finds what the libraries below it define.
+  function = reinterpret_cast<Function>(dlsym(library_, name));
+  isLoaded_ = isLoaded_ && function != nullptr;
+}
+
+VipsLibrary::VipsLibrary() : library_(dlopen(kLibraryName, RTLD_LAZY | RTLD_LOCAL)) {
+  if (library_ == nullptr) {
+    return;
+  }
+  isLoaded_ = true;
+  Find("vips_source_new_from_descriptor", openDescriptor);
+  Find("vips_pngload_source", loadPng);
+  Find("vips_tiffload_source", loadTiff);
+  Find("vips_gifload_source", loadGif);
+  Find("vips_webpload_source", loadWebp);
+  Find("vips_heifload_source", loadHeif);
+  Find("vips_jp2kload_source", loadJpeg2000);
+  Find("vips_image_get_typeof", typeOf);
+  Find("vips_image_get_int", getInt);
+  Find("vips_image_get_blob", getBlob);
+  Find("vips_image_get_array_double", getDoubles);
+  Find("vips_region_new", newRegion);
+  Find("vips_region_prepare", prepareRegion);
+  Find("vips_error_buffer", errorBuffer);
+  Find("g_object_unref", unref);
+  Find("png_create_read_struct", createPng);
+  Find("png_create_info_struct", createPngInfo);
+  Find("png_destroy_read_struct", destroyPng);
+  Find("png_set_longjmp_fn", setPngJump);
+  Find("png_longjmp", leavePng);
+  Find("png_set_read_fn", setPngReader);
+  Find("png_set_chunk_malloc_max", limitPngChunks);
+  Find("png_set_keep_unknown_chunks", skipPngChunks);
+  Find("png_get_io_ptr", getPngInput);
+  Find("png_read_info", readPngInfo);
+  Find("png_get_bit_depth", getPngDepth);
+  Find("png_get_gAMA_fixed", getPngGamma);
+  Find("png_get_pHYs", getPngDensity);
+  Find("TIFFFdOpen", openTiff);
+  Find("TIFFGetField", getTiffField);
+  Find("TIFFClose", closeTiff);
+  Find("vips_init", initialise_);
+  Find("vips_version", version_);
+  Find("vips_cache_set_max", setCache_);
+  Find("vips_concurrency_set", setConcurrency_);
+  Find("g_log_set_default_handler", setLogHandler_);
+  Find("g_module_open", openModule_);
+  isLoaded_ = isLoaded_ && Start();
+}
+
+bool VipsLibrary::Start() {
+  setLogHandler_(IgnoreMessage, nullptr);
+  setenv(kModulesVariable, kNoDirectory, 1);
+  const bool started = initialise_(kProgramName) == 0;
+  unsetenv(kModulesVariable);
+  if (started) {
+    // Every picture is read once, by a thread of its own.
+    setCache_(0);
+    setConcurrency_(1);
+  }
+  return started;
+}
+
+void VipsLibrary::LoadHeifModule() const {
+  const std::string path = DirectoryOf(reinterpret_cast<const void*>(initialise_)) +
+                           "vips-modules-" + std::to_string(version_(0)) + "." +
+                           std::to_string(version_(1)) + "/vips-heif.so";
+  openModule_(path.c_str(), G_MODULE_BIND_LAZY);
+}
+
+const VipsLibrary* VipsLibrary::Get() {
+  static const VipsLibrary library;
+  return library.isLoaded_ ? &library : nullptr;
+}

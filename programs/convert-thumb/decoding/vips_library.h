@@ -1,0 +1,66 @@
+// What is used of libvips, which is loaded for a photo that needs it and not with the program:
+// loading it takes many times as long as a JPEG's thumbnails.
+#pragma once
+
+#include <png.h>
+#include <tiffio.h>
+#include <vips/vips.h>
+
+/// The functions of libvips, and of the libraries below it, that are used.
+class VipsLibrary {
+ public:
+  /// Returns the library, loaded and started by the first call, without its loadable modules; null
+  /// when it, or a function of it, is missing.
+  static const VipsLibrary* Get();
+
+  /// Loads the module that reads HEIC and AVIF; without it loadHeif fails.
+  void LoadHeifModule() const;
+
+  decltype(&::vips_source_new_from_descriptor) openDescriptor = nullptr;
+  decltype(&::vips_pngload_source) loadPng = nullptr;
+  decltype(&::vips_tiffload_source) loadTiff = nullptr;
+  decltype(&::vips_gifload_source) loadGif = nullptr;
+  decltype(&::vips_webpload_source) loadWebp = nullptr;
+  decltype(&::vips_heifload_source) loadHeif = nullptr;
+  decltype(&::vips_jp2kload_source) loadJpeg2000 = nullptr;
+  decltype(&::vips_image_get_typeof) typeOf = nullptr;
+  decltype(&::vips_image_get_int) getInt = nullptr;
+  decltype(&::vips_image_get_blob) getBlob = nullptr;
+  decltype(&::vips_image_get_array_double) getDoubles = nullptr;
+  decltype(&::vips_region_new) newRegion = nullptr;
+  decltype(&::vips_region_prepare) prepareRegion = nullptr;
+  decltype(&::vips_error_buffer) errorBuffer = nullptr;
+  decltype(&::g_object_unref) unref = nullptr;
+  decltype(&::png_create_read_struct) createPng = nullptr;
+  decltype(&::png_create_info_struct) createPngInfo = nullptr;
+  decltype(&::png_destroy_read_struct) destroyPng = nullptr;
+  decltype(&::png_set_longjmp_fn) setPngJump = nullptr;
+  decltype(&::png_longjmp) leavePng = nullptr;
+  decltype(&::png_set_read_fn) setPngReader = nullptr;
+  decltype(&::png_set_chunk_malloc_max) limitPngChunks = nullptr;
+  decltype(&::png_set_keep_unknown_chunks) skipPngChunks = nullptr;
+  decltype(&::png_get_io_ptr) getPngInput = nullptr;
+  decltype(&::png_read_info) readPngInfo = nullptr;
+  decltype(&::png_get_bit_depth) getPngDepth = nullptr;
+  decltype(&::png_get_gAMA_fixed) getPngGamma = nullptr;
+  decltype(&::png_get_pHYs) getPngDensity = nullptr;
+  decltype(&::TIFFFdOpen) openTiff = nullptr;
+  decltype(&::TIFFGetField) getTiffField = nullptr;
+  decltype(&::TIFFClose) closeTiff = nullptr;
+
+ private:
+  VipsLibrary();
+
+  template <typename Function>
+  void Find(const char* name, Function& function);
+  bool Start();
+
+  void* library_ = nullptr;
+  decltype(&::vips_init) initialise_ = nullptr;
+  decltype(&::vips_version) version_ = nullptr;
+  decltype(&::vips_cache_set_max) setCache_ = nullptr;
+  decltype(&::vips_concurrency_set) setConcurrency_ = nullptr;
+  decltype(&::g_log_set_default_handler) setLogHandler_ = nullptr;
+  decltype(&::g_module_open) openModule_ = nullptr;
+  bool isLoaded_ = false;
+};

@@ -1,0 +1,298 @@
+#include "decoding/vips_reader.h"
+
+#include <algorithm>
+#include <optional>
+#include <string>
+
+#include "decoding/gif_frame.h"
+#include "decoding/pixel_rows.h"
+#include "decoding/png_header.h"
+#include "decoding/tiff_colours.h"
+#include "decoding/vips_library.h"
+#include "decoding/vips_traits.h"
+#include "picture/picture.h"
+
+namespace {
+
+constexpr uint64_t kMostPixels = 1000000000;
+/// What the decoders that go from top to bottom hand out at a time.
+constexpr int kStripRows = 16;
+constexpr Background kWhite = {kBrightest, kBrightest, kBrightest};
+constexpr char kInterlaced[] = "interlaced";
+
+VipsImage* Load(const VipsLibrary& vips, VipsSource* source, PhotoFormat format) {
+  VipsImage* image = nullptr;
+  const auto load = [&](auto loader) {
+    loader(source, &image, "access", VIPS_ACCESS_SEQUENTIAL, "fail_on", VIPS_FAIL_ON_ERROR,
+           nullptr);
+  };
+  switch (format) {
+    case PhotoFormat::kPng:
+      load(vips.loadPng);
+      break;
+    case PhotoFormat::kTiff:
+      load(vips.loadTiff);
+      break;
+    case PhotoFormat::kGif:
+      load(vips.loadGif);
+      break;
+    case PhotoFormat::kWebp:
+      load(vips.loadWebp);
+      break;
+    case PhotoFormat::kHeif:
+      vips.LoadHeifModule();
+      load(vips.loadHeif);
+      break;
+    case PhotoFormat::kJpeg2000:
+      load(vips.loadJpeg2000);
+      break;
+    default:
+      break;
+  }
+  return image;
+}
+
+/// Whether rows of these samples can be made into a photo's.
+bool HasUsualSamples(const VipsImage& image) {
+  const bool wide = image.BandFmt == VIPS_FORMAT_USHORT;
+  if ((image.BandFmt != VIPS_FORMAT_UCHAR && !wide) || image.Coding != VIPS_CODING_NONE) {
+    return false;
+  }
+  switch (image.Type) {
+    case VIPS_INTERPRETATION_B_W:
+    case VIPS_INTERPRETATION_GREY16:
+      return image.Bands == 1 || image.Bands == 2;
+    case VIPS_INTERPRETATION_sRGB:
+    case VIPS_INTERPRETATION_RGB16:
+      return image.Bands == 3 || image.Bands == 4;
+    case VIPS_INTERPRETATION_CMYK:
+      return image.Bands == 4;
+    default:
+      return false;
+  }
+}
+
+bool HasOpacity(const VipsImage& image) {
+  return image.Bands == 2 || (image.Bands == 4 && image.Type != VIPS_INTERPRETATION_CMYK);
+}
+
+}  // namespace
+
+struct VipsReader::State {
+  const VipsLibrary* vips = nullptr;
+  VipsSourceFile file;
+  size_t memoryLimit = 0;
+  VipsSource* source = nullptr;
+  VipsImage* image = nullptr;
+  VipsRegion* region = nullptr;
+  TiffColours tiffColours = TiffColours::kUsual;
+  PngHeader pngHeader;
+  PhotoTraits traits;
+  RowChange change = RowChange::kNone;
+  Background background = kWhite;
+  int next = 0;      ///< row to be read
+  int prepared = 0;  ///< end of the rows in the region
+  std::string error;
+
+  ~State() {
+    Release(region);
+    Release(image);
+    Release(source);
+  }
+
+  template <typename Object>
+  void Release(Object* object) {
+    if (object != nullptr) {
+      vips->unref(object);
+    }
+  }
+
+  uint64_t Pixels() const {
+    return static_cast<uint64_t>(image->Xsize) * static_cast<uint64_t>(image->Ysize);
+  }
+
+  size_t SampleBytes() const {
+    return image->BandFmt == VIPS_FORMAT_USHORT ? sizeof(uint16_t) : sizeof(uint8_t);
+  }
+
+  /// What decoding takes in memory besides a few rows.
+  uint64_t WholePictureBytes() const {
+    const bool interlaced = HasVipsField(*vips, image, kInterlaced);
+    const bool streamed =
+        file.format == PhotoFormat::kTiff || (file.format == PhotoFormat::kPng && !interlaced);
+    return streamed ? 0 : Pixels() * static_cast<uint64_t>(image->Bands) * SampleBytes();
+  }
+
+  bool TakePngHeader() {
+    const std::optional<PngHeader> header = ReadPngHeader(*vips, file.descriptor);
+    pngHeader = header.value_or(PngHeader());
+    return header && !header->linear;
+  }
+
+  /// Whether libvips reads the file as ImageMagick does, as far as it does not tell itself.
+  bool IsReadAsMeant() {
+    switch (file.format) {
+      case PhotoFormat::kTiff:
+        tiffColours = ReadTiffColours(*vips, file.descriptor);
+        return tiffColours != TiffColours::kUnusual;
+      case PhotoFormat::kPng:
+        return TakePngHeader();
+      case PhotoFormat::kGif:
+        return FirstFrameFillsGif(file.descriptor);
+      default:
+        return true;
+    }
+  }
+
+  bool Open() {
+    source = vips->openDescriptor(file.descriptor);
+    image = source == nullptr ? nullptr : Load(*vips, source, file.format);
+    return image != nullptr;
+  }
+
+  bool IsDecodable() const {
+    return HasUsualSamples(*image) && Pixels() <= kMostPixels &&
+           (file.firstPageOnly || !HasFurtherPages(*vips, image, file.format));
+  }
+
+  void TakeTraits() {
+    traits = ReadVipsTraits(*vips, image, file.format);
+    traits.palette = traits.palette || tiffColours == TiffColours::kPalette;
+    if (file.format == PhotoFormat::kPng) {
+      traits.density = pngHeader.density;
+    }
+  }
+
+  /// Opacity is ignored. What the file stores are brightness and colour differences, which
+  /// ImageMagick makes red, green and blue of first only where a profile says which.
+  void ChooseHeifChange() {
+    if (traits.colourProfile.empty()) {
+      change = RowChange::kLumaChroma;
+      traits.space = ColourSpace::kLumaChroma;
+    } else {
+      change = RowChange::kThroughLumaChroma;
+    }
+  }
+
+  void ChooseChange() {
+    if (file.format == PhotoFormat::kHeif) {
+      ChooseHeifChange();
+    } else if (image->Type == VIPS_INTERPRETATION_CMYK) {
+      change = RowChange::kInvert;
+      traits.space = ColourSpace::kInks;
+    } else if (HasOpacity(*image)) {
+      change = RowChange::kOnBackground;
+      background = ReadVipsBackground(*vips, image, std::min(pngHeader.bitDepth, 8));
+      traits.transparent = true;
+    }
+    if (ChangedBands(change, image->Bands) == 1) {
+      traits.space = ColourSpace::kGrey;
+    }
+  }
+
+  const uint8_t* Row(int y) const {
+    return region->data + static_cast<size_t>(y - region->valid.top) * VIPS_REGION_LSKIP(region);
+  }
+
+  void TakeError() {
+    error = vips->errorBuffer();
+    error.erase(std::min(error.find('\n'), error.size()));
+  }
+
+  /// ImageMagick makes pictures of most damaged GIFs, so it gets what libvips cannot decode.
+  bool IsDamagedGif() {
+    if (file.format != PhotoFormat::kGif || WholePictureBytes() > memoryLimit) {
+      return false;
+    }
+    const bool damaged = !PrepareRows();
+    prepared = 0;
+    Release(region);
+    region = nullptr;
+    return damaged;
+  }
+
+  bool PrepareRows() {
+    // The library's objects belong to the thread that makes them, and rows may be read by another
+    // one than the header.
+    if (region == nullptr) {
+      region = vips->newRegion(image);
+    }
+    const VipsRect rows = {0, next, image->Xsize, std::min(kStripRows, image->Ysize - next)};
+    if (region == nullptr || vips->prepareRegion(region, &rows) != 0) {
+      TakeError();
+      return false;
+    }
+    prepared = next + rows.height;
+    return true;
+  }
+};
+
+VipsReader::VipsReader(const VipsSourceFile& file, size_t memoryLimit)
+    : state_(std::make_unique<State>()) {
+  state_->file = file;
+  state_->memoryLimit = memoryLimit;
+}
+
+VipsReader::~VipsReader() = default;
+
+bool VipsReader::ReadHeader() {
+  State& state = *state_;
+  state.vips = VipsLibrary::Get();
+  if (state.vips == nullptr) {
+    return false;
+  }
+  if (!state.IsReadAsMeant() || !state.Open() || !state.IsDecodable()) {
+    return false;
+  }
+  state.TakeTraits();
+  state.ChooseChange();
+  return !state.IsDamagedGif();
+}
+
+PictureSize VipsReader::FullSize() const {
+  return {state_->image->Xsize, state_->image->Ysize};
+}
+
+const PhotoTraits& VipsReader::Traits() const {
+  return state_->traits;
+}
+
+bool VipsReader::Start(PictureSize) {
+  if (state_->WholePictureBytes() > state_->memoryLimit) {
+    state_->error = "it would take too much memory";
+    return false;
+  }
+  return true;
+}
+
+int VipsReader::Width() const {
+  return state_->image->Xsize;
+}
+
+int VipsReader::Height() const {
+  return state_->image->Ysize;
+}
+
+int VipsReader::Channels() const {
+  return ChangedBands(state_->change, state_->image->Bands);
+}
+
+size_t VipsReader::SampleSize() const {
+  return ChangedSampleSize(state_->change, state_->SampleBytes());
+}
+
+bool VipsReader::ReadRow(uint8_t* row) {
+  State& state = *state_;
+  if (state.next >= state.prepared && !state.PrepareRows()) {
+    return false;
+  }
+  const DecodedRow decoded = {state.Row(state.next), Width(), state.image->Bands,
+                              state.SampleBytes()};
+  ChangeRow(decoded, state.change, state.background, row);
+  ++state.next;
+  return true;
+}
+
+const char* VipsReader::Error() const {
+  return state_->error.c_str();
+}

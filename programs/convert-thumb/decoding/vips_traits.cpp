@@ -1,0 +1,103 @@
+#include "decoding/vips_traits.h"
+
+#include <algorithm>
+
+#include "decoding/exif_traits.h"
+#include "picture/picture.h"
+
+namespace {
+
+constexpr char kBackground[] = "background";
+constexpr char kPaletteDepth[] = "palette-bit-depth";
+constexpr double kMillimetresPerInch = 25.4;
+constexpr double kMillimetresPerCentimetre = 10;
+constexpr double kLargestDensity = 65535;
+/// What turning a density into millimetres and back may lose.
+constexpr double kDensityError = 1e-3;
+constexpr int kPerInch = 1;
+constexpr int kPerCentimetre = 2;
+
+std::vector<uint8_t> BlobOf(const VipsLibrary& vips, VipsImage* image, const char* name) {
+  const void* data = nullptr;
+  size_t size = 0;
+  if (!HasVipsField(vips, image, name) || vips.getBlob(image, name, &data, &size) != 0) {
+    return {};
+  }
+  const auto* const bytes = static_cast<const uint8_t*>(data);
+  return std::vector<uint8_t>(bytes, bytes + size);
+}
+
+int IntOf(const VipsLibrary& vips, VipsImage* image, const char* name, int otherwise) {
+  int value = otherwise;
+  if (HasVipsField(vips, image, name)) {
+    vips.getInt(image, name, &value);
+  }
+  return value;
+}
+
+int ToDensity(double perMillimetre, double millimetres) {
+  return static_cast<int>(
+      std::clamp(perMillimetre * millimetres + kDensityError, 0.0, kLargestDensity));
+}
+
+void TakeDensity(const VipsImage& image, PhotoFormat format, JpegDensity& density) {
+  // One in a millimetre is what a picture without any density has.
+  if (image.Xres == 1 && image.Yres == 1) {
+    return;
+  }
+  const bool inches = format == PhotoFormat::kTiff;
+  const double unit = inches ? kMillimetresPerInch : kMillimetresPerCentimetre;
+  density.unit = inches ? kPerInch : kPerCentimetre;
+  density.x = ToDensity(image.Xres, unit);
+  density.y = ToDensity(image.Yres, unit);
+}
+
+bool IsPalette(const VipsLibrary& vips, VipsImage* image, PhotoFormat format) {
+  const bool fewGreys = format == PhotoFormat::kPng && image->Type == VIPS_INTERPRETATION_B_W;
+  return fewGreys || HasVipsField(vips, image, kPaletteDepth);
+}
+
+}  // namespace
+
+bool HasVipsField(const VipsLibrary& vips, VipsImage* image, const char* name) {
+  return vips.typeOf(image, name) != 0;
+}
+
+bool HasFurtherPages(const VipsLibrary& vips, VipsImage* image, PhotoFormat format) {
+  // Of JPEG 2000 the sizes that can be decoded are counted.
+  return format != PhotoFormat::kJpeg2000 && IntOf(vips, image, VIPS_META_N_PAGES, 1) > 1;
+}
+
+Background ReadVipsBackground(const VipsLibrary& vips, VipsImage* image, int bits) {
+  Background background = {kBrightest, kBrightest, kBrightest};
+  double* samples = nullptr;
+  int count = 0;
+  if (!HasVipsField(vips, image, kBackground) ||
+      vips.getDoubles(image, kBackground, &samples, &count) != 0 || count < 1) {
+    return background;
+  }
+  // Grey is told as it is stored; of 16 bits only the upper 8.
+  const double end = (1 << (count == 1 ? bits : 8)) - 1;
+  for (size_t i = 0; i < background.size(); ++i) {
+    const double sample = samples[std::min(i, static_cast<size_t>(count) - 1)];
+    background[i] = static_cast<float>(std::clamp(sample / end, 0.0, 1.0)) * kBrightest;
+  }
+  return background;
+}
+
+PhotoTraits ReadVipsTraits(const VipsLibrary& vips, VipsImage* image, PhotoFormat format) {
+  PhotoTraits traits;
+  traits.palette = IsPalette(vips, image, format);
+  traits.colourProfile = BlobOf(vips, image, VIPS_META_ICC_NAME);
+  traits.orientation = IntOf(vips, image, VIPS_META_ORIENTATION, 1);
+  TakeDensity(*image, format, traits.density);
+  const std::vector<uint8_t> exif = BlobOf(vips, image, VIPS_META_EXIF_NAME);
+  if (!exif.empty() && format != PhotoFormat::kPng) {
+    TakeExifTraits(exif.data(), exif.size(), traits);
+  }
+  if (format == PhotoFormat::kHeif || format == PhotoFormat::kPng) {
+    // Of HEIF the decoder has turned the picture already; of PNG ImageMagick ignores this.
+    traits.orientation = 1;
+  }
+  return traits;
+}

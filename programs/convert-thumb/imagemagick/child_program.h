@@ -1,0 +1,7 @@
+// Runs another program in a child that this process stands for.
+#pragma once
+
+/// Starts `program` with these arguments (closed by a null) and ends this process the way the child
+/// ends: with its status or by its signal. SIGTERM, SIGINT, SIGHUP and SIGQUIT are passed on to it,
+/// and it is killed when this process is. Returns only when there is no child, with errno set.
+void StandForProgram(const char* program, char* const* arguments);

@@ -1,0 +1,50 @@
+#include "imagemagick/image_magick_limits.h"
+
+#include <cmath>
+#include <cstdlib>
+#include <cstring>
+#include <string>
+
+namespace {
+
+constexpr char kInMemory[] = "MAGICK_MEMORY_LIMIT";
+/// In files that are mapped, whose memory the kernel can take back. What is larger is read and
+/// written piece by piece, which takes five times as long.
+constexpr char kInMappedFiles[] = "MAGICK_MAP_LIMIT";
+
+/// The bytes that a text such as "64MiB" stands for; less than 0 for none.
+double Bytes(const char* text) {
+  constexpr char kPrefixes[] = "kmgt";
+  constexpr double kThousand = 1000;
+  constexpr double kBinaryThousand = 1024;
+  char* end = nullptr;
+  const double number = std::strtod(text, &end);
+  if (end == text) {
+    return -1;
+  }
+  const char letter = *end == '\0' ? '\0' : static_cast<char>(*end | 0x20);
+  const char* const prefix = letter == '\0' ? nullptr : std::strchr(kPrefixes, letter);
+  if (prefix == nullptr) {
+    return number;
+  }
+  const double unit = end[1] == 'i' || end[1] == 'I' ? kBinaryThousand : kThousand;
+  return number * std::pow(unit, static_cast<double>(prefix - kPrefixes + 1));
+}
+
+bool IsLower(const char* text, size_t limit) {
+  const double bytes = text == nullptr ? -1 : Bytes(text);
+  return bytes >= 0 && bytes <= static_cast<double>(limit);
+}
+
+void LimitTo(size_t limit, const char* variable) {
+  if (!IsLower(std::getenv(variable), limit)) {
+    setenv(variable, std::to_string(limit).c_str(), 1);
+  }
+}
+
+}  // namespace
+
+void LimitImageMagick(size_t memoryLimit) {
+  LimitTo(memoryLimit / 2, kInMemory);
+  LimitTo(memoryLimit, kInMappedFiles);
+}

@@ -1,0 +1,40 @@
+// A picture that is read row by row.
+#pragma once
+
+#include "picture/picture.h"
+#include "picture/sample_loops.h"
+
+class RowSource {
+ public:
+  virtual ~RowSource() = default;
+  virtual int Width() const = 0;     ///< pixels
+  virtual int Height() const = 0;    ///< pixels
+  virtual int Channels() const = 0;  ///< 1, 3 or 4
+
+  /// Writes the next row from the top to `row`, which has room for Width() * Channels() samples
+  /// from 0 to kBrightest. False when it cannot be read. Called at most Height() times.
+  virtual bool ReadRow(float* row) = 0;
+
+ protected:
+  RowSource() = default;
+  RowSource(const RowSource&) = default;
+  RowSource& operator=(const RowSource&) = default;
+};
+
+/// The rows of a picture in memory, which has to outlive this.
+class PictureRows final : public RowSource {
+ public:
+  explicit PictureRows(const Picture& picture) : picture_(picture) {}
+
+  int Width() const override { return picture_.width; }
+  int Height() const override { return picture_.height; }
+  int Channels() const override { return picture_.channels; }
+  bool ReadRow(float* row) override {
+    WidenRow(picture_.Row(next_++), row, picture_.RowSize());
+    return true;
+  }
+
+ private:
+  const Picture& picture_;
+  int next_ = 0;
+};

@@ -1,0 +1,304 @@
+// What the converter cannot do any more once it looks at a photo.
+
+#include <fcntl.h>
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+#include <linux/landlock.h>
+#include <linux/seccomp.h>
+#include <sched.h>
+#include <sys/mount.h>
+#include <sys/prctl.h>
+#include <sys/ptrace.h>
+#include <sys/resource.h>
+#include <sys/socket.h>
+#include <sys/stat.h>
+#include <sys/syscall.h>
+#include <sys/uio.h>
+#include <sys/wait.h>
+#include <sys/xattr.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <csignal>
+#include <functional>
+#include <system_error>
+#include <thread>
+
+#include "confinement/confinement.h"
+#include "converter_fixture.h"
+#include "support/files.h"
+#include "support/images.h"
+#include "support/seccomp_fail.h"
+
+namespace vela_test {
+namespace {
+
+constexpr char kInside[] = "/tmp/inside";
+constexpr char kOutside[] = "/tmp/outside";
+
+/// The errno of a call that failed, 0 of one that did not.
+int ErrorOf(long result) {
+  return result < 0 ? errno : 0;
+}
+
+/// What `attempt` returns (0 to 255) in a process of its own.
+int InChild(const std::function<int()>& attempt) {
+  const pid_t child = fork();
+  if (child == 0) {
+    _exit(attempt());
+  }
+  int status = 0;
+  EXPECT_EQ(waitpid(child, &status, 0), child);
+  EXPECT_TRUE(WIFEXITED(status));
+  return WEXITSTATUS(status);
+}
+
+/// The same once the process has been confined to kInside.
+int Confined(const std::function<int()>& attempt) {
+  return InChild([&attempt] {
+    Confine({{kInside}, {"/dev/null", std::string(kInside) + "/link"}});
+    return attempt();
+  });
+}
+
+int ErrorOfOpening(const std::string& path, int flags) {
+  return ErrorOf(open(path.c_str(), flags | O_CLOEXEC, 0600));
+}
+
+/// What the kernel of this machine answers to changes outside.
+int ErrorOutside() {
+  const long version =
+      syscall(SYS_landlock_create_ruleset, nullptr, 0, LANDLOCK_CREATE_RULESET_VERSION);
+  return version < 1 ? 0 : EACCES;
+}
+
+class Confinement : public ConverterTest {
+ protected:
+  void SetUp() override {
+    ConverterTest::SetUp();
+    for (const std::string directory : {kInside, kOutside}) {
+      MakeDirectories(directory);
+      WriteFile(directory + "/file", "content");
+    }
+  }
+};
+
+TEST_F(Confinement, ChangesFilesInside) {
+  EXPECT_EQ(Confined([] { return ErrorOfOpening("/tmp/inside/new", O_WRONLY | O_CREAT); }), 0);
+  EXPECT_TRUE(Exists("/tmp/inside/new"));
+  EXPECT_EQ(Confined([] { return ErrorOfOpening("/tmp/inside/file", O_WRONLY | O_TRUNC); }), 0);
+  EXPECT_EQ(ReadFile("/tmp/inside/file"), "");
+  EXPECT_EQ(Confined([] { return ErrorOf(rename("/tmp/inside/new", "/tmp/inside/file")); }), 0);
+  EXPECT_EQ(Confined([] { return ErrorOf(unlink("/tmp/inside/file")); }), 0);
+  EXPECT_FALSE(Exists("/tmp/inside/file"));
+  EXPECT_EQ(Confined([] { return ErrorOfOpening("/dev/null", O_WRONLY); }), 0);
+}
+
+TEST_F(Confinement, ChangesNoFilesElsewhere) {
+  const int error = ErrorOutside();
+  EXPECT_EQ(Confined([] { return ErrorOfOpening("/tmp/outside/new", O_WRONLY | O_CREAT); }), error);
+  EXPECT_EQ(Confined([] { return ErrorOfOpening("/tmp/outside/file", O_RDWR); }), error);
+  EXPECT_EQ(Confined([] { return ErrorOfOpening("/tmp/outside/file", O_WRONLY | O_TRUNC); }),
+            error);
+  EXPECT_EQ(Confined([] { return ErrorOf(unlink("/tmp/outside/file")); }), error);
+  if (error != 0) {
+    EXPECT_EQ(ReadFile("/tmp/outside/file"), "content");
+    EXPECT_EQ(ListDirectory(kOutside), std::vector<std::string>{"file"});
+  }
+}
+
+TEST_F(Confinement, MovesNothingInOrOut) {
+  if (ErrorOutside() == 0) {
+    return;
+  }
+  EXPECT_NE(Confined([] { return ErrorOf(rename("/tmp/outside/file", "/tmp/inside/a")); }), 0);
+  EXPECT_NE(Confined([] { return ErrorOf(rename("/tmp/inside/file", "/tmp/outside/a")); }), 0);
+  EXPECT_NE(Confined([] { return ErrorOf(link("/tmp/outside/file", "/tmp/inside/a")); }), 0);
+  EXPECT_EQ(ListDirectory(kInside), std::vector<std::string>{"file"});
+}
+
+TEST_F(Confinement, MakesNothingButFiles) {
+  EXPECT_EQ(Confined([] { return ErrorOf(mkdir("/tmp/inside/a", 0700)); }), ErrorOutside());
+  EXPECT_EQ(Confined([] { return ErrorOf(symlink("/etc", "/tmp/inside/b")); }), EPERM);
+  EXPECT_EQ(Confined([] { return ErrorOf(mknod("/tmp/inside/c", S_IFIFO | 0600, 0)); }), EPERM);
+  EXPECT_EQ(Confined([] { return ErrorOf(link("/tmp/inside/file", "/tmp/inside/d")); }), EPERM);
+}
+
+TEST_F(Confinement, ReadsEverywhere) {
+  EXPECT_EQ(Confined([] { return ErrorOfOpening("/tmp/outside/file", O_RDONLY); }), 0);
+  EXPECT_EQ(Confined([] { return ErrorOfOpening("/etc", O_RDONLY | O_DIRECTORY); }), 0);
+}
+
+TEST_F(Confinement, ChangesTheFileBehindAnOutputThatIsALink) {
+  ASSERT_EQ(symlink("/tmp/outside/file", "/tmp/inside/link"), 0);
+  EXPECT_EQ(Confined([] { return ErrorOfOpening("/tmp/inside/link", O_WRONLY | O_TRUNC); }), 0);
+  EXPECT_EQ(ReadFile("/tmp/outside/file"), "");
+  EXPECT_EQ(Confined([] { return ErrorOf(unlink("/tmp/outside/file")); }), ErrorOutside());
+}
+
+TEST_F(Confinement, DoesNotOpenADirectoryThatAnOutputNames) {
+  ASSERT_EQ(symlink(kOutside, "/tmp/inside/link"), 0);
+  EXPECT_EQ(Confined([] { return ErrorOfOpening("/tmp/outside/new", O_WRONLY | O_CREAT); }),
+            ErrorOutside());
+}
+
+/// A system call that an unconfined process is not refused, whoever runs it.
+struct Call {
+  const char* name;
+  std::function<long()> make;
+};
+
+std::vector<Call> RefusedCalls() {
+  static int number = 0;
+  static iovec part = {&number, sizeof number};
+  return {
+      {"socket", [] { return socket(AF_INET, SOCK_STREAM, 0); }},
+      {"unix socket", [] { return socket(AF_UNIX, SOCK_STREAM, 0); }},
+      {"connect", [] { return connect(-1, nullptr, 0); }},
+      {"bind", [] { return bind(-1, nullptr, 0); }},
+#ifndef __SANITIZE_ADDRESS__
+      {"ptrace", [] { return ptrace(PTRACE_TRACEME, 0, nullptr, nullptr); }},
+#endif
+      {"process_vm_readv", [] { return process_vm_readv(getpid(), &part, 1, &part, 1, 0); }},
+      {"keyctl", [] { return syscall(SYS_keyctl, -1, 0, 0, 0, 0); }},
+      {"setns", [] { return setns(-1, 0); }},
+      {"unshare", [] { return unshare(0); }},
+      {"io_uring_enter", [] { return syscall(SYS_io_uring_enter, -1, 0, 0, 0, nullptr, 0); }},
+      {"fchmod", [] { return fchmod(-1, 0600); }},
+      {"chmod", [] { return chmod("/tmp/inside/file", 0666); }},
+      {"fchmodat2", [] { return syscall(452, -1, "", 0600, 0); }},
+      {"fchown", [] { return fchown(-1, 0, 0); }},
+      {"lchown", [] { return lchown("/tmp/inside/none", 0, 0); }},
+      {"utimensat", [] { return utimensat(AT_FDCWD, "/tmp/inside/file", nullptr, 0); }},
+      {"setxattr", [] { return setxattr("/tmp/inside/none", "user.a", "", 0, 0); }},
+      {"truncate", [] { return truncate("/tmp/inside/file", 1); }},
+      {"symlink", [] { return symlink("a", "/tmp/none/a"); }},
+      {"linkat", [] { return linkat(-1, "a", -1, "b", 0); }},
+      {"kcmp", [] { return syscall(SYS_kcmp, getpid(), getpid(), -1, 0, 0); }},
+      {"pidfd_send_signal", [] { return syscall(SYS_pidfd_send_signal, -1, 0, nullptr, 0); }},
+  };
+}
+
+TEST_F(Confinement, RefusesSystemCallsThatNobodyNeeds) {
+  for (const Call& call : RefusedCalls()) {
+    EXPECT_NE(InChild([&call] { return ErrorOf(call.make()); }), EPERM) << call.name;
+    EXPECT_EQ(Confined([&call] { return ErrorOf(call.make()); }), EPERM) << call.name;
+  }
+}
+
+TEST_F(Confinement, MakesNoNamespaces) {
+  EXPECT_EQ(
+      Confined([] { return ErrorOf(syscall(SYS_clone, CLONE_NEWUSER | SIGCHLD, 0, 0, 0, 0)); }),
+      EPERM);
+  EXPECT_EQ(Confined([] { return ErrorOf(syscall(SYS_clone3, nullptr, 0)); }), ENOSYS);
+}
+
+TEST_F(Confinement, GainsNoPrivileges) {
+  EXPECT_EQ(Confined([] { return prctl(PR_GET_NO_NEW_PRIVS, 0, 0, 0, 0); }), 1);
+}
+
+TEST_F(Confinement, LeavesNoMemoryImage) {
+  EXPECT_EQ(Confined([] {
+              rlimit limit = {};
+              getrlimit(RLIMIT_CORE, &limit);
+              return limit.rlim_cur <= 1 && limit.rlim_max <= 1 ? 1 : 0;
+            }),
+            1);
+}
+
+int StartThreadAndProgram() {
+  try {
+    std::thread([] {}).join();
+  } catch (const std::system_error& error) {
+    return error.code().value();
+  }
+  const pid_t child = fork();
+  if (child == 0) {
+    execl("/bin/true", "true", nullptr);
+    _exit(errno);
+  }
+  int status = 0;
+  waitpid(child, &status, 0);
+  return WEXITSTATUS(status);
+}
+
+TEST_F(Confinement, StartsThreadsAlwaysAndProgramsUntilNoneIsNeeded) {
+  EXPECT_EQ(Confined(StartThreadAndProgram), 0);
+  EXPECT_EQ(Confined([] {
+              ConfineToThisProgram();
+              return StartThreadAndProgram();
+            }),
+            EPERM);
+}
+
+TEST_F(Confinement, SignalsNobodyButItselfInTheEnd) {
+  EXPECT_EQ(Confined([] {
+              ConfineToThisProgram();
+              return ErrorOf(kill(getppid(), 0));
+            }),
+            EPERM);
+  EXPECT_EQ(Confined([] {
+              ConfineToThisProgram();
+              return ErrorOf(raise(0)) + ErrorOf(kill(getpid(), 0));
+            }),
+            0);
+}
+
+TEST_F(Confinement, WorksInsideAnother) {
+  EXPECT_EQ(Confined([] {
+              Confine({{kInside}, {}});
+              return ErrorOfOpening("/tmp/inside/new", O_WRONLY | O_CREAT);
+            }),
+            0);
+}
+
+TEST_F(Confinement, IsLeftOutWhereTheKernelCannotDoIt) {
+  const std::string photo = MakePhoto("a.jpg", 300, 200);
+  ProgramOptions options;
+  options.beforeExec = {SeccompFail({SYS_landlock_create_ruleset, SYS_seccomp, SYS_prctl}, ENOSYS)};
+  const CommandLine line = Line(photo, UsualOutputs(), "ours");
+  const ProgramResult result = RunProgram(ConvertThumbPath(), line.Arguments(), options);
+  EXPECT_EQ(result.exitCode, 0) << result.err;
+  EXPECT_EQ(result.err, "");
+}
+
+TEST_F(Confinement, LetsOutputsHaveRelativeNames) {
+  const std::string photo = MakePhoto("a.jpg", 300, 200);
+  MakeDirectories(directory_ + "/below");
+  ProgramOptions options;
+  options.workingDirectory = directory_;
+  for (const char* name : {"bare.jpg", "./dot.jpg", "below/o.jpg", "../converter/up.jpg"}) {
+    const CommandLine line{photo, "", {{{}, name}}};
+    EXPECT_EQ(RunProgram(ConvertThumbPath(), line.Arguments(), options).exitCode, 0) << name;
+    EXPECT_TRUE(Exists(directory_ + "/" + name)) << name;
+  }
+}
+
+TEST_F(Confinement, LeavesMissingDirectoriesTheirError) {
+  const std::string photo = MakePhoto("a.jpg", 300, 200);
+  const CommandLine line{photo, directory_ + "/gone", {{{}, directory_ + "/missing/o.jpg"}}};
+  const ProgramResult result = RunProgram(ConvertThumbPath(), line.Arguments());
+  EXPECT_EQ(result.exitCode, 1);
+  EXPECT_EQ(result.err, "convert-thumb: cannot write " + directory_ + "/missing/o.jpg\n");
+}
+
+TEST_F(Confinement, HoldsForImageMagick) {
+  const std::string source = MakeImage(directory_ + "/a.bmp", 300, 200);
+  ProgramOptions options;
+  options.workingDirectory = directory_;
+  const ProgramResult result = RunProgram(
+      ConvertThumbPath(),
+      {"-define", "registry:temporary-path=" + directory_, source, "-write", directory_ + "/o.png",
+       "-set", "filename:a", "/tmp/outside/new", "%[filename:a].png"},
+      options);
+  EXPECT_TRUE(Exists(directory_ + "/o.png"));
+  if (ErrorOutside() != 0) {
+    EXPECT_EQ(result.exitCode, 1);
+    EXPECT_FALSE(Exists("/tmp/outside/new.png"));
+  } else {
+    EXPECT_TRUE(Exists("/tmp/outside/new.png"));
+  }
+}
+
+}  // namespace
+}  // namespace vela_test

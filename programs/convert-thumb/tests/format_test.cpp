@@ -1,0 +1,294 @@
+// Photos of every format that the converter decodes itself.
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "converter_fixture.h"
+#include "support/build_paths.h"
+#include "support/files.h"
+#include "support/image_checks.h"
+#include "support/images.h"
+
+namespace vela_test {
+namespace {
+
+using ::testing::HasSubstr;
+using ::testing::Not;
+
+constexpr int kWidth = 900;
+constexpr int kHeight = 660;
+
+class Formats : public ConverterTest {
+ protected:
+  /// Makes a picture and expects the converter to make ImageMagick's thumbnails of it by itself.
+  void ExpectOwn(const std::string& name, const std::vector<std::string>& options,
+                 double leastMean = 48) const {
+    SCOPED_TRACE(name);
+    ExpectOwnPictures(MakePicture(name, kWidth, kHeight, options), UsualOutputs(), leastMean);
+  }
+
+  /// Makes a picture in ten shorter versions and some with wrong bytes, and expects ImageMagick's
+  /// verdict on each.
+  void ExpectVerdictsOnDamage(const std::string& name,
+                              const std::vector<std::string>& options = {}) const {
+    const std::string bytes = ReadFile(MakePicture(name, 300, 220, options));
+    const std::string damaged = directory_ + "/damaged" + name.substr(name.rfind('.'));
+    for (size_t i = 0; i < 10; ++i) {
+      WriteFile(damaged, bytes.substr(0, bytes.size() * i / 10));
+      ExpectSameVerdict(damaged, {ThumbOptions()});
+    }
+    for (size_t i = 1; i < 10; ++i) {
+      std::string wrong = bytes;
+      wrong[bytes.size() * i / 10] = static_cast<char>(wrong[bytes.size() * i / 10] ^ 0x5A);
+      WriteFile(damaged, wrong);
+      ExpectSameVerdict(damaged, {ThumbOptions()});
+    }
+  }
+};
+
+TEST_F(Formats, Png) {
+  ExpectOwn("png24:a.png", {});
+  ExpectOwn("png48:a.png", {});
+  ExpectOwn("png24:a.png", {"-interlace", "PNG"});
+  ExpectOwn("a.png", {"-depth", "8", "-units", "PixelsPerInch", "-density", "300"});
+}
+
+TEST_F(Formats, PngOfFewColours) {
+  ExpectOwn("png8:a.png", {"-colors", "200"});
+  ExpectOwn("png8:a.png", {"-colors", "7"});
+}
+
+TEST_F(Formats, PngOfGreys) {
+  for (const char* depth : {"1", "2", "4", "8", "16"}) {
+    ExpectOwn("a.png",
+              {"-colorspace", "Gray", "-depth", depth, "-define",
+               "png:bit-depth=" + std::string(depth), "-define", "png:color-type=0"},
+              45);
+    EXPECT_EQ(DecodeJpeg(directory_ + "/ours0.jpg")->Components(), 1) << depth;
+  }
+}
+
+TEST_F(Formats, TiffOfEveryCompression) {
+  for (const char* compression : {"none", "LZW", "Zip", "JPEG", "RLE"}) {
+    ExpectOwn("a.tif", {"-depth", "8", "-compress", compression});
+  }
+  ExpectOwn("a.tif", {"-monochrome", "-compress", "Group4"}, 45);
+}
+
+TEST_F(Formats, TiffOfEveryLayout) {
+  ExpectOwn("a.tif", {"-depth", "16"});
+  ExpectOwn("a.tif", {"-depth", "8", "-endian", "MSB"});
+  ExpectOwn("a.tif", {"-depth", "8", "-interlace", "Plane"});
+  ExpectOwn("a.tiff", {"-depth", "8", "-define", "tiff:tile-geometry=256x256"});
+  ExpectOwn("a.tif", {"-colorspace", "Gray", "-depth", "8"});
+  ExpectOwn("a.tif", {"-colorspace", "Gray", "-define", "quantum:polarity=min-is-white"});
+  ExpectOwn("a.tif", {"-colors", "200", "-type", "Palette", "-depth", "8"}, 45);
+}
+
+TEST_F(Formats, TiffStandsUpright) {
+  for (const char* orientation : {"TopRight", "BottomLeft", "RightTop", "LeftBottom"}) {
+    ExpectOwn("a.tif", {"-depth", "8", "-orient", orientation});
+  }
+}
+
+TEST_F(Formats, PortableMaps) {
+  ExpectOwn("a.ppm", {"-depth", "8"});
+  ExpectOwn("a.ppm", {"-depth", "16"});
+  ExpectOwn("a.pgm", {"-depth", "8"});
+  ExpectOwn("a.pgm", {"-depth", "16"});
+}
+
+TEST_F(Formats, PortableMapWithComments) {
+  const std::string map = directory_ + "/a.ppm";
+  WriteFile(map, "P6 # one\n# two\n3\n#three\n2 255\n" + std::string("abcdefghijklmnopqr"));
+  ExpectOwnPictures(map, UsualOutputs());
+}
+
+TEST_F(Formats, Gif) {
+  ExpectOwn("a.gif", {});
+  ExpectOwn("a.gif", {"-colorspace", "Gray"});
+}
+
+TEST_F(Formats, Webp) {
+  ExpectOwn("a.webp", {});
+  ExpectOwn("a.webp", {"-define", "webp:lossless=true"});
+}
+
+TEST_F(Formats, WebpStandsUpright) {
+  JpegRecipe recipe;
+  recipe.width = 600;
+  recipe.height = 400;
+  recipe.orientation = 6;
+  const std::string jpeg = MakeJpeg(directory_ + "/a.jpg", recipe);
+  const std::string webp = directory_ + "/a.webp";
+  ASSERT_EQ(RunProgram(kImageMagick, {jpeg, webp}).exitCode, 0);
+  // ImageMagick leaves it lying.
+  const ProgramResult result =
+      RunProgram(ConvertThumbPath(), Line(webp, UsualOutputs(), "ours").Arguments());
+  EXPECT_EQ(result.exitCode, 0) << result.err;
+  EXPECT_EQ(QuadrantLetters(directory_ + "/ours0.jpg"), LettersAfterOrientation(6));
+}
+
+TEST_F(Formats, Heif) {
+  ExpectOwn("a.heic", {}, 42);
+  ExpectOwn("a.avif", {}, 42);
+}
+
+TEST_F(Formats, HeifOfACameraKeepsItsProfile) {
+  const std::string media = SharedMediaDirectory();
+  if (media.empty()) {
+    return;
+  }
+  const std::string photo = media + "/phone_12mp.heic";
+  ASSERT_EQ(RunProgram(kImageMagick, Line(photo, UsualOutputs(), "theirs").Arguments()).exitCode,
+            0);
+  const WithoutImageMagick without;
+  const ProgramResult result =
+      RunProgram(ConvertThumbPath(), Line(photo, UsualOutputs(), "ours").Arguments());
+  EXPECT_EQ(result.exitCode, 0) << result.err;
+  for (const char* place : {"0.jpg", "1.jpg", "2.jpg", "3.jpg"}) {
+    const std::string ours = directory_ + "/ours" + place;
+    const Likeness likeness = Compare(ours, directory_ + "/theirs" + place);
+    EXPECT_TRUE(likeness.sameSize);
+    EXPECT_GE(likeness.decibels, 40);
+    EXPECT_TRUE(ReadJpegMetadata(ours).icc);
+  }
+}
+
+TEST_F(Formats, Jpeg2000) {
+  ExpectOwn("a.jp2", {});
+  ExpectOwn("a.jp2", {"-colorspace", "Gray"});
+}
+
+TEST_F(Formats, ReadOfSeveralPagesTheFirst) {
+  const std::vector<std::string> second = {"-depth", "8", "(", "+clone", "-negate", ")"};
+  for (const char* name : {"a.tif", "a.gif", "a.webp", "a.ppm"}) {
+    const std::string source = MakePicture(name, 700, 500, second);
+    ExpectOwnPictures(source + "[0]", UsualOutputs());
+    const WithoutImageMagick without;
+    const CommandLine all = Line(source, UsualOutputs(), "all");
+    EXPECT_EQ(RunProgram(ConvertThumbPath(), all.Arguments()).exitCode, 1) << name;
+  }
+}
+
+TEST_F(Formats, HandsOverWhatIsReadDifferently) {
+  const std::vector<ThumbOptions> outputs = {ThumbOptions()};
+  ExpectHandedOver(MakePicture("a.bmp", 300, 200), outputs);
+  ExpectHandedOver(MakePicture("lab.tif", 300, 200, {"-colorspace", "Lab"}), outputs);
+  ExpectHandedOver(MakePicture("ycc.tif", 300, 200, {"-colorspace", "YCbCr"}), outputs);
+  ExpectHandedOver(MakePicture("linear.png", 300, 200, {"-set", "gamma", "1"}), outputs);
+  ExpectHandedOver(MakePicture("part.gif", 300, 200, {"-repage", "400x300+10+10"}), outputs);
+  ExpectHandedOver(MakePicture("plain.ppm", 300, 200, {"-compress", "none"}), outputs);
+  const std::string map = directory_ + "/odd.pgm";
+  WriteFile(map, "P5 3 2 100\n" + std::string("abcdef"));
+  ExpectHandedOver(map, outputs);
+}
+
+TEST_F(Formats, HandsOverWhatIsNamedLikeARawPhoto) {
+  const std::string raw = directory_ + "/a.nef";
+  CopyFile(MakePicture("a.tif", 300, 200, {"-depth", "8"}), raw);
+  ExpectSameVerdict(raw, {ThumbOptions()});
+  EXPECT_FALSE(Exists(directory_ + "/ours0.jpg"));
+}
+
+TEST_F(Formats, DataCountsAndNotTheName) {
+  const std::string source = directory_ + "/[a]*%d.jpg";
+  CopyFile(MakePicture("png24:a.png", 300, 200), source);
+  const WithoutImageMagick without;
+  const ProgramResult result =
+      RunProgram(ConvertThumbPath(), Line(source, {ThumbOptions()}, "ours").Arguments());
+  EXPECT_EQ(result.exitCode, 0) << result.err;
+  EXPECT_TRUE(IsWholeJpeg(directory_ + "/ours0.jpg"));
+}
+
+TEST_F(Formats, VerdictOnDamagedPng) {
+  ExpectVerdictsOnDamage("png24:a.png");
+  ExpectVerdictsOnDamage("png24:a.png", {"-interlace", "PNG"});
+}
+
+TEST_F(Formats, VerdictOnDamagedTiff) {
+  ExpectVerdictsOnDamage("a.tif", {"-depth", "8", "-compress", "LZW"});
+}
+
+TEST_F(Formats, VerdictOnDamagedPortableMap) {
+  ExpectVerdictsOnDamage("a.ppm", {"-depth", "8"});
+}
+
+TEST_F(Formats, VerdictOnDamagedWebp) {
+  ExpectVerdictsOnDamage("a.webp");
+}
+
+TEST_F(Formats, VerdictOnDamagedHeif) {
+  ExpectVerdictsOnDamage("a.heic");
+}
+
+TEST_F(Formats, VerdictOnDamagedJpeg2000) {
+  ExpectVerdictsOnDamage("a.jp2");
+}
+
+TEST_F(Formats, LeavesNothingOfADamagedPhoto) {
+  const std::string bytes = ReadFile(MakePicture("png24:a.png", 300, 220));
+  const std::string cut = directory_ + "/cut.png";
+  WriteFile(cut, bytes.substr(0, bytes.size() / 2));
+  const ProgramResult result =
+      RunProgram(ConvertThumbPath(), Line(cut, UsualOutputs(), "ours").Arguments());
+  EXPECT_EQ(result.exitCode, 1);
+  EXPECT_THAT(result.err, HasSubstr("cannot decode the photo"));
+  EXPECT_FALSE(Exists(directory_ + "/ours0.jpg"));
+}
+
+TEST_F(Formats, PicturesThatAreDecodedWholeKeepToTheMemoryLimit) {
+  // 4000 x 3000 pixels of three bytes take 36 megabytes.
+  const std::vector<ThumbOptions> outputs = {ThumbOptions()};
+  const std::string whole = MakePicture("a.webp", 4000, 3000);
+  const std::string streamed = MakePicture("a.png", 4000, 3000, {"-depth", "8", "-quality", "10"});
+  WriteFile("/etc/velainfo.conf", "convert_memory_limit=\"30000000\"\n");
+  const ProgramResult refused =
+      RunProgram(ConvertThumbPath(), Line(whole, outputs, "ours").Arguments());
+  EXPECT_EQ(refused.exitCode, 1);
+  EXPECT_THAT(refused.err, HasSubstr("too much memory"));
+  EXPECT_EQ(RunProgram(ConvertThumbPath(), Line(streamed, outputs, "ours").Arguments()).exitCode,
+            0);
+}
+
+TEST_F(Formats, JpegAndPortableMapDoWithoutLibvips) {
+  ProgramOptions options;
+  options.addedEnvironment = {"LD_DEBUG=files"};
+  const auto loaded = [&](const std::string& source) {
+    return RunProgram(ConvertThumbPath(), Line(source, {ThumbOptions()}, "ours").Arguments(),
+                      options)
+        .err;
+  };
+  EXPECT_THAT(loaded(MakePicture("a.jpg", 300, 200)), Not(HasSubstr("libvips")));
+  EXPECT_THAT(loaded(MakePicture("a.ppm", 300, 200)), Not(HasSubstr("libvips")));
+  EXPECT_THAT(loaded(MakePicture("a.png", 300, 200)), HasSubstr("libvips"));
+}
+
+TEST_F(Formats, OnlyHeifLoadsAModuleOfLibvips) {
+  ProgramOptions options;
+  options.addedEnvironment = {"LD_DEBUG=files"};
+  const auto loaded = [&](const std::string& source) {
+    return RunProgram(ConvertThumbPath(), Line(source, {ThumbOptions()}, "ours").Arguments(),
+                      options)
+        .err;
+  };
+  EXPECT_THAT(loaded(MakePicture("a.png", 300, 200)), Not(HasSubstr("vips-modules")));
+  EXPECT_THAT(loaded(MakePicture("a.heic", 300, 200)), HasSubstr("vips-heif.so"));
+}
+
+TEST_F(Formats, HandsOverWithoutLibvips) {
+  const std::string source = MakePicture("a.png", 300, 200);
+  MakeDirectories("/tmp/broken");
+  WriteFile("/tmp/broken/libvips.so.42", "");
+  ProgramOptions options;
+  options.addedEnvironment = {"LD_LIBRARY_PATH=/tmp/broken"};
+  const std::vector<std::string> arguments = Line(source, {ThumbOptions()}, "ours").Arguments();
+  const ProgramResult result = RunProgram(ConvertThumbPath(), arguments, options);
+  EXPECT_EQ(result.exitCode, 0);
+  EXPECT_EQ(result.err, "");
+  const WithoutImageMagick without;
+  EXPECT_EQ(RunProgram(ConvertThumbPath(), arguments, options).exitCode, 1);
+}
+
+}  // namespace
+}  // namespace vela_test

@@ -1,0 +1,110 @@
+// ImageMagick in a child, where it is not installed under the converter's name.
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <csignal>
+
+#include "converter_fixture.h"
+#include "support/files.h"
+#include "support/stub_files.h"
+#include "support/stub_tool.h"
+
+namespace vela_test {
+namespace {
+
+using ::testing::SizeIs;
+
+constexpr int kLongMilliseconds = 100000;
+
+class HandOverToChild : public ConverterTest {
+ protected:
+  const std::string started_ = std::string(kStubDirectory) + "/started";
+  const std::vector<std::string> arguments_ = {"/a.jpg", "-blur", "0x1", "/tmp/converter/b.png"};
+
+  static ProgramOptions Recorded() {
+    ProgramOptions options;
+    options.addedEnvironment = {std::string("TMPDIR=") + kStubDirectory};
+    return options;
+  }
+
+  StubPlan EndlessWork() const { return StubPlan().CreateFile(started_).Sleep(kLongMilliseconds); }
+
+  Program Start() const {
+    Program program = StartProgram(ConvertThumbPath(), arguments_, Recorded());
+    EXPECT_TRUE(WaitUntilExists(started_));
+    return program;
+  }
+
+  static std::string ProcessDirectory(pid_t pid) { return "/proc/" + std::to_string(pid); }
+};
+
+TEST_F(HandOverToChild, KeepsTheProcessAndItsName) {
+  const StubTool stub(kImageMagick);
+  stub.Plan(EndlessWork());
+  const Program program = Start();
+  ASSERT_THAT(stub.Calls(), SizeIs(1));
+  EXPECT_EQ(stub.Calls().front().parentPid, program.Pid());
+  EXPECT_EQ(stub.Calls().front().Parameters(), arguments_);
+  EXPECT_EQ(ReadFile(ProcessDirectory(program.Pid()) + "/comm"), "convert-thumb\n");
+}
+
+TEST_F(HandOverToChild, EndsWithItsStatus) {
+  const StubTool stub(kImageMagick);
+  for (const int status : {0, 1, 7}) {
+    stub.Plan(StubPlan().Exit(status));
+    EXPECT_EQ(RunProgram(ConvertThumbPath(), arguments_, Recorded()).exitCode, status);
+  }
+}
+
+TEST_F(HandOverToChild, EndsByItsSignal) {
+  const StubTool stub(kImageMagick);
+  for (const int signal : {SIGKILL, SIGSEGV, SIGTERM, SIGXCPU, SIGABRT}) {
+    stub.Plan(StubPlan().DieBySignal(signal));
+    EXPECT_EQ(RunProgram(ConvertThumbPath(), arguments_, Recorded()).signal, signal);
+  }
+}
+
+TEST_F(HandOverToChild, PassesSignalsOn) {
+  const StubTool stub(kImageMagick);
+  stub.Plan(EndlessWork());
+  for (const int signal : {SIGTERM, SIGINT, SIGHUP, SIGQUIT}) {
+    RemoveTree(started_);
+    Program program = Start();
+    const pid_t child = stub.Calls().back().pid;
+    program.Kill(signal);
+    const std::optional<ProgramResult> result = program.Wait();
+    ASSERT_TRUE(result) << signal;
+    EXPECT_EQ(result->signal, signal);
+    EXPECT_FALSE(Exists(ProcessDirectory(child))) << signal;
+  }
+}
+
+TEST_F(HandOverToChild, LeavesIgnoredSignalsIgnored) {
+  const StubTool stub(kImageMagick);
+  ProgramOptions options = Recorded();
+  options.beforeExec = {IgnoreSignal(SIGHUP)};
+  RunProgram(ConvertThumbPath(), arguments_, options);
+  ASSERT_THAT(stub.Calls(), SizeIs(1));
+  EXPECT_THAT(stub.Calls().front().ignoredSignals, ::testing::Contains(SIGHUP));
+  EXPECT_THAT(stub.Calls().front().ignoredSignals, ::testing::Not(::testing::Contains(SIGTERM)));
+  EXPECT_THAT(stub.Calls().front().blockedSignals, SizeIs(0));
+}
+
+TEST_F(HandOverToChild, LetsNothingOutliveIt) {
+  const StubTool stub(kImageMagick);
+  stub.Plan(EndlessWork());
+  const Program program = Start();
+  program.Kill(SIGKILL);
+  EXPECT_TRUE(WaitUntilGone(ProcessDirectory(stub.Calls().front().pid)));
+}
+
+TEST_F(HandOverToChild, FailsWhenTheProgramCannotRun) {
+  RemoveTool(kImageMagick);
+  const ProgramResult result = RunProgram(ConvertThumbPath(), arguments_);
+  EXPECT_EQ(result.exitCode, 1);
+  EXPECT_EQ(result.err, "convert-thumb: /usr/bin/convert-im6.q16: No such file or directory\n");
+}
+
+}  // namespace
+}  // namespace vela_test

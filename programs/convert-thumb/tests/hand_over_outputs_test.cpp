@@ -1,0 +1,113 @@
+// Outputs of command lines that ImageMagick gets: they arrive in the file that was named.
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "converter_fixture.h"
+#include "support/files.h"
+#include "support/image_checks.h"
+#include "support/images.h"
+
+namespace vela_test {
+namespace {
+
+/// Names that ImageMagick can take for more than names.
+constexpr const char* kOddNames[] = {"@a.jpg",   "png:a.jpg", "-a.jpg",   "a:b.jpg",  "|a.jpg",
+                                     "a[0].jpg", "a[1].jpg",  "a*.jpg",   "a?.jpg",   "{a,b}.jpg",
+                                     "a\nb.jpg", "~a.jpg",    "a\\n.jpg", "&lt;.jpg", " a.jpg"};
+
+class HandOverOutputs : public ConverterTest {
+ protected:
+  /// Of a kind that only ImageMagick reads.
+  std::string MakeSource() const { return MakeImage(directory_ + "/source.bmp", 300, 200); }
+
+  /// Files that patterns among the names above would match.
+  void MakeNeighbours() const {
+    for (const char* name : {"a0.jpg", "a1.jpg", "ab.jpg", "a.jpg", "b.jpg"}) {
+      WriteFile(directory_ + "/" + name, name);
+    }
+  }
+
+  void ExpectNeighboursUntouched() const {
+    for (const char* name : {"a0.jpg", "a1.jpg", "ab.jpg", "a.jpg", "b.jpg"}) {
+      EXPECT_EQ(ReadFile(directory_ + "/" + name), name);
+    }
+  }
+
+  /// Runs the line in the directory of the source; the result is a picture in the file `name`.
+  void ExpectWritten(const CommandLine& line, const std::string& name) const {
+    ProgramOptions options;
+    options.workingDirectory = directory_;
+    const ProgramResult result = RunProgram(ConvertThumbPath(), line.Arguments(), options);
+    EXPECT_EQ(result.exitCode, 0) << name << ": " << result.err;
+    const std::string path = directory_ + "/" + name;
+    EXPECT_TRUE(Exists(path)) << name;
+    if (Exists(path)) {
+      EXPECT_EQ(QuadrantLetters(path), "RGBY") << name;
+    }
+    RemoveTree(path);
+  }
+};
+
+TEST_F(HandOverOutputs, ArriveUnderTheirNamesInTheDirectoryAtHand) {
+  const std::string source = MakeSource();
+  MakeNeighbours();
+  for (const std::string name : kOddNames) {
+    ExpectWritten({source, directory_, {{{}, name}}}, name);
+  }
+  ExpectNeighboursUntouched();
+}
+
+TEST_F(HandOverOutputs, ArriveUnderTheirNamesElsewhere) {
+  const std::string source = MakeSource();
+  MakeNeighbours();
+  for (const std::string name : kOddNames) {
+    ExpectWritten({source, directory_, {{{}, directory_ + "/" + name}}}, name);
+  }
+  ExpectWritten({source, directory_, {{{}, directory_ + "/100%%d%%[fx:w].jpg"}}},
+                "100%d%[fx:w].jpg");
+  ExpectNeighboursUntouched();
+}
+
+TEST_F(HandOverOutputs, ArriveUnderTheirNamesWhenThereAreSeveral) {
+  const std::string source = MakeSource();
+  MakeNeighbours();
+  for (const std::string name : kOddNames) {
+    ExpectWritten({source, directory_, {{{}, name}, {{}, "other*.jpg"}}}, name);
+    EXPECT_EQ(QuadrantLetters(directory_ + "/other*.jpg"), "RGBY");
+  }
+  ExpectNeighboursUntouched();
+}
+
+TEST_F(HandOverOutputs, ArriveInDirectoriesWithOddNames) {
+  const std::string source = MakeSource();
+  for (const std::string name : kOddNames) {
+    MakeDirectories(directory_ + "/" + name);
+    ExpectWritten({source, directory_, {{{}, name + "/o.jpg"}}}, name + "/o.jpg");
+  }
+}
+
+TEST_F(HandOverOutputs, FailWithOneLineWhenTheNameIsTooLong) {
+  std::string name = directory_ + "/";
+  for (int i = 0; i < 2100; ++i) {
+    name += "%%";
+  }
+  const CommandLine line = {MakeSource(), directory_, {{{}, name + ".jpg"}}};
+  const ProgramResult result = RunProgram(ConvertThumbPath(), line.Arguments());
+  EXPECT_EQ(result.exitCode, 1);
+  EXPECT_EQ(result.err, "convert-thumb: name of an output too long for ImageMagick\n");
+  EXPECT_EQ(ListDirectory(directory_), std::vector<std::string>{"source.bmp"});
+}
+
+TEST_F(HandOverOutputs, KeepTheirMeaningWhereOnlyImageMagickUnderstandsTheLine) {
+  const std::string source = MakeSource();
+  ProgramOptions options;
+  options.workingDirectory = directory_;
+  const ProgramResult result =
+      RunProgram(ConvertThumbPath(), {source + "[0]", "-negate", "png:o.jpg"}, options);
+  EXPECT_EQ(result.exitCode, 0) << result.err;
+  EXPECT_EQ(ReadFile(directory_ + "/o.jpg").substr(1, 3), "PNG");
+}
+
+}  // namespace
+}  // namespace vela_test

@@ -1,0 +1,291 @@
+// Files that were made to do harm: every run ends by itself, within its memory limit, and leaves
+// either whole outputs or none.
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+#include <sys/resource.h>
+#include <sys/socket.h>
+#include <sys/stat.h>
+#include <sys/un.h>
+#include <unistd.h>
+
+#include <chrono>
+#include <cstring>
+#include <thread>
+
+#include "confinement/resource_limits.h"
+#include "converter_fixture.h"
+#include "hostile_pictures.h"
+#include "measured_run.h"
+#include "support/files.h"
+#include "support/image_checks.h"
+#include "support/images.h"
+
+namespace vela_test {
+namespace {
+
+constexpr size_t kMemoryLimit = size_t{128} << 20;
+constexpr uint32_t kHuge = 100000;
+
+class HostileInput : public ConverterTest {
+ protected:
+  const std::string outputs_ = directory_ + "/outputs";
+
+  void SetUp() override {
+    ConverterTest::SetUp();
+    MakeDirectories(outputs_);
+    WriteFile("/etc/velainfo.conf",
+              "convert_memory_limit=\"" + std::to_string(kMemoryLimit) + "\"\n");
+  }
+
+  std::string MakeFile(const std::string& name, const std::string& content) const {
+    WriteFile(directory_ + "/" + name, content);
+    return directory_ + "/" + name;
+  }
+
+  CommandLine LineFor(const std::string& source) const {
+    CommandLine line = Line(source, UsualOutputs(), "outputs/o");
+    line.scratchDirectory = outputs_;
+    return line;
+  }
+
+  static void ExpectWithinLimits(const std::string& source, const MeasuredRun& run) {
+    EXPECT_FALSE(run.timedOut) << source;
+// The memory that a sanitizer keeps for itself is many times the limit.
+#ifndef __SANITIZE_ADDRESS__
+    // The programs' code, and pictures that ImageMagick keeps in files, which count as well while
+    // they are mapped.
+    constexpr size_t kFiles = (size_t{64} << 20) + kMemoryLimit;
+    EXPECT_LT(run.peakMemory, kMemoryLimit + kMemoryBesides + kFiles) << source;
+#endif
+  }
+
+  /// Success with whole outputs, or status 1 with none.
+  MeasuredRun ExpectHarmless(const std::string& source) const {
+    ProgramOptions options;
+    options.timeLimit = std::chrono::minutes(1);
+    const CommandLine line = LineFor(source);
+    const MeasuredRun run = RunMeasured(ConvertThumbPath(), line.Arguments(), options);
+    ExpectWithinLimits(source, run);
+    if (run.exitCode == 0) {
+      for (const ThumbOutput& output : line.outputs) {
+        EXPECT_TRUE(IsWholeJpeg(output.path)) << output.path;
+      }
+    } else {
+      EXPECT_EQ(run.exitCode, 1) << source << ": " << run.error;
+      EXPECT_NE(run.error, "") << source;
+      EXPECT_THAT(ListDirectory(outputs_), ::testing::IsEmpty()) << source;
+    }
+    RemoveTree(outputs_);
+    MakeDirectories(outputs_);
+    return run;
+  }
+
+  void ExpectRefused(const std::string& source) const {
+    for (const char* page : {"", "[0]"}) {
+      EXPECT_EQ(ExpectHarmless(source + page).exitCode, 1) << source + page;
+    }
+  }
+};
+
+TEST_F(HostileInput, ClaimsAHugePicture) {
+  ExpectRefused(MakeFile("a.jpg", ClaimingJpeg(65500, 65500)));
+  ExpectRefused(MakeFile("a.png", ClaimingPng(kHuge, kHuge)));
+  ExpectRefused(MakeFile("a.gif", ClaimingGif(65535, 65535)));
+  ExpectRefused(MakeFile("a.tif", ClaimingTiff(kHuge, kHuge)));
+  ExpectRefused(MakeFile("a.webp", ClaimingWebp(kHuge, 40000)));
+  ExpectRefused(MakeFile("a.ppm", ClaimingPpm(kHuge, kHuge)));
+  ExpectRefused(MakeFile("a.bmp", ClaimingBmp(kHuge, kHuge)));
+  ExpectRefused(MakeFile("a.psd", ClaimingPsd(kHuge, kHuge)));
+}
+
+TEST_F(HostileInput, ClaimsALargePictureThatMayBe) {
+  constexpr uint32_t kLarge = 15000;
+  ExpectHarmless(MakeFile("a.jpg", ClaimingJpeg(kLarge, kLarge)));
+  ExpectHarmless(MakeFile("a.png", ClaimingPng(kLarge, kLarge)));
+  ExpectHarmless(MakeFile("a.gif", ClaimingGif(kLarge, kLarge)));
+  ExpectHarmless(MakeFile("a.tif", ClaimingTiff(kLarge, kLarge)));
+  ExpectHarmless(MakeFile("a.webp", ClaimingWebp(kLarge, kLarge)));
+  ExpectHarmless(MakeFile("a.ppm", ClaimingPpm(kLarge, kLarge)));
+  ExpectHarmless(MakeFile("a.bmp", ClaimingBmp(kLarge, kLarge)));
+  ExpectHarmless(MakeFile("a.psd", ClaimingPsd(kLarge, kLarge)));
+}
+
+TEST_F(HostileInput, ClaimsASideOfNothing) {
+  for (const auto& [width, height] : {std::pair{0U, 1U}, {1U, 0U}, {0U, 0U}}) {
+    ExpectHarmless(MakeFile("a.jpg", ClaimingJpeg(width, height)));
+    ExpectHarmless(MakeFile("a.png", ClaimingPng(width, height)));
+    ExpectHarmless(MakeFile("a.gif", ClaimingGif(width, height)));
+    ExpectHarmless(MakeFile("a.tif", ClaimingTiff(width, height)));
+    ExpectHarmless(MakeFile("a.ppm", ClaimingPpm(width, height)));
+  }
+}
+
+TEST_F(HostileInput, HoldsFarMoreThanItsSize) {
+  ExpectHarmless(MakeFile("a.png", BlackPng(12000, 12000)));
+}
+
+TEST_F(HostileInput, IsAPictureForTheTestsAbove) {
+  EXPECT_EQ(ExpectHarmless(MakeFile("a.png", BlackPng(300, 200))).exitCode, 0);
+  EXPECT_EQ(ExpectHarmless(MakeFile("a.gif", LongGif(30, 20, 3)) + "[0]").exitCode, 0);
+  EXPECT_EQ(ExpectHarmless(MakeFile("a.tif", ManyPagesTiff(1, 1)) + "[0]").exitCode, 0);
+}
+
+TEST_F(HostileInput, IsAnEndlessAnimation) {
+  const std::string gif = MakeFile("a.gif", LongGif(100, 100, 2000));
+  EXPECT_EQ(ExpectHarmless(gif + "[0]").exitCode, 0);
+  ExpectHarmless(gif);
+}
+
+TEST_F(HostileInput, LeadsThroughManyPages) {
+  constexpr size_t kPages = 60000;
+  ExpectHarmless(MakeFile("long.tif", ManyPagesTiff(kPages, kPages)) + "[0]");
+  ExpectHarmless(MakeFile("circle.tif", ManyPagesTiff(kPages, 0)) + "[0]");
+  ExpectHarmless(MakeFile("itself.tif", ManyPagesTiff(1, 0)));
+  ExpectHarmless(MakeFile("two.tif", ManyPagesTiff(2, 0)));
+  ExpectHarmless(MakeFile("nested.tif", NestedTiff(kPages)) + "[0]");
+}
+
+TEST_F(HostileInput, IsAVeryLongFileOfNothing) {
+  constexpr off_t kSize = off_t{2000} << 20;
+  for (const char* name : {"a.jpg", "a.png", "a.tif", "a.gif", "a.webp", "a.heic", "a.ppm"}) {
+    const std::string path = MakeFile(name, "");
+    ASSERT_EQ(truncate(path.c_str(), kSize), 0);
+    ExpectRefused(path);
+  }
+}
+
+TEST_F(HostileInput, IsAVeryLongFileBehindItsFirstBytes) {
+  constexpr off_t kSize = off_t{200} << 20;
+  for (const std::string beginning : {"\xFF\xD8\xFF", "\x89PNG\r\n\x1a\n", "GIF89a", "II*"}) {
+    const std::string path = MakeFile("a", beginning);
+    ASSERT_EQ(truncate(path.c_str(), kSize), 0);
+    ExpectRefused(path);
+  }
+}
+
+TEST_F(HostileInput, HasVeryManyScans) {
+  const std::string photo = ReadFile(MakePhoto("a.jpg", 400, 300, {"-interlace", "Plane"}));
+  ExpectRefused(MakeFile("many.jpg", RepeatLastScan(photo, 2000)));
+  ExpectHarmless(MakeFile("some.jpg", RepeatLastScan(photo, 100)));
+}
+
+void MakeSocket(const std::string& path) {
+  const int descriptor = socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0);
+  sockaddr_un address = {};
+  address.sun_family = AF_UNIX;
+  std::strncpy(address.sun_path, path.c_str(), sizeof address.sun_path - 1);
+  EXPECT_EQ(bind(descriptor, reinterpret_cast<const sockaddr*>(&address), sizeof address), 0);
+  close(descriptor);
+}
+
+TEST_F(HostileInput, IsNoFile) {
+  const std::string pipe = directory_ + "/pipe.jpg";
+  ASSERT_EQ(mkfifo(pipe.c_str(), 0600), 0);
+  const std::string socket = directory_ + "/socket.jpg";
+  MakeSocket(socket);
+  MakeDirectories(directory_ + "/directory.jpg");
+  for (const std::string& source : {pipe, socket, directory_ + "/directory.jpg",
+                                    std::string("/dev/zero"), std::string("/dev/null")}) {
+    ExpectRefused(source);
+  }
+}
+
+TEST_F(HostileInput, IsNoFileToBeTurned) {
+  const std::string pipe = directory_ + "/pipe.jpg";
+  ASSERT_EQ(mkfifo(pipe.c_str(), 0600), 0);
+  ProgramOptions options;
+  options.timeLimit = std::chrono::minutes(1);
+  EXPECT_EQ(RunProgram(ConvertThumbPath(), {"-rotate", "90", pipe, pipe}, options).exitCode, 1);
+}
+
+/// Cuts the source short while it is read, after more and more of the time that reading it takes.
+TEST_F(HostileInput, ShrinksWhileItIsRead) {
+  constexpr int kRounds = 12;
+  for (const char* name : {"a.jpg", "a.png", "a.tif", "a.ppm"}) {
+    const std::string original = directory_ + "/original-" + name;
+    const ProgramResult made =
+        RunProgram(kImageMagick, {"-seed", "20", "-size", "1600x1200", "plasma:", original});
+    ASSERT_EQ(made.exitCode, 0) << made.err;
+    const CommandLine line = LineFor(directory_ + "/" + name);
+    for (int round = 0; round < kRounds; ++round) {
+      CopyFile(original, line.source);
+      Program program = StartProgram(ConvertThumbPath(), line.Arguments());
+      std::this_thread::sleep_for(std::chrono::milliseconds(4 * round));
+      ASSERT_EQ(truncate(line.source.c_str(), 100), 0);
+      const std::optional<ProgramResult> result = program.Wait();
+      ASSERT_TRUE(result) << name;
+      EXPECT_EQ(result->signal, 0) << name << " " << round << ": " << result->err;
+    }
+  }
+}
+
+#ifndef __SANITIZE_ADDRESS__
+/// With less and less memory, from too little to start up to more than enough.
+class ShortOfMemory : public HostileInput {
+ protected:
+  /// Runs the line with that many megabytes; a run that fails leaves nothing, unless it has been
+  /// left to ImageMagick, which keeps what it has.
+  ProgramResult RunWith(uint64_t megabytes, const CommandLine& line) const {
+    ProgramOptions options;
+    options.beforeExec = {LimitResource(RLIMIT_DATA, megabytes << 20)};
+    ProgramResult result = RunProgram(ConvertThumbPath(), line.Arguments(), options);
+    const bool handedOver = result.err.find("convert-im6") != std::string::npos;
+    if (result.exitCode != 0 && !handedOver) {
+      EXPECT_THAT(ListDirectory(outputs_), ::testing::IsEmpty()) << megabytes;
+    }
+    RemoveTree(outputs_);
+    MakeDirectories(outputs_);
+    return result;
+  }
+
+  CommandLine LargeLine(const std::string& photo) const {
+    ThumbOptions large;
+    large.width = 3000;
+    large.height = 2000;
+    return Line(photo, {large, ThumbOptions()}, "outputs/o");
+  }
+};
+
+TEST_F(ShortOfMemory, EndsWithOneLine) {
+  const CommandLine line = LargeLine(MakePhoto("a.jpg", 3000, 2000));
+  int failures = 0;
+  constexpr int kRuns = 16;
+  for (int run = 1; run <= kRuns; ++run) {
+    const ProgramResult result = RunWith(static_cast<uint64_t>(8 * run), line);
+    EXPECT_EQ(result.signal, 0) << run << ": " << result.err;
+    if (result.exitCode != 0) {
+      ++failures;
+      EXPECT_EQ(result.exitCode, 1) << run;
+      EXPECT_EQ(result.err.rfind("convert-thumb: ", 0), 0U) << run << ": " << result.err;
+      EXPECT_EQ(result.err.find('\n'), result.err.size() - 1) << run << ": " << result.err;
+    }
+  }
+  EXPECT_GT(failures, 2);
+  EXPECT_LT(failures, kRuns);
+}
+
+TEST_F(ShortOfMemory, EndsCleanlyInLibraries) {
+  const std::string photo = directory_ + "/a.png";
+  const ProgramResult made =
+      RunProgram(kImageMagick, {"-size", "1500x1000", "plasma:sienna-steelblue", photo});
+  ASSERT_EQ(made.exitCode, 0) << made.err;
+  const CommandLine line = LargeLine(photo);
+  int failures = 0;
+  constexpr int kRuns = 16;
+  for (int run = 1; run <= kRuns; ++run) {
+    const ProgramResult result = RunWith(static_cast<uint64_t>(6 * run), line);
+    EXPECT_EQ(result.signal, 0) << run << ": " << result.err;
+    if (result.exitCode != 0) {
+      ++failures;
+      EXPECT_EQ(result.exitCode, 1) << run;
+      EXPECT_EQ(result.err.find('\n'), result.err.size() - 1) << run << ": " << result.err;
+    }
+  }
+  EXPECT_GT(failures, 2);
+  EXPECT_LT(failures, kRuns);
+}
+#endif
+
+}  // namespace
+}  // namespace vela_test

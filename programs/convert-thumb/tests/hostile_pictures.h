@@ -1,0 +1,37 @@
+// Small files that ask for a lot.
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+#include <string>
+
+namespace vela_test {
+
+/// Files of these formats whose header claims a size, in pixels, with next to no data behind it.
+/// JPEG and GIF hold sides of up to 65,535 pixels.
+std::string ClaimingJpeg(uint32_t width, uint32_t height);
+std::string ClaimingPng(uint32_t width, uint32_t height);
+std::string ClaimingGif(uint32_t width, uint32_t height);
+std::string ClaimingTiff(uint32_t width, uint32_t height);
+std::string ClaimingWebp(uint32_t width, uint32_t height);
+std::string ClaimingPpm(uint32_t width, uint32_t height);
+std::string ClaimingBmp(uint32_t width, uint32_t height);
+std::string ClaimingPsd(uint32_t width, uint32_t height);
+
+/// A whole black picture in three bytes a pixel that takes a thousandth of that in the file.
+std::string BlackPng(uint32_t width, uint32_t height);
+
+/// An animation of that many whole frames.
+std::string LongGif(uint32_t width, uint32_t height, size_t frames);
+
+/// A small grey TIFF whose pages lead from each to the next and from the last to `loopTo`, counted
+/// from 0; past the last: they end.
+std::string ManyPagesTiff(size_t pages, size_t loopTo);
+
+/// A small grey TIFF each of whose pages holds another inside, that many deep.
+std::string NestedTiff(size_t depth);
+
+/// `jpeg`, a progressive one, with its last scan `times` times.
+std::string RepeatLastScan(const std::string& jpeg, size_t times);
+
+}  // namespace vela_test

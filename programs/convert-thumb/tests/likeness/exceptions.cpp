@@ -1,0 +1,53 @@
+#include "likeness/exceptions.h"
+
+#include <algorithm>
+#include <array>
+
+namespace vela_test {
+namespace {
+
+struct Entry {
+  const char* format;
+  const char* says;
+  const char* vector;  ///< "" stands for all
+  LikenessException kind;
+  const char* why;
+};
+
+constexpr char kPanorama[] =
+    "wider or higher than ImageMagick's policy allows; there is no reason to refuse it";
+
+constexpr char kWholePicture[] = "the picture is whole; ImageMagick makes no thumbnails of it";
+
+constexpr char kIgnoredOrientation[] =
+    "ImageMagick does not look for the orientation in a WebP; with it the thumbnails are upright";
+
+constexpr char kLostProfile[] =
+    "ImageMagick loses this photo's colour profile, without which its colours look faded";
+
+constexpr std::array kEntries = {
+    Entry{"JPEG", "30000 x 10", "", LikenessException::kSucceeds, kPanorama},
+    Entry{"JPEG", "10 x 30000", "", LikenessException::kSucceeds, kPanorama},
+    Entry{"Netpbm", "PPM, 20000 x 12", "", LikenessException::kSucceeds, kPanorama},
+    Entry{"WebP", "orientation 6", "", LikenessException::kUpright, kIgnoredOrientation},
+    Entry{"Damaged", "PNG without its end chunk", "", LikenessException::kSucceeds, kWholePicture},
+    Entry{"Camera", "phone_12mp.heic", "", LikenessException::kSurroundings, kLostProfile},
+};
+
+bool IsAbout(const Entry& entry, const std::string& format, const std::string& says,
+             const std::string& vector) {
+  return format == entry.format && says == entry.says &&
+         (*entry.vector == '\0' || vector == entry.vector);
+}
+
+}  // namespace
+
+KnownDifference KnownDifferenceOf(const std::string& format, const std::string& says,
+                                  const std::string& vector) {
+  const auto* const found = std::find_if(kEntries.begin(), kEntries.end(), [&](const Entry& entry) {
+    return IsAbout(entry, format, says, vector);
+  });
+  return found == kEntries.end() ? KnownDifference() : KnownDifference{found->kind, found->why};
+}
+
+}  // namespace vela_test

@@ -1,0 +1,51 @@
+// Makes the inputs' files.
+#pragma once
+
+#include <cstddef>
+#include <functional>
+#include <string>
+#include <vector>
+
+#include "likeness/jpeg_maker.h"
+
+namespace vela_test {
+
+using FileMaker = std::function<void(const std::string& path)>;
+
+struct PhotoSize {
+  int width = 640;
+  int height = 480;
+};
+
+/// The photo as ImageMagick writes it with these options, in the format that the file's extension
+/// stands for.
+FileMaker Written(std::vector<std::string> options, PhotoSize size = {});
+
+/// The same with an alpha channel.
+FileMaker WrittenWithAlpha(std::vector<std::string> options, PhotoSize size = {});
+
+/// The same with a colour profile embedded, as profileOf() returns it.
+FileMaker WrittenWithProfile(std::vector<std::string> options, std::string (*profileOf)());
+
+/// The photo as a PPM, of sizes that ImageMagick refuses too.
+FileMaker Raw(PhotoSize size);
+
+/// The photo as a JPEG.
+FileMaker Encoded(const JpegKind& kind, PhotoSize size = {});
+
+/// A JPEG of `make`'s picture with EXIF orientation, rewritten in the format of the extension.
+FileMaker WithOrientation(int orientation, std::vector<std::string> options = {});
+
+/// The first `tenths` tenths of what `make` makes.
+FileMaker Truncated(FileMaker make, int tenths = 6);
+
+/// All but the last bytes of what `make` makes.
+FileMaker WithoutEnd(FileMaker make, size_t bytes);
+
+/// What `make` makes with bytes in the middle changed.
+FileMaker Damaged(FileMaker make);
+
+/// A file that is there already.
+FileMaker Copied(const std::string& from);
+
+}  // namespace vela_test

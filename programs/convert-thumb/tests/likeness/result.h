@@ -1,0 +1,35 @@
+// What came of one comparison, and its line for the table of results.
+#pragma once
+
+#include <string>
+#include <vector>
+
+namespace vela_test {
+
+/// One thumbnail, ours beside ImageMagick's; or a whole run, when one of them made no thumbnails.
+struct LikenessResult {
+  std::string format;  ///< of the input
+  std::string says;    ///< of the input
+  std::string vector;
+  std::string output;  ///< file name, empty for a whole run
+  int ourExit = 0;
+  int theirExit = 0;
+  std::string ourSize;  ///< such as "640x480", empty when there is no picture
+  std::string theirSize;
+  double decibels = 0;      ///< meaningful for two pictures of one size
+  std::string differences;  ///< beside the pixels
+  std::string remark;       ///< why a difference is all right
+};
+
+/// Whether there are two pictures that can be compared.
+bool HasLikeness(const LikenessResult& result);
+
+/// Where the results are kept, as the machine sees it.
+std::string ResultsDirectory();
+
+/// Replaces what is kept of an input's results by these, one line each with tabs between the
+/// fields. Nothing is kept where the directory cannot be written, which does not concern the
+/// comparison.
+void KeepResults(const std::string& testName, const std::vector<LikenessResult>& results);
+
+}  // namespace vela_test

@@ -1,0 +1,40 @@
+// The inputs of the comparison.
+#pragma once
+
+#include <functional>
+#include <ostream>
+#include <string>
+#include <vector>
+
+namespace vela_test {
+
+/// One input and what is to be made of it.
+struct LikenessSource {
+  std::string format;     ///< as a reader calls it
+  std::string says;       ///< what is special about it; unique within the format
+  std::string extension;  ///< of its file
+  /// Makes the file.
+  std::function<void(const std::string& path)> make;
+  /// By name, see vectors.h.
+  std::vector<std::string> vectors;
+  /// Thumbnails of the usual sizes; otherwise of sizes for the small pictures most inputs are.
+  bool isLarge = false;
+  /// Whether "[0]" stands behind its name.
+  bool firstPage = false;
+};
+
+/// For messages of failed comparisons.
+void PrintTo(const LikenessSource& source, std::ostream* out);
+
+/// Letters, digits and underscores only.
+std::string TestNameOf(const LikenessSource& source);
+
+std::vector<LikenessSource> JpegSources();
+std::vector<LikenessSource> PngSources();
+std::vector<LikenessSource> TiffSources();
+std::vector<LikenessSource> AnimationSources();   ///< GIF and WebP
+std::vector<LikenessSource> OtherSources();       ///< what is left
+std::vector<LikenessSource> DamagedSources();     ///< of every format
+std::vector<LikenessSource> CameraFileSources();  ///< of the folder with real ones; may be empty
+
+}  // namespace vela_test

@@ -1,0 +1,23 @@
+// The sets of arguments that every input of the comparison is converted with.
+#pragma once
+
+#include <string>
+#include <vector>
+
+#include "command_line.h"
+
+namespace vela_test {
+
+constexpr const char* kSix = "six";        ///< six outputs in one run, fitting, sharpened
+constexpr const char* kFill = "fill";      ///< filling the box, not sharpened
+constexpr const char* kTurned = "turned";  ///< two outputs, turned by 90 degrees
+constexpr const char* kSingle = "single";  ///< one small output, sharpened
+constexpr const char* kBare = "bare";      ///< two outputs, as little done to them as possible
+
+/// All of them.
+std::vector<std::string> AllVectors();
+
+/// The outputs of one, largest first. `large`: of the usual sizes, otherwise smaller ones.
+std::vector<ThumbOptions> OutputsOf(const std::string& vector, bool large);
+
+}  // namespace vela_test

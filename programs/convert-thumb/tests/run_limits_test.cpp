@@ -1,0 +1,180 @@
+// The limits of a run, and how it ends when it meets them.
+
+#include <gtest/gtest.h>
+#include <sys/resource.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <csignal>
+#include <functional>
+#include <thread>
+#include <vector>
+
+#include "confinement/memory_limit.h"
+#include "confinement/resource_limits.h"
+#include "converter_fixture.h"
+#include "encoding/unfinished_outputs.h"
+#include "imagemagick/image_magick_limits.h"
+#include "support/files.h"
+#include "support/images.h"
+#include "support/stub_files.h"
+#include "support/stub_tool.h"
+
+namespace vela_test {
+namespace {
+
+constexpr size_t kMebibyte = size_t{1} << 20;
+
+/// The status that a process of its own ends with after `work`; -1 when a signal ended it.
+int StatusOf(const std::function<int()>& work) {
+  const pid_t child = fork();
+  if (child == 0) {
+    _exit(work());
+  }
+  int status = 0;
+  EXPECT_EQ(waitpid(child, &status, 0), child);
+  return WIFEXITED(status) ? WEXITSTATUS(status) : -1;
+}
+
+rlimit LimitOf(int resource) {
+  rlimit limit = {};
+  getrlimit(static_cast<__rlimit_resource>(resource), &limit);
+  return limit;
+}
+
+class RunLimits : public ConverterTest {};
+
+TEST_F(RunLimits, AreReadFromTheSystemSettings) {
+  const size_t usual = ConversionMemoryLimit();
+  EXPECT_EQ(usual, 512 * kMebibyte);
+  for (const char* text : {"", "0", "-1", "many", "1e9", "512MiB", "99999999999999999999"}) {
+    WriteFile("/etc/velainfo.conf", std::string("convert_memory_limit=\"") + text + "\"\n");
+    EXPECT_EQ(ConversionMemoryLimit(), usual) << text;
+  }
+  WriteFile("/etc/velainfo.conf", "convert_memory_limit=\"100000000\"\n");
+  EXPECT_EQ(ConversionMemoryLimit(), 100000000U);
+}
+
+#ifndef __SANITIZE_ADDRESS__
+TEST_F(RunLimits, HoldForTheWholeProcess) {
+  EXPECT_EQ(
+      StatusOf([] {
+        LimitResources(100 * kMebibyte);
+        const rlim_t limit = LimitOf(RLIMIT_DATA).rlim_max;
+        return limit == LimitOf(RLIMIT_DATA).rlim_cur && limit > 100 * kMebibyte + kMemoryBesides
+                   ? static_cast<int>((limit - 100 * kMebibyte - kMemoryBesides) % kStackMemory)
+                   : 1;
+      }),
+      0);
+  EXPECT_EQ(StatusOf([] {
+              LimitResources(100 * kMebibyte);
+              std::vector<char> fits(90 * kMebibyte);
+              try {
+                std::vector<char> tooMuch(4000 * kMebibyte);
+              } catch (const std::bad_alloc&) {
+                return 0;
+              }
+              return 1;
+            }),
+            0);
+}
+
+TEST_F(RunLimits, DoNotWrapAround) {
+  EXPECT_EQ(StatusOf([] {
+              LimitResources(static_cast<size_t>(-1));
+              return LimitOf(RLIMIT_DATA).rlim_cur > 4000 * kMebibyte ? 0 : 1;
+            }),
+            0);
+}
+#endif
+
+TEST_F(RunLimits, AreNeverRaised) {
+  EXPECT_EQ(StatusOf([] {
+              const rlimit low = {20, 30};
+              setrlimit(RLIMIT_CPU, &low);
+              LimitResources(100 * kMebibyte);
+              const rlimit limit = LimitOf(RLIMIT_CPU);
+              return limit.rlim_cur == 20 && limit.rlim_max == 30 ? 0 : 1;
+            }),
+            0);
+}
+
+TEST_F(RunLimits, EndAnEndlessRun) {
+  EXPECT_EQ(StatusOf([] {
+              LimitResources(100 * kMebibyte);
+              const rlimit limit = LimitOf(RLIMIT_CPU);
+              return limit.rlim_cur == kMostProcessorSeconds && limit.rlim_max > limit.rlim_cur &&
+                             limit.rlim_max < 2 * kMostProcessorSeconds
+                         ? 0
+                         : 1;
+            }),
+            0);
+}
+
+TEST_F(RunLimits, EndCleanly) {
+  for (const int signal : {SIGABRT, SIGTRAP, SIGBUS, SIGXCPU}) {
+    const std::string one = directory_ + "/one.jpg";
+    const std::string two = directory_ + "/two.jpg";
+    const std::string other = directory_ + "/other.jpg";
+    for (const std::string& path : {one, two, other}) {
+      WriteFile(path, "part");
+    }
+    EXPECT_EQ(StatusOf([&] {
+                EndCleanlyOnFatalSignals();
+                std::thread([&] { NoteOutput(one); }).join();
+                NoteOutput(two);
+                raise(signal);
+                return 0;
+              }),
+              1)
+        << signal;
+    EXPECT_EQ(ListDirectory(directory_), std::vector<std::string>{"other.jpg"}) << signal;
+  }
+}
+
+TEST_F(RunLimits, LeaveNoOutputsOfAFailedRun) {
+  const std::string photo = MakePhoto("a.jpg", 700, 500);
+  CommandLine line = Line(photo, UsualOutputs(), "ours");
+  line.outputs.back().path = directory_ + "/missing/a.jpg";
+  EXPECT_EQ(RunProgram(ConvertThumbPath(), line.Arguments()).exitCode, 1);
+  EXPECT_EQ(ListDirectory(directory_), std::vector<std::string>{"a.jpg"});
+}
+
+class ImageMagickLimits : public ConverterTest {
+ protected:
+  /// What ImageMagick's environment says when the converter's says `given`.
+  static std::string Environment(const std::vector<std::string>& given) {
+    const StubTool stub(kImageMagick);
+    stub.Plan(StubPlan().Run("/usr/bin/env", {}));
+    ProgramOptions options;
+    options.addedEnvironment = given;
+    options.addedEnvironment.push_back(std::string("TMPDIR=") + kStubDirectory);
+    return RunProgram(ConvertThumbPath(), {"/a.jpg", "-negate", "/tmp/b.png"}, options).out;
+  }
+
+  static bool Says(const std::string& environment, const std::string& line) {
+    return ("\n" + environment).find("\n" + line + "\n") != std::string::npos;
+  }
+};
+
+TEST_F(ImageMagickLimits, FollowTheMemoryLimit) {
+  const std::string usual = Environment({});
+  EXPECT_TRUE(Says(usual, "MAGICK_MEMORY_LIMIT=268435456")) << usual;
+  EXPECT_TRUE(Says(usual, "MAGICK_MAP_LIMIT=536870912")) << usual;
+  WriteFile("/etc/velainfo.conf", "convert_memory_limit=\"100000000\"\n");
+  EXPECT_TRUE(Says(Environment({}), "MAGICK_MEMORY_LIMIT=50000000"));
+}
+
+TEST_F(ImageMagickLimits, StayWhenTheyAreLower) {
+  for (const char* low : {"64MiB", "64MB", "1000", "200m", "0.1GiB", "0"}) {
+    const std::string line = std::string("MAGICK_MEMORY_LIMIT=") + low;
+    EXPECT_TRUE(Says(Environment({line}), line)) << low;
+  }
+  for (const char* high : {"1GiB", "1TB", "unlimited", "", "-1", "268435457", "300MB"}) {
+    const std::string line = std::string("MAGICK_MEMORY_LIMIT=") + high;
+    EXPECT_TRUE(Says(Environment({line}), "MAGICK_MEMORY_LIMIT=268435456")) << high;
+  }
+}
+
+}  // namespace
+}  // namespace vela_test

@@ -1,0 +1,171 @@
+// Turning a JPEG where it is, without decoding it.
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+#include <sys/stat.h>
+
+#include "converter_fixture.h"
+#include "support/files.h"
+#include "support/image_checks.h"
+#include "support/images.h"
+#include "support/missing_library.h"
+#include "support/mounts.h"
+#include "support/stub_files.h"
+#include "support/stub_tool.h"
+
+namespace vela_test {
+namespace {
+
+using ::testing::ElementsAre;
+using ::testing::SizeIs;
+using ::testing::StartsWith;
+
+class TurnInPlace : public ConverterTest {
+ protected:
+  const std::string photo_ = directory_ + "/photo.jpg";
+
+  static ProgramResult Turn(const std::string& degrees, const std::string& path) {
+    return RunProgram(ConvertThumbPath(), {"-rotate", degrees, path, path});
+  }
+
+  /// Any turn that is not done here fails.
+  static void TakeImageMagickAway() { RemoveTool(kImageMagick); }
+};
+
+TEST_F(TurnInPlace, IsDoneHere) {
+  TakeImageMagickAway();
+  for (const int degrees : {90, 180, 270}) {
+    MakeJpeg(photo_);
+    const ProgramResult result = Turn(std::to_string(degrees), photo_);
+    EXPECT_EQ(result.exitCode, 0) << result.err;
+    EXPECT_EQ(QuadrantLetters(photo_), LettersAfterTurn(degrees));
+  }
+  EXPECT_THAT(ListDirectory(directory_), ElementsAre("photo.jpg"));
+}
+
+TEST_F(TurnInPlace, LosesNothing) {
+  MakePhoto("photo.jpg", 320, 240);
+  TakeImageMagickAway();
+  const std::string original = directory_ + "/original.jpg";
+  CopyFile(photo_, original);
+  for (int turn = 0; turn < 4; ++turn) {
+    ASSERT_EQ(Turn("90", photo_).exitCode, 0);
+  }
+  constexpr double kSamePixels = 1000;
+  EXPECT_EQ(Compare(photo_, original).decibels, kSamePixels);
+}
+
+TEST_F(TurnInPlace, KeepsMetadata) {
+  TakeImageMagickAway();
+  JpegRecipe recipe;
+  recipe.orientation = 6;
+  recipe.xmp = true;
+  recipe.iccProfile = true;
+  recipe.comment = "as it was";
+  MakeJpeg(photo_, recipe);
+  const std::string before = ReadFile(photo_);
+  ASSERT_EQ(Turn("90", photo_).exitCode, 0);
+  const std::string after = ReadFile(photo_);
+  // Everything in front of the picture's own tables.
+  const size_t tables = before.find("\xFF\xDB");
+  ASSERT_NE(tables, std::string::npos);
+  EXPECT_EQ(after.substr(0, tables), before.substr(0, tables));
+}
+
+TEST_F(TurnInPlace, KeepsThePermissions) {
+  MakeJpeg(photo_);
+  ASSERT_EQ(chmod(photo_.c_str(), 0640), 0);
+  ASSERT_EQ(Turn("90", photo_).exitCode, 0);
+  struct stat status {};
+  ASSERT_EQ(stat(photo_.c_str(), &status), 0);
+  EXPECT_EQ(status.st_mode & 07777U, 0640U);
+}
+
+TEST_F(TurnInPlace, TakesAnyName) {
+  TakeImageMagickAway();
+  for (const char* name : {"a b.jpg", "%d.jpg", "100%.jpg", "odd[1]*.jpg", "new\nline.jpg",
+                           "\xFF.jpg", "png:x.jpg", "-x.jpg", "picture"}) {
+    const std::string path = directory_ + "/" + name;
+    MakeJpeg(path);
+    EXPECT_EQ(Turn("90", path).exitCode, 0) << name;
+    EXPECT_EQ(QuadrantLetters(path), LettersAfterTurn(90)) << name;
+  }
+}
+
+TEST_F(TurnInPlace, LeavesPicturesThatEndWithinABlockToImageMagick) {
+  JpegRecipe recipe;
+  recipe.width = 70;
+  recipe.height = 50;
+  MakeJpeg(photo_, recipe);
+  const ProgramResult result = Turn("90", photo_);
+  EXPECT_EQ(result.exitCode, 0) << result.err;
+  EXPECT_EQ(QuadrantLetters(photo_), LettersAfterTurn(90));
+  EXPECT_EQ(DecodeJpeg(photo_)->Width(), 50);
+  EXPECT_EQ(DecodeJpeg(photo_)->Height(), 70);
+}
+
+TEST_F(TurnInPlace, LeavesOtherRequestsToImageMagick) {
+  MakeDirectories("/usr/vela/lib");
+  const StubTool imageMagick("/usr/vela/lib/convert-thumb");
+  MakeJpeg(photo_);
+  const std::string png = MakeImage(directory_ + "/a.png");
+  // Where the stub records its calls, it has to be able to write.
+  ProgramOptions options;
+  options.addedEnvironment = {std::string("TMPDIR=") + kStubDirectory};
+  const std::vector<std::vector<std::string>> requests = {{"-rotate", "0", photo_, photo_},
+                                                          {"-rotate", "45", photo_, photo_},
+                                                          {"-rotate", "90", png, png},
+                                                          {"-rotate", "90", photo_, png}};
+  for (const std::vector<std::string>& request : requests) {
+    RunProgram(ConvertThumbPath(), request, options);
+  }
+  EXPECT_THAT(imageMagick.Calls(), SizeIs(4));
+}
+
+TEST_F(TurnInPlace, LeavesDamagedFilesToImageMagick) {
+  TakeImageMagickAway();
+  MakeTruncatedJpeg(photo_);
+  const std::string before = ReadFile(photo_);
+  EXPECT_EQ(Turn("90", photo_).exitCode, 1);
+  EXPECT_EQ(ReadFile(photo_), before);
+}
+
+TEST_F(TurnInPlace, IsImageMagicksWithoutTheLibrary) {
+  const MissingLibrary missing("libturbojpeg");
+  MakeJpeg(photo_);
+  const ProgramResult result = Turn("90", photo_);
+  EXPECT_EQ(result.exitCode, 0) << result.err;
+  EXPECT_EQ(QuadrantLetters(photo_), LettersAfterTurn(90));
+}
+
+TEST_F(TurnInPlace, LeavesLargePicturesToImageMagick) {
+  WriteFile("/etc/velainfo.conf", "convert_memory_limit=\"1000000\"\n");
+  MakePhoto("photo.jpg", 640, 480);
+  TakeImageMagickAway();
+  EXPECT_EQ(Turn("90", photo_).exitCode, 1);
+}
+
+TEST_F(TurnInPlace, OnAFullVolumeNothingIsLost) {
+  SmallVolume volume(directory_, 1 << 20);
+  MakePhoto("photo.jpg", 640, 480);
+  const std::string before = ReadFile(photo_);
+  WriteFile(directory_ + "/filler", "");
+  volume.SetAvailable(0);
+  const ProgramResult result = Turn("90", photo_);
+  EXPECT_EQ(result.exitCode, 1);
+  EXPECT_THAT(result.err, StartsWith("convert-thumb: cannot replace " + photo_ + ": "));
+  EXPECT_EQ(ReadFile(photo_), before);
+  EXPECT_THAT(ListDirectory(directory_), ::testing::Not(::testing::Contains(StartsWith("VELA"))));
+}
+
+TEST_F(TurnInPlace, IsNotStoppedByWhatAKilledOneLeft) {
+  MakeJpeg(photo_);
+  Program program = StartProgram(
+      "/bin/sh", {"-c", "touch \"$1/VELAPHOTO.tmp.$$\"; exec \"$0\" -rotate 90 \"$2\" \"$2\"",
+                  ConvertThumbPath(), directory_, photo_});
+  EXPECT_EQ(program.Wait()->exitCode, 0);
+  EXPECT_THAT(ListDirectory(directory_), ElementsAre("photo.jpg"));
+}
+
+}  // namespace
+}  // namespace vela_test

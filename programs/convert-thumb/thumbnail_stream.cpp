@@ -1,0 +1,142 @@
+#include "thumbnail_stream.h"
+
+#include <algorithm>
+#include <utility>
+
+#include "picture/column_scaler.h"
+#include "picture/row_scaler.h"
+#include "picture/unsharp.h"
+
+namespace {
+
+constexpr int kUpright = 1;
+
+/// Whether the step works on rows of a photo that stands upright, in red, green and blue or grey.
+bool IsStreamed(const Step& step) {
+  switch (step.kind) {
+    case Step::Kind::kFlatten:
+    case Step::Kind::kAutoOrient:
+    case Step::Kind::kSharpen:
+    case Step::Kind::kConvertToSrgb:
+      return true;
+    case Step::Kind::kTurn:
+      return step.quarterTurns == 0;
+  }
+  return false;
+}
+
+bool KeepsProfile(const OutputPlan& output, const PhotoTraits& traits) {
+  return traits.space == ColourSpace::kRgb ||
+         std::none_of(output.steps.begin(), output.steps.end(),
+                      [](const Step& step) { return step.kind == Step::Kind::kConvertToSrgb; });
+}
+
+}  // namespace
+
+ResizePlan LaterResizePlan(PictureSize first, const ThumbnailBox& box, bool exact) {
+  ResizePlan plan;
+  plan.size = ThumbnailSize(first, box);
+  plan.filter = FilterKind::kMitchell;
+  plan.columnsFirst = exact && IsScaledDownFirst(first, plan.size);
+  plan.coarse = IsThinnedOut(first, plan.size);
+  return plan;
+}
+
+bool ThumbnailStream::Serves(const ConversionPlan& plan, const PhotoTraits& traits) {
+  const bool colours = traits.space == ColourSpace::kGrey || traits.space == ColourSpace::kRgb;
+  return traits.orientation == kUpright && colours &&
+         std::all_of(plan.outputs.begin(), plan.outputs.end(), [](const OutputPlan& output) {
+           return std::all_of(output.steps.begin(), output.steps.end(), IsStreamed);
+         });
+}
+
+/// Passes the rows of the first thumbnail on to those that it is complete for and to those that
+/// are scaled from it.
+class ThumbnailStream::Fork final : public RowSink {
+ public:
+  Fork(PictureSize size, int channels)
+      : block_(static_cast<size_t>(size.width) * static_cast<size_t>(channels), size.height) {}
+
+  void Add(RowSink& way) { ways_.push_back(&way); }
+
+  void Add(PictureSize size, int channels, const ResizePlan& resize, RowSink& next) {
+    if (resize.columnsFirst) {
+      columnScalers_.push_back(std::make_unique<ColumnScaler>(size, channels, resize, next));
+      Add(*columnScalers_.back());
+    } else {
+      scalers_.push_back(std::make_unique<BlockScaler>(size, channels, resize, next));
+    }
+  }
+
+  bool Put(const float* row) override {
+    const bool taken =
+        std::all_of(ways_.begin(), ways_.end(), [row](RowSink* way) { return way->Put(row); });
+    return taken && (scalers_.empty() || PutBlock(block_.Put(row)));
+  }
+
+ private:
+  bool PutBlock(int rows) {
+    return rows == 0 || std::all_of(scalers_.begin(), scalers_.end(), [&](const auto& scaler) {
+             return scaler->Put(block_.Lanes(), rows);
+           });
+  }
+
+  RowBlock block_;
+  std::vector<RowSink*> ways_;
+  std::vector<std::unique_ptr<BlockScaler>> scalers_;
+  std::vector<std::unique_ptr<ColumnScaler>> columnScalers_;
+};
+
+ThumbnailStream::ThumbnailStream(PictureSize first, int channels, const ConversionPlan& plan,
+                                 const PhotoTraits& traits, bool exact)
+    : channels_(channels), traits_(traits) {
+  const OutputPlan& firstOutput = plan.outputs.front();
+  const bool withProfile = KeepsProfile(firstOutput, traits);
+  auto fork = std::make_unique<Fork>(first, channels);
+  fork->Add(*AddEncoder(first, firstOutput.quality, withProfile));
+  for (size_t i = 1; i < plan.outputs.size(); ++i) {
+    const OutputPlan& output = plan.outputs[i];
+    const ResizePlan resize = LaterResizePlan(first, output.box, exact);
+    RowSink* const encoder =
+        AddEncoder(resize.size, output.quality, withProfile && KeepsProfile(output, traits));
+    RowSink* const next = AddSharpening(resize.size, output, encoder);
+    if (resize.size.width == first.width && resize.size.height == first.height) {
+      fork->Add(*next);
+    } else {
+      fork->Add(first, channels, resize, *next);
+    }
+  }
+  const size_t rowSize = static_cast<size_t>(first.width) * static_cast<size_t>(channels);
+  queue_ = std::make_unique<RowQueue>(rowSize, *fork);
+  steps_.push_back(std::move(fork));
+  way_ = AddSharpening(first, firstOutput, queue_.get());
+}
+
+bool ThumbnailStream::Put(const float* row) {
+  failed_ = !way_->Put(row);
+  return !failed_;
+}
+
+bool ThumbnailStream::Complete() {
+  return queue_->Finish();
+}
+
+std::optional<EncodedJpeg> ThumbnailStream::Finish(size_t output) {
+  return encoders_[output]->Finish();
+}
+
+RowSink* ThumbnailStream::AddEncoder(PictureSize size, int quality, bool withProfile) {
+  encoders_.push_back(
+      std::make_unique<JpegEncoder>(size, channels_, traits_, quality, withProfile));
+  return encoders_.back().get();
+}
+
+RowSink* ThumbnailStream::AddSharpening(PictureSize size, const OutputPlan& output, RowSink* next) {
+  for (auto step = output.steps.rbegin(); step != output.steps.rend(); ++step) {
+    if (step->kind == Step::Kind::kSharpen) {
+      steps_.push_back(std::make_unique<RowSharpener>(size, channels_, step->unsharp, *next));
+      next = steps_.back().get();
+    }
+  }
+  return next;
+}

@@ -1,0 +1,79 @@
+// A photo on its whole way to thumbnails.
+
+#include <fcntl.h>
+
+#include <cstdlib>
+#include <fstream>
+#include <iterator>
+#include <memory>
+
+#include "input_file.h"
+#include "decoding/photo_opener.h"
+#include "thumb/descriptor.h"
+#include "thumbnails.h"
+#include "encoding/unfinished_outputs.h"
+
+namespace {
+
+/// Small enough for what is left to be told from a leak.
+constexpr size_t kMemoryLimit = size_t{32} << 20;
+/// Larger pictures take too long to look at many.
+constexpr int64_t kMostPixels = 1000000;
+
+Step MakeStep(Step::Kind kind, int quarterTurns = 0) {
+  Step step;
+  step.kind = kind;
+  step.quarterTurns = quarterTurns;
+  return step;
+}
+
+OutputPlan MakeOutput(const std::string& path, const ThumbnailBox& box, int quarterTurns) {
+  OutputPlan output;
+  output.box = box;
+  output.quality = 85;
+  output.steps = {MakeStep(Step::Kind::kFlatten), MakeStep(Step::Kind::kAutoOrient),
+                  MakeStep(Step::Kind::kTurn, quarterTurns), MakeStep(Step::Kind::kSharpen),
+                  MakeStep(Step::Kind::kConvertToSrgb)};
+  output.path = path;
+  return output;
+}
+
+bool IsWholeJpeg(const std::string& path) {
+  std::ifstream file(path, std::ios::binary);
+  const std::string bytes((std::istreambuf_iterator<char>(file)), std::istreambuf_iterator<char>());
+  return bytes.size() > 4 && bytes.compare(0, 2, "\xFF\xD8") == 0 &&
+         bytes.compare(bytes.size() - 2, 2, "\xFF\xD9") == 0;
+}
+
+bool IsSmall(const PhotoReader& reader) {
+  const PictureSize size = reader.FullSize();
+  return int64_t{size.width} * size.height <= kMostPixels;
+}
+
+}  // namespace
+
+/// A million runs in one process would fill its list.
+void NoteOutput(const std::string& /*path*/) {}
+
+extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
+  const InputFile input(data, size);
+  const InputFile first(nullptr, 0);
+  const InputFile second(nullptr, 0);
+  ConversionPlan plan;
+  plan.source = input.Path();
+  plan.firstPageOnly = true;
+  // What is turned is made of whole pictures, what is not while it is decoded.
+  const int quarterTurns = static_cast<int>(size % 2);
+  plan.outputs = {MakeOutput(first.Path(), {100, 80, false}, quarterTurns),
+                  MakeOutput(second.Path(), {20, 20, true}, quarterTurns)};
+  const Descriptor file(open(input.Path().c_str(), O_RDONLY | O_CLOEXEC));
+  const std::unique_ptr<PhotoReader> reader = OpenPhoto(file.Get(), plan, kMemoryLimit);
+  if (reader == nullptr || !IsSmall(*reader)) {
+    return 0;
+  }
+  if (MakeThumbnails(*reader, plan, kMemoryLimit) &&
+      (!IsWholeJpeg(first.Path()) || !IsWholeJpeg(second.Path()))) {
+    std::abort();
+  }
+  return 0;
+}

@@ -1,0 +1,23 @@
+// A machine without some library.
+#pragma once
+
+#include <string>
+#include <vector>
+
+namespace vela_test {
+
+/// For as long as the object lives, no program that is started can load the library: an empty file
+/// hides it. Programs that have loaded it keep it.
+class MissingLibrary {
+ public:
+  /// `name`: that of the library's file up to ".so", such as "libavformat".
+  explicit MissingLibrary(const std::string& name);
+  ~MissingLibrary();
+  MissingLibrary(const MissingLibrary&) = delete;
+  MissingLibrary& operator=(const MissingLibrary&) = delete;
+
+ private:
+  std::vector<std::string> hidden_;
+};
+
+}  // namespace vela_test
