@@ -1,10 +1,13 @@
 #include "timed_run.h"
 
+#include <errno.h>
 #include <fcntl.h>
 #include <spawn.h>
+#include <sys/resource.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <chrono>
 #include <cstdio>
 #include <cstdlib>
@@ -32,17 +35,28 @@ pid_t Start(const std::vector<std::string>& command) {
   return child;
 }
 
-int WaitFor(pid_t child, const std::function<void(int)>& whileRunning) {
+/// Returns its status; `usage` receives what it used.
+int WaitFor(pid_t child, const std::function<void(int)>& whileRunning, rusage& usage) {
   int status = 0;
   if (!whileRunning) {
-    waitpid(child, &status, 0);
+    wait4(child, &status, 0, &usage);
     return status;
   }
-  while (waitpid(child, &status, WNOHANG) == 0) {
+  while (wait4(child, &status, WNOHANG, &usage) == 0) {
     whileRunning(child);
     usleep(5000);
   }
   return status;
+}
+
+double Seconds(const timeval& time) {
+  return static_cast<double>(time.tv_sec) + static_cast<double>(time.tv_usec) / 1e6;
+}
+
+void TakeLess(Cost& best, const Cost& cost) {
+  best.wallSeconds = std::min(best.wallSeconds, cost.wallSeconds);
+  best.cpuSeconds = std::min(best.cpuSeconds, cost.cpuSeconds);
+  best.peakMebibytes = std::max(best.peakMebibytes, cost.peakMebibytes);
 }
 
 }  // namespace
@@ -51,32 +65,37 @@ Cost TimedRun(const std::vector<std::string>& command,
               const std::function<void(int)>& whileRunning) {
   const auto begin = std::chrono::steady_clock::now();
   const pid_t child = Start(command);
-  const int status = WaitFor(child, whileRunning);
+  rusage usage = {};
+  const int status = WaitFor(child, whileRunning, usage);
   const std::chrono::duration<double> wall = std::chrono::steady_clock::now() - begin;
   if (!WIFEXITED(status) || WEXITSTATUS(status) != 0) {
     Fail(command[0] + " ended with status " + std::to_string(status));
   }
-  return {wall.count()};
+  return {wall.count(), Seconds(usage.ru_utime) + Seconds(usage.ru_stime),
+          static_cast<double>(usage.ru_maxrss) / 1024};
 }
 
-CostPair FastestOf(int rounds, const std::function<Cost()>& subject,
-                   const std::function<Cost()>& floor) {
-  CostPair best;
-  for (int round = 0; round < rounds; ++round) {
-    const Cost floorCost = floor();
-    const Cost subjectCost = subject();
-    if (round == 0 || subjectCost.wallSeconds < best.subject.wallSeconds) {
-      best.subject = subjectCost;
-    }
-    if (round == 0 || floorCost.wallSeconds < best.floor.wallSeconds) {
-      best.floor = floorCost;
+std::vector<Cost> LeastOf(int rounds, const std::vector<std::function<Cost()>>& subjects) {
+  std::vector<Cost> best;
+  for (const std::function<Cost()>& subject : subjects) {
+    best.push_back(subject());
+  }
+  for (int round = 1; round < rounds; ++round) {
+    for (size_t i = 0; i < subjects.size(); ++i) {
+      TakeLess(best[i], subjects[i]());
     }
   }
   return best;
 }
 
+CostPair FastestOf(int rounds, const std::function<Cost()>& subject,
+                   const std::function<Cost()>& floor) {
+  const std::vector<Cost> best = LeastOf(rounds, {floor, subject});
+  return {best[1], best[0]};
+}
+
 void Fail(const std::string& message) {
-  std::fprintf(stderr, "velathumb_bench: %s\n", message.c_str());
+  std::fprintf(stderr, "%s: %s\n", program_invocation_short_name, message.c_str());
   std::exit(1);
 }
 

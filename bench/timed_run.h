@@ -1,4 +1,4 @@
-// Runs a program and tells what it took.
+// Runs programs and tells what they took.
 #pragma once
 
 #include <functional>
@@ -10,6 +10,8 @@ namespace vela_bench {
 /// What one run took.
 struct Cost {
   double wallSeconds = 0;
+  double cpuSeconds = 0;     ///< of user and system
+  double peakMebibytes = 0;  ///< resident memory
 };
 
 /// Runs `command` (path first) with its output thrown away, and waits for it. Ends the benchmark
@@ -18,8 +20,11 @@ struct Cost {
 Cost TimedRun(const std::vector<std::string>& command,
               const std::function<void(int)>& whileRunning = nullptr);
 
-/// Runs both commands alternately, `rounds` times each, and returns the cost of the fastest run of
-/// each: what other work on the machine adds falls on both, and only ever adds.
+/// Runs all subjects in turn, `rounds` times, and returns the least wall and processor time and the
+/// highest memory of each: what other work on the machine adds falls on all, and only ever adds.
+std::vector<Cost> LeastOf(int rounds, const std::vector<std::function<Cost()>>& subjects);
+
+/// The same for a subject and its floor.
 struct CostPair {
   Cost subject;
   Cost floor;

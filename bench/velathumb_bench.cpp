@@ -63,7 +63,7 @@ void MeasureConversion() {
   const std::vector<std::string> subject = {vela_test::VelathumbPath(), profiles, directory};
   {
     const vela_test::StubTool recorder(vela_test::kConverterPath);
-    recorder.Plan(vela_test::StubPlan().PassThrough("/usr/bin/convert"));
+    recorder.Plan(vela_test::StubPlan().PassThrough(vela_test::RealConverterPath()));
     TimedRun(subject);
     WriteCommands("/tmp/commands");
   }
