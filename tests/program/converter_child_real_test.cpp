@@ -72,7 +72,7 @@ bool IsTheConvertersOwn(const std::string& target) {
 TEST_F(ConverterChild, HasTheStandardDescriptorsOnly) {
   DaemonPeer daemon;
   const StubTool converter(kConverterPath);
-  converter.Plan(StubPlan().PassThrough(kRealConverter));
+  converter.Plan(StubPlan().PassThrough(RealConverterPath()));
   MakeJpeg(InPhotos("a.jpg"));
   WriteFile(InPhotos("b.jpg"), "no photo");
   MakeJpeg(InPhotos("c.jpg"));
@@ -95,7 +95,7 @@ TEST_F(ConverterChild, HasTheStandardDescriptorsOnly) {
 // Neither does it see what the program itself was started with.
 TEST_F(ConverterChild, HasNoneOfTheCallersDescriptors) {
   const StubTool converter(kConverterPath);
-  converter.Plan(StubPlan().PassThrough(kRealConverter));
+  converter.Plan(StubPlan().PassThrough(RealConverterPath()));
   const std::string photo = MakeJpeg(InPhotos("a.jpg"));
   const int file = open(photo.c_str(), O_RDONLY);
   ASSERT_GE(file, 3);
@@ -111,7 +111,7 @@ TEST_F(ConverterChild, HasNoneOfTheCallersDescriptors) {
 
 TEST_F(ConverterChild, StandardDescriptorsAreThereWhenTheCallerClosedThem) {
   const StubTool converter(kConverterPath);
-  converter.Plan(StubPlan().PassThrough(kRealConverter));
+  converter.Plan(StubPlan().PassThrough(RealConverterPath()));
   const std::string photo = MakeJpeg(InPhotos("a.jpg"));
   ProgramOptions options;
   options.closeInput = true;

@@ -51,7 +51,7 @@ TEST_F(FullDisk, FullBeforeTheFirstOutput) {
   const std::string photo = MakeDetailedPhoto("a.jpg");
   MakeDetailedPhoto("b.jpg");
   const StubTool converter(kConverterPath);
-  converter.Plan(StubPlan().FillVolume(kPhotos).PassThrough(kRealConverter));
+  converter.Plan(StubPlan().FillVolume(kPhotos).PassThrough(RealConverterPath()));
   const DaemonPeer daemon;
   Make();
   EXPECT_EQ(converter.Calls().size(), 1U);
@@ -72,8 +72,8 @@ TEST_F(FullDisk, FullBetweenTwoOutputs) {
   WriteKinds(kProfiles, FullKinds());
   const std::string photo = MakeDetailedPhoto("a.jpg");
   const StubTool converter(kConverterPath);
-  converter.PlanCall(2, StubPlan().FillVolume(kPhotos).PassThrough(kRealConverter));
-  converter.Plan(StubPlan().PassThrough(kRealConverter));
+  converter.PlanCall(2, StubPlan().FillVolume(kPhotos).PassThrough(RealConverterPath()));
+  converter.Plan(StubPlan().PassThrough(RealConverterPath()));
   Make();
   EXPECT_EQ(converter.Calls().size(), 2U);
   EXPECT_TRUE(HasThumbs(photo, OfPhase(FullKinds(), 0)));
@@ -89,8 +89,8 @@ TEST_F(FullDisk, FullAnywhereInTheOutputs) {
   StubTool converter(kConverterPath);
   converter.PlanWhen(
       photo,
-      StubPlan().CreateFile("/tmp/begun").WaitForFile("/tmp/go").PassThrough(kRealConverter));
-  converter.Plan(StubPlan().PassThrough(kRealConverter));
+      StubPlan().CreateFile("/tmp/begun").WaitForFile("/tmp/go").PassThrough(RealConverterPath()));
+  converter.Plan(StubPlan().PassThrough(RealConverterPath()));
   int made = 0;
   int failed = 0;
   for (uint64_t pages = 0; pages < 200 && made == 0; pages += pages < 4 ? 1 : 5) {

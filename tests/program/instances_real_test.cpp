@@ -44,7 +44,7 @@ class Instances : public RealProgramTest {
   void SetUp() override {
     RealProgramTest::SetUp();
     converter_.emplace(kConverterPath);
-    converter_->Plan(StubPlan().PassThrough(kRealConverter));
+    converter_->Plan(StubPlan().PassThrough(RealConverterPath()));
   }
 
   void MakePhotos(int directories, int perDirectory) {

@@ -251,7 +251,7 @@ TEST_F(Interruption, SigtermEndsTheConvertersOfOtherInstances) {
   const StubTool converter(kConverterPath);
   converter.PlanCall(1, StubPlan().CreateFile("/tmp/hangs1").Sleep(60000));
   converter.PlanCall(2, StubPlan().CreateFile("/tmp/hangs2").Sleep(60000));
-  converter.Plan(StubPlan().PassThrough(kRealConverter));
+  converter.Plan(StubPlan().PassThrough(RealConverterPath()));
   Program other = StartProgram(VelathumbPath(), {kProfiles, InPhotos("d0")});
   ASSERT_TRUE(WaitUntilExists("/tmp/hangs1"));
   Program program = StartProgram(VelathumbPath(), {kProfiles, InPhotos("d1")});

@@ -259,7 +259,7 @@ std::vector<std::string> PidFiles() {
 }
 
 void Draw(const std::vector<std::string>& arguments) {
-  const ProgramResult result = RunProgram(kRealConverter, arguments);
+  const ProgramResult result = RunProgram(kImageMagickPath, arguments);
   EXPECT_EQ(result.exitCode, 0) << result.err;
 }
 

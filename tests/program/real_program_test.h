@@ -20,7 +20,6 @@ namespace vela_test::real {
 constexpr const char* kPhotos = "/tmp/photos";
 constexpr const char* kProfiles = "/tmp/profiles.conf";
 constexpr const char* kQueue = "/var/spool/thumb_create.queue";
-constexpr const char* kRealConverter = "/usr/bin/convert";
 
 /// One thumbnail that a profile file asks for.
 struct Kind {

@@ -1,5 +1,5 @@
-// A thumbnail never shows another photo's picture, even when the converter would take a photo's
-// name for a pattern or its content for a list of names.
+// A thumbnail never shows another photo's picture, even when ImageMagick would take a photo's name
+// for a pattern or its content for a list of names.
 #include "program/real_program_test.h"
 #include "support/images.h"
 
@@ -87,7 +87,7 @@ TEST_F(WrongPicture, NumbersInPagedNames) {
   ExpectOwnOrFailed("%d/p.tif", "0/p.tif");
 }
 
-// The converter leaves out the percent sign in front of a bracket.
+// ImageMagick leaves out the percent sign in front of a bracket.
 TEST_F(WrongPicture, PropertiesInPagedNames) {
   ExpectOwnOrFailed("%[x].tif", "[x].tif");
   ExpectOwnOrFailed("%[x]/p.tif", "[x]/p.tif");
@@ -99,7 +99,7 @@ TEST_F(WrongPicture, PrefixesInPagedNames) {
   ExpectOwnOrFailed("gif:d/p.gif", "d/p.gif");
 }
 
-// The converter reads a file with a wildcard in its name as a list of further arguments.
+// ImageMagick reads a file with a wildcard in its name as a list of further arguments.
 TEST_F(WrongPicture, TextThatNamesAnotherPhoto) {
   MakePlainPhoto("/tmp/private.png", kGreen);
   WriteFile(InPhotos("[1].jpg"), "/tmp/private.png\n");

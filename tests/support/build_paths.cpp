@@ -14,6 +14,10 @@ std::string StubToolPath() {
   return HostPath(STUB_TOOL_FILE);
 }
 
+std::string OwnConverterPath() {
+  return HostPath(OWN_CONVERTER_FILE);
+}
+
 std::string SourceDirectory() {
   return HostPath(SOURCE_DIRECTORY);
 }

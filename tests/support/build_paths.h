@@ -11,6 +11,9 @@ std::string VelathumbPath();
 /// The recording stub that stands for the external tools.
 std::string StubToolPath();
 
+/// The project's own converter, `convert-thumb`.
+std::string OwnConverterPath();
+
 /// The top folder of the source tree.
 std::string SourceDirectory();
 

@@ -177,10 +177,21 @@ uint64_t NextSequence() {
   return CountUp(kStubSequenceFile);
 }
 
+bool IsOwnConverterReal() {
+  const char* const choice = getenv("VELA_TEST_CONVERTER");
+  return choice == nullptr || std::string(choice) != "imagemagick";
+}
+
+std::string RealConverterPath() {
+  return IsOwnConverterReal() ? OwnConverterPath() : kImageMagickPath;
+}
+
 void InstallRealConverter() {
   MakeDirectories("/usr/vela/lib");
-  InstallLink("/usr/bin/convert", "/usr/vela/lib/convert-thumb");
-  InstallLink(SourceDirectory() + "/programs/convert-thumb/convert-thumb.sh", kConverterPath);
+  InstallLink(kImageMagickPath, "/usr/vela/lib/convert-thumb");
+  InstallLink(IsOwnConverterReal() ? OwnConverterPath()
+                                   : SourceDirectory() + "/programs/convert-thumb/convert-thumb.sh",
+              kConverterPath);
 }
 
 void InstallRealExiftool() {

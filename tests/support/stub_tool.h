@@ -12,6 +12,8 @@
 namespace vela_test {
 
 constexpr const char* kConverterPath = "/usr/vela/bin/convert-thumb";
+/// ImageMagick's own program, whatever else is called convert on this machine.
+constexpr const char* kImageMagickPath = "/usr/bin/convert-im6.q16";
 constexpr const char* kExiftoolPath = "/usr/vela/bin/exiftool";
 constexpr const char* kDcrawPath = "/usr/bin/dcraw";
 constexpr const char* kComparePath = "/usr/bin/compare";
@@ -74,7 +76,13 @@ std::vector<StubCall> AllStubCalls();
 /// whatever the test itself numbers.
 uint64_t NextSequence();
 
-/// Symbolic links to the machine's real tools at the places where the program looks for them.
+/// Which converter is the real one: the project's own, or ImageMagick when the environment has
+/// VELA_TEST_CONVERTER=imagemagick.
+bool IsOwnConverterReal();
+/// The real converter's program.
+std::string RealConverterPath();
+
+/// The real tools at the places where the program looks for them.
 void InstallRealConverter();
 void InstallRealExiftool();
 /// Both; dcraw and compare are at their places in a fresh sandbox.
