@@ -12,6 +12,8 @@ namespace {
 constexpr size_t kLongestLine = 8192;
 
 std::atomic_flag g_told = ATOMIC_FLAG_INIT;
+char g_line[kLongestLine] = "";
+std::atomic<bool> g_isLineWhole{false};
 
 bool IsControl(char character) {
   return static_cast<unsigned char>(character) < ' ';
@@ -33,11 +35,16 @@ void TellFailure(const char* format, ...) {
   if (g_told.test_and_set()) {
     return;
   }
-  char line[kLongestLine] = "";
   std::va_list arguments;
   va_start(arguments, format);
-  std::vsnprintf(line, sizeof line, format, arguments);
+  std::vsnprintf(g_line, sizeof g_line, format, arguments);
   va_end(arguments);
-  MakeOneLine(line);
-  std::fprintf(stderr, "convert-thumb: %s\n", line);
+  MakeOneLine(g_line);
+  g_isLineWhole = true;
+}
+
+void WriteFailureLine() {
+  if (g_isLineWhole) {
+    std::fprintf(stderr, "convert-thumb: %s\n", g_line);
+  }
 }

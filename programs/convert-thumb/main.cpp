@@ -24,6 +24,7 @@
 #include "thumb/descriptor.h"
 #include "thumbnails.h"
 #include "turning/jpeg_turn.h"
+#include "write_signals.h"
 
 namespace {
 
@@ -31,8 +32,8 @@ constexpr int kDone = 0;
 constexpr int kFailed = 1;
 
 /// Returns only when ImageMagick could not be started.
-int LeaveToImageMagick(const std::vector<std::string>& arguments) {
-  HandOver(arguments);
+int LeaveToImageMagick(const std::vector<std::string>& arguments, size_t memoryLimit) {
+  HandOver(arguments, memoryLimit);
   return kFailed;
 }
 
@@ -41,7 +42,8 @@ bool IsRegularFile(int descriptor) {
   return fstat(descriptor, &status) == 0 && S_ISREG(status.st_mode);
 }
 
-int Convert(const ConversionPlan& plan, const std::vector<std::string>& arguments) {
+int Convert(const ConversionPlan& plan, const std::vector<std::string>& arguments,
+            size_t memoryLimit) {
   // Opening must not wait when the source is a pipe.
   const Descriptor file(open(plan.source.c_str(), O_RDONLY | O_CLOEXEC | O_NOCTTY | O_NONBLOCK));
   if (!file.IsOpen()) {
@@ -49,31 +51,30 @@ int Convert(const ConversionPlan& plan, const std::vector<std::string>& argument
     return kFailed;
   }
   if (!IsRegularFile(file.Get())) {
-    return LeaveToImageMagick(arguments);
+    return LeaveToImageMagick(arguments, memoryLimit);
   }
-  const size_t memoryLimit = ConversionMemoryLimit();
   const std::unique_ptr<PhotoReader> reader = OpenPhoto(file.Get(), plan, memoryLimit);
   if (reader == nullptr) {
-    return LeaveToImageMagick(arguments);
+    return LeaveToImageMagick(arguments, memoryLimit);
   }
   ConfineToThisProgram();
   return MakeThumbnails(*reader, plan, memoryLimit) ? kDone : kFailed;
 }
 
-int TurnFile(const TurnPlan& plan, const std::vector<std::string>& arguments) {
-  const FileTurn turn = TurnJpegFile(plan.path, plan.quarterTurns, ConversionMemoryLimit());
+int TurnFile(const TurnPlan& plan, const std::vector<std::string>& arguments, size_t memoryLimit) {
+  const FileTurn turn = TurnJpegFile(plan.path, plan.quarterTurns, memoryLimit);
   if (turn == FileTurn::kImpossible) {
-    return LeaveToImageMagick(arguments);
+    return LeaveToImageMagick(arguments, memoryLimit);
   }
   return turn == FileTurn::kDone ? kDone : kFailed;
 }
 
-int Run(const std::vector<std::string>& arguments) {
+int Run(const std::vector<std::string>& arguments, size_t memoryLimit) {
   if (const std::optional<TurnPlan> turn = ParseTurn(arguments)) {
-    return TurnFile(*turn, arguments);
+    return TurnFile(*turn, arguments, memoryLimit);
   }
   const std::optional<ConversionPlan> plan = ParseConversion(arguments);
-  return plan ? Convert(*plan, arguments) : LeaveToImageMagick(arguments);
+  return plan ? Convert(*plan, arguments, memoryLimit) : LeaveToImageMagick(arguments, memoryLimit);
 }
 
 }  // namespace
@@ -82,10 +83,12 @@ int main(int argc, char** argv) {
   int status = kFailed;
   try {
     const std::vector<std::string> arguments(argv + (argc > 0 ? 1 : 0), argv + argc);
+    IgnoreWriteSignals();
     EndCleanlyOnFatalSignals();
-    LimitResources(ConversionMemoryLimit());
+    const size_t memoryLimit = ConversionMemoryLimit();
+    LimitResources(memoryLimit);
     Confine(FindWritablePlaces(arguments));
-    status = Run(arguments);
+    status = Run(arguments, memoryLimit);
   } catch (const std::bad_alloc&) {
     TellFailure("out of memory");
   } catch (const std::exception& error) {
@@ -93,6 +96,7 @@ int main(int argc, char** argv) {
   }
   if (status != kDone) {
     RemoveNotedOutputs();
+    WriteFailureLine();
   }
   return status;
 }

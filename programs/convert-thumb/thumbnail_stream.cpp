@@ -26,7 +26,7 @@ bool IsStreamed(const Step& step) {
 }
 
 bool KeepsProfile(const OutputPlan& output, const PhotoTraits& traits) {
-  return traits.space == ColourSpace::kRgb ||
+  return ProfileOutlivesConversion(traits.space) ||
          std::none_of(output.steps.begin(), output.steps.end(),
                       [](const Step& step) { return step.kind == Step::Kind::kConvertToSrgb; });
 }
@@ -121,7 +121,17 @@ bool ThumbnailStream::Complete() {
   return queue_->Finish();
 }
 
-std::optional<EncodedJpeg> ThumbnailStream::Finish(size_t output) {
+std::string ThumbnailStream::Error() const {
+  for (const std::unique_ptr<JpegEncoder>& encoder : encoders_) {
+    if (const std::string error = encoder->Error(); !error.empty()) {
+      return error;
+    }
+  }
+  // Nothing but memory is needed besides.
+  return "out of memory";
+}
+
+EncodedJpeg ThumbnailStream::Finish(size_t output) {
   return encoders_[output]->Finish();
 }
 

@@ -3,7 +3,7 @@
 
 #include <cstddef>
 #include <memory>
-#include <optional>
+#include <string>
 #include <vector>
 
 #include "command_line/conversion_plan.h"
@@ -30,15 +30,18 @@ class ThumbnailStream final : public RowSink {
 
   bool Put(const float* row) override;
 
-  /// Whether memory has run out.
+  /// Whether Put has refused a row.
   bool HasFailed() const { return failed_; }
 
-  /// To be called after the last row. False when memory has run out.
+  /// To be called after the last row. False when a row could not be encoded.
   bool Complete();
 
-  /// The output at this place of the plan, after Complete; empty when memory runs out. Any
-  /// thread may call it, once for each output.
-  std::optional<EncodedJpeg> Finish(size_t output);
+  /// Why a row was refused or could not be encoded.
+  std::string Error() const;
+
+  /// The output at this place of the plan, after Complete. Any thread may call it, once for each
+  /// output.
+  EncodedJpeg Finish(size_t output);
 
  private:
   class Fork;

@@ -27,9 +27,8 @@ struct Thumbnail {
   bool withProfile = true;
 };
 
-/// The profile of the old space is of no use in the new one.
 void ConvertToSrgb(Thumbnail& thumbnail) {
-  thumbnail.withProfile = thumbnail.withProfile && thumbnail.space == ColourSpace::kRgb;
+  thumbnail.withProfile = thumbnail.withProfile && ProfileOutlivesConversion(thumbnail.space);
   ConvertToRgb(thumbnail.picture, thumbnail.space);
   thumbnail.space = ColourSpace::kRgb;
 }
@@ -61,8 +60,12 @@ void ApplySteps(const OutputPlan& output, Thumbnail& thumbnail) {
   }
 }
 
-bool Write(const std::optional<EncodedJpeg>& jpeg, const OutputPlan& output) {
-  if (!jpeg || !WriteOutputFile(output.path, jpeg->bytes.get(), jpeg->size)) {
+bool Write(const EncodedJpeg& jpeg, const OutputPlan& output) {
+  if (!jpeg.IsComplete()) {
+    TellFailure("cannot encode %s: %s", output.path.c_str(), jpeg.error.c_str());
+    return false;
+  }
+  if (!WriteOutputFile(output.path, jpeg.bytes.get(), jpeg.size)) {
     TellFailure("cannot write %s", output.path.c_str());
     return false;
   }
@@ -70,14 +73,17 @@ bool Write(const std::optional<EncodedJpeg>& jpeg, const OutputPlan& output) {
 }
 
 void TellUndecodable(const PhotoReader& reader) {
-  TellFailure("cannot decode the photo: %s", reader.Error());
+  // What fails without the decoder's knowledge has run out of memory.
+  const char* const error = *reader.Error() == '\0' ? "out of memory" : reader.Error();
+  TellFailure("cannot decode the photo: %s", error);
 }
 
 /// What a turned copy of a thumbnail and what the encoder holds of it take, bytes a sample.
 constexpr size_t kBytesBesides = 4;
 
-/// Bytes besides the decoder's that the first thumbnail takes.
-size_t MemoryOfFirst(const PhotoReader& reader, const ResizePlan& resize) {
+/// Bytes besides the decoder's that making a thumbnail, which is not larger than the first, takes
+/// without sharpening it.
+size_t MemoryOfScaling(const PhotoReader& reader, const ResizePlan& resize) {
   const size_t samples = static_cast<size_t>(resize.size.width) *
                          static_cast<size_t>(resize.size.height) *
                          static_cast<size_t>(reader.Channels());
@@ -85,10 +91,37 @@ size_t MemoryOfFirst(const PhotoReader& reader, const ResizePlan& resize) {
          samples * kBytesBesides;
 }
 
-/// The same when all thumbnails are made at the same time: none is larger than the first.
+/// Bytes that the output's sharpening takes when it is as large as the first.
+size_t MemoryOfSharpening(const PhotoReader& reader, const ResizePlan& resize,
+                          const OutputPlan& output) {
+  size_t bytes = 0;
+  for (const Step& step : output.steps) {
+    if (step.kind == Step::Kind::kSharpen) {
+      bytes += RowSharpener::Memory(resize.size, reader.Channels(), step.unsharp);
+    }
+  }
+  return bytes;
+}
+
+/// Bytes that the thumbnails take when each step is done to a whole picture: no output takes more
+/// than the first does while it is scaled, but for its sharpening.
+size_t MemoryOfWholePictures(const PhotoReader& reader, const ResizePlan& resize,
+                             const ConversionPlan& plan) {
+  size_t sharpening = 0;
+  for (const OutputPlan& output : plan.outputs) {
+    sharpening = std::max(sharpening, MemoryOfSharpening(reader, resize, output));
+  }
+  return RowsAhead::Memory(reader) + MemoryOfScaling(reader, resize) + sharpening;
+}
+
+/// Bytes that they take when all are made at the same time.
 size_t MemoryOfAll(const PhotoReader& reader, const ResizePlan& resize,
                    const ConversionPlan& plan) {
-  return MemoryOfFirst(reader, resize) * plan.outputs.size();
+  size_t bytes = RowsAhead::Memory(reader);
+  for (const OutputPlan& output : plan.outputs) {
+    bytes += MemoryOfScaling(reader, resize) + MemoryOfSharpening(reader, resize, output);
+  }
+  return bytes;
 }
 
 /// Scales a photo whose decoding has been started; false when a row cannot be decoded or `out`
@@ -161,7 +194,7 @@ bool MakeWhileDecoding(PhotoReader& reader, const ResizePlan& resize, const Conv
     return false;
   }
   if (!decoded || !stream.Complete()) {
-    TellFailure("out of memory");
+    TellFailure("cannot encode the thumbnails: %s", stream.Error().c_str());
     return false;
   }
   return DoInTwoThreads(plan.outputs.size(),
@@ -185,7 +218,7 @@ bool MakeThumbnails(PhotoReader& reader, const ConversionPlan& plan, size_t memo
   if (!resize) {
     return false;
   }
-  if (MemoryOfFirst(reader, *resize) > memoryLimit) {
+  if (MemoryOfWholePictures(reader, *resize, plan) > memoryLimit) {
     TellFailure("%s would take too much memory", plan.outputs.front().path.c_str());
     return false;
   }

@@ -7,11 +7,11 @@
 #include <iterator>
 #include <memory>
 
-#include "input_file.h"
 #include "decoding/photo_opener.h"
+#include "encoding/unfinished_outputs.h"
+#include "input_file.h"
 #include "thumb/descriptor.h"
 #include "thumbnails.h"
-#include "encoding/unfinished_outputs.h"
 
 namespace {
 
@@ -53,7 +53,11 @@ bool IsSmall(const PhotoReader& reader) {
 }  // namespace
 
 /// A million runs in one process would fill its list.
-void NoteOutput(const std::string& /*path*/) {}
+bool NoteOutput(const std::string& /*path*/) {
+  return true;
+}
+
+void ForgetOutput(const std::string& /*path*/) {}
 
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
   const InputFile input(data, size);

@@ -8,5 +8,6 @@
 /// thumbnails do not need. Called while there is one thread. What the kernel cannot do is left out.
 void Confine(const WritablePlaces& places);
 
-/// No other program takes over any more, none can be started. After Confine.
+/// No other program takes over any more, none can be started, by any thread: libraries may have
+/// started some. After Confine.
 void ConfineToThisProgram();

@@ -3,6 +3,8 @@
 
 #include <cstddef>
 
-/// `convert_memory_limit` of the system settings, in bytes; when it is absent or no number, what
-/// was chosen when the program was built (VELA_CONVERT_MEMORY_LIMIT).
+/// `convert_memory_limit` of the system settings, in bytes: a number, which K, M or G behind it
+/// multiplies by 1024, its square or its cube. When it is absent or empty, what was chosen when the
+/// program was built (VELA_CONVERT_MEMORY_LIMIT); the same, after one line on standard error, when
+/// it is anything else.
 size_t ConversionMemoryLimit();

@@ -98,6 +98,10 @@ constexpr int kFileAttributes[] = {
     SCMP_SYS(fremovexattr), SCMP_SYS(symlink),   kRemovexattrat,         SCMP_SYS(symlinkat),
     kFileSetattr,           SCMP_SYS(link),      SCMP_SYS(linkat),       SCMP_SYS(truncate)};
 
+/// Of the flags of clone. That of clocks' namespaces means part of a signal's number there.
+constexpr uint64_t kNewNamespace[] = {CLONE_NEWNS,   CLONE_NEWCGROUP, CLONE_NEWUTS, CLONE_NEWIPC,
+                                      CLONE_NEWUSER, CLONE_NEWPID,    CLONE_NEWNET};
+
 constexpr int kPrograms[] = {SCMP_SYS(execve), SCMP_SYS(execveat)};
 
 /// Rules of the kernel's filter of system calls, which lets pass what no rule is about. A call that
@@ -123,18 +127,36 @@ class SystemCallFilter {
   void Add(uint32_t action, int call) { Add(action, call, nullptr, 0); }
   void RefuseWhen(int call, scmp_arg_cmp argument) { Add(kRefuse, call, &argument, 1); }
 
+  /// For this thread and all that it starts.
   void Load() {
     if (context_ == nullptr) {
       return;
     }
+    SetAttributes();
+    seccomp_load(context_);
+  }
+
+  /// For all threads, or as Load where that is not possible.
+  void LoadForAllThreads() {
+    if (context_ == nullptr) {
+      return;
+    }
+    SetAttributes();
+    seccomp_attr_set(context_, SCMP_FLTATR_CTL_TSYNC, 1);
+    if (seccomp_load(context_) != 0) {
+      seccomp_attr_set(context_, SCMP_FLTATR_CTL_TSYNC, 0);
+      seccomp_load(context_);
+    }
+  }
+
+ private:
+  void SetAttributes() {
     // Other calling conventions have other numbers; none of the programs uses them.
     seccomp_attr_set(context_, SCMP_FLTATR_ACT_BADARCH, kRefuse);
     // This process has no secrets from itself that would be worth to decode slower for.
     seccomp_attr_set(context_, SCMP_FLTATR_CTL_SSB, 1);
-    seccomp_load(context_);
   }
 
- private:
   void Add(uint32_t action, int call, const scmp_arg_cmp* arguments, unsigned count) {
     if (context_ != nullptr) {
       seccomp_rule_add_array(context_, action, call, count, arguments);
@@ -156,11 +178,15 @@ void RefuseForeignSystemCalls() {
   filter.Refuse(kOtherProcesses);
   filter.Refuse(kSystem);
   filter.Refuse(kFileAttributes);
-  // A namespace of its own would give privileges back.
-  filter.RefuseWhen(SCMP_SYS(clone), Compare(0, SCMP_CMP_MASKED_EQ, CLONE_NEWUSER, CLONE_NEWUSER));
+  // Namespaces of its own would give privileges back.
+  for (const uint64_t flag : kNewNamespace) {
+    filter.RefuseWhen(SCMP_SYS(clone), Compare(0, SCMP_CMP_MASKED_EQ, flag, flag));
+  }
   filter.Add(kUnknown, SCMP_SYS(clone3));
-  // Types into the terminal that the program was started from.
-  filter.RefuseWhen(SCMP_SYS(ioctl), Compare(1, SCMP_CMP_MASKED_EQ, UINT32_MAX, TIOCSTI));
+  // Type into the terminal that the program was started from, or paste into it.
+  for (const uint64_t request : {TIOCSTI, TIOCLINUX}) {
+    filter.RefuseWhen(SCMP_SYS(ioctl), Compare(1, SCMP_CMP_MASKED_EQ, UINT32_MAX, request));
+  }
   filter.Load();
 }
 
@@ -172,5 +198,5 @@ void RefuseOtherPrograms() {
     filter.RefuseWhen(call, Compare(0, SCMP_CMP_NE, self));
   }
   filter.Add(kRefuse, SCMP_SYS(tkill));
-  filter.Load();
+  filter.LoadForAllThreads();
 }

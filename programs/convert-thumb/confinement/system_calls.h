@@ -7,5 +7,6 @@
 /// keep working. Does nothing where the kernel cannot do it.
 void RefuseForeignSystemCalls();
 
-/// The same for starting programs and for signals to other processes.
+/// The same for starting programs and for signals to other processes, also for threads that exist
+/// already; where the kernel cannot do that, for this one and all that it starts.
 void RefuseOtherPrograms();

@@ -9,7 +9,6 @@ namespace {
 
 constexpr int kInch = 2;
 constexpr int kCentimetre = 3;
-constexpr double kLargestDensity = 65535;
 
 struct ExifDataUnref {
   void operator()(ExifData* data) const { exif_data_unref(data); }
@@ -49,7 +48,7 @@ int DensityOf(const OwnedExif& exif, ExifTag tag) {
     return 0;
   }
   return static_cast<int>(
-      std::min(static_cast<double>(value.numerator) / value.denominator, kLargestDensity));
+      std::min(static_cast<double>(value.numerator) / value.denominator, double{kLargestDensity}));
 }
 
 void TakeDensity(const OwnedExif& exif, JpegDensity& density) {

@@ -2,21 +2,33 @@
 
 #include <unistd.h>
 
+#include <algorithm>
 #include <cerrno>
 
 int FileInput::Read(unsigned char* bytes, int size) {
-  int done = 0;
-  while (done < size) {
-    const ssize_t count =
-        pread(descriptor_, bytes + done, static_cast<size_t>(size - done), place_);
-    if (count < 0 && errno == EINTR) {
-      continue;
-    }
-    if (count <= 0) {
-      break;
-    }
-    done += static_cast<int>(count);
-    place_ += count;
+  const size_t wanted = size > 0 ? static_cast<size_t>(size) : 0;
+  size_t done = 0;
+  while (done < wanted && (begin_ < end_ || Fill())) {
+    const size_t count = std::min(wanted - done, end_ - begin_);
+    std::copy_n(buffer_.data() + begin_, count, bytes + done);
+    begin_ += count;
+    done += count;
   }
-  return done;
+  return static_cast<int>(done);
+}
+
+bool FileInput::Fill() {
+  const auto room = static_cast<off_t>(buffer_.size());
+  const auto size = static_cast<size_t>(std::min(room, kMostBytes - place_));
+  ssize_t count = 0;
+  do {
+    count = pread(descriptor_, buffer_.data(), size, place_);
+  } while (count < 0 && errno == EINTR);
+  if (count <= 0) {
+    return false;
+  }
+  place_ += count;
+  begin_ = 0;
+  end_ = static_cast<size_t>(count);
+  return true;
 }

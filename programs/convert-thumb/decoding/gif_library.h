@@ -3,8 +3,10 @@
 
 #include <gif_lib.h>
 
+#include "loaded_library.h"
+
 /// The functions of giflib that are used.
-class GifLibrary {
+class GifLibrary final : private LoadedLibrary {
  public:
   /// Returns the library, loaded by the first call; null when it, or a function of it, is missing.
   static const GifLibrary* Get();
@@ -18,9 +20,4 @@ class GifLibrary {
 
  private:
   GifLibrary();
-
-  template <typename Function>
-  void Find(void* library, const char* name, Function& function);
-
-  bool isLoaded_ = false;
 };

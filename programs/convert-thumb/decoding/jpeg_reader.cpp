@@ -9,6 +9,7 @@
 #include "decoding/exif_traits.h"
 #include "decoding/jpeg_source.h"
 #include "jpeg_errors.h"
+#include "picture/resize.h"
 
 #include <jerror.h>
 
@@ -27,10 +28,14 @@ constexpr unsigned kFullScale = 8;
 constexpr double kReserve = 1.5;
 /// Decoding this many pixels takes too little time to lose anything for it.
 constexpr uint64_t kFewPixels = 2000000;
+/// Where ImageMagick leaves samples out, a reduced picture, which holds averages of all of them, is
+/// less like its result. Up to this many pixels, and wherever it leaves many out, likeness counts
+/// more than time.
+constexpr uint64_t kManyPixels = 16000000;
+constexpr double kFineGrid = 0.75;
 
 /// A picture whose scans take more than this to read was made to waste time.
 constexpr int kMostScans = 500;
-constexpr uint64_t kMostPixels = 1000000000;
 
 void WatchScans(j_common_ptr info) {
   if (reinterpret_cast<j_decompress_ptr>(info)->input_scan_number > kMostScans) {
@@ -137,8 +142,16 @@ struct JpegReader::State {
            ScaledSide(info.image_height, eighths) >= kReserve * needed.height;
   }
 
+  /// Whether the samples that ImageMagick picks have to be there.
+  bool HasToBeThinnedOut(PictureSize needed) const {
+    const PictureSize full = {static_cast<int>(info.image_width),
+                              static_cast<int>(info.image_height)};
+    return IsThinnedOut(full, needed) &&
+           (Pixels() <= kManyPixels || kGridFactor * needed.width < kFineGrid * full.width);
+  }
+
   unsigned ChooseScale(PictureSize needed) const {
-    if (Pixels() <= kFewPixels) {
+    if (Pixels() <= kFewPixels || HasToBeThinnedOut(needed)) {
       return kFullScale;
     }
     for (const unsigned eighths : kReductions) {

@@ -8,9 +8,11 @@ extern "C" {
 #include <netpbm/pam.h>
 }
 
+#include "loaded_library.h"
+
 /// The functions of libnetpbm that are used. It keeps settings for the whole process, so one
 /// thread at a time may use it.
-class NetpbmLibrary {
+class NetpbmLibrary final : private LoadedLibrary {
  public:
   /// Returns the library, loaded by the first call and silenced; null when it, or a function of it,
   /// is missing.
@@ -22,9 +24,4 @@ class NetpbmLibrary {
 
  private:
   NetpbmLibrary();
-
-  template <typename Function>
-  void Find(void* library, const char* name, Function& function);
-
-  bool isLoaded_ = false;
 };

@@ -7,6 +7,9 @@
 #include "decoding/photo_traits.h"
 #include "picture/thumbnail_size.h"
 
+/// Of a photo that is decoded here.
+constexpr uint64_t kMostPixels = 1000000000;
+
 class PhotoReader {
  public:
   virtual ~PhotoReader() = default;
@@ -34,6 +37,9 @@ class PhotoReader {
   /// Writes the next row from the top to `row`, which has room for Width() * Channels() samples and
   /// is aligned for them. False when it cannot be decoded. Called at most Height() times.
   virtual bool ReadRow(uint8_t* row) = 0;
+
+  /// Called by a thread that has read rows, before it ends: no more rows are read then.
+  virtual void LeaveThread() {}
 
   /// Why the last call failed.
   virtual const char* Error() const = 0;

@@ -13,6 +13,8 @@ struct JpegSampling {
   int vertical = 1;
 };
 
+constexpr int kLargestDensity = 65535;
+
 /// Density of the picture as a JPEG's header has it.
 struct JpegDensity {
   int unit = 0;  ///< 0: proportions only, 1: per inch, 2: per centimetre

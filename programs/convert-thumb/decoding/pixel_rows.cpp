@@ -27,8 +27,8 @@ void PutOnBackground(const Sample* in, int width, int bands, const Background& b
 }
 
 template <typename Sample>
-void Invert(const Sample* in, int width, int bands, Sample* out) {
-  for (int i = 0; i < width * bands; ++i) {
+void Invert(const Sample* in, size_t samples, Sample* out) {
+  for (size_t i = 0; i < samples; ++i) {
     out[i] = static_cast<Sample>(kEnd<Sample> - in[i]);
   }
 }
@@ -49,15 +49,16 @@ void MakeLumaChroma(const Sample* in, int width, int bands, uint16_t* out) {
 template <typename Sample>
 void Change(const DecodedRow& row, RowChange change, const Background& background, uint8_t* out) {
   const auto* const in = reinterpret_cast<const Sample*>(row.bytes);
+  const size_t samples = static_cast<size_t>(row.width) * static_cast<size_t>(row.bands);
   switch (change) {
     case RowChange::kNone:
-      std::memcpy(out, in, static_cast<size_t>(row.width * row.bands) * sizeof(Sample));
+      std::memcpy(out, in, samples * sizeof(Sample));
       break;
     case RowChange::kOnBackground:
       PutOnBackground(in, row.width, row.bands, background, reinterpret_cast<uint16_t*>(out));
       break;
     case RowChange::kInvert:
-      Invert(in, row.width, row.bands, reinterpret_cast<Sample*>(out));
+      Invert(in, samples, reinterpret_cast<Sample*>(out));
       break;
     case RowChange::kLumaChroma:
       MakeLumaChroma(in, row.width, row.bands, reinterpret_cast<uint16_t*>(out));

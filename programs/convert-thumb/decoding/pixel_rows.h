@@ -31,7 +31,6 @@ int ChangedBands(RowChange change, int bands);
 /// Bytes of a sample after the change.
 size_t ChangedSampleSize(RowChange change, size_t sampleSize);
 
-/// Writes the changed row to `out`, which has room for it and is aligned for its samples.
-/// Changes
+/// Writes the changed row to `out`, which has room for it and is aligned for its samples. Changes
 /// to brightness take 3 bands, or 4 of which they drop the last.
 void ChangeRow(const DecodedRow& row, RowChange change, const Background& background, uint8_t* out);

@@ -68,8 +68,7 @@ bool ReadInfo(png_structp png, png_infop info, FileInput& file) {
 }
 
 int ToDensity(png_uint_32 perUnit, png_uint_32 divisor) {
-  constexpr png_uint_32 kMost = 65535;
-  return static_cast<int>(std::min(perUnit / divisor, kMost));
+  return static_cast<int>(std::min(perUnit / divisor, png_uint_32{kLargestDensity}));
 }
 
 JpegDensity DensityOf(png_structp png, png_infop info) {

@@ -8,7 +8,6 @@
 
 namespace {
 
-constexpr int64_t kMostPixels = 1000000000;
 constexpr sample kByteEnd = 255;
 constexpr sample kWordEnd = 65535;
 
@@ -40,7 +39,8 @@ bool ReadHeaderOf(const NetpbmLibrary& netpbm, FILE* file, pam& header) {
 
 bool IsUsual(const pam& header) {
   return header.width > 0 && header.height > 0 &&
-         int64_t{header.width} * header.height <= kMostPixels &&
+         static_cast<uint64_t>(header.width) * static_cast<uint64_t>(header.height) <=
+             kMostPixels &&
          (header.depth == 1 || header.depth == 3) &&
          (header.maxval == kByteEnd || header.maxval == kWordEnd);
 }

@@ -1,6 +1,7 @@
 #include "decoding/rows_ahead.h"
 
 #include <algorithm>
+#include <exception>
 #include <system_error>
 
 #include "picture/sample_loops.h"
@@ -18,7 +19,7 @@ RowsAhead::RowsAhead(PhotoReader& reader)
     : reader_(reader),
       rowSize_(static_cast<size_t>(reader.Width()) * static_cast<size_t>(reader.Channels())),
       rowBytes_(rowSize_ * reader.SampleSize()),
-      rows_(rowBytes_ * kBatchRows * kBatches) {
+      rows_(Memory(reader)) {
   if (HasSecondProcessor()) {
     StartThread();
   }
@@ -38,7 +39,7 @@ RowsAhead::~RowsAhead() {
 
 void RowsAhead::StartThread() {
   try {
-    thread_ = std::thread([this] { DecodeBatches(); });
+    thread_ = std::thread([this] { Work(); });
   } catch (const std::system_error&) {
     // Rows are then decoded when they are read.
   }
@@ -62,7 +63,17 @@ uint8_t* RowsAhead::Row(int y) {
   return rows_.data() + static_cast<size_t>(y % (kBatchRows * kBatches)) * rowBytes_;
 }
 
-void RowsAhead::DecodeBatches() noexcept {
+size_t RowsAhead::Memory(const PhotoReader& reader) {
+  return static_cast<size_t>(reader.Width()) * static_cast<size_t>(reader.Channels()) *
+         reader.SampleSize() * kBatchRows * kBatches;
+}
+
+void RowsAhead::Work() noexcept {
+  DecodeBatches();
+  reader_.LeaveThread();
+}
+
+void RowsAhead::DecodeBatches() {
   const int batches = (Height() + kBatchRows - 1) / kBatchRows;
   for (int batch = 0; batch < batches && WaitForRoom(batch); ++batch) {
     const bool decoded = DecodeBatch(batch);
@@ -85,6 +96,14 @@ bool RowsAhead::WaitForRoom(int batch) {
 }
 
 bool RowsAhead::DecodeBatch(int batch) {
+  try {
+    return DecodeRows(batch);
+  } catch (const std::exception&) {
+    return false;
+  }
+}
+
+bool RowsAhead::DecodeRows(int batch) {
   const int end = std::min((batch + 1) * kBatchRows, Height());
   for (int y = batch * kBatchRows; y < end; ++y) {
     if (!reader_.ReadRow(Row(y))) {

@@ -25,11 +25,16 @@ class RowsAhead final : public RowSource {
   int Channels() const override { return reader_.Channels(); }
   bool ReadRow(float* row) override;
 
+  /// Bytes that the rows ahead take of a reader that has been started.
+  static size_t Memory(const PhotoReader& reader);
+
  private:
   void StartThread();
-  void DecodeBatches() noexcept;
+  void Work() noexcept;
+  void DecodeBatches();
   bool WaitForRoom(int batch);
   bool DecodeBatch(int batch);
+  bool DecodeRows(int batch);
   bool WaitForBatch(int batch);
   uint8_t* Row(int y);
 

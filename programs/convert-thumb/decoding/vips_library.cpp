@@ -4,6 +4,7 @@
 #include <gmodule.h>
 
 #include <cstdlib>
+#include <optional>
 #include <string>
 
 namespace {
@@ -17,6 +18,29 @@ constexpr char kNoDirectory[] = "/dev/null";
 /// Damage is told by the results of calls.
 void IgnoreMessage(const gchar*, GLogLevelFlags, const gchar*, gpointer) {}
 
+/// Keeps libvips from its modules as long as it lives; ImageMagick may still need the variable.
+class ModulesHidden {
+ public:
+  ModulesHidden() {
+    if (const char* const value = std::getenv(kModulesVariable)) {
+      former_ = value;
+    }
+    setenv(kModulesVariable, kNoDirectory, 1);
+  }
+  ~ModulesHidden() {
+    if (former_) {
+      setenv(kModulesVariable, former_->c_str(), 1);
+    } else {
+      unsetenv(kModulesVariable);
+    }
+  }
+  ModulesHidden(const ModulesHidden&) = delete;
+  ModulesHidden& operator=(const ModulesHidden&) = delete;
+
+ private:
+  std::optional<std::string> former_;
+};
+
 /// The directory of the file that `function` comes from, with its last slash.
 std::string DirectoryOf(const void* function) {
   Dl_info info = {};
@@ -29,18 +53,7 @@ std::string DirectoryOf(const void* function) {
 
 }  // namespace
 
-template <typename Function>
-void VipsLibrary::Find(const char* name, Function& function) {
-  // Also finds what the libraries below it define.
-  function = reinterpret_cast<Function>(dlsym(library_, name));
-  isLoaded_ = isLoaded_ && function != nullptr;
-}
-
-VipsLibrary::VipsLibrary() : library_(dlopen(kLibraryName, RTLD_LAZY | RTLD_LOCAL)) {
-  if (library_ == nullptr) {
-    return;
-  }
-  isLoaded_ = true;
+VipsLibrary::VipsLibrary() : LoadedLibrary(kLibraryName, RTLD_LAZY) {
   Find("vips_source_new_from_descriptor", openDescriptor);
   Find("vips_pngload_source", loadPng);
   Find("vips_tiffload_source", loadTiff);
@@ -50,11 +63,13 @@ VipsLibrary::VipsLibrary() : library_(dlopen(kLibraryName, RTLD_LAZY | RTLD_LOCA
   Find("vips_jp2kload_source", loadJpeg2000);
   Find("vips_image_get_typeof", typeOf);
   Find("vips_image_get_int", getInt);
+  Find("vips_image_get_string", getString);
   Find("vips_image_get_blob", getBlob);
   Find("vips_image_get_array_double", getDoubles);
   Find("vips_region_new", newRegion);
   Find("vips_region_prepare", prepareRegion);
   Find("vips_error_buffer", errorBuffer);
+  Find("vips_thread_shutdown", leaveThread);
   Find("g_object_unref", unref);
   Find("png_create_read_struct", createPng);
   Find("png_create_info_struct", createPngInfo);
@@ -72,20 +87,29 @@ VipsLibrary::VipsLibrary() : library_(dlopen(kLibraryName, RTLD_LAZY | RTLD_LOCA
   Find("TIFFFdOpen", openTiff);
   Find("TIFFGetField", getTiffField);
   Find("TIFFClose", closeTiff);
+  Find("TIFFSetErrorHandler", setTiffErrorHandler_);
+  Find("TIFFSetWarningHandler", setTiffWarningHandler_);
+  Find("WebPDemuxInternal", openWebp);
+  Find("WebPDemuxDelete", closeWebp);
+  Find("WebPDemuxGetI", getWebpNumber);
+  Find("WebPDemuxGetFrame", getWebpFrame);
+  Find("WebPDemuxReleaseIterator", releaseWebpFrame);
   Find("vips_init", initialise_);
   Find("vips_version", version_);
   Find("vips_cache_set_max", setCache_);
   Find("vips_concurrency_set", setConcurrency_);
   Find("g_log_set_default_handler", setLogHandler_);
   Find("g_module_open", openModule_);
-  isLoaded_ = isLoaded_ && Start();
+  isStarted_ = IsLoaded() && Start();
 }
 
 bool VipsLibrary::Start() {
   setLogHandler_(IgnoreMessage, nullptr);
-  setenv(kModulesVariable, kNoDirectory, 1);
+  // libvips puts its own in their place only when it opens its first TIFF.
+  setTiffErrorHandler_(nullptr);
+  setTiffWarningHandler_(nullptr);
+  const ModulesHidden hidden;
   const bool started = initialise_(kProgramName) == 0;
-  unsetenv(kModulesVariable);
   if (started) {
     // Every picture is read once, by a thread of its own.
     setCache_(0);
@@ -103,5 +127,5 @@ void VipsLibrary::LoadHeifModule() const {
 
 const VipsLibrary* VipsLibrary::Get() {
   static const VipsLibrary library;
-  return library.isLoaded_ ? &library : nullptr;
+  return library.isStarted_ ? &library : nullptr;
 }

@@ -5,9 +5,12 @@
 #include <png.h>
 #include <tiffio.h>
 #include <vips/vips.h>
+#include <webp/demux.h>
+
+#include "loaded_library.h"
 
 /// The functions of libvips, and of the libraries below it, that are used.
-class VipsLibrary {
+class VipsLibrary final : private LoadedLibrary {
  public:
   /// Returns the library, loaded and started by the first call, without its loadable modules; null
   /// when it, or a function of it, is missing.
@@ -25,11 +28,13 @@ class VipsLibrary {
   decltype(&::vips_jp2kload_source) loadJpeg2000 = nullptr;
   decltype(&::vips_image_get_typeof) typeOf = nullptr;
   decltype(&::vips_image_get_int) getInt = nullptr;
+  decltype(&::vips_image_get_string) getString = nullptr;
   decltype(&::vips_image_get_blob) getBlob = nullptr;
   decltype(&::vips_image_get_array_double) getDoubles = nullptr;
   decltype(&::vips_region_new) newRegion = nullptr;
   decltype(&::vips_region_prepare) prepareRegion = nullptr;
   decltype(&::vips_error_buffer) errorBuffer = nullptr;
+  decltype(&::vips_thread_shutdown) leaveThread = nullptr;
   decltype(&::g_object_unref) unref = nullptr;
   decltype(&::png_create_read_struct) createPng = nullptr;
   decltype(&::png_create_info_struct) createPngInfo = nullptr;
@@ -47,20 +52,24 @@ class VipsLibrary {
   decltype(&::TIFFFdOpen) openTiff = nullptr;
   decltype(&::TIFFGetField) getTiffField = nullptr;
   decltype(&::TIFFClose) closeTiff = nullptr;
+  decltype(&::WebPDemuxInternal) openWebp = nullptr;
+  decltype(&::WebPDemuxDelete) closeWebp = nullptr;
+  decltype(&::WebPDemuxGetI) getWebpNumber = nullptr;
+  decltype(&::WebPDemuxGetFrame) getWebpFrame = nullptr;
+  decltype(&::WebPDemuxReleaseIterator) releaseWebpFrame = nullptr;
 
  private:
   VipsLibrary();
 
-  template <typename Function>
-  void Find(const char* name, Function& function);
   bool Start();
 
-  void* library_ = nullptr;
   decltype(&::vips_init) initialise_ = nullptr;
   decltype(&::vips_version) version_ = nullptr;
+  decltype(&::TIFFSetErrorHandler) setTiffErrorHandler_ = nullptr;
+  decltype(&::TIFFSetWarningHandler) setTiffWarningHandler_ = nullptr;
   decltype(&::vips_cache_set_max) setCache_ = nullptr;
   decltype(&::vips_concurrency_set) setConcurrency_ = nullptr;
   decltype(&::g_log_set_default_handler) setLogHandler_ = nullptr;
   decltype(&::g_module_open) openModule_ = nullptr;
-  bool isLoaded_ = false;
+  bool isStarted_ = false;
 };

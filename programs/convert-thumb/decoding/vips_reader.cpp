@@ -10,11 +10,11 @@
 #include "decoding/tiff_colours.h"
 #include "decoding/vips_library.h"
 #include "decoding/vips_traits.h"
+#include "decoding/webp_frame.h"
 #include "picture/picture.h"
 
 namespace {
 
-constexpr uint64_t kMostPixels = 1000000000;
 /// What the decoders that go from top to bottom hand out at a time.
 constexpr int kStripRows = 16;
 constexpr Background kWhite = {kBrightest, kBrightest, kBrightest};
@@ -163,6 +163,17 @@ struct VipsReader::State {
     }
   }
 
+  /// Of an animation libvips makes every frame transparent when one of them is. False when the
+  /// first frame has to be left to ImageMagick.
+  bool TakeFirstFrame() {
+    if (file.format != PhotoFormat::kWebp || !HasFurtherPages(*vips, image, file.format)) {
+      return true;
+    }
+    const WebpFrame frame = ReadFirstWebpFrame(*vips, file.descriptor);
+    traits.transparent = frame == WebpFrame::kTransparent;
+    return frame != WebpFrame::kUnusual && (HasOpacity(*image) || !traits.transparent);
+  }
+
   /// Opacity is ignored. What the file stores are brightness and colour differences, which
   /// ImageMagick makes red, green and blue of first only where a profile says which.
   void ChooseHeifChange() {
@@ -205,10 +216,14 @@ struct VipsReader::State {
       return false;
     }
     const bool damaged = !PrepareRows();
+    DropRegion();
+    return damaged;
+  }
+
+  void DropRegion() {
     prepared = 0;
     Release(region);
     region = nullptr;
-    return damaged;
   }
 
   bool PrepareRows() {
@@ -246,7 +261,7 @@ bool VipsReader::ReadHeader() {
   }
   state.TakeTraits();
   state.ChooseChange();
-  return !state.IsDamagedGif();
+  return state.TakeFirstFrame() && !state.IsDamagedGif();
 }
 
 PictureSize VipsReader::FullSize() const {
@@ -291,6 +306,12 @@ bool VipsReader::ReadRow(uint8_t* row) {
   ChangeRow(decoded, state.change, state.background, row);
   ++state.next;
   return true;
+}
+
+void VipsReader::LeaveThread() {
+  // It holds memory that belongs to the thread.
+  state_->DropRegion();
+  state_->vips->leaveThread();
 }
 
 const char* VipsReader::Error() const {

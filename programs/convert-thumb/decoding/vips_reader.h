@@ -35,6 +35,7 @@ class VipsReader final : public PhotoReader {
   int Channels() const override;
   size_t SampleSize() const override;
   bool ReadRow(uint8_t* row) override;
+  void LeaveThread() override;
   const char* Error() const override;
 
  private:

@@ -1,6 +1,7 @@
 #include "decoding/vips_traits.h"
 
 #include <algorithm>
+#include <cstring>
 
 #include "decoding/exif_traits.h"
 #include "picture/picture.h"
@@ -11,11 +12,11 @@ constexpr char kBackground[] = "background";
 constexpr char kPaletteDepth[] = "palette-bit-depth";
 constexpr double kMillimetresPerInch = 25.4;
 constexpr double kMillimetresPerCentimetre = 10;
-constexpr double kLargestDensity = 65535;
 /// What turning a density into millimetres and back may lose.
 constexpr double kDensityError = 1e-3;
 constexpr int kPerInch = 1;
 constexpr int kPerCentimetre = 2;
+constexpr char kCentimetres[] = "cm";
 
 std::vector<uint8_t> BlobOf(const VipsLibrary& vips, VipsImage* image, const char* name) {
   const void* data = nullptr;
@@ -37,19 +38,27 @@ int IntOf(const VipsLibrary& vips, VipsImage* image, const char* name, int other
 
 int ToDensity(double perMillimetre, double millimetres) {
   return static_cast<int>(
-      std::clamp(perMillimetre * millimetres + kDensityError, 0.0, kLargestDensity));
+      std::clamp(perMillimetre * millimetres + kDensityError, 0.0, double{kLargestDensity}));
 }
 
-void TakeDensity(const VipsImage& image, PhotoFormat format, JpegDensity& density) {
+bool IsPerCentimetre(const VipsLibrary& vips, VipsImage* image) {
+  const char* unit = nullptr;
+  return HasVipsField(vips, image, VIPS_META_RESOLUTION_UNIT) &&
+         vips.getString(image, VIPS_META_RESOLUTION_UNIT, &unit) == 0 &&
+         std::strcmp(unit, kCentimetres) == 0;
+}
+
+void TakeDensity(const VipsLibrary& vips, VipsImage* image, PhotoFormat format,
+                 JpegDensity& density) {
   // One in a millimetre is what a picture without any density has.
-  if (image.Xres == 1 && image.Yres == 1) {
+  if (image->Xres == 1 && image->Yres == 1) {
     return;
   }
-  const bool inches = format == PhotoFormat::kTiff;
+  const bool inches = format == PhotoFormat::kTiff && !IsPerCentimetre(vips, image);
   const double unit = inches ? kMillimetresPerInch : kMillimetresPerCentimetre;
   density.unit = inches ? kPerInch : kPerCentimetre;
-  density.x = ToDensity(image.Xres, unit);
-  density.y = ToDensity(image.Yres, unit);
+  density.x = ToDensity(image->Xres, unit);
+  density.y = ToDensity(image->Yres, unit);
 }
 
 bool IsPalette(const VipsLibrary& vips, VipsImage* image, PhotoFormat format) {
@@ -90,7 +99,7 @@ PhotoTraits ReadVipsTraits(const VipsLibrary& vips, VipsImage* image, PhotoForma
   traits.palette = IsPalette(vips, image, format);
   traits.colourProfile = BlobOf(vips, image, VIPS_META_ICC_NAME);
   traits.orientation = IntOf(vips, image, VIPS_META_ORIENTATION, 1);
-  TakeDensity(*image, format, traits.density);
+  TakeDensity(vips, image, format, traits.density);
   const std::vector<uint8_t> exif = BlobOf(vips, image, VIPS_META_EXIF_NAME);
   if (!exif.empty() && format != PhotoFormat::kPng) {
     TakeExifTraits(exif.data(), exif.size(), traits);

@@ -1,6 +1,7 @@
 #include "encoding/jpeg_writer.h"
 
 #include <algorithm>
+#include <array>
 #include <cmath>
 
 #include "jpeg_errors.h"
@@ -14,6 +15,18 @@ constexpr int kFastTransformQuality = 90;
 constexpr float kSmallestDifference = 0.5;
 /// From here on colour is stored as finely as brightness, unless the photo says otherwise.
 constexpr int kFineColourQuality = 90;
+
+using Sampling = std::array<JpegSampling, 3>;
+
+/// Whether a JPEG that stores its components together can have these factors, which one that
+/// stores them one after the other need not care for.
+bool IsStorable(const Sampling& sampling) {
+  int blocks = 0;
+  for (const JpegSampling& component : sampling) {
+    blocks += component.horizontal * component.vertical;
+  }
+  return blocks <= C_MAX_BLOCKS_IN_MCU;
+}
 
 /// Compares whole rows without leaving early, which the compiler makes vector instructions of.
 bool IsGreyRow(const float* row, int width) {
@@ -66,6 +79,9 @@ class JpegEncoder::Compressor {
     return CallJpegLibrary(errors_, [&] { jpeg_finish_compress(&info_); });
   }
 
+  /// Why the last call failed.
+  const char* Error() const { return errors_.message; }
+
   EncodedJpeg TakeResult() {
     EncodedJpeg result;
     result.bytes.reset(bytes_);
@@ -93,7 +109,7 @@ class JpegEncoder::Compressor {
   }
 
   void SetSampling(const PhotoTraits& traits, int quality) {
-    if (info_.num_components == 3 && traits.colour) {
+    if (info_.num_components == 3 && traits.colour && IsStorable(traits.sampling)) {
       for (int i = 0; i < 3; ++i) {
         const JpegSampling& sampling = traits.sampling[static_cast<size_t>(i)];
         info_.comp_info[i].h_samp_factor = sampling.horizontal;
@@ -139,11 +155,19 @@ bool JpegEncoder::Put(const float* row) {
   return WriteRow();
 }
 
-std::optional<EncodedJpeg> JpegEncoder::Finish() {
-  if (compressor_ == nullptr && (!Start(1) || !WriteGreyRows())) {
-    return std::nullopt;
-  }
-  return compressor_->End() ? std::optional<EncodedJpeg>(compressor_->TakeResult()) : std::nullopt;
+std::string JpegEncoder::Error() const {
+  return compressor_ == nullptr ? "" : compressor_->Error();
+}
+
+EncodedJpeg JpegEncoder::Finish() {
+  const bool written = compressor_ != nullptr || (Start(1) && WriteGreyRows());
+  return written && compressor_->End() ? compressor_->TakeResult() : Failure();
+}
+
+EncodedJpeg JpegEncoder::Failure() const {
+  EncodedJpeg failure;
+  failure.error = Error();
+  return failure;
 }
 
 void JpegEncoder::KeepGreyRow(const float* row) {
@@ -179,15 +203,15 @@ bool JpegEncoder::WriteRow() {
   return compressor_->WriteRow(row_.data());
 }
 
-std::optional<EncodedJpeg> EncodeJpeg(const Picture& picture, const PhotoTraits& traits,
-                                      int quality, bool withProfile) {
+EncodedJpeg EncodeJpeg(const Picture& picture, const PhotoTraits& traits, int quality,
+                       bool withProfile) {
   JpegEncoder encoder({picture.width, picture.height}, picture.channels, traits, quality,
                       withProfile);
   std::vector<float> row(picture.RowSize());
   for (int y = 0; y < picture.height; ++y) {
     WidenRow(picture.Row(y), row.data(), row.size());
     if (!encoder.Put(row.data())) {
-      return std::nullopt;
+      return encoder.Failure();
     }
   }
   return encoder.Finish();

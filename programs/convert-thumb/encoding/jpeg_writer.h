@@ -5,7 +5,7 @@
 #include <cstdint>
 #include <cstdlib>
 #include <memory>
-#include <optional>
+#include <string>
 #include <vector>
 
 #include "decoding/photo_traits.h"
@@ -17,15 +17,18 @@ struct FreeEncoded {
   void operator()(unsigned char* memory) const { std::free(memory); }
 };
 
-/// The bytes of a file.
+/// The bytes of a file, or why there are none.
 struct EncodedJpeg {
   std::unique_ptr<unsigned char, FreeEncoded> bytes;
   size_t size = 0;
+  std::string error;  ///< in the JPEG library's words; empty when there are bytes
+
+  bool IsComplete() const { return bytes != nullptr; }
 };
 
-/// Encodes rows as they come. Colour is stored as finely as in the photo that `traits` are of; a
-/// colour picture without any colour is stored as grey. The colour profile goes along when
-/// `withProfile`.
+/// Encodes rows as they come. Colour is stored as finely as in the photo that `traits` are of,
+/// where a JPEG with its components together can be; a colour picture without any colour is stored
+/// as grey. The colour profile goes along when `withProfile`.
 class JpegEncoder final : public RowSink {
  public:
   /// `channels`: 1 or 3. `quality`: 1 to 100. `traits` have to outlive this.
@@ -37,8 +40,14 @@ class JpegEncoder final : public RowSink {
 
   bool Put(const float* row) override;
 
-  /// The file, after the last row; empty when memory runs out.
-  std::optional<EncodedJpeg> Finish();
+  /// Why a row was refused; empty when none was.
+  std::string Error() const;
+
+  /// The file, after the last row.
+  EncodedJpeg Finish();
+
+  /// What there is instead of a file when a row was refused.
+  EncodedJpeg Failure() const;
 
  private:
   class Compressor;
@@ -59,5 +68,5 @@ class JpegEncoder final : public RowSink {
 };
 
 /// Encodes a whole picture.
-std::optional<EncodedJpeg> EncodeJpeg(const Picture& picture, const PhotoTraits& traits,
-                                      int quality, bool withProfile);
+EncodedJpeg EncodeJpeg(const Picture& picture, const PhotoTraits& traits, int quality,
+                       bool withProfile);

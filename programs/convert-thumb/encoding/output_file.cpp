@@ -1,10 +1,12 @@
 #include "encoding/output_file.h"
 
 #include <fcntl.h>
+#include <sys/xattr.h>
 #include <unistd.h>
 
 #include <cerrno>
 #include <cstdio>
+#include <utility>
 
 #include "encoding/unfinished_outputs.h"
 #include "thumb/descriptor.h"
@@ -31,42 +33,92 @@ std::string ScratchName(const std::string& path) {
   return path.substr(0, path.rfind('/') + 1) + "VELAPHOTO.tmp." + std::to_string(getpid());
 }
 
-bool WriteScratchFile(const std::string& path, const unsigned char* bytes, size_t size,
-                      mode_t mode) {
+/// Opens a new file with exactly these permissions.
+Descriptor MakeFile(const std::string& path, mode_t mode) {
+  const mode_t mask = umask(0);
   Descriptor file(open(path.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, mode));
-  return file.IsOpen() && WriteAll(file.Get(), bytes, size) && file.Close();
+  umask(mask);
+  return file;
 }
 
-int OpenForWriting(const std::string& path) {
-  return open(path.c_str(), O_WRONLY | O_CREAT | O_TRUNC | O_CLOEXEC | O_NOCTTY, 0666);
+/// Directories give their group and access control lists to new files.
+bool IsLike(const Descriptor& file, const struct stat& former) {
+  struct stat status;
+  return fstat(file.Get(), &status) == 0 && status.st_uid == former.st_uid &&
+         status.st_gid == former.st_gid && status.st_mode == former.st_mode &&
+         !HasExtendedAttributes(file.Get());
+}
+
+/// After a crash of the machine, the name must not lead to a file whose content never arrived.
+bool WriteForGood(Descriptor& file, const unsigned char* bytes, size_t size) {
+  return WriteAll(file.Get(), bytes, size) && fdatasync(file.Get()) == 0 && file.Close();
+}
+
+Replacement ReplaceThrough(const std::string& scratch, const std::string& path,
+                           const unsigned char* bytes, size_t size, const struct stat& former) {
+  Descriptor file = MakeFile(scratch, former.st_mode & 07777U);
+  if (!file.IsOpen()) {
+    return errno == EACCES ? Replacement::kImpossible : Replacement::kFailed;
+  }
+  if (!IsLike(file, former)) {
+    return Replacement::kImpossible;
+  }
+  return WriteForGood(file, bytes, size) && std::rename(scratch.c_str(), path.c_str()) == 0
+             ? Replacement::kDone
+             : Replacement::kFailed;
+}
+
+/// Closed for what is neither a regular file nor a character device. Does not wait for the reader
+/// of a pipe.
+Descriptor OpenForWriting(const std::string& path) {
+  Descriptor file(
+      open(path.c_str(), O_WRONLY | O_CREAT | O_TRUNC | O_CLOEXEC | O_NOCTTY | O_NONBLOCK, 0666));
+  struct stat status;
+  const bool isFit = file.IsOpen() && fstat(file.Get(), &status) == 0 &&
+                     (S_ISREG(status.st_mode) || S_ISCHR(status.st_mode)) &&
+                     fcntl(file.Get(), F_SETFL, 0) == 0;
+  return isFit ? std::move(file) : Descriptor();
 }
 
 }  // namespace
 
 bool WriteOutputFile(const std::string& path, const unsigned char* bytes, size_t size) {
-  Descriptor file(OpenForWriting(path));
+  if (!NoteOutput(path)) {
+    return false;
+  }
+  Descriptor file = OpenForWriting(path);
   if (!file.IsOpen()) {
+    ForgetOutput(path);
     return false;
   }
-  NoteOutput(path);
+  struct stat status;
+  const bool isDevice = fstat(file.Get(), &status) == 0 && S_ISCHR(status.st_mode);
   const bool written = WriteAll(file.Get(), bytes, size);
-  if (!file.Close() || !written) {
-    unlink(path.c_str());
-    return false;
+  if (file.Close() && written) {
+    return true;
   }
-  return true;
+  if (!isDevice) {
+    unlink(path.c_str());
+  }
+  return false;
 }
 
-bool ReplaceFile(const std::string& path, const unsigned char* bytes, size_t size, mode_t mode) {
+Replacement ReplaceFile(const std::string& path, const unsigned char* bytes, size_t size,
+                        const struct stat& former) {
   const std::string scratch = ScratchName(path);
   // A process of that number that was killed may have left one.
   unlink(scratch.c_str());
-  if (WriteScratchFile(scratch, bytes, size, mode) &&
-      std::rename(scratch.c_str(), path.c_str()) == 0) {
-    return true;
-  }
+  NoteOutput(scratch);
+  const Replacement result = ReplaceThrough(scratch, path, bytes, size, former);
   const int error = errno;
-  unlink(scratch.c_str());
+  if (result != Replacement::kDone) {
+    unlink(scratch.c_str());
+  }
   errno = error;
-  return false;
+  return result;
+}
+
+bool HasExtendedAttributes(int descriptor) {
+  // File systems without any answer with an error.
+  return flistxattr(descriptor, nullptr, 0) > 0;
 }

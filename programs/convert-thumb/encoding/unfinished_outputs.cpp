@@ -1,5 +1,6 @@
 #include "encoding/unfinished_outputs.h"
 
+#include <sys/stat.h>
 #include <unistd.h>
 
 #include <atomic>
@@ -12,11 +13,16 @@ constexpr int kFailed = 1;
 
 /// A list that a signal handler can read at any moment: nothing is ever taken off it.
 struct NotedOutput {
-  std::string path;
+  explicit NotedOutput(const std::string& name) : path(name) {}
+
+  const std::string path;
+  std::atomic<bool> isForgotten{false};
   NotedOutput* next = nullptr;
 };
 std::atomic<NotedOutput*> g_noted{nullptr};
 static_assert(std::atomic<NotedOutput*>::is_always_lock_free);
+std::atomic<bool> g_isEnding{false};
+static_assert(std::atomic<bool>::is_always_lock_free);
 
 struct FatalSignal {
   int number;
@@ -34,6 +40,12 @@ void Tell(const char* message) {
   static_cast<void>(written);  // nobody else could be told
 }
 
+/// A device keeps nothing of the run.
+bool IsRegularFile(const std::string& path) {
+  struct stat status;
+  return stat(path.c_str(), &status) == 0 && S_ISREG(status.st_mode);
+}
+
 void EndCleanly(int number) {
   RemoveNotedOutputs();
   for (const FatalSignal& fatal : kFatalSignals) {
@@ -41,20 +53,37 @@ void EndCleanly(int number) {
       Tell(fatal.message);
     }
   }
+  // Another thread may have been about to make one.
+  RemoveNotedOutputs();
   _exit(kFailed);
 }
 
 }  // namespace
 
-void NoteOutput(const std::string& path) {
-  auto* const noted = new NotedOutput{path, g_noted.load()};
+bool NoteOutput(const std::string& path) {
+  auto* const noted = new NotedOutput(path);
+  noted->next = g_noted;
   while (!g_noted.compare_exchange_weak(noted->next, noted)) {
+  }
+  // Only now: either this sees that the run is ending, or who removes the files sees this one.
+  return !g_isEnding;
+}
+
+void ForgetOutput(const std::string& path) {
+  for (NotedOutput* noted = g_noted; noted != nullptr; noted = noted->next) {
+    if (!noted->isForgotten && noted->path == path) {
+      noted->isForgotten = true;
+      return;
+    }
   }
 }
 
 void RemoveNotedOutputs() {
+  g_isEnding = true;
   for (const NotedOutput* noted = g_noted; noted != nullptr; noted = noted->next) {
-    unlink(noted->path.c_str());
+    if (!noted->isForgotten && IsRegularFile(noted->path)) {
+      unlink(noted->path.c_str());
+    }
   }
 }
 

@@ -3,10 +3,15 @@
 
 #include <string>
 
-/// Remembers that this run has begun to write the file. Any thread may call it.
-void NoteOutput(const std::string& path);
+/// Remembers that this run is about to make the file. False when the run is ending already: then
+/// the file must not be made. Any thread may call it.
+bool NoteOutput(const std::string& path);
 
-/// Removes the files that were noted.
+/// The file that was noted last under this name could not be opened: what is there is not this
+/// run's. Any thread may call it.
+void ForgetOutput(const std::string& path);
+
+/// Removes the regular files that were noted. From then on the run is ending.
 void RemoveNotedOutputs();
 
 /// From now on signals that mean that the run cannot go on (no memory in a library, a source that

@@ -7,8 +7,10 @@
 #include <cerrno>
 #include <csignal>
 #include <cstring>
+#include <optional>
 
 #include "failure_line.h"
+#include "write_signals.h"
 
 namespace {
 
@@ -56,6 +58,8 @@ void PassSignalsOn() {
     sigprocmask(SIG_SETMASK, &mask, nullptr);
     execv(program, arguments);
     TellFailure("%s: %s", program, std::strerror(errno));
+    IgnoreWriteSignals();
+    WriteFailureLine();
   }
   _exit(kFailed);
 }
@@ -74,9 +78,20 @@ void PassSignalsOn() {
   _exit(kEndedBySignal + signal);
 }
 
-int AwaitEnd(pid_t child) {
+/// Where the end of children is ignored, there is nothing to wait for, and no status.
+void HearOfChildren() {
+  struct sigaction usual = {};
+  usual.sa_handler = SIG_DFL;
+  sigaction(SIGCHLD, &usual, nullptr);
+}
+
+/// Empty, with errno set, when how the child ended cannot be known.
+std::optional<int> AwaitEnd(pid_t child) {
   int status = 0;
-  while (waitpid(child, &status, 0) < 0 && errno == EINTR) {
+  while (waitpid(child, &status, 0) < 0) {
+    if (errno != EINTR) {
+      return std::nullopt;
+    }
   }
   return status;
 }
@@ -89,6 +104,7 @@ void StandForProgram(const char* program, char* const* arguments) {
   sigset_t mask;
   // Until there is somebody to pass them on to.
   sigprocmask(SIG_BLOCK, &passedOn, &mask);
+  HearOfChildren();
   const pid_t child = fork();
   if (child == 0) {
     BecomeProgram(program, arguments, self, mask);
@@ -99,8 +115,11 @@ void StandForProgram(const char* program, char* const* arguments) {
   }
   const int error = errno;
   sigprocmask(SIG_SETMASK, &mask, nullptr);
-  if (child > 0) {
-    EndLike(AwaitEnd(child));
+  if (child < 0) {
+    errno = error;
+    return;
   }
-  errno = error;
+  if (const std::optional<int> status = AwaitEnd(child)) {
+    EndLike(*status);
+  }
 }

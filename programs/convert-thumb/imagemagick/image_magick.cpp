@@ -7,12 +7,14 @@
 #include <cerrno>
 #include <cstring>
 #include <optional>
+#include <utility>
 
 #include "command_line/plan_parser.h"
-#include "confinement/memory_limit.h"
 #include "failure_line.h"
 #include "imagemagick/child_program.h"
 #include "imagemagick/image_magick_limits.h"
+#include "thumb/descriptor.h"
+#include "write_signals.h"
 
 namespace {
 
@@ -43,16 +45,6 @@ bool IsPlainName(const std::string& name) {
   return true;
 }
 
-/// The file under a name that means nothing but itself. Its descriptor stays open in the program
-/// that takes over.
-std::optional<std::string> OpenUnderPlainName(const std::string& file) {
-  const int descriptor = open(file.c_str(), O_RDONLY | O_NOCTTY);  // NOLINT
-  if (descriptor < 0) {
-    return std::nullopt;
-  }
-  return "/proc/self/fd/" + std::to_string(descriptor);
-}
-
 /// Without its name, an output does not tell its format.
 std::string FormatPrefix(const std::string& path) {
   const size_t dot = path.find_last_of("./");
@@ -62,20 +54,58 @@ std::string FormatPrefix(const std::string& path) {
   return path.substr(dot + 1) + ":";
 }
 
-/// Whether an argument that names no file can be left as it is: an option, or a picture that
-/// ImageMagick draws. In a directory it is a photo that has gone.
-bool CanBeNoFile(const std::string& argument) {
-  return errno == ENOENT && argument.find('/') == std::string::npos;
+/// Whether an argument that names no file, as `error` of opening it says, can be left as it is: an
+/// option, or a picture that ImageMagick draws. In a directory it is a photo that has gone.
+bool CanBeNoFile(const std::string& argument, int error) {
+  return error == ENOENT && argument.find('/') == std::string::npos;
 }
 
 /// A pipe or the like, on which ImageMagick could wait without end.
-bool IsSpecialFile(const std::string& file) {
-  struct stat status;
-  return stat(file.c_str(), &status) == 0 && !S_ISREG(status.st_mode) && !S_ISDIR(status.st_mode);
+bool IsSpecial(const struct stat& status) {
+  return !S_ISREG(status.st_mode) && !S_ISDIR(status.st_mode);
 }
 
-/// False, with one line on standard error, when the source cannot be handed over.
-bool MakeSourceSafe(std::vector<std::string>& arguments) {
+bool IsSpecialFile(const std::string& file) {
+  struct stat status;
+  return stat(file.c_str(), &status) == 0 && IsSpecial(status);
+}
+
+struct OpenedSource {
+  Descriptor descriptor;
+  int error = 0;  ///< errno when it could not be opened
+  bool isSpecial = false;
+};
+
+/// Does not wait when a pipe has taken the file's place. The descriptor, which programs inherit,
+/// waits for its data again.
+OpenedSource OpenSource(const std::string& file) {
+  OpenedSource source;
+  source.descriptor =
+      Descriptor(open(file.c_str(), O_RDONLY | O_NOCTTY | O_NONBLOCK));  // NOLINT: for ImageMagick
+  struct stat status;
+  if (!source.descriptor.IsOpen() || fstat(source.descriptor.Get(), &status) != 0 ||
+      fcntl(source.descriptor.Get(), F_SETFL, 0) != 0) {
+    source.error = errno;
+  } else {
+    source.isSpecial = IsSpecial(status);
+  }
+  return source;
+}
+
+bool TellSpecial(const std::string& file) {
+  TellFailure("%s: not a regular file", file.c_str());
+  return false;
+}
+
+/// A name that means nothing but itself, for as long as the process or program lasts.
+std::string PlainName(Descriptor& descriptor, std::vector<Descriptor>& inherited) {
+  const std::string name = "/proc/self/fd/" + std::to_string(descriptor.Get());
+  inherited.push_back(std::move(descriptor));
+  return name;
+}
+
+/// False when the source cannot be handed over. What has to stay open goes to `inherited`.
+bool MakeSourceSafe(std::vector<std::string>& arguments, std::vector<Descriptor>& inherited) {
   const size_t place = FindSourceArgument(arguments);
   if (place == arguments.size()) {
     return true;
@@ -83,24 +113,42 @@ bool MakeSourceSafe(std::vector<std::string>& arguments) {
   const std::string source = arguments[place];
   const std::string file = SourceFile(source);
   if (IsSpecialFile(file)) {
-    TellFailure("%s: not a regular file", file.c_str());
-    return false;
+    return TellSpecial(file);
   }
   if (IsPlainName(file)) {
     return true;
   }
-  const std::optional<std::string> plain = OpenUnderPlainName(file);
-  if (!plain && CanBeNoFile(file)) {
+  OpenedSource opened = OpenSource(file);
+  if (opened.isSpecial) {
+    return TellSpecial(file);
+  }
+  if (opened.error != 0 && CanBeNoFile(file, opened.error)) {
     return true;
   }
-  if (!plain) {
-    TellFailure("%s: %s", file.c_str(), std::strerror(errno));
+  if (opened.error != 0) {
+    TellFailure("%s: %s", file.c_str(), std::strerror(opened.error));
     return false;
   }
-  arguments[place] = *plain + source.substr(file.size());
+  const std::string plain = PlainName(opened.descriptor, inherited);
+  arguments[place] = plain + source.substr(file.size());
   if (place + 1 < arguments.size() && arguments.back() == file) {
     // A photo that is turned in place: opened by that name again, and cut, when it is written.
-    arguments.back() = FormatPrefix(file) + *plain;
+    arguments.back() = FormatPrefix(file) + plain;
+  }
+  return true;
+}
+
+/// Nobody may ever read from it.
+bool IsPipe(const std::string& path) {
+  struct stat status;
+  return stat(path.c_str(), &status) == 0 && S_ISFIFO(status.st_mode);
+}
+
+bool AreNoPipes(const std::vector<OutputPlan>& outputs) {
+  for (const OutputPlan& output : outputs) {
+    if (IsPipe(output.path)) {
+      return TellSpecial(output.path);
+    }
   }
   return true;
 }
@@ -124,8 +172,7 @@ bool MakeOutputSafe(std::string& path) {
 }
 
 /// Lets outputs be nothing but files of that name, which is what they are here; in a command line
-/// that only ImageMagick understands, names may well mean more. False, with one line on standard
-/// error, when there is no way.
+/// that only ImageMagick understands, names may well mean more. False when there is no way.
 bool MakeOutputsSafe(std::vector<std::string>& arguments) {
   for (size_t i = 1; i + 1 < arguments.size(); ++i) {
     if (arguments[i - 1] == "-write" && !MakeOutputSafe(arguments[i])) {
@@ -143,9 +190,10 @@ bool MakeOutputsSafe(std::vector<std::string>& arguments) {
   return true;
 }
 
-bool MakeSafe(std::vector<std::string>& arguments) {
-  const bool outputsAreFiles = ParseConversion(arguments).has_value();
-  return MakeSourceSafe(arguments) && (!outputsAreFiles || MakeOutputsSafe(arguments));
+bool MakeSafe(std::vector<std::string>& arguments, std::vector<Descriptor>& inherited) {
+  const std::optional<ConversionPlan> plan = ParseConversion(arguments);
+  return MakeSourceSafe(arguments, inherited) &&
+         (!plan || (AreNoPipes(plan->outputs) && MakeOutputsSafe(arguments)));
 }
 
 std::vector<char*> ArgumentVector(std::string& argumentZero, std::vector<std::string>& arguments) {
@@ -159,15 +207,18 @@ std::vector<char*> ArgumentVector(std::string& argumentZero, std::vector<std::st
 
 }  // namespace
 
-void HandOver(const std::vector<std::string>& arguments) {
+void HandOver(const std::vector<std::string>& arguments, size_t memoryLimit) {
   std::vector<std::string> handed = arguments;
-  if (!MakeSafe(handed)) {
+  std::vector<Descriptor> inherited;
+  if (!MakeSafe(handed, inherited)) {
     return;
   }
-  LimitImageMagick(ConversionMemoryLimit());
+  LimitImageMagick(memoryLimit);
   std::string argumentZero = kArgumentZero;
   std::vector<char*> vector = ArgumentVector(argumentZero, handed);
+  RestoreWriteSignals();
   execv(kLink, vector.data());
   StandForProgram(kProgram, vector.data());
+  IgnoreWriteSignals();
   TellFailure("%s: %s", kProgram, std::strerror(errno));
 }

@@ -10,5 +10,6 @@
 /// whose name ImageMagick would take for more than a name is opened here and handed over as a
 /// descriptor; one that cannot be opened is an error. The same for a photo that is turned in place.
 /// Outputs of a command line that is understood here are written so that they mean nothing but a
-/// file. Returns only when that failed, with one line on standard error.
-void HandOver(const std::vector<std::string>& arguments);
+/// file, and never a pipe. ImageMagick is told to take no more than `memoryLimit` bytes. Returns
+/// only when that failed; TellFailure was called then.
+void HandOver(const std::vector<std::string>& arguments, size_t memoryLimit);

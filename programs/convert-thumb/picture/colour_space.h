@@ -7,3 +7,9 @@ enum class ColourSpace {
   kLumaChroma,  ///< brightness and two colour differences, the middle of their range as zero
   kInks,        ///< cyan, magenta, yellow and black, each as the share of light that it leaves
 };
+
+/// Whether a colour profile that a picture of this space has is still of use when the picture has
+/// been converted to red, green and blue.
+constexpr bool ProfileOutlivesConversion(ColourSpace space) {
+  return space == ColourSpace::kRgb;
+}

@@ -106,6 +106,15 @@ bool RowSharpener::Put(const float* row) {
   return true;
 }
 
+size_t RowSharpener::Memory(PictureSize size, int channels, const UnsharpMask& mask) {
+  const auto reach = static_cast<size_t>(Reach(mask));
+  const size_t stride = PaddedSize(static_cast<size_t>(size.width) * static_cast<size_t>(channels));
+  const size_t margins = 2 * reach * static_cast<size_t>(channels);
+  // Rows as they came and blurred rows; a blurred and a sharpened one more.
+  const size_t held = 2 * reach + 1;
+  return (held * (margins + stride + stride) + 2 * stride) * sizeof(float);
+}
+
 size_t RowSharpener::RoomOfRow() const {
   return margin_ + stride_ + margin_;
 }

@@ -22,6 +22,9 @@ class RowSharpener final : public RowSink {
 
   bool Put(const float* row) override;
 
+  /// Bytes that sharpening a picture of that size takes besides the picture.
+  static size_t Memory(PictureSize size, int channels, const UnsharpMask& mask);
+
  private:
   size_t RoomOfRow() const;
   float* Row(int y);

@@ -6,6 +6,7 @@
 #include <linux/landlock.h>
 #include <linux/seccomp.h>
 #include <sched.h>
+#include <sys/ioctl.h>
 #include <sys/mount.h>
 #include <sys/prctl.h>
 #include <sys/ptrace.h>
@@ -21,6 +22,7 @@
 #include <cerrno>
 #include <csignal>
 #include <functional>
+#include <future>
 #include <system_error>
 #include <thread>
 
@@ -164,6 +166,8 @@ std::vector<Call> RefusedCalls() {
       {"setns", [] { return setns(-1, 0); }},
       {"unshare", [] { return unshare(0); }},
       {"io_uring_enter", [] { return syscall(SYS_io_uring_enter, -1, 0, 0, 0, nullptr, 0); }},
+      {"ioctl TIOCSTI", [] { return ioctl(-1, TIOCSTI, nullptr); }},
+      {"ioctl TIOCLINUX", [] { return ioctl(-1, TIOCLINUX, nullptr); }},
       {"fchmod", [] { return fchmod(-1, 0600); }},
       {"chmod", [] { return chmod("/tmp/inside/file", 0666); }},
       {"fchmodat2", [] { return syscall(452, -1, "", 0600, 0); }},
@@ -186,10 +190,22 @@ TEST_F(Confinement, RefusesSystemCallsThatNobodyNeeds) {
   }
 }
 
+/// What a process says that is asked for a child with these flags.
+int ErrorOfCloning(unsigned long flags) {
+  const long child = syscall(SYS_clone, flags | SIGCHLD, 0, 0, 0, 0);
+  if (child == 0) {
+    _exit(0);
+  }
+  return ErrorOf(child);
+}
+
 TEST_F(Confinement, MakesNoNamespaces) {
-  EXPECT_EQ(
-      Confined([] { return ErrorOf(syscall(SYS_clone, CLONE_NEWUSER | SIGCHLD, 0, 0, 0, 0)); }),
-      EPERM);
+  for (const unsigned long flag : {CLONE_NEWNS, CLONE_NEWCGROUP, CLONE_NEWUTS, CLONE_NEWIPC,
+                                   CLONE_NEWUSER, CLONE_NEWPID, CLONE_NEWNET}) {
+    EXPECT_NE(InChild([flag] { return ErrorOfCloning(flag); }), EPERM) << flag;
+    EXPECT_EQ(Confined([flag] { return ErrorOfCloning(flag); }), EPERM) << flag;
+  }
+  EXPECT_EQ(Confined([] { return ErrorOfCloning(0); }), 0);
   EXPECT_EQ(Confined([] { return ErrorOf(syscall(SYS_clone3, nullptr, 0)); }), ENOSYS);
 }
 
@@ -242,6 +258,47 @@ TEST_F(Confinement, SignalsNobodyButItselfInTheEnd) {
               return ErrorOf(raise(0)) + ErrorOf(kill(getpid(), 0));
             }),
             0);
+}
+
+/// ENOENT where programs may be started.
+int ErrorOfStartingNothing() {
+  return ErrorOf(execl("/tmp/inside/none", "none", nullptr));
+}
+
+TEST_F(Confinement, HoldsInTheEndForThreadsThatExisted) {
+  EXPECT_EQ(Confined([] {
+              std::promise<void> confined;
+              int error = 0;
+              std::thread thread([&confined, &error] {
+                confined.get_future().wait();
+                error = ErrorOfStartingNothing();
+              });
+              ConfineToThisProgram();
+              confined.set_value();
+              thread.join();
+              return error;
+            }),
+            EPERM);
+}
+
+TEST_F(Confinement, HoldsInTheEndWhereOtherThreadsCannotBeReached) {
+  EXPECT_EQ(Confined([] {
+              std::promise<void> done;
+              std::promise<void> filtered;
+              // A filter of its own keeps a thread from being given the others'.
+              std::thread thread([&done, &filtered] {
+                SeccompFail({SYS_kcmp}, ENOSYS)();
+                filtered.set_value();
+                done.get_future().wait();
+              });
+              filtered.get_future().wait();
+              ConfineToThisProgram();
+              const int error = ErrorOfStartingNothing();
+              done.set_value();
+              thread.join();
+              return error;
+            }),
+            EPERM);
 }
 
 TEST_F(Confinement, WorksInsideAnother) {

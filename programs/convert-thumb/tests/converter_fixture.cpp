@@ -1,7 +1,11 @@
 #include "converter_fixture.h"
 
+#include <fcntl.h>
 #include <gtest/gtest.h>
+#include <unistd.h>
 
+#include <cerrno>
+#include <csignal>
 #include <cstdio>
 #include <cstdlib>
 
@@ -44,6 +48,27 @@ Likeness Compare(const std::string& one, const std::string& other) {
     likeness.decibels = std::strtod(result.err.c_str(), nullptr);
   }
   return likeness;
+}
+
+BeforeExec SetSignals(const std::vector<int>& signals, void (*action)(int)) {
+  return [signals, action] {
+    for (const int signal : signals) {
+      if (std::signal(signal, action) == SIG_ERR) {
+        return errno;
+      }
+    }
+    return 0;
+  };
+}
+
+BeforeExec BreakErrorPipe() {
+  return [] {
+    int ends[2];
+    if (pipe2(ends, O_CLOEXEC) != 0 || dup2(ends[1], STDERR_FILENO) < 0) {
+      return errno;
+    }
+    return 0;
+  };
 }
 
 WithoutImageMagick::WithoutImageMagick() {

@@ -16,6 +16,13 @@ std::string ConvertThumbPath();
 /// ImageMagick's own program.
 constexpr const char* kImageMagick = "/usr/bin/convert-im6.q16";
 
+/// Starts a program with these signals at their default (SIG_DFL) or ignored (SIG_IGN), whatever
+/// the test itself was started with.
+BeforeExec SetSignals(const std::vector<int>& signals, void (*action)(int));
+
+/// Makes standard error a pipe that nobody reads.
+BeforeExec BreakErrorPipe();
+
 /// How alike two pictures are.
 struct Likeness {
   bool sameSize = false;

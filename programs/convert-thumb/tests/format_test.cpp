@@ -2,6 +2,7 @@
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
+#include <sys/stat.h>
 
 #include "converter_fixture.h"
 #include "support/build_paths.h"
@@ -25,6 +26,13 @@ class Formats : public ConverterTest {
                  double leastMean = 48) const {
     SCOPED_TRACE(name);
     ExpectOwnPictures(MakePicture(name, kWidth, kHeight, options), UsualOutputs(), leastMean);
+  }
+
+  std::string DensityOf(const std::string& name) const {
+    return RunProgram(
+               "/usr/bin/identify-im6.q16",
+               {"-format", "%[fx:resolution.x]x%[fx:resolution.y] %U", directory_ + "/" + name})
+        .out;
   }
 
   /// Makes a picture in ten shorter versions and some with wrong bytes, and expects ImageMagick's
@@ -184,6 +192,80 @@ TEST_F(Formats, HandsOverWhatIsReadDifferently) {
   ExpectHandedOver(map, outputs);
 }
 
+TEST_F(Formats, HandsOverAGifWhoseFirstFrameIsFarAway) {
+  const std::string gif = MakePicture("a.gif", 300, 200, {"-colors", "256"});
+  const std::string bytes = ReadFile(gif);
+  constexpr size_t kColoursEnd = 13 + 3 * 256;
+  const std::string piece = "\xFF" + std::string(255, 'x');
+  const auto delayed = [&](size_t pieces) {
+    std::string extension("\x21\x01", 2);
+    for (size_t i = 0; i < pieces; ++i) {
+      extension += piece;
+    }
+    return bytes.substr(0, kColoursEnd) + extension + '\0' + bytes.substr(kColoursEnd);
+  };
+  WriteFile(gif, delayed(10));
+  ExpectOwnPictures(gif, {ThumbOptions()});
+  WriteFile(gif, delayed(70000));
+  ExpectHandedOver(gif, {ThumbOptions()});
+}
+
+TEST_F(Formats, AnAnimationsFirstFrameMayBeOpaqueAmongTransparentOnes) {
+  // A frame that changes a part only is written with everything else transparent.
+  const std::string source =
+      MakePicture("a.webp", 300, 200,
+                  {"-attenuate", "0.5", "+noise", "Gaussian", "-define", "webp:lossless=true", "(",
+                   "+clone", "-fill", "red", "-draw", "rectangle 30,30 100,100", ")"});
+  ThumbOptions options;
+  options.width = 200;
+  options.height = 200;
+  options.flatten = true;
+  ExpectOwnPictures(source + "[0]", {options}, 48);
+}
+
+TEST_F(Formats, TransparentFramesOfAnAnimationAreFlattened) {
+  const std::string source = MakePicture("a.webp", 900, 660,
+                                         {"-alpha", "set", "-channel", "A", "-evaluate", "multiply",
+                                          "0.5", "+channel", "(", "+clone", "-flip", ")"});
+  ExpectOwnPictures(source + "[0]", UsualOutputs(), 45);
+}
+
+TEST_F(Formats, DensityOfTiffHasItsUnit) {
+  for (const char* unit : {"PixelsPerInch", "PixelsPerCentimeter"}) {
+    const std::string source =
+        MakePicture("a.tif", 300, 200, {"-depth", "8", "-units", unit, "-density", "120"});
+    ExpectOwnPictures(source, {ThumbOptions()});
+    EXPECT_EQ(DensityOf("ours0.jpg"), std::string("120x120 ") + unit);
+    EXPECT_EQ(DensityOf("theirs0.jpg"), std::string("120x120 ") + unit);
+  }
+}
+
+TEST_F(Formats, DamagedTiffIsNotToldByItsLibrary) {
+  const std::string source = MakePicture("a.tif", 300, 200, {"-depth", "8"});
+  const std::string bytes = ReadFile(source);
+  const WithoutImageMagick without;
+  // The directory, which lies at the end of the file, is missing or cut.
+  for (const size_t length : {size_t{40}, bytes.size() - 250, bytes.size() - 60}) {
+    WriteFile(source, bytes.substr(0, length));
+    const ProgramResult result =
+        RunProgram(ConvertThumbPath(), Line(source, {ThumbOptions()}, "ours").Arguments());
+    EXPECT_THAT(result.err, Not(HasSubstr("TIFF")));
+  }
+}
+
+TEST_F(Formats, LibvipsLeavesTheEnvironmentToImageMagick) {
+  const std::string tool = "/usr/vela/lib/convert-thumb";
+  MakeDirectories("/usr/vela/lib");
+  WriteFile(tool, "#!/bin/sh\necho \"VIPSHOME is ${VIPSHOME-unset}\"\n");
+  ASSERT_EQ(chmod(tool.c_str(), 0755), 0);
+  const std::string source = MakePicture("linear.png", 300, 200, {"-set", "gamma", "1"});
+  const std::vector<std::string> arguments = Line(source, {ThumbOptions()}, "ours").Arguments();
+  ProgramOptions options;
+  EXPECT_EQ(RunProgram(ConvertThumbPath(), arguments, options).out, "VIPSHOME is unset\n");
+  options.addedEnvironment = {"VIPSHOME=/opt/vips"};
+  EXPECT_EQ(RunProgram(ConvertThumbPath(), arguments, options).out, "VIPSHOME is /opt/vips\n");
+}
+
 TEST_F(Formats, HandsOverWhatIsNamedLikeARawPhoto) {
   const std::string raw = directory_ + "/a.nef";
   CopyFile(MakePicture("a.tif", 300, 200, {"-depth", "8"}), raw);
@@ -249,6 +331,41 @@ TEST_F(Formats, PicturesThatAreDecodedWholeKeepToTheMemoryLimit) {
   EXPECT_THAT(refused.err, HasSubstr("too much memory"));
   EXPECT_EQ(RunProgram(ConvertThumbPath(), Line(streamed, outputs, "ours").Arguments()).exitCode,
             0);
+}
+
+TEST_F(Formats, SharpeningKeepsToTheMemoryLimit) {
+  // 101 rows as they come and as many blurred ones, of 60,000 floats, take 48 megabytes.
+  ThumbOptions options;
+  options.width = 60000;
+  options.height = 60000;
+  options.unsharp = "50x10+1+0";
+  const std::string map = directory_ + "/wide.pgm";
+  WriteFile(map, "P5 60000 8 255\n" + std::string(60000 * 8, 'x'));
+  const std::vector<std::string> arguments = Line(map, {options}, "ours").Arguments();
+  WriteFile("/etc/velainfo.conf", "convert_memory_limit=\"40000000\"\n");
+  const ProgramResult refused = RunProgram(ConvertThumbPath(), arguments);
+  EXPECT_EQ(refused.exitCode, 1);
+  EXPECT_THAT(refused.err, HasSubstr("too much memory"));
+  WriteFile("/etc/velainfo.conf", "convert_memory_limit=\"100000000\"\n");
+  EXPECT_EQ(RunProgram(ConvertThumbPath(), arguments).exitCode, 0);
+}
+
+TEST_F(Formats, TellsWhyAThumbnailCannotBeEncoded) {
+  ThumbOptions wide;
+  wide.width = 65535;
+  wide.height = 65535;
+  const std::string map = directory_ + "/wide.ppm";
+  std::string samples(65535 * 3, 'x');
+  samples.front() = 'a';
+  WriteFile(map, "P6 65535 1 255\n" + samples);
+  for (const std::vector<ThumbOptions>& outputs :
+       {std::vector<ThumbOptions>{wide}, {wide, ThumbOptions()}}) {
+    const ProgramResult result =
+        RunProgram(ConvertThumbPath(), Line(map, outputs, "ours").Arguments());
+    EXPECT_EQ(result.exitCode, 1);
+    EXPECT_THAT(result.err, HasSubstr("65500"));
+    EXPECT_EQ(result.err.find('\n'), result.err.size() - 1) << result.err;
+  }
 }
 
 TEST_F(Formats, JpegAndPortableMapDoWithoutLibvips) {

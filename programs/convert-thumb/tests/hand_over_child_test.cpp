@@ -57,6 +57,14 @@ TEST_F(HandOverToChild, EndsWithItsStatus) {
   }
 }
 
+TEST_F(HandOverToChild, EndsWithItsStatusWhereChildrenAreIgnored) {
+  const StubTool stub(kImageMagick);
+  stub.Plan(StubPlan().Exit(7));
+  ProgramOptions options = Recorded();
+  options.beforeExec = {IgnoreSignal(SIGCHLD)};
+  EXPECT_EQ(RunProgram(ConvertThumbPath(), arguments_, options).exitCode, 7);
+}
+
 TEST_F(HandOverToChild, EndsByItsSignal) {
   const StubTool stub(kImageMagick);
   for (const int signal : {SIGKILL, SIGSEGV, SIGTERM, SIGXCPU, SIGABRT}) {
@@ -91,6 +99,18 @@ TEST_F(HandOverToChild, LeavesIgnoredSignalsIgnored) {
   EXPECT_THAT(stub.Calls().front().blockedSignals, SizeIs(0));
 }
 
+TEST_F(HandOverToChild, IgnoresNoMoreSignalsThanIt) {
+  const StubTool stub(kImageMagick);
+  for (const auto& action : {SIG_DFL, SIG_IGN}) {
+    ProgramOptions options = Recorded();
+    options.beforeExec = {SetSignals({SIGPIPE, SIGXFSZ}, action)};
+    RunProgram(ConvertThumbPath(), arguments_, options);
+    const std::vector<int> ignored = stub.Calls().back().ignoredSignals;
+    EXPECT_EQ(::testing::Value(ignored, ::testing::Contains(SIGPIPE)), action == SIG_IGN);
+    EXPECT_EQ(::testing::Value(ignored, ::testing::Contains(SIGXFSZ)), action == SIG_IGN);
+  }
+}
+
 TEST_F(HandOverToChild, LetsNothingOutliveIt) {
   const StubTool stub(kImageMagick);
   stub.Plan(EndlessWork());
@@ -104,6 +124,13 @@ TEST_F(HandOverToChild, FailsWhenTheProgramCannotRun) {
   const ProgramResult result = RunProgram(ConvertThumbPath(), arguments_);
   EXPECT_EQ(result.exitCode, 1);
   EXPECT_EQ(result.err, "convert-thumb: /usr/bin/convert-im6.q16: No such file or directory\n");
+}
+
+TEST_F(HandOverToChild, FailsWithAStatusWhenNobodyReadsTheReason) {
+  RemoveTool(kImageMagick);
+  ProgramOptions options;
+  options.beforeExec = {SetSignals({SIGPIPE}, SIG_DFL), BreakErrorPipe()};
+  EXPECT_EQ(RunProgram(ConvertThumbPath(), arguments_, options).exitCode, 1);
 }
 
 }  // namespace

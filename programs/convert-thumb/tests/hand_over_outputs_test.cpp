@@ -2,6 +2,7 @@
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
+#include <sys/stat.h>
 
 #include "converter_fixture.h"
 #include "support/files.h"
@@ -97,6 +98,18 @@ TEST_F(HandOverOutputs, FailWithOneLineWhenTheNameIsTooLong) {
   EXPECT_EQ(result.exitCode, 1);
   EXPECT_EQ(result.err, "convert-thumb: name of an output too long for ImageMagick\n");
   EXPECT_EQ(ListDirectory(directory_), std::vector<std::string>{"source.bmp"});
+}
+
+TEST_F(HandOverOutputs, FailWithOneLineWhenTheyArePipes) {
+  const std::string pipe = directory_ + "/pipe%.jpg";
+  ASSERT_EQ(mkfifo(pipe.c_str(), 0600), 0);
+  ProgramOptions options;
+  options.timeLimit = std::chrono::seconds(20);
+  const CommandLine line = {MakeSource(), directory_, {{{}, directory_ + "/pipe%%.jpg"}}};
+  const ProgramResult result = RunProgram(ConvertThumbPath(), line.Arguments(), options);
+  EXPECT_EQ(result.exitCode, 1);
+  EXPECT_EQ(result.err, "convert-thumb: " + pipe + ": not a regular file\n");
+  EXPECT_TRUE(Exists(pipe));
 }
 
 TEST_F(HandOverOutputs, KeepTheirMeaningWhereOnlyImageMagickUnderstandsTheLine) {

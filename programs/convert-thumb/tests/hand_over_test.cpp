@@ -5,6 +5,7 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <csignal>
 #include <memory>
 
 #include "converter_fixture.h"
@@ -72,6 +73,18 @@ TEST_F(HandOver, StaysTheSameProcessUnderTheSameName) {
   EXPECT_EQ(calls.front().arguments.front(), "convert-thumb");
 }
 
+TEST_F(HandOver, LeavesImageMagickItsSignals) {
+  InstallStub();
+  for (const auto& action : {SIG_DFL, SIG_IGN}) {
+    ProgramOptions options = Recorded();
+    options.beforeExec = {SetSignals({SIGPIPE, SIGXFSZ}, action)};
+    RunProgram(ConvertThumbPath(), {"/a.jpg", "-blur", "0x1", "/b.png"}, options);
+    const std::vector<int> ignored = stub_->Calls().back().ignoredSignals;
+    EXPECT_EQ(::testing::Value(ignored, ::testing::Contains(SIGPIPE)), action == SIG_IGN);
+    EXPECT_EQ(::testing::Value(ignored, ::testing::Contains(SIGXFSZ)), action == SIG_IGN);
+  }
+}
+
 TEST_F(HandOver, PassesWhatNamesNoFileOnAsItIs) {
   InstallStub();
   const std::vector<std::string> arguments = {"-size", "10x10", "gradient:red-blue", "/tmp/b.png"};
@@ -117,12 +130,12 @@ TEST_F(HandOver, PassesTheSourceOnOpenWhenItsNameWouldBeMisread) {
   ASSERT_THAT(handed, SizeIs(line.Arguments().size()));
   EXPECT_THAT(handed[2], StartsWith("/proc/self/fd/"));
   EXPECT_THAT(handed[2], ::testing::EndsWith("[0]"));
-  bool open = false;
+  bool isOpen = false;
   const StubCall call = stub_->Calls().front();
   for (const OpenDescriptor& descriptor : call.descriptors) {
-    open = open || descriptor.target == source;
+    isOpen = isOpen || descriptor.target == source;
   }
-  EXPECT_TRUE(open);
+  EXPECT_TRUE(isOpen);
 }
 
 TEST_F(HandOver, PassesNoOtherDescriptorOn) {

@@ -37,10 +37,13 @@ Picture TwoHalves(const Colour& top, const Colour& bottom) {
 /// The file that a picture is encoded to.
 class Encoded {
  public:
-  explicit Encoded(const Picture& picture) : file_(std::tmpfile()) {
-    const auto jpeg = EncodeJpeg(picture, PhotoTraits(), 90, false);
-    EXPECT_TRUE(jpeg);
-    EXPECT_EQ(std::fwrite(jpeg->bytes.get(), 1, jpeg->size, file_.get()), jpeg->size);
+  explicit Encoded(const Picture& picture, const PhotoTraits& traits = PhotoTraits(),
+                   int quality = 90)
+      : file_(std::tmpfile()) {
+    const EncodedJpeg jpeg = EncodeJpeg(picture, traits, quality, false);
+    EXPECT_TRUE(jpeg.IsComplete());
+    EXPECT_EQ(jpeg.error, "");
+    EXPECT_EQ(std::fwrite(jpeg.bytes.get(), 1, jpeg.size, file_.get()), jpeg.size);
     std::rewind(file_.get());
     reader_ = std::make_unique<JpegReader>(fileno(file_.get()), kMemoryLimit);
     EXPECT_TRUE(reader_->ReadHeader());
@@ -52,6 +55,7 @@ class Encoded {
   }
 
   int Channels() const { return reader_->Channels(); }
+  const PhotoTraits& Traits() const { return reader_->Traits(); }
   uint8_t* Pixel(int x, int y) { return rows_.data() + (y * kWidth + x) * Channels(); }
 
  private:
@@ -75,6 +79,35 @@ TEST(JpegEncoding, KeepsTheGreyRowsAboveTheFirstColour) {
     EXPECT_NEAR(encoded.Pixel(20, 10)[i], 60, 3);
     EXPECT_NEAR(encoded.Pixel(20, 50)[i], orange[i], 3);
   }
+}
+
+PhotoTraits ColourSampled(int brightness, int colour) {
+  PhotoTraits traits;
+  traits.colour = true;
+  traits.sampling = {JpegSampling{brightness, brightness}, {colour, colour}, {colour, colour}};
+  return traits;
+}
+
+TEST(JpegEncoding, KeepsThePhotosSampling) {
+  Encoded encoded(TwoHalves({60, 80, 60}, {200, 20, 200}), ColourSampled(2, 1));
+  EXPECT_EQ(encoded.Traits().sampling[0].horizontal, 2);
+  EXPECT_EQ(encoded.Traits().sampling[1].horizontal, 1);
+}
+
+TEST(JpegEncoding, LeavesSamplingAloneThatItCannotHave) {
+  // 16 and 4 and 4 blocks are more than one unit may have.
+  const Picture picture = TwoHalves({60, 80, 60}, {200, 20, 200});
+  Encoded fine(picture, ColourSampled(4, 2), 90);
+  EXPECT_EQ(fine.Traits().sampling[0].horizontal, 1);
+  Encoded coarse(picture, ColourSampled(4, 2), 80);
+  EXPECT_EQ(coarse.Traits().sampling[0].horizontal, 2);
+  EXPECT_EQ(coarse.Traits().sampling[1].horizontal, 1);
+}
+
+TEST(JpegEncoding, TellsWhyItFails) {
+  const EncodedJpeg jpeg = EncodeJpeg(Picture(65501, 1, 3), PhotoTraits(), 80, false);
+  EXPECT_FALSE(jpeg.IsComplete());
+  EXPECT_NE(jpeg.error.find("65500"), std::string::npos) << jpeg.error;
 }
 
 TEST(JpegEncoding, SeesTheFaintestColour) {

@@ -47,6 +47,15 @@ TEST(ThumbnailSizes, NeverGrowAndNeverVanish) {
   ExpectSize(ThumbnailSize({1, 1}, {65535, 65535, true}), 1, 1);
 }
 
+TEST(Sharpening, TellsTheMemoryThatItTakes) {
+  UnsharpMask mask;
+  mask.radius = 70;
+  // 141 rows as they come and as many blurred ones, of 3000 floats.
+  const size_t rows = size_t{2} * 141 * 3000 * sizeof(float);
+  EXPECT_GE(RowSharpener::Memory({1000, 10}, 3, mask), rows);
+  EXPECT_LE(RowSharpener::Memory({1000, 10}, 3, mask), rows + rows / 10);
+}
+
 TEST(Contributions, SumUpToOne) {
   for (const FilterKind kind : {FilterKind::kLanczos, FilterKind::kMitchell}) {
     for (const int grid : {0, 50}) {

@@ -5,8 +5,11 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include <new>
 #include <numeric>
 #include <vector>
+
+#include "worker_threads.h"
 
 namespace {
 
@@ -62,6 +65,22 @@ TEST(RowQueues, TellOfARefusedLastRow) {
   FirstSamples sink(20);
   RowQueue queue(5, sink);
   EXPECT_FALSE(PutRows(queue, 21) && queue.Finish());
+}
+
+class NoMemory final : public RowSink {
+ public:
+  bool Put(const float*) override { throw std::bad_alloc(); }
+};
+
+TEST(RowQueues, TellOfExceptions) {
+  NoMemory sink;
+  RowQueue queue(5, sink);
+  // With one processor the exception comes out of Put.
+  try {
+    EXPECT_FALSE(PutRows(queue, 100) && queue.Finish());
+  } catch (const std::bad_alloc&) {
+    EXPECT_FALSE(HasSecondProcessor());
+  }
 }
 
 TEST(RowQueues, EndBeforeTheirLastRow) {

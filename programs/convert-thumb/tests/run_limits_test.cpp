@@ -1,10 +1,13 @@
 // The limits of a run, and how it ends when it meets them.
 
+#include <fcntl.h>
 #include <gtest/gtest.h>
 #include <sys/resource.h>
+#include <sys/stat.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include <chrono>
 #include <csignal>
 #include <functional>
 #include <thread>
@@ -13,12 +16,14 @@
 #include "confinement/memory_limit.h"
 #include "confinement/resource_limits.h"
 #include "converter_fixture.h"
+#include "encoding/output_file.h"
 #include "encoding/unfinished_outputs.h"
 #include "imagemagick/image_magick_limits.h"
 #include "support/files.h"
 #include "support/images.h"
 #include "support/stub_files.h"
 #include "support/stub_tool.h"
+#include "thumb/descriptor.h"
 
 namespace vela_test {
 namespace {
@@ -44,15 +49,40 @@ rlimit LimitOf(int resource) {
 
 class RunLimits : public ConverterTest {};
 
+void SetMemoryLimit(const std::string& text) {
+  WriteFile("/etc/velainfo.conf", "convert_memory_limit=\"" + text + "\"\n");
+}
+
 TEST_F(RunLimits, AreReadFromTheSystemSettings) {
-  const size_t usual = ConversionMemoryLimit();
-  EXPECT_EQ(usual, 512 * kMebibyte);
-  for (const char* text : {"", "0", "-1", "many", "1e9", "512MiB", "99999999999999999999"}) {
-    WriteFile("/etc/velainfo.conf", std::string("convert_memory_limit=\"") + text + "\"\n");
-    EXPECT_EQ(ConversionMemoryLimit(), usual) << text;
-  }
-  WriteFile("/etc/velainfo.conf", "convert_memory_limit=\"100000000\"\n");
+  SetMemoryLimit("100000000");
   EXPECT_EQ(ConversionMemoryLimit(), 100000000U);
+  for (const char* text : {"300M", "300m", "307200K", "307200k"}) {
+    SetMemoryLimit(text);
+    EXPECT_EQ(ConversionMemoryLimit(), 300 * kMebibyte) << text;
+  }
+  SetMemoryLimit("2G");
+  EXPECT_EQ(ConversionMemoryLimit(), 2048 * kMebibyte);
+}
+
+TEST_F(RunLimits, HaveADefault) {
+  ::testing::internal::CaptureStderr();
+  EXPECT_EQ(ConversionMemoryLimit(), 512 * kMebibyte);
+  SetMemoryLimit("");
+  EXPECT_EQ(ConversionMemoryLimit(), 512 * kMebibyte);
+  EXPECT_EQ(::testing::internal::GetCapturedStderr(), "");
+}
+
+TEST_F(RunLimits, AreToldOfWhenTheyMakeNoSense) {
+  for (const char* text : {"0", "0M", "-1", "many", "M", "1e9", "512MiB", "512 M", "1.5G", "10T",
+                           "99999999999999999999", "99999999999G"}) {
+    SetMemoryLimit(text);
+    ::testing::internal::CaptureStderr();
+    EXPECT_EQ(ConversionMemoryLimit(), 512 * kMebibyte) << text;
+    EXPECT_EQ(::testing::internal::GetCapturedStderr(),
+              "convert-thumb: /etc/velainfo.conf: convert_memory_limit is no number of bytes, "
+              "536870912 is taken\n")
+        << text;
+  }
 }
 
 #ifndef __SANITIZE_ADDRESS__
@@ -138,6 +168,84 @@ TEST_F(RunLimits, LeaveNoOutputsOfAFailedRun) {
   line.outputs.back().path = directory_ + "/missing/a.jpg";
   EXPECT_EQ(RunProgram(ConvertThumbPath(), line.Arguments()).exitCode, 1);
   EXPECT_EQ(ListDirectory(directory_), std::vector<std::string>{"a.jpg"});
+}
+
+TEST_F(RunLimits, LeaveNoOutputsWhenNobodyReadsTheReason) {
+  const std::string photo = MakePhoto("a.jpg", 700, 500);
+  CommandLine line = Line(photo, UsualOutputs(), "ours");
+  line.outputs.back().path = directory_ + "/missing/a.jpg";
+  ProgramOptions options;
+  options.beforeExec = {SetSignals({SIGPIPE}, SIG_DFL), BreakErrorPipe()};
+  EXPECT_EQ(RunProgram(ConvertThumbPath(), line.Arguments(), options).exitCode, 1);
+  EXPECT_EQ(ListDirectory(directory_), std::vector<std::string>{"a.jpg"});
+}
+
+TEST_F(RunLimits, LeaveNoOutputsBeyondTheLargestFile) {
+  const std::string photo = MakePhoto("a.jpg", 700, 500);
+  ProgramOptions options;
+  // The smallest thumbnail fits.
+  options.beforeExec = {SetSignals({SIGXFSZ}, SIG_DFL), LimitResource(RLIMIT_FSIZE, 20000)};
+  const CommandLine line = Line(photo, UsualOutputs(), "ours");
+  const ProgramResult result = RunProgram(ConvertThumbPath(), line.Arguments(), options);
+  EXPECT_EQ(result.exitCode, 1);
+  EXPECT_EQ(ListDirectory(directory_), std::vector<std::string>{"a.jpg"});
+}
+
+TEST_F(RunLimits, LetNoOutputBeginOnceTheRunIsEnding) {
+  const std::string path = directory_ + "/late.jpg";
+  const unsigned char byte = 0;
+  EXPECT_EQ(StatusOf([&] {
+              RemoveNotedOutputs();
+              return WriteOutputFile(path, &byte, 1) ? 1 : 0;
+            }),
+            0);
+  EXPECT_FALSE(Exists(path));
+}
+
+TEST_F(RunLimits, RemoveNothingThatIsNotTheRuns) {
+  const std::string forgotten = directory_ + "/forgotten.jpg";
+  WriteFile(forgotten, "content");
+  const std::string pipe = directory_ + "/pipe.jpg";
+  const std::string device = directory_ + "/device.jpg";
+  ASSERT_EQ(mkfifo(pipe.c_str(), 0600), 0);
+  ASSERT_EQ(symlink("/dev/null", device.c_str()), 0);
+  EXPECT_EQ(StatusOf([&] {
+              for (const std::string& path : {forgotten, pipe, device}) {
+                NoteOutput(path);
+              }
+              ForgetOutput(forgotten);
+              RemoveNotedOutputs();
+              return 0;
+            }),
+            0);
+  EXPECT_EQ(ListDirectory(directory_),
+            (std::vector<std::string>{"device.jpg", "forgotten.jpg", "pipe.jpg"}));
+}
+
+TEST_F(RunLimits, DoNotLetAPipeHoldTheRun) {
+  const std::string photo = MakePhoto("a.jpg", 300, 200);
+  const CommandLine line = Line(photo, {ThumbOptions()}, "pipe");
+  const std::string pipe = line.outputs.front().path;
+  ASSERT_EQ(mkfifo(pipe.c_str(), 0600), 0);
+  ProgramOptions options;
+  options.timeLimit = std::chrono::seconds(20);
+  EXPECT_EQ(RunProgram(ConvertThumbPath(), line.Arguments(), options).exitCode, 1);
+  const Descriptor reader(open(pipe.c_str(), O_RDONLY | O_NONBLOCK | O_CLOEXEC));
+  ASSERT_TRUE(reader.IsOpen());
+  const ProgramResult result = RunProgram(ConvertThumbPath(), line.Arguments(), options);
+  EXPECT_EQ(result.exitCode, 1);
+  EXPECT_EQ(result.err, "convert-thumb: cannot write " + pipe + "\n");
+  EXPECT_TRUE(Exists(pipe));
+}
+
+TEST_F(RunLimits, LetOutputsGoToADevice) {
+  const std::string photo = MakePhoto("a.jpg", 300, 200);
+  const CommandLine line = Line(photo, {ThumbOptions()}, "device");
+  const std::string device = line.outputs.front().path;
+  ASSERT_EQ(symlink("/dev/null", device.c_str()), 0);
+  const ProgramResult result = RunProgram(ConvertThumbPath(), line.Arguments());
+  EXPECT_EQ(result.exitCode, 0) << result.err;
+  EXPECT_TRUE(Exists(device));
 }
 
 class ImageMagickLimits : public ConverterTest {

@@ -3,6 +3,11 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <sys/stat.h>
+#include <sys/xattr.h>
+#include <unistd.h>
+
+#include <array>
+#include <cstdint>
 
 #include "converter_fixture.h"
 #include "support/files.h"
@@ -19,6 +24,35 @@ namespace {
 using ::testing::ElementsAre;
 using ::testing::SizeIs;
 using ::testing::StartsWith;
+
+struct stat StatusOf(const std::string& path) {
+  struct stat status {};
+  EXPECT_EQ(stat(path.c_str(), &status), 0);
+  return status;
+}
+
+/// Gives a file, or with "default" a directory for its new files, an access control list by which
+/// user 0 may read. Attributes of this kind are those that every file system of the tests has.
+void SetAccessList(const std::string& path, const std::string& kind) {
+  struct Entry {
+    uint16_t tag;
+    uint16_t permissions;
+    uint32_t id;
+  };
+  struct List {
+    uint32_t version;
+    std::array<Entry, 5> entries;
+  };
+  constexpr uint32_t kNobody = 0xFFFFFFFF;
+  const List list = {2,
+                     {{{0x01, 6, kNobody},
+                       {0x02, 4, 0},
+                       {0x04, 4, kNobody},
+                       {0x10, 4, kNobody},
+                       {0x20, 4, kNobody}}}};
+  const std::string name = "system.posix_acl_" + kind;
+  ASSERT_EQ(setxattr(path.c_str(), name.c_str(), &list, sizeof list, 0), 0);
+}
 
 class TurnInPlace : public ConverterTest {
  protected:
@@ -79,6 +113,74 @@ TEST_F(TurnInPlace, KeepsThePermissions) {
   struct stat status {};
   ASSERT_EQ(stat(photo_.c_str(), &status), 0);
   EXPECT_EQ(status.st_mode & 07777U, 0640U);
+}
+
+TEST_F(TurnInPlace, KeepsPermissionsThatTheMaskWouldTake) {
+  TakeImageMagickAway();
+  MakeJpeg(photo_);
+  ASSERT_EQ(chmod(photo_.c_str(), 0666), 0);
+  ProgramOptions options;
+  options.umask = 077;
+  const ProgramResult result =
+      RunProgram(ConvertThumbPath(), {"-rotate", "90", photo_, photo_}, options);
+  EXPECT_EQ(result.exitCode, 0) << result.err;
+  EXPECT_EQ(StatusOf(photo_).st_mode & 07777U, 0666U);
+}
+
+TEST_F(TurnInPlace, LeavesLinksToImageMagick) {
+  const std::string elsewhere = directory_ + "/elsewhere.jpg";
+  MakeJpeg(elsewhere);
+  ASSERT_EQ(symlink(elsewhere.c_str(), photo_.c_str()), 0);
+  const ino_t inode = StatusOf(elsewhere).st_ino;
+  const ProgramResult result = Turn("90", photo_);
+  EXPECT_EQ(result.exitCode, 0) << result.err;
+  struct stat status {};
+  ASSERT_EQ(lstat(photo_.c_str(), &status), 0);
+  EXPECT_TRUE(S_ISLNK(status.st_mode));
+  EXPECT_EQ(StatusOf(elsewhere).st_ino, inode);
+  EXPECT_EQ(QuadrantLetters(elsewhere), LettersAfterTurn(90));
+}
+
+TEST_F(TurnInPlace, LeavesFilesOfSeveralNamesToImageMagick) {
+  const std::string other = directory_ + "/other.jpg";
+  MakeJpeg(photo_);
+  ASSERT_EQ(link(photo_.c_str(), other.c_str()), 0);
+  const ProgramResult result = Turn("90", photo_);
+  EXPECT_EQ(result.exitCode, 0) << result.err;
+  EXPECT_EQ(StatusOf(photo_).st_ino, StatusOf(other).st_ino);
+  EXPECT_EQ(QuadrantLetters(other), LettersAfterTurn(90));
+}
+
+TEST_F(TurnInPlace, LeavesFilesWithAccessListsToImageMagick) {
+  MakeJpeg(photo_);
+  SetAccessList(photo_, "access");
+  const ProgramResult result = Turn("90", photo_);
+  EXPECT_EQ(result.exitCode, 0) << result.err;
+  EXPECT_GT(getxattr(photo_.c_str(), "system.posix_acl_access", nullptr, 0), 0);
+  EXPECT_EQ(QuadrantLetters(photo_), LettersAfterTurn(90));
+}
+
+TEST_F(TurnInPlace, LeavesFilesThatNewOnesWouldNotBeLikeToImageMagick) {
+  MakeJpeg(photo_);
+  SetAccessList(directory_, "default");
+  const ProgramResult result = Turn("90", photo_);
+  EXPECT_EQ(result.exitCode, 0) << result.err;
+  EXPECT_LE(getxattr(photo_.c_str(), "system.posix_acl_access", nullptr, 0), 0);
+  EXPECT_EQ(QuadrantLetters(photo_), LettersAfterTurn(90));
+  EXPECT_THAT(ListDirectory(directory_), ElementsAre("photo.jpg"));
+}
+
+TEST_F(TurnInPlace, LeavesFilesOfOthersToImageMagick) {
+  MakeJpeg(photo_);
+  // An ordinary user's sandbox has no others.
+  const bool isOthers = chown(photo_.c_str(), 1, 1) == 0;
+  const ino_t inode = StatusOf(photo_).st_ino;
+  const ProgramResult result = Turn("90", photo_);
+  EXPECT_EQ(result.exitCode, 0) << result.err;
+  EXPECT_EQ(StatusOf(photo_).st_ino == inode, isOthers);
+  EXPECT_EQ(StatusOf(photo_).st_uid, isOthers ? 1U : geteuid());
+  EXPECT_EQ(StatusOf(photo_).st_gid, isOthers ? 1U : getegid());
+  EXPECT_EQ(QuadrantLetters(photo_), LettersAfterTurn(90));
 }
 
 TEST_F(TurnInPlace, TakesAnyName) {

@@ -5,13 +5,13 @@
 #include <unistd.h>
 
 #include <cerrno>
-#include <cstdio>
 #include <cstring>
 #include <memory>
 #include <optional>
 #include <vector>
 
 #include "encoding/output_file.h"
+#include "failure_line.h"
 #include "thumb/descriptor.h"
 #include "turning/turbojpeg_library.h"
 
@@ -24,7 +24,7 @@ constexpr size_t kBytesPerPixel = 2 * 3 * sizeof(short);
 
 struct FileContent {
   std::vector<unsigned char> bytes;
-  mode_t mode = 0;
+  struct stat status = {};
 };
 
 bool ReadAll(int descriptor, std::vector<unsigned char>& bytes) {
@@ -42,17 +42,23 @@ bool ReadAll(int descriptor, std::vector<unsigned char>& bytes) {
   return true;
 }
 
-/// Empty when it is no plain file, cannot be read, or is larger than `limit` bytes.
+/// Whether nothing but its name leads to it, and nothing but its status and content belongs to it.
+bool CanBeReplaced(int descriptor, const struct stat& status) {
+  return S_ISREG(status.st_mode) && status.st_nlink == 1 && status.st_uid == geteuid() &&
+         status.st_gid == getegid() && !HasExtendedAttributes(descriptor);
+}
+
+/// Empty when it cannot be replaced, cannot be read, or is larger than `limit` bytes.
 std::optional<FileContent> ReadFile(const std::string& path, size_t limit) {
-  const Descriptor file(open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NOCTTY | O_NONBLOCK));
-  struct stat status;
-  if (!file.IsOpen() || fstat(file.Get(), &status) != 0 || !S_ISREG(status.st_mode) ||
-      static_cast<size_t>(status.st_size) > limit) {
+  const Descriptor file(
+      open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NOCTTY | O_NONBLOCK | O_NOFOLLOW));
+  FileContent content;
+  if (!file.IsOpen() || fstat(file.Get(), &content.status) != 0 ||
+      !CanBeReplaced(file.Get(), content.status) ||
+      static_cast<size_t>(content.status.st_size) > limit) {
     return std::nullopt;
   }
-  FileContent content;
-  content.mode = status.st_mode & 07777;
-  content.bytes.resize(static_cast<size_t>(status.st_size));
+  content.bytes.resize(static_cast<size_t>(content.status.st_size));
   return ReadAll(file.Get(), content.bytes) ? std::optional<FileContent>(std::move(content))
                                             : std::nullopt;
 }
@@ -113,10 +119,14 @@ FileTurn TurnJpegFile(const std::string& path, int quarterTurns, size_t memoryLi
       !transformer.Turn(content->bytes, quarterTurns)) {
     return FileTurn::kImpossible;
   }
-  if (!ReplaceFile(path, transformer.Turned(), transformer.Size(), content->mode)) {
-    std::fprintf(stderr, "convert-thumb: cannot replace %s: %s\n", path.c_str(),
-                 std::strerror(errno));
-    return FileTurn::kFailed;
+  switch (ReplaceFile(path, transformer.Turned(), transformer.Size(), content->status)) {
+    case Replacement::kDone:
+      return FileTurn::kDone;
+    case Replacement::kImpossible:
+      return FileTurn::kImpossible;
+    case Replacement::kFailed:
+      break;
   }
-  return FileTurn::kDone;
+  TellFailure("cannot replace %s: %s", path.c_str(), std::strerror(errno));
+  return FileTurn::kFailed;
 }

@@ -4,8 +4,10 @@
 
 #include <turbojpeg.h>
 
+#include "loaded_library.h"
+
 /// The functions of libturbojpeg that are used.
-class TurbojpegLibrary {
+class TurbojpegLibrary final : private LoadedLibrary {
  public:
   /// Returns the library, loaded by the first call; null when it, or a function of it, is missing.
   static const TurbojpegLibrary* Get();
@@ -18,9 +20,4 @@ class TurbojpegLibrary {
 
  private:
   TurbojpegLibrary();
-
-  template <typename Function>
-  void Find(void* library, const char* name, Function& function);
-
-  bool isLoaded_ = false;
 };

@@ -19,10 +19,11 @@ std::vector<LikenessSource> CameraFileSources() {
     const std::string file = name;
     const std::string extension = file.substr(file.rfind('.') + 1);
     sources.push_back(
-        {"Camera", file, extension, Copied(media + "/" + file), {kSix, kFill, kTurned}, true});
+        {"Camera", file, extension, Copied(media + "/" + file), PhotographVectors(), true});
   }
   for (const char* name : {"corrupted.jpg", "invalid.jpg"}) {
-    sources.push_back({"Camera", name, "jpg", Copied(media + "/" + name), {kSix}, true});
+    sources.push_back(
+        {"Camera", name, "jpg", Copied(media + "/" + name), PhotographVectors(), true});
   }
   return sources;
 }

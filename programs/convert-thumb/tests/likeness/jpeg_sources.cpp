@@ -9,7 +9,7 @@ namespace vela_test {
 namespace {
 
 LikenessSource Jpeg(const std::string& says, const JpegKind& kind, PhotoSize size = {}) {
-  return {"JPEG", says, "jpg", Encoded(kind, size), AllVectors()};
+  return {"JPEG", says, "jpg", Encoded(kind, size), UsualVectors()};
 }
 
 LikenessSource LargeJpeg(const std::string& says, const JpegKind& kind, PhotoSize size) {
@@ -117,10 +117,13 @@ void AddInks(std::vector<LikenessSource>& sources) {
 void AddSizes(std::vector<LikenessSource>& sources) {
   sources.push_back(LargeJpeg("3 megapixels", {}, {2048, 1536}));
   LikenessSource source = LargeJpeg("8 megapixels", {}, {3264, 2448});
-  source.vectors = {kSix, kFill, kSingle};
+  source.vectors = PhotographVectors();
   sources.push_back(source);
   source = LargeJpeg("12 megapixels", {}, {4000, 3000});
-  source.vectors = {kSix, kTurned};
+  source.vectors = {kSix, kTurned, kSingle, kMiddle};
+  sources.push_back(source);
+  source = LargeJpeg("24 megapixels", {}, {6000, 4000});
+  source.vectors = {kSix, kSingle, kMiddle};
   sources.push_back(source);
   sources.push_back(Jpeg("641 x 479", {}, {641, 479}));
   sources.push_back(Jpeg("upright, 333 x 777", {}, {333, 777}));

@@ -11,6 +11,12 @@ std::vector<int> Sides(const std::string& vector, bool large) {
   if (vector == kSingle) {
     return {large ? 320 : 160};
   }
+  if (vector == kSmall) {
+    return {large ? 120 : 60};
+  }
+  if (vector == kMiddle) {
+    return {large ? 800 : 240};
+  }
   return large ? std::vector<int>{1280, 320} : std::vector<int>{400, 120};
 }
 
@@ -39,8 +45,12 @@ void Adapt(const std::string& vector, ThumbOptions& options) {
 
 }  // namespace
 
-std::vector<std::string> AllVectors() {
+std::vector<std::string> UsualVectors() {
   return {kSix, kFill, kTurned, kSingle, kBare};
+}
+
+std::vector<std::string> PhotographVectors() {
+  return {kSix, kFill, kTurned, kSingle, kSmall, kMiddle, kBare};
 }
 
 std::vector<ThumbOptions> OutputsOf(const std::string& vector, bool large) {

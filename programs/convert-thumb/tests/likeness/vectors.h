@@ -12,10 +12,15 @@ constexpr const char* kSix = "six";        ///< six outputs in one run, fitting,
 constexpr const char* kFill = "fill";      ///< filling the box, not sharpened
 constexpr const char* kTurned = "turned";  ///< two outputs, turned by 90 degrees
 constexpr const char* kSingle = "single";  ///< one small output, sharpened
+constexpr const char* kSmall = "small";    ///< one very small output, sharpened
+constexpr const char* kMiddle = "middle";  ///< one output of middle size, sharpened
 constexpr const char* kBare = "bare";      ///< two outputs, as little done to them as possible
 
-/// All of them.
-std::vector<std::string> AllVectors();
+/// Those that most inputs get.
+std::vector<std::string> UsualVectors();
+
+/// Those that show what becomes of a photo that need not be decoded at its full size.
+std::vector<std::string> PhotographVectors();
 
 /// The outputs of one, largest first. `large`: of the usual sizes, otherwise smaller ones.
 std::vector<ThumbOptions> OutputsOf(const std::string& vector, bool large);

@@ -1,0 +1,12 @@
+#include "loaded_library.h"
+
+#include <dlfcn.h>
+
+LoadedLibrary::LoadedLibrary(const char* name, int mode)
+    : library_(dlopen(name, mode | RTLD_LOCAL)), isLoaded_(library_ != nullptr) {}
+
+void* LoadedLibrary::Address(const char* name) {
+  void* const address = library_ == nullptr ? nullptr : dlsym(library_, name);
+  isLoaded_ = isLoaded_ && address != nullptr;
+  return address;
+}

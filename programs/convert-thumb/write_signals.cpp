@@ -1,0 +1,30 @@
+#include "write_signals.h"
+
+#include <csignal>
+#include <cstddef>
+
+namespace {
+
+constexpr int kSignals[] = {SIGPIPE, SIGXFSZ};
+constexpr size_t kCount = sizeof kSignals / sizeof *kSignals;
+
+struct sigaction g_former[kCount];
+bool g_isIgnoring = false;
+
+}  // namespace
+
+void IgnoreWriteSignals() {
+  struct sigaction ignore = {};
+  ignore.sa_handler = SIG_IGN;
+  for (size_t i = 0; i < kCount; ++i) {
+    sigaction(kSignals[i], &ignore, g_isIgnoring ? nullptr : &g_former[i]);
+  }
+  g_isIgnoring = true;
+}
+
+void RestoreWriteSignals() {
+  for (size_t i = 0; g_isIgnoring && i < kCount; ++i) {
+    sigaction(kSignals[i], &g_former[i], nullptr);
+  }
+  g_isIgnoring = false;
+}
