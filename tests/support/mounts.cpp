@@ -6,6 +6,7 @@
 #include <sys/statvfs.h>
 #include <unistd.h>
 
+#include <cerrno>
 #include <utility>
 
 #include "support/environment_failure.h"
@@ -29,6 +30,17 @@ void Unmount(const std::string& path, uint64_t mount) {
   if (MountAt(path) == mount) {
     umount2(path.c_str(), MNT_DETACH);
   }
+}
+
+/// False, with errno set, when the volume cannot be given that size.
+bool TrySetAvailable(const std::string& path, uint64_t bytes) {
+  const struct statvfs volume = VolumeOf(path);
+  const uint64_t used = static_cast<uint64_t>(volume.f_blocks - volume.f_bfree) * volume.f_frsize;
+  if (used + bytes == 0) {
+    EnvironmentFailure("an empty volume cannot be full");
+  }
+  const std::string options = "size=" + std::to_string(used + bytes);
+  return mount("tmpfs", path.c_str(), "tmpfs", MS_REMOUNT | MS_NOSUID, options.c_str()) == 0;
 }
 
 }  // namespace
@@ -55,15 +67,17 @@ uint64_t SmallVolume::Available() const {
 }
 
 void SmallVolume::SetAvailable(uint64_t bytes) {
-  const struct statvfs volume = VolumeOf(path_);
-  const uint64_t used = static_cast<uint64_t>(volume.f_blocks - volume.f_bfree) * volume.f_frsize;
-  if (used + bytes == 0) {
-    EnvironmentFailure("an empty volume cannot be full");
+  // Who writes at the same time may take up more than is left, which is refused.
+  constexpr int kTrials = 1000;
+  for (int trial = 0; trial < kTrials; ++trial) {
+    if (TrySetAvailable(path_, bytes)) {
+      return;
+    }
+    if (errno != EINVAL) {
+      break;
+    }
   }
-  const std::string options = "size=" + std::to_string(used + bytes);
-  if (mount("tmpfs", path_.c_str(), "tmpfs", MS_REMOUNT | MS_NOSUID, options.c_str()) != 0) {
-    EnvironmentFailureWithErrno("cannot resize the small volume at " + path_);
-  }
+  EnvironmentFailureWithErrno("cannot resize the small volume at " + path_);
 }
 
 uint64_t SmallVolume::PageSize() {
