@@ -225,6 +225,15 @@ size_t FindSourceArgument(const std::vector<std::string>& arguments) {
   return place < arguments.size() ? place : arguments.size();
 }
 
+std::optional<std::string> FindScratchDirectory(const std::vector<std::string>& arguments) {
+  for (size_t i = 1; i < arguments.size(); ++i) {
+    if (arguments[i - 1] == "-define" && StartsWith(arguments[i], kScratchDefine)) {
+      return arguments[i].substr(sizeof kScratchDefine - 1);
+    }
+  }
+  return std::nullopt;
+}
+
 std::optional<ConversionPlan> ParseConversion(const std::vector<std::string>& arguments) {
   Arguments rest(arguments);
   if (!SkipScratchDirectory(rest)) {

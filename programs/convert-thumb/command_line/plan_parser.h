@@ -25,6 +25,9 @@ std::optional<TurnPlan> ParseTurn(const std::vector<std::string>& arguments);
 /// The place of the argument that names the source; arguments.size() when there is none.
 size_t FindSourceArgument(const std::vector<std::string>& arguments);
 
+/// The directory for temporary files that the arguments name; empty when they name none.
+std::optional<std::string> FindScratchDirectory(const std::vector<std::string>& arguments);
+
 /// The file that a source argument names: all of it but for "[0]" at its end, which chooses the
 /// first page.
 std::string SourceFile(const std::string& argument);

@@ -2,19 +2,17 @@
 
 #include <algorithm>
 #include <cstdlib>
+#include <optional>
+
+#include "command_line/plan_parser.h"
 
 namespace {
 
-constexpr char kScratchDefine[] = "registry:temporary-path=";
 constexpr char kNothing[] = "/dev/null";
 constexpr char kUsualScratchDirectory[] = "/tmp";
 
 /// Name the directory for temporary files where no option does; the first that is set.
 constexpr const char* kScratchVariables[] = {"MAGICK_TEMPORARY_PATH", "MAGICK_TMPDIR", "TMPDIR"};
-
-bool StartsWith(const std::string& text, const std::string& beginning) {
-  return text.compare(0, beginning.size(), beginning) == 0;
-}
 
 std::string WithoutDoubledPercents(const std::string& text) {
   std::string plain;
@@ -57,10 +55,8 @@ void AddOutputArgument(WritablePlaces& places, const std::string& argument) {
 }
 
 std::string ScratchDirectory(const std::vector<std::string>& arguments) {
-  for (size_t i = 1; i < arguments.size(); ++i) {
-    if (arguments[i - 1] == "-define" && StartsWith(arguments[i], kScratchDefine)) {
-      return arguments[i].substr(sizeof kScratchDefine - 1);
-    }
+  if (const std::optional<std::string> named = FindScratchDirectory(arguments)) {
+    return *named;
   }
   for (const char* const variable : kScratchVariables) {
     const char* const directory = std::getenv(variable);
