@@ -43,8 +43,7 @@ ResizePlan LaterResizePlan(PictureSize first, const ThumbnailBox& box, bool exac
 }
 
 bool ThumbnailStream::Serves(const ConversionPlan& plan, const PhotoTraits& traits) {
-  const bool colours = traits.space == ColourSpace::kGrey || traits.space == ColourSpace::kRgb;
-  return traits.orientation == kUpright && colours &&
+  return traits.orientation == kUpright && IsStorable(traits.space) &&
          std::all_of(plan.outputs.begin(), plan.outputs.end(), [](const OutputPlan& output) {
            return std::all_of(output.steps.begin(), output.steps.end(), IsStreamed);
          });

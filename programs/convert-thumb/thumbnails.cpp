@@ -144,7 +144,7 @@ std::optional<ResizePlan> StartFirst(PhotoReader& reader, const OutputPlan& outp
   const PhotoTraits& traits = reader.Traits();
   resize.filter =
       traits.palette || traits.transparent ? FilterKind::kMitchell : FilterKind::kLanczos;
-  // A reduced photo has been thinned out by its decoder, which does it better.
+  // The averages of a reduced photo are not thinned out again.
   resize.coarse = !reader.IsReduced() && IsThinnedOut(fullSize, resize.size);
   resize.columnsFirst = !reader.IsReduced() && IsScaledDownFirst(fullSize, resize.size);
   return resize;
@@ -209,8 +209,7 @@ bool CanMakeThumbnails(const PhotoTraits& traits, const ConversionPlan& plan) {
   const bool converted = std::any_of(steps.begin(), steps.end(), [](const Step& step) {
     return step.kind == Step::Kind::kConvertToSrgb;
   });
-  const bool storable = traits.space == ColourSpace::kGrey || traits.space == ColourSpace::kRgb;
-  return (flattened || !traits.transparent) && (converted || storable);
+  return (flattened || !traits.transparent) && (converted || IsStorable(traits.space));
 }
 
 bool MakeThumbnails(PhotoReader& reader, const ConversionPlan& plan, size_t memoryLimit) {

@@ -5,6 +5,7 @@
 #include <exiv2/exiv2.hpp>
 #include <vector>
 
+#include "support/colour_profile.h"
 #include "support/environment_failure.h"
 #include "support/files.h"
 #include "support/jpeg_writer.h"
@@ -71,20 +72,6 @@ void MakeSequence(const std::string& path, int count, int width, int height) {
   Convert(arguments, width, height);
 }
 
-std::string MadeSrgbProfile() {
-  const cmsHPROFILE profile = cmsCreate_sRGBProfile();
-  cmsUInt32Number size = 0;
-  cmsSaveProfileToMem(profile, nullptr, &size);
-  std::string bytes(size, '\0');
-  const bool made =
-      profile != nullptr && size > 0 && cmsSaveProfileToMem(profile, bytes.data(), &size) != FALSE;
-  cmsCloseProfile(profile);
-  if (!made) {
-    EnvironmentFailure("cannot make a colour profile");
-  }
-  return bytes;
-}
-
 }  // namespace
 
 std::string MakeJpeg(const std::string& path, const JpegRecipe& recipe) {
@@ -138,7 +125,7 @@ std::string MakePpm(const std::string& path, int width, int height) {
 }
 
 std::string SrgbProfile() {
-  static const std::string profile = MadeSrgbProfile();
+  static const std::string profile = ProfileBytes(cmsCreate_sRGBProfile());
   return profile;
 }
 

@@ -8,6 +8,11 @@ enum class ColourSpace {
   kInks,        ///< cyan, magenta, yellow and black, each as the share of light that it leaves
 };
 
+/// Whether a thumbnail can be stored in this space.
+constexpr bool IsStorable(ColourSpace space) {
+  return space == ColourSpace::kGrey || space == ColourSpace::kRgb;
+}
+
 /// Whether a colour profile that a picture of this space has is still of use when the picture has
 /// been converted to red, green and blue.
 constexpr bool ProfileOutlivesConversion(ColourSpace space) {

@@ -35,20 +35,20 @@ class BlockScaler {
   size_t made_ = 0;
 };
 
-class RowScaler final : public RowSink {
+/// Scales the rows of a picture, one after another.
+class RowScaler {
  public:
   /// The same as BlockScaler's.
   RowScaler(PictureSize from, int channels, const ResizePlan& plan, RowSink& next);
 
   /// Where the next row may be written, to be taken by TakeRow.
   float* NextRow() { return block_.NextRow(); }
-  bool TakeRow() { return PutBlock(block_.TakeRow()); }
-
-  bool Put(const float* row) override { return PutBlock(block_.Put(row)); }
+  bool TakeRow() {
+    const int rows = block_.TakeRow();
+    return rows == 0 || scaler_.Put(block_.Lanes(), rows);
+  }
 
  private:
-  bool PutBlock(int rows) { return rows == 0 || scaler_.Put(block_.Lanes(), rows); }
-
   RowBlock block_;
   BlockScaler scaler_;
 };

@@ -28,6 +28,15 @@ class Formats : public ConverterTest {
     ExpectOwnPictures(MakePicture(name, kWidth, kHeight, options), UsualOutputs(), leastMean);
   }
 
+  /// What the loader says that it loads to convert the picture.
+  std::string LoadedFor(const std::string& source) const {
+    ProgramOptions options;
+    options.addedEnvironment = {"LD_DEBUG=files"};
+    return RunProgram(ConvertThumbPath(), Line(source, {ThumbOptions()}, "ours").Arguments(),
+                      options)
+        .err;
+  }
+
   std::string DensityOf(const std::string& name) const {
     return RunProgram(
                "/usr/bin/identify-im6.q16",
@@ -369,28 +378,14 @@ TEST_F(Formats, TellsWhyAThumbnailCannotBeEncoded) {
 }
 
 TEST_F(Formats, JpegAndPortableMapDoWithoutLibvips) {
-  ProgramOptions options;
-  options.addedEnvironment = {"LD_DEBUG=files"};
-  const auto loaded = [&](const std::string& source) {
-    return RunProgram(ConvertThumbPath(), Line(source, {ThumbOptions()}, "ours").Arguments(),
-                      options)
-        .err;
-  };
-  EXPECT_THAT(loaded(MakePicture("a.jpg", 300, 200)), Not(HasSubstr("libvips")));
-  EXPECT_THAT(loaded(MakePicture("a.ppm", 300, 200)), Not(HasSubstr("libvips")));
-  EXPECT_THAT(loaded(MakePicture("a.png", 300, 200)), HasSubstr("libvips"));
+  EXPECT_THAT(LoadedFor(MakePicture("a.jpg", 300, 200)), Not(HasSubstr("libvips")));
+  EXPECT_THAT(LoadedFor(MakePicture("a.ppm", 300, 200)), Not(HasSubstr("libvips")));
+  EXPECT_THAT(LoadedFor(MakePicture("a.png", 300, 200)), HasSubstr("libvips"));
 }
 
 TEST_F(Formats, OnlyHeifLoadsAModuleOfLibvips) {
-  ProgramOptions options;
-  options.addedEnvironment = {"LD_DEBUG=files"};
-  const auto loaded = [&](const std::string& source) {
-    return RunProgram(ConvertThumbPath(), Line(source, {ThumbOptions()}, "ours").Arguments(),
-                      options)
-        .err;
-  };
-  EXPECT_THAT(loaded(MakePicture("a.png", 300, 200)), Not(HasSubstr("vips-modules")));
-  EXPECT_THAT(loaded(MakePicture("a.heic", 300, 200)), HasSubstr("vips-heif.so"));
+  EXPECT_THAT(LoadedFor(MakePicture("a.png", 300, 200)), Not(HasSubstr("vips-modules")));
+  EXPECT_THAT(LoadedFor(MakePicture("a.heic", 300, 200)), HasSubstr("vips-heif.so"));
 }
 
 TEST_F(Formats, HandsOverWithoutLibvips) {

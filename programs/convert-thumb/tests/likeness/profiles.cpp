@@ -4,24 +4,10 @@
 
 #include <array>
 
-#include "support/environment_failure.h"
+#include "support/colour_profile.h"
 
 namespace vela_test {
 namespace {
-
-/// The profile's bytes; closes it.
-std::string BytesOf(cmsHPROFILE profile) {
-  cmsUInt32Number size = 0;
-  cmsSaveProfileToMem(profile, nullptr, &size);
-  std::string bytes(size, '\0');
-  const bool made =
-      profile != nullptr && size > 0 && cmsSaveProfileToMem(profile, bytes.data(), &size) != FALSE;
-  cmsCloseProfile(profile);
-  if (!made) {
-    EnvironmentFailure("cannot make a colour profile");
-  }
-  return bytes;
-}
 
 constexpr cmsCIExyY kDaylight = {0.3127, 0.3290, 1.0};
 
@@ -30,7 +16,7 @@ std::string RgbProfile(const cmsCIExyYTRIPLE& primaries, double gamma) {
   std::array<cmsToneCurve*, 3> curves = {curve, curve, curve};
   const cmsHPROFILE profile = cmsCreateRGBProfile(&kDaylight, &primaries, curves.data());
   cmsFreeToneCurve(curve);
-  return BytesOf(profile);
+  return ProfileBytes(profile);
 }
 
 /// Inks as their overprint on white looks; `toLab` is a transform from RGB.
@@ -86,7 +72,7 @@ std::string GreyProfile() {
   cmsToneCurve* const curve = cmsBuildGamma(nullptr, 2.2);
   const cmsHPROFILE profile = cmsCreateGrayProfile(cmsD50_xyY(), curve);
   cmsFreeToneCurve(curve);
-  return BytesOf(profile);
+  return ProfileBytes(profile);
 }
 
 std::string InkProfile() {
@@ -97,7 +83,7 @@ std::string InkProfile() {
   cmsSetPCS(profile, cmsSigLabData);
   WriteDescription(profile);
   WriteInkTable(profile);
-  return BytesOf(profile);
+  return ProfileBytes(profile);
 }
 
 }  // namespace vela_test
