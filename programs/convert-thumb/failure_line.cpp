@@ -6,6 +6,8 @@
 #include <cstdio>
 #include <cstring>
 
+namespace vela {
+
 namespace {
 
 /// Holds the longest path.
@@ -48,3 +50,5 @@ void WriteFailureLine() {
     std::fprintf(stderr, "convert-thumb: %s\n", g_line);
   }
 }
+
+}  // namespace vela

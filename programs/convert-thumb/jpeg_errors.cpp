@@ -1,5 +1,7 @@
 #include "jpeg_errors.h"
 
+namespace vela {
+
 namespace {
 
 void LeaveLibrary(j_common_ptr info) {
@@ -24,3 +26,5 @@ jpeg_error_mgr* PrepareJpegErrors(JpegErrors& errors) {
   errors.message[0] = '\0';
   return &errors.manager;
 }
+
+}  // namespace vela

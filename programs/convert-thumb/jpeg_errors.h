@@ -7,6 +7,8 @@
 
 #include <jpeglib.h>
 
+namespace vela {
+
 /// Put in place of the library's error manager. Its first member is the library's own part.
 struct JpegErrors {
   jpeg_error_mgr manager;
@@ -29,3 +31,5 @@ bool CallJpegLibrary(JpegErrors& errors, const Call& call) {
   call();
   return true;
 }
+
+}  // namespace vela

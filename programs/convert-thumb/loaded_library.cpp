@@ -2,6 +2,8 @@
 
 #include <dlfcn.h>
 
+namespace vela {
+
 LoadedLibrary::LoadedLibrary(const char* name, int mode)
     : library_(dlopen(name, mode | RTLD_LOCAL)), isLoaded_(library_ != nullptr) {}
 
@@ -10,3 +12,5 @@ void* LoadedLibrary::Address(const char* name) {
   isLoaded_ = isLoaded_ && address != nullptr;
   return address;
 }
+
+}  // namespace vela

@@ -1,6 +1,8 @@
 // A library that is loaded when it is needed and not with the program.
 #pragma once
 
+namespace vela {
+
 /// Base of the wrappers that hold a library's functions. The library stays until the process ends.
 class LoadedLibrary {
  public:
@@ -27,3 +29,5 @@ class LoadedLibrary {
   void* library_;
   bool isLoaded_;
 };
+
+}  // namespace vela

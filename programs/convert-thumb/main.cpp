@@ -21,10 +21,12 @@
 #include "encoding/unfinished_outputs.h"
 #include "failure_line.h"
 #include "imagemagick/image_magick.h"
-#include "thumb/descriptor.h"
+#include "posix/file_descriptor.h"
 #include "thumbnails.h"
 #include "turning/jpeg_turn.h"
 #include "write_signals.h"
+
+namespace vela {
 
 namespace {
 
@@ -45,7 +47,8 @@ bool IsRegularFile(int descriptor) {
 int Convert(const ConversionPlan& plan, const std::vector<std::string>& arguments,
             size_t memoryLimit) {
   // Opening must not wait when the source is a pipe.
-  const Descriptor file(open(plan.source.c_str(), O_RDONLY | O_CLOEXEC | O_NOCTTY | O_NONBLOCK));
+  const FileDescriptor file(
+      open(plan.source.c_str(), O_RDONLY | O_CLOEXEC | O_NOCTTY | O_NONBLOCK));
   if (!file.IsOpen()) {
     TellFailure("cannot open %s: %s", plan.source.c_str(), std::strerror(errno));
     return kFailed;
@@ -77,9 +80,7 @@ int Run(const std::vector<std::string>& arguments, size_t memoryLimit) {
   return plan ? Convert(*plan, arguments, memoryLimit) : LeaveToImageMagick(arguments, memoryLimit);
 }
 
-}  // namespace
-
-int main(int argc, char** argv) {
+int RunMain(int argc, char** argv) {
   int status = kFailed;
   try {
     const std::vector<std::string> arguments(argv + (argc > 0 ? 1 : 0), argv + argc);
@@ -99,4 +100,12 @@ int main(int argc, char** argv) {
     WriteFailureLine();
   }
   return status;
+}
+
+}  // namespace
+
+}  // namespace vela
+
+int main(int argc, char** argv) {
+  return vela::RunMain(argc, argv);
 }

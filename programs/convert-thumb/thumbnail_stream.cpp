@@ -7,6 +7,8 @@
 #include "picture/row_scaler.h"
 #include "picture/unsharp.h"
 
+namespace vela {
+
 namespace {
 
 constexpr int kUpright = 1;
@@ -149,3 +151,5 @@ RowSink* ThumbnailStream::AddSharpening(PictureSize size, const OutputPlan& outp
   }
   return next;
 }
+
+}  // namespace vela

@@ -13,6 +13,8 @@
 #include "picture/row_queue.h"
 #include "picture/row_sink.h"
 
+namespace vela {
+
 /// How a thumbnail is scaled from the first one, which has the size `first`. `exact`: with the
 /// order of directions that ImageMagick has, not the faster one.
 ResizePlan LaterResizePlan(PictureSize first, const ThumbnailBox& box, bool exact);
@@ -59,3 +61,5 @@ class ThumbnailStream final : public RowSink {
   RowSink* way_ = nullptr;  ///< of a row of the first thumbnail
   bool failed_ = false;
 };
+
+}  // namespace vela

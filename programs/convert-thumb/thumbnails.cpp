@@ -17,6 +17,8 @@
 #include "thumbnail_stream.h"
 #include "worker_threads.h"
 
+namespace vela {
+
 namespace {
 
 /// A picture on its way to an output.
@@ -226,3 +228,5 @@ bool MakeThumbnails(PhotoReader& reader, const ConversionPlan& plan, size_t memo
   return streamed ? MakeWhileDecoding(reader, *resize, plan)
                   : MakeWholePictures(reader, *resize, plan);
 }
+
+}  // namespace vela

@@ -10,6 +10,8 @@
 
 #include "failure_line.h"
 
+namespace vela {
+
 namespace {
 
 class Work {
@@ -76,3 +78,5 @@ bool HasSecondProcessor() {
 bool DoInTwoThreads(size_t count, const std::function<bool(size_t)>& work) {
   return Work(count, work).Run();
 }
+
+}  // namespace vela

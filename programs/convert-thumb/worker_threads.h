@@ -4,6 +4,8 @@
 #include <cstddef>
 #include <functional>
 
+namespace vela {
+
 /// Whether this process may use more than one processor.
 bool HasSecondProcessor();
 
@@ -11,3 +13,5 @@ bool HasSecondProcessor();
 /// each takes the next number that nobody has taken. False as soon as a call has returned false;
 /// what nobody has taken by then is left out.
 bool DoInTwoThreads(size_t count, const std::function<bool(size_t)>& work);
+
+}  // namespace vela

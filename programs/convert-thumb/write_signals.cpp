@@ -3,6 +3,8 @@
 #include <csignal>
 #include <cstddef>
 
+namespace vela {
+
 namespace {
 
 constexpr int kSignals[] = {SIGPIPE, SIGXFSZ};
@@ -28,3 +30,5 @@ void RestoreWriteSignals() {
   }
   g_isIgnoring = false;
 }
+
+}  // namespace vela

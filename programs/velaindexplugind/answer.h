@@ -3,6 +3,8 @@
 
 #include <string>
 
+namespace vela {
+
 enum class Outcome {
   kDone,     ///< carried out
   kRefused,  ///< the request was wrong
@@ -15,3 +17,5 @@ struct Answer {
   Outcome outcome = Outcome::kFault;
   std::string error;  ///< for the log, empty when there is nothing to tell
 };
+
+}  // namespace vela

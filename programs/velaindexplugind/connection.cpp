@@ -8,6 +8,8 @@
 
 #include "request.h"
 
+namespace vela {
+
 namespace {
 
 constexpr size_t kChunkSize = 16384;
@@ -33,7 +35,7 @@ ssize_t ReceiveChunk(int fd, Chunk& chunk) {
 
 }  // namespace
 
-Connection::Connection(Descriptor socket, Clock::time_point now)
+Connection::Connection(FileDescriptor socket, Clock::time_point now)
     : socket_(std::move(socket)), stateBegin_(now), lastBytes_(now) {}
 
 Connection::Received Connection::Receive(Clock::time_point now) {
@@ -94,3 +96,5 @@ bool Connection::IsOverdue(Clock::time_point now, Clock::duration limit) const {
   if (state_ == State::kDraining) return now - stateBegin_ >= limit;
   return now - lastBytes_ >= limit || now - stateBegin_ >= limit * kSlowness;
 }
+
+}  // namespace vela

@@ -5,7 +5,9 @@
 #include <string>
 #include <string_view>
 
-#include "thumb/descriptor.h"
+#include "posix/file_descriptor.h"
+
+namespace vela {
 
 /// A connection whose socket never blocks. Knows nothing of when it is called.
 class Connection {
@@ -32,7 +34,7 @@ class Connection {
     kEnd,  ///< the client has gone
   };
 
-  Connection(Descriptor socket, Clock::time_point now);
+  Connection(FileDescriptor socket, Clock::time_point now);
 
   int Fd() const { return socket_.Get(); }
   State GetState() const { return state_; }
@@ -62,7 +64,7 @@ class Connection {
   bool IsOverdue(Clock::time_point now, Clock::duration limit) const;
 
  private:
-  Descriptor socket_;
+  FileDescriptor socket_;
   State state_ = State::kReceiving;
   std::string line_;
   std::string reply_;
@@ -72,3 +74,5 @@ class Connection {
   Clock::time_point stateBegin_;
   Clock::time_point lastBytes_;
 };
+
+}  // namespace vela

@@ -5,6 +5,8 @@
 
 #include <memory>
 
+namespace vela {
+
 struct EventLoopCloser {
   void operator()(sd_event* event) const { sd_event_unref(event); }
 };
@@ -15,3 +17,5 @@ struct EventSourceCloser {
 };
 /// Something the loop waits for, until the object ends; its descriptor must live longer.
 using EventSource = std::unique_ptr<sd_event_source, EventSourceCloser>;
+
+}  // namespace vela

@@ -5,6 +5,8 @@
 #include <cerrno>
 #include <vector>
 
+namespace vela {
+
 std::string FindGroup(const std::string& name, gid_t& id) {
   std::vector<char> text(16384);
   group entry{};
@@ -18,3 +20,5 @@ std::string FindGroup(const std::string& name, gid_t& id) {
   id = entry.gr_gid;
   return {};
 }
+
+}  // namespace vela

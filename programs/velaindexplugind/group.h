@@ -5,5 +5,9 @@
 
 #include <string>
 
+namespace vela {
+
 /// Finds the number of the group `name`. Returns what went wrong, empty when nothing did.
 std::string FindGroup(const std::string& name, gid_t& id);
+
+}  // namespace vela

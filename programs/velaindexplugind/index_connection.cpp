@@ -4,6 +4,8 @@
 
 #include "index_tables.h"
 
+namespace vela {
+
 namespace {
 
 /// How long the opening waits for another program's transaction.
@@ -280,3 +282,5 @@ IndexResult IndexConnection::FindVersion(std::string_view directory,
   if (code == SQLITE_ROW) version = sqlite3_column_int(findVersion_.get(), 0);
   return Tell(EndOf(code));
 }
+
+}  // namespace vela

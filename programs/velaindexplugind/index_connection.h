@@ -14,6 +14,8 @@
 #include "index_file.h"
 #include "media_record.h"
 
+namespace vela {
+
 /// How an operation on the index ended: an SQLite result code and what to tell about it.
 struct IndexResult {
   int code = SQLITE_OK;
@@ -95,3 +97,5 @@ class IndexConnection {
   Statement removeVersion_;
   Statement findVersion_;
 };
+
+}  // namespace vela

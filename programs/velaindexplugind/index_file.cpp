@@ -10,7 +10,9 @@
 #include <system_error>
 
 #include "log.h"
-#include "thumb/descriptor.h"
+#include "posix/file_descriptor.h"
+
+namespace vela {
 
 namespace {
 
@@ -29,8 +31,8 @@ void GiveAway(int fd, const std::string& path, const IndexFile& file) {
       .Write();
 }
 
-Descriptor CreateNew(const std::string& path) {
-  return Descriptor(open(path.c_str(), O_RDWR | O_CREAT | O_EXCL | O_CLOEXEC, kFileMode));
+FileDescriptor CreateNew(const std::string& path) {
+  return FileDescriptor(open(path.c_str(), O_RDWR | O_CREAT | O_EXCL | O_CLOEXEC, kFileMode));
 }
 
 }  // namespace
@@ -42,14 +44,14 @@ void MakeIndexDirectory(const IndexFile& file) {
   std::filesystem::create_directories(directory.parent_path(), ignored);
   if (mkdir(directory.c_str(), kDirectoryMode) != 0) return;
   const int flags = O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC;
-  const Descriptor made(open(directory.c_str(), flags));
+  const FileDescriptor made(open(directory.c_str(), flags));
   if (!made.IsOpen()) return;
   GiveAway(made.Get(), directory, file);
   fchmod(made.Get(), kDirectoryMode);
 }
 
 void MakeIndexFile(const IndexFile& file) {
-  Descriptor made = CreateNew(file.path);
+  FileDescriptor made = CreateNew(file.path);
   if (!made.IsOpen() && errno == ENOENT) {
     MakeIndexDirectory(file);
     made = CreateNew(file.path);
@@ -58,3 +60,5 @@ void MakeIndexFile(const IndexFile& file) {
   GiveAway(made.Get(), file.path, file);
   fchmod(made.Get(), kFileMode);
 }
+
+}  // namespace vela

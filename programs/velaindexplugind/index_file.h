@@ -6,6 +6,8 @@
 #include <optional>
 #include <string>
 
+namespace vela {
+
 /// Where the index database is, and whose it is to be when it is made.
 struct IndexFile {
   std::string path;
@@ -20,3 +22,5 @@ void MakeIndexDirectory(const IndexFile& file);
 /// whatever the process's mask; a file that is there keeps its mode. A failure shows when the file
 /// is opened; a group that cannot be given is logged.
 void MakeIndexFile(const IndexFile& file);
+
+}  // namespace vela

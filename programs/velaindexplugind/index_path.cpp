@@ -2,6 +2,8 @@
 
 #include <filesystem>
 
+namespace vela {
+
 std::string PlainPath(std::string_view path) {
   std::string plain = std::filesystem::path(path).lexically_normal().native();
   // Two slashes in front can have a meaning of their own elsewhere; here they have none.
@@ -17,3 +19,5 @@ std::string_view ParentOf(std::string_view path) {
   const size_t slash = path.rfind('/');
   return slash == 0 ? std::string_view("/") : path.substr(0, slash);
 }
+
+}  // namespace vela

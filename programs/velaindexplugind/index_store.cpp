@@ -5,6 +5,8 @@
 
 #include "index_path.h"
 
+namespace vela {
+
 namespace {
 
 /// How long what can be had again waits for other writers, in this program and in others.
@@ -95,3 +97,5 @@ IndexResult IndexStore::FindNearestVersion(std::string_view path, std::optional<
     return result;
   });
 }
+
+}  // namespace vela

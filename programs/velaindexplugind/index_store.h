@@ -13,6 +13,8 @@
 #include "index_connection.h"
 #include "index_file.h"
 
+namespace vela {
+
 /// The index. All operations may be called from any thread; each works with a connection of its
 /// own, so that a reader does not wait for a writer. A database that is removed or replaced is
 /// opened anew at the next operation, as is one that gave an error.
@@ -55,3 +57,5 @@ class IndexStore {
   /// The library lets one writer in and has the others sleep; these need not.
   std::timed_mutex writeMutex_;
 };
+
+}  // namespace vela

@@ -2,6 +2,8 @@
 // and keep their version in the database's user_version: that is not the daemon's to change.
 #pragma once
 
+namespace vela {
+
 /// Version of the tables below. A database where they have a higher one is left alone.
 constexpr int kTablesVersion = 1;
 
@@ -36,3 +38,5 @@ constexpr char kMakeTables[] =
     " version INTEGER NOT NULL"
     ") WITHOUT ROWID;"
     "INSERT OR REPLACE INTO velaindexplugind_schema VALUES (1, 1);";
+
+}  // namespace vela

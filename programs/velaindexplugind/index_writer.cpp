@@ -8,6 +8,8 @@
 #include "index_path.h"
 #include "platform/velaindex.h"
 
+namespace vela {
+
 namespace {
 
 IndexResult StoreOne(IndexConnection& connection, const Request& request) {
@@ -74,3 +76,5 @@ void IndexWriter::CarryOut(std::list<Job>& jobs) const {
     return;
   }
 }
+
+}  // namespace vela

@@ -7,6 +7,8 @@
 #include "index_store.h"
 #include "worker_pool.h"
 
+namespace vela {
+
 /// Writes to the index for many clients, in few transactions. For one thread.
 class IndexWriter {
  public:
@@ -29,3 +31,5 @@ class IndexWriter {
   IndexStore& index_;
   const Clock::duration patience_;
 };
+
+}  // namespace vela

@@ -4,12 +4,16 @@
 #include <string>
 
 #include "index_file.h"
-#include "thumb/descriptor.h"
+#include "posix/file_descriptor.h"
+
+namespace vela {
 
 /// Takes the lock beside the index database, for as long as `lock` lives. Makes the database's
 /// directory when missing. Returns what went wrong, empty when nothing did.
-std::string LockIndex(const IndexFile& database, Descriptor& lock);
+std::string LockIndex(const IndexFile& database, FileDescriptor& lock);
 
 /// Takes the lock of who makes a socket at `path`, for as long as `lock` lives. Returns what went
 /// wrong, empty when nothing did.
-std::string LockSocket(const std::string& path, Descriptor& lock);
+std::string LockSocket(const std::string& path, FileDescriptor& lock);
+
+}  // namespace vela

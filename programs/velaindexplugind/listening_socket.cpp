@@ -18,6 +18,8 @@
 #include "instance_lock.h"
 #include "log.h"
 
+namespace vela {
+
 namespace {
 
 constexpr int kBacklog = 4096;
@@ -36,8 +38,8 @@ bool MakeAddress(const std::string& path, sockaddr_un& address) {
   return true;
 }
 
-Descriptor MakeSocket() {
-  return Descriptor(socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC | SOCK_NONBLOCK, 0));
+FileDescriptor MakeSocket() {
+  return FileDescriptor(socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC | SOCK_NONBLOCK, 0));
 }
 
 const sockaddr* Generic(const sockaddr_un& address) {
@@ -46,7 +48,7 @@ const sockaddr* Generic(const sockaddr_un& address) {
 
 /// Returns 0 when somebody listens at the address, else an errno value.
 int TryConnect(const sockaddr_un& address) {
-  const Descriptor probe = MakeSocket();
+  const FileDescriptor probe = MakeSocket();
   if (!probe.IsOpen()) return errno;
   const bool isConnected = connect(probe.Get(), Generic(address), sizeof address) == 0;
   // A queue that is full is also somebody's.
@@ -113,7 +115,7 @@ std::string ListeningSocket::TakeFromManager(bool& isTaken) {
   if (count < 0) return ErrorAt("sockets from the service manager", -count);
   if (count == 0) return {};
   if (count > 1) return "the service manager handed over more than one socket";
-  socket_ = Descriptor(SD_LISTEN_FDS_START);
+  socket_ = FileDescriptor(SD_LISTEN_FDS_START);
   const int isRight = sd_is_socket(socket_.Get(), AF_UNIX, SOCK_STREAM, 1);
   if (isRight <= 0) return "the service manager handed over no listening local socket";
   const int flags = fcntl(socket_.Get(), F_GETFL);
@@ -176,3 +178,5 @@ bool ListeningSocket::Unlink() {
   lock_.Close();
   return true;
 }
+
+}  // namespace vela

@@ -6,7 +6,9 @@
 #include <optional>
 #include <string>
 
-#include "thumb/descriptor.h"
+#include "posix/file_descriptor.h"
+
+namespace vela {
 
 /// A listening socket: handed over by the service manager, or made at a path and removed again.
 class ListeningSocket {
@@ -41,9 +43,11 @@ class ListeningSocket {
  private:
   std::string Bind(const std::string& path);
 
-  Descriptor socket_;
-  Descriptor lock_;   ///< open while path_ is the object's own to make and remove
-  std::string path_;  ///< empty: not made here
+  FileDescriptor socket_;
+  FileDescriptor lock_;  ///< open while path_ is the object's own to make and remove
+  std::string path_;     ///< empty: not made here
   dev_t device_ = 0;
   ino_t inode_ = 0;
 };
+
+}  // namespace vela

@@ -9,6 +9,8 @@
 #include <cstdlib>
 #include <ctime>
 
+namespace vela {
+
 namespace {
 
 const char* NameOf(LogLevel level) {
@@ -111,3 +113,5 @@ void LogLine::Write() const {
     written = write(STDERR_FILENO, line.data(), line.size());
   } while (written < 0 && errno == EINTR);
 }
+
+}  // namespace vela

@@ -5,6 +5,8 @@
 #include <string>
 #include <string_view>
 
+namespace vela {
+
 /// Levels as the system log numbers them.
 enum class LogLevel { kError = 3, kWarning = 4, kInfo = 6 };
 
@@ -26,3 +28,5 @@ class LogLine {
   LogLevel level_;
   std::string text_;
 };
+
+}  // namespace vela

@@ -9,6 +9,8 @@
 #include "service.h"
 #include "version_request.h"
 
+namespace vela {
+
 namespace {
 
 constexpr int kFailed = 1;
@@ -23,9 +25,7 @@ int Run(const Options& options) {
   }
 }
 
-}  // namespace
-
-int main(int argc, char** argv) {
+int RunMain(int argc, char** argv) {
   Options options;
   switch (ParseOptions(argc, argv, options)) {
     case ParseOutcome::kDone:
@@ -36,4 +36,12 @@ int main(int argc, char** argv) {
       break;
   }
   return Run(options);
+}
+
+}  // namespace
+
+}  // namespace vela
+
+int main(int argc, char** argv) {
+  return vela::RunMain(argc, argv);
 }

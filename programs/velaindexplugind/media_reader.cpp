@@ -9,6 +9,8 @@
 #include "platform/velaindex.h"
 #include "platform/vlibc.h"
 
+namespace vela {
+
 namespace {
 
 std::string ReadVideo(const std::string& path, MediaRecord& record) {
@@ -56,3 +58,5 @@ std::string ReadMediaHeaders(const std::string& path, MediaRecord& record) {
   if (BlVELAIndexIsPhotoOnWebFile(path.c_str())) return ReadPhoto(path, record);
   return "the name is not that of a photo or video";
 }
+
+}  // namespace vela

@@ -3,6 +3,8 @@
 
 #include <cstdint>
 
+namespace vela {
+
 /// The state of a file that a record was read from.
 struct FileState {
   int64_t size = 0;         ///< bytes
@@ -24,3 +26,5 @@ struct MediaRecord {
   uint32_t bitrate = 0;  ///< bits per second
   FileState file;
 };
+
+}  // namespace vela

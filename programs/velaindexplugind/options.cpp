@@ -9,6 +9,8 @@
 
 #include "whole_number.h"
 
+namespace vela {
+
 namespace {
 
 constexpr int kMaxWorkers = 64;
@@ -112,3 +114,5 @@ ParseOutcome ParseOptions(int argc, char** argv, Options& options) {
   }
   return ParseOutcome::kWrong;
 }
+
+}  // namespace vela

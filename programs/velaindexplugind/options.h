@@ -4,6 +4,8 @@
 #include <cstdint>
 #include <string>
 
+namespace vela {
+
 /// What is asked for.
 struct Options {
   std::string database = "/var/lib/velaindex/index.db";
@@ -28,3 +30,5 @@ enum class ParseOutcome {
 
 /// Reads the command line into `options`.
 ParseOutcome ParseOptions(int argc, char** argv, Options& options);
+
+}  // namespace vela

@@ -2,6 +2,8 @@
 
 #include <unistd.h>
 
+namespace vela {
+
 std::optional<ucred> PeerOf(int socket) {
   ucred peer{};
   socklen_t size = sizeof peer;
@@ -16,3 +18,5 @@ std::string ObjectionTo(Command command, const std::optional<ucred>& peer) {
   const bool isTrusted = peer && (peer->uid == 0 || peer->uid == geteuid());
   return isTrusted ? "" : "only root and the daemon's own user may set index versions";
 }
+
+}  // namespace vela

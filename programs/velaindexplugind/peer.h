@@ -8,8 +8,12 @@
 
 #include "request.h"
 
+namespace vela {
+
 /// Returns the process that connected, nothing when it cannot be told.
 std::optional<ucred> PeerOf(int socket);
 
 /// Returns why `peer` may not give the command, empty when it may.
 std::string ObjectionTo(Command command, const std::optional<ucred>& peer);
+
+}  // namespace vela

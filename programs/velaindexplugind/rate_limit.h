@@ -3,6 +3,8 @@
 
 #include <chrono>
 
+namespace vela {
+
 /// Lets a number of lines pass in each stretch of time and counts those that it holds back.
 class RateLimit {
  public:
@@ -34,3 +36,5 @@ class RateLimit {
   int passed_ = 0;
   int heldBack_ = 0;
 };
+
+}  // namespace vela

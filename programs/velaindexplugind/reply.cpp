@@ -3,6 +3,8 @@
 #include <json/value.h>
 #include <json/writer.h>
 
+namespace vela {
+
 namespace {
 
 Json::StreamWriterBuilder MakeWriterBuilder() {
@@ -63,3 +65,5 @@ std::string MediaReply(const std::string& path, const MediaRecord& record) {
   reply["media"] = media;
   return ToLine(reply);
 }
+
+}  // namespace vela

@@ -7,6 +7,8 @@
 
 #include "media_record.h"
 
+namespace vela {
+
 /// The reply where there is not even the memory for another one.
 constexpr char kLastResortReply[] = "{\"error\":\"out of memory\",\"success\":false}\n";
 
@@ -17,3 +19,5 @@ std::string ResultReply(bool result);
 
 /// `path` stands in the reply byte for byte, valid UTF-8 or not.
 std::string MediaReply(const std::string& path, const MediaRecord& record);
+
+}  // namespace vela

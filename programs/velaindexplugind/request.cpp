@@ -5,7 +5,9 @@
 #include <algorithm>
 #include <iterator>
 
-#include "json_object.h"
+#include "platform/standalone/strict_json.h"
+
+namespace vela {
 
 namespace {
 
@@ -91,7 +93,8 @@ const char* CommandWord(Command command) {
 
 std::string ParseRequest(std::string_view line, Request& request) {
   Json::Value object;
-  if (!ReadJsonObject(line, object)) return "the request is not one JSON object";
+  if (!ReadJsonObject(line, DuplicateKeys::kRejected, object))
+    return "the request is not one JSON object";
   const CommandForm* form = nullptr;
   std::string mistake = FindCommand(object, form);
   if (!mistake.empty()) return mistake;
@@ -103,3 +106,5 @@ std::string ParseRequest(std::string_view line, Request& request) {
   }
   return mistake;
 }
+
+}  // namespace vela

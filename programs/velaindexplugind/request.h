@@ -7,6 +7,8 @@
 #include <string>
 #include <string_view>
 
+namespace vela {
+
 /// Longest request line in bytes, without its newline.
 constexpr size_t kRequestMax = 65536;
 
@@ -36,3 +38,5 @@ const char* CommandWord(Command command);
 /// Reads a request line. Returns what is wrong with it in one sentence, empty when nothing is.
 /// Throws only std::bad_alloc.
 std::string ParseRequest(std::string_view line, Request& request);
+
+}  // namespace vela

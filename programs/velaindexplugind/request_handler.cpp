@@ -11,6 +11,8 @@
 #include "media_reader.h"
 #include "reply.h"
 
+namespace vela {
+
 namespace {
 
 /// File systems date changes to up to two seconds. A file that was changed so shortly before its
@@ -129,3 +131,5 @@ Answer RequestHandler::Handle(const Request& request, const Settings& settings) 
   }
   return {};
 }
+
+}  // namespace vela

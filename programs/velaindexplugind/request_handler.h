@@ -8,6 +8,8 @@
 #include "request.h"
 #include "settings.h"
 
+namespace vela {
+
 /// Where a request is to be carried out.
 enum class WorkPlace {
   kAtOnce,      ///< needs nothing that could make it wait
@@ -34,3 +36,5 @@ class RequestHandler {
 
   IndexStore& index_;
 };
+
+}  // namespace vela

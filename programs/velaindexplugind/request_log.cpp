@@ -6,6 +6,8 @@
 #include "log.h"
 #include "peer.h"
 
+namespace vela {
+
 namespace {
 
 const char* NameOf(Outcome outcome) {
@@ -70,3 +72,5 @@ void RequestLog::WriteAcceptFailure(int error) {
   if (!acceptFailures_.Pass(Clock::now(), heldBack)) return;
   LogLine(LogLevel::kError, "accept").Add("error", std::strerror(error)).Write();
 }
+
+}  // namespace vela

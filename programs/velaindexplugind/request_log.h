@@ -7,6 +7,8 @@
 #include "rate_limit.h"
 #include "request.h"
 
+namespace vela {
+
 /// Logs refused and failed requests, so many in a stretch of time, and all others where asked to.
 class RequestLog {
  public:
@@ -28,3 +30,5 @@ class RequestLog {
   RateLimit problems_{20, std::chrono::seconds(10)};
   RateLimit acceptFailures_{1, std::chrono::seconds(10)};
 };
+
+}  // namespace vela

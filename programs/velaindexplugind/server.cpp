@@ -13,6 +13,8 @@
 #include "peer.h"
 #include "reply.h"
 
+namespace vela {
+
 namespace {
 
 /// How many connections are taken before others have their turn.
@@ -64,7 +66,7 @@ uint32_t EventsFor(Connection::State state) {
 }  // namespace
 
 struct Server::Client {
-  Client(Server& owner, uint64_t number, Descriptor socket, Clock::time_point now)
+  Client(Server& owner, uint64_t number, FileDescriptor socket, Clock::time_point now)
       : server(owner), id(number), connection(std::move(socket), now), begin(now) {}
 
   Server& server;
@@ -140,7 +142,7 @@ bool Server::AcceptSome() {
       sd_event_source_set_enabled(listenerSource_.get(), SD_EVENT_OFF);
       return false;
     }
-    Descriptor socket(accept4(listener_, nullptr, nullptr, SOCK_CLOEXEC | SOCK_NONBLOCK));
+    FileDescriptor socket(accept4(listener_, nullptr, nullptr, SOCK_CLOEXEC | SOCK_NONBLOCK));
     if (socket.IsOpen()) {
       Welcome(std::move(socket));
     } else if (errno == EAGAIN) {
@@ -171,7 +173,7 @@ void Server::ResumeAccepting() {
   if (listenerSource_) sd_event_source_set_enabled(listenerSource_.get(), SD_EVENT_ON);
 }
 
-void Server::Welcome(Descriptor socket) {
+void Server::Welcome(FileDescriptor socket) {
   Client* client = nullptr;
   try {
     const uint64_t id = ++lastClient_;
@@ -395,3 +397,5 @@ void Server::BeginStop(bool takesWaiting, std::function<void()> onIdle) {
 void Server::ReportIdle() {
   if (onIdle_ && clients_.empty() && jobsInHand_ == 0) onIdle_();
 }
+
+}  // namespace vela

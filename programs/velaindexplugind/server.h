@@ -17,6 +17,8 @@
 #include "request_log.h"
 #include "worker_pool.h"
 
+namespace vela {
+
 /// How much the server lets happen at once, and for how long.
 struct ServerLimits {
   int workers = 4;                         ///< threads that read media files
@@ -64,7 +66,7 @@ class Server {
   void PauseAccepting(int error);
   void ResumeAccepting();
   void LetUnheardGo();
-  void Welcome(Descriptor socket);
+  void Welcome(FileDescriptor socket);
   void Serve(Client& client, uint32_t events);
   void Step(Client& client, uint32_t events);
   void Receive(Client& client);
@@ -108,3 +110,5 @@ class Server {
   std::unique_ptr<WorkerPool> indexReads_;
   std::unique_ptr<WorkerPool> indexWrites_;
 };
+
+}  // namespace vela

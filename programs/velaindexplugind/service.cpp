@@ -27,6 +27,8 @@
 #include "server.h"
 #include "settings.h"
 
+namespace vela {
+
 namespace {
 
 constexpr int kStarted = 0;
@@ -92,7 +94,7 @@ class Service {
 
   const Options& options_;
   std::optional<gid_t> group_;
-  Descriptor lock_;
+  FileDescriptor lock_;
   ListeningSocket socket_;
   std::unique_ptr<IndexStore> index_;
   std::unique_ptr<RequestHandler> handler_;
@@ -264,3 +266,5 @@ int RunService(const Options& options) {
   LogLine(LogLevel::kError, "start").Add("error", problem).Write();
   return kNotStarted;
 }
+
+}  // namespace vela

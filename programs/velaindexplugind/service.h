@@ -3,6 +3,10 @@
 
 #include "options.h"
 
+namespace vela {
+
 /// Runs the daemon until a signal ends it. Returns the exit status: 0, or 1 when it could not
 /// start, which is then logged.
 int RunService(const Options& options);
+
+}  // namespace vela

@@ -8,6 +8,8 @@
 #include "platform/vlibc.h"
 #include "whole_number.h"
 
+namespace vela {
+
 namespace {
 
 constexpr char kSettingsFile[] = "/etc/velainfo.conf";
@@ -47,3 +49,5 @@ Settings ReadSettings(std::string& warning) {
   settings.isVideoConvertDisabled = IsYes("disable_convert_video", warning);
   return settings;
 }
+
+}  // namespace vela

@@ -4,6 +4,8 @@
 #include <cstdint>
 #include <string>
 
+namespace vela {
+
 /// The settings, with the defaults for what the file does not say.
 struct Settings {
   int32_t indexVersion = 0;
@@ -14,3 +16,5 @@ struct Settings {
 /// Reads the settings file anew. `warning`, when not empty afterwards, tells about a value or file
 /// that could not be used; the default stands in for it.
 Settings ReadSettings(std::string& warning);
+
+}  // namespace vela

@@ -8,6 +8,8 @@
 #include "ipc/velamk_ipc.h"
 #include "platform/velaindex.h"
 
+namespace vela {
+
 namespace {
 
 constexpr int kTimeout = 60;  // seconds
@@ -35,3 +37,5 @@ int RequestVersion(const Options& options) {
   std::cerr << "velaindexplugind: " << reason << '\n';
   return 1;
 }
+
+}  // namespace vela

@@ -2,6 +2,8 @@
 
 #include <charconv>
 
+namespace vela {
+
 std::optional<int32_t> ParseWholeNumber(std::string_view text) {
   if (text.empty() || text.front() == '-') return std::nullopt;
   int32_t number = 0;
@@ -10,3 +12,5 @@ std::optional<int32_t> ParseWholeNumber(std::string_view text) {
   if (error != std::errc() || stop != end) return std::nullopt;
   return number;
 }
+
+}  // namespace vela

@@ -8,8 +8,10 @@
 #include <iterator>
 #include <utility>
 
+namespace vela {
+
 int DoneJobs::Open() {
-  signal_ = Descriptor(eventfd(0, EFD_CLOEXEC | EFD_NONBLOCK));
+  signal_ = FileDescriptor(eventfd(0, EFD_CLOEXEC | EFD_NONBLOCK));
   return signal_.IsOpen() ? 0 : errno;
 }
 
@@ -92,3 +94,5 @@ void WorkerPool::Run() {
     lock.lock();
   }
 }
+
+}  // namespace vela

@@ -12,9 +12,11 @@
 #include <vector>
 
 #include "answer.h"
+#include "posix/file_descriptor.h"
 #include "request.h"
 #include "settings.h"
-#include "thumb/descriptor.h"
+
+namespace vela {
 
 /// One request on its way through a pool.
 struct Job {
@@ -42,7 +44,7 @@ class DoneJobs {
   std::list<Job> Take();
 
  private:
-  Descriptor signal_;
+  FileDescriptor signal_;
   std::mutex mutex_;
   std::list<Job> jobs_;
 };
@@ -83,3 +85,5 @@ class WorkerPool {
   bool isStopping_ = false;
   std::vector<std::thread> threads_;
 };
+
+}  // namespace vela

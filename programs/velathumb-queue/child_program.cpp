@@ -7,7 +7,9 @@
 #include <cerrno>
 #include <csignal>
 
-#include "thumb/descriptor.h"
+#include "posix/file_descriptor.h"
+
+namespace vela {
 
 namespace {
 
@@ -41,8 +43,8 @@ pid_t StartChild(const ChildProgram& program, const std::string& entry, int& err
     error = errno;
     return 0;
   }
-  const Descriptor reader(ends[0]);
-  Descriptor writer(ends[1]);
+  const FileDescriptor reader(ends[0]);
+  FileDescriptor writer(ends[1]);
   const char* const arguments[] = {program.path.c_str(), program.profileFile.c_str(), entry.c_str(),
                                    nullptr};
   const pid_t parent = getpid();
@@ -57,7 +59,7 @@ pid_t StartChild(const ChildProgram& program, const std::string& entry, int& err
     error = errno;
     return 0;
   }
-  { const Descriptor closed = std::move(writer); }
+  { const FileDescriptor closed = std::move(writer); }
   error = ReadStartError(reader.Get());
   if (error == 0) {
     return child;
@@ -65,3 +67,5 @@ pid_t StartChild(const ChildProgram& program, const std::string& entry, int& err
   waitpid(child, nullptr, 0);
   return 0;
 }
+
+}  // namespace vela

@@ -5,6 +5,8 @@
 
 #include <string>
 
+namespace vela {
+
 /// How velathumb is started.
 struct ChildProgram {
   std::string path;
@@ -15,3 +17,5 @@ struct ChildProgram {
 /// to be called from the thread that lives as long as the process. Returns the process id, or 0
 /// with `error` set to an errno value.
 pid_t StartChild(const ChildProgram& program, const std::string& entry, int& error);
+
+}  // namespace vela

@@ -10,6 +10,8 @@
 #include "progress/velamk_progress.h"
 #include "run_log.h"
 
+namespace vela {
+
 namespace {
 
 /// How long the answer that conversion may run is good for: entries can follow each other fast.
@@ -80,3 +82,5 @@ bool PauseGate::MayStart() {
   pausedUntil_ = now + pause->askAgain;
   return false;
 }
+
+}  // namespace vela

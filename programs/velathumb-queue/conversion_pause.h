@@ -5,6 +5,8 @@
 #include <optional>
 #include <string>
 
+namespace vela {
+
 /// Why conversion rests, and when to ask again.
 struct ConversionPause {
   std::string reason;
@@ -31,3 +33,5 @@ class PauseGate {
 /// Returns nothing when photos may be converted now: the resume time is reached and the index
 /// service has not switched conversion off.
 std::optional<ConversionPause> FindConversionPause();
+
+}  // namespace vela

@@ -6,14 +6,16 @@
 #include <cerrno>
 #include <string>
 
+#include "posix/file_descriptor.h"
 #include "storage/directory_tree.h"
-#include "thumb/descriptor.h"
+
+namespace vela {
 
 namespace {
 
 bool IsDirectoryLocked(const std::string& directory) {
   const std::string metadata = directory + "/@eaDir";
-  const Descriptor descriptor(open(metadata.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+  const FileDescriptor descriptor(open(metadata.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
   return descriptor.IsOpen() && flock(descriptor.Get(), LOCK_SH | LOCK_NB) != 0 &&
          errno == EWOULDBLOCK;
 }
@@ -30,3 +32,5 @@ bool IsLockedElsewhere(const EntryTarget& target) {
   });
   return isLocked;
 }
+
+}  // namespace vela

@@ -11,6 +11,8 @@
 #include "platform/vlibc.h"
 #include "storage/creation_queue.h"
 
+namespace vela {
+
 namespace {
 
 /// velathumb stops where less is free.
@@ -55,3 +57,5 @@ std::string FindHindrance(const std::string& entry) {
   }
   return VLIBGetFsAvailSize(directory.c_str()) < kLeastFree ? "its volume is nearly full" : "";
 }
+
+}  // namespace vela

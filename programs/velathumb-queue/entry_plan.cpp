@@ -8,6 +8,8 @@
 
 #include "storage/creation_queue.h"
 
+namespace vela {
+
 namespace {
 
 /// How far beyond the first entry that is not done others are looked at.
@@ -116,3 +118,5 @@ std::optional<EntryPlan::Clock::time_point> EntryPlan::NextStart() const {
   }
   return next;
 }
+
+}  // namespace vela

@@ -7,6 +7,8 @@
 #include <string>
 #include <vector>
 
+namespace vela {
+
 /// What an entry stands for.
 struct EntryTarget {
   std::string directory;  ///< without symbolic links when it exists
@@ -62,3 +64,5 @@ class EntryPlan {
   std::vector<size_t> atWork_;
   size_t first_ = 0;  // all before it are done
 };
+
+}  // namespace vela

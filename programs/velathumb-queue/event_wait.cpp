@@ -10,6 +10,8 @@
 
 #include "platform/velautils.h"
 
+namespace vela {
+
 int EventWait::Open(const std::string& watchedFile) {
   sigset_t set;
   sigemptyset(&set);
@@ -19,8 +21,8 @@ int EventWait::Open(const std::string& watchedFile) {
   if (sigprocmask(SIG_BLOCK, &set, nullptr) != 0) {
     return errno;
   }
-  signals_ = Descriptor(signalfd(-1, &set, SFD_CLOEXEC | SFD_NONBLOCK));
-  changes_ = Descriptor(inotify_init1(IN_CLOEXEC | IN_NONBLOCK));
+  signals_ = FileDescriptor(signalfd(-1, &set, SFD_CLOEXEC | SFD_NONBLOCK));
+  changes_ = FileDescriptor(inotify_init1(IN_CLOEXEC | IN_NONBLOCK));
   if (!signals_.IsOpen() || !changes_.IsOpen()) {
     return errno;
   }
@@ -53,3 +55,5 @@ void EventWait::Wait(std::optional<std::chrono::milliseconds> timeout) {
   ReadSignals();
   DiscardChanges();
 }
+
+}  // namespace vela

@@ -5,7 +5,9 @@
 #include <optional>
 #include <string>
 
-#include "thumb/descriptor.h"
+#include "posix/file_descriptor.h"
+
+namespace vela {
 
 /// Gathers what wakes the runner. Blocks SIGCHLD, SIGTERM and SIGINT for the process.
 class EventWait {
@@ -25,7 +27,9 @@ class EventWait {
   void ReadSignals();
   void DiscardChanges();
 
-  Descriptor signals_;
-  Descriptor changes_;
+  FileDescriptor signals_;
+  FileDescriptor changes_;
   bool isStopping_ = false;
 };
+
+}  // namespace vela

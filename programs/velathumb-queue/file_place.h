@@ -5,6 +5,8 @@
 
 #include <string>
 
+namespace vela {
+
 /// Returns whether the open file `descriptor` is the one at `path`.
 inline bool IsAtPath(int descriptor, const std::string& path) {
   struct stat open = {};
@@ -12,3 +14,5 @@ inline bool IsAtPath(int descriptor, const std::string& path) {
   return fstat(descriptor, &open) == 0 && stat(path.c_str(), &named) == 0 &&
          open.st_dev == named.st_dev && open.st_ino == named.st_ino;
 }
+
+}  // namespace vela

@@ -16,10 +16,12 @@
 #include "options.h"
 #include "platform/velaindex.h"
 #include "platform/vlibc.h"
+#include "posix/file_descriptor.h"
 #include "queue_run.h"
 #include "run_log.h"
 #include "storage/creation_queue.h"
-#include "thumb/descriptor.h"
+
+namespace vela {
 
 namespace {
 
@@ -78,9 +80,9 @@ bool LockForProcess(int descriptor, bool wait) {
 
 /// Takes the lock that one runner at a time has; the file may be removed while somebody waits.
 /// Returns no open descriptor, with errno set, when it cannot be had.
-Descriptor TakeRunnerLock(bool wait) {
+FileDescriptor TakeRunnerLock(bool wait) {
   for (;;) {
-    Descriptor lock(open(kLockFile, O_RDWR | O_CREAT | O_CLOEXEC | O_NOCTTY, 0644));
+    FileDescriptor lock(open(kLockFile, O_RDWR | O_CREAT | O_CLOEXEC | O_NOCTTY, 0644));
     if (!lock.IsOpen() || !LockForProcess(lock.Get(), wait)) {
       const int error = errno;
       lock.Close();
@@ -97,7 +99,7 @@ int RunAlone(RunSettings settings) {
   if (!CheckAdditions(settings.additions) || !AppendEntries(settings.additions)) {
     return kError;
   }
-  const Descriptor lock = TakeRunnerLock(settings.wait);
+  const FileDescriptor lock = TakeRunnerLock(settings.wait);
   if (lock.IsOpen()) {
     return ToExitStatus(RunQueue(settings));
   }
@@ -109,9 +111,7 @@ int RunAlone(RunSettings settings) {
   return kError;
 }
 
-}  // namespace
-
-int main(int argc, char** argv) {
+int RunMain(int argc, char** argv) {
   RunSettings settings;
   switch (ParseOptions(argc, argv, settings)) {
     case ParseOutcome::kDone:
@@ -127,4 +127,12 @@ int main(int argc, char** argv) {
     WriteLog(LogLevel::kError, error.what());
     return kError;
   }
+}
+
+}  // namespace
+
+}  // namespace vela
+
+int main(int argc, char** argv) {
+  return vela::RunMain(argc, argv);
 }

@@ -11,6 +11,8 @@
 
 #include "run_log.h"
 
+namespace vela {
+
 namespace {
 
 constexpr char kDescription[] =
@@ -88,3 +90,5 @@ ParseOutcome ParseOptions(int argc, char** argv, RunSettings& settings) {
              ? ParseOutcome::kRun
              : ParseOutcome::kWrong;
 }
+
+}  // namespace vela

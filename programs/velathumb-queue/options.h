@@ -3,6 +3,8 @@
 
 #include "queue_run.h"
 
+namespace vela {
+
 /// How the reading of the command line ended.
 enum class ParseOutcome {
   kRun,    ///< the settings are there
@@ -12,3 +14,5 @@ enum class ParseOutcome {
 
 /// Reads the command line into `settings`.
 ParseOutcome ParseOptions(int argc, char** argv, RunSettings& settings);
+
+}  // namespace vela

@@ -4,6 +4,8 @@
 #include "profiles/thumbnail_profile.h"
 #include "run_log.h"
 
+namespace vela {
+
 bool IsProfileUsable(const std::string& profileFile) {
   ThumbnailProfileList profiles;
   if (IsFileExist(profileFile.c_str()) != 0 &&
@@ -14,3 +16,5 @@ bool IsProfileUsable(const std::string& profileFile) {
   WriteLog(LogLevel::kError, "no profile, or none with a thumbnail to make: " + profileFile);
   return false;
 }
+
+}  // namespace vela

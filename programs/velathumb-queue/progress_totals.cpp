@@ -16,6 +16,8 @@
 #include "storage/fail_marker.h"
 #include "storage/velamk_thumb_status.h"
 
+namespace vela {
+
 struct ProgressTotals::Sums {
   int64_t photos = 0;  ///< that lack thumbnails
   int64_t thumbs = 0;  ///< that they lack
@@ -122,3 +124,5 @@ void ProgressTotals::Set(const std::vector<std::string>& entries, const StopQues
     SetTotal(THUMB_TYPE_VIDEO, "total", "completed", CountWaitingVideos());
   }
 }
+
+}  // namespace vela

@@ -9,6 +9,8 @@
 #include <utility>
 #include <vector>
 
+namespace vela {
+
 /// Sets the totals in the progress files. A file that cannot be written is told in the log.
 class ProgressTotals {
  public:
@@ -36,3 +38,5 @@ class ProgressTotals {
   const bool countVideos_;
   std::set<Place> counted_;  // directories of this run's earlier queues
 };
+
+}  // namespace vela

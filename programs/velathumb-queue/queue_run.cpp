@@ -22,6 +22,8 @@
 #include "run_log.h"
 #include "taken_queue.h"
 
+namespace vela {
+
 namespace {
 
 using std::chrono::milliseconds;
@@ -406,3 +408,5 @@ RunEnd QueueRun::Run() {
 RunEnd RunQueue(const RunSettings& settings) {
   return QueueRun(settings).Run();
 }
+
+}  // namespace vela

@@ -6,6 +6,8 @@
 
 #include "child_program.h"
 
+namespace vela {
+
 /// How the queue is worked off.
 struct RunSettings {
   ChildProgram program;
@@ -26,3 +28,5 @@ enum class RunEnd {
 
 /// Works the queue off until it is empty, or with `follow` until a signal comes.
 RunEnd RunQueue(const RunSettings& settings);
+
+}  // namespace vela

@@ -7,6 +7,8 @@
 #include <cstdlib>
 #include <cstring>
 
+namespace vela {
+
 namespace {
 
 const char* JournalPrefix(LogLevel level) {
@@ -57,3 +59,5 @@ void WriteLog(LogLevel level, const std::string& message) {
 std::string ErrnoText(int error) {
   return std::strerror(error);
 }
+
+}  // namespace vela

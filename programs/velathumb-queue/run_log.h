@@ -3,6 +3,8 @@
 
 #include <string>
 
+namespace vela {
+
 enum class LogLevel { kError, kWarning, kInfo };
 
 /// Writes a line to standard error, control characters escaped; under the system's journal with the
@@ -11,3 +13,5 @@ void WriteLog(LogLevel level, const std::string& message);
 
 /// Returns the text of an errno value.
 std::string ErrnoText(int error);
+
+}  // namespace vela

@@ -16,9 +16,11 @@
 #include "file_place.h"
 #include "platform/velaindex.h"
 #include "platform/vlibc.h"
+#include "posix/file_descriptor.h"
 #include "run_log.h"
 #include "storage/creation_queue.h"
-#include "thumb/descriptor.h"
+
+namespace vela {
 
 namespace {
 
@@ -54,7 +56,7 @@ std::string WithoutIdleParts(const std::string& path) {
 }
 
 bool IsHeld(const std::string& path) {
-  const Descriptor file(open(path.c_str(), O_RDONLY | O_NONBLOCK | kOpenFlags));
+  const FileDescriptor file(open(path.c_str(), O_RDONLY | O_NONBLOCK | kOpenFlags));
   return file.IsOpen() && Lock(file.Get()) == EWOULDBLOCK;
 }
 
@@ -65,7 +67,7 @@ std::string KeyOf(const std::string& entry) {
 }
 
 int AppendLine(const std::string& path, const std::string& text) {
-  const Descriptor file(open(path.c_str(), O_WRONLY | O_CREAT | O_APPEND | kOpenFlags, 0644));
+  const FileDescriptor file(open(path.c_str(), O_WRONLY | O_CREAT | O_APPEND | kOpenFlags, 0644));
   if (!file.IsOpen()) {
     return errno;
   }
@@ -101,7 +103,7 @@ int TakenQueue::LeaveEmptyQueue(time_t made) const {
 }
 
 int TakenQueue::MoveQueue() {
-  const Descriptor queue(open(paths_.queue.c_str(), O_RDONLY | O_NONBLOCK | kOpenFlags));
+  const FileDescriptor queue(open(paths_.queue.c_str(), O_RDONLY | O_NONBLOCK | kOpenFlags));
   if (!queue.IsOpen()) {
     return errno;
   }
@@ -208,7 +210,7 @@ int TakenQueue::PutBackLeft() {
 }
 
 int TakenQueue::Finish() {
-  const Descriptor taken(open(paths_.taken.c_str(), O_RDONLY | kOpenFlags));
+  const FileDescriptor taken(open(paths_.taken.c_str(), O_RDONLY | kOpenFlags));
   if (taken.IsOpen()) {
     const int busy = Lock(taken.Get());
     struct stat status = {};
@@ -224,3 +226,5 @@ int TakenQueue::Finish() {
   const int error = RemoveFile(paths_.taken);
   return error != 0 ? error : RemoveFile(paths_.journal);
 }
+
+}  // namespace vela

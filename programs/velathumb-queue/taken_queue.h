@@ -8,6 +8,8 @@
 #include <unordered_set>
 #include <vector>
 
+namespace vela {
+
 /// Where the queue is and what is kept beside it.
 struct QueuePaths {
   std::string queue;    ///< new entries are appended to it
@@ -64,3 +66,5 @@ class TakenQueue {
   std::vector<std::string> entries_;
   off_t readSize_ = 0;
 };
+
+}  // namespace vela

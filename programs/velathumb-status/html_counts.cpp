@@ -3,6 +3,8 @@
 #include <algorithm>
 #include <cmath>
 
+namespace vela {
+
 namespace {
 
 std::string Segment(const char* cssClass, int64_t part) {
@@ -69,3 +71,5 @@ std::string ShareBar(const ThumbShares& shares, const char* cssClass) {
          Segment("present", shares.present) + Segment("missing", shares.missing) +
          Segment("failed", shares.failed) + "</div>\n";
 }
+
+}  // namespace vela

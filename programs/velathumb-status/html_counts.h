@@ -6,6 +6,8 @@
 
 #include "status_report.h"
 
+namespace vela {
+
 /// The wanted thumbnails, each counted once.
 struct ThumbShares {
   int64_t present = 0;
@@ -31,3 +33,5 @@ std::string PercentText(int64_t part, int64_t total);
 /// Returns a bar of the shares for the page; empty when there are no thumbnails. `cssClass` is the
 /// class of its element.
 std::string ShareBar(const ThumbShares& shares, const char* cssClass);
+
+}  // namespace vela

@@ -12,6 +12,8 @@
 #include "smallest_thumb.h"
 #include "text_encoding.h"
 
+namespace vela {
+
 namespace {
 
 std::string DirectoryOf(const std::string& path) {
@@ -210,3 +212,5 @@ int HtmlPage::Finish() {
   });
   return Error();
 }
+
+}  // namespace vela

@@ -8,6 +8,8 @@
 #include "page_file.h"
 #include "status_report.h"
 
+namespace vela {
+
 /// Writes the page while the scan goes on; the file appears, whole, when the page is finished. It
 /// holds no more than one thumbnail in memory.
 class HtmlPage : public StatusSink {
@@ -43,3 +45,5 @@ class HtmlPage : public StatusSink {
   StatusTotals totals_;
   int64_t sections_ = 0;
 };
+
+}  // namespace vela

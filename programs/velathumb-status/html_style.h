@@ -1,6 +1,8 @@
 // How the HTML page looks.
 #pragma once
 
+namespace vela {
+
 /// The page's style sheet. It refers to nothing outside the page. Every state is told by words, and
 /// by a border or a pattern, beside its colour.
 inline constexpr const char* kHtmlStyle = R"css(
@@ -81,3 +83,5 @@ footer{padding-top:2rem;padding-bottom:2rem;color:var(--soft);font-size:.8rem}
 gap:.75rem}body>header,main,footer{padding-left:1.5rem;padding-right:1.5rem}}
 @media print{.show{display:none}.tile{content-visibility:visible;break-inside:avoid}}
 )css";
+
+}  // namespace vela

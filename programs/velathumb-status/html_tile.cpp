@@ -10,6 +10,8 @@
 #include "storage/thumb_size_class.h"
 #include "text_encoding.h"
 
+namespace vela {
+
 namespace {
 
 constexpr const char* kNoBreakSpace = "\u00a0";
@@ -151,3 +153,5 @@ std::string TimeElement(time_t time) {
   }
   return std::string("<time datetime=\"") + machine + "\">" + human + "</time>";
 }
+
+}  // namespace vela

@@ -6,8 +6,12 @@
 
 #include "status_report.h"
 
+namespace vela {
+
 /// Returns the tile of the photo as a list item. `thumb` is a JPEG that shows it, empty for none.
 std::string PhotoTile(const PhotoReport& photo, const std::string& thumb);
 
 /// Returns a point in time, seconds since the epoch, as a time element in local time.
 std::string TimeElement(time_t time);
+
+}  // namespace vela

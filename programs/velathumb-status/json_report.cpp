@@ -8,6 +8,8 @@
 #include "size_class_text.h"
 #include "text_encoding.h"
 
+namespace vela {
+
 namespace {
 
 /// Raised when a key changes its meaning or goes; new keys do not change it.
@@ -146,3 +148,5 @@ void JsonStatus::TakeTotals(const StatusTotals& totals) {
   PutCounts(object["queued"], totals.queued);
   report_.Member("totals", object);
 }
+
+}  // namespace vela

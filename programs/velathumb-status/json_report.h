@@ -8,6 +8,8 @@
 
 #include "status_report.h"
 
+namespace vela {
+
 /// Stores the byte string under `key`; one that is no valid UTF-8 with replacement characters, and
 /// exactly under the key with "_base64" behind it.
 void PutBytes(Json::Value& object, const std::string& key, const std::string& bytes);
@@ -60,3 +62,5 @@ class JsonStatus : public StatusSink {
   const bool listPhotos_;
   Json::Value photoList_;
 };
+
+}  // namespace vela

@@ -25,6 +25,8 @@
 #include "text_report.h"
 #include "video_check_fault.h"
 
+namespace vela {
+
 namespace {
 
 constexpr int kNothingToDo = 0;
@@ -192,9 +194,7 @@ int StatusRun::Run() {
   return hasWork_ ? kWorkOutstanding : kNothingToDo;
 }
 
-}  // namespace
-
-int main(int argc, char** argv) {
+int RunMain(int argc, char** argv) {
   Options options;
   switch (ParseOptions(argc, argv, options)) {
     case ParseOutcome::kDone:
@@ -211,4 +211,12 @@ int main(int argc, char** argv) {
     std::cerr << "velathumb-status: " << error.what() << '\n';
     return kError;
   }
+}
+
+}  // namespace
+
+}  // namespace vela
+
+int main(int argc, char** argv) {
+  return vela::RunMain(argc, argv);
 }

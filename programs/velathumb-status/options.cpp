@@ -5,6 +5,8 @@
 #include <cstring>
 #include <iostream>
 
+namespace vela {
+
 namespace {
 
 constexpr char kDescription[] =
@@ -96,3 +98,5 @@ ParseOutcome ParseOptions(int argc, char** argv, Options& options) {
   }
   return ParseOutcome::kWrong;
 }
+
+}  // namespace vela

@@ -4,6 +4,8 @@
 #include <string>
 #include <vector>
 
+namespace vela {
+
 /// What is asked for.
 struct Options {
   std::vector<std::string> directories;
@@ -27,3 +29,5 @@ enum class ParseOutcome {
 
 /// Reads the command line into `options`.
 ParseOutcome ParseOptions(int argc, char** argv, Options& options);
+
+}  // namespace vela

@@ -8,6 +8,8 @@
 #include <cerrno>
 #include <cstdio>
 
+namespace vela {
+
 namespace {
 
 constexpr mode_t kNewFileMode = 0666;
@@ -131,3 +133,5 @@ int PageFile::MoveTo(const std::string& path) {
   }
   return error_;
 }
+
+}  // namespace vela

@@ -4,6 +4,8 @@
 #include <string>
 #include <string_view>
 
+namespace vela {
+
 /// A new file, written from its beginning on through a buffer. The first failure is remembered and
 /// makes every later call do nothing.
 class PageFile {
@@ -44,3 +46,5 @@ class PageFile {
   std::string name_;    // empty for a file without one
   std::string buffer_;  // not written yet
 };
+
+}  // namespace vela

@@ -4,6 +4,8 @@
 #include <cstdint>
 #include <cstdio>
 
+namespace vela {
+
 namespace {
 
 constexpr int kShortestBar = 10;
@@ -70,3 +72,5 @@ std::string FormatProgressBar(const FollowedCount& followed, const ProgressRate&
   const int room = width - 1 - static_cast<int>(rest.size());
   return room < kShortestBar ? rest.substr(1) : FormatBar(count, room) + rest;
 }
+
+}  // namespace vela

@@ -3,6 +3,8 @@
 #include <algorithm>
 #include <cmath>
 
+namespace vela {
+
 namespace {
 
 constexpr std::chrono::seconds kWindow(30);
@@ -48,3 +50,5 @@ std::optional<std::chrono::seconds> ProgressRate::TimeLeft(int total) const {
   }
   return std::chrono::seconds(std::lround(std::ceil(seconds)));
 }
+
+}  // namespace vela

@@ -5,6 +5,8 @@
 #include <deque>
 #include <optional>
 
+namespace vela {
+
 /// The rate of a counter over the last half minute.
 class ProgressRate {
  public:
@@ -28,3 +30,5 @@ class ProgressRate {
 
   std::deque<Sample> samples_;
 };
+
+}  // namespace vela

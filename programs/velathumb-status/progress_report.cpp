@@ -10,6 +10,8 @@
 #include "progress/velamk_progress.h"
 #include "thumb/running_instances.h"
 
+namespace vela {
+
 namespace {
 
 bool IsOutstanding(const ProgressCount& count) {
@@ -106,3 +108,5 @@ Json::Value DescribeResume(const ResumeState& state) {
   object["wait_seconds"] = static_cast<Json::Int64>(state.waitSeconds);
   return object;
 }
+
+}  // namespace vela

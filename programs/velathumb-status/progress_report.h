@@ -9,6 +9,8 @@
 
 #include "progress/progress_summary.h"
 
+namespace vela {
+
 /// The counters and who is at work.
 struct ProgressState {
   ProgressSummary summary;
@@ -34,3 +36,5 @@ ResumeState ReadResumeState();
 
 void WriteResumeText(std::ostream& out, const ResumeState& state);
 Json::Value DescribeResume(const ResumeState& state);
+
+}  // namespace vela

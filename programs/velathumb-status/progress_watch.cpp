@@ -14,6 +14,8 @@
 #include "progress_rate.h"
 #include "progress_report.h"
 
+namespace vela {
+
 namespace {
 
 constexpr std::chrono::milliseconds kInterval(500);
@@ -103,3 +105,5 @@ bool WatchProgress(std::ostream& out, bool isTerminal, bool asJson) {
   view.End(state);
   return state.HasWork();
 }
+
+}  // namespace vela

@@ -10,6 +10,8 @@
 #include "storage/velamk_thumb_status.h"
 #include "text_encoding.h"
 
+namespace vela {
+
 namespace {
 
 struct QueueFile {
@@ -83,3 +85,5 @@ bool WriteQueueJson(JsonReport& report, const QueueQuestion& question,
   report.EndList();
   return all > 0;
 }
+
+}  // namespace vela

@@ -6,6 +6,8 @@
 #include "json_report.h"
 #include "status_scan.h"
 
+namespace vela {
+
 /// How a report of the queues is asked for.
 struct QueueQuestion {
   bool countVideoWork = false;  ///< with the removals that are part of it
@@ -18,3 +20,5 @@ bool WriteQueueText(std::ostream& out, const QueueQuestion& question,
 /// Writes the same as the member "queues".
 bool WriteQueueJson(JsonReport& report, const QueueQuestion& question,
                     const ScanErrorHandler& onError);
+
+}  // namespace vela

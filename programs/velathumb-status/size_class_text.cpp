@@ -4,6 +4,8 @@
 
 #include "storage/thumb_size_class.h"
 
+namespace vela {
+
 namespace {
 
 constexpr const char* kNames[kEAThumbCount] = {"S", "M", "B", "L", "XL", "SM"};
@@ -31,3 +33,5 @@ std::vector<std::string> SizeClassesInState(const PhotoReport& photo, ThumbState
 std::vector<std::string> FailedSizeClasses(const PhotoReport& photo) {
   return Select([&](size_t size) { return photo.failures[size].has_value(); });
 }
+
+}  // namespace vela

@@ -6,6 +6,8 @@
 
 #include "status_report.h"
 
+namespace vela {
+
 /// Returns the short name of a size class, such as "XL".
 const char* SizeClassName(const EAThumbInfo& row);
 
@@ -14,3 +16,5 @@ std::vector<std::string> SizeClassesInState(const PhotoReport& photo, ThumbState
 
 /// Returns the short names of the photo's size classes with a failure marker, smallest first.
 std::vector<std::string> FailedSizeClasses(const PhotoReport& photo);
+
+}  // namespace vela

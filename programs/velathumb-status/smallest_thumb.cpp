@@ -10,8 +10,10 @@
 #include <string_view>
 
 #include "platform/velaindex.h"
+#include "posix/file_descriptor.h"
 #include "storage/thumb_size_class.h"
-#include "thumb/descriptor.h"
+
+namespace vela {
 
 namespace {
 
@@ -46,7 +48,7 @@ std::string ReadBytes(int file, size_t size) {
 
 std::string ReadThumb(const char* path) {
   // A pipe put in a thumbnail's place must not stop the scan.
-  const Descriptor file(open(path, O_RDONLY | O_CLOEXEC | O_NONBLOCK | O_NOFOLLOW));
+  const FileDescriptor file(open(path, O_RDONLY | O_CLOEXEC | O_NONBLOCK | O_NOFOLLOW));
   struct stat status = {};
   if (!file.IsOpen() || fstat(file.Get(), &status) != 0 || !IsEmbeddable(status)) {
     return std::string();
@@ -72,3 +74,5 @@ std::string ReadSmallestThumb(const std::string& path) {
   }
   return std::string();
 }
+
+}  // namespace vela

@@ -4,6 +4,8 @@
 #include <cstddef>
 #include <string>
 
+namespace vela {
+
 /// Larger files are left out of a page, bytes.
 inline constexpr size_t kLargestEmbeddedThumb = 4 * 1024 * 1024;
 
@@ -11,3 +13,5 @@ inline constexpr size_t kLargestEmbeddedThumb = 4 * 1024 * 1024;
 /// name. One that is empty, cannot be read or is larger than kLargestEmbeddedThumb is passed over.
 /// Empty when no thumbnail is left.
 std::string ReadSmallestThumb(const std::string& path);
+
+}  // namespace vela

@@ -2,6 +2,8 @@
 
 #include <algorithm>
 
+namespace vela {
+
 std::string PhotoReport::Name() const {
   return path.substr(path.rfind('/') + 1);
 }
@@ -39,3 +41,5 @@ void StatusTotals::Add(const DirectoryReport& directory) {
     queued.Add(directory.counts);
   }
 }
+
+}  // namespace vela

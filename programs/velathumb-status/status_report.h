@@ -9,6 +9,8 @@
 
 #include "storage/photo_thumb_states.h"
 
+namespace vela {
+
 /// One photo.
 struct PhotoReport {
   std::string path;
@@ -69,3 +71,5 @@ class StatusSink {
   virtual void EndDirectory(const DirectoryReport& /*directory*/) {}
   virtual void TakeTotals(const StatusTotals& /*totals*/) {}
 };
+
+}  // namespace vela

@@ -19,6 +19,8 @@
 #include "storage/fail_marker.h"
 #include "storage/video_level.h"
 
+namespace vela {
+
 namespace {
 
 /// Tells whether the path depends on more than its components: on the working directory or on what
@@ -181,3 +183,5 @@ void ScanStatus(const std::vector<std::string>& directories, const ScanOptions& 
   }
   scan.End();
 }
+
+}  // namespace vela

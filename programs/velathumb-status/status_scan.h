@@ -7,6 +7,8 @@
 
 #include "status_report.h"
 
+namespace vela {
+
 /// What a scan is to look at.
 struct ScanOptions {
   bool recursive = false;    ///< also below the directories
@@ -20,3 +22,5 @@ using ScanErrorHandler = std::function<void(const std::string& path, const std::
 /// found to `sink`.
 void ScanStatus(const std::vector<std::string>& directories, const ScanOptions& options,
                 StatusSink& sink, const ScanErrorHandler& onError);
+
+}  // namespace vela

@@ -5,6 +5,8 @@
 #include <cstdio>
 #include <memory>
 
+namespace vela {
+
 namespace {
 
 struct GlibDeleter {
@@ -83,3 +85,5 @@ std::string ToPlainLine(std::string_view bytes) {
   }
   return line;
 }
+
+}  // namespace vela

@@ -4,6 +4,8 @@
 #include <string>
 #include <string_view>
 
+namespace vela {
+
 /// Returns the text as valid UTF-8: what is none becomes the replacement character.
 std::string ToUtf8(std::string_view bytes);
 
@@ -20,3 +22,5 @@ std::string ToBase64(std::string_view bytes);
 /// Returns the text for a line on a terminal or in a file: control characters and the backslash
 /// escaped, everything else as it is.
 std::string ToPlainLine(std::string_view bytes);
+
+}  // namespace vela

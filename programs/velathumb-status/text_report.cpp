@@ -7,6 +7,8 @@
 #include "size_class_text.h"
 #include "text_encoding.h"
 
+namespace vela {
+
 namespace {
 
 constexpr int kColumnWidth = 9;
@@ -77,3 +79,5 @@ void TextReport::TakeTotals(const StatusTotals& totals) {
   WriteCounts(out_, totals.all, std::to_string(totals.queuedDirectories));
   out_ << "in " << Plural(totals.directories, "directory", "directories") << '\n';
 }
+
+}  // namespace vela

@@ -6,6 +6,8 @@
 
 #include "status_report.h"
 
+namespace vela {
+
 /// Writes a line for each directory, with `listPhotos` lines for its incomplete photos below it,
 /// and the totals.
 class TextReport : public StatusSink {
@@ -24,3 +26,5 @@ class TextReport : public StatusSink {
   bool hasHeading_ = false;
   std::string photoLines_;
 };
+
+}  // namespace vela

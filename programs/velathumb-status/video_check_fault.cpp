@@ -6,6 +6,8 @@
 #include "platform/velaindex.h"
 #include "platform/vlibc.h"
 
+namespace vela {
+
 namespace {
 
 /// Asks about a file that is there and no video: what matters is whether anybody can tell.
@@ -24,3 +26,5 @@ std::string FindVideoCheckFault() {
   }
   return {};
 }
+
+}  // namespace vela

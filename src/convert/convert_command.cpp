@@ -7,7 +7,9 @@
 
 #include "platform/velaindex.h"
 #include "platform/velautils.h"
-#include "thumb/cut_text.h"
+#include "posix/cut_text.h"
+
+using vela::CutText;
 
 namespace {
 

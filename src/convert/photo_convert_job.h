@@ -6,11 +6,15 @@
 
 #include "convert/photo_thumb_setting.h"
 
+namespace vela {
+
 /// Path of the image converter.
 inline constexpr char kConvertToolPath[] = "/usr/vela/bin/convert-thumb";
 
+}  // namespace vela
+
 /// All thumbnails that one converter run makes; every setting names the same source photo.
 struct PhotoConvertJob {
-  std::string toolPath = kConvertToolPath;
+  std::string toolPath = vela::kConvertToolPath;
   std::vector<PhotoThumbSetting> settings;
 };

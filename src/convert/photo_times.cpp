@@ -1,5 +1,7 @@
 #include "convert/photo_times.h"
 
+namespace vela {
+
 namespace {
 
 constexpr int kSetAccessAndModification = 3;
@@ -11,3 +13,5 @@ void DateLikePhoto(const std::string& path, const VLIBCFileStatus& photo) {
   const VLIBCFileTimes times = {modified, modified, photo.change};
   VLIBCFileUTime(path.c_str(), kSetAccessAndModification, &times);
 }
+
+}  // namespace vela

@@ -14,7 +14,11 @@
 #include "platform/velaindex.h"
 #include "platform/velautils.h"
 #include "platform/vlibc.h"
-#include "thumb/cut_text.h"
+#include "posix/cut_text.h"
+
+using vela::CutText;
+using vela::DateLikePhoto;
+using vela::kPhotoStatusOptions;
 
 namespace {
 

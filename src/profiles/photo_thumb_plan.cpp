@@ -8,6 +8,8 @@
 #include "storage/fail_marker.h"
 #include "thumb/file_helpers.h"
 
+using vela::FailMarkerPath;
+
 namespace {
 
 bool StatFile(const std::string& path, struct stat& out) {
@@ -58,7 +60,7 @@ int CreatePhotoThumbs(const DirectoryJob& dirJob, int phaseIndex, const std::str
   }
   const int result = RunPhotoConvertJob(job);
   if (result == -1) {
-    CreatePhaseFailMarkers(dirJob, phaseIndex, eaDir);
+    vela::CreatePhaseFailMarkers(dirJob, phaseIndex, eaDir);
   }
   return result;
 }
@@ -122,6 +124,8 @@ void CreateThumbFailMarker(const ThumbnailProfile& profile, const std::string& e
   }
 }
 
+namespace vela {
+
 int CreatePhaseFailMarkers(const DirectoryJob& dirJob, int phaseIndex, const std::string& eaDir) {
   const int count = GetProfileCount(dirJob.profiles, phaseIndex);
   for (int i = 0; i < count; ++i) {
@@ -129,3 +133,5 @@ int CreatePhaseFailMarkers(const DirectoryJob& dirJob, int phaseIndex, const std
   }
   return count;
 }
+
+}  // namespace vela

@@ -7,8 +7,8 @@
 #include <string>
 
 #include "convert/photo_convert_job.h"
+#include "profiles/directory_job.h"
 #include "profiles/thumbnail_profile.h"
-#include "thumb/directory_job.h"
 
 /// Makes the missing thumbnails of one phase of the photo `srcPath` in its metadata directory
 /// `eaDir`; `rotate` is in degrees clockwise. Returns 0 when nothing had to be made or all was, -1
@@ -41,5 +41,9 @@ void RemoveThumbAndFailMarker(const ThumbnailProfile& profile, const std::string
 /// Replaces the profile's thumbnail by an empty failure marker; errors are ignored.
 void CreateThumbFailMarker(const ThumbnailProfile& profile, const std::string& eaDir);
 
+namespace vela {
+
 /// Runs CreateThumbFailMarker for every profile of the phase. Returns their number.
 int CreatePhaseFailMarkers(const DirectoryJob& dirJob, int phaseIndex, const std::string& eaDir);
+
+}  // namespace vela

@@ -44,8 +44,12 @@ struct ThumbnailProfileList {
   std::vector<const ThumbnailProfile*> phase2;
 };
 
-/// Phase index that stands for all profiles.
+namespace vela {
+
+/// Phase index that means all profiles.
 inline constexpr int kAllPhases = -1;
+
+}  // namespace vela
 
 /// Reads the profile file into the empty `list`, keeping the profiles whose size class the index
 /// library wants for `dirPath`. Returns 1 (also when none was kept), or 0 when the file cannot be

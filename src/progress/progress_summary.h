@@ -4,6 +4,8 @@
 #include <string>
 #include <vector>
 
+namespace vela {
+
 /// Returns the path of the progress file of a media kind (a THUMB_TYPE), null for an unknown one.
 const char* ConvProgressFile(int kind);
 
@@ -31,3 +33,5 @@ ProgressSummary ReadProgressSummary();
 
 /// Returns the summary as lines of text, a heading first.
 std::vector<std::string> FormatProgressSummary(const ProgressSummary& summary);
+
+}  // namespace vela

@@ -36,38 +36,15 @@ int ReadCounter(const char* file, const char* key) {
   return ClampToInt(std::strtol(text, nullptr, 10));
 }
 
-ProgressCount ReadCount(int kind, const char* totalKey, const char* completedKey) {
-  const int total = GetConvProgress(kind, totalKey);
-  return {total, GetConvProgress(kind, completedKey)};
-}
-
-std::string FormatCount(const char* kind, const ProgressCount& count) {
-  char line[128] = "";
-  std::snprintf(line, sizeof line, "total_%s: %d, complete_%s: %d, progress: %.2f", kind,
-                count.total, kind, count.completed, double{count.Ratio()});
-  return line;
-}
-
 }  // namespace
 
-const char* ConvProgressFile(int kind) {
-  switch (kind) {
-    case THUMB_TYPE_PHOTO:
-      return "/var/spool/conv_progress_photo";
-    case THUMB_TYPE_VIDEO:
-      return "/var/spool/conv_progress_video";
-    default:
-      return nullptr;
-  }
-}
-
 int GetConvProgress(int kind, const char* key) {
-  const char* file = ConvProgressFile(kind);
+  const char* file = vela::ConvProgressFile(kind);
   return file == nullptr || key == nullptr ? 0 : ReadCounter(file, key);
 }
 
 void AddConvProgress(int kind, const char* key, int delta) {
-  const char* file = ConvProgressFile(kind);
+  const char* file = vela::ConvProgressFile(kind);
   if (file == nullptr || key == nullptr) {
     return;
   }
@@ -78,20 +55,9 @@ void AddConvProgress(int kind, const char* key, int delta) {
   }
 }
 
-ProgressSummary ReadProgressSummary() {
-  const ProgressCount photo = ReadCount(THUMB_TYPE_PHOTO, "total", "completed");
-  const ProgressCount thumb = ReadCount(THUMB_TYPE_PHOTO, "total_thumb", "completed_thumb");
-  return {photo, thumb, ReadCount(THUMB_TYPE_VIDEO, "total", "completed")};
-}
-
-std::vector<std::string> FormatProgressSummary(const ProgressSummary& summary) {
-  return {"========== Convert Progress ==========", FormatCount("photo", summary.photo),
-          FormatCount("thumb", summary.thumb), FormatCount("video", summary.video)};
-}
-
 void LogConvProgress() {
   int line = 144;
-  for (const std::string& text : FormatProgressSummary(ReadProgressSummary())) {
+  for (const std::string& text : vela::FormatProgressSummary(vela::ReadProgressSummary())) {
     syslog(LOG_ERR, "%s:%d %s", kLogSource, line, text.c_str());
     ++line;
   }

@@ -12,6 +12,10 @@
 #include "source/tool_output.h"
 #include "thumb/log_source.h"
 
+using vela::kLogSource;
+using vela::SplitTagLine;
+using vela::ToolOutput;
+
 namespace {
 
 constexpr char kExiftoolPath[] = "/usr/vela/bin/exiftool";

@@ -20,6 +20,12 @@
 #include "source/tool_output.h"
 #include "thumb/log_source.h"
 
+using vela::kAllPhases;
+using vela::kConvertToolPath;
+using vela::kLogSource;
+using vela::SplitTagLine;
+using vela::ToolOutput;
+
 namespace {
 
 constexpr char kDcrawPath[] = "/usr/bin/dcraw";

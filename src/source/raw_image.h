@@ -4,7 +4,7 @@
 #include <cstdint>
 #include <string>
 
-#include "thumb/directory_job.h"
+#include "profiles/directory_job.h"
 
 /// Reads the pixel size of the photo `path`, raw or not. Returns 1, or 0 (sizes untouched).
 int GetImageResolution(const std::string& path, uint32_t& width, uint32_t& height);

@@ -7,12 +7,18 @@
 
 #include "platform/velaindex.h"
 #include "platform/vlibc.h"
+#include "posix/glob_matches.h"
 #include "profiles/photo_thumb_plan.h"
 #include "profiles/thumbnail_profile.h"
 #include "source/raw_image.h"
 #include "source/tool_output.h"
 #include "thumb/file_helpers.h"
 #include "thumb/log_source.h"
+
+using vela::EscapePattern;
+using vela::kAllPhases;
+using vela::kLogSource;
+using vela::ToolOutput;
 
 namespace {
 

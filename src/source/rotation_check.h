@@ -3,7 +3,7 @@
 
 #include <string>
 
-#include "thumb/directory_job.h"
+#include "profiles/directory_job.h"
 
 /// Finds the turn (0, 90, 180 or 270 degrees clockwise) at which thumbnails made from `photoPath`
 /// match those that exist in its metadata directory `thumbDir`; 0 when that cannot be told. Leaves

@@ -3,6 +3,8 @@
 #include "platform/velaindex.h"
 #include "platform/vlibc.h"
 
+namespace vela {
+
 ToolOutput::~ToolOutput() {
   if (IsOpen()) {
     VLIBCPclose(stream_);
@@ -30,3 +32,5 @@ std::optional<TagLine> SplitTagLine(const std::string& line) {
   StringTrim(value.data());
   return TagLine{line.substr(0, colon), value.c_str()};
 }
+
+}  // namespace vela

@@ -5,6 +5,8 @@
 #include <optional>
 #include <string>
 
+namespace vela {
+
 /// Owns the stream of a tool started with VLIBCPopen; closing it waits for the tool.
 class ToolOutput {
  public:
@@ -35,3 +37,5 @@ struct TagLine {
 
 /// Splits a line at its first colon; nothing when there is none, or nothing behind it.
 std::optional<TagLine> SplitTagLine(const std::string& line);
+
+}  // namespace vela

@@ -11,7 +11,9 @@
 #include <memory>
 
 #include "platform/vlibc.h"
-#include "thumb/cut_text.h"
+#include "posix/cut_text.h"
+
+namespace vela {
 
 namespace {
 
@@ -104,3 +106,5 @@ QueueRead ForEachQueueEntry(const char* queueFile,
   }
   return lines.HasFailed() ? QueueRead::kBrokenOff : QueueRead::kWhole;
 }
+
+}  // namespace vela

@@ -4,6 +4,8 @@
 #include <functional>
 #include <string>
 
+namespace vela {
+
 /// A queue: the file that is written to, and the one that is being worked off.
 struct CreationQueue {
   const char* file;
@@ -40,3 +42,5 @@ enum class QueueRead {
 /// or more (newline included) are passed over.
 QueueRead ForEachQueueEntry(const char* queueFile,
                             const std::function<void(const std::string&)>& visit);
+
+}  // namespace vela

@@ -1,8 +1,14 @@
 #include "storage/directory_entries.h"
 
 #include "platform/velaindex.h"
+#include "posix/cut_text.h"
 #include "storage/velamk_thumb_status.h"
-#include "thumb/cut_text.h"
+
+using vela::CutText;
+using vela::DirectoryEntries;
+using vela::kPathBufferSize;
+
+namespace vela {
 
 std::string DirectoryEntryPath(const char* dir, const char* name) {
   std::string path = dir;
@@ -10,6 +16,8 @@ std::string DirectoryEntryPath(const char* dir, const char* name) {
   path += name;
   return path.size() < kPathBufferSize ? path : CutText(path);
 }
+
+}  // namespace vela
 
 int CountDirEntries(const char* path) {
   if (IsDirExist(path) == 0) {

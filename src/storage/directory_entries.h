@@ -6,6 +6,8 @@
 #include <memory>
 #include <string>
 
+namespace vela {
+
 /// An open directory, closed with the object.
 class DirectoryEntries {
  public:
@@ -30,3 +32,5 @@ class DirectoryEntries {
 
 /// Returns the path of the entry `name` of the directory `dir`, cut to what a path buffer holds.
 std::string DirectoryEntryPath(const char* dir, const char* name);
+
+}  // namespace vela

@@ -7,6 +7,12 @@
 #include "storage/status_log_source.h"
 #include "storage/velamk_thumb_status.h"
 
+using vela::DirectoryEntries;
+using vela::DirectoryEntryPath;
+using vela::kStatusLogSource;
+using vela::PhotoThumbStates;
+using vela::ReadPhotoThumbStates;
+
 namespace {
 
 /// Returns the size map of all photos of the directory, -1 to ask for each photo's own.
@@ -16,6 +22,8 @@ int32_t DirectorySizeMap(const char* dir) {
 }
 
 }  // namespace
+
+namespace vela {
 
 bool ForEachPhotoStatus(const char* dir, const PhotoStatusVisitor& visit) {
   if (IsDirExist(dir) == 0) {
@@ -39,10 +47,12 @@ bool ForEachPhotoStatus(const char* dir, const PhotoStatusVisitor& visit) {
   return true;
 }
 
+}  // namespace vela
+
 void GetDirThumbStatus(const char* dir, int* photosOut, int* thumbsOut) {
   *photosOut = 0;
   *thumbsOut = 0;
-  ForEachPhotoStatus(dir, [&](const std::string&, const PhotoThumbStates& photo) {
+  vela::ForEachPhotoStatus(dir, [&](const std::string&, const PhotoThumbStates& photo) {
     const int missing = photo.Missing();
     *photosOut += missing >= 1 ? 1 : 0;
     *thumbsOut += missing;

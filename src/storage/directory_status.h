@@ -6,6 +6,8 @@
 
 #include "storage/photo_thumb_states.h"
 
+namespace vela {
+
 /// Takes the path of a photo and the states of its thumbnails.
 using PhotoStatusVisitor = std::function<void(const std::string&, const PhotoThumbStates&)>;
 
@@ -13,3 +15,5 @@ using PhotoStatusVisitor = std::function<void(const std::string&, const PhotoThu
 /// which the system lists them. Returns false when `dir` is no directory or cannot be opened; the
 /// latter is logged.
 bool ForEachPhotoStatus(const char* dir, const PhotoStatusVisitor& visit);
+
+}  // namespace vela

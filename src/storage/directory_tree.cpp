@@ -6,6 +6,8 @@
 
 #include "platform/velaindex.h"
 
+namespace vela {
+
 namespace {
 
 constexpr int kWalkDescriptors = 100;
@@ -45,3 +47,5 @@ int ForEachIndexedDirectory(const char* root, const DirectoryVisitor& visit) {
   }
   return result;
 }
+
+}  // namespace vela

@@ -3,6 +3,8 @@
 
 #include <functional>
 
+namespace vela {
+
 /// Takes the path of a directory, and false when it cannot be opened.
 using DirectoryVisitor = std::function<void(const char* path, bool isReadable)>;
 
@@ -11,3 +13,5 @@ using DirectoryVisitor = std::function<void(const char* path, bool isReadable)>;
 /// directory is visited once. Returns 0, or -1 (errno tells why) when the walk came to an early
 /// end. One walk at a time in a thread.
 int ForEachIndexedDirectory(const char* root, const DirectoryVisitor& visit);
+
+}  // namespace vela

@@ -3,7 +3,9 @@
 #include <sys/stat.h>
 
 #include "platform/velaindex.h"
-#include "thumb/cut_text.h"
+#include "posix/cut_text.h"
+
+namespace vela {
 
 std::string FailMarkerPath(const std::string& thumbPath) {
   const std::size_t dot = thumbPath.rfind('.');
@@ -21,3 +23,5 @@ std::optional<time_t> FindFailMarker(const char* path, const EAThumbInfo& row) {
   }
   return status.st_mtime;
 }
+
+}  // namespace vela

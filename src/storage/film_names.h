@@ -1,6 +1,8 @@
 // The films converted from a video: their file names in its metadata directory.
 #pragma once
 
+namespace vela {
+
 /// A film's file names.
 struct FilmName {
   const char* name;     ///< the one that is written
@@ -23,3 +25,5 @@ inline constexpr FilmName kFlashFilm = {"VELAPHOTO_FILM.flv", "VELAPHOTO:FILM.fl
 /// The films that are made in the orientation of their video, in the order in which they are looked
 /// for.
 inline constexpr FilmName kOrientedFilms[] = {kHighFilm, kMediumFilm, kLowFilm, kMobileFilm};
+
+}  // namespace vela

@@ -5,10 +5,15 @@
 #include <iterator>
 
 #include "platform/velaindex.h"
+#include "posix/cut_text.h"
 #include "storage/film_names.h"
 #include "storage/log_source.h"
 #include "storage/velamk_util.h"
-#include "thumb/cut_text.h"
+
+using vela::FilmName;
+using vela::kMetadataLogSource;
+using vela::kOrientedFilms;
+using vela::kPathBufferSize;
 
 int IsVideoRotated(const char* path) {
   _VIDEO_METADATA_ metadata = {};

@@ -5,6 +5,8 @@
 #include "storage/log_source.h"
 #include "storage/velamk_util.h"
 
+using vela::kMetadataLogSource;
+
 int IsMediaPortraitInDB(const char* path) {
   VELA_MEDIA_INFO media = {};
   if (GetMediaFromPluginDB(THUMB_TYPE_PHOTO, path, media) < 0) {

@@ -4,8 +4,10 @@
 
 #include "platform/velaindex.h"
 #include "platform/vlibc.h"
+#include "posix/cut_text.h"
 #include "storage/log_source.h"
-#include "thumb/cut_text.h"
+
+namespace vela {
 
 bool FindMetadataDir(const char* path, int line, std::string& out) {
   char buffer[kPathBufferSize] = "";
@@ -17,3 +19,5 @@ bool FindMetadataDir(const char* path, int line, std::string& out) {
   out = buffer;
   return true;
 }
+
+}  // namespace vela

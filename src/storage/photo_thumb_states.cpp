@@ -7,10 +7,12 @@
 #include <string>
 
 #include "platform/velaindex.h"
+#include "posix/cut_text.h"
 #include "storage/status_log_source.h"
 #include "storage/thumb_age.h"
 #include "storage/velamk_thumb_status.h"
-#include "thumb/cut_text.h"
+
+namespace vela {
 
 namespace {
 
@@ -106,8 +108,10 @@ PhotoThumbStates ReadPhotoThumbStates(const char* path, int32_t sizeMap) {
   return photo;
 }
 
+}  // namespace vela
+
 void GetThumbStatus(const char* path, int* missingOut, int* presentOut, int32_t sizeMap) {
-  const PhotoThumbStates photo = ReadPhotoThumbStates(path, sizeMap);
+  const vela::PhotoThumbStates photo = vela::ReadPhotoThumbStates(path, sizeMap);
   *missingOut = photo.Missing();
   *presentOut = photo.Present();
 }

@@ -7,6 +7,8 @@
 
 #include "storage/thumb_size_class.h"
 
+namespace vela {
+
 enum class ThumbState {
   kNotWanted,  ///< the size map does not ask for it, or the photo could not be looked up
   kPresent,
@@ -40,3 +42,5 @@ struct PhotoThumbStates {
 /// Looks at the thumbnails of the photo `path` that `sizeMap` asks for (-1: ask the index library).
 /// A photo that cannot be looked up is logged.
 PhotoThumbStates ReadPhotoThumbStates(const char* path, int32_t sizeMap);
+
+}  // namespace vela

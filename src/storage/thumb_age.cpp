@@ -2,10 +2,16 @@
 
 #include <syslog.h>
 
+#include "posix/cut_text.h"
 #include "storage/log_source.h"
 #include "storage/metadata_dir.h"
 #include "storage/velamk_util.h"
-#include "thumb/cut_text.h"
+
+using vela::CutText;
+using vela::FindMetadataDir;
+using vela::kMetadataLogSource;
+
+namespace vela {
 
 std::string DerivedFilePath(const std::string& eaDir, const char* name) {
   return CutText(eaDir + "/" + name);
@@ -28,11 +34,13 @@ bool IsDerivedFileOutdated(const struct stat& source, const std::string& derived
   return stat(derivedPath.c_str(), &derived) != 0 || IsDerivedFileOutdated(source, derived);
 }
 
+}  // namespace vela
+
 int IsEAThumbOutdated(const char* path, const char* name) {
   struct stat source = {};
   std::string eaDir;
-  if (!StatMediaFile(path, source) || !FindMetadataDir(path, 69, eaDir)) {
+  if (!vela::StatMediaFile(path, source) || !FindMetadataDir(path, 69, eaDir)) {
     return 0;
   }
-  return IsDerivedFileOutdated(source, DerivedFilePath(eaDir, name)) ? 1 : 0;
+  return vela::IsDerivedFileOutdated(source, vela::DerivedFilePath(eaDir, name)) ? 1 : 0;
 }

@@ -5,6 +5,8 @@
 
 #include <string>
 
+namespace vela {
+
 /// Returns the path of the derived file `name` in the metadata directory `eaDir`, cut to what a
 /// path buffer holds.
 std::string DerivedFilePath(const std::string& eaDir, const char* name);
@@ -18,3 +20,5 @@ bool IsDerivedFileOutdated(const struct stat& source, const struct stat& derived
 
 /// Returns true when the derived file is missing, empty, or older (whole seconds) than `source`.
 bool IsDerivedFileOutdated(const struct stat& source, const std::string& derivedPath);
+
+}  // namespace vela

@@ -9,6 +9,10 @@
 #include "storage/metadata_dir.h"
 #include "storage/thumb_age.h"
 
+using vela::DerivedFilePath;
+using vela::FindMetadataDir;
+using vela::kMetadataLogSource;
+
 namespace {
 
 /// Tells whether the existing thumbnail `name` can stay.

@@ -6,6 +6,10 @@
 
 #include "storage/log_source.h"
 
+using vela::kEAThumbCount;
+using vela::kMetadataLogSource;
+using vela::kThumbSizesSmallestFirst;
+
 constexpr EAThumbInfo rgEAThumbInfo[kEAThumbCount] = {
     {EA_THUMB_SIZE_S, "120x120", "VELAPHOTO_THUMB_S.jpg", "VELAPHOTO:THUMB_S.jpg"},
     {EA_THUMB_SIZE_M, "320x320", "VELAPHOTO_THUMB_M.jpg", "VELAPHOTO:THUMB_M.jpg"},

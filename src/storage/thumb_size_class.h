@@ -21,16 +21,24 @@ struct EAThumbInfo {
   const char* oldName;     ///< its older form, with a colon
 };
 
+namespace vela {
+
 /// Number of size classes.
 inline constexpr int kEAThumbCount = 6;
 
+}  // namespace vela
+
 /// The size classes by value.
-extern const EAThumbInfo rgEAThumbInfo[kEAThumbCount];
+extern const EAThumbInfo rgEAThumbInfo[vela::kEAThumbCount];
+
+namespace vela {
 
 /// The size classes from the smallest to the largest; their values are in another order.
 inline constexpr EA_THUMB_SIZE kThumbSizesSmallestFirst[kEAThumbCount] = {
     EA_THUMB_SIZE_S, EA_THUMB_SIZE_SM, EA_THUMB_SIZE_M,
     EA_THUMB_SIZE_B, EA_THUMB_SIZE_L,  EA_THUMB_SIZE_XL};
+
+}  // namespace vela
 
 /// Stores a pointer to rgEAThumbInfo in `out` and returns its row count, 6.
 int GetEAThumbInfoTable(const EAThumbInfo** out);

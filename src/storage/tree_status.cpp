@@ -5,6 +5,9 @@
 #include "storage/creation_queue.h"
 #include "storage/velamk_thumb_status.h"
 
+using vela::IsQueued;
+using vela::kPhotoQueue;
+
 namespace {
 
 constexpr int kWalkDescriptors = 100;

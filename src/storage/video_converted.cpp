@@ -12,6 +12,19 @@
 #include "storage/metadata_dir.h"
 #include "storage/velamk_util.h"
 
+using vela::FilmName;
+using vela::FindMetadataDir;
+using vela::kConvertedMpeg4Film;
+using vela::kFlashFilm;
+using vela::kH264Film;
+using vela::kHighFilm;
+using vela::kIphoneFilm;
+using vela::kLowFilm;
+using vela::kMediumFilm;
+using vela::kMetadataLogSource;
+using vela::kMobileFilm;
+using vela::kMpeg4Film;
+
 namespace {
 
 constexpr int64_t kSmallestFilm = 2;

@@ -4,6 +4,8 @@
 #include <functional>
 #include <string>
 
+namespace vela {
+
 /// Takes the path of a subdirectory, at its place in the order of listing.
 using SubdirectoryVisitor = std::function<void(const std::string& path)>;
 
@@ -11,3 +13,5 @@ using SubdirectoryVisitor = std::function<void(const std::string& path)>;
 /// stores in `work` how many need work and count. Returns false, logged, when `dir` does not exist
 /// or cannot be opened.
 bool ReadVideoLevel(const char* dir, const SubdirectoryVisitor& onSubdirectory, int& work);
+
+}  // namespace vela

@@ -15,6 +15,16 @@
 #include "storage/velamk_util.h"
 #include "storage/video_level.h"
 
+using vela::DirectoryEntries;
+using vela::DirectoryEntryPath;
+using vela::ForEachQueueEntry;
+using vela::HasQueueLine;
+using vela::IsQueued;
+using vela::IsTreeEntry;
+using vela::kStatusLogSource;
+using vela::kVideoQueue;
+using vela::QueueRead;
+
 namespace {
 
 /// Longer paths leave no room for the names of derived files behind them.
@@ -77,7 +87,7 @@ int VideoTree::CountWork(const char* dir) {
   way_.push_back(place);
   int below = 0;
   int work = 0;
-  ReadVideoLevel(
+  vela::ReadVideoLevel(
       dir, [&](const std::string& subdirectory) { below += CountWork(subdirectory.c_str()); },
       work);
   way_.pop_back();
@@ -119,6 +129,8 @@ int IsVideoWorkNeeded(const char* path) {
   return VELAIDX_IsVideoNeedConvert(path) == 1 && IsVideoConverted(path) == 0 ? 1 : 0;
 }
 
+namespace vela {
+
 bool ReadVideoLevel(const char* dir, const SubdirectoryVisitor& onSubdirectory, int& work) {
   work = 0;
   std::vector<std::string> names;
@@ -138,6 +150,8 @@ bool ReadVideoLevel(const char* dir, const SubdirectoryVisitor& onSubdirectory, 
   }
   return true;
 }
+
+}  // namespace vela
 
 int CountVideoWork(const char* dir) {
   return VideoTree().CountWork(dir);

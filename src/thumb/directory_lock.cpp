@@ -7,6 +7,8 @@
 
 #include "thumb/log_source.h"
 
+namespace vela {
+
 DirectoryLock::DirectoryLock(const std::string& path) {
   // Whatever else bears the name, a pipe for one, must not make the open wait.
   const int descriptor = open(path.c_str(), O_RDONLY | O_NONBLOCK | O_CLOEXEC);
@@ -28,3 +30,5 @@ DirectoryLock::~DirectoryLock() {
     close(descriptor_);
   }
 }
+
+}  // namespace vela

@@ -3,6 +3,8 @@
 
 #include <string>
 
+namespace vela {
+
 /// Holds the exclusive lock on one metadata root until it is destroyed.
 class DirectoryLock {
  public:
@@ -17,3 +19,5 @@ class DirectoryLock {
  private:
   int descriptor_ = -1;
 };
+
+}  // namespace vela

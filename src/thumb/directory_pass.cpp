@@ -15,6 +15,13 @@
 #include "thumb/log_source.h"
 #include "thumb/photo_pass.h"
 
+using vela::DirectoryEntries;
+using vela::DirectoryLock;
+using vela::kLogSource;
+using vela::kPhotoQueue;
+using vela::PhotoEnd;
+using vela::PhotoPass;
+
 namespace {
 
 bool IsPhotoName(const char* name) {

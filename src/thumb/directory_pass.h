@@ -4,7 +4,7 @@
 #include <string>
 #include <vector>
 
-#include "thumb/directory_job.h"
+#include "profiles/directory_job.h"
 
 /// Makes the missing thumbnails of the directory's photos, one photo after the other, unless
 /// another instance is at work there. Failures are logged and never stop the pass; only a volume

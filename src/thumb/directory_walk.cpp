@@ -47,7 +47,11 @@ int RecursiveDirCallback(const char* path, const struct stat* /*status*/, int ty
   return FTW_CONTINUE;
 }
 
+namespace vela {
+
 void RunDirectoryTree(const std::string& dirPath, const std::string& profileFilePath) {
   g_profile_path = profileFilePath;
   nftw(dirPath.c_str(), RecursiveDirCallback, kWalkDescriptors, FTW_ACTIONRETVAL | FTW_MOUNT);
 }
+
+}  // namespace vela

@@ -11,10 +11,14 @@
 /// profile file that cannot be loaded is told on standard error.
 void RunDirectoryJob(const std::string& dirPath, const std::string& profileFilePath);
 
+/// The step of the walk; returns the walk's action code.
+int RecursiveDirCallback(const char* path, const struct stat* status, int typeFlag,
+                         struct FTW* walk);
+
+namespace vela {
+
 /// Runs RunDirectoryJob on `dirPath` and every directory below it on the same file system whose
 /// name is to be indexed, a directory before its subdirectories.
 void RunDirectoryTree(const std::string& dirPath, const std::string& profileFilePath);
 
-/// The step of the walk; returns the walk's action code.
-int RecursiveDirCallback(const char* path, const struct stat* status, int typeFlag,
-                         struct FTW* walk);
+}  // namespace vela

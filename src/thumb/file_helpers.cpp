@@ -7,8 +7,11 @@
 #include <cerrno>
 #include <string_view>
 
-#include "thumb/glob_matches.h"
+#include "posix/glob_matches.h"
 #include "thumb/log_source.h"
+
+using vela::GlobMatches;
+using vela::kLogSource;
 
 int checkCreateDir(const std::string& path) {
   struct stat status = {};
@@ -33,17 +36,4 @@ int RemoveFilesByPattern(const std::string& pattern) {
     }
   }
   return result;
-}
-
-std::string EscapePattern(const std::string& path) {
-  constexpr std::string_view kSpecial = "*?[\\";
-  std::string escaped;
-  escaped.reserve(path.size());
-  for (const char c : path) {
-    if (kSpecial.find(c) != std::string_view::npos) {
-      escaped += '\\';
-    }
-    escaped += c;
-  }
-  return escaped;
 }

@@ -11,6 +11,3 @@ int checkCreateDir(const std::string& path);
 /// Removes every file that matches the shell pattern. Returns 0 when all matches were removed or
 /// nothing matched, -1 when a removal failed; the others are still removed.
 int RemoveFilesByPattern(const std::string& pattern);
-
-/// Returns a pattern that matches exactly `path`, whatever characters it holds.
-std::string EscapePattern(const std::string& path);

@@ -9,6 +9,8 @@
 #include "source/raw_image.h"
 #include "thumb/log_source.h"
 
+using vela::kLogSource;
+
 namespace {
 
 /// Fills path and pixel size of an image. Returns false when the size cannot be read, which is

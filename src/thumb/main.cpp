@@ -10,8 +10,11 @@
 #include <cstring>
 #include <string>
 
-#include "thumb/cut_text.h"
+#include "posix/cut_text.h"
 #include "thumb/velathumb.h"
+
+using vela::CutText;
+using vela::RunDirectoryTree;
 
 namespace {
 

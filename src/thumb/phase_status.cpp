@@ -5,6 +5,9 @@
 #include "profiles/photo_thumb_plan.h"
 #include "profiles/thumbnail_profile.h"
 
+using vela::CreatePhaseFailMarkers;
+using vela::kAllPhases;
+
 namespace {
 
 /// An image file of a single byte is none.

@@ -3,7 +3,7 @@
 
 #include <string>
 
-#include "thumb/directory_job.h"
+#include "profiles/directory_job.h"
 
 /// Returns true when some thumbnail of the phase exists and is older (whole seconds) than the
 /// photo.

@@ -7,6 +7,7 @@
 #include "convert/photo_times.h"
 #include "ipc/velamk_ipc.h"
 #include "platform/velaindex.h"
+#include "posix/glob_matches.h"
 #include "profiles/photo_thumb_plan.h"
 #include "profiles/thumbnail_profile.h"
 #include "progress/velamk_progress.h"
@@ -17,6 +18,8 @@
 #include "thumb/index_registration.h"
 #include "thumb/log_source.h"
 #include "thumb/phase_status.h"
+
+namespace vela {
 
 namespace {
 
@@ -193,3 +196,5 @@ PhotoEnd PhotoPass::Report() const {
   PostPhotoConvert(photo_.c_str());
   return PhotoEnd::kNextPhoto;
 }
+
+}  // namespace vela

@@ -5,7 +5,9 @@
 #include <string>
 
 #include "platform/vlibc.h"
-#include "thumb/directory_job.h"
+#include "profiles/directory_job.h"
+
+namespace vela {
 
 /// How a photo ended.
 enum class PhotoEnd {
@@ -55,3 +57,5 @@ class PhotoPass {
   bool autoOrient_ = false;  ///< the converter turns the photo upright
   int rotation_ = 0;         ///< degrees clockwise
 };
+
+}  // namespace vela

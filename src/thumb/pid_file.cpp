@@ -4,7 +4,9 @@
 #include <cstring>
 #include <string>
 
-#include "thumb/cut_text.h"
+#include "posix/cut_text.h"
+
+namespace vela {
 
 long PidOfFile(const char* path) {
   std::string copy = CutText(path, kPidPathBufferSize);
@@ -13,3 +15,5 @@ long PidOfFile(const char* path) {
   const char* number = strtok_r(nullptr, ".", &rest);
   return number == nullptr ? 0 : std::strtol(number, nullptr, 10);
 }
+
+}  // namespace vela

@@ -10,9 +10,16 @@
 
 #include "convert/photo_convert_job.h"
 #include "platform/vlibc.h"
-#include "thumb/glob_matches.h"
+#include "posix/glob_matches.h"
 #include "thumb/log_source.h"
 #include "thumb/pid_file.h"
+
+using vela::GlobMatches;
+using vela::kConvertToolPath;
+using vela::kLogSource;
+using vela::kPidFilePattern;
+using vela::kPidPathBufferSize;
+using vela::PidOfFile;
 
 namespace {
 

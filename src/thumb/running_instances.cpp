@@ -5,8 +5,10 @@
 #include <fstream>
 #include <string>
 
-#include "thumb/glob_matches.h"
+#include "posix/glob_matches.h"
 #include "thumb/pid_file.h"
+
+namespace vela {
 
 namespace {
 
@@ -35,3 +37,5 @@ std::vector<pid_t> RunningInstances() {
   }
   return instances;
 }
+
+}  // namespace vela

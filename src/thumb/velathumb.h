@@ -1,7 +1,7 @@
 // The thumbnail maker: what the program itself is made of. The door of this room.
 #pragma once
 
-#include "thumb/directory_job.h"
+#include "profiles/directory_job.h"
 #include "thumb/directory_pass.h"
 #include "thumb/directory_walk.h"
 #include "thumb/file_helpers.h"

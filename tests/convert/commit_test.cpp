@@ -10,6 +10,8 @@
 #include "convert/convert_fixture.h"
 #include "support/mounts.h"
 
+using namespace vela;
+
 namespace vela_test {
 namespace {
 

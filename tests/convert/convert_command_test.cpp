@@ -10,6 +10,8 @@
 #include "support/sandbox.h"
 #include "support/stub_tool.h"
 
+using namespace vela;
+
 namespace vela_test {
 namespace {
 

@@ -8,6 +8,8 @@
 
 #include "convert/convert_fixture.h"
 
+using namespace vela;
+
 namespace vela_test {
 namespace {
 

@@ -7,6 +7,8 @@
 #include "command_line/plan_parser.h"
 #include "confinement/writable_places.h"
 
+using namespace vela;
+
 namespace {
 
 std::vector<std::string> Split(const uint8_t* data, size_t size) {

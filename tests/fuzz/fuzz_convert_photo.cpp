@@ -10,8 +10,10 @@
 #include "decoding/photo_opener.h"
 #include "encoding/unfinished_outputs.h"
 #include "input_file.h"
-#include "thumb/descriptor.h"
+#include "posix/file_descriptor.h"
 #include "thumbnails.h"
+
+using namespace vela;
 
 namespace {
 

@@ -7,6 +7,8 @@
 #include "profiles/plan_fixture.h"
 #include "support/mounts.h"
 
+using namespace vela;
+
 namespace vela_test {
 namespace {
 

@@ -6,6 +6,8 @@
 
 #include "profiles/plan_fixture.h"
 
+using namespace vela;
+
 namespace vela_test {
 namespace {
 

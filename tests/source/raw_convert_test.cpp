@@ -12,6 +12,8 @@
 #include "support/images.h"
 #include "support/mounts.h"
 
+using namespace vela;
+
 namespace vela_test {
 namespace {
 

@@ -10,6 +10,8 @@
 #include "source/source_fixture.h"
 #include "support/images.h"
 
+using namespace vela;
+
 namespace vela_test {
 namespace {
 

@@ -14,6 +14,8 @@
 #include "support/program.h"
 #include "support/raw_photos.h"
 
+using namespace vela;
+
 namespace vela_test {
 namespace {
 

@@ -9,13 +9,13 @@
 #include <string>
 #include <vector>
 
+#include "profiles/directory_job.h"
 #include "profiles/thumbnail_profile.h"
 #include "support/files.h"
 #include "support/images.h"
 #include "support/sandbox.h"
 #include "support/stub_tool.h"
 #include "support/system_log.h"
-#include "thumb/directory_job.h"
 
 namespace vela_test {
 

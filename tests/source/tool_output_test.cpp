@@ -9,6 +9,8 @@
 #include "platform/vlibc.h"
 #include "source/source_fixture.h"
 
+using namespace vela;
+
 namespace vela_test {
 namespace {
 

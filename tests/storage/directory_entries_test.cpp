@@ -13,6 +13,8 @@
 #include "support/sandbox.h"
 #include "support/system_log.h"
 
+using namespace vela;
+
 namespace vela_test {
 namespace {
 

@@ -12,6 +12,8 @@
 #include "support/files.h"
 #include "support/sandbox.h"
 
+using namespace vela;
+
 namespace vela_test {
 namespace {
 

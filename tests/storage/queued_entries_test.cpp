@@ -13,10 +13,16 @@
 #include "support/sandbox.h"
 #include "support/system_log.h"
 
+using namespace vela;
+
+namespace vela {
+
 /// Instead of the addresses of its members, which the test would be known by.
 static void PrintTo(const CreationQueue& queue, std::ostream* out) {
   *out << queue.file;
 }
+
+}  // namespace vela
 
 namespace vela_test {
 namespace {

@@ -1,9 +1,11 @@
 // Texts as a fixed-size buffer would hold them.
-#include "thumb/cut_text.h"
+#include "posix/cut_text.h"
 
 #include <gtest/gtest.h>
 
 #include <string>
+
+using namespace vela;
 
 namespace vela_test {
 namespace {

@@ -19,6 +19,8 @@
 #include "thumb/fork_call.h"
 #include "thumb/open_files.h"
 
+using namespace vela;
+
 namespace vela_test {
 namespace {
 

@@ -13,6 +13,8 @@
 #include "support/system_log.h"
 #include "thumb/pass_test.h"
 
+using namespace vela;
+
 namespace vela_test {
 namespace {
 

@@ -9,6 +9,7 @@
 #include <cerrno>
 #include <string>
 
+#include "posix/glob_matches.h"
 #include "support/files.h"
 #include "support/mounts.h"
 #include "support/privileges.h"
@@ -207,7 +208,7 @@ TEST_P(EscapedPattern, MatchesOnlyThePathItself) {
   const std::string neighbour = std::string("/tmp/") + GetParam().neighbour;
   WriteFile(own + "/x.fail", "");
   WriteFile(neighbour + "/x.fail", "");
-  EXPECT_EQ(0, RemoveFilesByPattern(EscapePattern(own) + "/*.fail"));
+  EXPECT_EQ(0, RemoveFilesByPattern(vela::EscapePattern(own) + "/*.fail"));
   EXPECT_THAT(ListDirectory(own), IsEmpty());
   EXPECT_THAT(ListDirectory(neighbour), ElementsAre("x.fail"));
 }

@@ -6,11 +6,11 @@
 #include <string>
 #include <vector>
 
+#include "profiles/directory_job.h"
 #include "profiles/thumbnail_profile.h"
 #include "support/files.h"
 #include "support/profile_file.h"
 #include "support/sandbox.h"
-#include "thumb/directory_job.h"
 #include "thumb/zero_mask.h"
 
 namespace vela_test {
@@ -36,7 +36,7 @@ class PassTest : public SandboxTest {
     const std::string file = WriteProfileFile("/tmp/profiles.conf", sections);
     profiles_ = ThumbnailProfileList();
     ASSERT_EQ(1, ParseThumbnailProfiles(profiles_, file, kDir));
-    ASSERT_EQ(static_cast<int>(sections.size()), GetProfileCount(profiles_, kAllPhases));
+    ASSERT_EQ(static_cast<int>(sections.size()), GetProfileCount(profiles_, vela::kAllPhases));
   }
 
   DirectoryJob Job() const { return {kDir, profiles_}; }

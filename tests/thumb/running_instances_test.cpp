@@ -19,6 +19,8 @@
 #include "support/program.h"
 #include "support/sandbox.h"
 
+using namespace vela;
+
 namespace vela_test {
 namespace {
 

@@ -4,6 +4,8 @@
 #include <string>
 #include <vector>
 
+namespace vela {
+
 /// The box that a thumbnail is scaled to; a picture that is smaller keeps its size.
 struct ThumbnailBox {
   int width = 0;      ///< pixels, at least 1
@@ -41,3 +43,5 @@ struct ConversionPlan {
   bool firstPageOnly = false;       ///< any further pages of the source are left alone
   std::vector<OutputPlan> outputs;  ///< at least one
 };
+
+}  // namespace vela

@@ -4,6 +4,8 @@
 
 #include <charconv>
 
+namespace vela {
+
 namespace {
 
 constexpr int kLargestSide = 65535;
@@ -131,3 +133,5 @@ std::optional<std::string> ParseOutputPath(const std::string& text) {
   }
   return path;
 }
+
+}  // namespace vela

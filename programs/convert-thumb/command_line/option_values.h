@@ -6,6 +6,8 @@
 
 #include "command_line/conversion_plan.h"
 
+namespace vela {
+
 /// A whole number without sign, from `least` to `most`; empty for any other text.
 std::optional<int> ParseWholeNumber(const std::string& text, int least, int most);
 
@@ -22,3 +24,5 @@ std::optional<int> ParseQuarterTurns(const std::string& text);
 /// The file name that an output argument stands for: a doubled percent sign is a single one. Empty
 /// when the text has any other percent sign or names anything but a JPEG file.
 std::optional<std::string> ParseOutputPath(const std::string& text);
+
+}  // namespace vela

@@ -6,6 +6,8 @@
 
 #include "command_line/option_values.h"
 
+namespace vela {
+
 namespace {
 
 constexpr char kScratchDefine[] = "registry:temporary-path=";
@@ -262,3 +264,5 @@ std::optional<TurnPlan> ParseTurn(const std::vector<std::string>& arguments) {
   }
   return TurnPlan{arguments[2], quarterTurns};
 }
+
+}  // namespace vela

@@ -8,6 +8,8 @@
 
 #include "command_line/conversion_plan.h"
 
+namespace vela {
+
 /// The arguments behind the program's name as a plan. Empty when they say anything that is not
 /// understood here to the last detail.
 std::optional<ConversionPlan> ParseConversion(const std::vector<std::string>& arguments);
@@ -31,3 +33,5 @@ std::optional<std::string> FindScratchDirectory(const std::vector<std::string>& 
 /// The file that a source argument names: all of it but for "[0]" at its end, which chooses the
 /// first page.
 std::string SourceFile(const std::string& argument);
+
+}  // namespace vela

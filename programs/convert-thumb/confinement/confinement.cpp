@@ -8,6 +8,8 @@
 #include "confinement/landlock.h"
 #include "confinement/system_calls.h"
 
+namespace vela {
+
 namespace {
 
 /// Of all sizes this one alone also keeps programs that collect memory images from getting one.
@@ -33,3 +35,5 @@ void Confine(const WritablePlaces& places) {
 void ConfineToThisProgram() {
   RefuseOtherPrograms();
 }
+
+}  // namespace vela

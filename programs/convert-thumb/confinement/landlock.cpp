@@ -9,7 +9,9 @@
 #include <cstdint>
 #include <string>
 
-#include "thumb/descriptor.h"
+#include "posix/file_descriptor.h"
+
+namespace vela {
 
 namespace {
 
@@ -57,22 +59,22 @@ RulesetAttributes AllRestrictions(int version) {
   return all;
 }
 
-void Allow(const Descriptor& ruleset, const Descriptor& place, uint64_t access) {
+void Allow(const FileDescriptor& ruleset, const FileDescriptor& place, uint64_t access) {
   landlock_path_beneath_attr rule = {};
   rule.allowed_access = access;
   rule.parent_fd = place.Get();
   syscall(SYS_landlock_add_rule, ruleset.Get(), LANDLOCK_RULE_PATH_BENEATH, &rule, 0);
 }
 
-void AllowChangesBelow(const Descriptor& ruleset, const std::string& directory, int version) {
-  const Descriptor place(open(directory.c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC));
+void AllowChangesBelow(const FileDescriptor& ruleset, const std::string& directory, int version) {
+  const FileDescriptor place(open(directory.c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC));
   if (place.IsOpen()) {
     Allow(ruleset, place, ChangeFile(version) | kChangeDirectory);
   }
 }
 
-void AllowChangesOf(const Descriptor& ruleset, const std::string& file, int version) {
-  const Descriptor place(open(file.c_str(), O_PATH | O_CLOEXEC));
+void AllowChangesOf(const FileDescriptor& ruleset, const std::string& file, int version) {
+  const FileDescriptor place(open(file.c_str(), O_PATH | O_CLOEXEC));
   struct stat status;
   if (place.IsOpen() && fstat(place.Get(), &status) == 0 && !S_ISDIR(status.st_mode)) {
     Allow(ruleset, place, ChangeFile(version));
@@ -87,7 +89,7 @@ void AllowWritingOnlyAt(const WritablePlaces& places) {
     return;
   }
   const RulesetAttributes restrictions = AllRestrictions(version);
-  const Descriptor ruleset(static_cast<int>(
+  const FileDescriptor ruleset(static_cast<int>(
       syscall(SYS_landlock_create_ruleset, &restrictions, sizeof restrictions, 0)));
   if (!ruleset.IsOpen()) {
     return;
@@ -100,3 +102,5 @@ void AllowWritingOnlyAt(const WritablePlaces& places) {
   }
   syscall(SYS_landlock_restrict_self, ruleset.Get(), 0);
 }
+
+}  // namespace vela

@@ -9,6 +9,8 @@
 
 #include "platform/vlibc.h"
 
+namespace vela {
+
 namespace {
 
 constexpr char kSystemSettings[] = "/etc/velainfo.conf";
@@ -59,3 +61,5 @@ size_t ConversionMemoryLimit() {
   }
   return limit.value_or(kDefaultLimit);
 }
+
+}  // namespace vela

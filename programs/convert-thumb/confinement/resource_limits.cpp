@@ -6,6 +6,8 @@
 #include <algorithm>
 #include <limits>
 
+namespace vela {
+
 namespace {
 
 /// Between the signal and the end by force.
@@ -50,3 +52,5 @@ void LimitResources(size_t memoryLimit) {
   LimitMemory(memoryLimit);
   Lower(RLIMIT_CPU, kMostProcessorSeconds, kMostProcessorSeconds + kSecondsToEnd);
 }
+
+}  // namespace vela

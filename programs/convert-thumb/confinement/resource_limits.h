@@ -3,6 +3,8 @@
 
 #include <cstddef>
 
+namespace vela {
+
 /// Processor time of all threads together; more than a picture of 100 megapixels takes on a slow
 /// machine.
 constexpr unsigned kMostProcessorSeconds = 600;
@@ -16,3 +18,5 @@ constexpr size_t kStackMemory = size_t{8} << 20;
 /// `memoryLimit` bytes besides the above, and it gets SIGXCPU when its processor time is used up.
 /// Lower limits that are in force stay.
 void LimitResources(size_t memoryLimit);
+
+}  // namespace vela

@@ -11,6 +11,8 @@
 
 #include <seccomp.h>
 
+namespace vela {
+
 namespace {
 
 constexpr uint32_t kRefuse = SCMP_ACT_ERRNO(EPERM);
@@ -200,3 +202,5 @@ void RefuseOtherPrograms() {
   filter.Add(kRefuse, SCMP_SYS(tkill));
   filter.LoadForAllThreads();
 }
+
+}  // namespace vela

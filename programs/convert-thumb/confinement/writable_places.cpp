@@ -6,6 +6,8 @@
 
 #include "command_line/plan_parser.h"
 
+namespace vela {
+
 namespace {
 
 constexpr char kNothing[] = "/dev/null";
@@ -83,3 +85,5 @@ WritablePlaces FindWritablePlaces(const std::vector<std::string>& arguments) {
   }
   return places;
 }
+
+}  // namespace vela

@@ -5,6 +5,8 @@
 
 #include <libexif/exif-data.h>
 
+namespace vela {
+
 namespace {
 
 constexpr int kInch = 2;
@@ -78,3 +80,5 @@ void TakeExifTraits(const uint8_t* data, size_t size, PhotoTraits& traits) {
   }
   TakeDensity(exif, traits.density);
 }
+
+}  // namespace vela

@@ -5,6 +5,8 @@
 #include <algorithm>
 #include <cerrno>
 
+namespace vela {
+
 int FileInput::Read(unsigned char* bytes, int size) {
   const size_t wanted = size > 0 ? static_cast<size_t>(size) : 0;
   size_t done = 0;
@@ -32,3 +34,5 @@ bool FileInput::Fill() {
   end_ = static_cast<size_t>(count);
   return true;
 }
+
+}  // namespace vela

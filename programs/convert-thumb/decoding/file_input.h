@@ -6,6 +6,8 @@
 #include <array>
 #include <cstddef>
 
+namespace vela {
+
 /// Reads the beginning of a file, whatever place its descriptor reads from, and leaves that alone.
 class FileInput {
  public:
@@ -28,3 +30,5 @@ class FileInput {
   size_t begin_ = 0;  ///< of what has not been handed out
   size_t end_ = 0;
 };
+
+}  // namespace vela

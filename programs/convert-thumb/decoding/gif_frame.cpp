@@ -3,6 +3,8 @@
 #include "decoding/file_input.h"
 #include "decoding/gif_library.h"
 
+namespace vela {
+
 namespace {
 
 int ReadInput(GifFileType* gif, GifByteType* bytes, int size) {
@@ -54,3 +56,5 @@ bool FirstFrameFillsGif(int descriptor) {
   library->close(gif, nullptr);
   return fills;
 }
+
+}  // namespace vela

@@ -2,6 +2,8 @@
 
 #include <dlfcn.h>
 
+namespace vela {
+
 namespace {
 
 constexpr char kLibraryName[] = "libgif.so.7";
@@ -21,3 +23,5 @@ const GifLibrary* GifLibrary::Get() {
   static const GifLibrary library;
   return library.IsLoaded() ? &library : nullptr;
 }
+
+}  // namespace vela

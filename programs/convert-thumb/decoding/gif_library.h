@@ -5,6 +5,8 @@
 
 #include "loaded_library.h"
 
+namespace vela {
+
 /// The functions of giflib that are used.
 class GifLibrary final : private LoadedLibrary {
  public:
@@ -21,3 +23,5 @@ class GifLibrary final : private LoadedLibrary {
  private:
   GifLibrary();
 };
+
+}  // namespace vela

@@ -13,6 +13,8 @@
 
 #include <jerror.h>
 
+namespace vela {
+
 namespace {
 
 constexpr int kExifMarker = JPEG_APP0 + 1;
@@ -238,3 +240,5 @@ bool JpegReader::ReadRow(uint8_t* row) {
 const char* JpegReader::Error() const {
   return state_->errors.message;
 }
+
+}  // namespace vela

@@ -7,6 +7,8 @@
 
 #include "decoding/photo_reader.h"
 
+namespace vela {
+
 class JpegReader final : public PhotoReader {
  public:
   /// Reads from `descriptor`, which has to stay open as long as the reader is used. `memoryLimit`:
@@ -34,3 +36,5 @@ class JpegReader final : public PhotoReader {
   struct State;
   std::unique_ptr<State> state_;
 };
+
+}  // namespace vela

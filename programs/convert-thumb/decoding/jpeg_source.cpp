@@ -6,6 +6,8 @@
 
 #include <jerror.h>
 
+namespace vela {
+
 namespace {
 
 JpegSource& SourceOf(j_decompress_ptr info) {
@@ -68,3 +70,5 @@ void ReadJpegFrom(JpegSource& source, int descriptor, jpeg_decompress_struct& in
   source.manager.term_source = End;
   info.src = &source.manager;
 }
+
+}  // namespace vela

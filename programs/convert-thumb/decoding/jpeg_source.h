@@ -6,6 +6,8 @@
 
 #include <jpeglib.h>
 
+namespace vela {
+
 constexpr size_t kJpegSourceBuffer = 65536;
 
 /// Its first member is the library's own part.
@@ -19,3 +21,5 @@ struct JpegSource {
 /// Makes `info` read from `descriptor`, from where it stands. A file that ends too early is
 /// decoded as far as it goes; an empty one is the library's error.
 void ReadJpegFrom(JpegSource& source, int descriptor, jpeg_decompress_struct& info);
+
+}  // namespace vela

@@ -2,6 +2,8 @@
 
 #include <dlfcn.h>
 
+namespace vela {
+
 namespace {
 
 constexpr char kLibraryName[] = "libnetpbm.so.11";
@@ -31,3 +33,5 @@ const NetpbmLibrary* NetpbmLibrary::Get() {
   static const NetpbmLibrary library;
   return library.IsLoaded() ? &library : nullptr;
 }
+
+}  // namespace vela

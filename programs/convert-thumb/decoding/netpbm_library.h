@@ -10,6 +10,8 @@ extern "C" {
 
 #include "loaded_library.h"
 
+namespace vela {
+
 /// The functions of libnetpbm that are used. It keeps settings for the whole process, so one
 /// thread at a time may use it.
 class NetpbmLibrary final : private LoadedLibrary {
@@ -25,3 +27,5 @@ class NetpbmLibrary final : private LoadedLibrary {
  private:
   NetpbmLibrary();
 };
+
+}  // namespace vela

@@ -6,6 +6,8 @@
 #include <string>
 #include <string_view>
 
+namespace vela {
+
 namespace {
 
 using std::literals::string_view_literals::operator""sv;
@@ -49,3 +51,5 @@ PhotoFormat FormatOf(int descriptor) {
   }
   return PhotoFormat::kUnknown;
 }
+
+}  // namespace vela

@@ -1,6 +1,8 @@
 // Tells the format of a photo from its first bytes.
 #pragma once
 
+namespace vela {
+
 enum class PhotoFormat {
   kUnknown,
   kJpeg,
@@ -16,3 +18,5 @@ enum class PhotoFormat {
 /// The format of an open file, whatever its name; kUnknown for any other one and when it cannot be
 /// read. Leaves the place where the descriptor reads alone.
 PhotoFormat FormatOf(int descriptor);
+
+}  // namespace vela

@@ -8,6 +8,8 @@
 #include "decoding/vips_reader.h"
 #include "thumbnails.h"
 
+namespace vela {
+
 namespace {
 
 bool HasTiffExtension(const std::string& path) {
@@ -47,3 +49,5 @@ std::unique_ptr<PhotoReader> OpenPhoto(int descriptor, const ConversionPlan& pla
   }
   return reader;
 }
+
+}  // namespace vela

@@ -7,6 +7,8 @@
 #include "decoding/photo_traits.h"
 #include "picture/thumbnail_size.h"
 
+namespace vela {
+
 /// Of a photo that is decoded here.
 constexpr uint64_t kMostPixels = 1000000000;
 
@@ -49,3 +51,5 @@ class PhotoReader {
   PhotoReader(const PhotoReader&) = default;
   PhotoReader& operator=(const PhotoReader&) = default;
 };
+
+}  // namespace vela

@@ -7,6 +7,8 @@
 
 #include "picture/colour_space.h"
 
+namespace vela {
+
 /// Sampling factors of a JPEG's component, 1 to 4.
 struct JpegSampling {
   int horizontal = 1;
@@ -32,3 +34,5 @@ struct PhotoTraits {
   int orientation = 1;                 ///< EXIF orientation, 1 to 8
   std::vector<uint8_t> colourProfile;  ///< ICC profile, empty when there is none
 };
+
+}  // namespace vela

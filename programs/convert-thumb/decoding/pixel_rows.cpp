@@ -5,6 +5,8 @@
 #include "picture/colour_conversion.h"
 #include "picture/picture.h"
 
+namespace vela {
+
 namespace {
 
 template <typename Sample>
@@ -96,3 +98,5 @@ void ChangeRow(const DecodedRow& row, RowChange change, const Background& backgr
     Change<uint16_t>(row, change, background, out);
   }
 }
+
+}  // namespace vela

@@ -5,6 +5,8 @@
 #include <cstddef>
 #include <cstdint>
 
+namespace vela {
+
 /// What has to be done to a decoder's row.
 enum class RowChange {
   kNone,
@@ -34,3 +36,5 @@ size_t ChangedSampleSize(RowChange change, size_t sampleSize);
 /// Writes the changed row to `out`, which has room for it and is aligned for its samples. Changes
 /// to brightness take 3 bands, or 4 of which they drop the last.
 void ChangeRow(const DecodedRow& row, RowChange change, const Background& background, uint8_t* out);
+
+}  // namespace vela

@@ -5,6 +5,8 @@
 
 #include "decoding/file_input.h"
 
+namespace vela {
+
 namespace {
 
 /// The smallest exponent, in 100,000ths, from which on ImageMagick takes samples for linear.
@@ -106,3 +108,5 @@ std::optional<PngHeader> ReadPngHeader(const VipsLibrary& vips, int descriptor) 
   }
   return HeaderOf(structures.png, structures.info);
 }
+
+}  // namespace vela

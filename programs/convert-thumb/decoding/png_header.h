@@ -6,6 +6,8 @@
 #include "decoding/photo_traits.h"
 #include "decoding/vips_library.h"
 
+namespace vela {
+
 struct PngHeader {
   int bitDepth = 8;
   bool linear = false;  ///< samples are said to be proportional to light
@@ -15,3 +17,5 @@ struct PngHeader {
 /// Of the file under `descriptor`; empty when it cannot be read. Leaves the place where the
 /// descriptor reads alone.
 std::optional<PngHeader> ReadPngHeader(const VipsLibrary& vips, int descriptor);
+
+}  // namespace vela

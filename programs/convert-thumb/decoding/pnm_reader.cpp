@@ -6,6 +6,8 @@
 
 #include "decoding/netpbm_library.h"
 
+namespace vela {
+
 namespace {
 
 constexpr sample kByteEnd = 255;
@@ -96,3 +98,5 @@ bool PnmReader::ReadRow(uint8_t* row) {
   }
   return true;
 }
+
+}  // namespace vela

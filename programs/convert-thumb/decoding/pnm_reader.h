@@ -8,6 +8,8 @@
 
 #include "decoding/photo_reader.h"
 
+namespace vela {
+
 class PnmReader final : public PhotoReader {
  public:
   /// Reads from `descriptor`. `firstPageOnly`: leave further pictures in the file alone.
@@ -42,3 +44,5 @@ class PnmReader final : public PhotoReader {
   size_t sampleSize_ = 1;
   std::string error_;
 };
+
+}  // namespace vela

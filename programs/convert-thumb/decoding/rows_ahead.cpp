@@ -7,6 +7,8 @@
 #include "picture/sample_loops.h"
 #include "worker_threads.h"
 
+namespace vela {
+
 namespace {
 
 /// Threads meet once a batch.
@@ -120,3 +122,5 @@ bool RowsAhead::WaitForBatch(int batch) {
   changed_.wait(lock, [&] { return failed_ || decoded_ > batch; });
   return decoded_ > batch;
 }
+
+}  // namespace vela

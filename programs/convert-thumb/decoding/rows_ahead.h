@@ -11,6 +11,8 @@
 #include "decoding/photo_reader.h"
 #include "picture/row_source.h"
 
+namespace vela {
+
 class RowsAhead final : public RowSource {
  public:
   /// The rows of a reader that has been started. Until this object ends, nobody else may use the
@@ -52,3 +54,5 @@ class RowsAhead final : public RowSource {
   bool stopped_ = false;
   std::thread thread_;
 };
+
+}  // namespace vela

@@ -5,6 +5,8 @@
 
 #include <cstdint>
 
+namespace vela {
+
 namespace {
 
 constexpr char kNoName[] = "";
@@ -47,3 +49,5 @@ TiffColours ReadTiffColours(const VipsLibrary& vips, int descriptor) {
   lseek(descriptor, 0, SEEK_SET);
   return known ? ColoursOf(photometric, compression) : TiffColours::kUnusual;
 }
+
+}  // namespace vela

@@ -3,6 +3,8 @@
 
 #include "decoding/vips_library.h"
 
+namespace vela {
+
 enum class TiffColours {
   kUsual,    ///< read by libvips as they are
   kPalette,  ///< the same; each pixel is the number of a colour
@@ -11,3 +13,5 @@ enum class TiffColours {
 
 /// Of the first picture in the file under `descriptor`, which reads from its start afterwards.
 TiffColours ReadTiffColours(const VipsLibrary& vips, int descriptor);
+
+}  // namespace vela

@@ -7,6 +7,8 @@
 #include <optional>
 #include <string>
 
+namespace vela {
+
 namespace {
 
 constexpr char kLibraryName[] = "libvips.so.42";
@@ -129,3 +131,5 @@ const VipsLibrary* VipsLibrary::Get() {
   static const VipsLibrary library;
   return library.isStarted_ ? &library : nullptr;
 }
+
+}  // namespace vela

@@ -9,6 +9,8 @@
 
 #include "loaded_library.h"
 
+namespace vela {
+
 /// The functions of libvips, and of the libraries below it, that are used.
 class VipsLibrary final : private LoadedLibrary {
  public:
@@ -73,3 +75,5 @@ class VipsLibrary final : private LoadedLibrary {
   decltype(&::g_module_open) openModule_ = nullptr;
   bool isStarted_ = false;
 };
+
+}  // namespace vela

@@ -13,6 +13,8 @@
 #include "decoding/webp_frame.h"
 #include "picture/picture.h"
 
+namespace vela {
+
 namespace {
 
 /// What the decoders that go from top to bottom hand out at a time.
@@ -317,3 +319,5 @@ void VipsReader::LeaveThread() {
 const char* VipsReader::Error() const {
   return state_->error.c_str();
 }
+
+}  // namespace vela

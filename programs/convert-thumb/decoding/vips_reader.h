@@ -8,6 +8,8 @@
 #include "decoding/photo_format.h"
 #include "decoding/photo_reader.h"
 
+namespace vela {
+
 /// What VipsReader reads.
 struct VipsSourceFile {
   int descriptor = -1;                         ///< open as long as the reader is used
@@ -42,3 +44,5 @@ class VipsReader final : public PhotoReader {
   struct State;
   std::unique_ptr<State> state_;
 };
+
+}  // namespace vela

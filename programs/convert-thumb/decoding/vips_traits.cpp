@@ -6,6 +6,8 @@
 #include "decoding/exif_traits.h"
 #include "picture/picture.h"
 
+namespace vela {
+
 namespace {
 
 constexpr char kBackground[] = "background";
@@ -110,3 +112,5 @@ PhotoTraits ReadVipsTraits(const VipsLibrary& vips, VipsImage* image, PhotoForma
   }
   return traits;
 }
+
+}  // namespace vela

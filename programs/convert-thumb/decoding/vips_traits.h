@@ -6,6 +6,8 @@
 #include "decoding/pixel_rows.h"
 #include "decoding/vips_library.h"
 
+namespace vela {
+
 /// Whether the picture has a field of this name.
 bool HasVipsField(const VipsLibrary& vips, VipsImage* image, const char* name);
 
@@ -18,3 +20,5 @@ Background ReadVipsBackground(const VipsLibrary& vips, VipsImage* image, int bit
 
 /// Density, orientation, profile, and whether the pixels are numbers of colours.
 PhotoTraits ReadVipsTraits(const VipsLibrary& vips, VipsImage* image, PhotoFormat format);
+
+}  // namespace vela

@@ -8,6 +8,8 @@
 
 #include "decoding/file_input.h"
 
+namespace vela {
+
 namespace {
 
 std::vector<uint8_t> BeginningOf(int descriptor) {
@@ -52,3 +54,5 @@ WebpFrame ReadFirstWebpFrame(const VipsLibrary& vips, int descriptor) {
   vips.closeWebp(file);
   return kind;
 }
+
+}  // namespace vela

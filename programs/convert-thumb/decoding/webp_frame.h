@@ -3,6 +3,8 @@
 
 #include "decoding/vips_library.h"
 
+namespace vela {
+
 enum class WebpFrame {
   kOpaque,
   kTransparent,
@@ -12,3 +14,5 @@ enum class WebpFrame {
 /// The first frame of the file under `descriptor`, each frame of which says for itself whether it
 /// has transparent parts. Leaves the place where the descriptor reads alone.
 WebpFrame ReadFirstWebpFrame(const VipsLibrary& vips, int descriptor);
+
+}  // namespace vela

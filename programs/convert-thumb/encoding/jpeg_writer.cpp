@@ -7,6 +7,8 @@
 #include "jpeg_errors.h"
 #include "picture/sample_loops.h"
 
+namespace vela {
+
 namespace {
 
 /// Above this the slower transform is worth its time.
@@ -216,3 +218,5 @@ EncodedJpeg EncodeJpeg(const Picture& picture, const PhotoTraits& traits, int qu
   }
   return encoder.Finish();
 }
+
+}  // namespace vela

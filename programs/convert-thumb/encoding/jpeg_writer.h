@@ -13,6 +13,8 @@
 #include "picture/row_sink.h"
 #include "picture/thumbnail_size.h"
 
+namespace vela {
+
 struct FreeEncoded {
   void operator()(unsigned char* memory) const { std::free(memory); }
 };
@@ -70,3 +72,5 @@ class JpegEncoder final : public RowSink {
 /// Encodes a whole picture.
 EncodedJpeg EncodeJpeg(const Picture& picture, const PhotoTraits& traits, int quality,
                        bool withProfile);
+
+}  // namespace vela

@@ -9,7 +9,9 @@
 #include <utility>
 
 #include "encoding/unfinished_outputs.h"
-#include "thumb/descriptor.h"
+#include "posix/file_descriptor.h"
+
+namespace vela {
 
 namespace {
 
@@ -34,15 +36,15 @@ std::string ScratchName(const std::string& path) {
 }
 
 /// Opens a new file with exactly these permissions.
-Descriptor MakeFile(const std::string& path, mode_t mode) {
+FileDescriptor MakeFile(const std::string& path, mode_t mode) {
   const mode_t mask = umask(0);
-  Descriptor file(open(path.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, mode));
+  FileDescriptor file(open(path.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, mode));
   umask(mask);
   return file;
 }
 
 /// Directories give their group and access control lists to new files.
-bool IsLike(const Descriptor& file, const struct stat& former) {
+bool IsLike(const FileDescriptor& file, const struct stat& former) {
   struct stat status;
   return fstat(file.Get(), &status) == 0 && status.st_uid == former.st_uid &&
          status.st_gid == former.st_gid && status.st_mode == former.st_mode &&
@@ -50,13 +52,13 @@ bool IsLike(const Descriptor& file, const struct stat& former) {
 }
 
 /// After a crash of the machine, the name must not lead to a file whose content never arrived.
-bool WriteForGood(Descriptor& file, const unsigned char* bytes, size_t size) {
+bool WriteForGood(FileDescriptor& file, const unsigned char* bytes, size_t size) {
   return WriteAll(file.Get(), bytes, size) && fdatasync(file.Get()) == 0 && file.Close();
 }
 
 Replacement ReplaceThrough(const std::string& scratch, const std::string& path,
                            const unsigned char* bytes, size_t size, const struct stat& former) {
-  Descriptor file = MakeFile(scratch, former.st_mode & 07777U);
+  FileDescriptor file = MakeFile(scratch, former.st_mode & 07777U);
   if (!file.IsOpen()) {
     return errno == EACCES ? Replacement::kImpossible : Replacement::kFailed;
   }
@@ -70,14 +72,14 @@ Replacement ReplaceThrough(const std::string& scratch, const std::string& path,
 
 /// Closed for what is neither a regular file nor a character device. Does not wait for the reader
 /// of a pipe.
-Descriptor OpenForWriting(const std::string& path) {
-  Descriptor file(
+FileDescriptor OpenForWriting(const std::string& path) {
+  FileDescriptor file(
       open(path.c_str(), O_WRONLY | O_CREAT | O_TRUNC | O_CLOEXEC | O_NOCTTY | O_NONBLOCK, 0666));
   struct stat status;
   const bool isFit = file.IsOpen() && fstat(file.Get(), &status) == 0 &&
                      (S_ISREG(status.st_mode) || S_ISCHR(status.st_mode)) &&
                      fcntl(file.Get(), F_SETFL, 0) == 0;
-  return isFit ? std::move(file) : Descriptor();
+  return isFit ? std::move(file) : FileDescriptor();
 }
 
 }  // namespace
@@ -86,7 +88,7 @@ bool WriteOutputFile(const std::string& path, const unsigned char* bytes, size_t
   if (!NoteOutput(path)) {
     return false;
   }
-  Descriptor file = OpenForWriting(path);
+  FileDescriptor file = OpenForWriting(path);
   if (!file.IsOpen()) {
     ForgetOutput(path);
     return false;
@@ -122,3 +124,5 @@ bool HasExtendedAttributes(int descriptor) {
   // File systems without any answer with an error.
   return flistxattr(descriptor, nullptr, 0) > 0;
 }
+
+}  // namespace vela

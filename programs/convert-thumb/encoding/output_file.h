@@ -6,6 +6,8 @@
 #include <cstddef>
 #include <string>
 
+namespace vela {
+
 /// Writes the whole file, new (with the permissions that the mask leaves of 0666) or over an old
 /// one; a character device is written to as well. False when any byte may not have arrived, or when
 /// something else has the name; what is there of the file is then removed. Any thread may call it.
@@ -26,3 +28,5 @@ Replacement ReplaceFile(const std::string& path, const unsigned char* bytes, siz
 
 /// Whether the open file has extended attributes, access control lists included.
 bool HasExtendedAttributes(int descriptor);
+
+}  // namespace vela

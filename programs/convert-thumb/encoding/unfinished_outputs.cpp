@@ -7,6 +7,8 @@
 #include <csignal>
 #include <cstring>
 
+namespace vela {
+
 namespace {
 
 constexpr int kFailed = 1;
@@ -95,3 +97,5 @@ void EndCleanlyOnFatalSignals() {
     sigaction(fatal.number, &action, nullptr);
   }
 }
+
+}  // namespace vela

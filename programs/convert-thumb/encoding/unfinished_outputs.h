@@ -3,6 +3,8 @@
 
 #include <string>
 
+namespace vela {
+
 /// Remembers that this run is about to make the file. False when the run is ending already: then
 /// the file must not be made. Any thread may call it.
 bool NoteOutput(const std::string& path);
@@ -18,3 +20,5 @@ void RemoveNotedOutputs();
 /// shrinks while it is read, no processor time left) end the process with status 1, one line on
 /// standard error, and without the files that were noted.
 void EndCleanlyOnFatalSignals();
+
+}  // namespace vela

@@ -12,6 +12,8 @@
 #include "failure_line.h"
 #include "write_signals.h"
 
+namespace vela {
+
 namespace {
 
 constexpr int kPassedOn[] = {SIGTERM, SIGINT, SIGHUP, SIGQUIT};
@@ -123,3 +125,5 @@ void StandForProgram(const char* program, char* const* arguments) {
     EndLike(*status);
   }
 }
+
+}  // namespace vela

@@ -13,8 +13,10 @@
 #include "failure_line.h"
 #include "imagemagick/child_program.h"
 #include "imagemagick/image_magick_limits.h"
-#include "thumb/descriptor.h"
+#include "posix/file_descriptor.h"
 #include "write_signals.h"
+
+namespace vela {
 
 namespace {
 
@@ -71,7 +73,7 @@ bool IsSpecialFile(const std::string& file) {
 }
 
 struct OpenedSource {
-  Descriptor descriptor;
+  FileDescriptor descriptor;
   int error = 0;  ///< errno when it could not be opened
   bool isSpecial = false;
 };
@@ -80,8 +82,8 @@ struct OpenedSource {
 /// waits for its data again.
 OpenedSource OpenSource(const std::string& file) {
   OpenedSource source;
-  source.descriptor =
-      Descriptor(open(file.c_str(), O_RDONLY | O_NOCTTY | O_NONBLOCK));  // NOLINT: for ImageMagick
+  source.descriptor = FileDescriptor(
+      open(file.c_str(), O_RDONLY | O_NOCTTY | O_NONBLOCK));  // NOLINT: for ImageMagick
   struct stat status;
   if (!source.descriptor.IsOpen() || fstat(source.descriptor.Get(), &status) != 0 ||
       fcntl(source.descriptor.Get(), F_SETFL, 0) != 0) {
@@ -98,14 +100,14 @@ bool TellSpecial(const std::string& file) {
 }
 
 /// A name that means nothing but itself, for as long as the process or program lasts.
-std::string PlainName(Descriptor& descriptor, std::vector<Descriptor>& inherited) {
+std::string PlainName(FileDescriptor& descriptor, std::vector<FileDescriptor>& inherited) {
   const std::string name = "/proc/self/fd/" + std::to_string(descriptor.Get());
   inherited.push_back(std::move(descriptor));
   return name;
 }
 
 /// False when the source cannot be handed over. What has to stay open goes to `inherited`.
-bool MakeSourceSafe(std::vector<std::string>& arguments, std::vector<Descriptor>& inherited) {
+bool MakeSourceSafe(std::vector<std::string>& arguments, std::vector<FileDescriptor>& inherited) {
   const size_t place = FindSourceArgument(arguments);
   if (place == arguments.size()) {
     return true;
@@ -190,7 +192,7 @@ bool MakeOutputsSafe(std::vector<std::string>& arguments) {
   return true;
 }
 
-bool MakeSafe(std::vector<std::string>& arguments, std::vector<Descriptor>& inherited) {
+bool MakeSafe(std::vector<std::string>& arguments, std::vector<FileDescriptor>& inherited) {
   const std::optional<ConversionPlan> plan = ParseConversion(arguments);
   return MakeSourceSafe(arguments, inherited) &&
          (!plan || (AreNoPipes(plan->outputs) && MakeOutputsSafe(arguments)));
@@ -209,7 +211,7 @@ std::vector<char*> ArgumentVector(std::string& argumentZero, std::vector<std::st
 
 void HandOver(const std::vector<std::string>& arguments, size_t memoryLimit) {
   std::vector<std::string> handed = arguments;
-  std::vector<Descriptor> inherited;
+  std::vector<FileDescriptor> inherited;
   if (!MakeSafe(handed, inherited)) {
     return;
   }
@@ -222,3 +224,5 @@ void HandOver(const std::vector<std::string>& arguments, size_t memoryLimit) {
   IgnoreWriteSignals();
   TellFailure("%s: %s", kProgram, std::strerror(errno));
 }
+
+}  // namespace vela

@@ -5,6 +5,8 @@
 #include <string>
 #include <vector>
 
+namespace vela {
+
 /// Replaces this process by ImageMagick with the same arguments; where it is not installed under
 /// the converter's name, this process stays and ends the way ImageMagick ends in a child. A source
 /// whose name ImageMagick would take for more than a name is opened here and handed over as a
@@ -13,3 +15,5 @@
 /// file, and never a pipe. ImageMagick is told to take no more than `memoryLimit` bytes. Returns
 /// only when that failed; TellFailure was called then.
 void HandOver(const std::vector<std::string>& arguments, size_t memoryLimit);
+
+}  // namespace vela

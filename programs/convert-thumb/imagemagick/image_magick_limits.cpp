@@ -5,6 +5,8 @@
 #include <cstring>
 #include <string>
 
+namespace vela {
+
 namespace {
 
 constexpr char kInMemory[] = "MAGICK_MEMORY_LIMIT";
@@ -48,3 +50,5 @@ void LimitImageMagick(size_t memoryLimit) {
   LimitTo(memoryLimit / 2, kInMemory);
   LimitTo(memoryLimit, kInMappedFiles);
 }
+
+}  // namespace vela

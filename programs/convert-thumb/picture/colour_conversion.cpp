@@ -2,6 +2,8 @@
 
 #include <utility>
 
+namespace vela {
+
 namespace {
 
 constexpr float kMiddle = 32768;
@@ -55,3 +57,5 @@ void RgbToLumaChroma(float red, float green, float blue, uint16_t* out) {
   out[1] = ToSample(kMiddleStep + (blue - luma) / kBlueScale);
   out[2] = ToSample(kMiddleStep + (red - luma) / kRedScale);
 }
+
+}  // namespace vela

@@ -7,6 +7,8 @@
 #include "picture/colour_space.h"
 #include "picture/picture.h"
 
+namespace vela {
+
 /// Makes red, green and blue of a picture in the space `from`; leaves grey and red, green and blue
 /// as they are. Inks are taken for ideal ones.
 void ConvertToRgb(Picture& picture, ColourSpace from);
@@ -18,3 +20,5 @@ void LumaChromaToRgb(uint16_t* samples, size_t pixels);
 /// ImageMagick reads the middle of the differences' 256 steps, 128, as half a step more than the
 /// middle of the range, and so is this pair of conversions.
 void RgbToLumaChroma(float red, float green, float blue, uint16_t* out);
+
+}  // namespace vela

@@ -1,6 +1,8 @@
 // Which colour the samples of a pixel stand for.
 #pragma once
 
+namespace vela {
+
 enum class ColourSpace {
   kGrey,
   kRgb,         ///< red, green, blue
@@ -18,3 +20,5 @@ constexpr bool IsStorable(ColourSpace space) {
 constexpr bool ProfileOutlivesConversion(ColourSpace space) {
   return space == ColourSpace::kRgb;
 }
+
+}  // namespace vela

@@ -4,6 +4,8 @@
 
 #include "picture/sample_loops.h"
 
+namespace vela {
+
 ColumnScaler::ColumnScaler(PictureSize from, int channels, const ResizePlan& plan, RowSink& next)
     : channels_(channels),
       rowSize_(static_cast<size_t>(from.width) * static_cast<size_t>(channels)),
@@ -41,3 +43,5 @@ bool ColumnScaler::PutBlock(int rows) {
   }
   return true;
 }
+
+}  // namespace vela

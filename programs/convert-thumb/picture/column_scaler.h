@@ -11,6 +11,8 @@
 #include "picture/row_window.h"
 #include "picture/thumbnail_size.h"
 
+namespace vela {
+
 /// Where overshoot is cut between the two directions, it shows which of them comes first: at hard
 /// edges of full contrast. RowScaler, with the other order, is faster.
 class ColumnScaler final : public RowSink {
@@ -37,3 +39,5 @@ class ColumnScaler final : public RowSink {
   int read_ = 0;
   size_t made_ = 0;
 };
+
+}  // namespace vela

@@ -5,6 +5,8 @@
 #include <cstdint>
 #include <vector>
 
+namespace vela {
+
 /// Rows from the top, pixels from the left, the samples of a pixel side by side: one, three or
 /// four. Samples are finer than those of a JPEG: what one step rounds off, the quantisation of the
 /// JPEG that is made at the end would make many times larger.
@@ -36,3 +38,5 @@ inline uint16_t ToSample(float value) {
   return static_cast<uint16_t>(
       static_cast<int>(rounded < 0 ? 0 : (rounded > kBrightest ? kBrightest : rounded)));
 }
+
+}  // namespace vela

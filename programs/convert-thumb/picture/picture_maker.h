@@ -8,6 +8,8 @@
 #include "picture/sample_loops.h"
 #include "picture/thumbnail_size.h"
 
+namespace vela {
+
 class PictureMaker final : public RowSink {
  public:
   PictureMaker(PictureSize size, int channels) : picture_(size.width, size.height, channels) {}
@@ -24,3 +26,5 @@ class PictureMaker final : public RowSink {
   Picture picture_;
   int next_ = 0;
 };
+
+}  // namespace vela

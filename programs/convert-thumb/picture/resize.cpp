@@ -6,6 +6,8 @@
 #include "picture/picture_maker.h"
 #include "picture/row_scaler.h"
 
+namespace vela {
+
 namespace {
 
 constexpr double kThinningArea = 0.1;
@@ -75,3 +77,5 @@ std::optional<Picture> Resize(RowSource& source, const ResizePlan& plan) {
   PictureMaker maker(plan.size, source.Channels());
   return Resize(source, plan, maker) ? std::optional<Picture>(maker.Take()) : std::nullopt;
 }
+
+}  // namespace vela

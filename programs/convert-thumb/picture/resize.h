@@ -11,6 +11,8 @@
 #include "picture/row_source.h"
 #include "picture/thumbnail_size.h"
 
+namespace vela {
+
 /// How to scale.
 struct ResizePlan {
   PictureSize size;  ///< of the result, both sides at least 1
@@ -42,3 +44,5 @@ bool Resize(RowSource& source, const ResizePlan& plan, RowSink& out);
 
 /// The scaled picture; empty when a row cannot be read.
 std::optional<Picture> Resize(RowSource& source, const ResizePlan& plan);
+
+}  // namespace vela

@@ -3,6 +3,8 @@
 #include <algorithm>
 #include <cmath>
 
+namespace vela {
+
 namespace {
 
 constexpr double kPi = 3.14159265358979323846;
@@ -90,3 +92,5 @@ std::vector<Contribution> MakeContributions(int length, int newLength, int grid,
   }
   return contributions;
 }
+
+}  // namespace vela

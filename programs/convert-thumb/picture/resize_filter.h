@@ -3,6 +3,8 @@
 
 #include <vector>
 
+namespace vela {
+
 /// Shape of the filter.
 enum class FilterKind {
   kLanczos,   ///< sinc windowed by a sinc, three lobes
@@ -21,3 +23,5 @@ struct Contribution {
 /// `grid` above 0 the line is first reduced or stretched to that many samples by taking the nearest
 /// one, and the filter works on these.
 std::vector<Contribution> MakeContributions(int length, int newLength, int grid, FilterKind kind);
+
+}  // namespace vela

@@ -8,6 +8,8 @@
 
 #include "picture/sample_loops.h"
 
+namespace vela {
+
 class RowBlock {
  public:
   /// For the rows of a picture `height` rows high; `rowSize`: samples a row.
@@ -49,3 +51,5 @@ class RowBlock {
   std::vector<float> rows_;
   std::vector<float> lanes_;
 };
+
+}  // namespace vela

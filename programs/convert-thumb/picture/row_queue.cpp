@@ -6,6 +6,8 @@
 
 #include "worker_threads.h"
 
+namespace vela {
+
 namespace {
 
 /// Threads meet once a batch.
@@ -116,3 +118,5 @@ bool RowQueue::PassOn(size_t begin, size_t end) {
 float* RowQueue::Row(size_t number) {
   return rows_.data() + number % kRows * rowSize_;
 }
+
+}  // namespace vela

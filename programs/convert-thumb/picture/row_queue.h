@@ -9,6 +9,8 @@
 
 #include "picture/row_sink.h"
 
+namespace vela {
+
 class RowQueue final : public RowSink {
  public:
   /// `rowSize`: samples a row. `next` has to outlive this and is used by nobody else until Finish.
@@ -46,3 +48,5 @@ class RowQueue final : public RowSink {
   bool failed_ = false;
   std::thread thread_;
 };
+
+}  // namespace vela

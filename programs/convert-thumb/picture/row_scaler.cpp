@@ -1,5 +1,7 @@
 #include "picture/row_scaler.h"
 
+namespace vela {
+
 BlockScaler::BlockScaler(PictureSize from, int channels, const ResizePlan& plan, RowSink& next)
     : channels_(channels),
       columns_(ContributionsOf(from.width, plan.size.width, plan)),
@@ -26,3 +28,5 @@ bool BlockScaler::Put(const float* lanes, int rows) {
 RowScaler::RowScaler(PictureSize from, int channels, const ResizePlan& plan, RowSink& next)
     : block_(static_cast<size_t>(from.width) * static_cast<size_t>(channels), from.height),
       scaler_(from, channels, plan, next) {}
+
+}  // namespace vela

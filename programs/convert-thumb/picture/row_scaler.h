@@ -11,6 +11,8 @@
 #include "picture/row_window.h"
 #include "picture/thumbnail_size.h"
 
+namespace vela {
+
 /// Scales blocks of rows: first from left to right, then from top to bottom.
 class BlockScaler {
  public:
@@ -52,3 +54,5 @@ class RowScaler {
   RowBlock block_;
   BlockScaler scaler_;
 };
+
+}  // namespace vela

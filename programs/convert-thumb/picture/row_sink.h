@@ -1,6 +1,8 @@
 // Takes a picture row by row.
 #pragma once
 
+namespace vela {
+
 class RowSink {
  public:
   virtual ~RowSink() = default;
@@ -14,3 +16,5 @@ class RowSink {
   RowSink(const RowSink&) = default;
   RowSink& operator=(const RowSink&) = default;
 };
+
+}  // namespace vela

@@ -4,6 +4,8 @@
 #include "picture/picture.h"
 #include "picture/sample_loops.h"
 
+namespace vela {
+
 class RowSource {
  public:
   virtual ~RowSource() = default;
@@ -38,3 +40,5 @@ class PictureRows final : public RowSource {
   const Picture& picture_;
   int next_ = 0;
 };
+
+}  // namespace vela

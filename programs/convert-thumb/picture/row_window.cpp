@@ -2,6 +2,8 @@
 
 #include <algorithm>
 
+namespace vela {
+
 namespace {
 
 size_t LongestContribution(const std::vector<Contribution>& contributions) {
@@ -32,3 +34,5 @@ void RowWindow::Filter(const Contribution& contribution, float* out) {
   }
   SumRows(weighted_.data(), weighted_.size(), out, stride_);
 }
+
+}  // namespace vela

@@ -7,6 +7,8 @@
 #include "picture/resize_filter.h"
 #include "picture/sample_loops.h"
 
+namespace vela {
+
 class RowWindow {
  public:
   /// `contributions`: to the rows that will be filtered. `stride`: of a row in memory, samples.
@@ -27,3 +29,5 @@ class RowWindow {
   std::vector<float> rows_;
   std::vector<WeightedRow> weighted_;
 };
+
+}  // namespace vela

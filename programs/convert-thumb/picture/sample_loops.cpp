@@ -5,6 +5,8 @@
 
 #include "picture/picture.h"
 
+namespace vela {
+
 // Chosen when the program starts: the wider instructions where the processor has them.
 #ifdef CONVERT_THUMB_VECTOR_CLONES
 #define VECTOR_CLONES __attribute__((target_clones("arch=x86-64-v4", "arch=x86-64-v3", "default")))
@@ -239,3 +241,5 @@ VECTOR_CLONES void SharpenRow(const float* row, const float* blurred, float amou
     out[i] = Cut(row[i] + difference * share);
   }
 }
+
+}  // namespace vela

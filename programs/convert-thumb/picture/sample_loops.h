@@ -7,6 +7,8 @@
 
 #include "picture/resize_filter.h"
 
+namespace vela {
+
 /// Rows that are scaled from left to right at a time.
 constexpr size_t kBlockRows = 8;
 
@@ -64,3 +66,5 @@ void RoundRow(const float* row, uint8_t* out, size_t size);
 /// difference, doubled, reaches `threshold`.
 void SharpenRow(const float* row, const float* blurred, float amount, float threshold, float* out,
                 size_t size);
+
+}  // namespace vela

@@ -3,6 +3,8 @@
 #include <algorithm>
 #include <cmath>
 
+namespace vela {
+
 namespace {
 
 int ScaledSide(int side, double scale) {
@@ -24,3 +26,5 @@ PictureSize ThumbnailSize(PictureSize size, const ThumbnailBox& box) {
   return {std::min(size.width, ScaledSide(size.width, bounded)),
           std::min(size.height, ScaledSide(size.height, bounded))};
 }
+
+}  // namespace vela

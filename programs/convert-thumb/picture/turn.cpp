@@ -5,6 +5,8 @@
 #include <cstring>
 #include <utility>
 
+namespace vela {
+
 namespace {
 
 void MirrorRow(uint16_t* row, int width, size_t channels) {
@@ -87,3 +89,5 @@ void Straighten(Picture& picture, int orientation) {
     Move(picture, kOrientations[static_cast<size_t>(place)]);
   }
 }
+
+}  // namespace vela

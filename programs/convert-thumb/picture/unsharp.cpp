@@ -5,6 +5,8 @@
 
 #include "picture/sample_loops.h"
 
+namespace vela {
+
 namespace {
 
 constexpr double kSmallestWeight = 1.0 / 65535;
@@ -167,3 +169,5 @@ void Sharpen(Picture& picture, const UnsharpMask& mask) {
     sharpener.Put(row.data());
   }
 }
+
+}  // namespace vela

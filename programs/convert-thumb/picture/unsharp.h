@@ -10,6 +10,8 @@
 #include "picture/sample_loops.h"
 #include "picture/thumbnail_size.h"
 
+namespace vela {
+
 /// Adds to every sample its difference from the blurred picture, as `mask` says.
 void Sharpen(Picture& picture, const UnsharpMask& mask);
 
@@ -52,3 +54,5 @@ class RowSharpener final : public RowSink {
   int read_ = 0;
   int made_ = 0;  ///< rows passed on
 };
+
+}  // namespace vela

@@ -32,6 +32,8 @@
 #include "support/images.h"
 #include "support/seccomp_fail.h"
 
+using namespace vela;
+
 namespace vela_test {
 namespace {
 

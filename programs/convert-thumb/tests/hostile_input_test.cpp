@@ -21,6 +21,8 @@
 #include "support/image_checks.h"
 #include "support/images.h"
 
+using namespace vela;
+
 namespace vela_test {
 namespace {
 

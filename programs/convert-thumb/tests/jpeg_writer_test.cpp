@@ -10,6 +10,8 @@
 
 #include "decoding/jpeg_reader.h"
 
+using namespace vela;
+
 namespace {
 
 constexpr size_t kMemoryLimit = size_t{1} << 26;

@@ -11,6 +11,8 @@
 #include "picture/turn.h"
 #include "picture/unsharp.h"
 
+using namespace vela;
+
 namespace {
 
 using ::testing::ElementsAre;

@@ -5,6 +5,8 @@
 
 #include "command_line.h"
 
+using namespace vela;
+
 namespace vela_test {
 namespace {
 

@@ -11,6 +11,8 @@
 
 #include "worker_threads.h"
 
+using namespace vela;
+
 namespace {
 
 /// Keeps the first sample of every row, up to a row that it refuses.

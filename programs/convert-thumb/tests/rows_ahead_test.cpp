@@ -11,6 +11,8 @@
 
 #include "worker_threads.h"
 
+using namespace vela;
+
 namespace {
 
 constexpr int kWidth = 7;

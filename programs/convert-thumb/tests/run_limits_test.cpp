@@ -19,11 +19,13 @@
 #include "encoding/output_file.h"
 #include "encoding/unfinished_outputs.h"
 #include "imagemagick/image_magick_limits.h"
+#include "posix/file_descriptor.h"
 #include "support/files.h"
 #include "support/images.h"
 #include "support/stub_files.h"
 #include "support/stub_tool.h"
-#include "thumb/descriptor.h"
+
+using namespace vela;
 
 namespace vela_test {
 namespace {
@@ -230,7 +232,7 @@ TEST_F(RunLimits, DoNotLetAPipeHoldTheRun) {
   ProgramOptions options;
   options.timeLimit = std::chrono::seconds(20);
   EXPECT_EQ(RunProgram(ConvertThumbPath(), line.Arguments(), options).exitCode, 1);
-  const Descriptor reader(open(pipe.c_str(), O_RDONLY | O_NONBLOCK | O_CLOEXEC));
+  const FileDescriptor reader(open(pipe.c_str(), O_RDONLY | O_NONBLOCK | O_CLOEXEC));
   ASSERT_TRUE(reader.IsOpen());
   const ProgramResult result = RunProgram(ConvertThumbPath(), line.Arguments(), options);
   EXPECT_EQ(result.exitCode, 1);

@@ -12,8 +12,10 @@
 
 #include "encoding/output_file.h"
 #include "failure_line.h"
-#include "thumb/descriptor.h"
+#include "posix/file_descriptor.h"
 #include "turning/turbojpeg_library.h"
+
+namespace vela {
 
 namespace {
 
@@ -50,7 +52,7 @@ bool CanBeReplaced(int descriptor, const struct stat& status) {
 
 /// Empty when it cannot be replaced, cannot be read, or is larger than `limit` bytes.
 std::optional<FileContent> ReadFile(const std::string& path, size_t limit) {
-  const Descriptor file(
+  const FileDescriptor file(
       open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NOCTTY | O_NONBLOCK | O_NOFOLLOW));
   FileContent content;
   if (!file.IsOpen() || fstat(file.Get(), &content.status) != 0 ||
@@ -130,3 +132,5 @@ FileTurn TurnJpegFile(const std::string& path, int quarterTurns, size_t memoryLi
   TellFailure("cannot replace %s: %s", path.c_str(), std::strerror(errno));
   return FileTurn::kFailed;
 }
+
+}  // namespace vela

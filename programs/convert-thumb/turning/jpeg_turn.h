@@ -4,6 +4,8 @@
 #include <cstddef>
 #include <string>
 
+namespace vela {
+
 /// How an attempt to turn a file ended.
 enum class FileTurn {
   kDone,
@@ -19,3 +21,5 @@ enum class FileTurn {
 /// symbolic link, one with several names or extended attributes, one whose owner, group or
 /// permissions the new one would not have. Called while there is one thread.
 FileTurn TurnJpegFile(const std::string& path, int quarterTurns, size_t memoryLimit);
+
+}  // namespace vela

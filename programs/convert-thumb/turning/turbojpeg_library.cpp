@@ -2,6 +2,8 @@
 
 #include <dlfcn.h>
 
+namespace vela {
+
 namespace {
 
 constexpr char kLibraryName[] = "libturbojpeg.so.0";
@@ -20,3 +22,5 @@ const TurbojpegLibrary* TurbojpegLibrary::Get() {
   static const TurbojpegLibrary library;
   return library.IsLoaded() ? &library : nullptr;
 }
+
+}  // namespace vela

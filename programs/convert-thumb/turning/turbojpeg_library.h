@@ -6,6 +6,8 @@
 
 #include "loaded_library.h"
 
+namespace vela {
+
 /// The functions of libturbojpeg that are used.
 class TurbojpegLibrary final : private LoadedLibrary {
  public:
@@ -21,3 +23,5 @@ class TurbojpegLibrary final : private LoadedLibrary {
  private:
   TurbojpegLibrary();
 };
+
+}  // namespace vela

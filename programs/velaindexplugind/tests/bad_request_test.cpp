@@ -10,6 +10,8 @@
 #include "index_daemon.h"
 #include "request.h"
 
+using namespace vela;
+
 namespace vela_test {
 namespace {
 

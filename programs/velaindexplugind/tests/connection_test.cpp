@@ -11,6 +11,8 @@
 
 #include "request.h"
 
+using namespace vela;
+
 namespace vela_test {
 namespace {
 
@@ -22,10 +24,10 @@ class ConnectionTest : public ::testing::Test {
   ConnectionTest() {
     int ends[2];
     EXPECT_EQ(socketpair(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0, ends), 0);
-    client_ = ::Descriptor(ends[0]);
+    client_ = vela::FileDescriptor(ends[0]);
     const int size = 4096;
     EXPECT_EQ(setsockopt(ends[1], SOL_SOCKET, SO_SNDBUF, &size, sizeof size), 0);
-    connection_ = std::make_unique<Connection>(::Descriptor(ends[1]), begin_);
+    connection_ = std::make_unique<Connection>(vela::FileDescriptor(ends[1]), begin_);
   }
 
   void ClientSends(const std::string& bytes) {
@@ -41,7 +43,7 @@ class ConnectionTest : public ::testing::Test {
   }
 
   const Clock::time_point begin_ = Clock::now();
-  ::Descriptor client_;
+  vela::FileDescriptor client_;
   std::unique_ptr<Connection> connection_;
 };
 

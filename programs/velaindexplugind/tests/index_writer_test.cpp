@@ -12,6 +12,8 @@
 
 #include "index_daemon.h"
 
+using namespace vela;
+
 namespace vela_test {
 namespace {
 

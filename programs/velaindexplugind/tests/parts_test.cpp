@@ -12,6 +12,8 @@
 #include "request.h"
 #include "whole_number.h"
 
+using namespace vela;
+
 namespace vela_test {
 namespace {
 

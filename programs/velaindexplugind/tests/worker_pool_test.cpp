@@ -9,6 +9,8 @@
 #include <utility>
 #include <vector>
 
+using namespace vela;
+
 namespace vela_test {
 namespace {
 

@@ -16,6 +16,8 @@
 #include "support/daemon_peer.h"
 #include "support/files.h"
 
+using namespace vela;
+
 namespace vela_test {
 namespace {
 

@@ -16,6 +16,8 @@
 #include "support/profile_file.h"
 #include "support/stub_tool.h"
 
+using namespace vela;
+
 namespace vela_test {
 namespace {
 

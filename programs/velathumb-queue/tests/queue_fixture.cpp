@@ -14,6 +14,8 @@
 #include "support/images.h"
 #include "support/profile_file.h"
 
+using namespace vela;
+
 namespace vela_test {
 
 namespace {

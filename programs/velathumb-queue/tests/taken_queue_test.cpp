@@ -23,6 +23,8 @@
 #include "support/mounts.h"
 #include "support/privileges.h"
 
+using namespace vela;
+
 namespace vela_test {
 namespace {
 

@@ -11,6 +11,8 @@
 #include "support/quadrants.h"
 #include "support/sandbox.h"
 
+using namespace vela;
+
 namespace vela_test {
 namespace {
 

@@ -7,6 +7,8 @@
 #include "platform/velaindex.h"
 #include "support/files.h"
 
+using namespace vela;
+
 namespace vela_test {
 
 namespace {

@@ -28,6 +28,8 @@
 #include "support/sandbox.h"
 #include "support/seccomp_fail.h"
 
+using namespace vela;
+
 namespace vela_test {
 namespace {
 

@@ -6,6 +6,8 @@
 #include <algorithm>
 #include <string>
 
+using namespace vela;
+
 namespace vela_test {
 namespace {
 

@@ -5,6 +5,8 @@
 
 #include <limits>
 
+using namespace vela;
+
 namespace vela_test {
 namespace {
 

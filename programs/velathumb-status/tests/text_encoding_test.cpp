@@ -7,6 +7,8 @@
 
 #include "json_report.h"
 
+using namespace vela;
+
 namespace vela_test {
 namespace {
 

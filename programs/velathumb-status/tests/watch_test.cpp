@@ -22,6 +22,8 @@
 #include "support/sandbox.h"
 #include "terminal.h"
 
+using namespace vela;
+
 namespace vela_test {
 namespace {
 

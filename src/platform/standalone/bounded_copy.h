@@ -5,7 +5,7 @@
 #include <cstring>
 #include <string_view>
 
-namespace velaplatform {
+namespace vela {
 
 /// Copies `text` to `out` (at most `outSize` bytes, always terminated); what does not fit is cut.
 inline void CopyCut(std::string_view text, char* out, size_t outSize) {
@@ -15,4 +15,4 @@ inline void CopyCut(std::string_view text, char* out, size_t outSize) {
   out[length] = '\0';
 }
 
-}  // namespace velaplatform
+}  // namespace vela

@@ -9,10 +9,10 @@
 #include <mutex>
 #include <string_view>
 
-#include "platform/standalone/file_content.h"
 #include "platform/standalone/last_error.h"
 #include "platform/standalone/white_space.h"
 #include "platform/velautils.h"
+#include "posix/file_content.h"
 
 namespace VELAUtils {
 
@@ -96,7 +96,7 @@ char* LineFeed::Copy(char* buffer, size_t size) {
 bool LineFeed::PrepareLine() {
   if (text_.empty() || !isFaultless_) return false;
   given_ = 0;
-  isFaultless_ = PrepareText(velaplatform::Trimmed(TakeLine()));
+  isFaultless_ = PrepareText(vela::Trimmed(TakeLine()));
   return isFaultless_;
 }
 
@@ -120,7 +120,7 @@ bool LineFeed::PrepareText(std::string_view line) {
 
 bool LineFeed::PrepareSection(std::string_view line) {
   if (line.find(']') != line.size() - 1) return false;
-  const std::string_view name = velaplatform::Trimmed(line.substr(1, line.size() - 2));
+  const std::string_view name = vela::Trimmed(line.substr(1, line.size() - 2));
   if (name.empty()) return false;
   const auto known = std::find_if(sections_.begin(), sections_.end(),
                                   [&](const Section& section) { return section.name == name; });
@@ -133,7 +133,7 @@ bool LineFeed::PrepareSection(std::string_view line) {
 bool LineFeed::PreparePair(std::string_view line) {
   const size_t equals = line.find('=');
   if (equals == std::string_view::npos) return false;
-  key_ = velaplatform::Trimmed(line.substr(0, equals));
+  key_ = vela::Trimmed(line.substr(0, equals));
   if (key_.empty()) return false;
   line_ = "key";
   line_.append(line.substr(equals));
@@ -193,14 +193,14 @@ ConfParser::~ConfParser() = default;
 bool ConfParser::loadFromFile(const std::string& path) {
   content_->sections.clear();
   std::string text;
-  const int error = velaplatform::ReadFile(path.c_str(), text);
+  const int error = vela::ReadFile(path.c_str(), text);
   if (error != 0) {
-    velaplatform::SetLastError(error);
+    vela::SetLastError(error);
     return false;
   }
   std::vector<Section> sections;
   if (text.size() > kFileSizeMax || !Parse(text, sections)) {
-    velaplatform::SetLastError(EINVAL);
+    vela::SetLastError(EINVAL);
     return false;
   }
   content_->sections = std::move(sections);

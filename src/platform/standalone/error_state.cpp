@@ -21,7 +21,7 @@ const char* BaseName(const char* path) {
 
 }  // namespace
 
-namespace velaplatform {
+namespace vela {
 
 void SetLastError(int code, const char* file, int line) {
   g_lastError = {code, BaseName(file), line};
@@ -32,7 +32,7 @@ int Fail(int code, const char* file, int line) {
   return -1;
 }
 
-}  // namespace velaplatform
+}  // namespace vela
 
 int VLIBCErrGet(void) {
   return g_lastError.code;

@@ -8,7 +8,7 @@
 
 namespace {
 
-using velaplatform::Fail;
+using vela::Fail;
 
 constexpr int kSetAccessTime = 1;
 constexpr int kSetModificationTime = 2;

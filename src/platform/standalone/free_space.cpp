@@ -7,13 +7,13 @@
 
 uint64_t VLIBGetFsAvailSize(const char* path) {
   if (path == nullptr) {
-    velaplatform::SetLastError(EINVAL);
+    vela::SetLastError(EINVAL);
     return 0;
   }
   struct statvfs volume;
   while (statvfs(path, &volume) != 0) {
     if (errno == EINTR) continue;
-    velaplatform::SetLastError(errno);
+    vela::SetLastError(errno);
     return 0;
   }
   return static_cast<uint64_t>(volume.f_bavail) * volume.f_frsize;

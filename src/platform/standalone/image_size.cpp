@@ -18,8 +18,8 @@
 
 namespace {
 
-using velaplatform::Fail;
-using velaplatform::PixelSize;
+using vela::Fail;
+using vela::PixelSize;
 
 /// The library's XMP parts are not safe to use from several threads without this.
 void LockXmp(void* mutex, bool isLock) {
@@ -85,7 +85,7 @@ void ReadHeader(Exiv2::Image& image) {
 /// Returns an empty size when there is none to be read.
 PixelSize ReadPixelSize(const char* path) {
   const std::unique_ptr<Exiv2::Image> image = OpenImage(path);
-  if (!image) return velaplatform::ReadPpmSize(path);
+  if (!image) return vela::ReadPpmSize(path);
   if (!IsPhotoType(image->imageType())) return {};
   ReadHeader(*image);
   const PixelSize size{image->pixelWidth(), image->pixelHeight()};

@@ -12,15 +12,15 @@
 #include <string_view>
 #include <thread>
 
-#include "platform/standalone/deadline.h"
-#include "platform/standalone/file_descriptor.h"
 #include "platform/standalone/index_schema.h"
 #include "platform/standalone/last_error.h"
 #include "platform/velaindex.h"
+#include "posix/deadline.h"
+#include "posix/file_descriptor.h"
 
 namespace {
 
-using velaplatform::Fail;
+using vela::Fail;
 
 /// The index tells the names of everybody's photos, also of those in closed directories.
 constexpr mode_t kDirectoryMode = 0750;
@@ -61,12 +61,12 @@ int ToErrno(int sqliteCode) {
 /// Makes the database's directory, with its mode whatever the process's mask. Returns whether it is
 /// there, also when another process was faster.
 bool MakeDirectory() {
-  if (mkdir(velaplatform::kIndexDirectory, kDirectoryMode) != 0) return errno == EEXIST;
-  return chmod(velaplatform::kIndexDirectory, kDirectoryMode) == 0;
+  if (mkdir(vela::kIndexDirectory, kDirectoryMode) != 0) return errno == EEXIST;
+  return chmod(vela::kIndexDirectory, kDirectoryMode) == 0;
 }
 
 int CreateNewFile() {
-  return open(velaplatform::kIndexDatabase, O_RDWR | O_CREAT | O_EXCL | O_CLOEXEC, kFileMode);
+  return open(vela::kIndexDatabase, O_RDWR | O_CREAT | O_EXCL | O_CLOEXEC, kFileMode);
 }
 
 /// Makes the database's file, empty, when it is missing, with its mode whatever the process's mask:
@@ -74,7 +74,7 @@ int CreateNewFile() {
 void MakeFile() {
   int made = CreateNewFile();
   if (made < 0 && errno == ENOENT && MakeDirectory()) made = CreateNewFile();
-  const velaplatform::FileDescriptor file(made);
+  const vela::FileDescriptor file(made);
   if (made >= 0) fchmod(made, kFileMode);
 }
 
@@ -142,7 +142,7 @@ int IndexDatabase::Run(const StatementHandle& statement) {
 int IndexDatabase::OpenFile() {
   constexpr int kFlags = SQLITE_OPEN_READWRITE | SQLITE_OPEN_NOMUTEX;
   sqlite3* database = nullptr;
-  const int code = sqlite3_open_v2(velaplatform::kIndexDatabase, &database, kFlags, nullptr);
+  const int code = sqlite3_open_v2(vela::kIndexDatabase, &database, kFlags, nullptr);
   database_.reset(database);
   return ToErrno(code);
 }
@@ -150,10 +150,10 @@ int IndexDatabase::OpenFile() {
 /// The library does not wait for other programs in all statements; this does.
 int IndexDatabase::ExecuteOnceFree(const char* sql) {
   constexpr std::chrono::milliseconds kPause(5);
-  const auto end = velaplatform::Deadline::Clock::now() +
-                   std::chrono::milliseconds(velaplatform::kIndexBusyTimeout);
+  const auto end =
+      vela::Deadline::Clock::now() + std::chrono::milliseconds(vela::kIndexBusyTimeout);
   int error = Execute(sql);
-  while (error == EBUSY && velaplatform::Deadline::Clock::now() < end) {
+  while (error == EBUSY && vela::Deadline::Clock::now() < end) {
     std::this_thread::sleep_for(kPause);
     error = Execute(sql);
   }
@@ -161,7 +161,7 @@ int IndexDatabase::ExecuteOnceFree(const char* sql) {
 }
 
 int IndexDatabase::Configure() {
-  sqlite3_busy_timeout(database_.get(), velaplatform::kIndexBusyTimeout);
+  sqlite3_busy_timeout(database_.get(), vela::kIndexBusyTimeout);
   // A checkpoint at the close would wait for the disk, and would remove the log by its name even if
   // that belongs to a new database by then.
   sqlite3_db_config(database_.get(), SQLITE_DBCONFIG_NO_CKPT_ON_CLOSE, 1, nullptr);
@@ -183,7 +183,7 @@ int IndexDatabase::CheckVersion(int& version) {
   version = sqlite3_column_int(version_.get(), 0);
   const int error = ToErrno(sqlite3_reset(version_.get()));
   if (error != 0) return error;
-  return version > velaplatform::kIndexSchemaVersion ? EPROTONOSUPPORT : 0;
+  return version > vela::kIndexSchemaVersion ? EPROTONOSUPPORT : 0;
 }
 
 int IndexDatabase::Finish(int error) {
@@ -197,15 +197,15 @@ int IndexDatabase::MakeTables() {
   if (error != 0) return error;
   int version = 0;
   error = CheckVersion(version);
-  const bool isMissing = version < velaplatform::kIndexSchemaVersion;
-  if (error == 0 && isMissing) error = Execute(velaplatform::kIndexSchema);
+  const bool isMissing = version < vela::kIndexSchemaVersion;
+  if (error == 0 && isMissing) error = Execute(vela::kIndexSchema);
   return Finish(error);
 }
 
 int IndexDatabase::EnsureTables() {
   int version = 0;
   const int error = CheckVersion(version);
-  const bool isMissing = version < velaplatform::kIndexSchemaVersion;
+  const bool isMissing = version < vela::kIndexSchemaVersion;
   return error == 0 && isMissing ? MakeTables() : error;
 }
 
@@ -215,7 +215,7 @@ int IndexDatabase::Open() {
   if (error == 0) error = Configure();
   if (error == 0) error = PrepareStatements();
   if (error == 0) error = EnsureTables();
-  if (error == 0) error = Prepare(velaplatform::kReplaceConversion, replace_);
+  if (error == 0) error = Prepare(vela::kReplaceConversion, replace_);
   return error;
 }
 

@@ -1,7 +1,7 @@
 // The embedded index database, for all programs that use it.
 #pragma once
 
-namespace velaplatform {
+namespace vela {
 
 constexpr const char* kIndexDirectory = "/var/lib/velaindex";
 constexpr const char* kIndexDatabase = "/var/lib/velaindex/index.db";
@@ -30,4 +30,4 @@ constexpr const char* kIndexSchema =
 constexpr const char* kReplaceConversion =
     "INSERT OR REPLACE INTO conversion VALUES (?1, ?2, ?3, ?4, ?5, ?6, ?7)";
 
-}  // namespace velaplatform
+}  // namespace vela

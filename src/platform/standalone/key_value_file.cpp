@@ -7,18 +7,18 @@
 #include <string>
 
 #include "platform/standalone/bounded_copy.h"
-#include "platform/standalone/file_content.h"
-#include "platform/standalone/file_descriptor.h"
-#include "platform/standalone/file_lock.h"
-#include "platform/standalone/file_replacement.h"
 #include "platform/standalone/key_value_text.h"
 #include "platform/standalone/last_error.h"
 #include "platform/vlibc.h"
+#include "posix/file_content.h"
+#include "posix/file_descriptor.h"
+#include "posix/file_lock.h"
+#include "posix/file_replacement.h"
 
 namespace {
 
-using velaplatform::Fail;
-using velaplatform::FileDescriptor;
+using vela::Fail;
+using vela::FileDescriptor;
 
 struct FreeMemory {
   void operator()(char* memory) const { free(memory); }
@@ -36,7 +36,7 @@ int FollowLink(std::string& path) {
 enum class Attempt { kDone, kAgain };
 
 int CreateWithValue(std::string& path, const char* key, const char* value, Attempt& attempt) {
-  const int error = velaplatform::CreateWhole(path, velaplatform::WithValue("", key, value));
+  const int error = vela::CreateWhole(path, vela::WithValue("", key, value));
   if (error != EEXIST) return error;
   // Another process was faster, or a link leads to a file that is not there.
   struct stat named;
@@ -55,17 +55,17 @@ int CheckIdentity(std::string& path, const struct stat& locked, Attempt& attempt
   attempt = Attempt::kAgain;
   if (lstat(path.c_str(), &named) != 0) return errno == ENOENT ? 0 : errno;
   if (S_ISLNK(named.st_mode)) return FollowLink(path);
-  if (velaplatform::IsSameFile(locked, named)) attempt = Attempt::kDone;
+  if (vela::IsSameFile(locked, named)) attempt = Attempt::kDone;
   return 0;
 }
 
 int TrySetValue(std::string& path, const char* key, const char* value, Attempt& attempt) {
   attempt = Attempt::kDone;
   const FileDescriptor file(open(path.c_str(), O_RDWR | O_CLOEXEC | O_NONBLOCK | O_NOCTTY));
-  if (!file) {
+  if (!file.IsOpen()) {
     return errno == ENOENT ? CreateWithValue(path, key, value, attempt) : errno;
   }
-  int error = velaplatform::LockExclusively(file.Get());
+  int error = vela::LockExclusively(file.Get());
   if (error != 0) return error;
 
   struct stat locked;
@@ -75,29 +75,29 @@ int TrySetValue(std::string& path, const char* key, const char* value, Attempt& 
   if (error != 0 || attempt == Attempt::kAgain) return error;
 
   std::string text;
-  error = velaplatform::ReadToEnd(file.Get(), text);
+  error = vela::ReadToEnd(file.Get(), text);
   if (error != 0) return error;
-  return velaplatform::ReplaceWhole(path, velaplatform::WithValue(text, key, value), locked);
+  return vela::ReplaceWhole(path, vela::WithValue(text, key, value), locked);
 }
 
 }  // namespace
 
 int VLIBCFileGetKeyValue(const char* file, const char* key, char* out, size_t outSize,
                          int /*flags*/) {
-  velaplatform::CopyCut("", out, outSize);
+  vela::CopyCut("", out, outSize);
   if (file == nullptr || key == nullptr) return Fail(EINVAL);
   std::string text;
-  const int error = velaplatform::ReadFile(file, text);
+  const int error = vela::ReadFile(file, text);
   if (error != 0) return Fail(error);
-  const auto value = velaplatform::FindValue(text, key);
+  const auto value = vela::FindValue(text, key);
   if (!value) return 0;
-  velaplatform::CopyCut(*value, out, outSize);
+  vela::CopyCut(*value, out, outSize);
   return 1;
 }
 
 int VLIBCFileSetKeyValue(const char* file, const char* key, const char* value, int /*flags*/) {
   if (file == nullptr || key == nullptr || value == nullptr) return Fail(EINVAL);
-  if (!velaplatform::IsStorable(key, value)) return Fail(EINVAL);
+  if (!vela::IsStorable(key, value)) return Fail(EINVAL);
   std::string path(file);
   Attempt attempt = Attempt::kAgain;
   while (attempt == Attempt::kAgain) {
@@ -109,15 +109,15 @@ int VLIBCFileSetKeyValue(const char* file, const char* key, const char* value, i
 
 int VLIBCFileCheckKeyValue(const char* file, const char* key, const char* value, int /*flags*/) {
   if (file == nullptr || key == nullptr || value == nullptr) {
-    velaplatform::SetLastError(EINVAL);
+    vela::SetLastError(EINVAL);
     return 0;
   }
   std::string text;
-  const int error = velaplatform::ReadFile(file, text);
+  const int error = vela::ReadFile(file, text);
   if (error != 0) {
-    velaplatform::SetLastError(error);
+    vela::SetLastError(error);
     return 0;
   }
-  const auto found = velaplatform::FindValue(text, key);
+  const auto found = vela::FindValue(text, key);
   return found && *found == value ? 1 : 0;
 }

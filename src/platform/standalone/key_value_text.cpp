@@ -2,7 +2,7 @@
 
 #include "platform/standalone/white_space.h"
 
-namespace velaplatform {
+namespace vela {
 
 namespace {
 
@@ -112,4 +112,4 @@ bool IsStorable(std::string_view key, std::string_view value) {
   return value.find('\n') == std::string_view::npos;
 }
 
-}  // namespace velaplatform
+}  // namespace vela

@@ -5,7 +5,7 @@
 #include <string>
 #include <string_view>
 
-namespace velaplatform {
+namespace vela {
 
 /// Returns the value of the first line of `text` that carries `key`.
 std::optional<std::string> FindValue(std::string_view text, std::string_view key);
@@ -17,4 +17,4 @@ std::string WithValue(std::string_view text, std::string_view key, std::string_v
 /// Returns whether a line can hold the pair so that the same pair is read back.
 bool IsStorable(std::string_view key, std::string_view value);
 
-}  // namespace velaplatform
+}  // namespace vela

@@ -1,7 +1,7 @@
 // The error of the calling thread's last platform failure.
 #pragma once
 
-namespace velaplatform {
+namespace vela {
 
 /// Keeps `code` (an errno value) and the caller's place in the source as the calling thread's last
 /// failure. Leaves errno as it is.
@@ -10,4 +10,4 @@ void SetLastError(int code, const char* file = __builtin_FILE(), int line = __bu
 /// The same for functions that report a failure by -1, which it returns.
 int Fail(int code, const char* file = __builtin_FILE(), int line = __builtin_LINE());
 
-}  // namespace velaplatform
+}  // namespace vela

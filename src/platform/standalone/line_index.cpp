@@ -7,7 +7,7 @@
 #include <new>
 #include <string>
 
-namespace velaplatform {
+namespace vela {
 
 namespace {
 
@@ -113,4 +113,4 @@ bool LineIndex::Holds(int fd, std::string_view text) const {
   return false;
 }
 
-}  // namespace velaplatform
+}  // namespace vela

@@ -7,7 +7,7 @@
 #include <string_view>
 #include <vector>
 
-namespace velaplatform {
+namespace vela {
 
 /// The lines of one version of a file.
 class LineIndex {
@@ -34,4 +34,4 @@ class LineIndex {
   std::vector<Line> lines_;  // by hash
 };
 
-}  // namespace velaplatform
+}  // namespace vela

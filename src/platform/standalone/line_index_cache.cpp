@@ -7,11 +7,11 @@
 #include <mutex>
 #include <string>
 
-#include "platform/standalone/file_descriptor.h"
-#include "platform/standalone/file_version.h"
 #include "platform/standalone/line_index.h"
+#include "posix/file_descriptor.h"
+#include "posix/file_version.h"
 
-namespace velaplatform {
+namespace vela {
 
 namespace {
 
@@ -56,7 +56,8 @@ std::optional<bool> LineIndexCache::Find(const char* path, std::string_view text
   if (!file->index.MayHold(text)) return false;
 
   const FileDescriptor fd(open(path, O_RDONLY | O_CLOEXEC | O_NONBLOCK | O_NOCTTY));
-  if (!fd || fstat(fd.Get(), &now) != 0 || !IsSameVersion(file->version, now)) return std::nullopt;
+  if (!fd.IsOpen() || fstat(fd.Get(), &now) != 0 || !IsSameVersion(file->version, now))
+    return std::nullopt;
   return file->index.Holds(fd.Get(), text);
 }
 
@@ -102,4 +103,4 @@ void IndexLines(const char* path, int fd) {
   Cache().Add(std::move(file));
 }
 
-}  // namespace velaplatform
+}  // namespace vela

@@ -4,7 +4,7 @@
 #include <optional>
 #include <string_view>
 
-namespace velaplatform {
+namespace vela {
 
 /// Tells from the index of the file `path` whether a line of it equals the text. Returns nothing
 /// when there is no index of the file's present version. Callable from any thread.
@@ -14,4 +14,4 @@ std::optional<bool> FindLineInIndex(const char* path, std::string_view text);
 /// is then worth remembering. Moves the read position; a failure leaves no index.
 void IndexLines(const char* path, int fd);
 
-}  // namespace velaplatform
+}  // namespace vela

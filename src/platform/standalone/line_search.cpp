@@ -7,14 +7,14 @@
 #include <string_view>
 
 #include "platform/standalone/bounded_copy.h"
-#include "platform/standalone/file_descriptor.h"
 #include "platform/standalone/last_error.h"
 #include "platform/standalone/line_index_cache.h"
 #include "platform/vlibc.h"
+#include "posix/file_descriptor.h"
 
 namespace {
 
-using velaplatform::Fail;
+using vela::Fail;
 
 constexpr size_t kChunkSize = 65536;
 
@@ -81,8 +81,8 @@ int FindLine(int fd, std::string_view wanted, bool& isFound) {
 
 /// Searches the open file `fd`, found at `path`. Sets `isFound`. Returns 0 or an errno value.
 int FindLineInFile(const char* path, int fd, std::string_view wanted, bool& isFound) {
-  velaplatform::IndexLines(path, fd);
-  if (const auto known = velaplatform::FindLineInIndex(path, wanted)) {
+  vela::IndexLines(path, fd);
+  if (const auto known = vela::FindLineInIndex(path, wanted)) {
     isFound = *known;
     return 0;
   }
@@ -91,19 +91,19 @@ int FindLineInFile(const char* path, int fd, std::string_view wanted, bool& isFo
 }
 
 int SearchFile(const char* path, std::string_view wanted, bool& isFound) {
-  if (const auto known = velaplatform::FindLineInIndex(path, wanted)) {
+  if (const auto known = vela::FindLineInIndex(path, wanted)) {
     isFound = *known;
     return 0;
   }
-  const velaplatform::FileDescriptor fd(open(path, O_RDONLY | O_CLOEXEC | O_NONBLOCK | O_NOCTTY));
-  if (!fd) return errno;
+  const vela::FileDescriptor fd(open(path, O_RDONLY | O_CLOEXEC | O_NONBLOCK | O_NOCTTY));
+  if (!fd.IsOpen()) return errno;
   return FindLineInFile(path, fd.Get(), wanted, isFound);
 }
 
 }  // namespace
 
 int VLIBCFileGetLine(const char* file, const char* text, char* out, size_t outSize, int /*flags*/) {
-  velaplatform::CopyCut("", out, outSize);
+  vela::CopyCut("", out, outSize);
   if (file == nullptr || text == nullptr) return Fail(EINVAL);
   const std::string_view wanted(text);
   if (wanted.size() > INT_MAX) return Fail(EOVERFLOW);
@@ -112,6 +112,6 @@ int VLIBCFileGetLine(const char* file, const char* text, char* out, size_t outSi
   const int error = SearchFile(file, wanted, isFound);
   if (error != 0) return Fail(error);
   if (!isFound) return 0;
-  velaplatform::CopyCut(wanted, out, outSize);
+  vela::CopyCut(wanted, out, outSize);
   return static_cast<int>(wanted.size());
 }

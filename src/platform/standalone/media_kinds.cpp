@@ -66,7 +66,7 @@ bool IsIn(const std::array<Extension, N>& table, std::string_view extension) {
 }
 
 std::string_view ExtensionOfPath(const char* path) {
-  return path == nullptr ? std::string_view() : velaplatform::ExtensionOf(path);
+  return path == nullptr ? std::string_view() : vela::ExtensionOf(path);
 }
 
 bool IsPhoto(std::string_view extension) {

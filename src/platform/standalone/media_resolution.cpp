@@ -7,8 +7,8 @@
 
 namespace {
 
-using velaplatform::Fail;
-using velaplatform::VideoContainer;
+using vela::Fail;
+using vela::VideoContainer;
 
 bool ReadSize(const VideoContainer& container, VELA_RESOLUTION& resolution) {
   const AVStream* picture = container.Picture();

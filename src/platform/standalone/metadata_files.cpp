@@ -14,7 +14,7 @@
 
 namespace {
 
-using velaplatform::Fail;
+using vela::Fail;
 
 constexpr std::string_view kMetadataDirectory = "@eaDir";
 
@@ -71,7 +71,7 @@ int Remove(const DerivedPath& path) {
 }  // namespace
 
 int IndexIsPathSupportEAWrite(const char* dir) {
-  if (dir == nullptr || velaplatform::HasComponent(dir, kMetadataDirectory)) return 0;
+  if (dir == nullptr || vela::HasComponent(dir, kMetadataDirectory)) return 0;
   if (IsDirExist(dir) == 0) return 0;
   return faccessat(AT_FDCWD, dir, W_OK | X_OK, AT_EACCESS) == 0 ? 1 : 0;
 }
@@ -79,9 +79,9 @@ int IndexIsPathSupportEAWrite(const char* dir) {
 int VELAEADirPath(int /*flags*/, const char* path, char* out, size_t outSize) {
   if (path == nullptr || out == nullptr) return Fail(EINVAL);
   const std::string_view whole(path);
-  const std::string_view file = velaplatform::LastComponentOf(whole);
+  const std::string_view file = vela::LastComponentOf(whole);
   if (file.empty()) return Fail(EINVAL);
-  if (velaplatform::HasComponent(whole, kMetadataDirectory)) return Fail(EINVAL);
+  if (vela::HasComponent(whole, kMetadataDirectory)) return Fail(EINVAL);
   const std::string_view directory = whole.substr(0, whole.size() - file.size());
   if (!Join({directory, kMetadataDirectory, "/", file}, out, outSize)) return Fail(ENAMETOOLONG);
   return 0;

@@ -14,7 +14,7 @@ std::string GetPathDirName(const std::string& path) {
 }
 
 std::string GetPathExt(const std::string& path) {
-  return std::string(velaplatform::ExtensionOf(path));
+  return std::string(vela::ExtensionOf(path));
 }
 
 }  // namespace VELAUtils
@@ -22,5 +22,5 @@ std::string GetPathExt(const std::string& path) {
 const char* VELAIndexExtGet(const char* path) {
   if (path == nullptr) return "";
   // The extension ends where the path ends, so its text is terminated as well.
-  return velaplatform::ExtensionOf(path).data();
+  return vela::ExtensionOf(path).data();
 }

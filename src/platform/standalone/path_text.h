@@ -3,7 +3,7 @@
 
 #include <string_view>
 
-namespace velaplatform {
+namespace vela {
 
 /// Returns the last component of `path`: what follows its last slash.
 constexpr std::string_view LastComponentOf(std::string_view path) {
@@ -29,4 +29,4 @@ constexpr bool HasComponent(std::string_view path, std::string_view component) {
   }
 }
 
-}  // namespace velaplatform
+}  // namespace vela

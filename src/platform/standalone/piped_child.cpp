@@ -11,17 +11,17 @@
 #include <utility>
 #include <vector>
 
-#include "platform/standalone/child_process.h"
-#include "platform/standalone/child_watchdog.h"
-#include "platform/standalone/file_descriptor.h"
 #include "platform/standalone/last_error.h"
 #include "platform/standalone/settings.h"
 #include "platform/vlibc.h"
+#include "posix/child_process.h"
+#include "posix/child_watchdog.h"
+#include "posix/file_descriptor.h"
 
 namespace {
 
-using velaplatform::ChildWatchdog;
-using velaplatform::FileDescriptor;
+using vela::ChildWatchdog;
+using vela::FileDescriptor;
 
 /// A child with the stream that its output comes through.
 struct PipedChild {
@@ -63,12 +63,12 @@ PipedChildren& OpenChildren() {
 /// Ends a child that cannot be handed out.
 void Abandon(PipedChild& child) {
   kill(child.pid, SIGKILL);
-  velaplatform::ReapChild(child.pid);
+  vela::ReapChild(child.pid);
 }
 
 /// Returns 0 or an errno value.
 int Watch(PipedChild& child, const char* program) {
-  const std::chrono::seconds limit = velaplatform::CurrentSettings().toolTimeout;
+  const std::chrono::seconds limit = vela::CurrentSettings().toolTimeout;
   if (limit.count() == 0) return 0;
   child.watchdog = std::make_unique<ChildWatchdog>();
   return child.watchdog->Start(child.pid, program, limit) ? 0 : EAGAIN;
@@ -80,8 +80,8 @@ int Open(const char* program, std::vector<char*>& arguments, bool joinError, Pip
   if (pipe2(ends, O_CLOEXEC) != 0) return errno;
   FileDescriptor readEnd(ends[0]);
   FileDescriptor writeEnd(ends[1]);
-  const velaplatform::ChildStreams streams{writeEnd.Get(), joinError ? writeEnd.Get() : -1};
-  int error = velaplatform::StartChild(program, arguments.data(), streams, child.pid);
+  const vela::ChildStreams streams{writeEnd.Get(), joinError ? writeEnd.Get() : -1};
+  int error = vela::StartChild(program, arguments.data(), streams, child.pid);
   if (error != 0) return error;
   writeEnd.Reset();
 
@@ -103,7 +103,7 @@ int Open(const char* program, std::vector<char*>& arguments, bool joinError, Pip
 
 FILE* VLIBCPopen(const char* program, const char* mode, ...) {
   if (program == nullptr || mode == nullptr || mode[0] != 'r') {
-    velaplatform::SetLastError(EINVAL);
+    vela::SetLastError(EINVAL);
     return nullptr;
   }
   std::vector<char*> arguments{const_cast<char*>(program)};
@@ -117,7 +117,7 @@ FILE* VLIBCPopen(const char* program, const char* mode, ...) {
   const bool joinError = strchr(mode + 1, 'E') != nullptr;
   const int error = Open(program, arguments, joinError, child);
   if (error != 0) {
-    velaplatform::SetLastError(error);
+    vela::SetLastError(error);
     return nullptr;
   }
   FILE* stream = child.stream;
@@ -127,13 +127,13 @@ FILE* VLIBCPopen(const char* program, const char* mode, ...) {
 
 int VLIBCPclose(FILE* stream) {
   const PipedChild child = OpenChildren().Take(stream);
-  if (stream == nullptr || child.stream == nullptr) return velaplatform::Fail(EINVAL);
+  if (stream == nullptr || child.stream == nullptr) return vela::Fail(EINVAL);
   // A child that still writes learns from the closed pipe that nobody listens. One that does not
   // care goes on to its own end or its time limit.
   fclose(stream);
-  velaplatform::AwaitChild(child.pid);
+  vela::AwaitChild(child.pid);
   if (child.watchdog) child.watchdog->Stop();
-  const int status = velaplatform::ReapChild(child.pid);
-  if (status == -1) return velaplatform::Fail(ECHILD);
-  return WIFEXITED(status) ? WEXITSTATUS(status) : velaplatform::Fail(EINTR);
+  const int status = vela::ReapChild(child.pid);
+  if (status == -1) return vela::Fail(ECHILD);
+  return WIFEXITED(status) ? WEXITSTATUS(status) : vela::Fail(EINTR);
 }

@@ -3,7 +3,7 @@
 
 #include <cstdint>
 
-namespace velaplatform {
+namespace vela {
 
 /// Pixels, as stored; zero or less when there is no size.
 struct PixelSize {
@@ -11,4 +11,4 @@ struct PixelSize {
   int64_t height = 0;
 };
 
-}  // namespace velaplatform
+}  // namespace vela

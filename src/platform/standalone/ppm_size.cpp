@@ -9,7 +9,7 @@ extern "C" {
 #include <netpbm/ppm.h>
 }
 
-namespace velaplatform {
+namespace vela {
 
 namespace {
 
@@ -61,4 +61,4 @@ PixelSize ReadPpmSize(const char* path) {
   return {width, height};
 }
 
-}  // namespace velaplatform
+}  // namespace vela

@@ -3,9 +3,9 @@
 
 #include "platform/standalone/pixel_size.h"
 
-namespace velaplatform {
+namespace vela {
 
 /// Reads the header of the file at `path`; an empty size when it is no portable pixmap.
 PixelSize ReadPpmSize(const char* path);
 
-}  // namespace velaplatform
+}  // namespace vela

@@ -7,13 +7,13 @@
 #include <cerrno>
 #include <cstring>
 
-#include "platform/standalone/file_descriptor.h"
 #include "platform/standalone/last_error.h"
 #include "platform/vlibc.h"
+#include "posix/file_descriptor.h"
 
 namespace {
 
-using velaplatform::FileDescriptor;
+using vela::FileDescriptor;
 
 constexpr size_t kCommandNameMax = 15;  // the kernel cuts command names to this length
 
@@ -48,7 +48,7 @@ size_t ReadProcessFile(int processTable, const char* pidName, const char* file, 
   memcpy(path, pidName, pidLength);
   memcpy(path + pidLength, file, fileSize);
   const FileDescriptor descriptor(openat(processTable, path, O_RDONLY | O_CLOEXEC));
-  if (!descriptor) return 0;
+  if (!descriptor.IsOpen()) return 0;
   const ssize_t got = read(descriptor.Get(), out, outSize);
   return got > 0 ? static_cast<size_t>(got) : 0;
 }
@@ -88,7 +88,7 @@ int SignalMatching(int processTable, const KernelEntry& entry, const Order& orde
 /// Returns the number of processes signalled, or -1 with errno set.
 int SignalAll(const Order& order) {
   const FileDescriptor processTable(open("/proc", O_RDONLY | O_DIRECTORY | O_CLOEXEC));
-  if (!processTable) return -1;
+  if (!processTable.IsOpen()) return -1;
   int count = 0;
   alignas(KernelEntry) char buffer[4096];
   for (;;) {
@@ -107,12 +107,12 @@ int SignalAll(const Order& order) {
 
 int VLIBCKill(const char* name, int signal) {
   const int savedErrno = errno;
-  if (name == nullptr || *name == '\0') return velaplatform::Fail(EINVAL);
+  if (name == nullptr || *name == '\0') return vela::Fail(EINVAL);
   const size_t length = strlen(name);
   const Order order{name, length < kCommandNameMax ? length : kCommandNameMax,
                     signal == 0 ? SIGTERM : signal, getpid()};
   int result = SignalAll(order);
-  if (result < 0) result = velaplatform::Fail(errno);
+  if (result < 0) result = vela::Fail(errno);
   errno = savedErrno;
   return result;
 }

@@ -9,11 +9,11 @@
 #include <thread>
 #include <utility>
 
-#include "platform/standalone/child_process.h"
 #include "platform/standalone/last_error.h"
 #include "platform/standalone/settings.h"
-#include "platform/standalone/signal_block.h"
 #include "platform/velautils.h"
+#include "posix/child_process.h"
+#include "posix/signal_block.h"
 
 namespace VELAUtils {
 
@@ -43,7 +43,7 @@ std::vector<char*> MakeVector(std::string& program, Arguments& arguments) {
   return pointers;
 }
 
-velaplatform::ChildStreams StreamsFor(bool keepOutput) {
+vela::ChildStreams StreamsFor(bool keepOutput) {
   if (!keepOutput) return {};
   return {STDOUT_FILENO, STDERR_FILENO};
 }
@@ -55,11 +55,11 @@ int ResultOf(int status) {
 
 /// Waits for the child's end, within the time limit of all tools, and returns the run's result.
 int Finish(pid_t pid, const std::string& program) {
-  const std::chrono::seconds limit = velaplatform::CurrentSettings().toolTimeout;
-  if (limit.count() != 0 && !velaplatform::AwaitChildFor(pid, limit)) {
-    velaplatform::EndOverdueChild(pid, program.c_str(), limit);
+  const std::chrono::seconds limit = vela::CurrentSettings().toolTimeout;
+  if (limit.count() != 0 && !vela::AwaitChildFor(pid, limit)) {
+    vela::EndOverdueChild(pid, program.c_str(), limit);
   }
-  return ResultOf(velaplatform::ReapChild(pid));
+  return ResultOf(vela::ReapChild(pid));
 }
 
 /// A run that nobody waits for: a thread does, so that the limit holds and no zombie stays. It also
@@ -67,15 +67,15 @@ int Finish(pid_t pid, const std::string& program) {
 void RunUnattended(std::string program, Arguments arguments, bool keepOutput,
                    std::promise<int> started) {
   pid_t pid = -1;
-  const int error = velaplatform::StartChild(program.c_str(), MakeVector(program, arguments).data(),
-                                             StreamsFor(keepOutput), pid);
+  const int error = vela::StartChild(program.c_str(), MakeVector(program, arguments).data(),
+                                     StreamsFor(keepOutput), pid);
   started.set_value(error);
   if (error == 0) Finish(pid, program);
 }
 
 /// Returns 0 or an errno value.
 int StartUnattended(const std::string& program, const Arguments& arguments, bool keepOutput) {
-  const velaplatform::SignalBlock noSignals;
+  const vela::SignalBlock noSignals;
   try {
     std::promise<int> started;
     std::future<int> result = started.get_future();
@@ -104,11 +104,11 @@ void ProcessRunner::addArguments(const char* a1, const char* a2, const char* a3,
 int ProcessRunner::run(bool wait, bool keepOutput) {
   pid_t pid = -1;
   const int error =
-      wait ? velaplatform::StartChild(program_.c_str(), MakeVector(program_, arguments_).data(),
-                                      StreamsFor(keepOutput), pid)
+      wait ? vela::StartChild(program_.c_str(), MakeVector(program_, arguments_).data(),
+                              StreamsFor(keepOutput), pid)
            : StartUnattended(program_, arguments_, keepOutput);
   if (error != 0) {
-    velaplatform::SetLastError(error);
+    vela::SetLastError(error);
     return kNotStarted;
   }
   return wait ? Finish(pid, program_) : 0;

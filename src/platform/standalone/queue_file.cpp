@@ -7,15 +7,15 @@
 #include <string>
 #include <utility>
 
-#include "platform/standalone/file_descriptor.h"
-#include "platform/standalone/file_lock.h"
 #include "platform/standalone/last_error.h"
 #include "platform/velaindex.h"
+#include "posix/file_descriptor.h"
+#include "posix/file_lock.h"
 
 namespace {
 
-using velaplatform::Fail;
-using velaplatform::FileDescriptor;
+using vela::Fail;
+using vela::FileDescriptor;
 
 constexpr mode_t kQueueMode = 0644;
 constexpr int kFlags = O_RDWR | O_APPEND | O_CLOEXEC | O_NONBLOCK | O_NOCTTY;
@@ -25,10 +25,10 @@ constexpr int kFlags = O_RDWR | O_APPEND | O_CLOEXEC | O_NONBLOCK | O_NOCTTY;
 int OpenQueue(const char* path, FileDescriptor& file) {
   for (;;) {
     file.Reset(open(path, kFlags));
-    if (file) return 0;
+    if (file.IsOpen()) return 0;
     if (errno != ENOENT) return errno;
     file.Reset(open(path, kFlags | O_CREAT | O_EXCL, kQueueMode));
-    if (file) return fchmod(file.Get(), kQueueMode) == 0 ? 0 : errno;
+    if (file.IsOpen()) return fchmod(file.Get(), kQueueMode) == 0 ? 0 : errno;
     if (errno != EEXIST) return errno;
     // A link that leads nowhere stays as it is. Else made by another writer just now, and it may be
     // renamed away again as soon.
@@ -48,13 +48,13 @@ struct Queue {
 int LockQueue(const char* path, Queue& queue, bool& isCurrent) {
   int error = OpenQueue(path, queue.file);
   if (error != 0) return error;
-  error = velaplatform::LockExclusively(queue.file.Get());
+  error = vela::LockExclusively(queue.file.Get());
   if (error != 0) return error;
   if (fstat(queue.file.Get(), &queue.status) != 0) return errno;
   if (!S_ISREG(queue.status.st_mode)) return EINVAL;
   struct stat named;
   if (stat(path, &named) != 0) return errno == ENOENT ? 0 : errno;
-  isCurrent = velaplatform::IsSameFile(queue.status, named);
+  isCurrent = vela::IsSameFile(queue.status, named);
   return 0;
 }
 

@@ -9,11 +9,11 @@
 #include <string>
 #include <string_view>
 
-#include "platform/standalone/file_content.h"
-#include "platform/standalone/file_version.h"
 #include "platform/standalone/key_value_text.h"
+#include "posix/file_content.h"
+#include "posix/file_version.h"
 
-namespace velaplatform {
+namespace vela {
 
 namespace {
 
@@ -86,4 +86,4 @@ Settings CurrentSettings() {
   return cache.Get();
 }
 
-}  // namespace velaplatform
+}  // namespace vela

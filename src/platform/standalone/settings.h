@@ -4,7 +4,7 @@
 #include <chrono>
 #include <cstdint>
 
-namespace velaplatform {
+namespace vela {
 
 /// What the settings file says, with the defaults for what it does not say.
 struct Settings {
@@ -16,4 +16,4 @@ struct Settings {
 /// Returns the settings as the file holds them now; callable from any thread.
 Settings CurrentSettings();
 
-}  // namespace velaplatform
+}  // namespace vela

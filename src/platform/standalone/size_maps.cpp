@@ -7,16 +7,16 @@
 namespace {
 
 int GetSizeMap(int kind, int32_t* sizeMap) {
-  if (sizeMap == nullptr) return velaplatform::Fail(EINVAL);
+  if (sizeMap == nullptr) return vela::Fail(EINVAL);
   switch (kind) {
     case THUMB_TYPE_PHOTO:
-      *sizeMap = velaplatform::CurrentSettings().photoThumbSizeMap;
+      *sizeMap = vela::CurrentSettings().photoThumbSizeMap;
       return 0;
     case THUMB_TYPE_VIDEO:
-      *sizeMap = velaplatform::CurrentSettings().videoThumbSizeMap;
+      *sizeMap = vela::CurrentSettings().videoThumbSizeMap;
       return 0;
     default:
-      return velaplatform::Fail(EINVAL);
+      return vela::Fail(EINVAL);
   }
 }
 

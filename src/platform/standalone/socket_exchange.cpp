@@ -15,16 +15,16 @@
 #include <string_view>
 #include <utility>
 
-#include "platform/standalone/deadline.h"
-#include "platform/standalone/file_descriptor.h"
-#include "platform/standalone/json_line.h"
 #include "platform/standalone/last_error.h"
+#include "platform/standalone/strict_json.h"
 #include "platform/velaindex.h"
+#include "posix/deadline.h"
+#include "posix/file_descriptor.h"
 
 namespace {
 
-using velaplatform::Deadline;
-using velaplatform::FileDescriptor;
+using vela::Deadline;
+using vela::FileDescriptor;
 
 constexpr size_t kReplyMax = 16 * 1024 * 1024;
 constexpr size_t kChunkSize = 16384;
@@ -82,7 +82,7 @@ int Connect(const char* path, const Deadline& deadline, FileDescriptor& connecti
   // Where no daemon runs this is asked once a photo: find out before making a socket for nothing.
   if (access(path, F_OK) != 0) return errno;
   connection.Reset(socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC | SOCK_NONBLOCK, 0));
-  if (!connection) return errno;
+  if (!connection.IsOpen()) return errno;
   const int error = ConnectOnce(connection.Get(), address);
   const bool isQueueFull = error == EAGAIN || error == EINTR;
   return isQueueFull ? ConnectWaiting(connection.Get(), address, deadline) : error;
@@ -156,7 +156,7 @@ int Exchange(const char* socketPath, const Json::Value& request, const Deadline&
   int error = Connect(socketPath, deadline, connection);
   if (error != 0) return error;
   std::string line;
-  if (!velaplatform::WriteJsonLine(request, line)) return EINVAL;
+  if (!vela::WriteJsonLine(request, line)) return EINVAL;
   error = Send(connection.Get(), line, deadline);
   if (error != 0) return error;
   line.clear();
@@ -164,7 +164,7 @@ int Exchange(const char* socketPath, const Json::Value& request, const Deadline&
   if (error != 0) return error;
   connection.Reset();
   if (line.empty()) return ECONNRESET;
-  return velaplatform::ReadJsonObject(line, reply) ? 0 : EPROTO;
+  return vela::ReadJsonObject(line, vela::DuplicateKeys::kLastWins, reply) ? 0 : EPROTO;
 }
 
 int ExchangeOrFail(const char* socketPath, Json::Value& packet, int timeoutSeconds) {
@@ -187,5 +187,5 @@ int AutoSendRecvPacket(const char* socketPath, int /*unused*/, Json::Value& pack
       socketPath == nullptr ? EINVAL : ExchangeOrFail(socketPath, packet, timeoutSeconds);
   if (error == 0) return 0;
   packet = Json::Value(Json::objectValue);
-  return velaplatform::Fail(error);
+  return vela::Fail(error);
 }

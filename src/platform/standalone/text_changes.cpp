@@ -19,7 +19,7 @@ void EscapePercentSign(const char* in, char* out, size_t outSize) {
 
 void StringTrim(char* text) {
   if (text == nullptr) return;
-  const std::string_view trimmed = velaplatform::Trimmed(text);
+  const std::string_view trimmed = vela::Trimmed(text);
   memmove(text, trimmed.data(), trimmed.size());
   text[trimmed.size()] = '\0';
 }

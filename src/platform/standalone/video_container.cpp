@@ -5,7 +5,7 @@
 #include <cerrno>
 #include <string>
 
-namespace velaplatform {
+namespace vela {
 
 namespace {
 
@@ -64,4 +64,4 @@ const AVStream* VideoContainer::Sound() const {
   return FirstStream(AVMEDIA_TYPE_AUDIO);
 }
 
-}  // namespace velaplatform
+}  // namespace vela

@@ -5,7 +5,7 @@
 
 #include "platform/standalone/video_library.h"
 
-namespace velaplatform {
+namespace vela {
 
 class VideoContainer {
  public:
@@ -50,4 +50,4 @@ class VideoContainer {
   int64_t fileSize_ = 0;
 };
 
-}  // namespace velaplatform
+}  // namespace vela

@@ -11,8 +11,8 @@
 
 namespace {
 
-using velaplatform::Fail;
-using velaplatform::VideoContainer;
+using vela::Fail;
+using vela::VideoContainer;
 
 /// Whether `name` is one of the names of the format the file was read as.
 bool IsReadAs(const VideoContainer& container, const char* name) {

@@ -5,7 +5,7 @@
 #define VELA_TEXT_OF(x) #x
 #define VELA_LIBRARY_NAME(version) "libavformat.so." VELA_TEXT_OF(version)
 
-namespace velaplatform {
+namespace vela {
 
 namespace {
 
@@ -40,4 +40,4 @@ const VideoLibrary* VideoLibrary::Get() {
   return library.isLoaded_ ? &library : nullptr;
 }
 
-}  // namespace velaplatform
+}  // namespace vela

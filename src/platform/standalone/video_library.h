@@ -8,7 +8,7 @@ extern "C" {
 #include <libavutil/display.h>
 }
 
-namespace velaplatform {
+namespace vela {
 
 /// The functions of the video library that are used.
 class VideoLibrary {
@@ -36,4 +36,4 @@ class VideoLibrary {
   bool isLoaded_ = false;
 };
 
-}  // namespace velaplatform
+}  // namespace vela

@@ -11,8 +11,8 @@
 
 namespace {
 
-using velaplatform::Fail;
-using velaplatform::VideoContainer;
+using vela::Fail;
+using vela::VideoContainer;
 
 /// Rounds; what does not fit becomes the nearest value that does.
 int32_t ToInt32(double value) {

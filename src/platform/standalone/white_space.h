@@ -3,7 +3,7 @@
 
 #include <string_view>
 
-namespace velaplatform {
+namespace vela {
 
 constexpr bool IsWhiteSpace(char c) {
   return c == ' ' || (c >= '\t' && c <= '\r');
@@ -16,4 +16,4 @@ constexpr std::string_view Trimmed(std::string_view text) {
   return text;
 }
 
-}  // namespace velaplatform
+}  // namespace vela

@@ -11,6 +11,8 @@
 #include "support/sandbox.h"
 #include "support/system_log.h"
 
+using namespace vela;
+
 namespace {
 
 struct FakeSizeMaps {

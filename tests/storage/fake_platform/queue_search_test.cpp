@@ -16,6 +16,8 @@
 #include "support/files.h"
 #include "support/sandbox.h"
 
+using namespace vela;
+
 namespace {
 
 /// A question, and the buffer for its answer.

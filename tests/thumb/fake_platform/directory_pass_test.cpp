@@ -19,6 +19,8 @@
 #include "thumb/fake_platform/index_fake.h"
 #include "thumb/pass_test.h"
 
+using namespace vela;
+
 namespace vela_test {
 namespace {
 

@@ -18,6 +18,8 @@
 #include "thumb/fake_platform/source_fake.h"
 #include "thumb/pass_test.h"
 
+using namespace vela;
+
 namespace vela_test {
 namespace {
 

@@ -7,10 +7,10 @@
 #include <vector>
 
 #include "platform/velaindex.h"
+#include "profiles/directory_job.h"
 #include "profiles/thumbnail_profile.h"
 #include "source/raw_image.h"
 #include "source/rotation_check.h"
-#include "thumb/directory_job.h"
 
 namespace vela_test {
 

@@ -3,7 +3,7 @@
 
 #include <sys/stat.h>
 
-namespace velaplatform {
+namespace vela {
 
 /// Returns whether both records describe the same file in the same state.
 bool IsSameVersion(const struct stat& a, const struct stat& b);
@@ -13,4 +13,4 @@ bool IsSameVersion(const struct stat& a, const struct stat& b);
 /// times.
 bool IsAtRest(const struct stat& file);
 
-}  // namespace velaplatform
+}  // namespace vela

@@ -4,7 +4,7 @@
 #include <string>
 #include <string_view>
 
-namespace velaplatform {
+namespace vela {
 
 /// Appends everything from the present position of `fd` to its end to `content`. Returns 0 or an
 /// errno value.
@@ -17,4 +17,4 @@ int ReadFile(const char* path, std::string& content);
 /// Writes all of `content` to `fd`. Returns 0 or an errno value.
 int WriteAll(int fd, std::string_view content);
 
-}  // namespace velaplatform
+}  // namespace vela

@@ -1,11 +1,11 @@
-#include "platform/standalone/file_version.h"
+#include "posix/file_version.h"
 
 #include <cstdint>
 #include <ctime>
 
-#include "platform/standalone/file_lock.h"
+#include "posix/file_lock.h"
 
-namespace velaplatform {
+namespace vela {
 
 namespace {
 
@@ -29,4 +29,4 @@ bool IsAtRest(const struct stat& file) {
   return age > kRestMilliseconds;
 }
 
-}  // namespace velaplatform
+}  // namespace vela

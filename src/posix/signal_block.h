@@ -3,7 +3,7 @@
 
 #include <signal.h>
 
-namespace velaplatform {
+namespace vela {
 
 /// Blocks all signals for the calling thread as long as it lives.
 class SignalBlock {
@@ -21,4 +21,4 @@ class SignalBlock {
   sigset_t old_;
 };
 
-}  // namespace velaplatform
+}  // namespace vela

@@ -1,4 +1,4 @@
-#include "platform/standalone/child_process.h"
+#include "posix/child_process.h"
 
 #include <fcntl.h>
 #include <poll.h>
@@ -15,12 +15,12 @@
 #include <memory>
 #include <new>
 
-#include "platform/standalone/child_status_keeper.h"
-#include "platform/standalone/deadline.h"
-#include "platform/standalone/file_descriptor.h"
-#include "platform/standalone/signal_block.h"
+#include "posix/child_status_keeper.h"
+#include "posix/deadline.h"
+#include "posix/file_descriptor.h"
+#include "posix/signal_block.h"
 
-namespace velaplatform {
+namespace vela {
 
 namespace {
 
@@ -129,7 +129,7 @@ pid_t CloneChild(ChildPlan& plan) {
 /// such wait.
 int AwaitByDescriptor(pid_t pid, const Deadline& deadline) {
   const FileDescriptor process(static_cast<int>(syscall(SYS_pidfd_open, pid, 0)));
-  if (!process) return errno;
+  if (!process.IsOpen()) return errno;
   pollfd entry{process.Get(), POLLIN, 0};
   for (;;) {
     const int ready = poll(&entry, 1, deadline.PollMilliseconds());
@@ -215,4 +215,4 @@ int ReapChild(pid_t pid) {
   return reaped == pid ? status : -1;
 }
 
-}  // namespace velaplatform
+}  // namespace vela

@@ -4,6 +4,8 @@
 #include <cstddef>
 #include <string>
 
+namespace vela {
+
 /// Size in bytes, terminator included, of the buffers that hold a path or a formatted argument.
 inline constexpr std::size_t kPathBufferSize = 4096;
 
@@ -11,3 +13,5 @@ inline constexpr std::size_t kPathBufferSize = 4096;
 inline std::string CutText(const std::string& text, std::size_t bufferSize = kPathBufferSize) {
   return text.substr(0, bufferSize - 1);
 }
+
+}  // namespace vela

@@ -9,7 +9,7 @@
 #include <string>
 #include <thread>
 
-namespace velaplatform {
+namespace vela {
 
 /// Ends a child at its time limit from a thread of its own.
 class ChildWatchdog {
@@ -36,4 +36,4 @@ class ChildWatchdog {
   std::thread thread_;
 };
 
-}  // namespace velaplatform
+}  // namespace vela

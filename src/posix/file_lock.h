@@ -3,7 +3,7 @@
 
 #include <sys/stat.h>
 
-namespace velaplatform {
+namespace vela {
 
 /// Waits for an exclusive lock on the open file `fd`. Returns 0 or an errno value. The lock ends
 /// with the descriptor.
@@ -12,4 +12,4 @@ int LockExclusively(int fd);
 /// Returns whether both records describe the same file.
 bool IsSameFile(const struct stat& a, const struct stat& b);
 
-}  // namespace velaplatform
+}  // namespace vela

@@ -1,4 +1,4 @@
-#include "platform/standalone/json_line.h"
+#include "platform/standalone/strict_json.h"
 
 #include <json/reader.h>
 #include <json/value.h>
@@ -6,8 +6,9 @@
 
 #include <exception>
 #include <memory>
+#include <new>
 
-namespace velaplatform {
+namespace vela {
 
 namespace {
 
@@ -18,10 +19,10 @@ Json::StreamWriterBuilder MakeWriterBuilder() {
   return builder;
 }
 
-Json::CharReaderBuilder MakeReaderBuilder() {
+Json::CharReaderBuilder MakeReaderBuilder(DuplicateKeys duplicates) {
   Json::CharReaderBuilder builder;
   Json::CharReaderBuilder::strictMode(&builder.settings_);
-  builder["rejectDupKeys"] = false;
+  builder["rejectDupKeys"] = duplicates == DuplicateKeys::kRejected;
   builder["skipBom"] = false;
   return builder;
 }
@@ -30,41 +31,41 @@ bool IsDigit(char c) {
   return c >= '0' && c <= '9';
 }
 
-/// Removes the digits at the front; returns whether there were any.
-bool TakeDigits(std::string_view& text) {
+/// Removes the digits at the front. Returns true when there were any.
+bool SkipDigits(std::string_view& text) {
   const size_t before = text.size();
   while (!text.empty() && IsDigit(text.front())) text.remove_prefix(1);
   return text.size() < before;
 }
 
-/// Removes `c` or `other` from the front; returns whether one was there.
-bool TakeEither(std::string_view& text, char c, char other) {
-  if (text.empty() || (text.front() != c && text.front() != other)) return false;
+/// Removes one of `characters` from the front. Returns true when one was there.
+bool SkipOneOf(std::string_view characters, std::string_view& text) {
+  if (text.empty() || characters.find(text.front()) == std::string_view::npos) return false;
   text.remove_prefix(1);
   return true;
 }
 
 bool IsNumber(std::string_view text) {
-  TakeEither(text, '-', '-');
-  const bool isZero = TakeEither(text, '0', '0');
-  if (!isZero && !TakeDigits(text)) return false;
-  if (TakeEither(text, '.', '.') && !TakeDigits(text)) return false;
-  if (TakeEither(text, 'e', 'E')) {
-    TakeEither(text, '+', '-');
-    if (!TakeDigits(text)) return false;
+  SkipOneOf("-", text);
+  const bool isZero = SkipOneOf("0", text);
+  if (!isZero && !SkipDigits(text)) return false;
+  if (SkipOneOf(".", text) && !SkipDigits(text)) return false;
+  if (SkipOneOf("eE", text)) {
+    SkipOneOf("+-", text);
+    if (!SkipDigits(text)) return false;
   }
   return text.empty();
 }
 
-/// Returns the place behind the string that begins at `begin`.
+/// Returns the position after the string that begins at `begin`.
 size_t EndOfString(std::string_view text, size_t begin) {
   size_t at = begin + 1;
   while (at < text.size() && text[at] != '"') at += text[at] == '\\' ? 2 : 1;
   return at + 1;
 }
 
-/// Returns whether the text has what the reader lets pass and JSON does not know: comments behind
-/// values, and numbers such as 01 or a single minus sign.
+/// Returns true when the text has what the library accepts although it is not JSON: comments, and
+/// numbers such as 01 or a single minus sign.
 bool IsLoose(std::string_view text) {
   for (size_t at = 0; at < text.size();) {
     const char c = text[at];
@@ -95,18 +96,22 @@ bool WriteJsonLine(const Json::Value& value, std::string& line) {
   }
 }
 
-bool ReadJsonObject(std::string_view text, Json::Value& object) {
-  static const Json::CharReaderBuilder builder = MakeReaderBuilder();
+bool ReadJsonObject(std::string_view text, DuplicateKeys duplicates, Json::Value& object) {
+  static const Json::CharReaderBuilder lenient = MakeReaderBuilder(DuplicateKeys::kLastWins);
+  static const Json::CharReaderBuilder strict = MakeReaderBuilder(DuplicateKeys::kRejected);
   if (IsLoose(text)) return false;
+  const Json::CharReaderBuilder& builder =
+      duplicates == DuplicateKeys::kRejected ? strict : lenient;
   try {
     const std::unique_ptr<Json::CharReader> reader(builder.newCharReader());
-    std::string errors;
-    return reader->parse(text.data(), text.data() + text.size(), &object, &errors) &&
+    return reader->parse(text.data(), text.data() + text.size(), &object, nullptr) &&
            object.isObject();
+  } catch (const std::bad_alloc&) {
+    throw;
   } catch (const std::exception&) {
-    // Nesting beyond the reader's limit, for one.
+    // For example nesting beyond the library's limit.
     return false;
   }
 }
 
-}  // namespace velaplatform
+}  // namespace vela

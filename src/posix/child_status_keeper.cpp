@@ -1,10 +1,10 @@
-#include "platform/standalone/child_status_keeper.h"
+#include "posix/child_status_keeper.h"
 
 #include <signal.h>
 
 #include <mutex>
 
-namespace velaplatform {
+namespace vela {
 
 namespace {
 
@@ -48,4 +48,4 @@ void ReleaseChildStatus() {
   if (isOurs) sigaction(SIGCHLD, &g_replaced, nullptr);
 }
 
-}  // namespace velaplatform
+}  // namespace vela

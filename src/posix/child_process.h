@@ -5,7 +5,7 @@
 
 #include <chrono>
 
-namespace velaplatform {
+namespace vela {
 
 /// Where a child's output goes; -1 stands for /dev/null.
 struct ChildStreams {
@@ -35,4 +35,4 @@ void EndOverdueChild(pid_t pid, const char* program, std::chrono::seconds limit)
 /// of the process has taken it.
 int ReapChild(pid_t pid);
 
-}  // namespace velaplatform
+}  // namespace vela

@@ -1,4 +1,4 @@
-#include "platform/standalone/file_content.h"
+#include "posix/file_content.h"
 
 #include <fcntl.h>
 #include <unistd.h>
@@ -7,9 +7,9 @@
 #include <new>
 #include <stdexcept>
 
-#include "platform/standalone/file_descriptor.h"
+#include "posix/file_descriptor.h"
 
-namespace velaplatform {
+namespace vela {
 
 namespace {
 
@@ -42,7 +42,7 @@ int ReadToEnd(int fd, std::string& content) {
 
 int ReadFile(const char* path, std::string& content) {
   const FileDescriptor file(open(path, O_RDONLY | O_CLOEXEC | O_NONBLOCK | O_NOCTTY));
-  if (!file) return errno;
+  if (!file.IsOpen()) return errno;
   return ReadToEnd(file.Get(), content);
 }
 
@@ -58,4 +58,4 @@ int WriteAll(int fd, std::string_view content) {
   return 0;
 }
 
-}  // namespace velaplatform
+}  // namespace vela

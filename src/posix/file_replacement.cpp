@@ -1,4 +1,4 @@
-#include "platform/standalone/file_replacement.h"
+#include "posix/file_replacement.h"
 
 #include <fcntl.h>
 #include <stdio.h>
@@ -7,11 +7,11 @@
 #include <cerrno>
 #include <utility>
 
-#include "platform/standalone/file_content.h"
-#include "platform/standalone/file_descriptor.h"
-#include "platform/standalone/file_lock.h"
+#include "posix/file_content.h"
+#include "posix/file_descriptor.h"
+#include "posix/file_lock.h"
 
-namespace velaplatform {
+namespace vela {
 
 namespace {
 
@@ -27,7 +27,7 @@ class ScratchFile {
   ScratchFile(const ScratchFile&) = delete;
   ScratchFile& operator=(const ScratchFile&) = delete;
   ~ScratchFile() {
-    if (file_) unlink(path_.c_str());
+    if (file_.IsOpen()) unlink(path_.c_str());
   }
 
   /// Makes the file, empty and locked. Returns 0 or an errno value.
@@ -60,7 +60,7 @@ int ScratchFile::Open() {
 int ScratchFile::OpenOnce(bool& isReady) {
   const int flags = O_RDWR | O_CREAT | O_NOFOLLOW | O_NONBLOCK | O_NOCTTY | O_CLOEXEC;
   FileDescriptor file(open(Path(), flags, 0600));
-  if (!file) return errno;
+  if (!file.IsOpen()) return errno;
   const int error = LockExclusively(file.Get());
   if (error != 0) return error;
 
@@ -119,4 +119,4 @@ int ReplaceWhole(const std::string& path, std::string_view content, const struct
   return 0;
 }
 
-}  // namespace velaplatform
+}  // namespace vela

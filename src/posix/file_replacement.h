@@ -6,7 +6,7 @@
 #include <string>
 #include <string_view>
 
-namespace velaplatform {
+namespace vela {
 
 /// Makes the file `path` with this content and mode 0644, whole from the first moment on. Returns 0
 /// or an errno value; EEXIST when something is at `path` already.
@@ -16,4 +16,4 @@ int CreateWhole(const std::string& path, std::string_view content);
 /// caller holds the lock on the old file. Returns 0 or an errno value.
 int ReplaceWhole(const std::string& path, std::string_view content, const struct stat& old);
 
-}  // namespace velaplatform
+}  // namespace vela

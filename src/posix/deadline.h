@@ -3,7 +3,7 @@
 
 #include <chrono>
 
-namespace velaplatform {
+namespace vela {
 
 /// A deadline on the clock that nobody sets.
 class Deadline {
@@ -33,4 +33,4 @@ class Deadline {
   Clock::time_point end_;
 };
 
-}  // namespace velaplatform
+}  // namespace vela

@@ -5,6 +5,8 @@
 
 #include <string>
 
+namespace vela {
+
 /// Expands a shell pattern; holds no path when nothing matches or the expansion fails. The paths
 /// are sorted and live as long as the object.
 class GlobMatches {
@@ -23,3 +25,8 @@ class GlobMatches {
   glob_t matches_ = {};
   bool found_ = false;
 };
+
+/// Returns a pattern that matches exactly `path`, whatever characters it holds.
+std::string EscapePattern(const std::string& path);
+
+}  // namespace vela

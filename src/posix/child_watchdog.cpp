@@ -1,12 +1,12 @@
-#include "platform/standalone/child_watchdog.h"
+#include "posix/child_watchdog.h"
 
 #include <system_error>
 
-#include "platform/standalone/child_process.h"
-#include "platform/standalone/deadline.h"
-#include "platform/standalone/signal_block.h"
+#include "posix/child_process.h"
+#include "posix/deadline.h"
+#include "posix/signal_block.h"
 
-namespace velaplatform {
+namespace vela {
 
 bool ChildWatchdog::Start(pid_t pid, const char* program, std::chrono::seconds limit) {
   // The thread inherits the block: signals stay with the threads of the program.
@@ -36,4 +36,4 @@ void ChildWatchdog::Watch(pid_t pid, const std::string& program, std::chrono::se
   if (!isStopped) EndOverdueChild(pid, program.c_str(), limit);
 }
 
-}  // namespace velaplatform
+}  // namespace vela

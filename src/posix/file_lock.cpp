@@ -1,10 +1,10 @@
-#include "platform/standalone/file_lock.h"
+#include "posix/file_lock.h"
 
 #include <sys/file.h>
 
 #include <cerrno>
 
-namespace velaplatform {
+namespace vela {
 
 int LockExclusively(int fd) {
   while (flock(fd, LOCK_EX) != 0) {
@@ -17,4 +17,4 @@ bool IsSameFile(const struct stat& a, const struct stat& b) {
   return a.st_dev == b.st_dev && a.st_ino == b.st_ino;
 }
 
-}  // namespace velaplatform
+}  // namespace vela
