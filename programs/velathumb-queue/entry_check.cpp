@@ -7,6 +7,7 @@
 #include <system_error>
 
 #include "entry_plan.h"
+#include "platform/system_rules.h"
 #include "platform/velaindex.h"
 #include "platform/vlibc.h"
 #include "storage/creation_queue.h"
@@ -14,9 +15,6 @@
 namespace vela {
 
 namespace {
-
-/// velathumb stops where less is free.
-constexpr uint64_t kLeastFree = uint64_t{1} << 30;
 
 std::string FindTreeFault(const std::string& path) {
   if (path.find(':') != std::string::npos) {
@@ -30,7 +28,7 @@ std::string FindTreeFault(const std::string& path) {
 
 std::string CheckAddition(std::string& entry) {
   const bool isTree = IsTreeEntry(entry);
-  const std::string given = isTree ? entry.substr(std::strlen(kTreeEntryPrefix)) : entry;
+  const std::string given = isTree ? entry.substr(std::strlen(kTreePrefix)) : entry;
   if (given.find('\n') != std::string::npos) {
     return "an entry cannot hold a newline";
   }
@@ -46,7 +44,7 @@ std::string CheckAddition(std::string& entry) {
   while (path.size() > 1 && path.back() == '/') {
     path.pop_back();
   }
-  entry = isTree ? kTreeEntryPrefix + path : path;
+  entry = isTree ? kTreePrefix + path : path;
   return isTree ? FindTreeFault(path) : std::string();
 }
 
@@ -55,7 +53,7 @@ std::string FindHindrance(const std::string& entry) {
   if (IsDirExist(directory.c_str()) == 0) {
     return "there is no such directory";
   }
-  return VLIBGetFsAvailSize(directory.c_str()) < kLeastFree ? "its volume is nearly full" : "";
+  return VLIBGetFsAvailSize(directory.c_str()) < kLeastFreeSpace ? "its volume is nearly full" : "";
 }
 
 }  // namespace vela

@@ -6,6 +6,7 @@
 #include <system_error>
 #include <utility>
 
+#include "platform/system_rules.h"
 #include "storage/creation_queue.h"
 
 namespace vela {
@@ -18,7 +19,7 @@ constexpr size_t kLookAhead = 1000;
 /// Returns the directory that velathumb takes from a tree entry: without colons in front of it, and
 /// up to the next one.
 std::string TreeDirectory(const std::string& entry) {
-  const size_t begin = entry.find_first_not_of(':', std::strlen(kTreeEntryPrefix));
+  const size_t begin = entry.find_first_not_of(':', std::strlen(kTreePrefix));
   return begin == std::string::npos ? "" : entry.substr(begin, entry.find(':', begin) - begin);
 }
 

@@ -14,6 +14,7 @@
 #include <system_error>
 
 #include "file_place.h"
+#include "platform/system_rules.h"
 #include "platform/velaindex.h"
 #include "platform/vlibc.h"
 #include "posix/file_descriptor.h"
@@ -62,7 +63,7 @@ bool IsHeld(const std::string& path) {
 
 /// Returns what an entry is known by: the same for spellings of its path.
 std::string KeyOf(const std::string& entry) {
-  const size_t begin = IsTreeEntry(entry) ? std::strlen(kTreeEntryPrefix) : 0;
+  const size_t begin = IsTreeEntry(entry) ? std::strlen(kTreePrefix) : 0;
   return entry.substr(0, begin) + WithoutIdleParts(entry.substr(begin));
 }
 

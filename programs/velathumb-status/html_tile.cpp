@@ -64,7 +64,7 @@ std::string UnconvertibleNote(const PhotoReport& photo) {
 /// together.
 std::string FailureNotes(const PhotoReport& photo) {
   std::string notes;
-  std::array<bool, kEAThumbCount> isNamed = {};
+  std::array<bool, kThumbSizeCount> isNamed = {};
   for (const EA_THUMB_SIZE first : kThumbSizesSmallestFirst) {
     if (!HasFailed(photo, static_cast<size_t>(first)) || isNamed[static_cast<size_t>(first)]) {
       continue;

@@ -8,13 +8,11 @@ namespace vela {
 
 namespace {
 
-constexpr const char* kNames[kEAThumbCount] = {"S", "M", "B", "L", "XL", "SM"};
-
 std::vector<std::string> Select(const std::function<bool(size_t)>& isWanted) {
   std::vector<std::string> names;
   for (const EA_THUMB_SIZE size : kThumbSizesSmallestFirst) {
     if (isWanted(static_cast<size_t>(size))) {
-      names.emplace_back(kNames[size]);
+      names.emplace_back(kThumbSizeTraits[size].shortName);
     }
   }
   return names;
@@ -23,7 +21,7 @@ std::vector<std::string> Select(const std::function<bool(size_t)>& isWanted) {
 }  // namespace
 
 const char* SizeClassName(const EAThumbInfo& row) {
-  return kNames[row.size];
+  return kThumbSizeTraits[row.size].shortName;
 }
 
 std::vector<std::string> SizeClassesInState(const PhotoReport& photo, ThumbState state) {

@@ -17,7 +17,7 @@ struct PhotoReport {
   PhotoThumbStates thumbs;
   /// When the making of a missing or outdated thumbnail failed (seconds since the epoch), by size
   /// class.
-  std::array<std::optional<time_t>, kEAThumbCount> failures = {};
+  std::array<std::optional<time_t>, kThumbSizeCount> failures = {};
 
   /// Returns the file name.
   std::string Name() const;

@@ -1,15 +1,11 @@
 #include "convert/convert_command.h"
 
-#include <fcntl.h>
-#include <unistd.h>
-
-#include <cstdlib>
-
 #include "platform/velaindex.h"
 #include "platform/velautils.h"
 #include "posix/cut_text.h"
+#include "posix/files.h"
 
-using vela::CutText;
+using namespace vela;
 
 namespace {
 
@@ -27,14 +23,11 @@ std::string EscapedTempPath(const PhotoThumbSetting& setting) {
 }  // namespace
 
 std::string MakeTempOutputPath(const std::string& destPath) {
-  std::string nameTemplate = VELAUtils::GetPathDirName(destPath) + "/VELAPHOTO.tmp.XXXXXX";
-  std::string path = nameTemplate;
-  const int descriptor = mkostemp(path.data(), O_CLOEXEC);
-  if (descriptor < 0) {
+  const std::string nameTemplate = VELAUtils::GetPathDirName(destPath) + "/VELAPHOTO.tmp.XXXXXX";
+  const std::string path = FindUnusedPath(nameTemplate);
+  if (path.empty()) {
     return nameTemplate;
   }
-  close(descriptor);
-  unlink(path.c_str());
   const std::string extension = VELAUtils::GetPathExt(destPath);
   return extension.empty() ? path : path + "." + extension;
 }

@@ -1,6 +1,7 @@
 // One run of the image converter for one source photo.
 #pragma once
 
+#include <cstdint>
 #include <string>
 #include <vector>
 
@@ -10,6 +11,9 @@ namespace vela {
 
 /// Path of the image converter.
 inline constexpr char kConvertToolPath[] = "/usr/vela/bin/convert-thumb";
+
+/// Bytes that a thumbnail has at least: a converter that fails early can leave a single one.
+inline constexpr int64_t kSmallestThumb = 2;
 
 }  // namespace vela
 

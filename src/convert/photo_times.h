@@ -1,4 +1,4 @@
-// The file status of photos, and files dated like them.
+// The file status of photos, and files that take their times.
 #pragma once
 
 #include <string>

@@ -1,12 +1,6 @@
 #include "convert/velamk_photo_thumb.h"
 
-#include <sys/stat.h>
-#include <syslog.h>
-#include <unistd.h>
-
 #include <algorithm>
-#include <cerrno>
-#include <cstdio>
 #include <cstring>
 #include <ctime>
 
@@ -15,17 +9,17 @@
 #include "platform/velautils.h"
 #include "platform/vlibc.h"
 #include "posix/cut_text.h"
+#include "posix/files.h"
+#include "posix/log.h"
 
-using vela::CutText;
-using vela::DateLikePhoto;
-using vela::kPhotoStatusOptions;
+using namespace vela;
 
 namespace {
 
 constexpr char kLogSource[] = "velamk_photo_thumb";
 
-/// A JPEG of a single byte is what is left of an output that failed while it was opened.
-constexpr int64_t kSmallestThumb = 2;
+/// Every service of the system may renew a thumbnail.
+constexpr unsigned kThumbMode = 0777;
 
 std::string InputArgument(const std::string& srcPath) {
   const bool firstPageOnly = BlVELAIndexIsMultiplePagePhotoFile(srcPath.c_str());
@@ -49,46 +43,46 @@ void AddCommand(VELAUtils::ProcessRunner& runner, const PhotoConvertJob& job,
 
 void RemoveTempOutputs(const PhotoConvertJob& job) {
   for (const PhotoThumbSetting& setting : job.settings) {
-    unlink(setting.tempPath.c_str());
+    RemoveFile(setting.tempPath);
   }
 }
 
-/// Tells whether the photo was written while it was converted. One figure alone may change without
-/// the content: allocation is settled late, and sparse files are filled in place.
+/// Returns true when the photo was written while it was converted. One figure alone may change
+/// without the content: allocation is settled late, and sparse files are filled in place.
 bool IsSourceChanged(const VLIBCFileStatus& source, int64_t oldBlocks, int64_t oldSize) {
   return source.size != oldSize && source.blocks != oldBlocks;
 }
 
 /// Returns the size of the thumbnail in bytes, 0 when it cannot be examined.
 int64_t ThumbSize(const std::string& destPath) {
-  struct stat status = {};
-  return stat(destPath.c_str(), &status) == 0 ? status.st_size : 0;
+  const auto status = ExamineFile(destPath);
+  return status ? status->size : 0;
 }
 
 /// Moves one output into place. Returns false when there is no usable output; nothing of it is left
 /// then.
 bool CommitOutput(const PhotoThumbSetting& setting, const VLIBCFileStatus& source, time_t now) {
-  const char* temp = setting.tempPath.c_str();
-  const char* dest = setting.destPath.c_str();
-  if (rename(temp, dest) != 0) {
-    syslog(LOG_ERR, "%s:%d [Error] rename: %s, %s", kLogSource, 430, temp, dest);
-    unlink(temp);
+  const std::string& temp = setting.tempPath;
+  const std::string& dest = setting.destPath;
+  if (RenameFile(temp, dest) != 0) {
+    LogError(kLogSource, 430, "[Error] rename: " + temp + ", " + dest);
+    RemoveFile(temp);
     return false;
   }
-  if (chmod(dest, 0777) != 0) {
-    syslog(LOG_ERR, "%s:%d [Error] Failed to chmod [%s], %s", kLogSource, 437, dest,
-           std::strerror(errno));
+  if (const int error = SetFileMode(dest, kThumbMode); error != 0) {
+    LogError(kLogSource, 437, "[Error] Failed to chmod [" + dest + "], " + std::strerror(error));
   }
-  const int64_t size = ThumbSize(setting.destPath);
+  const int64_t size = ThumbSize(dest);
   if (size < kSmallestThumb) {
-    unlink(dest);
-    syslog(LOG_ERR, "%s:%d [Error] file size of dest path: %d, %s", kLogSource, 441,
-           static_cast<int>(size), dest);
+    RemoveFile(dest);
+    LogError(
+        kLogSource, 441,
+        "[Error] file size of dest path: " + std::to_string(static_cast<int>(size)) + ", " + dest);
     return false;
   }
   if (now < source.modification.seconds) {
     // A photo from the future would make every thumbnail of it look outdated.
-    DateLikePhoto(setting.destPath, source);
+    DateLikePhoto(dest, source);
   }
   return true;
 }
@@ -109,11 +103,11 @@ int RunPhotoConvertJob(PhotoConvertJob& job) {
   }
   VLIBCFileStatus source = {};
   if (VLIBCFileStat(srcPath.c_str(), kPhotoStatusOptions, &source) != 0) {
-    syslog(LOG_ERR, "%s:%d [Error] failed to stat file: %s", kLogSource, 117, srcPath.c_str());
+    LogError(kLogSource, 117, "[Error] failed to stat file: " + srcPath);
     return -1;
   }
-  if (!S_ISREG(source.mode)) {
-    syslog(LOG_ERR, "%s:%d [Error] not a regular file: %s", kLogSource, 121, srcPath.c_str());
+  if (!IsRegularFileMode(source.mode)) {
+    LogError(kLogSource, 121, "[Error] not a regular file: " + srcPath);
     return -1;
   }
   AddCommand(runner, job, srcPath);
@@ -128,14 +122,15 @@ int CommitPhotoThumbs(const PhotoConvertJob& job, const std::string& srcPath, in
   const time_t now = std::time(nullptr);
   VLIBCFileStatus source = {};
   if (VLIBCFileStat(srcPath.c_str(), kPhotoStatusOptions, &source) != 0) {
-    syslog(LOG_ERR, "%s:%d Failed to VLIBCFileStat() path [%s]", kLogSource, 397, srcPath.c_str());
+    LogError(kLogSource, 397, "Failed to VLIBCFileStat() path [" + srcPath + "]");
     RemoveTempOutputs(job);
     return -1;
   }
   if (IsSourceChanged(source, oldBlocks, oldSize)) {
-    syslog(LOG_ERR, "%s:%d [Error] file size changed: st_blocks %d -> %d; st_size %jd -> %jd, %s",
-           kLogSource, 409, static_cast<int>(oldBlocks), static_cast<int>(source.blocks),
-           static_cast<intmax_t>(oldSize), static_cast<intmax_t>(source.size), srcPath.c_str());
+    LogError(kLogSource, 409,
+             "[Error] file size changed: st_blocks " + std::to_string(static_cast<int>(oldBlocks)) +
+                 " -> " + std::to_string(static_cast<int>(source.blocks)) + "; st_size " +
+                 std::to_string(oldSize) + " -> " + std::to_string(source.size) + ", " + srcPath);
     RemoveTempOutputs(job);
     return -1;
   }

@@ -1,9 +1,11 @@
 #include "ipc/velamk_ipc.h"
 
 #include <json/value.h>
-#include <syslog.h>
 
 #include "platform/velaindex.h"
+#include "posix/log.h"
+
+using namespace vela;
 
 namespace {
 
@@ -44,7 +46,7 @@ bool Exchange(Json::Value& packet, int line) {
   if (ToBool(Member(packet, "success"))) {
     return true;
   }
-  syslog(LOG_ERR, "%s:%d fail", kLogSource, line);
+  LogError(kLogSource, line, "fail");
   return false;
 }
 

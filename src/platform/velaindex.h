@@ -71,6 +71,17 @@ int VELAEADirPath(int flags, const char* path, char* out, size_t outSize);
 const char* IsEAFileExist(const char* eaDir, int64_t* sizeOut, const char* name,
                           const char* oldName);
 
+/// A file in a metadata directory.
+struct EAFileStatus {
+  int64_t size;      ///< bytes
+  int64_t modified;  ///< seconds since the epoch
+};
+
+/// Looks up a file as IsEAFileExist does, and its status in the same step. Returns the name found
+/// (one of the two pointers) and fills `status`, or null.
+const char* FindEAFile(const char* eaDir, const char* name, const char* oldName,
+                       EAFileStatus* status);
+
 /// The same for the media file `path` itself. Returns 1 when either name exists, else 0.
 int IsEAFileExist2(const char* path, const char* name, const char* oldName);
 

@@ -7,17 +7,18 @@
 #include <sys/prctl.h>
 #include <sys/syscall.h>
 #include <sys/wait.h>
-#include <syslog.h>
 #include <unistd.h>
 
 #include <cerrno>
 #include <cstring>
 #include <memory>
 #include <new>
+#include <string>
 
 #include "posix/child_status_keeper.h"
 #include "posix/deadline.h"
 #include "posix/file_descriptor.h"
+#include "posix/log.h"
 #include "posix/signal_block.h"
 
 namespace vela {
@@ -199,8 +200,8 @@ bool AwaitChildFor(pid_t pid, std::chrono::seconds limit) {
 void EndOverdueChild(pid_t pid, const char* program, std::chrono::seconds limit) {
   if (!HasEnded(pid)) {
     kill(pid, SIGKILL);
-    syslog(LOG_ERR, "%s has not ended within %lld seconds (tool_timeout) and was killed", program,
-           static_cast<long long>(limit.count()));
+    LogError(std::string(program) + " has not ended within " + std::to_string(limit.count()) +
+             " seconds (tool_timeout) and was killed");
   }
   kill(-pid, SIGKILL);
 }

@@ -14,4 +14,12 @@ inline std::string CutText(const std::string& text, std::size_t bufferSize = kPa
   return text.substr(0, bufferSize - 1);
 }
 
+/// Returns the path of the file `name` in the directory `dir`, cut to what a path buffer holds.
+inline std::string JoinPath(const std::string& dir, const std::string& name) {
+  std::string path = dir;
+  path += '/';
+  path += name;
+  return path.size() < kPathBufferSize ? path : CutText(path);
+}
+
 }  // namespace vela

@@ -13,6 +13,14 @@ int LockExclusively(int fd) {
   return 0;
 }
 
+int TryLockExclusively(int fd) {
+  return flock(fd, LOCK_EX | LOCK_NB) == 0 ? 0 : errno;
+}
+
+void Unlock(int fd) {
+  flock(fd, LOCK_UN);
+}
+
 bool IsSameFile(const struct stat& a, const struct stat& b) {
   return a.st_dev == b.st_dev && a.st_ino == b.st_ino;
 }

@@ -9,6 +9,13 @@ namespace vela {
 /// with the descriptor.
 int LockExclusively(int fd);
 
+/// Takes an exclusive lock on the open file `fd` without waiting. Returns 0 or an errno value,
+/// EWOULDBLOCK while another process holds a lock. The lock ends with the descriptor.
+int TryLockExclusively(int fd);
+
+/// Releases the lock on the open file `fd`, also for processes that share the descriptor.
+void Unlock(int fd);
+
 /// Returns whether both records describe the same file.
 bool IsSameFile(const struct stat& a, const struct stat& b);
 

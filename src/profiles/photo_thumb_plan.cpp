@@ -1,24 +1,24 @@
 #include "profiles/photo_thumb_plan.h"
 
-#include <fcntl.h>
-#include <unistd.h>
-
 #include "convert/velamk_photo_thumb.h"
 #include "platform/velaindex.h"
+#include "posix/files.h"
 #include "storage/fail_marker.h"
-#include "thumb/file_helpers.h"
+#include "storage/file_helpers.h"
 
-using vela::FailMarkerPath;
+using namespace vela;
 
 namespace {
+
+constexpr unsigned kMarkerMode = 0777;
 
 bool StatFile(const std::string& path, struct stat& out) {
   return stat(path.c_str(), &out) == 0;
 }
 
 void RemoveWithMarker(const std::string& thumbPath) {
-  unlink(thumbPath.c_str());
-  unlink(FailMarkerPath(thumbPath).c_str());
+  RemoveFile(thumbPath);
+  RemoveFile(FailMarkerPath(thumbPath));
 }
 
 /// Takes over what the profile says of the image.
@@ -60,7 +60,7 @@ int CreatePhotoThumbs(const DirectoryJob& dirJob, int phaseIndex, const std::str
   }
   const int result = RunPhotoConvertJob(job);
   if (result == -1) {
-    vela::CreatePhaseFailMarkers(dirJob, phaseIndex, eaDir);
+    CreatePhaseFailMarkers(dirJob, phaseIndex, eaDir);
   }
   return result;
 }
@@ -118,10 +118,7 @@ void RemoveThumbAndFailMarker(const ThumbnailProfile& profile, const std::string
 void CreateThumbFailMarker(const ThumbnailProfile& profile, const std::string& eaDir) {
   RemoveThumbAndFailMarker(profile, eaDir);
   const std::string marker = FailMarkerPath(eaDir + "/" + profile.thumbName());
-  const int descriptor = open(marker.c_str(), O_RDWR | O_CREAT | O_TRUNC | O_CLOEXEC, 0777);
-  if (descriptor >= 0) {
-    close(descriptor);
-  }
+  CreateEmptyFile(marker, kMarkerMode);
 }
 
 namespace vela {

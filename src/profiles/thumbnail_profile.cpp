@@ -2,12 +2,13 @@
 
 #include <algorithm>
 #include <cstddef>
-#include <string_view>
 #include <utility>
 
 #include "platform/velaindex.h"
 #include "platform/velautils.h"
 #include "storage/velamk_util.h"
+
+using namespace vela;
 
 namespace {
 
@@ -16,9 +17,9 @@ std::string WithUnderscores(std::string name) {
   return name;
 }
 
-bool FillsArea(std::string_view thumbName) {
-  return thumbName == "VELAPHOTO_THUMB_XL.jpg" || thumbName == "VELAPHOTO_THUMB_SM.jpg" ||
-         thumbName == "VELAPHOTO_THUMB_M.jpg" || thumbName == "VELAPHOTO_THUMB_L.jpg";
+bool FillsArea(const std::string& thumbName) {
+  const ThumbSizeTraits* traits = FindThumbSize(thumbName);
+  return traits != nullptr && traits->fillsArea;
 }
 
 bool IsThumbSection(const std::string& section) {

@@ -1,7 +1,6 @@
 #include "progress/velamk_progress.h"
 
 #include <sys/time.h>
-#include <syslog.h>
 
 #include <algorithm>
 #include <cstdint>
@@ -11,15 +10,17 @@
 #include <limits>
 #include <string>
 
+#include "platform/system_rules.h"
 #include "platform/velaindex.h"
 #include "platform/vlibc.h"
+#include "posix/log.h"
 #include "progress/progress_summary.h"
+
+using namespace vela;
 
 namespace {
 
 constexpr char kLogSource[] = "velamk_progress";
-constexpr char kSystemSettings[] = "/etc/velainfo.conf";
-constexpr char kResumeTimeKey[] = "thumb_conv_resume_time";
 
 int ClampToInt(int64_t value) {
   constexpr int64_t kLowest = std::numeric_limits<int>::min();
@@ -39,35 +40,36 @@ int ReadCounter(const char* file, const char* key) {
 }  // namespace
 
 int GetConvProgress(int kind, const char* key) {
-  const char* file = vela::ConvProgressFile(kind);
+  const char* file = ConvProgressFile(kind);
   return file == nullptr || key == nullptr ? 0 : ReadCounter(file, key);
 }
 
 void AddConvProgress(int kind, const char* key, int delta) {
-  const char* file = vela::ConvProgressFile(kind);
+  const char* file = ConvProgressFile(kind);
   if (file == nullptr || key == nullptr) {
     return;
   }
   const int64_t sum = int64_t{ReadCounter(file, key)} + delta;
   const std::string text = std::to_string(ClampToInt(sum));
   if (VLIBCFileSetKeyValue(file, key, text.c_str(), 0) < 0) {
-    syslog(LOG_ERR, "%s:%d VLIBCFileSetKeyValue fail: %s", kLogSource, 115, file);
+    LogError(kLogSource, 115, "VLIBCFileSetKeyValue fail: " + std::string(file));
   }
 }
 
 void LogConvProgress() {
   int line = 144;
-  for (const std::string& text : vela::FormatProgressSummary(vela::ReadProgressSummary())) {
-    syslog(LOG_ERR, "%s:%d %s", kLogSource, line, text.c_str());
+  for (const std::string& text : FormatProgressSummary(ReadProgressSummary())) {
+    LogError(kLogSource, line, text);
     ++line;
   }
 }
 
 long GetThumbConvResumeTime() {
   char text[1024] = "";
-  if (VLIBCFileGetKeyValue(kSystemSettings, kResumeTimeKey, text, sizeof text, 0) < 0) {
-    syslog(LOG_ERR, "%s:%d VLIBCFileGetKeyValue(%s) failed, velaerr=0x%04X", kLogSource, 176,
-           kResumeTimeKey, static_cast<unsigned>(VLIBCErrGet()));
+  if (VLIBCFileGetKeyValue(kSettingsFile, kResumeTimeKey, text, sizeof text, 0) < 0) {
+    LogError(kLogSource, 176,
+             "VLIBCFileGetKeyValue(" + std::string(kResumeTimeKey) +
+                 ") failed, velaerr=" + LogCode(VLIBCErrGet()));
   }
   return std::strtol(text, nullptr, 10);
 }

@@ -1,7 +1,6 @@
 #include "source/orientation.h"
 
 #include <libexif/exif-data.h>
-#include <syslog.h>
 
 #include <cstdlib>
 #include <cstring>
@@ -9,12 +8,11 @@
 
 #include "platform/velaindex.h"
 #include "platform/vlibc.h"
+#include "posix/log.h"
 #include "source/tool_output.h"
-#include "thumb/log_source.h"
+#include "storage/log_source.h"
 
-using vela::kLogSource;
-using vela::SplitTagLine;
-using vela::ToolOutput;
+using namespace vela;
 
 namespace {
 
@@ -36,8 +34,8 @@ std::string CanonicalText(const char* text) {
 std::string ReadOrientationText(const std::string& path) {
   const std::unique_ptr<ExifData, ExifDataUnref> data(exif_data_new_from_file(path.c_str()));
   if (data == nullptr) {
-    syslog(LOG_ERR, "%s:%d %s (%d) File not readable or no EXIF data in file %s.\n", kLogSource,
-           696, kLogSource, 696, path.c_str());
+    LogError(kProgramLogSource, 696,
+             "velathumb (696) File not readable or no EXIF data in file " + path + ".\n");
     return {};
   }
   char text[128] = "";
@@ -54,8 +52,9 @@ std::string ReadRotationTag(const std::string& rawPath) {
   const std::string option = std::string("-") + kRotationTag;
   ToolOutput output(VLIBCPopen(kExiftoolPath, "r", "-S", option.c_str(), rawPath.c_str(), nullptr));
   if (!output.IsOpen()) {
-    syslog(LOG_ERR, "%s:%d [Error] VLIBCPopen: %s -S -%s %s", kLogSource, 196, kExiftoolPath,
-           kRotationTag, rawPath.c_str());
+    LogError(kProgramLogSource, 196,
+             "[Error] VLIBCPopen: " + std::string(kExiftoolPath) + " -S -" + kRotationTag + " " +
+                 rawPath);
     return {};
   }
   std::string value;

@@ -1,39 +1,29 @@
 #include "source/raw_image.h"
 
-#include <sys/stat.h>
-#include <syslog.h>
-#include <unistd.h>
-
 #include <algorithm>
 #include <cerrno>
 #include <cstdio>
 #include <cstring>
 #include <limits>
-#include <memory>
 
 #include "convert/photo_convert_job.h"
 #include "platform/velaindex.h"
 #include "platform/velautils.h"
 #include "platform/vlibc.h"
+#include "posix/descriptor_copy.h"
+#include "posix/files.h"
+#include "posix/log.h"
 #include "profiles/thumbnail_profile.h"
 #include "source/orientation.h"
 #include "source/tool_output.h"
-#include "thumb/log_source.h"
+#include "storage/log_source.h"
 
-using vela::kAllPhases;
-using vela::kConvertToolPath;
-using vela::kLogSource;
-using vela::SplitTagLine;
-using vela::ToolOutput;
+using namespace vela;
 
 namespace {
 
 constexpr char kDcrawPath[] = "/usr/bin/dcraw";
-
-struct FileCloser {
-  void operator()(FILE* file) const { std::fclose(file); }
-};
-using File = std::unique_ptr<FILE, FileCloser>;
+constexpr unsigned kDecodedCopyMode = 0666;
 
 /// Reads "width x height". Returns false when the text is something else or no size that an image
 /// can have.
@@ -52,45 +42,28 @@ bool ParseSize(const std::string& text, uint32_t& width, uint32_t& height) {
   return true;
 }
 
-/// Writes what was read in one piece. Returns false when not all of it could be written, which is
-/// logged.
-bool WriteAll(int descriptor, const char* data, ssize_t count, const std::string& outPath) {
-  const ssize_t written = write(descriptor, data, static_cast<std::size_t>(count));
-  if (written == -1) {
-    syslog(LOG_ERR, "%s:%d write failed, path=%s, %s", kLogSource, 590, outPath.c_str(),
-           std::strerror(errno));
-    return false;
-  }
-  if (written != count) {
-    syslog(LOG_ERR, "%s:%d write size wrong, read_count=%zd, write_count=%zd", kLogSource, 594,
-           count, written);
-    return false;
-  }
-  return true;
-}
-
-/// Copies everything from one descriptor to the other. Returns true when there was anything and all
-/// of it arrived.
-bool CopyOutput(int from, int to, const std::string& rawPath, const std::string& outPath) {
-  char buffer[4096];
-  int64_t total = 0;
-  for (;;) {
-    const ssize_t count = read(from, buffer, sizeof buffer);
-    if (count == -1) {
-      syslog(LOG_ERR, "%s:%d read failed, path=%s", kLogSource, 583, rawPath.c_str());
-      return false;
-    }
-    if (count == 0) {
-      return total > 0;
-    }
-    if (!WriteAll(to, buffer, count, outPath)) {
-      return false;
-    }
-    total += count;
+/// Logs why a decoded copy was not written completely.
+void LogIncompleteCopy(const CopyResult& copy, const std::string& rawPath,
+                       const std::string& outPath) {
+  switch (copy.end) {
+    case CopyEnd::kComplete:
+      break;
+    case CopyEnd::kReadFailed:
+      LogError(kProgramLogSource, 583, "read failed, path=" + rawPath);
+      break;
+    case CopyEnd::kWriteFailed:
+      LogError(kProgramLogSource, 590,
+               "write failed, path=" + outPath + ", " + std::strerror(copy.error));
+      break;
+    case CopyEnd::kWriteCut:
+      LogError(kProgramLogSource, 594,
+               "write size wrong, read_count=" + std::to_string(copy.piece) +
+                   ", write_count=" + std::to_string(copy.taken));
+      break;
   }
 }
 
-/// Tells whether the largest thumbnail can be made from the preview without enlarging it.
+/// Returns true when the largest thumbnail can be made from the preview without enlarging it.
 bool IsPreviewLargeEnough(const DirectoryJob& job, const std::string& previewPath) {
   uint32_t width = 0;
   uint32_t height = 0;
@@ -102,7 +75,8 @@ bool IsPreviewLargeEnough(const DirectoryJob& job, const std::string& previewPat
   return largest != nullptr && std::max(width, height) >= static_cast<uint32_t>(largest->size());
 }
 
-/// Turns the preview in place as the raw photo says; it is used as it stands whatever comes of it.
+/// Turns the preview in place as the raw photo says. A preview that could not be turned is used as
+/// it is.
 void TurnPreview(const std::string& rawPath, const std::string& previewPath) {
   const int degrees = GetRawPreviewRotation(rawPath, previewPath);
   if (degrees <= 0) {
@@ -113,8 +87,8 @@ void TurnPreview(const std::string& rawPath, const std::string& previewPath) {
                       previewPath.c_str());
   // Readers of the log know this line as the sign of a turned preview: it is written on success.
   if (runner.run(true, false) == 0) {
-    syslog(LOG_ERR, "%s:%d Failed to rotate %s to %d degree", kLogSource, 650, previewPath.c_str(),
-           degrees);
+    LogError(kProgramLogSource, 650,
+             "Failed to rotate " + previewPath + " to " + std::to_string(degrees) + " degree");
   }
 }
 
@@ -126,13 +100,13 @@ std::string Decode(const DirectoryJob& job, const std::string& rawPath,
     TurnPreview(rawPath, previewPath);
     return previewPath;
   }
-  unlink(previewPath.c_str());
+  RemoveFile(previewPath);
   const std::string ppmPath = thumbDir + "/RAW_TEMP.ppm";
   if (DcrawToFile(rawPath, ppmPath, "-w")) {
     return ppmPath;
   }
-  syslog(LOG_ERR, "%s:%d Failed to convert raw %s to pnm", kLogSource, 660, rawPath.c_str());
-  unlink(ppmPath.c_str());
+  LogError(kProgramLogSource, 660, "Failed to convert raw " + rawPath + " to pnm");
+  RemoveFile(ppmPath);
   return {};
 }
 
@@ -148,8 +122,8 @@ int GetImageResolution(const std::string& path, uint32_t& width, uint32_t& heigh
 int GetRawImageSize(const std::string& path, uint32_t& width, uint32_t& height) {
   ToolOutput output(VLIBCPopen(kDcrawPath, "rB", "-i", "-v", path.c_str(), nullptr));
   if (!output.IsOpen()) {
-    syslog(LOG_ERR, "%s:%d [Error] VLIBCPopen: %s -i -v %s", kLogSource, 83, kDcrawPath,
-           path.c_str());
+    LogError(kProgramLogSource, 83,
+             "[Error] VLIBCPopen: " + std::string(kDcrawPath) + " -i -v " + path);
     return 0;
   }
   while (const auto line = output.ReadLine()) {
@@ -164,32 +138,35 @@ int GetRawImageSize(const std::string& path, uint32_t& width, uint32_t& height) 
 bool DcrawToFile(const std::string& rawPath, const std::string& outPath, const char* option) {
   const ToolOutput output(VLIBCPopen(kDcrawPath, "r", option, "-c", rawPath.c_str(), nullptr));
   if (!output.IsOpen()) {
-    AppLogError(LOG_ERR, "%s:%d VLIBCPopen [%s %s -c] failed", kLogSource, 569, kDcrawPath, option);
+    AppLogError(kErrorPriority, "%s:%d VLIBCPopen [%s %s -c] failed", kProgramLogSource, 569,
+                kDcrawPath, option);
     return false;
   }
-  const File file(std::fopen(outPath.c_str(), "wbe"));
-  if (file == nullptr) {
-    syslog(LOG_ERR, "%s:%d fopen failed, path=%s, errno=%d", kLogSource, 574, outPath.c_str(),
-           errno);
+  const FileDescriptor file = CreateEmptyFile(outPath, kDecodedCopyMode);
+  if (!file.IsOpen()) {
+    LogError(kProgramLogSource, 574,
+             "fopen failed, path=" + outPath + ", errno=" + std::to_string(errno));
     return false;
   }
-  return CopyOutput(output.Descriptor(), fileno(file.get()), rawPath, outPath);
+  const CopyResult copy = CopyDescriptor(output.Descriptor(), file.Get());
+  LogIncompleteCopy(copy, rawPath, outPath);
+  return copy.end == CopyEnd::kComplete && copy.total > 0;
 }
 
 std::string ConvertRawToJpeg(const DirectoryJob& job, const std::string& rawPath,
                              const std::string& thumbDir) {
-  struct stat before = {};
-  if (stat(rawPath.c_str(), &before) != 0 || !S_ISREG(before.st_mode)) {
-    syslog(LOG_ERR, "%s:%d %s is not regular file", kLogSource, 628, rawPath.c_str());
+  const auto before = ExamineFile(rawPath);
+  if (!before || !before->isRegular) {
+    LogError(kProgramLogSource, 628, rawPath + " is not regular file");
     return {};
   }
   const std::string result = Decode(job, rawPath, thumbDir);
   if (result.empty()) {
     return {};
   }
-  struct stat after = {};
-  if (stat(rawPath.c_str(), &after) != 0 || after.st_blocks != before.st_blocks) {
-    unlink(result.c_str());
+  const auto after = ExamineFile(rawPath);
+  if (!after || after->blocks != before->blocks) {
+    RemoveFile(result);
     return {};
   }
   return result;

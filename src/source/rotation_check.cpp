@@ -1,24 +1,20 @@
 #include "source/rotation_check.h"
 
-#include <sys/stat.h>
-#include <syslog.h>
-
 #include <cstdlib>
 
 #include "platform/velaindex.h"
 #include "platform/vlibc.h"
+#include "posix/files.h"
 #include "posix/glob_matches.h"
+#include "posix/log.h"
 #include "profiles/photo_thumb_plan.h"
 #include "profiles/thumbnail_profile.h"
 #include "source/raw_image.h"
 #include "source/tool_output.h"
-#include "thumb/file_helpers.h"
-#include "thumb/log_source.h"
+#include "storage/file_helpers.h"
+#include "storage/log_source.h"
 
-using vela::EscapePattern;
-using vela::kAllPhases;
-using vela::kLogSource;
-using vela::ToolOutput;
+using namespace vela;
 
 namespace {
 
@@ -43,15 +39,13 @@ Reference FindReference(const DirectoryJob& job, const std::string& thumbDir) {
   return {};
 }
 
-/// Tells whether one of the two is lying and the other standing; a square is neither.
+/// Returns true when one of the two is landscape and the other portrait; a square is neither.
 bool IsCrossed(const std::string& photoPath, const std::string& referencePath) {
-  struct stat status = {};
   uint32_t photoWidth = 0;
   uint32_t photoHeight = 0;
   uint32_t width = 0;
   uint32_t height = 0;
-  if (stat(referencePath.c_str(), &status) != 0 ||
-      GetImageResolution(photoPath, photoWidth, photoHeight) != 1 ||
+  if (!ExamineFile(referencePath) || GetImageResolution(photoPath, photoWidth, photoHeight) != 1 ||
       GetImageResolution(referencePath, width, height) != 1) {
     return false;
   }
@@ -92,8 +86,8 @@ int CompareWithReference(const DirectoryJob& job, const std::string& photoPath,
 
 void RemoveTrialImages(const std::string& thumbDir) {
   if (RemoveFilesByPattern(EscapePattern(thumbDir) + kTrialPattern) == -1) {
-    AppLogError(LOG_ERR, "%s:%d Failed to remove files by pattern [%s%s]", kLogSource, 334,
-                thumbDir.c_str(), kTrialPattern);
+    AppLogError(kErrorPriority, "%s:%d Failed to remove files by pattern [%s%s]", kProgramLogSource,
+                334, thumbDir.c_str(), kTrialPattern);
   }
 }
 
@@ -103,8 +97,9 @@ int CompareImagesMAE(const std::string& imageA, const std::string& imageB) {
   ToolOutput output(VLIBCPopen(kComparePath, "rE", "-metric", "MAE", imageA.c_str(), imageB.c_str(),
                                "null:", nullptr));
   if (!output.IsOpen()) {
-    syslog(LOG_ERR, "%s:%d [Error] VLIBCPopen: %s -metric MAE %s %s null:", kLogSource, 152,
-           kComparePath, imageA.c_str(), imageB.c_str());
+    LogError(kProgramLogSource, 152,
+             "[Error] VLIBCPopen: " + std::string(kComparePath) + " -metric MAE " + imageA + " " +
+                 imageB + " null:");
     return kUnknownDistance;
   }
   const auto line = output.ReadLine();

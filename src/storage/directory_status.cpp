@@ -1,17 +1,13 @@
 #include "storage/directory_status.h"
 
-#include <syslog.h>
-
 #include "platform/velaindex.h"
-#include "storage/directory_entries.h"
-#include "storage/status_log_source.h"
+#include "posix/cut_text.h"
+#include "posix/directory_entries.h"
+#include "posix/log.h"
+#include "storage/log_source.h"
 #include "storage/velamk_thumb_status.h"
 
-using vela::DirectoryEntries;
-using vela::DirectoryEntryPath;
-using vela::kStatusLogSource;
-using vela::PhotoThumbStates;
-using vela::ReadPhotoThumbStates;
+using namespace vela;
 
 namespace {
 
@@ -31,7 +27,7 @@ bool ForEachPhotoStatus(const char* dir, const PhotoStatusVisitor& visit) {
   }
   DirectoryEntries entries(dir);
   if (!entries.IsOpen()) {
-    syslog(LOG_ERR, "%s:%d [Error] opendir: %s", kStatusLogSource, 153, dir);
+    LogError(kStatusLogSource, 153, "[Error] opendir: " + LogText(dir));
     return false;
   }
   const int32_t sizeMap = DirectorySizeMap(dir);
@@ -39,7 +35,7 @@ bool ForEachPhotoStatus(const char* dir, const PhotoStatusVisitor& visit) {
     if (EntryNameShouldIndex(name) != 1) {
       continue;
     }
-    const std::string path = DirectoryEntryPath(dir, name);
+    const std::string path = JoinPath(dir, name);
     if (BlVELAIndexIsPhotoOnWebConvertFile(path.c_str())) {
       visit(path, ReadPhotoThumbStates(path.c_str(), sizeMap));
     }
@@ -52,9 +48,24 @@ bool ForEachPhotoStatus(const char* dir, const PhotoStatusVisitor& visit) {
 void GetDirThumbStatus(const char* dir, int* photosOut, int* thumbsOut) {
   *photosOut = 0;
   *thumbsOut = 0;
-  vela::ForEachPhotoStatus(dir, [&](const std::string&, const PhotoThumbStates& photo) {
+  ForEachPhotoStatus(dir, [&](const std::string&, const PhotoThumbStates& photo) {
     const int missing = photo.Missing();
     *photosOut += missing >= 1 ? 1 : 0;
     *thumbsOut += missing;
   });
+}
+
+int CountDirEntries(const char* path) {
+  if (IsDirExist(path) == 0) {
+    return 0;
+  }
+  DirectoryEntries entries(path);
+  if (!entries.IsOpen()) {
+    return 0;
+  }
+  int count = 0;
+  while (entries.NextName() != nullptr) {
+    ++count;
+  }
+  return count;
 }

@@ -1,9 +1,8 @@
 #include "storage/fail_marker.h"
 
-#include <sys/stat.h>
-
 #include "platform/velaindex.h"
 #include "posix/cut_text.h"
+#include "posix/files.h"
 
 namespace vela {
 
@@ -16,12 +15,11 @@ std::optional<time_t> FindFailMarker(const char* path, const EAThumbInfo& row) {
   const std::string name = FailMarkerPath(row.name);
   const std::string oldName = FailMarkerPath(row.oldName);
   char marker[kPathBufferSize] = "";
-  struct stat status = {};
-  if (GetEAFilePath(path, name.c_str(), oldName.c_str(), marker, sizeof marker) != 0 ||
-      stat(marker, &status) != 0) {
+  if (GetEAFilePath(path, name.c_str(), oldName.c_str(), marker, sizeof marker) != 0) {
     return std::nullopt;
   }
-  return status.st_mtime;
+  const std::optional<FileStatus> status = ExamineFile(marker);
+  return status ? std::optional<time_t>(status->modified) : std::nullopt;
 }
 
 }  // namespace vela

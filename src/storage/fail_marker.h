@@ -1,4 +1,4 @@
-// The empty file that stands for a thumbnail that could not be made.
+// The failure marker: an empty file in place of a thumbnail that could not be made.
 #pragma once
 
 #include <ctime>
@@ -13,7 +13,7 @@ namespace vela {
 /// Empty for a path without an extension.
 std::string FailMarkerPath(const std::string& thumbPath);
 
-/// Returns when the failure marker of the size class `row` of the photo `path` was left (seconds
+/// Returns when the failure marker of the size class `row` of the photo `path` was created (seconds
 /// since the epoch), nothing when there is none under either name.
 std::optional<time_t> FindFailMarker(const char* path, const EAThumbInfo& row);
 

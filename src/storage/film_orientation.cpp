@@ -1,25 +1,22 @@
 // Whether the films of a video stand as the video does.
-#include <syslog.h>
 
 #include <algorithm>
 #include <iterator>
 
 #include "platform/velaindex.h"
 #include "posix/cut_text.h"
+#include "posix/log.h"
 #include "storage/film_names.h"
 #include "storage/log_source.h"
 #include "storage/velamk_util.h"
 
-using vela::FilmName;
-using vela::kMetadataLogSource;
-using vela::kOrientedFilms;
-using vela::kPathBufferSize;
+using namespace vela;
 
 int IsVideoRotated(const char* path) {
   _VIDEO_METADATA_ metadata = {};
   if (VELAIDX_GetVideoMetadata(path, &metadata) < 0) {
-    syslog(LOG_ERR, "%s:%d Failed to get media metadata from file [%s].", kMetadataLogSource, 213,
-           path);
+    LogError(kMetadataLogSource, 213,
+             "Failed to get media metadata from file [" + LogText(path) + "].");
     return 0;
   }
   const int32_t rotation = metadata.rotation;
@@ -37,7 +34,7 @@ int HasConvertedFilm(const char* path) {
 
 int IsEAFileOrientationMatched(const char* path, const char* name, const char* oldName) {
   if (path == nullptr) {
-    syslog(LOG_ERR, "%s:%d Bad parameters.", kMetadataLogSource, 166);
+    LogError(kMetadataLogSource, 166, "Bad parameters.");
     return -1;
   }
   char film[kPathBufferSize] = "";

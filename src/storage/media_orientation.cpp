@@ -1,16 +1,16 @@
-#include <syslog.h>
 
 #include "ipc/velamk_ipc.h"
 #include "platform/velaindex.h"
+#include "posix/log.h"
 #include "storage/log_source.h"
 #include "storage/velamk_util.h"
 
-using vela::kMetadataLogSource;
+using namespace vela;
 
 int IsMediaPortraitInDB(const char* path) {
   VELA_MEDIA_INFO media = {};
   if (GetMediaFromPluginDB(THUMB_TYPE_PHOTO, path, media) < 0) {
-    syslog(LOG_ERR, "%s:%d fail to get media from plugin db: %s", kMetadataLogSource, 128, path);
+    LogError(kMetadataLogSource, 128, "fail to get media from plugin db: " + LogText(path));
     return 0;
   }
   return media.width < media.height ? 1 : 0;

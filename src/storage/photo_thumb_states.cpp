@@ -1,16 +1,17 @@
 #include "storage/photo_thumb_states.h"
 
-#include <sys/stat.h>
-#include <syslog.h>
-
 #include <algorithm>
+#include <optional>
 #include <string>
 
 #include "platform/velaindex.h"
 #include "posix/cut_text.h"
-#include "storage/status_log_source.h"
+#include "posix/log.h"
+#include "storage/log_source.h"
 #include "storage/thumb_age.h"
 #include "storage/velamk_thumb_status.h"
+
+using namespace vela;
 
 namespace vela {
 
@@ -25,49 +26,32 @@ bool ResolveSizeMap(const char* path, int32_t& sizeMap) {
   if (VELAIDX_GetThumbSizeMap(path, THUMB_TYPE_PHOTO, &sizeMap) >= 0) {
     return true;
   }
-  syslog(LOG_ERR, "%s:%d [Error] get thumb size map: %s", kStatusLogSource, 96, path);
+  LogError(kStatusLogSource, 96, "[Error] get thumb size map: " + LogText(path));
   return false;
 }
 
-/// Looks at one thumbnail after the other of a photo that is examined only once.
+/// Examines the thumbnails of one photo; the photo itself is examined only once.
 class PhotoThumbs {
  public:
   PhotoThumbs(const char* path, const char* eaDir) : path_(path), eaDir_(eaDir) {}
 
   ThumbState StateOf(const EAThumbInfo& row) {
-    if (IsGoodFile(row.name)) {
-      return ThumbState::kPresent;
-    }
-    const char* name = IsEAFileExist(eaDir_.c_str(), nullptr, row.name, row.oldName);
-    if (name == nullptr) {
+    EAFileStatus thumb = {};
+    if (FindEAFile(eaDir_, row.name, row.oldName, &thumb) == nullptr) {
       return ThumbState::kMissing;
     }
-    return IsOutdated(name) ? ThumbState::kOutdated : ThumbState::kPresent;
+    if (!photo_) {
+      photo_ = ExamineMediaFile(path_);
+    }
+    // A photo that cannot be examined never has its thumbnails made again.
+    const bool isOutdated = photo_ && IsDerivedFileOutdated(*photo_, thumb.size, thumb.modified);
+    return isOutdated ? ThumbState::kOutdated : ThumbState::kPresent;
   }
 
  private:
-  /// Answers the usual case, a good thumbnail under its current name, from one look at the file.
-  bool IsGoodFile(const char* name) {
-    const std::string path = eaDir_ + '/' + name;
-    struct stat thumb = {};
-    if (path.size() >= kPathBufferSize || stat(path.c_str(), &thumb) != 0 ||
-        !S_ISREG(thumb.st_mode)) {
-      return false;
-    }
-    known_ = known_ || stat(path_, &photo_) == 0;
-    return known_ && !IsDerivedFileOutdated(photo_, thumb);
-  }
-
-  bool IsOutdated(const char* name) {
-    known_ = known_ || StatMediaFile(path_, photo_);
-    // A photo that cannot be examined never has its thumbnails made again.
-    return known_ && IsDerivedFileOutdated(photo_, DerivedFilePath(eaDir_, name));
-  }
-
   const char* path_;
-  const std::string eaDir_;
-  bool known_ = false;
-  struct stat photo_ = {};
+  const char* eaDir_;
+  std::optional<FileStatus> photo_;
 };
 
 }  // namespace
@@ -92,7 +76,7 @@ PhotoThumbStates ReadPhotoThumbStates(const char* path, int32_t sizeMap) {
   photo.lookup = PhotoLookup::kFailed;
   char eaDir[kPathBufferSize] = "";
   if (VELAEADirPath(0, path, eaDir, sizeof eaDir) != 0) {
-    syslog(LOG_ERR, "%s:%d [Error] get eadir: %s", kStatusLogSource, 89, path);
+    LogError(kStatusLogSource, 89, "[Error] get eadir: " + LogText(path));
     return photo;
   }
   if (!ResolveSizeMap(path, sizeMap)) {
@@ -111,7 +95,7 @@ PhotoThumbStates ReadPhotoThumbStates(const char* path, int32_t sizeMap) {
 }  // namespace vela
 
 void GetThumbStatus(const char* path, int* missingOut, int* presentOut, int32_t sizeMap) {
-  const vela::PhotoThumbStates photo = vela::ReadPhotoThumbStates(path, sizeMap);
+  const PhotoThumbStates photo = ReadPhotoThumbStates(path, sizeMap);
   *missingOut = photo.Missing();
   *presentOut = photo.Present();
 }

@@ -1,4 +1,4 @@
-// How the thumbnails of one photo are, size class by size class.
+// The states of one photo's thumbnails, size class by size class.
 #pragma once
 
 #include <array>
@@ -16,7 +16,7 @@ enum class ThumbState {
   kOutdated,  ///< older than the photo, or empty
 };
 
-/// How the look at a photo has ended.
+/// How the lookup of a photo ended.
 enum class PhotoLookup {
   kAbsent,  ///< there is no such file
   kFailed,  ///< its thumbnails cannot be looked up
@@ -26,7 +26,7 @@ enum class PhotoLookup {
 /// The states of a photo's thumbnails by size class.
 struct PhotoThumbStates {
   PhotoLookup lookup = PhotoLookup::kAbsent;
-  std::array<ThumbState, kEAThumbCount> states = {};
+  std::array<ThumbState, kThumbSizeCount> states = {};
 
   /// Returns whether the thumbnail of the size class `size` is missing or outdated.
   bool IsLacking(size_t size) const {

@@ -1,46 +1,37 @@
 #include "storage/thumb_age.h"
 
-#include <syslog.h>
-
 #include "posix/cut_text.h"
+#include "posix/log.h"
 #include "storage/log_source.h"
 #include "storage/metadata_dir.h"
 #include "storage/velamk_util.h"
 
-using vela::CutText;
-using vela::FindMetadataDir;
-using vela::kMetadataLogSource;
+using namespace vela;
 
 namespace vela {
 
-std::string DerivedFilePath(const std::string& eaDir, const char* name) {
-  return CutText(eaDir + "/" + name);
-}
-
-bool StatMediaFile(const char* path, struct stat& out) {
-  if (stat(path, &out) == 0) {
-    return true;
+std::optional<FileStatus> ExamineMediaFile(const char* path) {
+  const std::optional<FileStatus> status = ExamineFile(path);
+  if (!status) {
+    LogError(kMetadataLogSource, 64, "Fail to get " + LogText(path) + " file information");
   }
-  syslog(LOG_ERR, "%s:%d Fail to get %s file information", kMetadataLogSource, 64, path);
-  return false;
+  return status;
 }
 
-bool IsDerivedFileOutdated(const struct stat& source, const struct stat& derived) {
-  return source.st_mtim.tv_sec > derived.st_mtim.tv_sec || derived.st_size < 1;
-}
-
-bool IsDerivedFileOutdated(const struct stat& source, const std::string& derivedPath) {
-  struct stat derived = {};
-  return stat(derivedPath.c_str(), &derived) != 0 || IsDerivedFileOutdated(source, derived);
+bool IsDerivedFileOutdated(const FileStatus& source, int64_t size, int64_t modified) {
+  return source.modified > modified || size < 1;
 }
 
 }  // namespace vela
 
 int IsEAThumbOutdated(const char* path, const char* name) {
-  struct stat source = {};
+  const auto source = ExamineMediaFile(path);
   std::string eaDir;
-  if (!vela::StatMediaFile(path, source) || !FindMetadataDir(path, 69, eaDir)) {
+  if (!source || !FindMetadataDir(path, 69, eaDir)) {
     return 0;
   }
-  return vela::IsDerivedFileOutdated(source, vela::DerivedFilePath(eaDir, name)) ? 1 : 0;
+  const auto derived = ExamineFile(JoinPath(eaDir, name));
+  const bool isOutdated =
+      !derived || IsDerivedFileOutdated(*source, derived->size, derived->modified);
+  return isOutdated ? 1 : 0;
 }

@@ -1,24 +1,19 @@
-// Whether a derived file still fits the state of its source.
+// Whether a derived file is up to date with its source.
 #pragma once
 
-#include <sys/stat.h>
-
+#include <optional>
 #include <string>
+
+#include "posix/files.h"
 
 namespace vela {
 
-/// Returns the path of the derived file `name` in the metadata directory `eaDir`, cut to what a
-/// path buffer holds.
-std::string DerivedFilePath(const std::string& eaDir, const char* name);
-
-/// Examines the media file `path`, symbolic links followed. Returns false on failure, which is
+/// Examines the media file `path`, symbolic links followed. Returns nothing on failure, which is
 /// logged.
-bool StatMediaFile(const char* path, struct stat& out);
+std::optional<FileStatus> ExamineMediaFile(const char* path);
 
-/// Returns true when the derived file is empty or older (whole seconds) than `source`.
-bool IsDerivedFileOutdated(const struct stat& source, const struct stat& derived);
-
-/// Returns true when the derived file is missing, empty, or older (whole seconds) than `source`.
-bool IsDerivedFileOutdated(const struct stat& source, const std::string& derivedPath);
+/// Returns true when a derived file of `size` bytes, modified at `modified` (seconds since the
+/// epoch), is empty or older than `source`.
+bool IsDerivedFileOutdated(const FileStatus& source, int64_t size, int64_t modified);
 
 }  // namespace vela

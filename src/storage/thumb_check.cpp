@@ -1,17 +1,15 @@
 #include "storage/velamk_util.h"
 
-#include <syslog.h>
-
 #include <string>
 
 #include "platform/velaindex.h"
+#include "posix/cut_text.h"
+#include "posix/log.h"
 #include "storage/log_source.h"
 #include "storage/metadata_dir.h"
 #include "storage/thumb_age.h"
 
-using vela::DerivedFilePath;
-using vela::FindMetadataDir;
-using vela::kMetadataLogSource;
+using namespace vela;
 
 namespace {
 
@@ -20,7 +18,7 @@ bool IsThumbGood(const char* path, const std::string& eaDir, const char* name) {
   if (IsEAThumbOutdated(path, name) == 1) {
     return false;
   }
-  const std::string thumbPath = DerivedFilePath(eaDir, name);
+  const std::string thumbPath = JoinPath(eaDir, name);
   return IsMediaPortraitInDB(path) == IsFilePortrait(thumbPath.c_str());
 }
 
@@ -42,7 +40,7 @@ bool CheckThumb(const char* path, const std::string& eaDir, const EAThumbInfo& r
 
 int CheckEAThumbs(const char* path, int32_t sizeMap) {
   if (path == nullptr) {
-    syslog(LOG_ERR, "%s:%d Bad parameters.", kMetadataLogSource, 545);
+    LogError(kMetadataLogSource, 545, "Bad parameters.");
     return 0;
   }
   std::string eaDir;

@@ -1,16 +1,13 @@
 #include "storage/thumb_size_class.h"
 
-#include <syslog.h>
+#include <iterator>
 
-#include <cstring>
-
+#include "posix/log.h"
 #include "storage/log_source.h"
 
-using vela::kEAThumbCount;
-using vela::kMetadataLogSource;
-using vela::kThumbSizesSmallestFirst;
+using namespace vela;
 
-constexpr EAThumbInfo rgEAThumbInfo[kEAThumbCount] = {
+constexpr EAThumbInfo rgEAThumbInfo[kThumbSizeCount] = {
     {EA_THUMB_SIZE_S, "120x120", "VELAPHOTO_THUMB_S.jpg", "VELAPHOTO:THUMB_S.jpg"},
     {EA_THUMB_SIZE_M, "320x320", "VELAPHOTO_THUMB_M.jpg", "VELAPHOTO:THUMB_M.jpg"},
     {EA_THUMB_SIZE_B, "640x640", "VELAPHOTO_THUMB_B.jpg", "VELAPHOTO:THUMB_B.jpg"},
@@ -21,13 +18,9 @@ constexpr EAThumbInfo rgEAThumbInfo[kEAThumbCount] = {
 
 namespace {
 
-bool IsNameOf(const EAThumbInfo& row, const char* name) {
-  return std::strcmp(name, row.name) == 0 || std::strcmp(name, row.oldName) == 0;
-}
-
 constexpr bool IsIndexedBySize() {
-  for (int i = 0; i < kEAThumbCount; ++i) {
-    if (rgEAThumbInfo[i].size != i) {
+  for (int i = 0; i < kThumbSizeCount; ++i) {
+    if (rgEAThumbInfo[i].size != i || kThumbSizeTraits[i].size != i) {
       return false;
     }
   }
@@ -35,27 +28,70 @@ constexpr bool IsIndexedBySize() {
 }
 static_assert(IsIndexedBySize(), "a row's position is its size class");
 
+/// Returns true when `sizeString` is a square box of this edge length.
+constexpr bool IsSquareOf(int edge, std::string_view sizeString) {
+  const std::string_view width = sizeString.substr(0, sizeString.find('x'));
+  int number = 0;
+  for (const char digit : width) {
+    number = number * 10 + (digit - '0');
+  }
+  return number == edge && sizeString.substr(width.size() + 1) == width;
+}
+
+constexpr bool HaveEqualSizes() {
+  for (int i = 0; i < kThumbSizeCount; ++i) {
+    if (!IsSquareOf(kThumbSizeTraits[i].edge, rgEAThumbInfo[i].sizeString)) {
+      return false;
+    }
+  }
+  return true;
+}
+static_assert(HaveEqualSizes(), "both tables have the same sizes");
+
+constexpr bool IsSmallestFirst() {
+  for (int i = 1; i < kThumbSizeCount; ++i) {
+    if (kThumbSizeTraits[kThumbSizesSmallestFirst[i - 1]].edge >=
+        kThumbSizeTraits[kThumbSizesSmallestFirst[i]].edge) {
+      return false;
+    }
+  }
+  return true;
+}
+static_assert(IsSmallestFirst(), "the order is by size and names each size class once");
+
 }  // namespace
+
+namespace vela {
+
+const ThumbSizeTraits* FindThumbSize(std::string_view name) {
+  for (const EAThumbInfo& row : rgEAThumbInfo) {
+    if (name == row.name || name == row.oldName) {
+      return &kThumbSizeTraits[row.size];
+    }
+  }
+  return nullptr;
+}
+
+}  // namespace vela
 
 int GetEAThumbInfoTable(const EAThumbInfo** out) {
   *out = rgEAThumbInfo;
-  return kEAThumbCount;
+  return static_cast<int>(std::size(rgEAThumbInfo));
 }
 
 const char* GetEAThumbSizeString(int value) {
   if (value < 0) {
-    syslog(LOG_ERR, "%s:%d Bad parameters.", kMetadataLogSource, 47);
+    LogError(kMetadataLogSource, 47, "Bad parameters.");
     return nullptr;
   }
   return rgEAThumbInfo[value].sizeString;
 }
 
 int IsThumbInSizeMap(const char* name, int32_t sizeMap) {
-  for (const EA_THUMB_SIZE size : kThumbSizesSmallestFirst) {
-    if (IsNameOf(rgEAThumbInfo[size], name)) {
-      return (sizeMap & (1 << size)) != 0 ? 1 : 0;
-    }
+  const ThumbSizeTraits* traits = name == nullptr ? nullptr : FindThumbSize(name);
+  if (traits == nullptr) {
+    LogError(kMetadataLogSource, 113, "[Error] invalid thumb filename: " + LogText(name));
+    return 0;
   }
-  syslog(LOG_ERR, "%s:%d [Error] invalid thumb filename: %s", kMetadataLogSource, 113, name);
-  return 0;
+  return (sizeMap & (1 << traits->size)) != 0 ? 1 : 0;
 }

@@ -2,6 +2,9 @@
 #pragma once
 
 #include <cstdint>
+#include <string_view>
+
+#include "platform/system_rules.h"
 
 /// Size classes. The values are bit positions in the size map and therefore out of size order.
 enum EA_THUMB_SIZE : int32_t {
@@ -21,22 +24,34 @@ struct EAThumbInfo {
   const char* oldName;     ///< its older form, with a colon
 };
 
-namespace vela {
-
-/// Number of size classes.
-inline constexpr int kEAThumbCount = 6;
-
-}  // namespace vela
-
 /// The size classes by value.
-extern const EAThumbInfo rgEAThumbInfo[vela::kEAThumbCount];
+extern const EAThumbInfo rgEAThumbInfo[vela::kThumbSizeCount];
 
 namespace vela {
+
+/// What distinguishes a size class beyond its row in rgEAThumbInfo.
+struct ThumbSizeTraits {
+  EA_THUMB_SIZE size;
+  const char* shortName;  ///< as reports show it
+  int edge;               ///< edge length of the box in pixels
+  bool fillsArea;         ///< the thumbnail fills its box; otherwise it fits into it
+};
+
+/// The traits of the size classes by value.
+inline constexpr ThumbSizeTraits kThumbSizeTraits[kThumbSizeCount] = {
+    {EA_THUMB_SIZE_S, "S", 120, false},   {EA_THUMB_SIZE_M, "M", 320, true},
+    {EA_THUMB_SIZE_B, "B", 640, false},   {EA_THUMB_SIZE_L, "L", 800, true},
+    {EA_THUMB_SIZE_XL, "XL", 1280, true}, {EA_THUMB_SIZE_SM, "SM", 240, true},
+};
 
 /// The size classes from the smallest to the largest; their values are in another order.
-inline constexpr EA_THUMB_SIZE kThumbSizesSmallestFirst[kEAThumbCount] = {
+inline constexpr EA_THUMB_SIZE kThumbSizesSmallestFirst[kThumbSizeCount] = {
     EA_THUMB_SIZE_S, EA_THUMB_SIZE_SM, EA_THUMB_SIZE_M,
     EA_THUMB_SIZE_B, EA_THUMB_SIZE_L,  EA_THUMB_SIZE_XL};
+
+/// Returns the size class of the thumbnail file name `name` (either form), null when it belongs to
+/// none.
+const ThumbSizeTraits* FindThumbSize(std::string_view name);
 
 }  // namespace vela
 

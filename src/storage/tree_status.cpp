@@ -5,8 +5,7 @@
 #include "storage/creation_queue.h"
 #include "storage/velamk_thumb_status.h"
 
-using vela::IsQueued;
-using vela::kPhotoQueue;
+using namespace vela;
 
 namespace {
 

@@ -1,29 +1,19 @@
 // Whether a video has the films that it needs.
-#include <syslog.h>
 
 #include <initializer_list>
 #include <string>
 
 #include "ipc/velamk_ipc.h"
+#include "platform/system_rules.h"
 #include "platform/velaindex.h"
 #include "platform/vlibc.h"
+#include "posix/log.h"
 #include "storage/film_names.h"
 #include "storage/log_source.h"
 #include "storage/metadata_dir.h"
 #include "storage/velamk_util.h"
 
-using vela::FilmName;
-using vela::FindMetadataDir;
-using vela::kConvertedMpeg4Film;
-using vela::kFlashFilm;
-using vela::kH264Film;
-using vela::kHighFilm;
-using vela::kIphoneFilm;
-using vela::kLowFilm;
-using vela::kMediumFilm;
-using vela::kMetadataLogSource;
-using vela::kMobileFilm;
-using vela::kMpeg4Film;
+using namespace vela;
 
 namespace {
 
@@ -44,7 +34,7 @@ enum class FilmQuality { kGood, kPoor, kUnknown };
 FilmQuality JudgeFilm(const char* path, int line) {
   VELA_MEDIA_INFO media = {};
   if (GetMediaFromPluginDB(THUMB_TYPE_PHOTO, path, media) < 0) {
-    syslog(LOG_ERR, "%s:%d fail to get media from plugin db: %s", kMetadataLogSource, line, path);
+    LogError(kMetadataLogSource, line, "fail to get media from plugin db: " + LogText(path));
     return FilmQuality::kUnknown;
   }
   return media.bitrate < kHighBitrate ? FilmQuality::kGood : FilmQuality::kPoor;
@@ -107,14 +97,14 @@ struct CheckLines {
 /// Returns false, logged, when `path` is null or has no metadata directory.
 bool BeginCheck(const char* path, const CheckLines& lines, std::string& eaDir) {
   if (path == nullptr) {
-    syslog(LOG_ERR, "%s:%d Bad parameters.", kMetadataLogSource, lines.badParameters);
+    LogError(kMetadataLogSource, lines.badParameters, "Bad parameters.");
     return false;
   }
   return FindMetadataDir(path, lines.noMetadataDir, eaDir);
 }
 
 bool AreMobileFilmsWanted() {
-  return VLIBCFileCheckKeyValue("/etc/velainfo.conf", "enable_mobile_video", "yes", 0) != 0;
+  return VLIBCFileCheckKeyValue(kSettingsFile, "enable_mobile_video", "yes", 0) != 0;
 }
 
 }  // namespace
@@ -142,7 +132,7 @@ int IsMobileVideoConverted(const char* path) {
 
 int IsVideoConverted(const char* path) {
   if (path == nullptr) {
-    syslog(LOG_ERR, "%s:%d Bad parameters.", kMetadataLogSource, 509);
+    LogError(kMetadataLogSource, 509, "Bad parameters.");
     return -1;
   }
   const bool mobileFilmsWanted = AreMobileFilmsWanted();

@@ -1,6 +1,4 @@
 // Videos that need work: one, those of a tree, those of a queue.
-#include <sys/stat.h>
-#include <syslog.h>
 
 #include <algorithm>
 #include <cstring>
@@ -8,22 +6,17 @@
 #include <vector>
 
 #include "platform/velaindex.h"
+#include "posix/cut_text.h"
+#include "posix/directory_entries.h"
+#include "posix/files.h"
+#include "posix/log.h"
 #include "storage/creation_queue.h"
-#include "storage/directory_entries.h"
-#include "storage/status_log_source.h"
+#include "storage/log_source.h"
 #include "storage/velamk_thumb_status.h"
 #include "storage/velamk_util.h"
 #include "storage/video_level.h"
 
-using vela::DirectoryEntries;
-using vela::DirectoryEntryPath;
-using vela::ForEachQueueEntry;
-using vela::HasQueueLine;
-using vela::IsQueued;
-using vela::IsTreeEntry;
-using vela::kStatusLogSource;
-using vela::kVideoQueue;
-using vela::QueueRead;
+using namespace vela;
 
 namespace {
 
@@ -34,16 +27,16 @@ bool AreThumbsMissing(const char* path, int32_t sizeMap) {
   return sizeMap > 0 && CheckEAThumbs(path, sizeMap) == 0;
 }
 
-/// Reads the names of all entries that are indexed, so that no descriptor stays open however deep
-/// a tree is. Returns false on failure, which is logged.
+/// Reads the names of all entries that are indexed, so that no descriptor stays open while a
+/// subdirectory is read. Returns false on failure, which is logged.
 bool ListEntries(const char* dir, std::vector<std::string>& names) {
   if (IsDirExist(dir) == 0) {
-    syslog(LOG_ERR, "%s:%d [Error] dir doesn't exist: %s", kStatusLogSource, 332, dir);
+    LogError(kStatusLogSource, 332, "[Error] dir doesn't exist: " + LogText(dir));
     return false;
   }
   DirectoryEntries entries(dir);
   if (!entries.IsOpen()) {
-    syslog(LOG_ERR, "%s:%d [Error] opendir: %s", kStatusLogSource, 338, dir);
+    LogError(kStatusLogSource, 338, "[Error] opendir: " + LogText(dir));
     return false;
   }
   while (const char* name = entries.NextName()) {
@@ -54,47 +47,33 @@ bool ListEntries(const char* dir, std::vector<std::string>& names) {
   return true;
 }
 
-/// Counts the work in a tree. Remembers the directories that it is in, so that a link which leads
-/// back into one of them does not send it round and round.
+/// Counts the work in a tree. Remembers the directories from the root down to the current one, so
+/// that a link back to one of them does not cause an endless loop.
 class VideoTree {
  public:
   int CountWork(const char* dir);
 
  private:
-  struct Place {
-    dev_t device;
-    ino_t inode;
-  };
-
-  bool IsIn(const Place& place) const;
-
-  std::vector<Place> way_;
+  std::vector<FileIdentity> ancestors_;
 };
 
-bool VideoTree::IsIn(const Place& place) const {
-  return std::any_of(way_.begin(), way_.end(), [&place](const Place& other) {
-    return other.device == place.device && other.inode == place.inode;
-  });
-}
-
 int VideoTree::CountWork(const char* dir) {
-  struct stat status = {};
-  const bool isKnown = stat(dir, &status) == 0;
-  const Place place = {status.st_dev, status.st_ino};
-  if (isKnown && IsIn(place)) {
+  const auto status = ExamineFile(dir);
+  const FileIdentity identity = status ? status->identity : FileIdentity{};
+  if (status && std::find(ancestors_.begin(), ancestors_.end(), identity) != ancestors_.end()) {
     return 0;
   }
-  way_.push_back(place);
+  ancestors_.push_back(identity);
   int below = 0;
   int work = 0;
-  vela::ReadVideoLevel(
+  ReadVideoLevel(
       dir, [&](const std::string& subdirectory) { below += CountWork(subdirectory.c_str()); },
       work);
-  way_.pop_back();
+  ancestors_.pop_back();
   return work + below;
 }
 
-/// Returns the directory of a tree entry: what stands between its first colon and the next.
+/// Returns the directory of a tree entry: the text between its first colon and the next.
 std::string TreeOf(const std::string& entry) {
   const size_t begin = entry.find(':') + 1;
   return entry.substr(begin, entry.find(':', begin) - begin);
@@ -114,13 +93,13 @@ int IsVideoWorkNeeded(const char* path) {
     return 0;
   }
   if (std::strlen(path) > kLongestVideoPath) {
-    syslog(LOG_ERR, "%s:%d [Error] path is too long and can't create thumbnail: %s",
-           kStatusLogSource, 295, path);
+    LogError(kStatusLogSource, 295,
+             "[Error] path is too long and can't create thumbnail: " + LogText(path));
     return 0;
   }
   int32_t sizeMap = 0;
   if (VELAIDX_GetThumbSizeMap(path, THUMB_TYPE_VIDEO, &sizeMap) < 0) {
-    syslog(LOG_ERR, "%s:%d [Error] get thumb size map: %s", kStatusLogSource, 301, path);
+    LogError(kStatusLogSource, 301, "[Error] get thumb size map: " + LogText(path));
     return 0;
   }
   if (AreThumbsMissing(path, sizeMap)) {
@@ -137,10 +116,10 @@ bool ReadVideoLevel(const char* dir, const SubdirectoryVisitor& onSubdirectory, 
   if (!ListEntries(dir, names)) {
     return false;
   }
-  // Kept for the whole level on purpose: what is listed behind a waiting video does not count.
+  // Kept for the whole level on purpose: videos listed after a queued one do not count.
   bool seenQueued = false;
   for (const std::string& name : names) {
-    const std::string path = DirectoryEntryPath(dir, name.c_str());
+    const std::string path = JoinPath(dir, name);
     if (IsDirExist(path.c_str()) != 0) {
       onSubdirectory(path);
     } else if (IsVideoWorkNeeded(path.c_str()) == 1) {
@@ -169,7 +148,7 @@ int CountVideoQueueWork(const char* queueFile) {
     }
   });
   if (read == QueueRead::kNotOpened) {
-    syslog(LOG_ERR, "%s:%d [Error] fopen: %s", kStatusLogSource, 416, queueFile);
+    LogError(kStatusLogSource, 416, "[Error] fopen: " + LogText(queueFile));
   }
   return count;
 }

@@ -1,33 +1,30 @@
 #include "thumb/directory_lock.h"
 
-#include <fcntl.h>
-#include <sys/file.h>
-#include <syslog.h>
-#include <unistd.h>
+#include <utility>
 
-#include "thumb/log_source.h"
+#include "posix/file_lock.h"
+#include "posix/files.h"
+#include "posix/log.h"
+#include "storage/log_source.h"
 
 namespace vela {
 
 DirectoryLock::DirectoryLock(const std::string& path) {
-  // Whatever else bears the name, a pipe for one, must not make the open wait.
-  const int descriptor = open(path.c_str(), O_RDONLY | O_NONBLOCK | O_CLOEXEC);
-  if (descriptor < 0) {
-    syslog(LOG_ERR, "%s:%d Failed to open %s", kLogSource, 844, path.c_str());
+  FileDescriptor directory = OpenForReading(path);
+  if (!directory.IsOpen()) {
+    LogError(kProgramLogSource, 844, "Failed to open " + path);
     return;
   }
-  if (flock(descriptor, LOCK_EX | LOCK_NB) != 0) {
-    syslog(LOG_ERR, "%s:%d Failed to lock %s", kLogSource, 849, path.c_str());
-    close(descriptor);
+  if (TryLockExclusively(directory.Get()) != 0) {
+    LogError(kProgramLogSource, 849, "Failed to lock " + path);
     return;
   }
-  descriptor_ = descriptor;
+  descriptor_ = std::move(directory);
 }
 
 DirectoryLock::~DirectoryLock() {
   if (IsHeld()) {
-    flock(descriptor_, LOCK_UN);
-    close(descriptor_);
+    Unlock(descriptor_.Get());
   }
 }
 

@@ -3,6 +3,8 @@
 
 #include <string>
 
+#include "posix/file_descriptor.h"
+
 namespace vela {
 
 /// Holds the exclusive lock on one metadata root until it is destroyed.
@@ -14,10 +16,10 @@ class DirectoryLock {
   DirectoryLock(const DirectoryLock&) = delete;
   DirectoryLock& operator=(const DirectoryLock&) = delete;
 
-  bool IsHeld() const { return descriptor_ >= 0; }
+  bool IsHeld() const { return descriptor_.IsOpen(); }
 
  private:
-  int descriptor_ = -1;
+  FileDescriptor descriptor_;
 };
 
 }  // namespace vela

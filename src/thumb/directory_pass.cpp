@@ -1,26 +1,21 @@
 #include "thumb/directory_pass.h"
 
-#include <sys/stat.h>
-#include <syslog.h>
-
 #include <algorithm>
 #include <cstring>
 #include <ctime>
 
+#include "platform/system_rules.h"
 #include "platform/velaindex.h"
+#include "posix/directory_entries.h"
+#include "posix/files.h"
+#include "posix/log.h"
 #include "storage/creation_queue.h"
-#include "storage/directory_entries.h"
+#include "storage/file_helpers.h"
+#include "storage/log_source.h"
 #include "thumb/directory_lock.h"
-#include "thumb/file_helpers.h"
-#include "thumb/log_source.h"
 #include "thumb/photo_pass.h"
 
-using vela::DirectoryEntries;
-using vela::DirectoryLock;
-using vela::kLogSource;
-using vela::kPhotoQueue;
-using vela::PhotoEnd;
-using vela::PhotoPass;
+using namespace vela;
 
 namespace {
 
@@ -28,23 +23,23 @@ bool IsPhotoName(const char* name) {
   if (std::strcmp(name, ".") == 0 || std::strcmp(name, "..") == 0) {
     return false;
   }
-  // Other systems keep a file's attributes beside it under its name with this prefix.
+  // Other systems keep a file's attributes next to it under its name with this prefix.
   if (std::strncmp(name, "._", 2) == 0) {
     return false;
   }
   return BlVELAIndexIsPhotoOnWebConvertFile(name);
 }
 
-bool IsRegularFile(const std::string& path) {
-  struct stat status = {};
-  if (stat(path.c_str(), &status) != 0) {
-    syslog(LOG_ERR, "%s:%d [Error] stat: %s", kLogSource, 416, path.c_str());
+bool IsPhotoFile(const std::string& path) {
+  const auto status = ExamineFile(path);
+  if (!status) {
+    LogError(kProgramLogSource, 416, "[Error] stat: " + path);
     return false;
   }
-  return S_ISREG(status.st_mode);
+  return status->isRegular;
 }
 
-/// Takes the photos one after the other. Returns true when the directory needs a later run.
+/// Processes the photos one after the other. Returns true when the directory needs a later run.
 bool MakePhotos(const DirectoryJob& job, const std::string& metadataRoot,
                 const std::vector<std::string>& names, time_t passStart) {
   bool queue = false;
@@ -64,7 +59,7 @@ bool MakePhotos(const DirectoryJob& job, const std::string& metadataRoot,
 
 void QueueDirectory(const std::string& dir) {
   if (WriteIndexQueue(dir.c_str(), kPhotoQueue.file) != 0) {
-    syslog(LOG_ERR, "%s:%d Failed to write [%s] to thumb queue", kLogSource, 1112, dir.c_str());
+    LogError(kProgramLogSource, 1112, "Failed to write [" + dir + "] to thumb queue");
   }
 }
 
@@ -74,11 +69,11 @@ std::vector<std::string> ListDirectoryPhotos(const std::string& dir) {
   std::vector<std::string> names;
   DirectoryEntries entries(dir.c_str());
   if (!entries.IsOpen()) {
-    syslog(LOG_ERR, "%s:%d [Error] opendir: %s", kLogSource, 404, dir.c_str());
+    LogError(kProgramLogSource, 404, "[Error] opendir: " + dir);
     return names;
   }
   while (const char* name = entries.NextName()) {
-    if (IsPhotoName(name) && IsRegularFile(dir + "/" + name)) {
+    if (IsPhotoName(name) && IsPhotoFile(dir + "/" + name)) {
       names.emplace_back(name);
     }
   }
@@ -87,7 +82,7 @@ std::vector<std::string> ListDirectoryPhotos(const std::string& dir) {
 }
 
 void CreateDirectoryThumbs(const DirectoryJob& job) {
-  const std::string metadataRoot = job.path + "/@eaDir";
+  const std::string metadataRoot = job.path + "/" + kMetadataDirName;
   const std::vector<std::string> names = ListDirectoryPhotos(job.path);
   const time_t passStart = std::time(nullptr);
   if (names.empty() || checkCreateDir(metadataRoot) == 0) {

@@ -3,8 +3,11 @@
 #include <cstdio>
 
 #include "platform/velaindex.h"
+#include "posix/files.h"
 #include "profiles/thumbnail_profile.h"
 #include "thumb/directory_pass.h"
+
+using namespace vela;
 
 namespace {
 
@@ -13,16 +16,11 @@ constexpr int kWalkDescriptors = 100;
 /// The walk hands its callback no pointer of the caller's.
 std::string g_profile_path;
 
-bool Exists(const std::string& path) {
-  struct stat status = {};
-  return stat(path.c_str(), &status) == 0;
-}
-
 }  // namespace
 
 void RunDirectoryJob(const std::string& dirPath, const std::string& profileFilePath) {
   ThumbnailProfileList profiles;
-  if (!Exists(dirPath) || !Exists(profileFilePath)) {
+  if (!ExamineFile(dirPath) || !ExamineFile(profileFilePath)) {
     return;
   }
   if (IndexIsPathSupportEAWrite(dirPath.c_str()) == 0) {

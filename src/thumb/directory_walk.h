@@ -8,7 +8,7 @@
 
 /// Makes the thumbnails of the directory `dirPath` with the profiles of `profileFilePath`. Skips a
 /// directory or profile file that does not exist and a directory that may have no metadata; a
-/// profile file that cannot be loaded is told on standard error.
+/// profile file that cannot be loaded is reported on standard error.
 void RunDirectoryJob(const std::string& dirPath, const std::string& profileFilePath);
 
 /// The step of the walk; returns the walk's action code.

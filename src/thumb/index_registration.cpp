@@ -1,15 +1,15 @@
 #include "thumb/index_registration.h"
 
 #include <json/value.h>
-#include <syslog.h>
 
 #include <cstring>
 
 #include "platform/velaindex.h"
+#include "posix/log.h"
 #include "source/raw_image.h"
-#include "thumb/log_source.h"
+#include "storage/log_source.h"
 
-using vela::kLogSource;
+using namespace vela;
 
 namespace {
 
@@ -21,7 +21,7 @@ bool DescribeImage(const std::string& path, int line, VELA_MEDIA_INFO& out) {
   if (GetImageResolution(path, out.width, out.height) == 1) {
     return true;
   }
-  syslog(LOG_ERR, "%s:%d [Error] GetImageResolution: %s", kLogSource, line, path.c_str());
+  LogError(kProgramLogSource, line, "[Error] GetImageResolution: " + path);
   return false;
 }
 

@@ -2,26 +2,22 @@
 //
 // Makes the missing thumbnails of the photos in each directory, with R: also below it.
 
-#include <fcntl.h>
-#include <sys/stat.h>
-#include <unistd.h>
-
 #include <csignal>
 #include <cstring>
 #include <string>
 
+#include "platform/system_rules.h"
 #include "posix/cut_text.h"
+#include "posix/files.h"
+#include "posix/processes.h"
 #include "thumb/velathumb.h"
 
-using vela::CutText;
-using vela::RunDirectoryTree;
+using namespace vela;
 
 namespace {
 
-constexpr char kTreePrefix[] = "R:";
-
 bool IsTree(const char* argument) {
-  return std::strncmp(argument, kTreePrefix, 2) == 0;
+  return std::strncmp(argument, kTreePrefix, std::strlen(kTreePrefix)) == 0;
 }
 
 /// Returns the directory of an argument with the tree prefix, empty when it names none. The
@@ -44,17 +40,6 @@ void RunArgument(const char* argument, const std::string& profileFile) {
   RunDirectoryJob(CutText(argument), profileFile);
 }
 
-/// Makes sure that no file or lock takes the place of a standard descriptor that the caller closed.
-void HoldStandardDescriptors() {
-  int descriptor = 0;
-  do {
-    descriptor = open("/dev/null", O_RDWR);
-  } while (descriptor >= 0 && descriptor <= STDERR_FILENO);
-  if (descriptor > STDERR_FILENO) {
-    close(descriptor);
-  }
-}
-
 }  // namespace
 
 int main(int argc, char** argv) {
@@ -62,7 +47,7 @@ int main(int argc, char** argv) {
     return 1;
   }
   HoldStandardDescriptors();
-  umask(0);
+  CreateFilesWithExactModes();
   KillThumbProcesses();
   std::signal(SIGTERM, OnSigTerm);
   const std::string profileFile = CutText(argv[1]);
@@ -70,6 +55,6 @@ int main(int argc, char** argv) {
   for (int i = 2; i < argc; ++i) {
     RunArgument(argv[i], profileFile);
   }
-  unlink(pidFile.c_str());
+  RemoveFile(pidFile);
   return 0;
 }

@@ -1,19 +1,10 @@
 #include "thumb/phase_status.h"
 
-#include <sys/stat.h>
-
+#include "convert/photo_convert_job.h"
 #include "profiles/photo_thumb_plan.h"
 #include "profiles/thumbnail_profile.h"
 
-using vela::CreatePhaseFailMarkers;
-using vela::kAllPhases;
-
-namespace {
-
-/// An image file of a single byte is none.
-constexpr off_t kSmallestThumb = 2;
-
-}  // namespace
+using namespace vela;
 
 bool IsPhaseThumbOutdated(const DirectoryJob& job, int phase, const std::string& photoPath,
                           const std::string& metadataDir) {

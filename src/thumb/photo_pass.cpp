@@ -1,33 +1,29 @@
 #include "thumb/photo_pass.h"
 
-#include <sys/stat.h>
-#include <syslog.h>
-#include <unistd.h>
-
 #include "convert/photo_times.h"
 #include "ipc/velamk_ipc.h"
+#include "platform/system_rules.h"
 #include "platform/velaindex.h"
+#include "posix/files.h"
 #include "posix/glob_matches.h"
+#include "posix/log.h"
 #include "profiles/photo_thumb_plan.h"
 #include "profiles/thumbnail_profile.h"
 #include "progress/velamk_progress.h"
 #include "source/raw_image.h"
 #include "source/rotation_check.h"
+#include "storage/file_helpers.h"
+#include "storage/log_source.h"
 #include "storage/velamk_thumb_status.h"
-#include "thumb/file_helpers.h"
 #include "thumb/index_registration.h"
-#include "thumb/log_source.h"
 #include "thumb/phase_status.h"
 
 namespace vela {
 
 namespace {
 
-/// Bytes that must be available on the volume before a photo is converted.
-constexpr uint64_t kSmallestFreeSpace = 0x40000000;
-
-/// From this index version on the index keeps the turn that an owner gave a photo.
-constexpr int kTurnKeepingIndexVersion = 1;
+/// From this index version on, the index keeps the rotation that an owner gave a photo.
+constexpr int kRotationKeepingIndexVersion = 1;
 
 /// The thumbnail from which the later phases are made; null when there is none.
 const ThumbnailProfile* ReferenceProfile(const DirectoryJob& job) {
@@ -64,7 +60,7 @@ PhotoEnd PhotoPass::Run() {
   if (phase_ == 0 && IsRaw() && !DecodeRaw()) {
     return Report();
   }
-  if (!IsSourceRegularFile()) {
+  if (!IsRegularFile(source_)) {
     return PhotoEnd::kNextPhoto;
   }
   AskIndex();
@@ -82,8 +78,8 @@ PhotoEnd PhotoPass::Run() {
 
 void PhotoPass::RemoveOldMarkers() const {
   if (RemoveFilesByPattern(EscapePattern(metadataDir_) + "/*.fail") == -1) {
-    AppLogError(LOG_ERR, "%s:%d Failed to remove files by pattern [%s/*.fail]", kLogSource, 880,
-                metadataDir_.c_str());
+    AppLogError(kErrorPriority, "%s:%d Failed to remove files by pattern [%s/*.fail]",
+                kProgramLogSource, 880, metadataDir_.c_str());
   }
 }
 
@@ -95,11 +91,11 @@ bool PhotoPass::NeedsThumbs() const {
 }
 
 bool PhotoPass::IsVolumeNearlyFull() const {
-  if (VLIBGetFsAvailSize(job_.path.c_str()) >= kSmallestFreeSpace) {
+  if (VLIBGetFsAvailSize(job_.path.c_str()) >= kLeastFreeSpace) {
     return false;
   }
-  syslog(LOG_ERR, "%s:%d Stopping creating thumbs as the disk space is near full, %s", kLogSource,
-         893, photo_.c_str());
+  LogError(kProgramLogSource, 893,
+           "Stopping creating thumbs as the disk space is near full, " + photo_);
   return true;
 }
 
@@ -130,13 +126,8 @@ bool PhotoPass::DecodeRaw() {
   return true;
 }
 
-bool PhotoPass::IsSourceRegularFile() const {
-  struct stat status = {};
-  return stat(source_.c_str(), &status) == 0 && S_ISREG(status.st_mode);
-}
-
 void PhotoPass::AskIndex() {
-  autoOrient_ = GetIndexVersion(source_.c_str()) < kTurnKeepingIndexVersion;
+  autoOrient_ = GetIndexVersion(source_.c_str()) < kRotationKeepingIndexVersion;
   if (!autoOrient_ && phase_ == 0) {
     rotation_ = DetectThumbRotation(job_, source_, metadataDir_);
   }
@@ -149,7 +140,7 @@ int PhotoPass::MakePhase(int phase, int rotation) const {
 bool PhotoPass::MakePhase0() {
   const int result = MakePhase(0, rotation_);
   if (decoded_) {
-    unlink(source_.c_str());
+    RemoveFile(source_);
   }
   const int thumbs = GetProfileCount(job_.profiles, 0);
   if (result == -1) {

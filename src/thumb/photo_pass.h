@@ -11,13 +11,13 @@ namespace vela {
 
 /// How a photo ended.
 enum class PhotoEnd {
-  kNextPhoto,       ///< done with it, whatever came of it
+  kNextPhoto,       ///< finished, successfully or not
   kNextPhotoQueue,  ///< the same, and the directory needs a later run
   kStopPass,        ///< no further photo of the directory may be started
 };
 
-/// Takes one photo through the phases that are due. A failure in between leaves its markers, counts
-/// and report behind and never stops the pass.
+/// Takes one photo through the phases that are due. A failure on the way leaves its markers, is
+/// counted and reported, and never stops the pass.
 class PhotoPass {
  public:
   /// `name` is the photo's name in the job's directory, `metadataRoot` the directory that holds the
@@ -34,7 +34,6 @@ class PhotoPass {
   bool ChoosePhase();
   bool IsRaw() const;
   bool DecodeRaw();
-  bool IsSourceRegularFile() const;
   void AskIndex();
   int MakePhase(int phase, int rotation) const;
   bool MakePhase0();

@@ -1,7 +1,6 @@
 #include "thumb/process_control.h"
 
 #include <fcntl.h>
-#include <syslog.h>
 #include <unistd.h>
 
 #include <cerrno>
@@ -11,15 +10,12 @@
 #include "convert/photo_convert_job.h"
 #include "platform/vlibc.h"
 #include "posix/glob_matches.h"
-#include "thumb/log_source.h"
+#include "posix/log.h"
+#include "posix/processes.h"
+#include "storage/log_source.h"
 #include "thumb/pid_file.h"
 
-using vela::GlobMatches;
-using vela::kConvertToolPath;
-using vela::kLogSource;
-using vela::kPidFilePattern;
-using vela::kPidPathBufferSize;
-using vela::PidOfFile;
+using namespace vela;
 
 namespace {
 
@@ -68,19 +64,14 @@ constexpr const char* BaseName(const char* path) {
   return name;
 }
 
-bool IsProcessThere(long pid) {
-  const auto id = static_cast<pid_t>(pid);
-  return id == pid && kill(id, 0) == 0;
-}
-
 }  // namespace
 
 std::string CreatePidFile() {
   const OwnPidPath path;
   const int descriptor = open(path.c_str(), O_WRONLY | O_CREAT | O_CLOEXEC, 0644);
   if (descriptor < 0) {
-    syslog(LOG_ERR, "%s:%d Failed to open %s. (%s)", kLogSource, 1133, path.c_str(),
-           std::strerror(errno));
+    LogError(kProgramLogSource, 1133,
+             "Failed to open " + std::string(path.c_str()) + ". (" + std::strerror(errno) + ")");
   } else {
     close(descriptor);
   }
@@ -90,12 +81,12 @@ std::string CreatePidFile() {
 void KillThumbProcesses() {
   for (const char* path : GlobMatches(kPidFilePattern)) {
     const long pid = PidOfFile(path);
-    if (pid == 0 || IsProcessThere(pid)) {
+    if (pid == 0 || StateOfProcess(pid) == ProcessState::kRunning) {
       continue;
     }
     if (unlink(path) != 0) {
-      syslog(LOG_ERR, "%s: %s(%d) - unlink(%s), %s\n", kLogSource, "KillThumbProcesses", 1161, path,
-             std::strerror(errno));
+      LogError("velathumb: KillThumbProcesses(1161) - unlink(" + std::string(path) + "), " +
+               std::strerror(errno) + "\n");
     }
   }
 }

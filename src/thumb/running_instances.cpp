@@ -1,11 +1,10 @@
 #include "thumb/running_instances.h"
 
-#include <cerrno>
-#include <csignal>
 #include <fstream>
 #include <string>
 
 #include "posix/glob_matches.h"
+#include "posix/processes.h"
 #include "thumb/pid_file.h"
 
 namespace vela {
@@ -14,15 +13,15 @@ namespace {
 
 constexpr char kCommandName[] = "velathumb";
 
-/// Tells whether the process runs this program: the number in a pid file that was left behind may
-/// have gone to another. A process that may not be looked at has the benefit of the doubt.
+/// Returns true when the process runs this program: the number in a stale pid file may belong to
+/// another program by now. A process that may not be examined counts.
 bool IsInstance(pid_t pid) {
   std::ifstream file("/proc/" + std::to_string(pid) + "/comm");
   std::string name;
   if (std::getline(file, name)) {
     return name == kCommandName;
   }
-  return kill(pid, 0) == 0 || errno == EPERM;
+  return StateOfProcess(pid) != ProcessState::kGone;
 }
 
 }  // namespace

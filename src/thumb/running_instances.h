@@ -1,9 +1,9 @@
-// Which instances are at work.
+// The running instances.
 #pragma once
 
-#include <sys/types.h>
-
 #include <vector>
+
+#include "posix/processes.h"
 
 namespace vela {
 

@@ -2,9 +2,9 @@
 #pragma once
 
 #include "profiles/directory_job.h"
+#include "storage/file_helpers.h"
 #include "thumb/directory_pass.h"
 #include "thumb/directory_walk.h"
-#include "thumb/file_helpers.h"
 #include "thumb/index_registration.h"
 #include "thumb/phase_status.h"
 #include "thumb/process_control.h"

@@ -1,5 +1,6 @@
 // The entries of a directory.
-#include "storage/directory_entries.h"
+#include "posix/directory_entries.h"
+#include "posix/cut_text.h"
 
 #include <gmock/gmock.h>
 #include <sys/stat.h>
@@ -79,15 +80,15 @@ TEST_F(EntryCount, LeavesNoDescriptorOpen) {
 }
 
 TEST(EntryPath, IsThatOfDirectoryAndName) {
-  EXPECT_EQ(DirectoryEntryPath("/tmp/a", "b"), "/tmp/a/b");
-  EXPECT_EQ(DirectoryEntryPath("/tmp/a/", "b"), "/tmp/a//b");
+  EXPECT_EQ(vela::JoinPath("/tmp/a", "b"), "/tmp/a/b");
+  EXPECT_EQ(vela::JoinPath("/tmp/a/", "b"), "/tmp/a//b");
 }
 
 TEST(EntryPath, IsCutToAPathsLength) {
   const std::string dir = "/" + std::string(4089, 'd');
-  EXPECT_EQ(DirectoryEntryPath(dir.c_str(), "1234"), dir + "/1234");
-  EXPECT_EQ(DirectoryEntryPath(dir.c_str(), "12345"), dir + "/1234");
-  EXPECT_EQ(DirectoryEntryPath(dir.c_str(), std::string(255, '1').c_str()), dir + "/1111");
+  EXPECT_EQ(vela::JoinPath(dir.c_str(), "1234"), dir + "/1234");
+  EXPECT_EQ(vela::JoinPath(dir.c_str(), "12345"), dir + "/1234");
+  EXPECT_EQ(vela::JoinPath(dir.c_str(), std::string(255, '1').c_str()), dir + "/1111");
 }
 
 }  // namespace

@@ -1,5 +1,5 @@
 // Making directories and removing files by pattern.
-#include "thumb/file_helpers.h"
+#include "storage/file_helpers.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>

@@ -10,13 +10,12 @@
 
 #include "platform/standalone/last_error.h"
 #include "platform/standalone/path_text.h"
+#include "platform/system_rules.h"
 #include "platform/velaindex.h"
 
 namespace {
 
 using vela::Fail;
-
-constexpr std::string_view kMetadataDirectory = "@eaDir";
 
 /// Writes the parts one behind the other to `out`, terminated. Returns false, with `out` as it was,
 /// when they do not fit.
@@ -48,10 +47,11 @@ class DerivedPath {
   bool isValid_;
 };
 
-bool IsRegularFile(const DerivedPath& path, int64_t* sizeOut) {
+/// Fills `out` when a regular file is at `path`.
+bool ExamineRegularFile(const DerivedPath& path, EAFileStatus& out) {
   struct stat status;
   if (!path.IsValid() || stat(path.Get(), &status) != 0 || !S_ISREG(status.st_mode)) return false;
-  if (sizeOut != nullptr) *sizeOut = status.st_size;
+  out = {status.st_size, status.st_mtim.tv_sec};
   return true;
 }
 
@@ -71,7 +71,7 @@ int Remove(const DerivedPath& path) {
 }  // namespace
 
 int IndexIsPathSupportEAWrite(const char* dir) {
-  if (dir == nullptr || vela::HasComponent(dir, kMetadataDirectory)) return 0;
+  if (dir == nullptr || vela::HasComponent(dir, vela::kMetadataDirName)) return 0;
   if (IsDirExist(dir) == 0) return 0;
   return faccessat(AT_FDCWD, dir, W_OK | X_OK, AT_EACCESS) == 0 ? 1 : 0;
 }
@@ -81,18 +81,27 @@ int VELAEADirPath(int /*flags*/, const char* path, char* out, size_t outSize) {
   const std::string_view whole(path);
   const std::string_view file = vela::LastComponentOf(whole);
   if (file.empty()) return Fail(EINVAL);
-  if (vela::HasComponent(whole, kMetadataDirectory)) return Fail(EINVAL);
+  if (vela::HasComponent(whole, vela::kMetadataDirName)) return Fail(EINVAL);
   const std::string_view directory = whole.substr(0, whole.size() - file.size());
-  if (!Join({directory, kMetadataDirectory, "/", file}, out, outSize)) return Fail(ENAMETOOLONG);
+  if (!Join({directory, vela::kMetadataDirName, "/", file}, out, outSize))
+    return Fail(ENAMETOOLONG);
   return 0;
+}
+
+const char* FindEAFile(const char* eaDir, const char* name, const char* oldName,
+                       EAFileStatus* status) {
+  if (eaDir == nullptr) return nullptr;
+  if (ExamineRegularFile(DerivedPath(eaDir, name), *status)) return name;
+  if (ExamineRegularFile(DerivedPath(eaDir, oldName), *status)) return oldName;
+  return nullptr;
 }
 
 const char* IsEAFileExist(const char* eaDir, int64_t* sizeOut, const char* name,
                           const char* oldName) {
-  if (eaDir == nullptr) return nullptr;
-  if (IsRegularFile(DerivedPath(eaDir, name), sizeOut)) return name;
-  if (IsRegularFile(DerivedPath(eaDir, oldName), sizeOut)) return oldName;
-  return nullptr;
+  EAFileStatus status;
+  const char* found = FindEAFile(eaDir, name, oldName, &status);
+  if (found != nullptr && sizeOut != nullptr) *sizeOut = status.size;
+  return found;
 }
 
 int IsEAFileExist2(const char* path, const char* name, const char* oldName) {

@@ -10,15 +10,13 @@
 #include <string_view>
 
 #include "platform/standalone/key_value_text.h"
+#include "platform/system_rules.h"
 #include "posix/file_content.h"
 #include "posix/file_version.h"
 
 namespace vela {
 
 namespace {
-
-constexpr const char* kSettingsFile = "/etc/velainfo.conf";
-constexpr uint32_t kAllSizeClasses = 63;
 
 /// Returns the number that the whole text is in decimal; the largest one for a number beyond it.
 std::optional<uint32_t> ParseNumber(std::string_view text) {
@@ -37,7 +35,7 @@ std::optional<uint32_t> FindNumber(std::string_view text, std::string_view key) 
 
 void ReadSizeMap(std::string_view text, std::string_view key, int32_t& sizeMap) {
   const auto number = FindNumber(text, key);
-  if (number && *number <= kAllSizeClasses) sizeMap = static_cast<int32_t>(*number);
+  if (number && *number <= uint32_t{kAllThumbSizes}) sizeMap = static_cast<int32_t>(*number);
 }
 
 Settings ParseSettings(std::string_view text) {

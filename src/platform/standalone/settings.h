@@ -4,13 +4,15 @@
 #include <chrono>
 #include <cstdint>
 
+#include "platform/system_rules.h"
+
 namespace vela {
 
 /// What the settings file says, with the defaults for what it does not say.
 struct Settings {
-  int32_t photoThumbSizeMap = 63;         ///< bit mask of size classes
-  int32_t videoThumbSizeMap = 63;         ///< bit mask of size classes
-  std::chrono::seconds toolTimeout{600};  ///< 0: no limit
+  int32_t photoThumbSizeMap = kAllThumbSizes;  ///< bit mask of size classes
+  int32_t videoThumbSizeMap = kAllThumbSizes;  ///< bit mask of size classes
+  std::chrono::seconds toolTimeout{600};       ///< 0: no limit
 };
 
 /// Returns the settings as the file holds them now; callable from any thread.

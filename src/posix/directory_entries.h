@@ -4,7 +4,6 @@
 #include <dirent.h>
 
 #include <memory>
-#include <string>
 
 namespace vela {
 
@@ -29,8 +28,5 @@ class DirectoryEntries {
   };
   std::unique_ptr<DIR, Closer> stream_;
 };
-
-/// Returns the path of the entry `name` of the directory `dir`, cut to what a path buffer holds.
-std::string DirectoryEntryPath(const char* dir, const char* name);
 
 }  // namespace vela

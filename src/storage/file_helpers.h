@@ -1,4 +1,4 @@
-// Small file-system helpers that the rooms share.
+// Creating directories and removing files.
 #pragma once
 
 #include <string>

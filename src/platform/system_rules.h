@@ -1,0 +1,29 @@
+// Rules of the whole system that several programs go by.
+#pragma once
+
+#include <cstdint>
+
+namespace vela {
+
+/// Name of the metadata directory that lies next to the photos.
+inline constexpr char kMetadataDirName[] = "@eaDir";
+
+/// The system's settings, one `key="value"` a line.
+inline constexpr char kSettingsFile[] = "/etc/velainfo.conf";
+
+/// Setting: until when conversion is paused, seconds since the epoch.
+inline constexpr char kResumeTimeKey[] = "thumb_conv_resume_time";
+
+/// Bytes that must be available on a volume before a photo on it is converted.
+inline constexpr uint64_t kLeastFreeSpace = uint64_t{1} << 30;
+
+/// Marks an argument or a queue entry as a directory with everything below it.
+inline constexpr char kTreePrefix[] = "R:";
+
+/// Number of size classes of thumbnails.
+inline constexpr int kThumbSizeCount = 6;
+
+/// The size map with all size classes.
+inline constexpr int32_t kAllThumbSizes = (1 << kThumbSizeCount) - 1;
+
+}  // namespace vela

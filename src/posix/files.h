@@ -1,0 +1,73 @@
+// Files by path: what they are, and simple changes.
+#pragma once
+
+#include <cstdint>
+#include <optional>
+#include <string>
+
+#include "posix/file_descriptor.h"
+
+namespace vela {
+
+/// Two names of the same file have equal identities.
+struct FileIdentity {
+  uint64_t device = 0;
+  uint64_t inode = 0;
+};
+
+constexpr bool operator==(const FileIdentity& a, const FileIdentity& b) {
+  return a.device == b.device && a.inode == b.inode;
+}
+
+/// What the system knows of a file.
+struct FileStatus {
+  bool isRegular = false;
+  bool isDirectory = false;
+  int64_t size = 0;      ///< bytes
+  int64_t blocks = 0;    ///< allocated, of 512 bytes
+  int64_t modified = 0;  ///< seconds since the epoch
+  FileIdentity identity;
+};
+
+/// Returns true when the file mode `mode`, with its type bits, is that of a regular file.
+bool IsRegularFileMode(uint32_t mode);
+
+/// Examines the file at `path`, symbolic links followed. Returns nothing, with errno set, when that
+/// fails, also for a null path.
+std::optional<FileStatus> ExamineFile(const char* path);
+inline std::optional<FileStatus> ExamineFile(const std::string& path) {
+  return ExamineFile(path.c_str());
+}
+
+/// Returns true when a regular file is at `path`, symbolic links followed.
+bool IsRegularFile(const std::string& path);
+
+/// Returns true when the process may read the file at `path`, symbolic links followed.
+bool IsReadable(const std::string& path);
+
+/// Opens the file or directory at `path` for reading; never waits for the writer of a pipe. Returns
+/// no open descriptor, with errno set, on failure.
+FileDescriptor OpenForReading(const std::string& path);
+
+/// Creates the empty file `path` with these permission bits, or empties the one that exists, and
+/// opens it for reading and writing. Returns no open descriptor, with errno set, on failure.
+FileDescriptor CreateEmptyFile(const std::string& path, unsigned mode);
+
+/// Creates the directory `path` with these permission bits. Returns 0 or an errno value.
+int CreateDirectory(const std::string& path, unsigned mode);
+
+/// Sets the permission bits of the file at `path`. Returns 0 or an errno value.
+int SetFileMode(const std::string& path, unsigned mode);
+
+/// Renames a file, replacing any file of the new name. Returns 0 or an errno value.
+int RenameFile(const std::string& from, const std::string& to);
+
+/// Removes the file at `path`, a symbolic link itself and not its target. Returns 0 or an errno
+/// value.
+int RemoveFile(const std::string& path);
+
+/// Replaces the X's at the end of `nameTemplate` so that no file has the resulting path. Returns an
+/// empty string when there is none or it could not be used.
+std::string FindUnusedPath(const std::string& nameTemplate);
+
+}  // namespace vela

@@ -1,0 +1,25 @@
+// Messages to the system log at error priority.
+#pragma once
+
+#include <string>
+#include <string_view>
+
+namespace vela {
+
+/// The priority of all messages, as the system log numbers them.
+inline constexpr int kErrorPriority = 3;
+
+/// Logs "SOURCE:LINE TEXT". `line` identifies the message for those who read the log; it stays what
+/// it is when the code moves.
+void LogError(std::string_view source, int line, std::string_view text);
+
+/// Logs a message that does not start with its source and number.
+void LogError(std::string_view text);
+
+/// Returns `text` for a message, "(null)" for a null pointer.
+std::string LogText(const char* text);
+
+/// Returns an error code of the platform as messages show it, such as "0x0002".
+std::string LogCode(int code);
+
+}  // namespace vela

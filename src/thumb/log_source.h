@@ -1,8 +1,0 @@
-// The name under which the program's own decisions log.
-#pragma once
-
-namespace vela {
-
-inline constexpr char kLogSource[] = "velathumb";
-
-}  // namespace vela
