@@ -29,8 +29,8 @@ Json::Value Member(const Json::Value& packet, const char* name) {
   return packet.isObject() ? packet[name] : Json::Value();
 }
 
-/// The JSON library throws on a value that it cannot convert; a daemon that answers with one must
-/// not end the program.
+/// The JSON library throws on a value that it cannot convert; such an answer must not end the
+/// program.
 bool ToBool(const Json::Value& value) {
   return value.isConvertibleTo(Json::booleanValue) && value.asBool();
 }
@@ -39,8 +39,8 @@ int ToInt(const Json::Value& value) {
   return value.isConvertibleTo(Json::intValue) ? value.asInt() : 0;
 }
 
-/// Replaces the request by the daemon's reply and tells whether the daemon carried it out; logs the
-/// failure with the operation's `line`.
+/// Replaces the request by the daemon's reply. Returns true when the daemon succeeded; a failure is
+/// logged with the operation's `line`.
 bool Exchange(Json::Value& packet, int line) {
   AutoSendRecvPacket(PluginDaemonSocketPath, -1, packet, kExchangeSeconds);
   if (ToBool(Member(packet, "success"))) {

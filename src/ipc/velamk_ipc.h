@@ -21,8 +21,8 @@ bool IsDisableConvertVideo();
 /// Asks whether photo conversion is switched off. Returns false also on failure, which is logged.
 bool IsDisableConvertPhoto();
 
-/// Tells the daemon that the conversion of the photo `path` is over; a failure is logged.
+/// Reports to the daemon that the conversion of the photo `path` is over; a failure is logged.
 void PostPhotoConvert(const char* path);
 
-/// Tells the daemon that the conversion of the video `path` is over; a failure is logged.
+/// Reports to the daemon that the conversion of the video `path` is over; a failure is logged.
 void PostVideoConvert(const char* path);

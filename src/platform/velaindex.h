@@ -29,7 +29,7 @@ struct VELA_RESOLUTION {
   int32_t height;
 };
 
-/// What a video's container tells.
+/// What a video's container states.
 struct _VIDEO_METADATA_ {  // NOLINT(bugprone-reserved-identifier)
   int32_t rotation;        ///< degrees clockwise: 0, 90, 180 or 270
   int32_t duration;        ///< seconds, rounded
@@ -106,12 +106,12 @@ int VELAIndexImgResGet(const char* path, uint32_t* width, uint32_t* height);
 int VELAIDX_GetMediaResolution(const char* path, VELA_RESOLUTION* resolution);
 
 /// Reads rotation, duration and bit rate of the video `path` from its container; what the container
-/// does not tell is 0. Returns 0, or -1 (record untouched) when the file is no readable video.
+/// does not state is 0. Returns 0, or -1 (record untouched) when the file is no readable video.
 int VELAIDX_GetVideoMetadata(const char* path, _VIDEO_METADATA_* metadata);
 
-/// Tells whether browsers need a converted film of the video `path`: 0 when they play it as it is
-/// (H.264 with AAC or no sound in MP4; VP8, VP9 or AV1 in WebM), 1 for any other video, -1 when it
-/// cannot be read.
+/// Returns whether browsers need a converted version of the video `path`: 0 when they play it as it
+/// is (H.264 with AAC or no sound in MP4; VP8, VP9 or AV1 in WebM), 1 for any other video, -1 when
+/// it cannot be read.
 int VELAIDX_IsVideoNeedConvert(const char* path);
 
 /// Stores the size classes that the file `path` needs, as a bit mask. Returns 0, or -1 for an

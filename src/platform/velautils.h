@@ -49,7 +49,7 @@ class ProcessRunner {
                     const char* a4 = nullptr, const char* a5 = nullptr, const char* a6 = nullptr,
                     const char* a7 = nullptr, const char* a8 = nullptr, const char* a9 = nullptr);
 
-  /// Starts the program; with `wait` waits for its end, with `keepOutput` lets it write to the
+  /// Starts the program; with `wait` waits for its end, with `keepOutput` it writes to the
   /// caller's output instead of /dev/null. Returns 0 when the child exited with 0 (or, without
   /// `wait`, was started), else non-zero: exit status, ended by a signal, killed after the time
   /// limit, or not startable.

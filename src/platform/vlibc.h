@@ -71,7 +71,7 @@ int VLIBCPclose(FILE* stream);
 int VLIBCKill(const char* name, int signal);
 
 /// Returns the bytes available to an ordinary user on the volume that holds `path`, 0 when it
-/// cannot be told.
+/// cannot be determined.
 uint64_t VLIBGetFsAvailSize(const char* path);
 
 /// Returns the code (an errno value) of the calling thread's last platform failure, 0 before any.

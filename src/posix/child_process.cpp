@@ -29,7 +29,7 @@ constexpr int kFirstOtherDescriptor = STDERR_FILENO + 1;
 constexpr size_t kCommandNameSize = 16;
 constexpr size_t kChildStackSize = 64 * 1024;
 
-/// What the child has to do, in memory that it shares with its parent until the program runs.
+/// The child's task, in memory that it shares with its parent until the program runs.
 struct ChildPlan {
   const char* program;
   char* const* arguments;
@@ -66,7 +66,7 @@ bool SetStreams(const ChildStreams& streams) {
   if (input < 0 || output < 0 || error < 0) return false;
   if (dup2(input, STDIN_FILENO) < 0 || dup2(output, STDOUT_FILENO) < 0) return false;
   if (dup2(error, STDERR_FILENO) < 0) return false;
-  // Also what the program itself was given open by whoever started it.
+  // Also the descriptors that this process inherited.
   closefrom(kFirstOtherDescriptor);
   return true;
 }
@@ -112,12 +112,12 @@ ChildPlan MakePlan(const char* program, char* const arguments[], const ChildStre
   return plan;
 }
 
-/// Returns the process id, or -1 with errno set. The parent stands still until the program runs or
+/// Returns the process id, or -1 with errno set. The parent is suspended until the program runs or
 /// the child has ended, which makes sharing its memory safe, and the start independent of how much
 /// memory that is.
 pid_t CloneChild(ChildPlan& plan) {
   // Not on the caller's own stack: the child leaves its frames there without returning from them,
-  // which tools that watch over the stack take for damage.
+  // which stack checkers take for corruption.
   const std::unique_ptr<char[]> stack(new (std::nothrow) char[kChildStackSize]);
   if (!stack) {
     errno = ENOMEM;
@@ -126,8 +126,8 @@ pid_t CloneChild(ChildPlan& plan) {
   return clone(RunChild, stack.get() + kChildStackSize, CLONE_VM | CLONE_VFORK | SIGCHLD, &plan);
 }
 
-/// Returns 0 when the child has ended, ETIMEDOUT, or another errno value when the system has no
-/// such wait.
+/// Returns 0 when the child has ended, ETIMEDOUT, or another errno value when the system does not
+/// support this.
 int AwaitByDescriptor(pid_t pid, const Deadline& deadline) {
   const FileDescriptor process(static_cast<int>(syscall(SYS_pidfd_open, pid, 0)));
   if (!process.IsOpen()) return errno;
@@ -140,7 +140,7 @@ int AwaitByDescriptor(pid_t pid, const Deadline& deadline) {
   }
 }
 
-/// Asks again and again, for systems that cannot wait with a limit.
+/// Polls, for systems that cannot wait with a limit.
 int AwaitByAsking(pid_t pid, const Deadline& deadline) {
   constexpr int kPauseMilliseconds = 10;
   for (;;) {

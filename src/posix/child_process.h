@@ -7,7 +7,7 @@
 
 namespace vela {
 
-/// Where a child's output goes; -1 stands for /dev/null.
+/// Where a child's output goes; -1 means /dev/null.
 struct ChildStreams {
   int standardOutput = -1;
   int standardError = -1;

@@ -1,13 +1,13 @@
-// Keeps the kernel from throwing the exit statuses of the tools away.
+// Keeps the kernel from discarding the exit statuses of child processes.
 #pragma once
 
 namespace vela {
 
-/// A process that ignores SIGCHLD, as it may have been told by whoever started it, gets no exit
-/// status of its children. Takes that back while a child is out; called once per child.
+/// A process that ignores SIGCHLD, which it can inherit from its parent, gets no exit statuses of
+/// its children. Undoes that while a child is running; called once per child.
 void KeepChildStatus();
 
-/// The child of a KeepChildStatus is done with; the last one restores what was set before.
+/// Ends the effect of one KeepChildStatus; the last one restores the previous setting.
 void ReleaseChildStatus();
 
 }  // namespace vela

@@ -1,4 +1,4 @@
-// The time limit of a child whose caller waits in plain reads.
+// The time limit of a child whose output is read with blocking calls.
 #pragma once
 
 #include <sys/types.h>
@@ -19,12 +19,12 @@ class ChildWatchdog {
   ChildWatchdog& operator=(const ChildWatchdog&) = delete;
   ~ChildWatchdog() { Stop(); }
 
-  /// Begins to watch the child `pid`, whose program is named in the system log. Returns false when
+  /// Starts watching the child `pid`, whose program is named in the system log. Returns false when
   /// no thread can be had.
   bool Start(pid_t pid, const char* program, std::chrono::seconds limit);
 
-  /// Ends the watch. To be called before the child is reaped: as long as it is not, its process id
-  /// belongs to nobody else.
+  /// Ends the watch. To be called before the child is reaped: until then its process id is not
+  /// reused.
   void Stop();
 
  private:

@@ -1,4 +1,4 @@
-// Text as a fixed-size buffer would hold it.
+// Text cut to the size of a fixed buffer.
 #pragma once
 
 #include <cstddef>
@@ -9,7 +9,7 @@ namespace vela {
 /// Size in bytes, terminator included, of the buffers that hold a path or a formatted argument.
 inline constexpr std::size_t kPathBufferSize = 4096;
 
-/// Returns what a buffer of `bufferSize` bytes, terminator included, keeps of `text`.
+/// Returns what a buffer of `bufferSize` bytes, terminator included, holds of `text`.
 inline std::string CutText(const std::string& text, std::size_t bufferSize = kPathBufferSize) {
   return text.substr(0, bufferSize - 1);
 }

@@ -1,11 +1,11 @@
-// A point in time that a wait must not go beyond.
+// A time at which a wait ends.
 #pragma once
 
 #include <chrono>
 
 namespace vela {
 
-/// A deadline on the clock that nobody sets.
+/// A deadline on the monotonic clock.
 class Deadline {
  public:
   using Clock = std::chrono::steady_clock;

@@ -16,7 +16,7 @@ int TryLockExclusively(int fd);
 /// Releases the lock on the open file `fd`, also for processes that share the descriptor.
 void Unlock(int fd);
 
-/// Returns whether both records describe the same file.
+/// Returns true when both records describe the same file.
 bool IsSameFile(const struct stat& a, const struct stat& b);
 
 }  // namespace vela

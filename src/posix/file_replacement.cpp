@@ -18,9 +18,9 @@ namespace {
 constexpr mode_t kNewFileMode = 0644;
 constexpr mode_t kPermissionBits = 07777;
 
-/// The new file while it is written, beside the one it is for and under one name for all writers:
-/// what a writer that died has left is then found and removed by the next one. Its lock tells a
-/// dead writer from a living one.
+/// The new file while it is written, next to its target and under the same name for all writers, so
+/// that the next writer finds and removes what a killed one has left. Its lock distinguishes a dead
+/// writer from a living one.
 class ScratchFile {
  public:
   explicit ScratchFile(const std::string& target) : path_(target + ".replacement") {}
@@ -37,7 +37,7 @@ class ScratchFile {
   const struct stat& Status() const { return status_; }
   const char* Path() const { return path_.c_str(); }
 
-  /// The file has moved away from its scratch name.
+  /// The file has been renamed.
   void Forget() { file_.Reset(); }
 
  private:
@@ -79,7 +79,7 @@ int ScratchFile::OpenOnce(bool& isReady) {
   return 0;
 }
 
-/// Renames unless something is at `to`. Returns 0 or an errno value.
+/// Renames unless `to` exists. Returns 0 or an errno value.
 int RenameToFreeName(const char* from, const char* to) {
   if (renameat2(AT_FDCWD, from, AT_FDCWD, to, RENAME_NOREPLACE) == 0) return 0;
   if (errno != EINVAL && errno != ENOSYS) return errno;
@@ -112,8 +112,8 @@ int ReplaceWhole(const std::string& path, std::string_view content, const struct
   if (fchmod(scratch.Fd(), old.st_mode & kPermissionBits) != 0) return errno;
   error = WriteAll(scratch.Fd(), content);
   if (error != 0) return error;
-  // No fsync: what these files hold is cheap to lose with the power, and waiting for the disk at
-  // each change is not.
+  // No fsync: losing the last change in a power failure costs less than waiting for the disk at
+  // every change.
   if (rename(scratch.Path(), path.c_str()) != 0) return errno;
   scratch.Forget();
   return 0;

@@ -8,8 +8,8 @@
 
 namespace vela {
 
-/// Makes the file `path` with this content and mode 0644, whole from the first moment on. Returns 0
-/// or an errno value; EEXIST when something is at `path` already.
+/// Creates the file `path` with this content and mode 0644 in one step. Returns 0 or an errno
+/// value, EEXIST when `path` exists.
 int CreateWhole(const std::string& path, std::string_view content);
 
 /// Puts a new file with this content in the place of `path`; mode and owner are those of `old`. The

@@ -5,12 +5,12 @@
 
 namespace vela {
 
-/// Returns whether both records describe the same file in the same state.
+/// Returns true when both records describe the same file in the same state.
 bool IsSameVersion(const struct stat& a, const struct stat& b);
 
-/// Returns whether the file has not changed for a while. Times of files advance in steps of a timer
-/// tick, so a change within the same tick could not be told: only a file at rest is known by its
-/// times.
+/// Returns true when the file has not changed for a while. Times of files advance in steps of a
+/// timer tick, so a change within the same tick is not visible: only a file that has been at rest
+/// can be identified by its times.
 bool IsAtRest(const struct stat& file);
 
 }  // namespace vela

@@ -9,8 +9,8 @@ namespace vela {
 /// The priority of all messages, as the system log numbers them.
 inline constexpr int kErrorPriority = 3;
 
-/// Logs "SOURCE:LINE TEXT". `line` identifies the message for those who read the log; it stays what
-/// it is when the code moves.
+/// Logs "SOURCE:LINE TEXT". `line` identifies the message to readers of the log and does not
+/// change when the code moves.
 void LogError(std::string_view source, int line, std::string_view text);
 
 /// Logs a message that does not start with its source and number.

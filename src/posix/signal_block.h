@@ -1,11 +1,11 @@
-// Keeping signals away from a thread for a while.
+// Blocking signals for a while.
 #pragma once
 
 #include <signal.h>
 
 namespace vela {
 
-/// Blocks all signals for the calling thread as long as it lives.
+/// Blocks all signals for the calling thread until it is destroyed.
 class SignalBlock {
  public:
   SignalBlock() {

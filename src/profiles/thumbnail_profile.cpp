@@ -26,7 +26,7 @@ bool IsThumbSection(const std::string& section) {
   return section.compare(0, 5, "thumb") == 0;
 }
 
-/// Builds the profile of one section; null when the section names no thumbnail that is wanted.
+/// Builds the profile of one section; null when the section has no wanted thumbnail.
 std::unique_ptr<const ThumbnailProfile> ReadProfile(const VELAUtils::ConfParser& conf,
                                                     const std::string& section, int32_t sizeMap) {
   const int size = conf.getInt(section, "size", 120);
@@ -61,7 +61,7 @@ void FileIntoPhases(ThumbnailProfileList& list) {
   }
 }
 
-/// Returns the list of one phase, null when the index stands for all profiles.
+/// Returns the list of one phase, null when the index means all profiles.
 const std::vector<const ThumbnailProfile*>* PhaseList(const ThumbnailProfileList& list,
                                                       int phaseIndex) {
   switch (phaseIndex) {

@@ -1,4 +1,5 @@
-// Conversion progress: counters in the spool directory, and the time until which conversion rests.
+// Conversion progress: counters in the spool directory, and the time until which conversion is
+// paused.
 #pragma once
 
 struct timeval;
@@ -15,7 +16,7 @@ void AddConvProgress(int kind, const char* key, int delta);
 /// Writes the progress summary of photos, thumbnails and videos to the system log.
 void LogConvProgress();
 
-/// Returns the time (seconds since the epoch) until which conversion is held back, 0 when none is
+/// Returns the time (seconds since the epoch) until which conversion is paused, 0 when none is
 /// set; a failed read is logged and gives 0.
 long GetThumbConvResumeTime();
 

@@ -29,8 +29,8 @@ std::string CanonicalText(const char* text) {
   return std::strcmp(text, "Top-left") == 0 ? kUprightText : text;
 }
 
-/// Returns the library's text for the orientation of an image, empty when it states none; nothing
-/// is known of an image without EXIF data, which is logged.
+/// Returns the library's text for the orientation of an image, empty when it has none or no
+/// EXIF data; the latter is logged.
 std::string ReadOrientationText(const std::string& path) {
   const std::unique_ptr<ExifData, ExifDataUnref> data(exif_data_new_from_file(path.c_str()));
   if (data == nullptr) {

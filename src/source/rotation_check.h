@@ -6,8 +6,8 @@
 #include "profiles/directory_job.h"
 
 /// Finds the turn (0, 90, 180 or 270 degrees clockwise) at which thumbnails made from `photoPath`
-/// match those that exist in its metadata directory `thumbDir`; 0 when that cannot be told. Leaves
-/// no trial image behind.
+/// match those that exist in its metadata directory `thumbDir`; 0 when it is unknown. Removes
+/// its trial images.
 int DetectThumbRotation(const DirectoryJob& job, const std::string& photoPath,
                         const std::string& thumbDir);
 

@@ -35,7 +35,7 @@ struct TagLine {
   std::string value;  ///< without white space at its ends
 };
 
-/// Splits a line at its first colon; nothing when there is none, or nothing behind it.
+/// Splits a line at its first colon; nothing when there is no colon or nothing after it.
 std::optional<TagLine> SplitTagLine(const std::string& line);
 
 }  // namespace vela

@@ -1,4 +1,4 @@
-// The photos of one directory and how their thumbnails are.
+// The photos of one directory and the states of their thumbnails.
 #pragma once
 
 #include <functional>

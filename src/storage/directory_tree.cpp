@@ -12,7 +12,7 @@ namespace {
 
 constexpr int kWalkDescriptors = 100;
 
-/// A walk on its way. An exception must not pass through the C library.
+/// A walk in progress. An exception must not pass through the C library.
 struct Walk {
   const DirectoryVisitor& visit;
   std::exception_ptr failure;

@@ -1,9 +1,9 @@
-// The films converted from a video: their file names in its metadata directory.
+// The converted videos: their file names in the metadata directory of their source.
 #pragma once
 
 namespace vela {
 
-/// A film's file names.
+/// The file names of a converted video.
 struct FilmName {
   const char* name;     ///< the one that is written
   const char* oldName;  ///< its older form, with a colon, which counts as well
@@ -22,8 +22,7 @@ inline constexpr FilmName kIphoneFilm = {"VELAPHOTO_FILM_MOBILE_IPHONE",
 inline constexpr FilmName kMpeg4Film = {"VELAPHOTO_FILM_MPEG4.mp4", "VELAPHOTO:FILM_MPEG4.mp4"};
 inline constexpr FilmName kFlashFilm = {"VELAPHOTO_FILM.flv", "VELAPHOTO:FILM.flv"};
 
-/// The films that are made in the orientation of their video, in the order in which they are looked
-/// for.
+/// The converted videos that have the orientation of their source, in lookup order.
 inline constexpr FilmName kOrientedFilms[] = {kHighFilm, kMediumFilm, kLowFilm, kMobileFilm};
 
 }  // namespace vela

@@ -1,4 +1,4 @@
-// Whether the films of a video stand as the video does.
+// Whether the converted videos have the orientation of their source.
 
 #include <algorithm>
 #include <iterator>

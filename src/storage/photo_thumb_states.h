@@ -12,13 +12,13 @@ namespace vela {
 enum class ThumbState {
   kNotWanted,  ///< the size map does not ask for it, or the photo could not be looked up
   kPresent,
-  kMissing,   ///< there is no such file
+  kMissing,
   kOutdated,  ///< older than the photo, or empty
 };
 
 /// How the lookup of a photo ended.
 enum class PhotoLookup {
-  kAbsent,  ///< there is no such file
+  kAbsent,  ///< the photo does not exist
   kFailed,  ///< its thumbnails cannot be looked up
   kDone,
 };
@@ -39,7 +39,7 @@ struct PhotoThumbStates {
   int Present() const;
 };
 
-/// Looks at the thumbnails of the photo `path` that `sizeMap` asks for (-1: ask the index library).
+/// Examines the thumbnails of the photo `path` that `sizeMap` asks for (-1: ask the index library).
 /// A photo that cannot be looked up is logged.
 PhotoThumbStates ReadPhotoThumbStates(const char* path, int32_t sizeMap);
 

@@ -13,7 +13,7 @@ using namespace vela;
 
 namespace {
 
-/// Tells whether the existing thumbnail `name` can stay.
+/// Returns true when the existing thumbnail `name` can be kept.
 bool IsThumbGood(const char* path, const std::string& eaDir, const char* name) {
   if (IsEAThumbOutdated(path, name) == 1) {
     return false;
@@ -22,8 +22,8 @@ bool IsThumbGood(const char* path, const std::string& eaDir, const char* name) {
   return IsMediaPortraitInDB(path) == IsFilePortrait(thumbPath.c_str());
 }
 
-/// Checks one size class and removes its thumbnail when it is bad. Returns true when it is there
-/// and good.
+/// Checks one size class and removes its thumbnail when it is bad. Returns true when it exists and
+/// is good.
 bool CheckThumb(const char* path, const std::string& eaDir, const EAThumbInfo& row) {
   const char* name = IsEAFileExist(eaDir.c_str(), nullptr, row.name, row.oldName);
   if (name == nullptr) {

@@ -1,4 +1,4 @@
-// Thumbnail status: what is still to be done.
+// Thumbnail status: the outstanding work.
 #pragma once
 
 #include <ftw.h>
@@ -6,8 +6,8 @@
 
 #include <cstdint>
 
-/// Photos with at least one missing thumbnail, and missing thumbnails, in the tree that
-/// GetDirThumbStatusRecursive went through last. One such scan at a time in a process.
+/// Photos with at least one missing thumbnail, and missing thumbnails, counted by the last
+/// GetDirThumbStatusRecursive. One such scan at a time in a process.
 extern int g_incomplete_photo_num;
 extern int g_incomplete_thumb_num;
 
@@ -21,8 +21,8 @@ void GetThumbStatus(const char* path, int* missingOut, int* presentOut, int32_t 
 /// opened; the latter is logged.
 void GetDirThumbStatus(const char* dir, int* photosOut, int* thumbsOut);
 
-/// Counts the same for the tree `dir`, other file systems and directories that wait in the photo
-/// queue left out. Returns 0, or -1 when the walk came to an early end.
+/// Counts the same for the tree `dir`, without other file systems and without directories in the
+/// photo queue. Returns 0, or -1 when the walk ended early.
 int GetDirThumbStatusRecursive(const char* dir, int* photosOut, int* thumbsOut);
 
 /// The step of that scan: adds a directory to the two counters above. Returns the walk's action
@@ -35,15 +35,15 @@ int GetDirThumbStatusRecursive_Callback(const char* path, const struct stat* sta
 /// outdated and thumbnails and films of the wrong orientation.
 int IsVideoWorkNeeded(const char* path);
 
-/// Returns the number of videos in the tree `dir` that need work and do not wait in the video
-/// queue; 0, logged, when the directory does not exist or cannot be opened. Once a waiting video
-/// has been met in a directory, the videos listed after it in that directory are not counted.
-/// A directory met again below itself, through a link, is not entered again; one met by several
-/// ways counts for each. Removes what IsVideoWorkNeeded removes.
+/// Returns the number of videos in the tree `dir` that need work and are not in the video queue; 0,
+/// logged, when the directory does not exist or cannot be opened. The videos listed after a queued
+/// one in the same directory are not counted. A link to a directory above is not followed; a
+/// directory that is reached in several ways counts each time. Removes what IsVideoWorkNeeded
+/// removes.
 int CountVideoWork(const char* dir);
 
 /// Returns the number of videos that need work among the entries of the queue file `queueFile`; of
-/// the video queue without those that are being worked off. 0 when there is no such file or it
+/// the video queue without those in progress. 0 when there is no such file or it
 /// cannot be opened; the latter is logged. Removes what IsVideoWorkNeeded removes.
 int CountVideoQueueWork(const char* queueFile);
 

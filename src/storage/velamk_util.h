@@ -1,4 +1,4 @@
-// Size classes and metadata names: what exists beside a media file, and whether it is still good.
+// Size classes and metadata names: what exists for a media file, and whether it is still good.
 #pragma once
 
 #include <cstdint>
@@ -9,24 +9,24 @@
 /// it (whole seconds), else 0; also 0 when the media file cannot be examined, which is logged.
 int IsEAThumbOutdated(const char* path, const char* name);
 
-/// Returns 1 when the plugin daemon's record of `path` is higher than wide, else 0; an unknown
+/// Returns 1 when the plugin daemon's record of `path` is portrait, else 0; an unknown
 /// record is logged.
 int IsMediaPortraitInDB(const char* path);
 
-/// Returns 1 when the photo or film `path` itself is higher than wide, else 0, also when its size
+/// Returns 1 when the photo or film `path` itself is portrait, else 0, also when its size
 /// cannot be read.
 int IsFilePortrait(const char* path);
 
 /// Checks the thumbnails of the media file `path` that `sizeMap` asks for and removes, under both
-/// names, each that is outdated or of the wrong orientation. Returns 1 when all are there and good,
-/// else 0.
+/// names, each that is outdated or of the wrong orientation. Returns 1 when all exist and are
+/// good, else 0.
 int CheckEAThumbs(const char* path, int32_t sizeMap);
 
-/// Returns 1 when the video `path` is to be turned by 90, 180 or 270 degrees for display, else 0,
+/// Returns 1 when the video `path` is to be rotated by 90, 180 or 270 degrees for display, else 0,
 /// also when its metadata cannot be read, which is logged.
 int IsVideoRotated(const char* path);
 
-/// Returns 1 when the video `path` has one of the films that are made in its orientation (high,
+/// Returns 1 when the video `path` has one of the converted videos that keep its orientation (high,
 /// medium, low, mobile), of whatever size, else 0.
 int HasConvertedFilm(const char* path);
 
@@ -35,21 +35,21 @@ int HasConvertedFilm(const char* path);
 /// when there is no such file or `path` is null, which is logged.
 int IsEAFileOrientationMatched(const char* path, const char* name, const char* oldName);
 
-/// Returns 1 when one of the films that HasConvertedFilm looks for has the orientation of the video
+/// Returns 1 when one of the files that HasConvertedFilm looks for has the orientation of the video
 /// `path`, else 0.
 int HasMatchedConvertedFilm(const char* path);
 
-/// Tells whether the video `path` has a film for browsers: 1 or 0, -1 (logged) for a null path or a
-/// video without a metadata directory. Removes the Flash film of a rotated video, under both names,
-/// when only its orientation is wrong.
+/// Returns 1 when the video `path` has a version for browsers, else 0; -1, logged, for a null path
+/// and a video without a metadata directory. Removes the Flash film of a rotated video, under both
+/// names, when only its orientation is wrong.
 int IsWebVideoConverted(const char* path);
 
-/// Tells whether the video `path` has a film for mobile devices: 1, 0 or -1 as
+/// Returns 1 when the video `path` has a version for mobile devices, 0 or -1 as
 /// IsWebVideoConverted. Removes the MPEG-4 conversion of a rotated video when only its orientation
 /// is wrong.
 int IsMobileVideoConverted(const char* path);
 
-/// Tells whether the video `path` has the films it needs, for mobile devices too when the system
-/// settings ask for them. Returns 1 (also when a check ends in an error), 0, or -1 for a null path,
-/// which is logged. Removes films as the two checks do.
+/// Checks whether the video `path` has the converted videos it needs, for mobile devices too when
+/// the system settings ask for them. Returns 1 (also when a check ends in an error), 0, or -1 for a
+/// null path, which is logged. Removes files as the two checks do.
 int IsVideoConverted(const char* path);

@@ -1,4 +1,4 @@
-// Whether a video has the films that it needs.
+// Whether a video has the converted videos that it needs.
 
 #include <initializer_list>
 #include <string>
@@ -18,7 +18,7 @@ using namespace vela;
 namespace {
 
 constexpr int64_t kSmallestFilm = 2;
-/// Films made of a video of this many bits per second or more lose too much.
+/// Conversions of a video with this many bits per second or more lose too much quality.
 constexpr uint32_t kHighBitrate = 4500000;
 
 bool IsFilmPresent(const std::string& eaDir, const FilmName& film) {
@@ -29,8 +29,8 @@ bool IsFilmPresent(const std::string& eaDir, const FilmName& film) {
 
 enum class FilmQuality { kGood, kPoor, kUnknown };
 
-/// Judges the H.264 and iPhone films of a video by its own record; a failed lookup is logged with
-/// the caller's `line`.
+/// Judges the H.264 and iPhone versions of a video by the video's own record; a failed lookup is
+/// logged with the caller's `line`.
 FilmQuality JudgeFilm(const char* path, int line) {
   VELA_MEDIA_INFO media = {};
   if (GetMediaFromPluginDB(THUMB_TYPE_PHOTO, path, media) < 0) {
@@ -40,7 +40,7 @@ FilmQuality JudgeFilm(const char* path, int line) {
   return media.bitrate < kHighBitrate ? FilmQuality::kGood : FilmQuality::kPoor;
 }
 
-/// Tells whether the film of a rotated video stands as the video does; one that does not is
+/// Returns true when a conversion of a rotated video has its orientation; one that does not is
 /// removed, so that it is made again.
 bool KeepMatchingFilm(const char* path, const FilmName& film) {
   if (IsEAFileExist2(path, film.name, film.oldName) <= 0) {
@@ -53,7 +53,8 @@ bool KeepMatchingFilm(const char* path, const FilmName& film) {
   return false;
 }
 
-/// Judges a rotated video, for which `fallback` counts beside the films made in its orientation.
+/// Judges a rotated video, for which `fallback` counts in addition to the conversions that keep its
+/// orientation.
 bool IsRotatedVideoConverted(const char* path, const FilmName& fallback) {
   if (HasConvertedFilm(path) != 0 && HasMatchedConvertedFilm(path) != 0) {
     return true;
@@ -71,11 +72,11 @@ bool IsUprightVideoOnWeb(const char* path, const std::string& eaDir) {
   return IsFilmPresent(eaDir, kH264Film) && JudgeFilm(path, 243) == FilmQuality::kGood;
 }
 
-/// Tells whether the H.264 film or the iPhone film of a video serves mobile devices.
+/// Returns true when the H.264 or the iPhone version of a video suits mobile devices.
 bool HasGoodPhoneFilm(const char* path, const std::string& eaDir) {
   if (IsFilmPresent(eaDir, kH264Film)) {
     const FilmQuality quality = JudgeFilm(path, 344);
-    // Without a record the iPhone film is not looked at either.
+    // Without a record the iPhone version is not considered either.
     if (quality != FilmQuality::kPoor) {
       return quality == FilmQuality::kGood;
     }
@@ -139,6 +140,6 @@ int IsVideoConverted(const char* path) {
   if (IsWebVideoConverted(path) == 0) {
     return 0;
   }
-  // A check that ends in an error counts as converted: nothing could be done about that video.
+  // A check that ends in an error counts as converted: there is nothing to do for that video.
   return !mobileFilmsWanted || IsMobileVideoConverted(path) != 0 ? 1 : 0;
 }

@@ -20,7 +20,7 @@ using namespace vela;
 
 namespace {
 
-/// Longer paths leave no room for the names of derived files behind them.
+/// Longer paths leave no room for the names of derived files.
 constexpr size_t kLongestVideoPath = 4066;
 
 bool AreThumbsMissing(const char* path, int32_t sizeMap) {

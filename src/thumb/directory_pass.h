@@ -7,7 +7,7 @@
 #include "profiles/directory_job.h"
 
 /// Makes the missing thumbnails of the directory's photos, one photo after the other, unless
-/// another instance is at work there. Failures are logged and never stop the pass; only a volume
+/// another instance is working there. Failures are logged and never stop the pass; only a volume
 /// that is nearly full does.
 void CreateDirectoryThumbs(const DirectoryJob& job);
 

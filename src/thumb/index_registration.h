@@ -1,4 +1,4 @@
-// Tells the index of a made thumbnail.
+// Registers new thumbnails with the index.
 #pragma once
 
 #include <string>

@@ -1,4 +1,4 @@
-// What a photo's thumbnails of one phase are like, and how a failed phase is marked.
+// The state of a photo's thumbnails of one phase, and the marking of failed phases.
 #pragma once
 
 #include <string>

@@ -7,7 +7,7 @@
 /// which is logged.
 std::string CreatePidFile();
 
-/// Removes the pid files of velathumb processes that are gone; kills nothing. A removal that fails
+/// Removes stale pid files; kills nothing. A removal that fails
 /// is logged.
 void KillThumbProcesses();
 
