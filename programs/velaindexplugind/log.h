@@ -5,12 +5,11 @@
 #include <string>
 #include <string_view>
 
+#include "posix/service_log.h"
+
 namespace vela {
 
-/// Levels as the system log numbers them.
-enum class LogLevel { kError = 3, kWarning = 4, kInfo = 6 };
-
-/// One line of the log. Values are quoted where they need it.
+/// One line of the log. Values with other than plain characters are quoted.
 ///
 ///     LogLine(LogLevel::kInfo, "stop").Add("signal", "SIGTERM").Write();
 class LogLine {
@@ -20,8 +19,8 @@ class LogLine {
   LogLine& Add(std::string_view key, std::string_view value);
   LogLine& Add(std::string_view key, int64_t value);
 
-  /// Writes the line to standard error. Where that leads to the journal, the journal's mark of the
-  /// level stands before it; elsewhere the line begins with the time.
+  /// Writes the line to the log of the service; outside the journal, which notes the time itself,
+  /// with the time as its first field.
   void Write() const;
 
  private:

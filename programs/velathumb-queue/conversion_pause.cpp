@@ -1,34 +1,26 @@
 #include "conversion_pause.h"
 
 #include <json/value.h>
-#include <sys/time.h>
 
 #include <algorithm>
 
 #include "ipc/velamk_ipc.h"
 #include "platform/velaindex.h"
-#include "progress/velamk_progress.h"
-#include "run_log.h"
+#include "posix/service_log.h"
+#include "progress/resume_state.h"
 
 namespace vela {
 
 namespace {
 
-/// How long the answer that conversion may run is good for: entries can follow each other fast.
-constexpr std::chrono::seconds kAnswerLife(1);
-/// The resume time may be brought forward, and a switch be turned, at any moment.
+/// How long the answer that conversion may run is valid: entries can follow each other fast.
+constexpr std::chrono::seconds kAnswerValidity(1);
+/// Both the resume time and the switch may change at any moment.
 constexpr std::chrono::seconds kLongestWait(5);
 
-std::chrono::seconds WaitForResumeTime() {
-  timeval wait = {};
-  GetThumbConvResumeWait(&wait);
-  // A negative resume time is never reached but has no wait either.
-  return std::clamp(std::chrono::seconds(wait.tv_sec), std::chrono::seconds(1), kLongestWait);
-}
-
-/// A machine without settings has no resume time; asking for it would only fill the log.
-bool IsResumeTimeReached() {
-  return IsFileExist("/etc/velainfo.conf") == 0 || IsThumbConvResumeTimeReached() == 1;
+std::chrono::seconds TimeToNextCheck() {
+  // A negative resume time is never reached, but the time until then is reported as 0.
+  return std::clamp(TimeUntilResume(), std::chrono::seconds(1), kLongestWait);
 }
 
 bool IsTrue(const Json::Value& packet, const char* name) {
@@ -36,21 +28,21 @@ bool IsTrue(const Json::Value& packet, const char* name) {
   return value.isConvertibleTo(Json::booleanValue) && value.asBool();
 }
 
-/// Asks what IsDisableConvertPhoto asks, but does not wait half an hour for a daemon that keeps
-/// still: the runner hears no signal meanwhile.
+/// Sends the request of IsDisableConvertPhoto, but does not wait half an hour for a daemon that
+/// does not answer: the runner handles no signals meanwhile.
 bool IsSwitchedOff() {
-  constexpr int kLongestAnswer = 3;
+  constexpr int kAnswerTimeout = 3;  // seconds
   Json::Value packet(Json::objectValue);
   packet["command"] = "IS_DISABLE_CONVERT_PHOTO";
-  AutoSendRecvPacket(PluginDaemonSocketPath, -1, packet, kLongestAnswer);
+  AutoSendRecvPacket(PluginDaemonSocketPath, -1, packet, kAnswerTimeout);
   return IsTrue(packet, "success") && IsTrue(packet, "result");
 }
 
 }  // namespace
 
 std::optional<ConversionPause> FindConversionPause() {
-  if (!IsResumeTimeReached()) {
-    return ConversionPause{"conversion is held back by its resume time", WaitForResumeTime()};
+  if (IsPausedByResumeTime()) {
+    return ConversionPause{"the resume time is not reached", TimeToNextCheck()};
   }
   if (IsSwitchedOff()) {
     return ConversionPause{"the index service has switched photo conversion off", kLongestWait};
@@ -59,27 +51,27 @@ std::optional<ConversionPause> FindConversionPause() {
 }
 
 bool PauseGate::MayStart() {
-  const auto asked = Clock::now();
-  if (pausedUntil_ && asked < *pausedUntil_) {
+  const auto start = Clock::now();
+  if (pausedUntil_ && start < *pausedUntil_) {
     return false;
   }
-  if (asked < mayStartUntil_) {
+  if (start < allowedUntil_) {
     return true;
   }
   const auto pause = FindConversionPause();
   const auto now = Clock::now();
   if (!pause) {
-    // An answer that took its time is good for longer, or nothing else would be done.
-    mayStartUntil_ = now + kAnswerLife + 10 * (now - asked);
+    // A slow answer is valid for longer, or the runner would do nothing but ask.
+    allowedUntil_ = now + kAnswerValidity + 10 * (now - start);
     pausedUntil_.reset();
     reason_.clear();
     return true;
   }
   if (pause->reason != reason_) {
-    WriteLog(LogLevel::kInfo, "waiting: " + pause->reason);
+    WriteLog(LogLevel::kInfo, "conversion is paused: " + pause->reason);
     reason_ = pause->reason;
   }
-  pausedUntil_ = now + pause->askAgain;
+  pausedUntil_ = now + pause->checkAfter;
   return false;
 }
 

@@ -7,25 +7,25 @@
 
 namespace vela {
 
-/// Why conversion rests, and when to ask again.
+/// Why conversion is paused, and after which time to check again.
 struct ConversionPause {
   std::string reason;
-  std::chrono::seconds askAgain;
+  std::chrono::seconds checkAfter;
 };
 
-/// Keeps asking whether conversion may run, as often as is needed and no more.
+/// Checks whether conversion may run, no more often than needed.
 class PauseGate {
  public:
   using Clock = std::chrono::steady_clock;
 
-  /// Returns whether photos may be converted now. A pause is told in the log once.
+  /// Returns whether photos may be converted now. A pause is logged once.
   bool MayStart();
 
-  /// Returns when it is worth asking again, nothing while conversion may run.
-  std::optional<Clock::time_point> AskAgain() const { return pausedUntil_; }
+  /// Returns when to check again, nothing while conversion may run.
+  std::optional<Clock::time_point> NextCheck() const { return pausedUntil_; }
 
  private:
-  Clock::time_point mayStartUntil_;
+  Clock::time_point allowedUntil_;
   std::optional<Clock::time_point> pausedUntil_;
   std::string reason_;
 };

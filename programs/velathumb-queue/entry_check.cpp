@@ -1,16 +1,18 @@
 #include "entry_check.h"
 
-#include <cerrno>
 #include <cstdint>
 #include <cstring>
 #include <filesystem>
 #include <system_error>
 
-#include "entry_plan.h"
 #include "platform/system_rules.h"
 #include "platform/velaindex.h"
 #include "platform/vlibc.h"
+#include "posix/path_lock.h"
+#include "posix/service_log.h"
+#include "profiles/thumbnail_profile.h"
 #include "storage/creation_queue.h"
+#include "storage/directory_tree.h"
 
 namespace vela {
 
@@ -18,10 +20,15 @@ namespace {
 
 std::string FindTreeFault(const std::string& path) {
   if (path.find(':') != std::string::npos) {
-    return "a tree's path cannot hold a colon; add its directories one by one";
+    return "the path of a tree cannot contain a colon; add its directories one by one";
   }
   const std::string name = path.substr(path.rfind('/') + 1);
-  return EntryNameShouldIndex(name.c_str()) == 1 ? "" : "velathumb leaves out a tree of this name";
+  return EntryNameShouldIndex(name.c_str()) == 1 ? "" : "velathumb skips a tree of this name";
+}
+
+bool IsDirectoryLocked(const std::string& directory) {
+  // With the slash at the end anything but a directory fails to open.
+  return IsLocked(directory + "/" + kMetadataDirName + "/");
 }
 
 }  // namespace
@@ -30,7 +37,7 @@ std::string CheckAddition(std::string& entry) {
   const bool isTree = IsTreeEntry(entry);
   const std::string given = isTree ? entry.substr(std::strlen(kTreePrefix)) : entry;
   if (given.find('\n') != std::string::npos) {
-    return "an entry cannot hold a newline";
+    return "an entry cannot contain a newline";
   }
   if (given.empty() || IsDirExist(given.c_str()) == 0) {
     return "there is no such directory";
@@ -48,12 +55,34 @@ std::string CheckAddition(std::string& entry) {
   return isTree ? FindTreeFault(path) : std::string();
 }
 
-std::string FindHindrance(const std::string& entry) {
+std::string FindObstacle(const std::string& entry) {
   const std::string directory = TargetOf(entry).directory;
   if (IsDirExist(directory.c_str()) == 0) {
     return "there is no such directory";
   }
   return VLIBGetFsAvailSize(directory.c_str()) < kLeastFreeSpace ? "its volume is nearly full" : "";
+}
+
+bool IsLockedElsewhere(const EntryTarget& target) {
+  if (!target.isTree) {
+    return IsDirectoryLocked(target.directory);
+  }
+  bool isLocked = false;
+  ForEachIndexedDirectory(target.directory.c_str(), [&](const char* path, bool isReadable) {
+    isLocked = isLocked || (isReadable && IsDirectoryLocked(path));
+  });
+  return isLocked;
+}
+
+bool IsProfileUsable(const std::string& profileFile) {
+  ThumbnailProfileList profiles;
+  if (IsFileExist(profileFile.c_str()) != 0 &&
+      ParseThumbnailProfiles(profiles, profileFile, "/") != 0 &&
+      GetProfileCount(profiles, kAllPhases) > 0) {
+    return true;
+  }
+  WriteLog(LogLevel::kError, "no profile file, or no thumbnail in it: " + profileFile);
+  return false;
 }
 
 }  // namespace vela

@@ -1,16 +1,27 @@
-// Whether velathumb would do anything with an entry.
+// What is checked before and after velathumb runs: it silently skips what it cannot process, with
+// exit status 0.
 #pragma once
 
 #include <string>
 
+#include "entry_plan.h"
+
 namespace vela {
 
-/// Turns an entry that was given on the command line into one that means the same to everybody: its
-/// path absolute. Returns what is wrong with it, empty when nothing is.
+/// Makes the path of an entry from the command line absolute, so that it does not depend on the
+/// working directory. Returns what is wrong with the entry, empty when nothing is.
 std::string CheckAddition(std::string& entry);
 
-/// Returns why the entry cannot be worked on now, empty when it can: velathumb says nothing about a
-/// directory that is not there and gives up, with status 0, where the volume is nearly full.
-std::string FindHindrance(const std::string& entry);
+/// Returns why the entry cannot be processed now, empty when it can: its directory must exist, and
+/// its volume have enough free space.
+std::string FindObstacle(const std::string& entry);
+
+/// Returns whether another process holds the lock on a directory of the entry: velathumb would skip
+/// it.
+bool IsLockedElsewhere(const EntryTarget& target);
+
+/// Returns whether velathumb can read the profile file and it defines a thumbnail; logs when not.
+/// Without a usable profile velathumb skips every directory, and each entry would count as done.
+bool IsProfileUsable(const std::string& profileFile);
 
 }  // namespace vela

@@ -13,11 +13,11 @@ namespace vela {
 
 namespace {
 
-/// How far beyond the first entry that is not done others are looked at.
+/// How many entries are considered, from the first one that is not done.
 constexpr size_t kLookAhead = 1000;
 
-/// Returns the directory that velathumb takes from a tree entry: without colons in front of it, and
-/// up to the next one.
+/// Returns the directory that velathumb reads from a tree entry: without leading colons, up to the
+/// next colon.
 std::string TreeDirectory(const std::string& entry) {
   const size_t begin = entry.find_first_not_of(':', std::strlen(kTreePrefix));
   return begin == std::string::npos ? "" : entry.substr(begin, entry.find(':', begin) - begin);
@@ -57,7 +57,7 @@ bool DoOverlap(const EntryTarget& a, const EntryTarget& b) {
 EntryPlan::EntryPlan(std::vector<std::string> entries) {
   items_.reserve(entries.size());
   for (std::string& entry : entries) {
-    items_.push_back({std::move(entry), State::kWaiting, Clock::time_point(), std::nullopt});
+    items_.push_back({std::move(entry), State::kPending, Clock::time_point(), std::nullopt});
   }
 }
 
@@ -65,14 +65,14 @@ EntryPlan::Range EntryPlan::Window() const {
   return {first_, std::min(items_.size(), first_ + kLookAhead)};
 }
 
-bool EntryPlan::OverlapsWithWork(Item& item) {
-  if (atWork_.empty()) {
+bool EntryPlan::OverlapsWithProgress(Item& item) {
+  if (inProgress_.empty()) {
     return false;
   }
   if (!item.target) {
     item.target = TargetOf(item.entry);
   }
-  return std::any_of(atWork_.begin(), atWork_.end(),
+  return std::any_of(inProgress_.begin(), inProgress_.end(),
                      [&](size_t other) { return DoOverlap(*item.target, *items_[other].target); });
 }
 
@@ -80,27 +80,27 @@ std::optional<size_t> EntryPlan::Start(Clock::time_point now) {
   const auto [begin, end] = Window();
   for (size_t number = begin; number < end; ++number) {
     Item& item = items_[number];
-    if (item.state != State::kWaiting || item.notBefore > now || OverlapsWithWork(item)) {
+    if (item.state != State::kPending || item.notBefore > now || OverlapsWithProgress(item)) {
       continue;
     }
     if (!item.target) {
       item.target = TargetOf(item.entry);
     }
-    item.state = State::kAtWork;
-    atWork_.push_back(number);
+    item.state = State::kInProgress;
+    inProgress_.push_back(number);
     return number;
   }
   return std::nullopt;
 }
 
-void EntryPlan::PutOff(size_t number, Clock::time_point time) {
-  atWork_.erase(std::remove(atWork_.begin(), atWork_.end(), number), atWork_.end());
-  items_[number].state = State::kWaiting;
+void EntryPlan::Postpone(size_t number, Clock::time_point time) {
+  inProgress_.erase(std::remove(inProgress_.begin(), inProgress_.end(), number), inProgress_.end());
+  items_[number].state = State::kPending;
   items_[number].notBefore = time;
 }
 
 void EntryPlan::Finish(size_t number) {
-  atWork_.erase(std::remove(atWork_.begin(), atWork_.end(), number), atWork_.end());
+  inProgress_.erase(std::remove(inProgress_.begin(), inProgress_.end(), number), inProgress_.end());
   items_[number].state = State::kDone;
   items_[number].target.reset();
   while (first_ < items_.size() && items_[first_].state == State::kDone) {
@@ -113,7 +113,7 @@ std::optional<EntryPlan::Clock::time_point> EntryPlan::NextStart() const {
   const auto [begin, end] = Window();
   for (size_t number = begin; number < end; ++number) {
     const Item& item = items_[number];
-    if (item.state == State::kWaiting && (!next || item.notBefore < *next)) {
+    if (item.state == State::kPending && (!next || item.notBefore < *next)) {
       next = item.notBefore;
     }
   }

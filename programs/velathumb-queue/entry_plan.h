@@ -1,4 +1,4 @@
-// Which entry comes next, and which may be worked on at the same time.
+// Which entry comes next, and which may be processed at the same time.
 #pragma once
 
 #include <chrono>
@@ -9,16 +9,16 @@
 
 namespace vela {
 
-/// What an entry stands for.
+/// The directory or tree that an entry names.
 struct EntryTarget {
   std::string directory;  ///< without symbolic links when it exists
-  bool isTree = false;    ///< with everything below it
+  bool isTree = false;    ///< including everything below it
 };
 
-/// Returns what the queue entry `entry` stands for.
+/// Returns the target of the queue entry `entry`.
 EntryTarget TargetOf(const std::string& entry);
 
-/// Returns whether both stand for a common directory.
+/// Returns whether both include a common directory.
 bool DoOverlap(const EntryTarget& a, const EntryTarget& b);
 
 /// Hands out entries in their order, never two that overlap at the same time.
@@ -28,27 +28,27 @@ class EntryPlan {
 
   explicit EntryPlan(std::vector<std::string> entries);
 
-  /// Returns the first entry that waits, is not put off beyond `now` and overlaps with none that is
-  /// at work; it is then at work. Nothing when there is none at the moment.
+  /// Returns the first pending entry that is not postponed beyond `now` and overlaps with none that
+  /// is in progress; it is then in progress. Nothing when there is none at the moment.
   std::optional<size_t> Start(Clock::time_point now);
 
-  /// Puts an entry that was at work off until `time`.
-  void PutOff(size_t number, Clock::time_point time);
+  /// Postpones an entry that was in progress until `time`.
+  void Postpone(size_t number, Clock::time_point time);
 
-  /// Notes that an entry that was at work is done.
+  /// Marks an entry that was in progress as done.
   void Finish(size_t number);
 
   const std::string& Entry(size_t number) const { return items_[number].entry; }
   bool IsFinished() const { return first_ == items_.size(); }
 
-  /// Returns when the first of the entries that are put off may start, nothing when none is.
+  /// Returns when the first pending entry may start, nothing when none is pending.
   std::optional<Clock::time_point> NextStart() const;
 
  private:
-  enum class State { kWaiting, kAtWork, kDone };
+  enum class State { kPending, kInProgress, kDone };
   struct Item {
     std::string entry;
-    State state = State::kWaiting;
+    State state = State::kPending;
     Clock::time_point notBefore;
     std::optional<EntryTarget> target;
   };
@@ -58,11 +58,11 @@ class EntryPlan {
   };
 
   Range Window() const;
-  bool OverlapsWithWork(Item& item);
+  bool OverlapsWithProgress(Item& item);
 
   std::vector<Item> items_;
-  std::vector<size_t> atWork_;
-  size_t first_ = 0;  // all before it are done
+  std::vector<size_t> inProgress_;
+  size_t first_ = 0;  // all entries before it are done
 };
 
 }  // namespace vela

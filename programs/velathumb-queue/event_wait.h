@@ -1,4 +1,4 @@
-// Waiting for the end of a child, a signal to stop, or a new queue.
+// Waits for the end of a child, a signal to stop, or a new queue.
 #pragma once
 
 #include <chrono>
@@ -9,18 +9,19 @@
 
 namespace vela {
 
-/// Gathers what wakes the runner. Blocks SIGCHLD, SIGTERM and SIGINT for the process.
+/// Waits for all events that the runner handles. Blocks SIGCHLD, SIGTERM and SIGINT for the
+/// process.
 class EventWait {
  public:
-  /// Watches the directory of the file `watchedFile` for its appearing or being written. Returns 0
-  /// or an errno value.
+  /// Watches the directory of `watchedFile` for files that are created, moved there or written.
+  /// Returns 0 or an errno value.
   int Open(const std::string& watchedFile);
 
-  /// Waits until something happens or `timeout` is over; without one as long as it takes. What
-  /// happened stays to be asked for elsewhere, only the wish to stop is kept.
+  /// Waits for an event, at most for `timeout` when given. Of the events only the request to stop
+  /// is kept; the caller has to check for the others.
   void Wait(std::optional<std::chrono::milliseconds> timeout);
 
-  /// Whether SIGTERM or SIGINT has come.
+  /// Returns whether SIGTERM or SIGINT was received.
   bool IsStopping() const { return isStopping_; }
 
  private:

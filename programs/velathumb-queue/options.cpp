@@ -1,58 +1,55 @@
 #include "options.h"
 
-#include <unistd.h>
-
 #include <CLI/CLI.hpp>
 
-#include <cerrno>
 #include <filesystem>
 #include <string>
 #include <system_error>
 
-#include "run_log.h"
+#include "posix/files.h"
+#include "posix/service_log.h"
 
 namespace vela {
 
 namespace {
 
-constexpr char kDescription[] =
-    "Works the queue of directories off that wait for thumbnails: runs velathumb for each.";
-
-constexpr char kFooter[] =
-    "Exit status: 0 nothing waits any more, 1 something was left for a later run: ended by a\n"
-    "signal, could not be worked on, or another velathumb-queue is running; 2 error.";
+constexpr ProgramText kProgramText = {
+    "velathumb-queue",
+    "Processes the queue of directories that need thumbnails: runs velathumb for each entry.",
+    "Exit status: 0 the queue is empty, 1 entries are left for a later run: stopped by a signal,\n"
+    "entries that cannot be processed now, or another velathumb-queue is running; 2 error."};
 
 void AddOptions(CLI::App& app, RunSettings& settings) {
-  app.add_flag("-f,--follow", settings.follow, "stay and wait for new entries");
+  app.add_flag("-f,--follow", settings.follow, "keep running and wait for new entries");
   app.add_option("-j,--jobs", settings.jobs,
-                 "work on up to N directories at a time, never two of a tree")
+                 "process up to N entries at a time, never overlapping ones")
       ->type_name("N")
       ->check(CLI::Range(1, 256));
   app.add_option("-a,--add", settings.additions,
-                 "append ENTRY to the queue first: a directory, or R: and a directory; can be "
-                 "given again")
+                 "append ENTRY to the queue first: a directory, or R: and a directory; may be "
+                 "repeated")
       ->type_name("ENTRY")
       ->allow_extra_args(false);
-  app.add_option("-p,--profile", settings.program.profileFile, "profile file for velathumb")
+  app.add_option("-p,--profile", settings.velathumb.profileFile, "profile file for velathumb")
       ->type_name("FILE")
       ->capture_default_str();
-  app.add_option("--velathumb", settings.program.path, "the velathumb to run")
+  app.add_option("--velathumb", settings.velathumb.path, "the velathumb to run")
       ->type_name("FILE")
       ->capture_default_str();
   app.add_flag("--wait", settings.wait,
-               "when another velathumb-queue is running, wait for its end");
+               "when another velathumb-queue is running, wait for it to end");
   app.add_flag("--check-videos", settings.checkVideos,
-               "count the videos that wait in their queue for the progress totals; this REMOVES "
-               "bad thumbnails and films of these videos");
-  app.set_version_flag("--version", "velathumb-queue " VELA_VERSION);
+               "count the videos in the video queue for the progress totals; this REMOVES bad "
+               "thumbnails and converted videos of these videos");
 }
 
-bool IsUsable(const std::string& file, int mode) {
-  if (access(file.c_str(), mode) == 0) {
-    return true;
+/// Returns whether the file has the access that velathumb needs; otherwise that is logged.
+bool IsUsable(const std::string& file, FileAccess access) {
+  const int error = CheckAccess(file, access);
+  if (error != 0) {
+    WriteLog(LogLevel::kError, file, error);
   }
-  WriteLog(LogLevel::kError, file + ": " + ErrnoText(errno));
-  return false;
+  return error == 0;
 }
 
 /// Returns the directory that this program was installed into.
@@ -61,8 +58,8 @@ std::filesystem::path OwnDirectory() {
   return std::filesystem::read_symlink("/proc/self/exe", error).parent_path();
 }
 
-/// What is installed together with this program.
-ChildProgram InstalledProgram() {
+/// Returns the velathumb and the profile file that were installed together with this program.
+VelathumbCommand InstalledVelathumb() {
   const std::filesystem::path programs = OwnDirectory();
   const auto profiles = programs.parent_path() / "share/velathumb/thumb-profiles.conf";
   return {(programs / "velathumb").string(), profiles.string()};
@@ -71,22 +68,15 @@ ChildProgram InstalledProgram() {
 }  // namespace
 
 ParseOutcome ParseOptions(int argc, char** argv, RunSettings& settings) {
-  try {
-    settings.program = InstalledProgram();
-    CLI::App app(kDescription, "velathumb-queue");
-    app.footer(kFooter);
-    AddOptions(app, settings);
-    try {
-      app.parse(argc, argv);
-    } catch (const CLI::ParseError& error) {
-      return app.exit(error) == 0 ? ParseOutcome::kDone : ParseOutcome::kWrong;
-    }
-  } catch (const std::exception& error) {
-    WriteLog(LogLevel::kError, error.what());
-    return ParseOutcome::kWrong;
+  settings.velathumb = InstalledVelathumb();
+  const ParseOutcome outcome = ParseCommandLine(kProgramText, ArgumentsOf(argc, argv),
+                                                [&](CLI::App& app) { AddOptions(app, settings); });
+  if (outcome != ParseOutcome::kRun) {
+    return outcome;
   }
-  // velathumb says nothing about a profile that is not there, and every entry would count as done.
-  return IsUsable(settings.program.path, X_OK) && IsUsable(settings.program.profileFile, R_OK)
+  // velathumb silently ignores a missing profile, and every entry would count as done.
+  return IsUsable(settings.velathumb.path, FileAccess::kExecute) &&
+                 IsUsable(settings.velathumb.profileFile, FileAccess::kRead)
              ? ParseOutcome::kRun
              : ParseOutcome::kWrong;
 }

@@ -7,9 +7,9 @@
 #include "entry_plan.h"
 #include "platform/velaindex.h"
 #include "platform/vlibc.h"
+#include "posix/service_log.h"
 #include "progress/progress_summary.h"
 #include "progress/velamk_progress.h"
-#include "run_log.h"
 #include "storage/creation_queue.h"
 #include "storage/directory_status.h"
 #include "storage/directory_tree.h"
@@ -19,12 +19,12 @@
 namespace vela {
 
 struct ProgressTotals::Sums {
-  int64_t photos = 0;  ///< that lack thumbnails
-  int64_t thumbs = 0;  ///< that they lack
-  /// Of these, what an earlier queue of this run has already counted as done because it failed.
+  int64_t photos = 0;  ///< with missing thumbnails
+  int64_t thumbs = 0;  ///< missing thumbnails
+  /// Of these, the ones that failed in an earlier queue of this run and so were counted as done.
   int64_t failedPhotos = 0;
   int64_t failedThumbs = 0;
-  std::set<Place> directories;
+  std::set<FileIdentity> directories;
 };
 
 namespace {
@@ -38,7 +38,7 @@ void SetCounter(int kind, const char* key, int64_t value) {
   }
 }
 
-/// Sets the total to what is done, `recounted` of it taken back, and what is outstanding.
+/// Sets the total to what is done, less `recounted`, plus what is outstanding.
 void SetTotal(int kind, const char* totalKey, const char* completedKey, int64_t outstanding,
               int64_t recounted = 0) {
   const int64_t completed = std::max<int64_t>(0, GetConvProgress(kind, completedKey) - recounted);
@@ -48,7 +48,7 @@ void SetTotal(int kind, const char* totalKey, const char* completedKey, int64_t 
   SetCounter(kind, totalKey, completed + outstanding);
 }
 
-int64_t CountWaitingVideos() {
+int64_t CountQueuedVideos() {
   return int64_t{CountVideoQueueWork(kVideoQueue.tempFile)} + CountVideoQueueWork(kVideoQueue.file);
 }
 
@@ -64,15 +64,11 @@ int CountFailures(const std::string& path, const PhotoThumbStates& thumbs) {
 }  // namespace
 
 void ProgressTotals::CountDirectory(const char* path, Sums& sums) const {
-  struct stat status = {};
-  if (stat(path, &status) != 0) {
+  FileIdentity directory;
+  if (IdentifyDirectory(path, directory) != 0 || !sums.directories.insert(directory).second) {
     return;
   }
-  const Place place = {status.st_dev, status.st_ino};
-  if (!sums.directories.insert(place).second) {
-    return;
-  }
-  const bool wasCounted = counted_.count(place) != 0;
+  const bool wasCounted = counted_.count(directory) != 0;
   ForEachPhotoStatus(path, [&](const std::string& photo, const PhotoThumbStates& thumbs) {
     const int missing = thumbs.Missing();
     if (missing == 0) {
@@ -86,7 +82,7 @@ void ProgressTotals::CountDirectory(const char* path, Sums& sums) const {
   });
 }
 
-void ProgressTotals::CountEntry(const std::string& entry, const StopQuestion& shouldStop,
+void ProgressTotals::CountEntry(const std::string& entry, const StopCheck& shouldStop,
                                 Sums& sums) const {
   const EntryTarget target = TargetOf(entry);
   if (!target.isTree) {
@@ -100,13 +96,13 @@ void ProgressTotals::CountEntry(const std::string& entry, const StopQuestion& sh
   });
 }
 
-void ProgressTotals::BeginAnew() {
+void ProgressTotals::Reset() {
   counted_.clear();
   SetCounter(THUMB_TYPE_PHOTO, "completed", 0);
   SetCounter(THUMB_TYPE_PHOTO, "completed_thumb", 0);
 }
 
-void ProgressTotals::Set(const std::vector<std::string>& entries, const StopQuestion& shouldStop) {
+void ProgressTotals::Set(const std::vector<std::string>& entries, const StopCheck& shouldStop) {
   Sums sums;
   for (const std::string& entry : entries) {
     if (shouldStop()) {
@@ -121,7 +117,7 @@ void ProgressTotals::Set(const std::vector<std::string>& entries, const StopQues
   SetTotal(THUMB_TYPE_PHOTO, "total", "completed", sums.photos, sums.failedPhotos);
   SetTotal(THUMB_TYPE_PHOTO, "total_thumb", "completed_thumb", sums.thumbs, sums.failedThumbs);
   if (countVideos_) {
-    SetTotal(THUMB_TYPE_VIDEO, "total", "completed", CountWaitingVideos());
+    SetTotal(THUMB_TYPE_VIDEO, "total", "completed", CountQueuedVideos());
   }
 }
 

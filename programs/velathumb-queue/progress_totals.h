@@ -1,42 +1,40 @@
-// What the progress counters count towards.
+// The totals of the progress counters.
 #pragma once
-
-#include <sys/stat.h>
 
 #include <functional>
 #include <set>
 #include <string>
-#include <utility>
 #include <vector>
+
+#include "posix/files.h"
 
 namespace vela {
 
-/// Sets the totals in the progress files. A file that cannot be written is told in the log.
+/// Sets the totals in the progress files. A file that cannot be written is logged.
 class ProgressTotals {
  public:
-  /// Returns true when the counting is to be given up.
-  using StopQuestion = std::function<bool()>;
+  /// Returns whether to stop counting.
+  using StopCheck = std::function<bool()>;
 
-  /// With `countVideos` the videos that wait are counted too, with the removals that are part of
-  /// that.
+  /// With `countVideos` the videos in their queue are counted too, which removes bad thumbnails and
+  /// converted videos.
   explicit ProgressTotals(bool countVideos) : countVideos_(countVideos) {}
 
-  /// Sets the counters of photos and thumbnails to 0, for work that begins.
-  void BeginAnew();
+  /// Sets the counters of photos and thumbnails to 0, when work begins after an idle time.
+  void Reset();
 
-  /// Sets the totals to what is done and what the directories of the entries still need, each
-  /// directory once. When it is given up, nothing is set.
-  void Set(const std::vector<std::string>& entries, const StopQuestion& shouldStop);
+  /// Sets the totals to what is done plus what the directories of the entries still need, each
+  /// directory counted once. When `shouldStop` returns true, nothing is set.
+  void Set(const std::vector<std::string>& entries, const StopCheck& shouldStop);
 
  private:
-  using Place = std::pair<dev_t, ino_t>;
   struct Sums;
 
-  void CountEntry(const std::string& entry, const StopQuestion& shouldStop, Sums& sums) const;
+  void CountEntry(const std::string& entry, const StopCheck& shouldStop, Sums& sums) const;
   void CountDirectory(const char* path, Sums& sums) const;
 
   const bool countVideos_;
-  std::set<Place> counted_;  // directories of this run's earlier queues
+  std::set<FileIdentity> counted_;  // directories in earlier queues of this run
 };
 
 }  // namespace vela

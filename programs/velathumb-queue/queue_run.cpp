@@ -1,11 +1,8 @@
 #include "queue_run.h"
 
-#include <sys/wait.h>
-
 #include <algorithm>
 #include <cerrno>
 #include <chrono>
-#include <csignal>
 #include <functional>
 #include <map>
 #include <optional>
@@ -13,13 +10,12 @@
 #include <unordered_set>
 
 #include "conversion_pause.h"
-#include "directory_probe.h"
 #include "entry_check.h"
 #include "entry_plan.h"
 #include "event_wait.h"
-#include "profile_check.h"
+#include "posix/child_process.h"
+#include "posix/service_log.h"
 #include "progress_totals.h"
-#include "run_log.h"
 #include "taken_queue.h"
 
 namespace vela {
@@ -29,41 +25,51 @@ namespace {
 using std::chrono::milliseconds;
 using Clock = EntryPlan::Clock;
 
-/// How long an entry waits whose directory somebody else works on.
-constexpr std::chrono::seconds kLockedPause(2);
-/// How long it waits after its velathumb was killed, times the number of tries.
+/// How long an entry is postponed while its directory is locked by another velathumb.
+constexpr std::chrono::seconds kLockedDirectoryPause(2);
+/// How long it is postponed after its velathumb was killed or failed, times the number of tries.
 constexpr milliseconds kRetryPause(200);
-/// How long it is before a file of the queue that somebody holds is looked at again.
-constexpr milliseconds kBusyPause(200);
-/// After so many tries velathumb itself is at fault with this entry.
-constexpr int kMostTries = 25;
-/// velathumb enters a directory again when more is to be made in it: twice, for a photo that
-/// succeeds. One that comes back more often is left for another run.
-constexpr int kMostRounds = 16;
+/// Interval of the attempts to lock a file of the queue that is locked.
+constexpr milliseconds kLockedFilePause(200);
+/// After so many failed tries an entry is deferred: it is probably the cause itself.
+constexpr int kMaxTries = 25;
+/// velathumb queues a directory again when there is more to make in it: twice, for a photo that
+/// succeeds. One that is queued more often is deferred.
+constexpr int kMaxRounds = 16;
 
-/// Works one taken queue off.
+/// Starts velathumb for one entry. It ends with this process, however that ends: an orphan would
+/// keep its directory locked. To be called from the main thread. Returns 0 and stores the process
+/// id, or an errno value.
+int StartVelathumb(const VelathumbCommand& command, std::string entry, pid_t& pid) {
+  std::string path = command.path;
+  std::string profileFile = command.profileFile;
+  char* const arguments[] = {path.data(), profileFile.data(), entry.data(), nullptr};
+  return StartAttachedChild(path.c_str(), arguments, pid);
+}
+
+/// Processes one taken queue.
 class Batch {
  public:
   Batch(const RunSettings& settings, TakenQueue& taken, EventWait& events, PauseGate& gate)
       : settings_(settings), taken_(taken), events_(events), gate_(gate), plan_(taken.Entries()) {}
 
-  /// Returns kEmpty when all entries are done or left for later.
+  /// Returns kEmpty when all entries are done or deferred.
   RunEnd Run();
 
-  /// Returns how many entries were left for later.
-  int LeftCount() const { return left_; }
+  /// Returns how many entries were deferred to a later run.
+  int DeferredCount() const { return deferred_; }
 
  private:
   void StartEntries();
   bool StartEntry(size_t number);
   void ReapChildren();
-  void TakeEnd(size_t number, int status);
-  void TakeSuccess(size_t number);
+  void HandleEnd(size_t number, int status);
+  void HandleSuccess(size_t number);
   void Retry(size_t number);
-  void Leave(size_t number, const std::string& reason);
+  void Defer(size_t number, const std::string& reason);
   void Finish(size_t number);
   void StopChildren();
-  std::optional<milliseconds> TimeToWait() const;
+  std::optional<milliseconds> WaitTime() const;
 
   const RunSettings& settings_;
   TakenQueue& taken_;
@@ -72,26 +78,26 @@ class Batch {
   EntryPlan plan_;
   std::map<pid_t, size_t> children_;
   std::map<size_t, int> tries_;
-  int left_ = 0;
+  int deferred_ = 0;
   bool hasFailed_ = false;
 };
 
 bool Batch::StartEntry(size_t number) {
   const std::string& entry = plan_.Entry(number);
-  const std::string hindrance = FindHindrance(entry);
-  if (!hindrance.empty()) {
-    Leave(number, hindrance);
+  const std::string obstacle = FindObstacle(entry);
+  if (!obstacle.empty()) {
+    Defer(number, obstacle);
     return !hasFailed_;
   }
   if (IsLockedElsewhere(TargetOf(entry))) {
-    plan_.PutOff(number, Clock::now() + kLockedPause);
+    plan_.Postpone(number, Clock::now() + kLockedDirectoryPause);
     return true;
   }
-  int error = 0;
-  const pid_t child = StartChild(settings_.program, entry, error);
-  if (child == 0) {
-    WriteLog(LogLevel::kError, "cannot start " + settings_.program.path + ": " + ErrnoText(error));
-    plan_.PutOff(number, Clock::now());
+  pid_t child = 0;
+  const int error = StartVelathumb(settings_.velathumb, entry, child);
+  if (error != 0) {
+    WriteLog(LogLevel::kError, "cannot start " + settings_.velathumb.path, error);
+    plan_.Postpone(number, Clock::now());
     hasFailed_ = true;
     return false;
   }
@@ -108,18 +114,18 @@ void Batch::StartEntries() {
   }
 }
 
-void Batch::Leave(size_t number, const std::string& reason) {
+void Batch::Defer(size_t number, const std::string& reason) {
   const std::string& entry = plan_.Entry(number);
-  WriteLog(LogLevel::kWarning, "left for a later run, " + reason + ": " + entry);
-  const int error = taken_.Leave(entry);
+  WriteLog(LogLevel::kWarning, "deferred to a later run, " + reason + ": " + entry);
+  const int error = taken_.Defer(entry);
   if (error != 0) {
-    // Not done and not kept: the queue in hand must stay.
-    WriteLog(LogLevel::kError, "cannot keep it: " + ErrnoText(error));
-    plan_.PutOff(number, Clock::now());
+    // Neither done nor saved: the taken queue must stay.
+    WriteLog(LogLevel::kError, "cannot defer it", error);
+    plan_.Postpone(number, Clock::now());
     hasFailed_ = true;
     return;
   }
-  ++left_;
+  ++deferred_;
   tries_.erase(number);
   plan_.Finish(number);
 }
@@ -127,8 +133,8 @@ void Batch::Leave(size_t number, const std::string& reason) {
 void Batch::Finish(size_t number) {
   const int error = taken_.MarkDone(plan_.Entry(number));
   if (error != 0) {
-    // A later run repeats the entry, no more.
-    WriteLog(LogLevel::kWarning, "cannot note that an entry is done: " + ErrnoText(error));
+    // The only effect is that a later run repeats the entry.
+    WriteLog(LogLevel::kWarning, "cannot record that an entry is done", error);
   }
   tries_.erase(number);
   plan_.Finish(number);
@@ -136,53 +142,54 @@ void Batch::Finish(size_t number) {
 
 void Batch::Retry(size_t number) {
   const int tries = ++tries_[number];
-  if (tries < kMostTries) {
-    plan_.PutOff(number, Clock::now() + tries * kRetryPause);
+  if (tries < kMaxTries) {
+    plan_.Postpone(number, Clock::now() + tries * kRetryPause);
     return;
   }
-  Leave(number, "velathumb was ended each time");
+  Defer(number, "velathumb did not complete in any try");
 }
 
-/// velathumb ends with 0 also when it passed over a directory or stopped in it.
-void Batch::TakeSuccess(size_t number) {
+/// velathumb exits with 0 also when it skipped a directory or stopped in it.
+void Batch::HandleSuccess(size_t number) {
   const std::string& entry = plan_.Entry(number);
-  const std::string hindrance = FindHindrance(entry);
-  if (!hindrance.empty()) {
-    Leave(number, hindrance);
+  const std::string obstacle = FindObstacle(entry);
+  if (!obstacle.empty()) {
+    Defer(number, obstacle);
   } else if (IsLockedElsewhere(TargetOf(entry))) {
-    plan_.PutOff(number, Clock::now() + kLockedPause);
+    plan_.Postpone(number, Clock::now() + kLockedDirectoryPause);
   } else {
     Finish(number);
   }
 }
 
-void Batch::TakeEnd(size_t number, int status) {
-  if (WIFEXITED(status) && WEXITSTATUS(status) == 0) {
-    TakeSuccess(number);
+void Batch::HandleEnd(size_t number, int status) {
+  if (HasSucceeded(status)) {
+    HandleSuccess(number);
     return;
   }
   if (!events_.IsStopping()) {
-    WriteLog(LogLevel::kWarning, "velathumb was ended, trying again: " + plan_.Entry(number));
+    WriteLog(LogLevel::kWarning,
+             "velathumb did not complete, trying again: " + plan_.Entry(number));
   }
   Retry(number);
 }
 
 void Batch::ReapChildren() {
-  int status = 0;
-  for (pid_t child = 0; (child = waitpid(-1, &status, WNOHANG)) > 0;) {
-    const auto found = children_.find(child);
-    if (found == children_.end()) {
+  for (auto child = children_.begin(); child != children_.end();) {
+    const auto [pid, number] = *child;
+    const std::optional<int> status = ReapEndedChild(pid);
+    if (!status) {
+      ++child;
       continue;
     }
-    const size_t number = found->second;
-    children_.erase(found);
-    TakeEnd(number, status);
+    child = children_.erase(child);
+    HandleEnd(number, *status);
   }
 }
 
 void Batch::StopChildren() {
   for (const auto& child : children_) {
-    kill(child.first, SIGTERM);
+    TerminateChild(child.first);
   }
   while (!children_.empty()) {
     events_.Wait(milliseconds(1000));
@@ -190,16 +197,17 @@ void Batch::StopChildren() {
   }
 }
 
-std::optional<milliseconds> Batch::TimeToWait() const {
-  std::optional<Clock::time_point> wake = gate_.AskAgain();
-  const bool hasRoom = static_cast<int>(children_.size()) < settings_.jobs;
-  if (!wake && hasRoom) {
+std::optional<milliseconds> Batch::WaitTime() const {
+  std::optional<Clock::time_point> wake = gate_.NextCheck();
+  const bool hasFreeJob = static_cast<int>(children_.size()) < settings_.jobs;
+  if (!wake && hasFreeJob) {
     wake = plan_.NextStart();
   }
   if (!wake) {
     return std::nullopt;
   }
-  // An entry that only waits for another's end has no time of its own: that end wakes the runner.
+  // An entry that waits only for another one needs no time limit: the end of that one wakes the
+  // runner.
   const auto left = std::chrono::ceil<milliseconds>(*wake - Clock::now());
   return left > milliseconds(0) ? left : milliseconds(children_.empty() ? 0 : 1000);
 }
@@ -210,7 +218,7 @@ RunEnd Batch::Run() {
     if (plan_.IsFinished() || hasFailed_) {
       break;
     }
-    events_.Wait(TimeToWait());
+    events_.Wait(WaitTime());
     ReapChildren();
   }
   StopChildren();
@@ -220,7 +228,7 @@ RunEnd Batch::Run() {
   return plan_.IsFinished() ? RunEnd::kEmpty : RunEnd::kStopped;
 }
 
-/// Takes one queue after the other.
+/// Processes one queue after the other.
 class QueueRun {
  public:
   explicit QueueRun(const RunSettings& settings)
@@ -231,14 +239,14 @@ class QueueRun {
  private:
   RunEnd RunRounds();
   RunEnd RunRound(bool& isIdle);
-  RunEnd WorkOff(TakenQueue::Outcome outcome);
-  bool WaitForPermission();
+  RunEnd ProcessTaken(TakenQueue::Outcome outcome);
+  bool WaitUntilAllowed();
   void SetTotals(TakenQueue::Outcome outcome);
-  bool HasSeenAll();
-  RunEnd LeaveAll();
-  int AskUntilFree(const std::function<int()>& act);
+  bool RecordSeen();
+  RunEnd DeferAll();
+  int RetryWhileLocked(const std::function<int()>& act);
   RunEnd FinishTaken();
-  bool PutBackLeft();
+  bool RequeueDeferred();
   void WaitForEntries();
 
   const RunSettings& settings_;
@@ -246,24 +254,24 @@ class QueueRun {
   ProgressTotals totals_;
   EventWait events_;
   PauseGate gate_;
-  bool isIdle_ = true;                    // nothing was in hand before
-  bool hasLeft_ = false;                  // entries for a later run
-  std::unordered_set<std::string> seen_;  // since nothing waited last
-  int rounds_ = 0;                        // without a new one among them
-  Clock::time_point putBack_;
+  bool isIdle_ = true;                    // no entry was in progress before
+  bool hasDeferred_ = false;              // entries are left for a later run
+  std::unordered_set<std::string> seen_;  // entries since the queue was last empty
+  int rounds_ = 0;                        // in a row without an entry not seen before
+  Clock::time_point lastRequeue_;
 };
 
-/// Returns whether all entries that were taken have been there before.
-bool QueueRun::HasSeenAll() {
+/// Records the taken entries. Returns whether all of them were recorded before.
+bool QueueRun::RecordSeen() {
   const size_t before = seen_.size();
   seen_.insert(taken_.Entries().begin(), taken_.Entries().end());
   return seen_.size() == before;
 }
 
-/// Returns false when the wait was ended by a signal.
-bool QueueRun::WaitForPermission() {
+/// Waits until conversion may run. Returns false when a signal ended the wait.
+bool QueueRun::WaitUntilAllowed() {
   while (!events_.IsStopping() && !gate_.MayStart()) {
-    const auto left = std::chrono::ceil<milliseconds>(*gate_.AskAgain() - Clock::now());
+    const auto left = std::chrono::ceil<milliseconds>(*gate_.NextCheck() - Clock::now());
     events_.Wait(std::max(left, milliseconds(0)));
   }
   return !events_.IsStopping();
@@ -271,7 +279,7 @@ bool QueueRun::WaitForPermission() {
 
 void QueueRun::SetTotals(TakenQueue::Outcome outcome) {
   if (isIdle_ && outcome == TakenQueue::Outcome::kTaken) {
-    totals_.BeginAnew();
+    totals_.Reset();
   }
   isIdle_ = false;
   totals_.Set(taken_.Entries(), [this] {
@@ -280,83 +288,84 @@ void QueueRun::SetTotals(TakenQueue::Outcome outcome) {
   });
 }
 
-/// Repeats what finds a file held by somebody. Returns its last result: EWOULDBLOCK when the wait
-/// was ended by a signal.
-int QueueRun::AskUntilFree(const std::function<int()>& act) {
+/// Repeats `act` while it finds a file locked. Returns its last result: EWOULDBLOCK when a signal
+/// ended the wait.
+int QueueRun::RetryWhileLocked(const std::function<int()>& act) {
   int error = act();
   while (error == EWOULDBLOCK && !events_.IsStopping()) {
-    events_.Wait(kBusyPause);
+    events_.Wait(kLockedFilePause);
     error = act();
   }
   return error;
 }
 
 RunEnd QueueRun::FinishTaken() {
-  const int error = AskUntilFree([this] { return taken_.Finish(); });
+  const int error = RetryWhileLocked([this] { return taken_.Finish(); });
   if (error == 0) {
     return RunEnd::kEmpty;
   }
   if (error == EWOULDBLOCK) {
     return RunEnd::kStopped;
   }
-  WriteLog(LogLevel::kError, "cannot remove the queue that is done: " + ErrnoText(error));
+  WriteLog(LogLevel::kError, "cannot remove the finished queue", error);
   return RunEnd::kFailed;
 }
 
-RunEnd QueueRun::WorkOff(TakenQueue::Outcome outcome) {
+RunEnd QueueRun::ProcessTaken(TakenQueue::Outcome outcome) {
   const size_t count = taken_.Entries().size();
   WriteLog(LogLevel::kInfo,
-           (outcome == TakenQueue::Outcome::kResumed ? "going on with " : "took ") +
+           (outcome == TakenQueue::Outcome::kResumed ? "resuming with " : "took ") +
                std::to_string(count) + (count == 1 ? " entry" : " entries"));
-  if (!WaitForPermission()) {
+  if (!WaitUntilAllowed()) {
     return RunEnd::kStopped;
   }
   SetTotals(outcome);
   Batch batch(settings_, taken_, events_, gate_);
   const RunEnd end = batch.Run();
-  hasLeft_ = hasLeft_ || batch.LeftCount() > 0;
+  hasDeferred_ = hasDeferred_ || batch.DeferredCount() > 0;
   return end == RunEnd::kEmpty ? FinishTaken() : end;
 }
 
-RunEnd QueueRun::LeaveAll() {
-  WriteLog(LogLevel::kWarning, "entries come back again and again, left for a later run");
-  hasLeft_ = true;
+RunEnd QueueRun::DeferAll() {
+  WriteLog(LogLevel::kWarning,
+           "the same entries are queued again and again, deferred to a later run");
+  hasDeferred_ = true;
   for (const std::string& entry : taken_.Entries()) {
-    const int error = taken_.Leave(entry);
+    const int error = taken_.Defer(entry);
     if (error != 0) {
-      WriteLog(LogLevel::kError, "cannot keep an entry: " + ErrnoText(error));
+      WriteLog(LogLevel::kError, "cannot defer an entry", error);
       return RunEnd::kFailed;
     }
   }
   return FinishTaken();
 }
 
-/// Returns false when that failed, which is told in the log.
-bool QueueRun::PutBackLeft() {
-  putBack_ = Clock::now();
-  const int error = AskUntilFree([this] { return taken_.PutBackLeft(); });
+/// Returns false when that failed, which is logged.
+bool QueueRun::RequeueDeferred() {
+  lastRequeue_ = Clock::now();
+  const int error = RetryWhileLocked([this] { return taken_.RequeueDeferred(); });
   if (error != 0 && error != EWOULDBLOCK) {
-    WriteLog(LogLevel::kError, "cannot put back what was left: " + ErrnoText(error));
+    WriteLog(LogLevel::kError, "cannot put deferred entries back into the queue", error);
   }
   return error == 0 || error == EWOULDBLOCK;
 }
 
 void QueueRun::WaitForEntries() {
-  // The watch tells of every new queue; the limit is for a file system that tells nothing.
+  // The watch reports every new queue; the limit is for file systems that report nothing.
   constexpr milliseconds kLongestWait = std::chrono::minutes(1);
-  constexpr std::chrono::hours kLater(1);
+  constexpr std::chrono::hours kRequeueInterval(1);
   isIdle_ = true;
   rounds_ = 0;
   seen_.clear();
   events_.Wait(kLongestWait);
-  if (Clock::now() - putBack_ >= kLater) {
-    PutBackLeft();
+  if (Clock::now() - lastRequeue_ >= kRequeueInterval) {
+    RequeueDeferred();
   }
 }
 
-/// Takes what waits and works it off. Sets `isIdle` when nothing waits.
+/// Takes the pending entries and processes them. Sets `isIdle` when there are none.
 RunEnd QueueRun::RunRound(bool& isIdle) {
-  if (!IsProfileUsable(settings_.program.profileFile)) {
+  if (!IsProfileUsable(settings_.velathumb.profileFile)) {
     return RunEnd::kFailed;
   }
   const TakenQueue::Outcome outcome = taken_.Take();
@@ -364,7 +373,7 @@ RunEnd QueueRun::RunRound(bool& isIdle) {
     case TakenQueue::Outcome::kFailed:
       return RunEnd::kFailed;
     case TakenQueue::Outcome::kBusy:
-      events_.Wait(kBusyPause);
+      events_.Wait(kLockedFilePause);
       return RunEnd::kEmpty;
     case TakenQueue::Outcome::kNothing:
       isIdle = true;
@@ -373,8 +382,8 @@ RunEnd QueueRun::RunRound(bool& isIdle) {
     case TakenQueue::Outcome::kTaken:
       break;
   }
-  rounds_ = HasSeenAll() ? rounds_ + 1 : 0;
-  return rounds_ > kMostRounds ? LeaveAll() : WorkOff(outcome);
+  rounds_ = RecordSeen() ? rounds_ + 1 : 0;
+  return rounds_ > kMaxRounds ? DeferAll() : ProcessTaken(outcome);
 }
 
 RunEnd QueueRun::RunRounds() {
@@ -385,7 +394,7 @@ RunEnd QueueRun::RunRounds() {
       return end;
     }
     if (isIdle && !settings_.follow) {
-      return hasLeft_ ? RunEnd::kLeft : RunEnd::kEmpty;
+      return hasDeferred_ ? RunEnd::kDeferred : RunEnd::kEmpty;
     }
     if (isIdle) {
       WaitForEntries();
@@ -397,10 +406,10 @@ RunEnd QueueRun::RunRounds() {
 RunEnd QueueRun::Run() {
   const int error = events_.Open(PhotoQueuePaths().queue);
   if (error != 0) {
-    WriteLog(LogLevel::kError, "cannot watch the queue: " + ErrnoText(error));
+    WriteLog(LogLevel::kError, "cannot watch the queue", error);
     return RunEnd::kFailed;
   }
-  return PutBackLeft() ? RunRounds() : RunEnd::kFailed;
+  return RequeueDeferred() ? RunRounds() : RunEnd::kFailed;
 }
 
 }  // namespace

@@ -1,32 +1,36 @@
-// Works the photo queue off.
+// Processes the photo queue.
 #pragma once
 
 #include <string>
 #include <vector>
 
-#include "child_program.h"
-
 namespace vela {
 
-/// How the queue is worked off.
+/// How velathumb is started.
+struct VelathumbCommand {
+  std::string path;
+  std::string profileFile;
+};
+
+/// How the queue is processed.
 struct RunSettings {
-  ChildProgram program;
+  VelathumbCommand velathumb;
   int jobs = 1;                        ///< velathumb processes at a time
-  bool follow = false;                 ///< stay and wait for new entries
-  bool wait = false;                   ///< for the end of another runner
-  bool checkVideos = false;            ///< count waiting videos for the totals
+  bool follow = false;                 ///< keep running and wait for new entries
+  bool wait = false;                   ///< wait for the end of another runner
+  bool checkVideos = false;            ///< count the queued videos for the totals
   std::vector<std::string> additions;  ///< entries to append to the queue first
 };
 
 /// How a run ended.
 enum class RunEnd {
-  kEmpty,    ///< nothing waits any more
-  kLeft,     ///< nothing waits but what could not be worked on
-  kStopped,  ///< by a signal; entries may be left for the next run
-  kFailed,   ///< told in the log; entries may be left for the next run
+  kEmpty,     ///< the queue is empty
+  kDeferred,  ///< only entries that could not be processed are left
+  kStopped,   ///< by a signal; entries may be left for the next run
+  kFailed,    ///< the reason is logged; entries may be left for the next run
 };
 
-/// Works the queue off until it is empty, or with `follow` until a signal comes.
+/// Processes the queue until it is empty, or with `follow` until a signal is received.
 RunEnd RunQueue(const RunSettings& settings);
 
 }  // namespace vela

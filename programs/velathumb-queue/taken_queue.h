@@ -1,8 +1,7 @@
-// The photo queue's entries that are being worked off, safe against a crash at any moment.
+// The entries of the photo queue that are being processed, safe against a crash at any moment.
 #pragma once
 
-#include <sys/types.h>
-
+#include <cstdint>
 #include <ctime>
 #include <string>
 #include <unordered_set>
@@ -10,12 +9,12 @@
 
 namespace vela {
 
-/// Where the queue is and what is kept beside it.
+/// The queue and the files beside it.
 struct QueuePaths {
   std::string queue;    ///< new entries are appended to it
-  std::string taken;    ///< what it was called when it was taken
-  std::string journal;  ///< entries of `taken` that are done, one a line
-  std::string later;    ///< entries that could not be worked on, for a later run
+  std::string taken;    ///< the queue is renamed to it when it is taken
+  std::string journal;  ///< entries of `taken` that are done, one per line
+  std::string later;    ///< entries that could not be processed, for a later run
 };
 
 /// The paths of the photo queue.
@@ -26,45 +25,46 @@ class TakenQueue {
  public:
   explicit TakenQueue(QueuePaths paths) : paths_(std::move(paths)) {}
 
-  /// What a take has found.
+  /// What Take has found.
   enum class Outcome {
-    kNothing,  ///< no entries wait
+    kNothing,  ///< no entries
     kResumed,  ///< entries that an earlier run has left
     kTaken,    ///< new entries
-    kBusy,     ///< somebody holds the queue; to be asked again
-    kFailed,   ///< told in the log
+    kBusy,     ///< the queue is locked; to be tried again
+    kFailed,   ///< the reason is logged
   };
 
-  /// Takes the entries that an earlier run has left, else those that wait in the queue.
+  /// Takes the entries that an earlier run has left, else those in the queue.
   Outcome Take();
 
-  /// The entries that are not done, each once, in the order of their first appearance.
+  /// Returns the entries that are not done, each once, in the order of their first appearance.
   const std::vector<std::string>& Entries() const { return entries_; }
 
-  /// Notes that the entry is done: a later run does not repeat it. Returns 0 or an errno value.
+  /// Records that the entry is done: a later run does not repeat it. Returns 0 or an errno value.
   int MarkDone(const std::string& entry);
 
-  /// Keeps an entry for a later run, which is then done for this one. Returns 0 or an errno value.
-  int Leave(const std::string& entry);
+  /// Saves an entry for a later run and records it as done for this one. Returns 0 or an errno
+  /// value.
+  int Defer(const std::string& entry);
 
-  /// Puts the entries that were left for later back into the queue. Returns 0 or an errno value,
-  /// EWOULDBLOCK while somebody holds the queue.
-  int PutBackLeft();
+  /// Puts the deferred entries back into the queue. Returns 0 or an errno value, EWOULDBLOCK while
+  /// the queue is locked.
+  int RequeueDeferred();
 
-  /// Forgets the taken entries, all of which are done; were any appended since they were read, the
-  /// next take goes on with those. Returns 0 or an errno value, EWOULDBLOCK while somebody holds
-  /// the file.
+  /// Removes the taken queue, all of whose entries are done. When entries were appended since it
+  /// was read, it stays, and the next Take returns those. Returns 0 or an errno value, EWOULDBLOCK
+  /// while the file is locked.
   int Finish();
 
  private:
   int MoveQueue();
-  int LeaveEmptyQueue(time_t made) const;
+  int RemoveEmptyQueue(time_t modified) const;
   bool ReadEntries();
   std::unordered_set<std::string> ReadJournal();
 
   const QueuePaths paths_;
   std::vector<std::string> entries_;
-  off_t readSize_ = 0;
+  uintmax_t readSize_ = 0;
 };
 
 }  // namespace vela

@@ -1,4 +1,4 @@
-// Numbers of thumbnails as an HTML page shows them.
+// Thumbnail counts as an HTML page shows them.
 #pragma once
 
 #include <cstdint>
@@ -11,7 +11,7 @@ namespace vela {
 /// The wanted thumbnails, each counted once.
 struct ThumbShares {
   int64_t present = 0;
-  int64_t missing = 0;  ///< missing or outdated, and not known to fail
+  int64_t missing = 0;  ///< missing or outdated, without a failure marker
   int64_t failed = 0;   ///< missing or outdated, with a failure marker
 
   int64_t Total() const { return present + missing + failed; }
@@ -24,7 +24,7 @@ ThumbShares SharesOf(const PhotoReport& photo);
 /// Returns the number with its digits in groups of three.
 std::string GroupDigits(int64_t number);
 
-/// Returns the number, grouped, with the word for one or for many.
+/// Returns the number with grouped digits and the singular or plural noun.
 std::string CountText(int64_t number, const char* one, const char* many);
 
 /// Returns "12%"; something but not everything is at least 1 and at most 99. `total` is not 0.

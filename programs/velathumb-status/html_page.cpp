@@ -1,7 +1,5 @@
 #include "html_page.h"
 
-#include <sys/stat.h>
-
 #include <cerrno>
 #include <ctime>
 #include <filesystem>
@@ -21,21 +19,22 @@ std::string DirectoryOf(const std::string& path) {
   return slash == std::string::npos ? "." : path.substr(0, slash + 1);
 }
 
-/// Returns the file that a link leads to: the page is to stand there, and the link to stay.
+/// Returns the file that a link leads to, which is replaced instead of the link.
 std::string ResolvedTarget(const std::string& path) {
   std::error_code error;
   const auto target = std::filesystem::canonical(path, error);
   return error ? path : target.string();
 }
 
-/// Returns an errno value when something stands at `path` that is no file. A device, above all,
-/// must not be replaced by one.
+/// Returns an errno value when `path` is something other than a regular file: a device, above all,
+/// must not be replaced by a file.
 int ErrorOfTarget(const std::string& path) {
-  struct stat target = {};
-  if (stat(path.c_str(), &target) != 0 || S_ISREG(target.st_mode)) {
+  std::error_code error;
+  const auto target = std::filesystem::status(path, error);
+  if (!std::filesystem::exists(target) || std::filesystem::is_regular_file(target)) {
     return 0;
   }
-  return S_ISDIR(target.st_mode) ? EISDIR : EEXIST;
+  return std::filesystem::is_directory(target) ? EISDIR : EEXIST;
 }
 
 std::string Span(const std::string& text) {
@@ -107,14 +106,14 @@ std::string Choice(const char* id, const char* label, bool isChosen) {
          (isChosen ? " checked" : "") + ">" + label + "</label>\n";
 }
 
-/// Works without a script: the style sheet hides what is not asked for.
+/// Needs no script: the style sheet hides the other photos.
 std::string Choices() {
   return "<fieldset class=\"show\"><legend>Show</legend>\n" +
          Choice("show-all", "All photos", true) + Choice("show-work", "Need work", false) +
          Choice("show-failed", "Failed", false) + "</fieldset>\n";
 }
 
-/// Whatever a name on the page holds, the policy lets nothing run and nothing be loaded.
+/// Whatever a name on the page contains, the policy allows no script and no loading.
 std::string PageHead() {
   return std::string(
              "<!DOCTYPE html>\n<html lang=\"en\">\n<head>\n<meta charset=\"utf-8\">\n"
@@ -142,12 +141,12 @@ constexpr const char* kPageEnd =
 HtmlPage::HtmlPage(const std::string& path)
     : path_(ResolvedTarget(path)),
       error_(ErrorOfTarget(path_)),
-      body_(DirectoryOf(path_), PageFile::Kind::kScratch),
-      photos_(DirectoryOf(path_), PageFile::Kind::kScratch) {}
+      body_(DirectoryOf(path_), NewFile::Kind::kScratch),
+      photos_(DirectoryOf(path_), NewFile::Kind::kScratch) {}
 
 HtmlPage::~HtmlPage() = default;
 
-/// A page that has failed takes nothing more; a scan must not end because memory is short for it.
+/// Does nothing after an error of the page; lack of memory for the page must not end the scan.
 template <typename Step>
 void HtmlPage::Do(const Step& step) {
   if (Error() != 0) {
@@ -203,7 +202,7 @@ void HtmlPage::TakeTotals(const StatusTotals& totals) {
 
 int HtmlPage::Finish() {
   Do([&] {
-    PageFile page(DirectoryOf(path_), PageFile::Kind::kResult);
+    NewFile page(DirectoryOf(path_), NewFile::Kind::kResult);
     page.Append(PageHead());
     page.Append(PageHeader(totals_, shares_));
     page.AppendAllOf(body_);

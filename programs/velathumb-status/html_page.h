@@ -1,23 +1,23 @@
-// The state of directories as one self-contained page.
+// The status of directories as one self-contained page.
 #pragma once
 
 #include <cstdint>
 #include <string>
 
 #include "html_counts.h"
-#include "page_file.h"
+#include "posix/new_file.h"
 #include "status_report.h"
 
 namespace vela {
 
-/// Writes the page while the scan goes on; the file appears, whole, when the page is finished. It
-/// holds no more than one thumbnail in memory.
+/// Writes the page during the scan; the file appears only when the page is complete. Holds no more
+/// than one thumbnail in memory.
 class HtmlPage : public StatusSink {
  public:
-  /// The page is to stand at `path`: a new file, or in place of a file or of a symbolic link to
-  /// one. Anything else there (a directory, a device) stays and makes Finish fail.
+  /// `path` is a new file, a file to replace, or a symbolic link to one. Anything else there (a
+  /// directory, a device) is kept and makes Finish fail.
   explicit HtmlPage(const std::string& path);
-  /// Leaves nothing behind of a page that was not finished.
+  /// Removes what was written of an unfinished page.
   ~HtmlPage() override;
 
   void BeginDirectory() override;
@@ -28,8 +28,8 @@ class HtmlPage : public StatusSink {
   /// Returns the first error so far, an errno value, 0 when there was none.
   int Error() const;
 
-  /// Puts the finished page in place of what stands there. Returns 0, or an errno value when
-  /// something could not be written; the old file then stays.
+  /// Replaces the file with the finished page. Returns 0, or an errno value when something could
+  /// not be written; the old file is then kept.
   int Finish();
 
  private:
@@ -37,9 +37,9 @@ class HtmlPage : public StatusSink {
   void Do(const Step& step);
 
   const std::string path_;
-  int error_;  // of the page itself; those of its files are theirs
-  PageFile body_;
-  PageFile photos_;  // of the current directory, until its numbers are known
+  int error_;  // apart from the errors of its files
+  NewFile body_;
+  NewFile photos_;  // of the current directory, until its counts are known
   ThumbShares directoryShares_;
   ThumbShares shares_;
   StatusTotals totals_;

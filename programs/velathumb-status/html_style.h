@@ -1,10 +1,10 @@
-// How the HTML page looks.
+// The style sheet of the HTML page.
 #pragma once
 
 namespace vela {
 
-/// The page's style sheet. It refers to nothing outside the page. Every state is told by words, and
-/// by a border or a pattern, beside its colour.
+/// Refers to nothing outside the page. Every state is shown by words and by a border or a pattern,
+/// not by its colour alone.
 inline constexpr const char* kHtmlStyle = R"css(
 :root{color-scheme:light dark;--bg:#f3f5f7;--card:#fff;--text:#1c2128;--soft:#535c66;--line:#d3d9df;
 --well:#e9edf1;--present:#1a7f4b;--missing:#c98a00;--missing-soft:#ffe9b3;--missing-text:#6b4a00;

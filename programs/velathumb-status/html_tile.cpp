@@ -16,14 +16,14 @@ namespace {
 
 constexpr const char* kNoBreakSpace = "\u00a0";
 
-/// Returns "XL (1280×1280)", held together on one line.
+/// Returns a text like "XL (1280×1280)" that is not broken into lines.
 std::string SizeText(const EAThumbInfo& row) {
   std::string pixels = row.sizeString;
   pixels.replace(pixels.find('x'), 1, "×");
   return std::string(SizeClassName(row)) + kNoBreakSpace + '(' + pixels + ')';
 }
 
-/// Returns the sizes that are wanted, one behind the other.
+/// Returns the sizes for which `isWanted` returns true, separated by commas.
 std::string SizeList(const std::function<bool(size_t)>& isWanted) {
   std::string list;
   for (const EA_THUMB_SIZE size : kThumbSizesSmallestFirst) {
@@ -38,7 +38,7 @@ bool HasFailed(const PhotoReport& photo, size_t size) {
   return photo.thumbs.IsLacking(size) && photo.failures[size].has_value();
 }
 
-/// Whether nothing at all has come of the photo, and everything was tried.
+/// Returns whether every thumbnail of the photo was tried and failed.
 bool IsUnconvertible(const PhotoReport& photo, const std::string& thumb) {
   const ThumbShares shares = SharesOf(photo);
   const auto& states = photo.thumbs.states;
@@ -60,8 +60,7 @@ std::string UnconvertibleNote(const PhotoReport& photo) {
   return Note("The photo could not be converted, since " + TimeElement(since.value_or(0)));
 }
 
-/// Returns a note for each time at which sizes failed, so that what failed together stands
-/// together.
+/// Returns a note for each time at which sizes failed: those that failed together share a note.
 std::string FailureNotes(const PhotoReport& photo) {
   std::string notes;
   std::array<bool, kThumbSizeCount> isNamed = {};
@@ -80,7 +79,7 @@ std::string FailureNotes(const PhotoReport& photo) {
   return notes;
 }
 
-std::string LackNote(const PhotoReport& photo, ThumbState state, const char* label) {
+std::string StateNote(const PhotoReport& photo, ThumbState state, const char* label) {
   const std::string sizes = SizeList(
       [&](size_t size) { return photo.thumbs.states[size] == state && !HasFailed(photo, size); });
   return sizes.empty() ? std::string() : Note(label + (": " + sizes));
@@ -93,14 +92,14 @@ std::string Notes(const PhotoReport& photo, const std::string& thumb) {
   if (IsUnconvertible(photo, thumb)) {
     return UnconvertibleNote(photo);
   }
-  return FailureNotes(photo) + LackNote(photo, ThumbState::kMissing, "Missing") +
-         LackNote(photo, ThumbState::kOutdated, "Outdated");
+  return FailureNotes(photo) + StateNote(photo, ThumbState::kMissing, "Missing") +
+         StateNote(photo, ThumbState::kOutdated, "Outdated");
 }
 
-/// How a tile is marked, for the eye and in words.
+/// The mark of a tile: its style and its text.
 struct Mark {
   const char* cssClass;
-  const char* label;  ///< none for a photo that is done
+  const char* label;  ///< null for a photo that is done
 };
 
 Mark MarkOf(const PhotoReport& photo) {
@@ -119,7 +118,7 @@ Mark MarkOf(const PhotoReport& photo) {
   return {"missing", isMissing ? "Missing" : "Outdated"};
 }
 
-/// The size of the box only: its style fits the picture into it whatever its shape.
+/// Gives the size of the box; the style sheet fits the picture into it.
 std::string Picture(const std::string& thumb, const std::string& name) {
   if (thumb.empty()) {
     return "<span class=\"none\">No thumbnail</span>";

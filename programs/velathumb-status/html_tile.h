@@ -1,4 +1,4 @@
-// One photo in the grid of an HTML page.
+// A photo in the grid of an HTML page.
 #pragma once
 
 #include <ctime>
@@ -8,7 +8,8 @@
 
 namespace vela {
 
-/// Returns the tile of the photo as a list item. `thumb` is a JPEG that shows it, empty for none.
+/// Returns the tile of the photo as a list item. `thumb` is the content of a JPEG file, empty for
+/// none.
 std::string PhotoTile(const PhotoReport& photo, const std::string& thumb);
 
 /// Returns a point in time, seconds since the epoch, as a time element in local time.

@@ -12,7 +12,7 @@ namespace vela {
 
 namespace {
 
-/// Raised when a key changes its meaning or goes; new keys do not change it.
+/// Raised when a key changes its meaning or is removed; new keys do not change it.
 constexpr int kFormat = 1;
 
 Json::StreamWriterBuilder MakeWriter() {

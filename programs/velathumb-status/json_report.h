@@ -1,4 +1,4 @@
-// Everything the tool tells as one JSON object, written as it becomes known.
+// The report as one JSON object, written as the results become known.
 #pragma once
 
 #include <json/value.h>
@@ -10,8 +10,8 @@
 
 namespace vela {
 
-/// Stores the byte string under `key`; one that is no valid UTF-8 with replacement characters, and
-/// exactly under the key with "_base64" behind it.
+/// Stores the byte string under `key`. One that is not valid UTF-8 is stored there with replacement
+/// characters, and exactly under `key` followed by "_base64".
 void PutBytes(Json::Value& object, const std::string& key, const std::string& bytes);
 
 /// Returns the value as compact JSON without a newline.
@@ -25,13 +25,13 @@ class JsonReport {
   /// Writes a whole member.
   void Member(const char* key, const Json::Value& value);
 
-  /// Writes a member that is a list: between the two calls its elements.
+  /// Begin and end a member that is a list; its elements are written in between.
   void BeginList(const char* key);
   void Element(const Json::Value& value);
   void EndList();
 
-  /// Writes an element of that list, an object whose last member `key` is a list itself: between
-  /// the two calls its elements.
+  /// Begin and end an element of that list, an object whose last member `key` is a list itself; the
+  /// elements of that are written in between.
   void BeginElement(const Json::Value& object, const char* key);
   void InnerElement(const Json::Value& value);
   void EndElement();

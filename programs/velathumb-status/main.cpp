@@ -1,22 +1,21 @@
 // velathumb-status [OPTION]... [DIR]...
 //
-// Tells people and scripts what is still to be done.
-
-#include <unistd.h>
+// Reports the outstanding work, for people and scripts.
 
 #include <cerrno>
 #include <cstdlib>
 #include <cstring>
-#include <exception>
 #include <iostream>
 #include <memory>
 #include <string>
 #include <utility>
 #include <vector>
 
+#include "cli/command_line.h"
 #include "html_page.h"
 #include "json_report.h"
 #include "options.h"
+#include "posix/terminal.h"
 #include "progress_report.h"
 #include "progress_watch.h"
 #include "queue_report.h"
@@ -33,7 +32,7 @@ constexpr int kNothingToDo = 0;
 constexpr int kWorkOutstanding = 1;
 constexpr int kError = 2;
 
-/// Hands everything to several others and remembers whether there is work.
+/// Passes everything on to several sinks and remembers whether there is work.
 class SinkList : public StatusSink {
  public:
   void Append(StatusSink* sink) { sinks_.push_back(sink); }
@@ -58,28 +57,27 @@ class SinkList : public StatusSink {
   bool hasWork_ = false;
 };
 
-/// One run over all questions of a command line.
+/// Produces everything that a command line asks for.
 class StatusRun {
  public:
   explicit StatusRun(Options options) : options_(std::move(options)), json_(std::cout) {}
 
-  /// Answers and returns the exit status.
+  /// Writes the reports and returns the exit status.
   int Run();
 
  private:
   void Watch();
-  void Answer();
+  void Report();
   bool CanCheckVideos();
-  void AnswerDirectories();
-  void AnswerQueues();
-  void AnswerProgress();
-  void AnswerResumeTime();
-  void TakePageError(int error);
-  void TakeError(const std::string& path, const std::string& message);
-  void TakeWork(bool hasWork) { hasWork_ = hasWork_ || hasWork; }
+  void ReportDirectories();
+  void ReportQueues();
+  void ReportProgress();
+  void ReportResumeTime();
+  void AddPageError(int error);
+  void AddError(const std::string& path, const std::string& message);
+  void AddWork(bool hasWork) { hasWork_ = hasWork_ || hasWork; }
   ScanErrorHandler ErrorHandler() {
-    return
-        [this](const std::string& path, const std::string& message) { TakeError(path, message); };
+    return [this](const std::string& path, const std::string& message) { AddError(path, message); };
   }
 
   Options options_;
@@ -88,7 +86,7 @@ class StatusRun {
   bool hasWork_ = false;
 };
 
-void StatusRun::TakeError(const std::string& path, const std::string& message) {
+void StatusRun::AddError(const std::string& path, const std::string& message) {
   std::cerr << "velathumb-status: " << ToPlainLine(path) << ": " << message << '\n';
   Json::Value error;
   PutBytes(error, "path", path);
@@ -99,53 +97,52 @@ void StatusRun::TakeError(const std::string& path, const std::string& message) {
 bool StatusRun::CanCheckVideos() {
   const std::string fault = FindVideoCheckFault();
   if (!fault.empty()) {
-    TakeError("--check-videos", fault);
+    AddError("--check-videos", fault);
   }
   return fault.empty();
 }
 
-void StatusRun::AnswerDirectories() {
+void StatusRun::ReportDirectories() {
   std::unique_ptr<HtmlPage> page;
   if (!options_.htmlFile.empty()) {
     page = std::make_unique<HtmlPage>(options_.htmlFile);
     if (page->Error() != 0) {
-      TakePageError(page->Error());
+      AddPageError(page->Error());
       return;
     }
   }
   SinkList sinks;
-  std::unique_ptr<StatusSink> answer;
+  std::unique_ptr<StatusSink> report;
   if (options_.json) {
-    answer = std::make_unique<JsonStatus>(json_, options_.photos);
+    report = std::make_unique<JsonStatus>(json_, options_.photos);
   } else {
-    answer = std::make_unique<TextReport>(std::cout, options_.photos);
+    report = std::make_unique<TextReport>(std::cout, options_.photos);
   }
-  sinks.Append(answer.get());
+  sinks.Append(report.get());
   if (page != nullptr) {
     sinks.Append(page.get());
   }
   ScanStatus(options_.directories, {options_.recursive, options_.checkVideos}, sinks,
              ErrorHandler());
-  TakeWork(sinks.HasWork());
+  AddWork(sinks.HasWork());
   if (page != nullptr && page->Finish() != 0) {
-    TakePageError(page->Error());
+    AddPageError(page->Error());
   }
 }
 
-void StatusRun::TakePageError(int error) {
-  // What stands there and is no file is never replaced.
-  TakeError(options_.htmlFile, error == EEXIST ? "is no regular file" : std::strerror(error));
+void StatusRun::AddPageError(int error) {
+  // Only a regular file is ever replaced.
+  AddError(options_.htmlFile, error == EEXIST ? "is not a regular file" : std::strerror(error));
 }
 
-void StatusRun::AnswerQueues() {
-  const QueueQuestion question = {options_.checkVideos};
-  TakeWork(options_.json ? WriteQueueJson(json_, question, ErrorHandler())
-                         : WriteQueueText(std::cout, question, ErrorHandler()));
+void StatusRun::ReportQueues() {
+  AddWork(options_.json ? WriteQueueJson(json_, options_.checkVideos, ErrorHandler())
+                        : WriteQueueText(std::cout, options_.checkVideos, ErrorHandler()));
 }
 
-void StatusRun::AnswerProgress() {
+void StatusRun::ReportProgress() {
   const ProgressState state = ReadProgressState();
-  TakeWork(state.HasWork());
+  AddWork(state.HasWork());
   if (options_.json) {
     json_.Member("progress", DescribeProgress(state));
   } else {
@@ -153,7 +150,7 @@ void StatusRun::AnswerProgress() {
   }
 }
 
-void StatusRun::AnswerResumeTime() {
+void StatusRun::ReportResumeTime() {
   const ResumeState state = ReadResumeState();
   if (options_.json) {
     json_.Member("resume", DescribeResume(state));
@@ -163,16 +160,15 @@ void StatusRun::AnswerResumeTime() {
 }
 
 void StatusRun::Watch() {
-  const bool isTerminal = isatty(STDOUT_FILENO) == 1;
-  TakeWork(WatchProgress(std::cout, isTerminal, options_.json));
+  AddWork(WatchProgress(std::cout, IsOutputTerminal(), options_.json));
 }
 
-void StatusRun::Answer() {
+void StatusRun::Report() {
   options_.checkVideos = options_.checkVideos && CanCheckVideos();
-  if (!options_.directories.empty()) AnswerDirectories();
-  if (options_.queue) AnswerQueues();
-  if (options_.progress) AnswerProgress();
-  if (options_.resumeTime) AnswerResumeTime();
+  if (!options_.directories.empty()) ReportDirectories();
+  if (options_.queue) ReportQueues();
+  if (options_.progress) ReportProgress();
+  if (options_.resumeTime) ReportResumeTime();
   if (options_.json) {
     json_.Member("errors", errors_);
     json_.End();
@@ -183,10 +179,10 @@ int StatusRun::Run() {
   if (options_.watch) {
     Watch();
   } else {
-    Answer();
+    Report();
   }
   if (!std::cout.flush()) {
-    TakeError("standard output", "cannot be written");
+    AddError("standard output", "cannot be written");
   }
   if (!errors_.empty()) {
     return kError;
@@ -194,23 +190,9 @@ int StatusRun::Run() {
   return hasWork_ ? kWorkOutstanding : kNothingToDo;
 }
 
-int RunMain(int argc, char** argv) {
-  Options options;
-  switch (ParseOptions(argc, argv, options)) {
-    case ParseOutcome::kDone:
-      return kNothingToDo;
-    case ParseOutcome::kWrong:
-      return kError;
-    case ParseOutcome::kRun:
-      break;
-  }
-  try {
-    std::ios::sync_with_stdio(false);
-    return StatusRun(std::move(options)).Run();
-  } catch (const std::exception& error) {
-    std::cerr << "velathumb-status: " << error.what() << '\n';
-    return kError;
-  }
+int Run(Options& options) {
+  std::ios::sync_with_stdio(false);
+  return StatusRun(std::move(options)).Run();
 }
 
 }  // namespace
@@ -218,5 +200,5 @@ int RunMain(int argc, char** argv) {
 }  // namespace vela
 
 int main(int argc, char** argv) {
-  return vela::RunMain(argc, argv);
+  return vela::RunProgram(argc, argv, vela::ParseOptions, vela::Run, vela::kError);
 }

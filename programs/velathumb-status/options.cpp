@@ -3,54 +3,51 @@
 #include <CLI/CLI.hpp>
 
 #include <cstring>
-#include <iostream>
 
 namespace vela {
 
 namespace {
 
-constexpr char kDescription[] =
-    "Tells what velathumb still has to do: which photos lack thumbnails, which videos need work,\n"
-    "what waits in the queues and how far the conversion has come.";
-
-constexpr char kFooter[] =
+constexpr ProgramText kProgramText = {
+    "velathumb-status",
+    "Reports the outstanding work of velathumb: which photos lack thumbnails, which videos need\n"
+    "work, what the queues contain and how far the conversion has got.",
     "Exit status: 0 nothing to do, 1 work outstanding, 2 error.\n"
-    "Nothing is changed, unless --check-videos asks for it.";
+    "Nothing is changed unless --check-videos is given."};
 
 /// Returns what is wrong with the name of a file, empty when nothing is.
 std::string FindNameFault(const std::string& name) {
-  return name.empty() ? "the name of the file is empty; --help tells more" : std::string();
+  return name.empty() ? "the name of the file is empty; see --help" : std::string();
 }
 
 void AddOptions(CLI::App& app, Options& options) {
   auto* directories =
-      app.add_option("DIR", options.directories, "directories to look at, a line for each");
-  app.add_flag("-p,--photos", options.photos, "name the photos and what each lacks or failed at")
+      app.add_option("DIR", options.directories, "directories to check, one line for each");
+  app.add_flag("-p,--photos", options.photos,
+               "list incomplete photos with their missing, outdated and failed sizes")
       ->needs(directories);
-  app.add_flag("-r,--recursive", options.recursive, "look below the directories too")
+  app.add_flag("-r,--recursive", options.recursive, "include everything below the directories")
       ->needs(directories);
   app.add_flag("--check-videos", options.checkVideos,
-               "look at videos too, with the index service; this REMOVES thumbnails of videos that "
-               "are outdated or of the wrong orientation, and the Flash film or MPEG-4 conversion "
-               "of a rotated video that stands wrong");
+               "check videos too, with the index service; this REMOVES thumbnails of videos that "
+               "are outdated or have the wrong orientation, and the Flash or MPEG-4 conversion of "
+               "a rotated video when its orientation is wrong");
   app.add_option("--html", options.htmlFile, "write a page with all photos to FILE")
       ->check(FindNameFault, "")
       ->type_name("FILE")
       ->needs(directories);
-  auto* queue = app.add_flag("-q,--queue", options.queue, "tell what the queues hold");
-  app.add_flag("--progress", options.progress, "tell the counters of conversion progress");
+  auto* queue = app.add_flag("-q,--queue", options.queue, "show the entries of the queues");
+  app.add_flag("--progress", options.progress, "show the counters of conversion progress");
   auto* resumeTime =
-      app.add_flag("--resume-time", options.resumeTime, "tell until when conversion is held back");
-  app.add_flag("-w,--watch", options.watch,
-               "follow the progress until no velathumb is running any more")
+      app.add_flag("--resume-time", options.resumeTime, "show until when conversion is paused");
+  app.add_flag("-w,--watch", options.watch, "follow the progress until no velathumb is running")
       ->excludes(directories)
       ->excludes(queue)
       ->excludes(resumeTime);
-  app.add_flag("-j,--json", options.json, "answer in JSON");
-  app.set_version_flag("--version", "velathumb-status " VELA_VERSION);
+  app.add_flag("-j,--json", options.json, "write JSON");
 }
 
-/// Returns what is wrong with options that are right each by itself, empty when nothing is.
+/// Returns what is wrong with options that are valid one by one, empty when nothing is.
 std::string FindContradiction(const Options& options) {
   const bool hasQuestion = !options.directories.empty() || options.queue || options.progress ||
                            options.watch || options.resumeTime;
@@ -63,15 +60,12 @@ std::string FindContradiction(const Options& options) {
   return {};
 }
 
-/// Returns the arguments such that the library takes each literally: a value that begins with a
-/// bracket would be a list to it.
-std::vector<std::string> LiteralArguments(int argc, char** argv) {
-  std::vector<std::string> arguments;
-  // From the last to the first, as the library wants them.
-  for (int i = argc - 1; i > 0; --i) {
-    const std::string argument = argv[i];
+/// Returns the arguments such that the library takes each literally: it would parse a value that
+/// begins with a bracket as a list.
+std::vector<std::string> LiteralArguments(std::vector<std::string> arguments) {
+  for (std::string& argument : arguments) {
     const bool isListLike = !argument.empty() && std::strchr("[{%", argument.front()) != nullptr;
-    arguments.push_back(isListLike ? "./" + argument : argument);
+    if (isListLike) argument.insert(0, "./");
   }
   return arguments;
 }
@@ -79,24 +73,10 @@ std::vector<std::string> LiteralArguments(int argc, char** argv) {
 }  // namespace
 
 ParseOutcome ParseOptions(int argc, char** argv, Options& options) {
-  try {
-    CLI::App app(kDescription, "velathumb-status");
-    app.footer(kFooter);
-    AddOptions(app, options);
-    try {
-      app.parse(LiteralArguments(argc, argv));
-    } catch (const CLI::ParseError& error) {
-      return app.exit(error) == 0 ? ParseOutcome::kDone : ParseOutcome::kWrong;
-    }
-    const std::string contradiction = FindContradiction(options);
-    if (contradiction.empty()) {
-      return ParseOutcome::kRun;
-    }
-    std::cerr << "velathumb-status: " << contradiction << "; --help tells more\n";
-  } catch (const std::exception& error) {
-    std::cerr << "velathumb-status: " << error.what() << '\n';
-  }
-  return ParseOutcome::kWrong;
+  return ParseCommandLine(
+      kProgramText, LiteralArguments(ArgumentsOf(argc, argv)),
+      [&](CLI::App& app) { AddOptions(app, options); },
+      [&](const CLI::App&) { return FindContradiction(options); });
 }
 
 }  // namespace vela

@@ -4,9 +4,11 @@
 #include <string>
 #include <vector>
 
+#include "cli/command_line.h"
+
 namespace vela {
 
-/// What is asked for.
+/// What to report, and how.
 struct Options {
   std::vector<std::string> directories;
   bool photos = false;
@@ -20,14 +22,7 @@ struct Options {
   std::string htmlFile;  ///< empty: no page
 };
 
-/// How the reading of the command line ended.
-enum class ParseOutcome {
-  kRun,    ///< the options are there
-  kDone,   ///< help or version was printed
-  kWrong,  ///< wrong use, told on standard error
-};
-
-/// Reads the command line into `options`.
+/// Parses the command line into `options`.
 ParseOutcome ParseOptions(int argc, char** argv, Options& options);
 
 }  // namespace vela

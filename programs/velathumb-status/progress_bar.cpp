@@ -37,8 +37,8 @@ std::string FormatTimeLeft(const ProgressRate& rate, int total) {
   return left ? "  " + FormatDuration(*left) + " left" : std::string();
 }
 
-/// Returns how much of `whole` is done, rounded down: the whole is not shown before the end. The
-/// counters may disagree.
+/// Returns the completed part of `whole`, rounded down: the full value is not shown before the end.
+/// The counters may be inconsistent.
 int DonePart(const ProgressCount& count, int whole) {
   const int64_t done = std::clamp(count.completed, 0, count.total);
   return static_cast<int>(done * whole / count.total);

@@ -1,4 +1,4 @@
-// One line that shows how far the conversion has come.
+// One line that shows the progress of the conversion.
 #pragma once
 
 #include <string>
@@ -8,16 +8,16 @@
 
 namespace vela {
 
-/// The counter that a bar follows: that of the thumbnails, or of the photos when nobody has said
-/// how many thumbnails there will be.
+/// The counter that a bar shows: that of the thumbnails, or of the photos when the total of the
+/// thumbnails is not known.
 struct FollowedCount {
   const char* unit;
   ProgressCount count;
 };
 FollowedCount ChooseCount(const ProgressSummary& summary);
 
-/// Returns the line for a terminal of `width` columns: bar, share, counts, rate and time left;
-/// without a total only what has been made and the rate.
+/// Returns the line for a terminal of `width` columns: bar, percentage, counts, rate and time left;
+/// without a total only the count and the rate.
 std::string FormatProgressBar(const FollowedCount& followed, const ProgressRate& rate, int width);
 
 }  // namespace vela

@@ -8,7 +8,7 @@ namespace vela {
 namespace {
 
 constexpr std::chrono::seconds kWindow(30);
-/// A year: what is further away is not known.
+/// A year: anything longer counts as unknown.
 constexpr double kLongestSeconds = 365.0 * 24 * 3600;
 
 }  // namespace
@@ -18,7 +18,7 @@ void ProgressRate::Note(Clock::time_point time, int completed) {
     samples_.clear();
   }
   samples_.push_back({time, completed});
-  // One sample from before the window stays, so that there is always a stretch to measure.
+  // One sample from before the window is kept, so that there is always an interval to measure.
   while (samples_.size() > 2 && samples_[1].time <= time - kWindow) {
     samples_.pop_front();
   }
@@ -32,7 +32,7 @@ std::optional<double> ProgressRate::PerSecond() const {
   if (time.count() <= 0) {
     return std::nullopt;
   }
-  // As floating point, since what is between two counters need not fit into one.
+  // As floating point: the difference of two counters may not fit into an int.
   const double made = static_cast<double>(samples_.back().completed) -
                       static_cast<double>(samples_.front().completed);
   return made / time.count();

@@ -12,14 +12,14 @@ class ProgressRate {
  public:
   using Clock = std::chrono::steady_clock;
 
-  /// Notes that the counter stood at `completed` at `time`; times do not go back. A counter that
-  /// went back begins anew.
+  /// Notes the value of the counter at `time`; times must not decrease. A counter that decreased
+  /// starts a new measurement.
   void Note(Clock::time_point time, int completed);
 
-  /// Returns the rate per second, nothing while it is not known.
+  /// Returns the rate per second, nothing while it is unknown.
   std::optional<double> PerSecond() const;
 
-  /// Returns the time until the counter reaches `total`, nothing while that is not known.
+  /// Returns the time until the counter reaches `total`, nothing while that is unknown.
   std::optional<std::chrono::seconds> TimeLeft(int total) const;
 
  private:

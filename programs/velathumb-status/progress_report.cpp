@@ -1,13 +1,9 @@
 #include "progress_report.h"
 
-#include <sys/time.h>
-
 #include <ctime>
 #include <ostream>
 #include <string>
 
-#include "platform/velaindex.h"
-#include "progress/velamk_progress.h"
 #include "thumb/running_instances.h"
 
 namespace vela {
@@ -75,28 +71,13 @@ Json::Value DescribeProgress(const ProgressState& state) {
   return object;
 }
 
-ResumeState ReadResumeState() {
-  ResumeState state;
-  if (IsFileExist("/etc/velainfo.conf") == 0) {
-    // Nothing holds conversion back where there are no settings; asking would only fill the log.
-    state.isReached = true;
-    return state;
-  }
-  state.resumeTime = GetThumbConvResumeTime();
-  state.isReached = IsThumbConvResumeTimeReached() == 1;
-  timeval wait = {};
-  GetThumbConvResumeWait(&wait);
-  state.waitSeconds = wait.tv_sec;
-  return state;
-}
-
 void WriteResumeText(std::ostream& out, const ResumeState& state) {
   if (state.isReached) {
-    out << "conversion is not held back\n";
+    out << "conversion is not paused\n";
   } else if (state.resumeTime < 0) {
-    out << "conversion is held back without an end (resume time " << state.resumeTime << ")\n";
+    out << "conversion is paused indefinitely (resume time " << state.resumeTime << ")\n";
   } else {
-    out << "conversion is held back until " << FormatTime(state.resumeTime) << ", for "
+    out << "conversion is paused until " << FormatTime(state.resumeTime) << ", for "
         << state.waitSeconds << " s\n";
   }
 }

@@ -1,8 +1,6 @@
 #include "progress_watch.h"
 
 #include <json/writer.h>
-#include <sys/ioctl.h>
-#include <unistd.h>
 
 #include <chrono>
 #include <ostream>
@@ -10,6 +8,7 @@
 #include <thread>
 
 #include "json_report.h"
+#include "posix/terminal.h"
 #include "progress_bar.h"
 #include "progress_rate.h"
 #include "progress_report.h"
@@ -19,31 +18,25 @@ namespace vela {
 namespace {
 
 constexpr std::chrono::milliseconds kInterval(500);
-constexpr int kUsualWidth = 80;
+constexpr int kLineWidth = 80;  // elsewhere than on a terminal
 
-int TerminalWidth() {
-  winsize size = {};
-  return ioctl(STDOUT_FILENO, TIOCGWINSZ, &size) == 0 && size.ws_col > 0 ? size.ws_col
-                                                                         : kUsualWidth;
-}
-
-/// Draws the line over the one before, which it can only while neither wraps.
+/// Draws the line over the previous one, which works only while neither wraps.
 void DrawBar(std::ostream& out, const std::string& line, int width) {
   out << '\r' << line.substr(0, static_cast<size_t>(width - 1)) << "\033[K" << std::flush;
 }
 
-Json::Value DescribeMoment(const ProgressState& state, const FollowedCount& followed,
-                           const ProgressRate& rate) {
-  Json::Value moment = DescribeProgress(state);
+Json::Value DescribeState(const ProgressState& state, const FollowedCount& followed,
+                          const ProgressRate& rate) {
+  Json::Value object = DescribeProgress(state);
   const auto perSecond = rate.PerSecond();
   const auto left = rate.TimeLeft(followed.count.total);
-  moment["unit"] = followed.unit;
-  moment["rate"] = perSecond ? Json::Value(*perSecond) : Json::Value();
-  moment["seconds_left"] = left ? Json::Value(Json::Int64{left->count()}) : Json::Value();
-  return moment;
+  object["unit"] = followed.unit;
+  object["rate"] = perSecond ? Json::Value(*perSecond) : Json::Value();
+  object["seconds_left"] = left ? Json::Value(Json::Int64{left->count()}) : Json::Value();
+  return object;
 }
 
-/// Shows one moment after the other.
+/// Shows one state after the other.
 class ProgressView {
  public:
   ProgressView(std::ostream& out, bool isTerminal, bool asJson)
@@ -52,7 +45,7 @@ class ProgressView {
   void Show(const ProgressState& state) {
     const FollowedCount followed = ChooseCount(state.summary);
     if (followed.unit != unit_) {
-      // Two counters have no rate in common.
+      // The rate of one counter says nothing about the other.
       rate_ = ProgressRate();
       unit_ = followed.unit;
     }
@@ -67,8 +60,8 @@ class ProgressView {
       return;
     }
     lastCounts_ = std::move(counts);
-    out_ << (asJson_ ? ToJsonLine(DescribeMoment(state, followed, rate_))
-                     : FormatProgressBar(followed, rate_, kUsualWidth))
+    out_ << (asJson_ ? ToJsonLine(DescribeState(state, followed, rate_))
+                     : FormatProgressBar(followed, rate_, kLineWidth))
          << std::endl;
   }
 

@@ -20,13 +20,13 @@ struct QueueFile {
   bool isVideo;
 };
 
-/// What is being worked off comes first.
+/// The entries that are being processed come first.
 constexpr QueueFile kQueueFiles[] = {{"photo", kPhotoQueue.tempFile, false},
                                      {"photo", kPhotoQueue.file, false},
                                      {"video", kVideoQueue.tempFile, true},
                                      {"video", kVideoQueue.file, true}};
 
-/// Calls `visit` with each entry of the file that is there. Returns their number.
+/// Calls `visit` with each entry of the file, if it exists. Returns their number.
 int64_t ReadQueue(const QueueFile& queue, const ScanErrorHandler& onError,
                   const std::function<void(const std::string&)>& visit) {
   int64_t count = 0;
@@ -45,8 +45,7 @@ int64_t ReadQueue(const QueueFile& queue, const ScanErrorHandler& onError,
 
 }  // namespace
 
-bool WriteQueueText(std::ostream& out, const QueueQuestion& question,
-                    const ScanErrorHandler& onError) {
+bool WriteQueueText(std::ostream& out, bool checkVideos, const ScanErrorHandler& onError) {
   int64_t all = 0;
   for (const QueueFile& queue : kQueueFiles) {
     out << queue.kind << " queue " << queue.path << '\n';
@@ -54,7 +53,7 @@ bool WriteQueueText(std::ostream& out, const QueueQuestion& question,
       out << "    " << ToPlainLine(entry) << '\n';
     });
     out << "    " << count << (count == 1 ? " entry" : " entries");
-    if (question.countVideoWork && queue.isVideo) {
+    if (checkVideos && queue.isVideo) {
       out << ", videos that need work: " << CountVideoQueueWork(queue.path);
     }
     out << '\n';
@@ -63,17 +62,15 @@ bool WriteQueueText(std::ostream& out, const QueueQuestion& question,
   return all > 0;
 }
 
-bool WriteQueueJson(JsonReport& report, const QueueQuestion& question,
-                    const ScanErrorHandler& onError) {
+bool WriteQueueJson(JsonReport& report, bool checkVideos, const ScanErrorHandler& onError) {
   int64_t all = 0;
   report.BeginList("queues");
   for (const QueueFile& queue : kQueueFiles) {
     Json::Value object;
     object["kind"] = queue.kind;
     object["file"] = queue.path;
-    object["videos_needing_work"] = question.countVideoWork && queue.isVideo
-                                        ? Json::Value(CountVideoQueueWork(queue.path))
-                                        : Json::Value();
+    object["videos_needing_work"] =
+        checkVideos && queue.isVideo ? Json::Value(CountVideoQueueWork(queue.path)) : Json::Value();
     report.BeginElement(object, "entries");
     all += ReadQueue(queue, onError, [&report](const std::string& entry) {
       Json::Value line;

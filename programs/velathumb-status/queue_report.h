@@ -1,4 +1,4 @@
-// What the creation queues hold.
+// The contents of the creation queues.
 #pragma once
 
 #include <iosfwd>
@@ -8,17 +8,12 @@
 
 namespace vela {
 
-/// How a report of the queues is asked for.
-struct QueueQuestion {
-  bool countVideoWork = false;  ///< with the removals that are part of it
-};
-
-/// Writes the entries of all queue files as text. Returns true when there are any.
-bool WriteQueueText(std::ostream& out, const QueueQuestion& question,
-                    const ScanErrorHandler& onError);
+/// Writes the entries of all queue files as text. With `checkVideos` also counts the queued videos
+/// that need work, which removes bad thumbnails and converted videos. Returns true when there are
+/// any entries.
+bool WriteQueueText(std::ostream& out, bool checkVideos, const ScanErrorHandler& onError);
 
 /// Writes the same as the member "queues".
-bool WriteQueueJson(JsonReport& report, const QueueQuestion& question,
-                    const ScanErrorHandler& onError);
+bool WriteQueueJson(JsonReport& report, bool checkVideos, const ScanErrorHandler& onError);
 
 }  // namespace vela

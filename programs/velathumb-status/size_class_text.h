@@ -1,4 +1,4 @@
-// How reports name the size classes of a photo.
+// Names of size classes in reports.
 #pragma once
 
 #include <string>

@@ -1,59 +1,23 @@
 #include "smallest_thumb.h"
 
-#include <fcntl.h>
 #include <limits.h>
-#include <sys/stat.h>
-#include <unistd.h>
 
-#include <cerrno>
-#include <cstdint>
 #include <string_view>
 
 #include "platform/velaindex.h"
-#include "posix/file_descriptor.h"
+#include "posix/file_content.h"
 #include "storage/thumb_size_class.h"
 
 namespace vela {
 
 namespace {
 
-/// Everybody may write into a metadata directory: what does not begin as every JPEG does is not for
-/// the page, nor is what a link leads to.
+/// Metadata directories are writable for all users: a file that does not begin like a JPEG must not
+/// get into the page, nor the target of a link.
 constexpr std::string_view kJpegBegin = "\xff\xd8\xff";
 
-bool IsEmbeddable(const struct stat& file) {
-  return S_ISREG(file.st_mode) && static_cast<uint64_t>(file.st_size) <= kLargestEmbeddedThumb;
-}
-
-/// Returns at most `size` bytes from the beginning, nothing after a read error.
-std::string ReadBytes(int file, size_t size) {
-  std::string bytes(size, '\0');
-  size_t length = 0;
-  while (length < size) {
-    const ssize_t count = read(file, &bytes[length], size - length);
-    if (count < 0 && errno == EINTR) {
-      continue;
-    }
-    if (count < 0) {
-      return std::string();
-    }
-    if (count == 0) {
-      break;
-    }
-    length += static_cast<size_t>(count);
-  }
-  bytes.resize(length);
-  return bytes;
-}
-
 std::string ReadThumb(const char* path) {
-  // A pipe put in a thumbnail's place must not stop the scan.
-  const FileDescriptor file(open(path, O_RDONLY | O_CLOEXEC | O_NONBLOCK | O_NOFOLLOW));
-  struct stat status = {};
-  if (!file.IsOpen() || fstat(file.Get(), &status) != 0 || !IsEmbeddable(status)) {
-    return std::string();
-  }
-  std::string bytes = ReadBytes(file.Get(), static_cast<size_t>(status.st_size));
+  std::string bytes = ReadSmallFile(path, kLargestEmbeddedThumb);
   const bool isJpeg = bytes.compare(0, kJpegBegin.size(), kJpegBegin) == 0;
   return isJpeg ? bytes : std::string();
 }

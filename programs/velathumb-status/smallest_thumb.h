@@ -1,4 +1,4 @@
-// The picture that stands for a photo on a page.
+// The thumbnail that represents a photo on a page.
 #pragma once
 
 #include <cstddef>
@@ -6,12 +6,12 @@
 
 namespace vela {
 
-/// Larger files are left out of a page, bytes.
+/// Larger thumbnails are not embedded into a page, bytes.
 inline constexpr size_t kLargestEmbeddedThumb = 4 * 1024 * 1024;
 
 /// Returns the bytes of the smallest thumbnail of the photo `path`, under its current or its older
-/// name. One that is empty, cannot be read or is larger than kLargestEmbeddedThumb is passed over.
-/// Empty when no thumbnail is left.
+/// name. One that is not a JPEG file, cannot be read or is larger than kLargestEmbeddedThumb is
+/// skipped. Empty when no thumbnail is left.
 std::string ReadSmallestThumb(const std::string& path);
 
 }  // namespace vela

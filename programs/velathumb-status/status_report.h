@@ -1,4 +1,4 @@
-// What is known of photos, directories and all of them together.
+// Status of photos, of directories and of all directories together.
 #pragma once
 
 #include <array>
@@ -15,7 +15,7 @@ namespace vela {
 struct PhotoReport {
   std::string path;
   PhotoThumbStates thumbs;
-  /// When the making of a missing or outdated thumbnail failed (seconds since the epoch), by size
+  /// When a missing or outdated thumbnail could not be made (seconds since the epoch), by size
   /// class.
   std::array<std::optional<time_t>, kThumbSizeCount> failures = {};
 
@@ -26,24 +26,24 @@ struct PhotoReport {
   int FailureCount() const;
 };
 
-/// Numbers of one directory or of many.
+/// Counts of one directory or of several.
 struct StatusCounts {
   int64_t photos = 0;
   int64_t incompletePhotos = 0;   ///< with a thumbnail missing or outdated
   int64_t presentThumbs = 0;      ///< up to date
   int64_t missingThumbs = 0;      ///< missing or outdated
   int64_t failureMarkers = 0;     ///< thumbnails that could not be made
-  std::optional<int64_t> videos;  ///< videos that need work; nothing when not asked for
+  std::optional<int64_t> videos;  ///< videos that need work; nothing when not checked
 
   void Add(const PhotoReport& photo);
   void Add(const StatusCounts& other);
   bool HasWork() const { return incompletePhotos > 0 || videos.value_or(0) > 0; }
 };
 
-/// One directory, its subdirectories aside.
+/// One directory without its subdirectories.
 struct DirectoryReport {
   std::string path;
-  bool isQueued = false;  ///< waits in the photo queue
+  bool isQueued = false;  ///< is in the photo queue
   StatusCounts counts;
 };
 
@@ -52,13 +52,13 @@ struct StatusTotals {
   int64_t directories = 0;
   int64_t queuedDirectories = 0;
   StatusCounts all;     ///< of all directories
-  StatusCounts queued;  ///< of those that wait in the photo queue
+  StatusCounts queued;  ///< of those in the photo queue
 
   void Add(const DirectoryReport& directory);
 };
 
-/// Takes what a scan finds, in its order: the beginning of a directory, its photos, its end; the
-/// totals come last.
+/// Receives the results of a scan in this order: for each directory its beginning, its photos and
+/// its end; then the totals.
 class StatusSink {
  public:
   StatusSink() = default;

@@ -1,18 +1,14 @@
 #include "status_scan.h"
 
-#include <fcntl.h>
-#include <sys/stat.h>
-#include <unistd.h>
-
 #include <algorithm>
 #include <cerrno>
 #include <cstring>
 #include <filesystem>
 #include <set>
 #include <system_error>
-#include <utility>
 
 #include "platform/velaindex.h"
+#include "posix/files.h"
 #include "storage/creation_queue.h"
 #include "storage/directory_status.h"
 #include "storage/directory_tree.h"
@@ -23,15 +19,14 @@ namespace vela {
 
 namespace {
 
-/// Tells whether the path depends on more than its components: on the working directory or on what
-/// a dot stands for.
+/// Returns whether the path is relative or has "." or ".." among its components.
 bool IsIndirect(const std::filesystem::path& path) {
   return path.is_relative() || std::any_of(path.begin(), path.end(), [](const auto& component) {
            return component == "." || component == "..";
          });
 }
 
-/// Returns the path as the queues name it: absolute, without dots and needless slashes.
+/// Returns the path as it is in the queues: absolute, without dots and extra slashes.
 std::string AbsolutePath(const std::string& given) {
   const std::filesystem::path path(given);
   std::error_code error;
@@ -40,7 +35,7 @@ std::string AbsolutePath(const std::string& given) {
   if (error) {
     return given;
   }
-  // A slash at the end makes an empty last component.
+  // A trailing slash makes an empty last component.
   const bool endsInSlash = plain.has_relative_path() && !plain.has_filename();
   return (endsInSlash ? plain.parent_path() : plain).string();
 }
@@ -77,18 +72,13 @@ class StatusScan {
   void ScanTree(const std::string& root);
   void ScanDirectory(const std::string& path);
   bool ScanPhotos(DirectoryReport& directory);
-  bool IsFirstVisit(const struct stat& directory);
 
   const ScanOptions options_;
   StatusSink& sink_;
   const ScanErrorHandler& onError_;
   StatusTotals totals_;
-  std::set<std::pair<dev_t, ino_t>> visited_;
+  std::set<FileIdentity> visited_;
 };
-
-bool StatusScan::IsFirstVisit(const struct stat& directory) {
-  return visited_.emplace(directory.st_dev, directory.st_ino).second;
-}
 
 bool StatusScan::ScanPhotos(DirectoryReport& directory) {
   std::vector<PhotoReport> photos;
@@ -111,16 +101,13 @@ bool StatusScan::ScanPhotos(DirectoryReport& directory) {
 }
 
 void StatusScan::ScanDirectory(const std::string& path) {
-  struct stat status = {};
-  if (stat(path.c_str(), &status) != 0) {
-    onError_(path, std::strerror(errno));
+  FileIdentity identity;
+  const int error = IdentifyDirectory(path, identity);
+  if (error != 0) {
+    onError_(path, std::strerror(error));
     return;
   }
-  if (!S_ISDIR(status.st_mode)) {
-    onError_(path, std::strerror(ENOTDIR));
-    return;
-  }
-  if (!IsFirstVisit(status)) {
+  if (!visited_.insert(identity).second) {
     return;
   }
   DirectoryReport directory;
@@ -140,9 +127,12 @@ void StatusScan::ScanDirectory(const std::string& path) {
   sink_.EndDirectory(directory);
   if (!isRead) {
     onError_(path, "cannot be opened");
-  } else if (faccessat(AT_FDCWD, path.c_str(), X_OK, AT_EACCESS) != 0) {
-    // The names are there, but nothing can be said of what they stand for.
-    onError_(path, std::strerror(errno));
+    return;
+  }
+  // Without this access the names can be read, but not the status of the files.
+  const int accessError = CheckAccess(path, FileAccess::kExecute);
+  if (accessError != 0) {
+    onError_(path, std::strerror(accessError));
   }
 }
 
@@ -158,9 +148,9 @@ void StatusScan::ScanTree(const std::string& root) {
         ScanDirectory(path);
       });
   if (result != 0) {
-    onError_(root, std::string("not all of it was looked at: ") + std::strerror(errno));
+    onError_(root, std::string("was not scanned completely: ") + std::strerror(errno));
   } else if (!isEntered) {
-    onError_(root, "is left out of a tree because of its name");
+    onError_(root, "is skipped in trees because of its name");
   }
 }
 

@@ -1,4 +1,4 @@
-// Asks the library how directories stand.
+// Scans directories for their status.
 #pragma once
 
 #include <functional>
@@ -9,17 +9,17 @@
 
 namespace vela {
 
-/// What a scan is to look at.
+/// What to scan.
 struct ScanOptions {
-  bool recursive = false;    ///< also below the directories
-  bool checkVideos = false;  ///< videos too, with the removals that are part of their check
+  bool recursive = false;    ///< including everything below the directories
+  bool checkVideos = false;  ///< videos too, which removes bad thumbnails and conversions
 };
 
-/// Takes the path of what could not be looked at, and why.
+/// Receives the path of something that could not be checked, and why.
 using ScanErrorHandler = std::function<void(const std::string& path, const std::string& message)>;
 
-/// Scans the directories one after the other, each once however often it is met, and hands what is
-/// found to `sink`.
+/// Scans the directories one after the other, each once however often it is found, and passes the
+/// results to `sink`.
 void ScanStatus(const std::vector<std::string>& directories, const ScanOptions& options,
                 StatusSink& sink, const ScanErrorHandler& onError);
 

@@ -1,4 +1,4 @@
-// Byte strings as the formats of the reports need them.
+// Encodes byte strings for the formats of the reports.
 #pragma once
 
 #include <string>
@@ -6,14 +6,14 @@
 
 namespace vela {
 
-/// Returns the text as valid UTF-8: what is none becomes the replacement character.
+/// Returns the text as valid UTF-8: every invalid byte becomes the replacement character.
 std::string ToUtf8(std::string_view bytes);
 
 /// Returns whether the bytes are valid UTF-8.
 bool IsUtf8(std::string_view bytes);
 
-/// Returns the text for an HTML page, in an attribute or between tags: valid UTF-8, with what has a
-/// meaning there and control characters escaped.
+/// Returns the text for an HTML page, in an attribute or between tags: valid UTF-8, with markup and
+/// control characters escaped.
 std::string ToHtml(std::string_view bytes);
 
 /// Returns the bytes in base 64, on one line.

@@ -1,4 +1,4 @@
-// The state of directories as lines of text.
+// The status of directories as lines of text.
 #pragma once
 
 #include <iosfwd>
@@ -8,7 +8,7 @@
 
 namespace vela {
 
-/// Writes a line for each directory, with `listPhotos` lines for its incomplete photos below it,
+/// Writes a line for each directory, with `listPhotos` followed by lines for its incomplete photos,
 /// and the totals.
 class TextReport : public StatusSink {
  public:

@@ -5,7 +5,7 @@ _velathumb_status() {
   local options='-p -r -q -w -j -h --photos --recursive --check-videos --html --queue --progress --resume-time
     --watch --json --help --version'
   compopt -o filenames 2>/dev/null
-  # Bash takes the equals sign for a word of its own.
+  # Bash treats the equals sign as a separate word.
   if [[ $previous == --html || ($previous == '=' && ${COMP_WORDS[COMP_CWORD - 2]} == --html) ]]; then
     mapfile -t COMPREPLY < <(compgen -f -- "$current")
   elif [[ $current == -* ]]; then

@@ -10,7 +10,7 @@ namespace vela {
 
 namespace {
 
-/// Asks about a file that is there and no video: what matters is whether anybody can tell.
+/// Checks a file that exists and is not a video: only the error matters.
 bool AreVideosReadable() {
   return VELAIDX_IsVideoNeedConvert("/proc/self/exe") >= 0 || VLIBCErrGet() != ELIBACC;
 }

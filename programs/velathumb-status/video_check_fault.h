@@ -1,4 +1,4 @@
-// Whether videos can be checked at all.
+// Whether videos can be checked.
 #pragma once
 
 #include <string>

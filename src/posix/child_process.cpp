@@ -33,7 +33,7 @@ constexpr size_t kChildStackSize = 64 * 1024;
 struct ChildPlan {
   const char* program;
   char* const* arguments;
-  ChildStreams streams;
+  const ChildStreams* streams;  ///< null for a child that keeps those of its parent
   pid_t parent;
   char commandName[kCommandNameSize];
   int error;
@@ -41,11 +41,17 @@ struct ChildPlan {
 
 // From here to RunChild: the child before its program, on borrowed memory. System calls only.
 
-void SetDefaultSignals() {
+/// No handler of the parent may run in the child, whose memory is the parent's.
+void SetDefaultSignals(bool keepIgnored) {
   struct sigaction action;
   memset(&action, 0, sizeof(action));
   action.sa_handler = SIG_DFL;
-  for (int number = 1; number < NSIG; ++number) sigaction(number, &action, nullptr);
+  for (int number = 1; number < NSIG; ++number) {
+    struct sigaction old;
+    const bool isKept =
+        keepIgnored && sigaction(number, nullptr, &old) == 0 && old.sa_handler == SIG_IGN;
+    if (!isKept) sigaction(number, &action, nullptr);
+  }
 }
 
 /// Copies `fd` out of the way of the standard descriptors; `fallback` is copied for one that is not
@@ -66,7 +72,7 @@ bool SetStreams(const ChildStreams& streams) {
   if (input < 0 || output < 0 || error < 0) return false;
   if (dup2(input, STDIN_FILENO) < 0 || dup2(output, STDOUT_FILENO) < 0) return false;
   if (dup2(error, STDERR_FILENO) < 0) return false;
-  // Also the descriptors that this process inherited.
+  // Also descriptors that this program has inherited itself.
   closefrom(kFirstOtherDescriptor);
   return true;
 }
@@ -87,13 +93,14 @@ bool UnblockSignals() {
 
 /// Returns an errno value; does not return once the program runs.
 int BecomeProgram(const ChildPlan& plan) {
-  SetDefaultSignals();
+  const bool isAttached = plan.streams == nullptr;
+  SetDefaultSignals(isAttached);
   // The kernel sets this name only at the end of exec, after the parent has gone on: until then a
   // search for the program's name would miss the child.
   prctl(PR_SET_NAME, plan.commandName);
   if (!EndWithParent(plan.parent)) return errno;
-  if (setpgid(0, 0) != 0) return errno;
-  if (!SetStreams(plan.streams)) return errno;
+  if (!isAttached && setpgid(0, 0) != 0) return errno;
+  if (!isAttached && !SetStreams(*plan.streams)) return errno;
   if (!UnblockSignals()) return errno;
   execve(plan.program, plan.arguments, environ);
   return errno;
@@ -105,7 +112,7 @@ int RunChild(void* data) {
   _exit(127);
 }
 
-ChildPlan MakePlan(const char* program, char* const arguments[], const ChildStreams& streams) {
+ChildPlan MakePlan(const char* program, char* const arguments[], const ChildStreams* streams) {
   ChildPlan plan{program, arguments, streams, getpid(), {}, 0};
   const char* slash = strrchr(program, '/');
   strncpy(plan.commandName, slash == nullptr ? program : slash + 1, kCommandNameSize - 1);
@@ -113,11 +120,11 @@ ChildPlan MakePlan(const char* program, char* const arguments[], const ChildStre
 }
 
 /// Returns the process id, or -1 with errno set. The parent is suspended until the program runs or
-/// the child has ended, which makes sharing its memory safe, and the start independent of how much
-/// memory that is.
+/// the child has ended, which makes sharing its memory safe and the time to start independent of
+/// how much memory that is.
 pid_t CloneChild(ChildPlan& plan) {
-  // Not on the caller's own stack: the child leaves its frames there without returning from them,
-  // which stack checkers take for corruption.
+  // Not on the caller's own stack: the child abandons its frames without returning from them, which
+  // stack checkers report as corruption.
   const std::unique_ptr<char[]> stack(new (std::nothrow) char[kChildStackSize]);
   if (!stack) {
     errno = ENOMEM;
@@ -141,7 +148,7 @@ int AwaitByDescriptor(pid_t pid, const Deadline& deadline) {
 }
 
 /// Polls, for systems that cannot wait with a limit.
-int AwaitByAsking(pid_t pid, const Deadline& deadline) {
+int AwaitByPolling(pid_t pid, const Deadline& deadline) {
   constexpr int kPauseMilliseconds = 10;
   for (;;) {
     siginfo_t info;
@@ -161,11 +168,9 @@ bool HasEnded(pid_t pid) {
   return result != 0 || info.si_pid == pid;
 }
 
-}  // namespace
-
-int StartChild(const char* program, char* const arguments[], const ChildStreams& streams,
-               pid_t& pid) {
-  // A handler that ends the tools must not run while this one has no name yet.
+int StartPlanned(const char* program, char* const arguments[], const ChildStreams* streams,
+                 pid_t& pid) {
+  // A signal handler that ends the children must not run before this one's process id is known.
   const SignalBlock noSignals;
   ChildPlan plan = MakePlan(program, arguments, streams);
   KeepChildStatus();
@@ -183,6 +188,17 @@ int StartChild(const char* program, char* const arguments[], const ChildStreams&
   return 0;
 }
 
+}  // namespace
+
+int StartChild(const char* program, char* const arguments[], const ChildStreams& streams,
+               pid_t& pid) {
+  return StartPlanned(program, arguments, &streams, pid);
+}
+
+int StartAttachedChild(const char* program, char* const arguments[], pid_t& pid) {
+  return StartPlanned(program, arguments, nullptr, pid);
+}
+
 void AwaitChild(pid_t pid) {
   siginfo_t info;
   while (waitid(P_PID, static_cast<id_t>(pid), &info, WEXITED | WNOWAIT) != 0) {
@@ -194,7 +210,7 @@ bool AwaitChildFor(pid_t pid, std::chrono::seconds limit) {
   const Deadline deadline(limit);
   const int error = AwaitByDescriptor(pid, deadline);
   if (error == 0 || error == ETIMEDOUT) return error == 0;
-  return AwaitByAsking(pid, deadline) == 0;
+  return AwaitByPolling(pid, deadline) == 0;
 }
 
 void EndOverdueChild(pid_t pid, const char* program, std::chrono::seconds limit) {
@@ -214,6 +230,18 @@ int ReapChild(pid_t pid) {
   } while (reaped < 0 && errno == EINTR);
   ReleaseChildStatus();
   return reaped == pid ? status : -1;
+}
+
+std::optional<int> ReapEndedChild(pid_t pid) {
+  return HasEnded(pid) ? std::optional<int>(ReapChild(pid)) : std::nullopt;
+}
+
+void TerminateChild(pid_t pid) {
+  kill(pid, SIGTERM);
+}
+
+bool HasSucceeded(int waitStatus) {
+  return WIFEXITED(waitStatus) && WEXITSTATUS(waitStatus) == 0;
 }
 
 }  // namespace vela

@@ -1,9 +1,10 @@
-// Starting and ending the external tools.
+// Starting and ending child processes.
 #pragma once
 
 #include <sys/types.h>
 
 #include <chrono>
+#include <optional>
 
 namespace vela {
 
@@ -21,6 +22,10 @@ struct ChildStreams {
 int StartChild(const char* program, char* const arguments[], const ChildStreams& streams,
                pid_t& pid);
 
+/// Starts a child that remains part of the calling program: it keeps the caller's standard streams,
+/// inheritable descriptors, ignored signals and process group. Otherwise as StartChild.
+int StartAttachedChild(const char* program, char* const arguments[], pid_t& pid);
+
 /// Waits until the child has ended; its process id stays taken until ReapChild.
 void AwaitChild(pid_t pid);
 
@@ -34,5 +39,14 @@ void EndOverdueChild(pid_t pid, const char* program, std::chrono::seconds limit)
 /// Takes the ended child from the process table. Returns its wait status, or -1 when another part
 /// of the process has taken it.
 int ReapChild(pid_t pid);
+
+/// Does the same without waiting. Returns nothing while the child is running.
+std::optional<int> ReapEndedChild(pid_t pid);
+
+/// Sends SIGTERM to the child alone, not to what it has started.
+void TerminateChild(pid_t pid);
+
+/// Returns whether a wait status is that of a program that exited with 0.
+bool HasSucceeded(int waitStatus);
 
 }  // namespace vela

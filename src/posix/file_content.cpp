@@ -1,9 +1,11 @@
 #include "posix/file_content.h"
 
 #include <fcntl.h>
+#include <sys/stat.h>
 #include <unistd.h>
 
 #include <cerrno>
+#include <cstdint>
 #include <new>
 #include <stdexcept>
 
@@ -28,6 +30,22 @@ int AppendToEnd(int fd, std::string& content) {
   }
 }
 
+/// Returns at most `size` bytes from the beginning, nothing after an error: the file may grow
+/// meanwhile.
+std::string ReadBytes(int fd, size_t size) {
+  std::string bytes(size, '\0');
+  size_t length = 0;
+  while (length < size) {
+    const ssize_t count = read(fd, &bytes[length], size - length);
+    if (count < 0 && errno == EINTR) continue;
+    if (count < 0) return {};
+    if (count == 0) break;
+    length += static_cast<size_t>(count);
+  }
+  bytes.resize(length);
+  return bytes;
+}
+
 }  // namespace
 
 int ReadToEnd(int fd, std::string& content) {
@@ -44,6 +62,15 @@ int ReadFile(const char* path, std::string& content) {
   const FileDescriptor file(open(path, O_RDONLY | O_CLOEXEC | O_NONBLOCK | O_NOCTTY));
   if (!file.IsOpen()) return errno;
   return ReadToEnd(file.Get(), content);
+}
+
+std::string ReadSmallFile(const std::string& path, size_t limit) {
+  const int flags = O_RDONLY | O_NONBLOCK | O_NOFOLLOW | O_NOCTTY | O_CLOEXEC;
+  const FileDescriptor file(open(path.c_str(), flags));
+  struct stat status = {};
+  if (!file.IsOpen() || fstat(file.Get(), &status) != 0) return {};
+  if (!S_ISREG(status.st_mode) || static_cast<uint64_t>(status.st_size) > limit) return {};
+  return ReadBytes(file.Get(), static_cast<size_t>(status.st_size));
 }
 
 int WriteAll(int fd, std::string_view content) {

@@ -37,8 +37,18 @@ bool IsRegularFile(const std::string& path) {
   return status && status->isRegular;
 }
 
-bool IsReadable(const std::string& path) {
-  return access(path.c_str(), R_OK) == 0;
+int IdentifyDirectory(const std::string& path, FileIdentity& identity) {
+  const std::optional<FileStatus> status = ExamineFile(path);
+  if (!status) {
+    return errno;
+  }
+  identity = status->identity;
+  return status->isDirectory ? 0 : ENOTDIR;
+}
+
+int CheckAccess(const std::string& path, FileAccess access) {
+  const int mode = access == FileAccess::kRead ? R_OK : X_OK;
+  return ErrnoUnless(faccessat(AT_FDCWD, path.c_str(), mode, AT_EACCESS) == 0);
 }
 
 FileDescriptor OpenForReading(const std::string& path) {
@@ -63,6 +73,29 @@ int RenameFile(const std::string& from, const std::string& to) {
 
 int RemoveFile(const std::string& path) {
   return ErrnoUnless(unlink(path.c_str()) == 0);
+}
+
+int RemoveFileIfPresent(const std::string& path) {
+  const int error = RemoveFile(path);
+  return error == ENOENT ? 0 : error;
+}
+
+int AppendLine(const std::string& path, const std::string& text) {
+  const int flags = O_WRONLY | O_CREAT | O_APPEND | O_NOCTTY | O_CLOEXEC;
+  const FileDescriptor file(open(path.c_str(), flags, 0644));
+  if (!file.IsOpen()) {
+    return errno;
+  }
+  const off_t end = lseek(file.Get(), 0, SEEK_END);
+  const std::string line = text + '\n';
+  const ssize_t written = write(file.Get(), line.data(), line.size());
+  if (written < 0) {
+    return errno;
+  }
+  if (written == static_cast<ssize_t>(line.size())) {
+    return 0;
+  }
+  return ftruncate(file.Get(), end) == 0 ? ENOSPC : errno;
 }
 
 std::string FindUnusedPath(const std::string& nameTemplate) {

@@ -18,6 +18,9 @@ struct FileIdentity {
 constexpr bool operator==(const FileIdentity& a, const FileIdentity& b) {
   return a.device == b.device && a.inode == b.inode;
 }
+constexpr bool operator<(const FileIdentity& a, const FileIdentity& b) {
+  return a.device != b.device ? a.device < b.device : a.inode < b.inode;
+}
 
 /// What the system knows of a file.
 struct FileStatus {
@@ -42,8 +45,19 @@ inline std::optional<FileStatus> ExamineFile(const std::string& path) {
 /// Returns true when a regular file is at `path`, symbolic links followed.
 bool IsRegularFile(const std::string& path);
 
-/// Returns true when the process may read the file at `path`, symbolic links followed.
-bool IsReadable(const std::string& path);
+/// Stores the identity of the directory `path`. Returns 0 or an errno value, ENOTDIR when it is not
+/// a directory.
+int IdentifyDirectory(const std::string& path, FileIdentity& identity);
+
+/// What a process may do with a file.
+enum class FileAccess {
+  kRead,
+  kExecute,  ///< for a directory: look up names in it
+};
+
+/// Returns 0 when this process has the access to `path`, symbolic links followed, else an errno
+/// value.
+int CheckAccess(const std::string& path, FileAccess access);
 
 /// Opens the file or directory at `path` for reading; never waits for the writer of a pipe. Returns
 /// no open descriptor, with errno set, on failure.
@@ -65,6 +79,13 @@ int RenameFile(const std::string& from, const std::string& to);
 /// Removes the file at `path`, a symbolic link itself and not its target. Returns 0 or an errno
 /// value.
 int RemoveFile(const std::string& path);
+
+/// Removes the file at `path` as RemoveFile does. Returns 0 also when it does not exist.
+int RemoveFileIfPresent(const std::string& path);
+
+/// Appends `text` and a newline to the file `path`, created with mode 0644 when missing. A line
+/// that does not fit on the volume is removed again. Returns 0 or an errno value.
+int AppendLine(const std::string& path, const std::string& text);
 
 /// Replaces the X's at the end of `nameTemplate` so that no file has the resulting path. Returns an
 /// empty string when there is none or it could not be used.

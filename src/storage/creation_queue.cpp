@@ -32,7 +32,7 @@ bool IsQueued(const CreationQueue& queue, const char* path) {
   if (HasQueueLine(queue.tempFile, path)) {
     return true;
   }
-  return IsReadable(queue.file) && HasQueueLine(queue.file, path);
+  return CheckAccess(queue.file, FileAccess::kRead) == 0 && HasQueueLine(queue.file, path);
 }
 
 QueueRead ForEachQueueEntry(const char* queueFile,

@@ -57,7 +57,7 @@ TEST_F(CrashTest, WhatWasInHandIsRepeatedAndNothingElse) {
   Enqueue({"/tmp/new"});
   const ProgramResult result = velathumb_.Run();
   EXPECT_EQ(result.exitCode, 0);
-  EXPECT_THAT(result.err, HasSubstr("going on with 2 entries\n"));
+  EXPECT_THAT(result.err, HasSubstr("resuming with 2 entries\n"));
   EXPECT_THAT(velathumb_.Entries(),
               ElementsAre("/tmp/a", "/tmp/b", "/tmp/b", "/tmp/c", "/tmp/new"));
   ExpectNothingWaits();
@@ -158,7 +158,7 @@ TEST_F(CrashTest, AVelathumbThatWasKilledIsTriedAgain) {
   Enqueue({"/tmp/a"});
   const ProgramResult result = velathumb_.Run();
   EXPECT_EQ(result.exitCode, 0);
-  EXPECT_THAT(result.err, HasSubstr("velathumb was ended, trying again: /tmp/a\n"));
+  EXPECT_THAT(result.err, HasSubstr("velathumb did not complete, trying again: /tmp/a\n"));
   EXPECT_THAT(velathumb_.Entries(), ElementsAre("/tmp/a", "/tmp/a", "/tmp/a"));
   ExpectNothingWaits();
 }

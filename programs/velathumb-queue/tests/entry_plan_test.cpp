@@ -113,7 +113,7 @@ TEST_F(EntryPlanTest, LeavesOutWhatOverlapsWithWorkUntilThatIsDone) {
 TEST_F(EntryPlanTest, WhatIsPutOffWaitsForItsTimeAndHoldsNobodyBack) {
   EntryPlan plan({"/a", "R:/a"});
   EXPECT_THAT(plan.Start(now_), Optional(0U));
-  plan.PutOff(0, now_ + seconds(5));
+  plan.Postpone(0, now_ + seconds(5));
   EXPECT_THAT(plan.Start(now_), Optional(1U));
   EXPECT_THAT(plan.NextStart(), Optional(now_ + seconds(5)));
   plan.Finish(1);

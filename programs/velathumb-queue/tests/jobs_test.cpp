@@ -146,7 +146,7 @@ TEST_F(JobsTest, ASecondRunnerIsRefused) {
   Enqueue({"/tmp/b"});
   const ProgramResult second = velathumb_.Run();
   EXPECT_EQ(second.exitCode, 1);
-  EXPECT_EQ(second.err, "velathumb-queue: another velathumb-queue is running and has the work\n");
+  EXPECT_EQ(second.err, "velathumb-queue: another velathumb-queue is already running\n");
   EXPECT_EQ(ReadFile(kQueueFile), "/tmp/b\n");
   WriteFile("/tmp/go", "");
   ExpectEnd(runner);

@@ -55,7 +55,7 @@ TEST_F(LaterTest, ADirectoryThatIsNotThereIsKeptUntilItIs) {
   const ProgramResult first = velathumb_.Run();
   EXPECT_EQ(first.exitCode, 1);
   EXPECT_THAT(first.err,
-              HasSubstr("left for a later run, there is no such directory: R:/tmp/gone\n"));
+              HasSubstr("deferred to a later run, there is no such directory: R:/tmp/gone\n"));
   ExpectKept({"/tmp/none", "R:/tmp/gone"});
   MakeDirectories("/tmp/gone");
   EXPECT_EQ(velathumb_.Run().exitCode, 1);
@@ -81,7 +81,7 @@ TEST_F(LaterTest, ANearlyFullVolumeIsLeftAloneUntilItHasRoom) {
   const ProgramResult first = velathumb_.Run();
   EXPECT_EQ(first.exitCode, 1);
   EXPECT_THAT(first.err,
-              HasSubstr("left for a later run, its volume is nearly full: /tmp/small\n"));
+              HasSubstr("deferred to a later run, its volume is nearly full: /tmp/small\n"));
   EXPECT_THAT(velathumb_.Entries(), ElementsAre("/tmp/a"));
   ExpectKept({"/tmp/small"});
   volume.SetAvailable(kGibibyte);
@@ -110,7 +110,7 @@ TEST_F(LaterTest, AnEntryWhoseVelathumbIsKilledEachTimeIsKept) {
   const ProgramResult result = velathumb_.Run();
   EXPECT_EQ(result.exitCode, 1);
   EXPECT_THAT(result.err,
-              HasSubstr("left for a later run, velathumb was ended each time: /tmp/a\n"));
+              HasSubstr("deferred to a later run, velathumb did not complete in any try: /tmp/a\n"));
   const std::vector<std::string> entries = velathumb_.Entries();
   EXPECT_EQ(std::count(entries.begin(), entries.end(), "/tmp/a"), 25);
   EXPECT_EQ(std::count(entries.begin(), entries.end(), "/tmp/b"), 1);

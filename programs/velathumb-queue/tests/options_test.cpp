@@ -108,7 +108,7 @@ TEST_F(OptionsTest, EntriesAreAddedForTheRunnerThatRuns) {
 
 TEST_F(OptionsTest, AnEntryWithANewlineIsRefused) {
   EXPECT_THAT(Refusal(QueueArguments(kProfiles, {"--add", "/tmp/a\n/tmp/b"})),
-              HasSubstr("cannot add /tmp/a\\x0a/tmp/b: an entry cannot hold a newline\n"));
+              HasSubstr("cannot add /tmp/a\\n/tmp/b: an entry cannot contain a newline\n"));
 }
 
 TEST_F(OptionsTest, AnEntryIsAddedWithItsWholePath) {
@@ -139,7 +139,7 @@ TEST_F(OptionsTest, ATreeThatVelathumbWouldLeaveOutIsRefused) {
   EXPECT_THAT(Refusal(velathumb.Arguments({"--add", "R:/tmp/a:b"})), HasSubstr("colon"));
   RemoveTree(kQueueFile);
   EXPECT_THAT(Refusal(velathumb.Arguments({"--add", "R:/tmp/@eaDir/"})),
-              HasSubstr("velathumb leaves out a tree of this name\n"));
+              HasSubstr("velathumb skips a tree of this name\n"));
   EXPECT_EQ(velathumb.Run({"--add", "/tmp/a:b"}).exitCode, 0);
   EXPECT_THAT(velathumb.Entries(), ElementsAre("/tmp/a", "/tmp/a:b"));
 }
@@ -152,19 +152,19 @@ TEST_F(OptionsTest, WithAnEntryThatIsRefusedNoneIsAdded) {
 TEST_F(OptionsTest, AProfileThatCannotBeReadAsOneLeavesTheQueue) {
   WriteFile(kProfiles, "[thumb_s\nsize=120\n");
   EXPECT_EQ(Refusal(QueueArguments(kProfiles)),
-            "velathumb-queue: no profile, or none with a thumbnail to make: /tmp/profiles.conf\n");
+            "velathumb-queue: no profile file, or no thumbnail in it: /tmp/profiles.conf\n");
 }
 
 TEST_F(OptionsTest, AProfileWithoutAnyThumbnailLeavesTheQueue) {
   WriteFile(kProfiles, "; nothing\n");
   EXPECT_EQ(Refusal(QueueArguments(kProfiles)),
-            "velathumb-queue: no profile, or none with a thumbnail to make: /tmp/profiles.conf\n");
+            "velathumb-queue: no profile file, or no thumbnail in it: /tmp/profiles.conf\n");
 }
 
 TEST_F(OptionsTest, ADirectoryForAProfileLeavesTheQueue) {
   MakeDirectories("/tmp/directory");
   EXPECT_EQ(Refusal(QueueArguments("/tmp/directory")),
-            "velathumb-queue: no profile, or none with a thumbnail to make: /tmp/directory\n");
+            "velathumb-queue: no profile file, or no thumbnail in it: /tmp/directory\n");
 }
 
 TEST_F(OptionsTest, AFifoInTheQueuesPlaceIsAnError) {
@@ -219,7 +219,7 @@ TEST_F(OptionsTest, ControlCharactersOfAnEntryAreWrittenOut) {
   Enqueue({"/tmp/\x1b[2J\r"});
   EXPECT_EQ(velathumb.Run().err,
             "velathumb-queue: took 1 entry\n"
-            "velathumb-queue: velathumb was ended, trying again: /tmp/\\x1b[2J\\x0d\n");
+            "velathumb-queue: velathumb did not complete, trying again: /tmp/\\x1b[2J\\x0d\n");
 }
 
 }  // namespace

@@ -62,7 +62,7 @@ TEST_F(PauseTest, NothingIsStartedBeforeTheResumeTime) {
   Enqueue({"/tmp/a"});
   Program runner = velathumb_.Start();
   ExpectNoStart();
-  EXPECT_THAT(runner.Error(), HasSubstr("waiting: conversion is held back by its resume time\n"));
+  EXPECT_THAT(runner.Error(), HasSubstr("conversion is paused: the resume time is not reached\n"));
   ASSERT_TRUE(velathumb_.WaitForStarts(1));
   EXPECT_GE(time(nullptr), resume);
   ExpectEnd(runner, 0);

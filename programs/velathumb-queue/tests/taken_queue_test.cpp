@@ -222,20 +222,20 @@ TEST_F(TakenQueueTest, WhatIsDoneStaysWhileSomebodyHoldsIt) {
 TEST_F(TakenQueueTest, WhatIsLeftForLaterIsDoneForNowAndComesBack) {
   AppendToQueue({"/a", "/b", "/c"});
   ASSERT_EQ(taken_.Take(), Outcome::kTaken);
-  EXPECT_EQ(taken_.Leave("/c"), 0);
-  EXPECT_EQ(taken_.Leave("/a"), 0);
+  EXPECT_EQ(taken_.Defer("/c"), 0);
+  EXPECT_EQ(taken_.Defer("/a"), 0);
   EXPECT_EQ(ReadFile(kLaterFile), "/c\n/a\n");
   EXPECT_EQ(taken_.Take(), Outcome::kResumed);
   EXPECT_THAT(taken_.Entries(), ElementsAre("/b"));
   EXPECT_EQ(taken_.Finish(), 0);
-  EXPECT_EQ(taken_.PutBackLeft(), 0);
+  EXPECT_EQ(taken_.RequeueDeferred(), 0);
   EXPECT_FALSE(Exists(kLaterFile));
   EXPECT_EQ(taken_.Take(), Outcome::kTaken);
   EXPECT_THAT(taken_.Entries(), ElementsAre("/c", "/a"));
 }
 
 TEST_F(TakenQueueTest, WithNothingLeftForLaterNothingIsPutBack) {
-  EXPECT_EQ(taken_.PutBackLeft(), 0);
+  EXPECT_EQ(taken_.RequeueDeferred(), 0);
   EXPECT_THAT(ListDirectory("/var/spool"), IsEmpty());
 }
 
@@ -243,14 +243,14 @@ TEST_F(TakenQueueTest, AnEntryThatCannotBeKeptIsNotDone) {
   AppendToQueue({"/a"});
   ASSERT_EQ(taken_.Take(), Outcome::kTaken);
   MakeDirectories(kLaterFile);
-  EXPECT_EQ(taken_.Leave("/a"), EISDIR);
+  EXPECT_EQ(taken_.Defer("/a"), EISDIR);
   EXPECT_FALSE(Exists(kJournalFile));
 }
 
 TEST_F(TakenQueueTest, WhatCannotBePutBackIsKept) {
   WriteFile(kLaterFile, "/a\n");
   MakeDirectories(kQueueFile);
-  EXPECT_NE(taken_.PutBackLeft(), 0);
+  EXPECT_NE(taken_.RequeueDeferred(), 0);
   EXPECT_EQ(ReadFile(kLaterFile), "/a\n");
 }
 

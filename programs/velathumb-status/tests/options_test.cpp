@@ -145,7 +145,7 @@ TEST_F(CommandLine, SeveralQuestionsAreAllAnswered) {
   EXPECT_EQ(result.exitCode, 1);
   EXPECT_THAT(result.out,
               AllOf(HasSubstr(kTop), HasSubstr("/tmp/film.mp4"), HasSubstr("total_photo: 0"),
-                    HasSubstr("conversion is not held back")));
+                    HasSubstr("conversion is not paused")));
 }
 
 TEST_F(CommandLine, WorkOfOneQuestionIsEnoughAndAnErrorGoesBeforeIt) {

@@ -63,7 +63,7 @@ TEST_F(PageOption, WhatIsNoFileIsRefused) {
   ASSERT_EQ(mkfifo(kPage, 0666), 0);
   ASSERT_EQ(symlink("/dev/null", "/tmp/page/link"), 0);
   for (const std::string page : {"/dev/null", kPage, "/tmp/page/link"}) {
-    ExpectRefused(page, "is no regular file");
+    ExpectRefused(page, "is not a regular file");
   }
   ExpectRefused("/tmp/page", "Is a directory");
   ExpectRefused("/tmp/none/page.html", "No such file or directory");

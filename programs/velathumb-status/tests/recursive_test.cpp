@@ -176,7 +176,7 @@ TEST_F(TreeAnswer, ARootThatIsLeftOutForItsNameIsAnError) {
   const ProgramResult result = RunStatus({"-r", "/tmp/@eaDir", kTop});
   EXPECT_EQ(result.exitCode, 2);
   EXPECT_EQ(result.err,
-            "velathumb-status: /tmp/@eaDir: is left out of a tree because of its name\n");
+            "velathumb-status: /tmp/@eaDir: is skipped in trees because of its name\n");
   EXPECT_THAT(ReadStatusText(result.out).Names(), ElementsAre(kTop));
 }
 
@@ -219,7 +219,7 @@ TEST_F(TreeAnswer, AWalkThatEndsEarlyIsAnError) {
   options.beforeExec = {LimitResource(RLIMIT_NOFILE, 20)};
   const ProgramResult result = RunStatus({"-r", kTop}, options);
   EXPECT_EQ(result.exitCode, 2);
-  EXPECT_THAT(result.err, HasSubstr("velathumb-status: /tmp/photos: not all of it was looked at: "
+  EXPECT_THAT(result.err, HasSubstr("velathumb-status: /tmp/photos: was not scanned completely: "
                                     "Too many open files\n"));
   EXPECT_EQ(ReadStatusText(result.out).Names().front(), kTop);
 }

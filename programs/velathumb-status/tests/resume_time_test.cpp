@@ -39,13 +39,13 @@ TEST_F(ResumeAnswer, SaysWhenNothingHoldsBack) {
     Store(time);
     const ProgramResult result = RunStatus({"--resume-time"});
     EXPECT_EQ(result.exitCode, 0);
-    EXPECT_EQ(result.out, "conversion is not held back\n");
+    EXPECT_EQ(result.out, "conversion is not paused\n");
   }
 }
 
 TEST_F(ResumeAnswer, TellsTheTimeInTheUsersZone) {
   Store(4102444800);  // 2100-01-01 00:00:00 UTC
-  EXPECT_THAT(AskIn("UTC0").out, MatchesRegex("conversion is held back until "
+  EXPECT_THAT(AskIn("UTC0").out, MatchesRegex("conversion is paused until "
                                               "2100-01-01 00:00:00 \\+0000, for [0-9]+ s\n"));
   EXPECT_THAT(AskIn("XYZ-2").out, HasSubstr("until 2100-01-01 02:00:00 +0200, for "));
 }
@@ -59,7 +59,7 @@ TEST_F(ResumeAnswer, IsNoWork) {
 TEST_F(ResumeAnswer, SaysThatThereIsNoEnd) {
   Store(-1);
   EXPECT_EQ(RunStatus({"--resume-time"}).out,
-            "conversion is held back without an end (resume time -1)\n");
+            "conversion is paused indefinitely (resume time -1)\n");
 }
 
 TEST_F(ResumeAnswer, JsonHasTheDocumentedMembers) {
@@ -95,7 +95,7 @@ TEST_F(ResumeAnswer, JsonOfANegativeTimeIsNotReached) {
 TEST_F(ResumeAnswer, WithoutSettingsNothingHoldsBack) {
   const ProgramResult result = RunStatus({"--resume-time"});
   EXPECT_EQ(result.exitCode, 0);
-  EXPECT_EQ(result.out, "conversion is not held back\n");
+  EXPECT_EQ(result.out, "conversion is not paused\n");
   EXPECT_EQ(AskForJson({"--resume-time"})["resume"]["reached"], Json::Value(true));
   EXPECT_THAT(ErrorLines(), IsEmpty());
 }

@@ -1,0 +1,49 @@
+#include "posix/service_log.h"
+
+#include <errno.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <cstdlib>
+#include <cstring>
+#include <string>
+
+#include "posix/escaped_text.h"
+#include "posix/file_content.h"
+
+namespace vela {
+
+namespace {
+
+/// The variable alone proves nothing: it is inherited by programs whose standard error was
+/// redirected.
+bool LeadsToJournal() {
+  const char* stream = std::getenv("JOURNAL_STREAM");
+  struct stat status;
+  if (stream == nullptr || fstat(STDERR_FILENO, &status) != 0) return false;
+  return stream == std::to_string(status.st_dev) + ':' + std::to_string(status.st_ino);
+}
+
+std::string Prefix(LogLevel level) {
+  if (IsLogInJournal()) return '<' + std::to_string(static_cast<int>(level)) + '>';
+  return std::string(program_invocation_short_name) + ": ";
+}
+
+}  // namespace
+
+bool IsLogInJournal() {
+  static const bool isInJournal = LeadsToJournal();
+  return isInJournal;
+}
+
+void WriteLog(LogLevel level, std::string_view message) {
+  const std::string line = Prefix(level) + EscapeControls(message, InvalidBytes::kEscape) + '\n';
+  // Usually a single write, so that lines of several threads and processes do not mix.
+  WriteAll(STDERR_FILENO, line);
+}
+
+void WriteLog(LogLevel level, std::string_view message, int error) {
+  WriteLog(level, std::string(message) + ": " + std::strerror(error));
+}
+
+}  // namespace vela
