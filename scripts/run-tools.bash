@@ -1,0 +1,122 @@
+# Functions of scripts/run: build velathumb, put the tools it drives in place, draw sample photos.
+# shellcheck shell=bash
+
+ROOT=$(cd "$(dirname "${BASH_SOURCE[0]}")/.." && pwd)
+readonly ROOT
+readonly BUILD=$ROOT/build/run
+readonly TOOLS=/usr/vela/bin
+readonly CONVERTER=${VELA_CONVERTER:-own}
+readonly OWN_CONVERTER=$BUILD/programs/convert-thumb/convert-thumb
+readonly CONVERTER_FRONT=$ROOT/programs/convert-thumb/convert-thumb.sh
+readonly CONVERTER_LINK=/usr/vela/lib/convert-thumb
+
+say() { printf '==> %s\n' "$*"; }
+
+fail() {
+  printf 'run: %s\n' "$*" >&2
+  exit 1
+}
+
+build() {
+  say "Building velathumb in build/run"
+  cd "$ROOT" || return
+  cmake --preset release -B "$BUILD" --log-level=WARNING \
+    -DVELA_BUILD_TESTS=OFF -DVELA_BUILD_BENCH=OFF >/dev/null
+  cmake --build "$BUILD"
+}
+
+# ImageMagick's own program, not whatever else is called convert on this machine.
+imagemagick_convert() {
+  local candidate
+  for candidate in /usr/bin/convert-im6.q16 /usr/bin/convert; do
+    if [[ -x $candidate ]]; then
+      echo "$candidate"
+      return
+    fi
+  done
+  fail "ImageMagick's convert is not in /usr/bin"
+}
+
+link_tool() { # LINK TARGET
+  local tool=$1 target=$2
+  if [[ -f $tool && -x $tool ]]; then
+    return
+  fi
+  say "Linking $tool to $target"
+  local purpose="link $tool to $target"
+  "$ROOT/scripts/as-root" "$purpose" mkdir -p "${tool%/*}"
+  "$ROOT/scripts/as-root" "$purpose" ln -sfn "$target" "$tool"
+}
+
+# The converter that is to be installed.
+chosen_converter() {
+  case $CONVERTER in
+    own) echo "$OWN_CONVERTER" ;;
+    imagemagick) echo "$CONVERTER_FRONT" ;;
+    *) fail "VELA_CONVERTER is own or imagemagick, not '$CONVERTER'" ;;
+  esac
+}
+
+# Returns 0 if a file is a converter of this project, of whatever version: both the script and the
+# program refer to the link to ImageMagick's convert.
+is_our_converter() { # FILE
+  grep -qaF "$CONVERTER_LINK" "$1"
+}
+
+# Another converter that someone has put there stays; an older one of ours is replaced.
+place_converter() {
+  local tool=$TOOLS/convert-thumb converter
+  converter=$(chosen_converter)
+  if cmp -s "$converter" "$tool"; then
+    return
+  fi
+  if [[ -e $tool && ! -L $tool ]] && ! is_our_converter "$tool"; then
+    say "Leaving $tool as it is: not a converter of this project"
+    return
+  fi
+  say "Installing $tool"
+  local purpose="install $tool"
+  "$ROOT/scripts/as-root" "$purpose" mkdir -p "$TOOLS"
+  "$ROOT/scripts/as-root" "$purpose" install -m 0755 "$converter" "$tool"
+}
+
+place_tools() {
+  local convert
+  convert=$(imagemagick_convert)
+  link_tool "$CONVERTER_LINK" "$convert"
+  place_converter
+  link_tool "$TOOLS/exiftool" /usr/bin/exiftool
+}
+
+draw() { # SIZE COLOURS OPTION... OUTPUT
+  local size=$1 colours=$2 convert
+  shift 2
+  convert=$(imagemagick_convert)
+  "$convert" -size "$size" "gradient:$colours" \
+    -fill white -draw 'circle 700,500 700,300' -draw 'rectangle 60,60 500,160' "$@"
+}
+
+draw_samples() { # DIRECTORY
+  local dir=$1
+  mkdir -p "$dir/second folder"
+  draw 3000x2000 skyblue-seagreen -quality 90 "$dir/landscape.jpg"
+  draw 2000x3000 gold-firebrick -quality 90 "$dir/portrait.jpg"
+  draw 3000x2000 plum-navy -quality 90 "$dir/turned by its EXIF tag.jpg"
+  "$TOOLS/exiftool" -q -overwrite_original -n -Orientation=6 "$dir/turned by its EXIF tag.jpg"
+  draw 1600x1200 white-black -alpha set -channel A -evaluate multiply 0.5 \
+    "$dir/second folder/transparent.png"
+  draw 1400x1050 orange-purple '(' +clone -negate ')' "$dir/second folder/animated.gif"
+  draw 2400x1600 khaki-teal -compress lzw "$dir/second folder/scan.tif"
+  head -c 300 "$dir/landscape.jpg" >"$dir/damaged.jpg"
+}
+
+make_samples() { # DIRECTORY
+  if [[ -d $1 ]]; then
+    say "Taking the sample photos in ${1#"$ROOT/"}"
+    return
+  fi
+  say "Making sample photos in ${1#"$ROOT/"}"
+  rm -rf "$1.part"
+  draw_samples "$1.part"
+  mv "$1.part" "$1"
+}
