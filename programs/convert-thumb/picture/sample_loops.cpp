@@ -229,6 +229,8 @@ VECTOR_CLONES void WidenRow(const uint16_t* row, float* out, size_t size) {
 
 VECTOR_CLONES void RoundRow(const float* row, uint8_t* out, size_t size) {
   for (size_t i = 0; i < size; ++i) {
+    // Samples are not negative, and std::lround would keep the loop from being vectorized.
+    // NOLINTNEXTLINE(bugprone-incorrect-roundings)
     out[i] = static_cast<uint8_t>(static_cast<int>(row[i] * (1.0F / kJpegStep) + 0.5F));
   }
 }

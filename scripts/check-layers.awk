@@ -1,0 +1,115 @@
+# Reads tables (see scripts/check-layers) and then sources; prints the faults of their includes.
+
+# The part of the tree that has an order of its own: src or programs/NAME.
+function part_of(path) {
+  return match(path, /^programs\/[^\/]*/) ? substr(path, 1, RLENGTH) : "src"
+}
+
+# A file with a place of its own counts as a folder.
+function folder_of(file) {
+  if (!(file in placed)) sub(/\/[^\/]*$/, "", file)
+  return file
+}
+
+function without_dots(path) {
+  while (match(path, /[^\/]+\/\.\.\//)) {
+    path = substr(path, 1, RSTART - 1) substr(path, RSTART + RLENGTH)
+  }
+  return path
+}
+
+# The file that a quoted include names: beside the including one, below src/ or below the program.
+function find_target(file, name, folder) {
+  folder = file
+  sub(/[^\/]*$/, "", folder)
+  if (without_dots(folder name) in files) return without_dots(folder name)
+  if (without_dots("src/" name) in files) return without_dots("src/" name)
+  if (without_dots(part_of(file) "/" name) in files) return without_dots(part_of(file) "/" name)
+  return ""
+}
+
+function fault(message) {
+  printf "%s:%d: %s\n", FILENAME, FNR, message
+}
+
+function is_below(upper, lower, order) {
+  for (order = 1; order <= orders; ++order) {
+    if (level[order, upper] && level[order, upper] < level[order, lower]) return 1
+  }
+  return 0
+}
+
+function may_include(from, to) {
+  if (from == to) return 1
+  if (part_of(from) != part_of(to)) {
+    return part_of(to) == "src" && (!(to in closed) || closed[to] == part_of(from))
+  }
+  return !(part_of(from) in ordered) || is_below(from, to)
+}
+
+function check_folder(folder) {
+  if (!(part_of(folder) in ordered) || folder in placed) return
+  fault(folder " has no place in the order of the layers")
+  placed[folder]
+}
+
+function check_own(name, target, from, to) {
+  target = find_target(FILENAME, name)
+  if (target == "") {
+    fault("includes \"" name "\", which is neither in src/ nor in the program")
+    return
+  }
+  from = folder_of(FILENAME)
+  to = folder_of(target)
+  if (!may_include(from, to)) fault("includes " target ": " from " may not include " to)
+  if (target == FILENAME) fault("includes itself")
+  print FILENAME, target, FILENAME ":" FNR >file_graph
+  if (from != to) print from, to, FILENAME ":" FNR >folder_graph
+}
+
+function check_system(name, folder) {
+  if (name !~ system_headers) return
+  system_files += !(FILENAME in uses_system)
+  uses_system[FILENAME]
+  for (folder in system_folders) if (index(FILENAME, folder "/") == 1) return
+  if (FILENAME in reason) needed[FILENAME]
+  else fault("includes <" name ">: neither in a folder that wraps the system nor on the allow-list")
+}
+
+BEGIN {
+  printf "" >file_graph
+  printf "" >folder_graph
+}
+
+input == "order" {
+  ++orders
+  current = 1
+  part = substr($1, 1, length($1) - 1)
+  ordered[part]
+  for (i = 2; i <= NF; ++i) {
+    if ($i == ">") ++current
+    else if ($i !~ /^[{}]$/) {
+      level[orders, part "/" $i] = current
+      placed[part "/" $i]
+    }
+  }
+  next
+}
+input == "closed" { closed[$1] = $2; next }
+input == "system" { system_folders[$1]; next }
+input == "allowed" && NF > 0 { file = $1; $1 = ""; reason[file] = $0; next }
+input == "files" { files[$1]; ++file_count; next }
+
+FNR == 1 { check_folder(folder_of(FILENAME)) }
+match($0, /^[ \t]*#[ \t]*include[ \t]*"[^"]*"/) { split($0, words, "\""); check_own(words[2]) }
+match($0, /^[ \t]*#[ \t]*include[ \t]*<[^>]*>/) { split($0, words, /[<>]/); check_system(words[2]) }
+
+END {
+  for (file in reason) {
+    if (!(file in needed)) printf "%s:1: is on the allow-list, which it does not need\n", file
+    else if (reason[file] == "") printf "%s:1: is on the allow-list without a reason\n", file
+  }
+  printf "%d of %d product files (%.1f %%) include POSIX or Linux headers; allowed are %d %%\n",
+    system_files, file_count, 100 * system_files / file_count, max_percent >share
+  exit 100 * system_files > max_percent * file_count
+}
