@@ -1,21 +1,42 @@
-// What came of a request.
+// What a request is answered with.
 #pragma once
 
+#include <cstdint>
 #include <string>
 
 namespace vela {
 
+struct IndexResult;
+struct MediaRecord;
+
 enum class Outcome {
-  kDone,     ///< carried out
-  kRefused,  ///< the request was wrong
+  kDone,     ///< succeeded
+  kRefused,  ///< the request was invalid or not permitted
   kFailed,   ///< the media file could not be read
-  kFault,    ///< the daemon's own fault or the index's; the operator is to know
+  kFault,    ///< the daemon or the index failed; the operator should know
 };
 
 struct Answer {
-  std::string line;  ///< the reply; empty when there was no memory for it
+  std::string line;  ///< the reply; empty when memory ran out
   Outcome outcome = Outcome::kFault;
-  std::string error;  ///< for the log, empty when there is nothing to tell
+  std::string error;  ///< for the log, empty when there is none
 };
+
+// Replies as they are sent over the socket: one line of JSON each, including the newline. All of
+// these functions throw only std::bad_alloc.
+
+/// The reply when there is not enough memory for any other.
+constexpr char kLastResortReply[] = "{\"error\":\"out of memory\",\"success\":false}\n";
+
+std::string FailureReply(const std::string& error);
+std::string SuccessReply();
+std::string VersionReply(int32_t version);
+std::string ResultReply(bool result);
+
+/// The reply contains `path` byte for byte, valid UTF-8 or not.
+std::string MediaReply(const std::string& path, const MediaRecord& record);
+
+/// Returns a plain success, or a fault of the index.
+Answer IndexAnswer(const IndexResult& result);
 
 }  // namespace vela

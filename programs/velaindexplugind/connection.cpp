@@ -1,11 +1,10 @@
 #include "connection.h"
 
-#include <sys/socket.h>
-
 #include <array>
 #include <cerrno>
 #include <utility>
 
+#include "posix/local_socket.h"
 #include "request.h"
 
 namespace vela {
@@ -14,23 +13,24 @@ namespace {
 
 constexpr size_t kChunkSize = 16384;
 
-/// How often a client may be slow by its limit in one request or reply.
-constexpr int kSlowness = 4;
+/// How many times its idle limit a client may take for one request or reply.
+constexpr int kSlowClientFactor = 4;
 
-/// How much of a request that is too long is taken off the client.
+/// How much of an overlong request is received and discarded.
 constexpr size_t kDrainMax = 16 * 1024 * 1024;
 
 using Chunk = std::array<char, kChunkSize>;
 
-/// Returns the bytes received, 0 at the end of the connection or after a failure, -1 when there is
-/// nothing yet.
-ssize_t ReceiveChunk(int fd, Chunk& chunk) {
-  for (;;) {
-    const ssize_t got = recv(fd, chunk.data(), chunk.size(), MSG_DONTWAIT);
-    if (got >= 0) return got;
-    if (errno == EAGAIN) return -1;
-    if (errno != EINTR) return 0;
+/// Returns false when nothing has arrived. `piece` is what has, empty at the end of the connection
+/// or after a failure; it points into `chunk`.
+bool ReceivePiece(int fd, Chunk& chunk, std::string_view& piece) {
+  size_t got = 0;
+  const int error = ReceiveNow(fd, chunk.data(), chunk.size(), got);
+  if (error == EAGAIN) {
+    return false;
   }
+  piece = {chunk.data(), error == 0 ? got : 0};
+  return true;
 }
 
 }  // namespace
@@ -41,15 +41,22 @@ Connection::Connection(FileDescriptor socket, Clock::time_point now)
 Connection::Received Connection::Receive(Clock::time_point now) {
   Chunk chunk;
   for (;;) {
-    const ssize_t got = ReceiveChunk(Fd(), chunk);
-    if (got < 0) return Received::kMore;
-    if (got == 0) return line_.empty() ? Received::kEnd : Received::kLine;
+    std::string_view piece;
+    if (!ReceivePiece(Fd(), chunk, piece)) {
+      return Received::kMore;
+    }
+    if (piece.empty()) {
+      return line_.empty() ? Received::kEnd : Received::kLine;
+    }
     lastBytes_ = now;
-    const std::string_view piece(chunk.data(), static_cast<size_t>(got));
     const size_t newline = piece.find('\n');
     line_.append(piece.substr(0, newline));
-    if (line_.size() > kRequestMax) return Received::kTooLong;
-    if (newline != std::string_view::npos) return Received::kLine;
+    if (line_.size() > kRequestMax) {
+      return Received::kTooLong;
+    }
+    if (newline != std::string_view::npos) {
+      return Received::kLine;
+    }
   }
 }
 
@@ -63,19 +70,21 @@ void Connection::BeginReply(std::string reply, bool drains, Clock::time_point no
 
 Connection::Sent Connection::Send(Clock::time_point now) {
   while (sent_ < reply_.size()) {
-    const ssize_t count =
-        send(Fd(), reply_.data() + sent_, reply_.size() - sent_, MSG_NOSIGNAL | MSG_DONTWAIT);
-    if (count >= 0) {
-      sent_ += static_cast<size_t>(count);
-      lastBytes_ = now;
-    } else if (errno == EAGAIN) {
+    size_t count = 0;
+    const int error = SendNow(Fd(), std::string_view(reply_).substr(sent_), count);
+    if (error == EAGAIN) {
       return Sent::kMore;
-    } else if (errno != EINTR) {
+    }
+    if (error != 0) {
       return Sent::kEnd;
     }
+    sent_ += count;
+    lastBytes_ = now;
   }
-  if (!drains_) return Sent::kAll;
-  shutdown(Fd(), SHUT_WR);
+  if (!drains_) {
+    return Sent::kAll;
+  }
+  EndSending(Fd());
   state_ = State::kDraining;
   stateBegin_ = now;
   return Sent::kMore;
@@ -84,17 +93,25 @@ Connection::Sent Connection::Send(Clock::time_point now) {
 bool Connection::Drain() {
   Chunk chunk;
   for (;;) {
-    const ssize_t got = ReceiveChunk(Fd(), chunk);
-    if (got < 0) return true;
-    drained_ += static_cast<size_t>(got);
-    if (got == 0 || drained_ > kDrainMax) return false;
+    std::string_view piece;
+    if (!ReceivePiece(Fd(), chunk, piece)) {
+      return true;
+    }
+    drained_ += piece.size();
+    if (piece.empty() || drained_ > kDrainMax) {
+      return false;
+    }
   }
 }
 
 bool Connection::IsOverdue(Clock::time_point now, Clock::duration limit) const {
-  if (state_ == State::kWorking) return false;
-  if (state_ == State::kDraining) return now - stateBegin_ >= limit;
-  return now - lastBytes_ >= limit || now - stateBegin_ >= limit * kSlowness;
+  if (state_ == State::kWorking) {
+    return false;
+  }
+  if (state_ == State::kDraining) {
+    return now - stateBegin_ >= limit;
+  }
+  return now - lastBytes_ >= limit || now - stateBegin_ >= limit * kSlowClientFactor;
 }
 
 }  // namespace vela

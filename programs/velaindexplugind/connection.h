@@ -9,29 +9,29 @@
 
 namespace vela {
 
-/// A connection whose socket never blocks. Knows nothing of when it is called.
+/// A connection with a non-blocking socket. The caller decides when to call its functions.
 class Connection {
  public:
   using Clock = std::chrono::steady_clock;
 
   enum class State {
-    kReceiving,  ///< the request is not yet whole
-    kWorking,    ///< the request is being carried out
-    kSending,    ///< the reply is on its way
-    kDraining,   ///< the reply is sent, the client is still writing
+    kReceiving,  ///< the request is incomplete
+    kWorking,    ///< the request is in progress
+    kSending,    ///< the reply is being sent
+    kDraining,   ///< the reply is sent, the client is still sending
   };
 
   enum class Received {
-    kMore,     ///< the line is not yet whole
-    kLine,     ///< Line() is there
+    kMore,     ///< the line is incomplete
+    kLine,     ///< Line() is complete
     kTooLong,  ///< the line is longer than a request may be
-    kEnd,      ///< the client has gone without a request, or the socket has failed
+    kEnd,      ///< the client has disconnected without a request, or the socket has failed
   };
 
   enum class Sent {
-    kMore,  ///< the client must take some of it first
+    kMore,  ///< the client must receive some of it first
     kAll,
-    kEnd,  ///< the client has gone
+    kEnd,  ///< the client has disconnected
   };
 
   Connection(FileDescriptor socket, Clock::time_point now);
@@ -39,8 +39,8 @@ class Connection {
   int Fd() const { return socket_.Get(); }
   State GetState() const { return state_; }
 
-  /// Receives what is there. What a client leaves without a newline when it closes its side counts
-  /// as a line.
+  /// Receives what has arrived. A last line does not need a newline when the client closes its side
+  /// of the connection.
   Received Receive(Clock::time_point now);
 
   /// The request line without its newline.
@@ -48,19 +48,20 @@ class Connection {
 
   void BeginWork() { state_ = State::kWorking; }
 
-  /// Takes the reply that Send sends. With `drains`, the client is still writing its request: its
-  /// bytes are thrown away afterwards, so that the reply reaches it.
+  /// Sets the reply for Send. With `drains`, the client is still sending its request: the rest is
+  /// received and discarded after the reply, because closing the connection at once would destroy
+  /// the reply.
   void BeginReply(std::string reply, bool drains, Clock::time_point now);
 
-  /// Sends as much as the client takes.
+  /// Sends as much of the reply as possible without waiting.
   Sent Send(Clock::time_point now);
 
-  /// Throws away what is there, after Send. Returns false when the client has gone or has been
-  /// writing for too long.
+  /// Discards what has arrived, after Send. Returns false when the client has disconnected or has
+  /// sent too much.
   bool Drain();
 
-  /// Returns whether the client has kept still for `limit`, or has kept the daemon busy with one
-  /// request line or reply for several times that. Never while its request is carried out.
+  /// Returns whether the client has been idle for `limit`, or has taken several times as long for
+  /// one request line or reply. Returns false while its request is in progress.
   bool IsOverdue(Clock::time_point now, Clock::duration limit) const;
 
  private:

@@ -1,4 +1,4 @@
-// Owners of the event loop and of what it waits for.
+// Owners of the event loop and of its event sources.
 #pragma once
 
 #include <systemd/sd-event.h>
@@ -15,7 +15,8 @@ using EventLoop = std::unique_ptr<sd_event, EventLoopCloser>;
 struct EventSourceCloser {
   void operator()(sd_event_source* source) const { sd_event_source_disable_unref(source); }
 };
-/// Something the loop waits for, until the object ends; its descriptor must live longer.
+/// An event that the loop waits for during the lifetime of the object; its descriptor must live
+/// longer.
 using EventSource = std::unique_ptr<sd_event_source, EventSourceCloser>;
 
 }  // namespace vela

@@ -1,20 +1,51 @@
 #include "index_connection.h"
 
-#include <thread>
-
-#include "index_tables.h"
+#include <utility>
 
 namespace vela {
 
 namespace {
 
-/// How long the opening waits for another program's transaction.
-constexpr std::chrono::milliseconds kOpenPatience(5000);
+/// How long opening waits for the transactions of other programs.
+constexpr std::chrono::milliseconds kOpenTimeout(5000);
 
-/// Not among the codes that the library gives.
-constexpr int kNewerTables = -1;
+/// Version of the tables below. It is kept in a table, because user_version belongs to the programs
+/// that register conversions in the same database.
+constexpr int kTablesVersion = 1;
 
-/// Gives a statement its values, and takes them back at the end: texts are not copied.
+/// Paths are byte strings, sizes pixels and bytes, times seconds since the epoch. In `media`,
+/// `read_at` is when the record was read; in `posted`, `kind` is 1 for photos and 2 for videos.
+constexpr char kCreateTables[] =
+    "CREATE TABLE IF NOT EXISTS velaindexplugind_schema ("
+    " id INTEGER PRIMARY KEY CHECK (id = 1),"
+    " version INTEGER NOT NULL"
+    ");"
+    "CREATE TABLE IF NOT EXISTS media ("
+    " path BLOB NOT NULL PRIMARY KEY,"
+    " type INTEGER NOT NULL,"
+    " width INTEGER NOT NULL,"
+    " height INTEGER NOT NULL,"
+    " rotation INTEGER NOT NULL,"
+    " duration INTEGER NOT NULL,"
+    " bitrate INTEGER NOT NULL,"
+    " size INTEGER NOT NULL,"
+    " mtime INTEGER NOT NULL,"
+    " mtime_nanoseconds INTEGER NOT NULL,"
+    " read_at INTEGER NOT NULL"
+    ") WITHOUT ROWID;"
+    "CREATE TABLE IF NOT EXISTS posted ("
+    " path BLOB NOT NULL,"
+    " kind INTEGER NOT NULL,"
+    " posted_at INTEGER NOT NULL,"
+    " PRIMARY KEY (path, kind)"
+    ") WITHOUT ROWID;"
+    "CREATE TABLE IF NOT EXISTS directory_index_version ("
+    " path BLOB NOT NULL PRIMARY KEY,"
+    " version INTEGER NOT NULL"
+    ") WITHOUT ROWID;"
+    "INSERT OR REPLACE INTO velaindexplugind_schema VALUES (1, 1);";
+
+/// Binds values to a statement and removes them at the end: texts are not copied.
 class Bindings {
  public:
   explicit Bindings(sqlite3_stmt* statement) : statement_(statement) {}
@@ -26,11 +57,11 @@ class Bindings {
   Bindings& operator=(const Bindings&) = delete;
 
   Bindings& Add(std::string_view bytes) {
-    Note(sqlite3_bind_blob64(statement_, ++column_, bytes.data(), bytes.size(), SQLITE_STATIC));
+    Keep(sqlite3_bind_blob64(statement_, ++column_, bytes.data(), bytes.size(), SQLITE_STATIC));
     return *this;
   }
   Bindings& Add(int64_t number) {
-    Note(sqlite3_bind_int64(statement_, ++column_, number));
+    Keep(sqlite3_bind_int64(statement_, ++column_, number));
     return *this;
   }
 
@@ -38,8 +69,10 @@ class Bindings {
   int Step() { return code_ == SQLITE_OK ? sqlite3_step(statement_) : code_; }
 
  private:
-  void Note(int code) {
-    if (code_ == SQLITE_OK) code_ = code;
+  void Keep(int code) {
+    if (code_ == SQLITE_OK) {
+      code_ = code;
+    }
   }
 
   sqlite3_stmt* statement_;
@@ -47,7 +80,7 @@ class Bindings {
   int code_ = SQLITE_OK;
 };
 
-/// Reads the columns of a row in their order.
+/// Reads the columns of a row from left to right.
 class Row {
  public:
   explicit Row(sqlite3_stmt* statement) : statement_(statement) {}
@@ -76,166 +109,108 @@ StoredMedia ReadMedia(sqlite3_stmt* statement) {
   return media;
 }
 
-/// SQLITE_OK for a statement that came to its end or gave a row.
+/// Returns SQLITE_OK for the step of a statement that ended or returned a row.
 int EndOf(int stepCode) {
   return stepCode == SQLITE_DONE || stepCode == SQLITE_ROW ? SQLITE_OK : stepCode;
 }
 
 }  // namespace
 
-IndexResult IndexConnection::Tell(int code) const {
-  if (code == SQLITE_OK) return {};
+IndexResult IndexConnection::ResultOf(int code) const {
+  if (code == SQLITE_OK) {
+    return {};
+  }
   if (code == kNewerTables) {
     return {code, "the tables in the index database are those of a newer velaindexplugind"};
   }
-  const bool isOwn = database_ != nullptr && sqlite3_extended_errcode(database_.get()) == code;
-  return {code, isOwn ? sqlite3_errmsg(database_.get()) : sqlite3_errstr(code)};
+  return {code, database_.ErrorText(code)};
 }
 
-int IndexConnection::Execute(const char* sql) {
-  return sqlite3_exec(database_.get(), sql, nullptr, nullptr, nullptr);
-}
-
-/// The library does not wait for other programs in all statements; this does.
-int IndexConnection::ExecuteOnceFree(const char* sql) {
-  constexpr std::chrono::milliseconds kPause(5);
-  const auto end = std::chrono::steady_clock::now() + kOpenPatience;
-  int code = Execute(sql);
-  while (IndexResult{code, {}}.IsBusy() && std::chrono::steady_clock::now() < end) {
-    std::this_thread::sleep_for(kPause);
-    code = Execute(sql);
-  }
-  return code;
-}
-
-int IndexConnection::Prepare(const char* sql, Statement& statement) {
-  sqlite3_stmt* prepared = nullptr;
-  const int code =
-      sqlite3_prepare_v3(database_.get(), sql, -1, SQLITE_PREPARE_PERSISTENT, &prepared, nullptr);
-  statement.reset(prepared);
-  return code;
-}
-
-int IndexConnection::OpenFile(const std::string& file) {
-  constexpr int kFlags = SQLITE_OPEN_READWRITE | SQLITE_OPEN_NOMUTEX;
-  sqlite3* database = nullptr;
-  const int code = sqlite3_open_v2(file.c_str(), &database, kFlags, nullptr);
-  database_.reset(database);
-  return code;
-}
-
-int IndexConnection::Configure() {
-  sqlite3_extended_result_codes(database_.get(), 1);
-  SetPatience(kOpenPatience);
-  // A checkpoint at the close would remove the log by its name, even if that belongs to a new
-  // database by then.
-  sqlite3_db_config(database_.get(), SQLITE_DBCONFIG_NO_CKPT_ON_CLOSE, 1, nullptr);
-  const int code = ExecuteOnceFree("PRAGMA journal_mode = WAL");
-  return code == SQLITE_OK ? Execute("PRAGMA synchronous = NORMAL") : code;
-}
-
-/// Version 0: there are no tables.
+/// Sets 0 when the database does not have the tables.
 int IndexConnection::ReadTablesVersion(int& version) {
   version = 0;
   Statement statement;
-  int code = Prepare("SELECT count(*) FROM sqlite_master WHERE name = 'velaindexplugind_schema'",
-                     statement);
-  if (code != SQLITE_OK) return code;
+  int code = database_.Prepare(
+      "SELECT count(*) FROM sqlite_master WHERE name = 'velaindexplugind_schema'", statement);
+  if (code != SQLITE_OK) {
+    return code;
+  }
   code = sqlite3_step(statement.get());
-  if (code != SQLITE_ROW || sqlite3_column_int(statement.get(), 0) == 0) return EndOf(code);
-  code = Prepare("SELECT version FROM velaindexplugind_schema", statement);
-  if (code != SQLITE_OK) return code;
+  if (code != SQLITE_ROW || sqlite3_column_int(statement.get(), 0) == 0) {
+    return EndOf(code);
+  }
+  code = database_.Prepare("SELECT version FROM velaindexplugind_schema", statement);
+  if (code != SQLITE_OK) {
+    return code;
+  }
   code = sqlite3_step(statement.get());
-  if (code == SQLITE_ROW) version = sqlite3_column_int(statement.get(), 0);
+  if (code == SQLITE_ROW) {
+    version = sqlite3_column_int(statement.get(), 0);
+  }
   return EndOf(code);
 }
 
-int IndexConnection::MakeTables() {
-  int code = ExecuteOnceFree("BEGIN IMMEDIATE");
-  if (code != SQLITE_OK) return code;
-  // Another process may have made them meanwhile, a newer one too.
-  int version = 0;
-  code = ReadTablesVersion(version);
-  if (code == SQLITE_OK && version > kTablesVersion) code = kNewerTables;
-  if (code == SQLITE_OK) code = Execute(kMakeTables);
-  if (code == SQLITE_OK) code = Execute("COMMIT");
-  if (code != SQLITE_OK) Execute("ROLLBACK");
-  return code;
-}
-
-int IndexConnection::EnsureTables() {
-  int version = 0;
-  const int code = ReadTablesVersion(version);
-  if (code != SQLITE_OK) return code;
-  if (version > kTablesVersion) return kNewerTables;
-  return version == kTablesVersion ? SQLITE_OK : MakeTables();
-}
-
 int IndexConnection::PrepareAll() {
-  int code = Prepare(
-      "SELECT type, width, height, rotation, duration, bitrate, size, mtime, mtime_nanoseconds,"
-      " read_at FROM media WHERE path = ?1",
-      findMedia_);
-  if (code == SQLITE_OK) {
-    code = Prepare(
-        "INSERT OR REPLACE INTO media (path, type, width, height, rotation, duration, bitrate,"
-        " size, mtime, mtime_nanoseconds, read_at)"
-        " VALUES (?1, ?2, ?3, ?4, ?5, ?6, ?7, ?8, ?9, ?10, ?11)",
-        storeMedia_);
+  const std::pair<const char*, Statement&> statements[] = {
+      {"SELECT type, width, height, rotation, duration, bitrate, size, mtime, mtime_nanoseconds,"
+       " read_at FROM media WHERE path = ?1",
+       findMedia_},
+      {"INSERT OR REPLACE INTO media (path, type, width, height, rotation, duration, bitrate,"
+       " size, mtime, mtime_nanoseconds, read_at)"
+       " VALUES (?1, ?2, ?3, ?4, ?5, ?6, ?7, ?8, ?9, ?10, ?11)",
+       storeMedia_},
+      {"DELETE FROM media WHERE path = ?1", removeMedia_},
+      {"INSERT OR REPLACE INTO posted (path, kind, posted_at) VALUES (?1, ?2, ?3)", storePosted_},
+      {"INSERT OR REPLACE INTO directory_index_version (path, version) VALUES (?1, ?2)",
+       storeVersion_},
+      {"DELETE FROM directory_index_version WHERE path = ?1", removeVersion_},
+      {"SELECT version FROM directory_index_version WHERE path = ?1", findVersion_}};
+  for (const auto& [sql, statement] : statements) {
+    const int code = database_.Prepare(sql, statement);
+    if (code != SQLITE_OK) {
+      return code;
+    }
   }
-  if (code == SQLITE_OK) code = Prepare("DELETE FROM media WHERE path = ?1", removeMedia_);
-  if (code == SQLITE_OK) {
-    code = Prepare("INSERT OR REPLACE INTO posted (path, kind, posted_at) VALUES (?1, ?2, ?3)",
-                   storePosted_);
-  }
-  if (code == SQLITE_OK) {
-    code = Prepare("INSERT OR REPLACE INTO directory_index_version (path, version) VALUES (?1, ?2)",
-                   storeVersion_);
-  }
-  if (code == SQLITE_OK) {
-    code = Prepare("DELETE FROM directory_index_version WHERE path = ?1", removeVersion_);
-  }
-  if (code == SQLITE_OK) {
-    code = Prepare("SELECT version FROM directory_index_version WHERE path = ?1", findVersion_);
-  }
-  return code;
+  return SQLITE_OK;
 }
 
 IndexResult IndexConnection::Open(const IndexFile& file) {
-  // The library would make it with a mode that depends on the process's mask.
-  MakeIndexFile(file);
-  int code = OpenFile(file.path);
-  if (code == SQLITE_OK) code = Configure();
-  if (code == SQLITE_OK) code = EnsureTables();
-  if (code == SQLITE_OK) code = PrepareAll();
-  return Tell(code);
-}
-
-bool IndexConnection::IsCurrent() const {
-  int hasMoved = 1;
-  const int code = sqlite3_file_control(database_.get(), "main", SQLITE_FCNTL_HAS_MOVED, &hasMoved);
-  return code == SQLITE_OK && hasMoved == 0;
-}
-
-void IndexConnection::SetPatience(std::chrono::milliseconds patience) {
-  sqlite3_busy_timeout(database_.get(), static_cast<int>(patience.count()));
+  int code = database_.Open(file, kOpenTimeout);
+  if (code == SQLITE_OK) {
+    code = database_.EnsureTables({kTablesVersion, kCreateTables,
+                                   [this](int& version) { return ReadTablesVersion(version); }});
+  }
+  if (code == SQLITE_OK) {
+    code = PrepareAll();
+  }
+  return ResultOf(code);
 }
 
 IndexResult IndexConnection::TransactOnce(const std::function<IndexResult()>& change) {
-  const int begun = Execute("BEGIN IMMEDIATE");
-  if (begun != SQLITE_OK) return Tell(begun);
+  const int begun = database_.Begin();
+  if (begun != SQLITE_OK) {
+    return ResultOf(begun);
+  }
   IndexResult result = change();
-  if (result.IsOk()) result = Tell(Execute("COMMIT"));
-  if (!result.IsOk()) Execute("ROLLBACK");
+  if (result.IsOk()) {
+    result = ResultOf(database_.Commit());
+  }
+  if (!result.IsOk()) {
+    database_.RollBack();
+  }
   return result;
 }
 
 IndexResult IndexConnection::Transact(bool isDurable, const std::function<IndexResult()>& change) {
-  if (!isDurable) return TransactOnce(change);
-  const int code = Execute("PRAGMA synchronous = FULL");
-  if (code != SQLITE_OK) return Tell(code);
+  if (!isDurable) {
+    return TransactOnce(change);
+  }
+  const int code = database_.Execute("PRAGMA synchronous = FULL");
+  if (code != SQLITE_OK) {
+    return ResultOf(code);
+  }
   IndexResult result = TransactOnce(change);
-  Execute("PRAGMA synchronous = NORMAL");
+  database_.Execute("PRAGMA synchronous = NORMAL");
   return result;
 }
 
@@ -243,8 +218,10 @@ IndexResult IndexConnection::FindMedia(std::string_view path, std::optional<Stor
   media.reset();
   Bindings bindings(findMedia_.get());
   const int code = bindings.Add(path).Step();
-  if (code == SQLITE_ROW) media = ReadMedia(findMedia_.get());
-  return Tell(EndOf(code));
+  if (code == SQLITE_ROW) {
+    media = ReadMedia(findMedia_.get());
+  }
+  return ResultOf(EndOf(code));
 }
 
 IndexResult IndexConnection::StoreMedia(std::string_view path, const StoredMedia& media) {
@@ -253,25 +230,27 @@ IndexResult IndexConnection::StoreMedia(std::string_view path, const StoredMedia
   bindings.Add(path).Add(record.type).Add(record.width).Add(record.height).Add(record.rotation);
   bindings.Add(record.duration).Add(record.bitrate).Add(record.file.size);
   bindings.Add(record.file.seconds).Add(record.file.nanoseconds).Add(media.readAt);
-  return Tell(EndOf(bindings.Step()));
+  return ResultOf(EndOf(bindings.Step()));
 }
 
 IndexResult IndexConnection::RemoveMedia(std::string_view path) {
   Bindings bindings(removeMedia_.get());
-  return Tell(EndOf(bindings.Add(path).Step()));
+  return ResultOf(EndOf(bindings.Add(path).Step()));
 }
 
 IndexResult IndexConnection::StorePosted(std::string_view path, int kind, int64_t postedAt) {
   Bindings bindings(storePosted_.get());
-  return Tell(EndOf(bindings.Add(path).Add(kind).Add(postedAt).Step()));
+  return ResultOf(EndOf(bindings.Add(path).Add(kind).Add(postedAt).Step()));
 }
 
 IndexResult IndexConnection::StoreVersion(std::string_view directory,
                                           std::optional<int32_t> version) {
   Bindings bindings((version ? storeVersion_ : removeVersion_).get());
   bindings.Add(directory);
-  if (version) bindings.Add(*version);
-  return Tell(EndOf(bindings.Step()));
+  if (version) {
+    bindings.Add(*version);
+  }
+  return ResultOf(EndOf(bindings.Step()));
 }
 
 IndexResult IndexConnection::FindVersion(std::string_view directory,
@@ -279,8 +258,10 @@ IndexResult IndexConnection::FindVersion(std::string_view directory,
   version.reset();
   Bindings bindings(findVersion_.get());
   const int code = bindings.Add(directory).Step();
-  if (code == SQLITE_ROW) version = sqlite3_column_int(findVersion_.get(), 0);
-  return Tell(EndOf(code));
+  if (code == SQLITE_ROW) {
+    version = sqlite3_column_int(findVersion_.get(), 0);
+  }
+  return ResultOf(EndOf(code));
 }
 
 }  // namespace vela

@@ -1,18 +1,17 @@
 #include "index_store.h"
 
 #include <algorithm>
+#include <filesystem>
 #include <utility>
-
-#include "index_path.h"
 
 namespace vela {
 
 namespace {
 
-/// How long what can be had again waits for other writers, in this program and in others.
-constexpr std::chrono::milliseconds kShortPatience(250);
+/// How long writing a record, which can be read from its file again, waits for other writers.
+constexpr std::chrono::milliseconds kRecordTimeout(250);
 
-/// What is left until `end`, nothing when it has passed.
+/// Returns the time left until `end`, 0 when it has passed.
 std::chrono::milliseconds LeftUntil(IndexStore::Clock::time_point end) {
   const auto left = end - IndexStore::Clock::now();
   return std::max(std::chrono::duration_cast<std::chrono::milliseconds>(left),
@@ -21,9 +20,33 @@ std::chrono::milliseconds LeftUntil(IndexStore::Clock::time_point end) {
 
 }  // namespace
 
+std::string PlainPath(std::string_view path) {
+  std::string plain = std::filesystem::path(path).lexically_normal().native();
+  // Two leading slashes may have a meaning of their own on other systems, and are kept above.
+  const size_t first = plain.find_first_not_of('/');
+  if (first == std::string::npos) {
+    return "/";
+  }
+  plain.erase(0, first - 1);
+  if (plain.back() == '/') {
+    plain.pop_back();
+  }
+  return plain;
+}
+
+std::string_view ParentOf(std::string_view path) {
+  if (path.size() <= 1) {
+    return {};
+  }
+  const size_t slash = path.rfind('/');
+  return slash == 0 ? std::string_view("/") : path.substr(0, slash);
+}
+
 std::unique_ptr<IndexConnection> IndexStore::TakeIdle() {
   const std::lock_guard<std::mutex> lock(idleMutex_);
-  if (idle_.empty()) return nullptr;
+  if (idle_.empty()) {
+    return nullptr;
+  }
   std::unique_ptr<IndexConnection> connection = std::move(idle_.back());
   idle_.pop_back();
   return connection;
@@ -31,8 +54,12 @@ std::unique_ptr<IndexConnection> IndexStore::TakeIdle() {
 
 IndexResult IndexStore::Acquire(std::unique_ptr<IndexConnection>& connection) {
   connection = TakeIdle();
-  while (connection && !connection->IsCurrent()) connection = TakeIdle();
-  if (connection) return {};
+  while (connection && !connection->IsCurrent()) {
+    connection = TakeIdle();
+  }
+  if (connection) {
+    return {};
+  }
   connection = std::make_unique<IndexConnection>();
   return connection->Open(file_);
 }
@@ -45,17 +72,23 @@ void IndexStore::Release(std::unique_ptr<IndexConnection> connection) {
 IndexResult IndexStore::Read(const Operation& operation) {
   std::unique_ptr<IndexConnection> connection;
   IndexResult result = Acquire(connection);
-  if (result.IsOk()) result = operation(*connection);
-  // Whatever was wrong, the next operation shall not inherit it.
-  if (result.IsOk()) Release(std::move(connection));
+  if (result.IsOk()) {
+    result = operation(*connection);
+  }
+  // After a failure the connection is closed, so that the next operation starts with a new one.
+  if (result.IsOk()) {
+    Release(std::move(connection));
+  }
   return result;
 }
 
 IndexResult IndexStore::Write(Clock::time_point end, const Operation& operation) {
   const std::unique_lock<std::timed_mutex> lock(writeMutex_, end);
-  if (!lock.owns_lock()) return {SQLITE_BUSY, sqlite3_errstr(SQLITE_BUSY)};
+  if (!lock.owns_lock()) {
+    return {SQLITE_BUSY, sqlite3_errstr(SQLITE_BUSY)};
+  }
   return Read([&](IndexConnection& connection) {
-    connection.SetPatience(LeftUntil(end));
+    connection.SetBusyTimeout(LeftUntil(end));
     return operation(connection);
   });
 }
@@ -69,15 +102,17 @@ IndexResult IndexStore::FindMedia(std::string_view path, std::optional<StoredMed
 }
 
 IndexResult IndexStore::StoreMedia(std::string_view path, const StoredMedia& media) {
-  return Write(Clock::now() + kShortPatience,
+  return Write(Clock::now() + kRecordTimeout,
                [&](IndexConnection& connection) { return connection.StoreMedia(path, media); });
 }
 
 IndexResult IndexStore::RemoveMedia(std::string_view path) {
   std::optional<StoredMedia> media;
   IndexResult result = FindMedia(path, media);
-  if (!result.IsOk() || !media) return result;
-  return Write(Clock::now() + kShortPatience,
+  if (!result.IsOk() || !media) {
+    return result;
+  }
+  return Write(Clock::now() + kRecordTimeout,
                [&](IndexConnection& connection) { return connection.RemoveMedia(path); });
 }
 
@@ -92,7 +127,9 @@ IndexResult IndexStore::FindNearestVersion(std::string_view path, std::optional<
     IndexResult result;
     for (std::string_view at = path; result.IsOk() && !at.empty(); at = ParentOf(at)) {
       result = connection.FindVersion(at, version);
-      if (version) break;
+      if (version) {
+        break;
+      }
     }
     return result;
   });

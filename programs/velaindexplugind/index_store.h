@@ -7,17 +7,25 @@
 #include <memory>
 #include <mutex>
 #include <optional>
+#include <string>
 #include <string_view>
 #include <vector>
 
 #include "index_connection.h"
-#include "index_file.h"
 
 namespace vela {
 
-/// The index. All operations may be called from any thread; each works with a connection of its
-/// own, so that a reader does not wait for a writer. A database that is removed or replaced is
-/// opened anew at the next operation, as is one that gave an error.
+/// Returns the absolute `path` without ".", "..", repeated slashes and a slash at the end. Symbolic
+/// links are not resolved.
+std::string PlainPath(std::string_view path);
+
+/// Returns the directory above the plain path `path`, "" above "/". The result points into
+/// `path` or to a constant.
+std::string_view ParentOf(std::string_view path);
+
+/// The index. All operations may be called from any thread; each uses its own connection, so that
+/// readers do not wait for writers. A database that was removed or replaced is reopened by
+/// the next operation, as is one that returned an error.
 class IndexStore {
  public:
   using Clock = std::chrono::steady_clock;
@@ -30,15 +38,16 @@ class IndexStore {
 
   IndexResult FindMedia(std::string_view path, std::optional<StoredMedia>& media);
 
-  /// Stores a record, unless it would have to wait for long: it can be read again.
+  /// Stores a record. Gives up soon when other writers hold the database: the record can be read
+  /// from its file again.
   IndexResult StoreMedia(std::string_view path, const StoredMedia& media);
 
-  /// Removes the record of `path`, when there is one.
+  /// Removes the record of `path`, if there is one.
   IndexResult RemoveMedia(std::string_view path);
 
-  /// Carries out `change` in one transaction, which begins as soon as no other one is there, in
-  /// this program and in others; busy when that is not before `end`. With `isDurable` all is on the
-  /// disk when this returns.
+  /// Runs `change` in one transaction, which starts when the database is free of other writers, in
+  /// this program and in others. The result is busy when that does not happen before `end`. With
+  /// `isDurable`, the changes are on the disk when this returns.
   IndexResult Change(Clock::time_point end, bool isDurable, const Operation& change);
 
   /// Finds the version set for the plain path itself or the nearest directory above it.
@@ -54,7 +63,7 @@ class IndexStore {
   const IndexFile file_;
   std::mutex idleMutex_;
   std::vector<std::unique_ptr<IndexConnection>> idle_;
-  /// The library lets one writer in and has the others sleep; these need not.
+  /// SQLite makes waiting writers poll; with this lock, those of this program need not.
   std::timed_mutex writeMutex_;
 };
 

@@ -4,8 +4,7 @@
 #include <ctime>
 #include <iterator>
 
-#include "index_answer.h"
-#include "index_path.h"
+#include "answer.h"
 #include "platform/velaindex.h"
 
 namespace vela {
@@ -21,19 +20,20 @@ IndexResult StoreOne(IndexConnection& connection, const Request& request) {
   return connection.StorePosted(request.path, kind, std::time(nullptr));
 }
 
-/// A version cannot be had again from anywhere when the power fails, unlike all else in the index.
-bool NeedsDisk(const Job& job) {
+/// Unlike everything else in the index, a version that is lost in a power failure cannot be
+/// determined again.
+bool MustBeDurable(const Job& job) {
   return job.request.command == Command::kSetIndexVersion;
 }
 
 Answer OverdueAnswer() {
-  return IndexAnswer({SQLITE_BUSY, "other writers kept it for too long"});
+  return IndexAnswer({SQLITE_BUSY, "other writers held it for too long"});
 }
 
 }  // namespace
 
 IndexResult IndexWriter::Store(Position first, Position end) const {
-  return index_.Change(first->arrival + patience_, std::any_of(first, end, NeedsDisk),
+  return index_.Change(first->arrival + timeout_, std::any_of(first, end, MustBeDurable),
                        [first, end](IndexConnection& connection) {
                          IndexResult result;
                          for (auto job = first; result.IsOk() && job != end; ++job) {
@@ -43,10 +43,10 @@ IndexResult IndexWriter::Store(Position first, Position end) const {
                        });
 }
 
-/// Returns the first job that has time left.
+/// Fails the jobs that have reached the timeout. Returns the first one that has not.
 IndexWriter::Position IndexWriter::FailOverdue(Position first, Position end) const {
   const Clock::time_point now = Clock::now();
-  while (first != end && now - first->arrival >= patience_) {
+  while (first != end && now - first->arrival >= timeout_) {
     first->answer = OverdueAnswer();
     ++first;
   }
@@ -62,7 +62,7 @@ void IndexWriter::CarryOutFrom(Position first, std::list<Job>& jobs) const {
       std::for_each(first, jobs.end(), [&answer](Job& job) { job.answer = answer; });
       return;
     }
-    // Its time is over, to the millisecond perhaps.
+    // The first job has reached the timeout, though perhaps not to the millisecond.
     first->answer = OverdueAnswer();
     first = FailOverdue(std::next(first), jobs.end());
   }
@@ -72,7 +72,7 @@ void IndexWriter::CarryOut(std::list<Job>& jobs) const {
   try {
     CarryOutFrom(jobs.begin(), jobs);
   } catch (...) {
-    // Empty lines, as the jobs have them from the beginning, stand for the want of memory.
+    // The jobs keep the empty reply lines they started with, which mean that memory ran out.
     return;
   }
 }

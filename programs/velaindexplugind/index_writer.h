@@ -1,4 +1,4 @@
-// Carries out requests that write to the index.
+// Carries out the requests that write to the index.
 #pragma once
 
 #include <chrono>
@@ -9,16 +9,16 @@
 
 namespace vela {
 
-/// Writes to the index for many clients, in few transactions. For one thread.
+/// Writes to the index for many clients in few transactions. Not thread-safe.
 class IndexWriter {
  public:
   using Clock = std::chrono::steady_clock;
 
-  /// A request waits for other writers until it is `patience` old.
-  IndexWriter(IndexStore& index, Clock::duration patience) : index_(index), patience_(patience) {}
+  /// A request waits for other writers until it is as old as `timeout`.
+  IndexWriter(IndexStore& index, Clock::duration timeout) : index_(index), timeout_(timeout) {}
 
-  /// Carries the jobs out, which are in the order of their arrival, in one transaction as soon as
-  /// the index is free. Those for which that is too late fail when their time is over.
+  /// Carries out the jobs, which are in the order of their arrival, in one transaction as soon as
+  /// the index is free. Jobs that have reached the timeout by then fail.
   void CarryOut(std::list<Job>& jobs) const;
 
  private:
@@ -29,7 +29,7 @@ class IndexWriter {
   IndexResult Store(Position first, Position end) const;
 
   IndexStore& index_;
-  const Clock::duration patience_;
+  const Clock::duration timeout_;
 };
 
 }  // namespace vela

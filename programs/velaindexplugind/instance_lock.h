@@ -1,19 +1,19 @@
-// Keeps a second daemon away from the index and from the socket.
+// Keeps a second daemon from using the index or the socket.
 #pragma once
 
 #include <string>
 
-#include "index_file.h"
+#include "platform/standalone/index_database.h"
 #include "posix/file_descriptor.h"
 
 namespace vela {
 
-/// Takes the lock beside the index database, for as long as `lock` lives. Makes the database's
-/// directory when missing. Returns what went wrong, empty when nothing did.
+/// Takes the lock beside the index database until `lock` is closed. Creates the database's
+/// directory when it is missing. Returns an error message, empty on success.
 std::string LockIndex(const IndexFile& database, FileDescriptor& lock);
 
-/// Takes the lock of who makes a socket at `path`, for as long as `lock` lives. Returns what went
-/// wrong, empty when nothing did.
+/// Takes the lock that protects the creation of a socket at `path`, until `lock` is closed. Returns
+/// an error message, empty on success.
 std::string LockSocket(const std::string& path, FileDescriptor& lock);
 
 }  // namespace vela

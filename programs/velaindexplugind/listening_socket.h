@@ -1,16 +1,15 @@
 // The socket that clients connect to.
 #pragma once
 
-#include <sys/types.h>
-
 #include <optional>
 #include <string>
 
+#include "posix/accounts.h"
 #include "posix/file_descriptor.h"
 
 namespace vela {
 
-/// A listening socket: handed over by the service manager, or made at a path and removed again.
+/// A listening socket, either passed by the service manager or created at a path and removed again.
 class ListeningSocket {
  public:
   ListeningSocket() = default;
@@ -18,24 +17,25 @@ class ListeningSocket {
   ListeningSocket(const ListeningSocket&) = delete;
   ListeningSocket& operator=(const ListeningSocket&) = delete;
 
-  /// Takes the socket that the service manager handed over, if it did. `isTaken` tells. Returns
-  /// what went wrong, empty when nothing did.
+  /// Takes the socket passed by the service manager; `isTaken` is false when there is none. Returns
+  /// an error message, empty on success.
   std::string TakeFromManager(bool& isTaken);
 
-  /// Makes a socket at `path` that its owner and the group `group` (nothing: root's for root, else
-  /// the process's) may use, and nobody else. A socket that is there and that nobody listens at is
-  /// replaced, and for root whatever somebody else has put there, which is logged; anything else is
-  /// left alone and an error, as is another process that does the same. Must run while the process
-  /// has one thread. Returns what went wrong.
+  /// Creates a socket at `path` for its owner and `group` only; the default group is root's for
+  /// root, otherwise that of the process. A socket at which no process listens is replaced. Root
+  /// also replaces whatever another user has created there, and logs that. Anything else at the
+  /// path is an error and left unchanged; so is another process that is creating a socket there.
+  /// Must be called while the process has a single thread. Returns an error message, empty on
+  /// success.
   std::string Make(const std::string& path, std::optional<gid_t> group);
 
   int Fd() const { return socket_.Get(); }
 
-  /// Returns where clients connect to, empty when that cannot be told.
+  /// Returns the address that clients connect to, empty when it is unknown.
   std::string Address() const;
 
-  /// Takes a socket that Make made away from its path, unless another one is there by now. Who is
-  /// connected stays so. Returns whether Make had made it.
+  /// Removes a socket created by Make from its path, unless another one has replaced it. Existing
+  /// connections stay open. Returns whether the socket was created by Make.
   bool Unlink();
 
   void Close() { socket_.Close(); }
@@ -44,8 +44,8 @@ class ListeningSocket {
   std::string Bind(const std::string& path);
 
   FileDescriptor socket_;
-  FileDescriptor lock_;  ///< open while path_ is the object's own to make and remove
-  std::string path_;     ///< empty: not made here
+  FileDescriptor lock_;  ///< held while this object may create and remove path_
+  std::string path_;     ///< empty: not created by this object
   dev_t device_ = 0;
   ino_t inode_ = 0;
 };

@@ -1,4 +1,4 @@
-// Requests as they come over the socket.
+// Requests as they are received from the socket.
 #pragma once
 
 #include <cstddef>
@@ -25,18 +25,17 @@ enum class Command {
   kPostVideoConvert,
 };
 
-/// One request; which fields mean something depends on the command.
+/// One request; which of the fields are used depends on the command.
 struct Request {
   Command command = Command::kIsPhotoConvertDisabled;
   std::string path;                ///< absolute, as the client wrote it
-  std::optional<int32_t> version;  ///< kSetIndexVersion; nothing: no version of its own any more
+  std::optional<int32_t> version;  ///< for kSetIndexVersion; nothing: remove the version
 };
 
-/// Returns the command's word on the socket.
-const char* CommandWord(Command command);
+/// Returns the command's name in requests.
+const char* CommandName(Command command);
 
-/// Reads a request line. Returns what is wrong with it in one sentence, empty when nothing is.
-/// Throws only std::bad_alloc.
+/// Parses a request line. Returns an error message, empty on success. Throws only std::bad_alloc.
 std::string ParseRequest(std::string_view line, Request& request);
 
 }  // namespace vela

@@ -6,21 +6,19 @@
 #include <optional>
 #include <utility>
 
-#include "index_answer.h"
-#include "index_path.h"
-#include "media_reader.h"
-#include "reply.h"
+#include "media_record.h"
+#include "posix/accounts.h"
 
 namespace vela {
 
 namespace {
 
-/// File systems date changes to up to two seconds. A file that was changed so shortly before its
-/// record was read can have been changed once more since, with nothing to tell by.
-constexpr int64_t kTimeGrain = 2;
+/// File times are accurate to two seconds on some file systems. A file that was changed so shortly
+/// before its record was read may have been changed again since, without a new time.
+constexpr int64_t kTimeResolution = 2;
 
-/// How often a file that changes while it is read is read again.
-constexpr int kReadTries = 3;
+/// How many times a file is read that changes while it is read.
+constexpr int kReadAttempts = 3;
 
 Answer Done(std::string line) {
   return {std::move(line), Outcome::kDone, {}};
@@ -47,23 +45,25 @@ bool IsGone(int error) {
   return error == ENOENT || error == ENOTDIR;
 }
 
-bool StillHolds(const StoredMedia& media, const FileState& now) {
-  return media.record.file == now && now.seconds + kTimeGrain < media.readAt;
+bool IsUpToDate(const StoredMedia& media, const FileState& now) {
+  return media.record.file == now && now.seconds + kTimeResolution < media.readAt;
 }
 
-/// Reads a record that is of one state of the file.
-std::string ReadWhole(const std::string& path, StoredMedia& media) {
+/// Reads a record while the file does not change. Returns an error message, empty on success.
+std::string ReadConsistently(const std::string& path, StoredMedia& media) {
   FileState after;
   int error = ReadFileState(path, after);
-  for (int i = 0; error == 0 && i < kReadTries; ++i) {
+  for (int i = 0; error == 0 && i < kReadAttempts; ++i) {
     media.record = {};
     media.record.file = after;
     media.readAt = std::time(nullptr);
     std::string problem = ReadMediaHeaders(path, media.record);
     error = ReadFileState(path, after);
-    if (error == 0 && after == media.record.file) return problem;
+    if (error == 0 && after == media.record.file) {
+      return problem;
+    }
   }
-  return error == 0 ? "the file does not stop changing" : ErrorText(error);
+  return error == 0 ? "the file keeps changing" : ErrorText(error);
 }
 
 }  // namespace
@@ -82,14 +82,28 @@ WorkPlace PlaceOf(Command command) {
   }
 }
 
-/// The index is a help here, not a condition: without it the file itself still tells.
-Answer RequestHandler::ReadAnew(const std::string& path) const {
+/// A version applies to a whole tree with the photos of all its owners, so it is for the
+/// administrator to decide. All other commands are open to every user who can connect.
+std::string ObjectionTo(Command command, const std::optional<ucred>& peer) {
+  if (command != Command::kSetIndexVersion) {
+    return {};
+  }
+  const bool isTrusted = peer && (peer->uid == 0 || peer->uid == EffectiveUser());
+  return isTrusted ? "" : "only root and the daemon's own user may set index versions";
+}
+
+/// A failure of the index does not matter here: the record comes from the file itself.
+Answer RequestHandler::ReadRecord(const std::string& path) const {
   StoredMedia media;
-  const std::string problem = ReadWhole(path, media);
-  if (!problem.empty()) return Failed(problem);
+  const std::string problem = ReadConsistently(path, media);
+  if (!problem.empty()) {
+    return Failed(problem);
+  }
   const IndexResult stored = index_.StoreMedia(path, media);
   Answer answer = Done(MediaReply(path, media.record));
-  if (!stored.IsOk()) answer.error = "index database: " + stored.message;
+  if (!stored.IsOk()) {
+    answer.error = "index database: " + stored.message;
+  }
   return answer;
 }
 
@@ -97,21 +111,23 @@ Answer RequestHandler::GetMedia(const std::string& path) const {
   FileState now;
   const int error = ReadFileState(path, now);
   if (error != 0) {
-    if (IsGone(error)) index_.RemoveMedia(path);
+    if (IsGone(error)) {
+      index_.RemoveMedia(path);
+    }
     return Failed(ErrorText(error));
   }
   std::optional<StoredMedia> stored;
   const IndexResult found = index_.FindMedia(path, stored);
-  if (found.IsOk() && stored && StillHolds(*stored, now)) {
+  if (found.IsOk() && stored && IsUpToDate(*stored, now)) {
     return Done(MediaReply(path, stored->record));
   }
-  return ReadAnew(path);
+  return ReadRecord(path);
 }
 
-Answer RequestHandler::GetIndexVersion(const std::string& path, int32_t standard) const {
+Answer RequestHandler::GetIndexVersion(const std::string& path, int32_t defaultVersion) const {
   std::optional<int32_t> version;
   const IndexResult result = index_.FindNearestVersion(PlainPath(path), version);
-  return result.IsOk() ? Done(VersionReply(version.value_or(standard))) : IndexAnswer(result);
+  return result.IsOk() ? Done(VersionReply(version.value_or(defaultVersion))) : IndexAnswer(result);
 }
 
 Answer RequestHandler::Handle(const Request& request, const Settings& settings) const {

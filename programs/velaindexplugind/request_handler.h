@@ -1,38 +1,44 @@
-// Carries requests out.
+// Carries out requests.
 #pragma once
 
+#include <optional>
 #include <string>
 
 #include "answer.h"
 #include "index_store.h"
+#include "posix/local_socket.h"
 #include "request.h"
 #include "settings.h"
 
 namespace vela {
 
-/// Where a request is to be carried out.
+/// Where a request is carried out.
 enum class WorkPlace {
-  kAtOnce,      ///< needs nothing that could make it wait
-  kIndexRead,   ///< reads the index
-  kIndexWrite,  ///< writes to it; for IndexWriter
-  kFiles,       ///< needs media files, on whatever disk
+  kAtOnce,      ///< on the event loop: nothing could make it wait
+  kIndexRead,   ///< by the thread that reads the index
+  kIndexWrite,  ///< by the thread that writes to the index, in IndexWriter
+  kFiles,       ///< by the threads that read media files, possibly from slow disks
 };
 
-/// Returns the place for a command.
+/// Returns where a command is carried out.
 WorkPlace PlaceOf(Command command);
 
-/// Carries requests out, from any thread; all but those that write to the index.
+/// Returns why `peer` is not permitted to give the command, empty when it is. Without a peer, the
+/// client is unknown.
+std::string ObjectionTo(Command command, const std::optional<ucred>& peer);
+
+/// Carries out all requests but those that write to the index, from any thread.
 class RequestHandler {
  public:
   explicit RequestHandler(IndexStore& index) : index_(index) {}
 
-  /// Carries one request out. Throws only std::bad_alloc.
+  /// Carries out one request. Throws only std::bad_alloc.
   Answer Handle(const Request& request, const Settings& settings) const;
 
  private:
   Answer GetMedia(const std::string& path) const;
-  Answer ReadAnew(const std::string& path) const;
-  Answer GetIndexVersion(const std::string& path, int32_t standard) const;
+  Answer ReadRecord(const std::string& path) const;
+  Answer GetIndexVersion(const std::string& path, int32_t defaultVersion) const;
 
   IndexStore& index_;
 };

@@ -4,7 +4,7 @@
 #include <optional>
 
 #include "log.h"
-#include "peer.h"
+#include "posix/local_socket.h"
 
 namespace vela {
 
@@ -40,36 +40,52 @@ LogLevel LevelOf(const Answer& answer) {
 
 void AddPeer(LogLine& line, int socket) {
   const std::optional<ucred> peer = PeerOf(socket);
-  if (peer) line.Add("pid", peer->pid).Add("uid", peer->uid);
+  if (peer) {
+    line.Add("pid", peer->pid).Add("uid", peer->uid);
+  }
 }
 
 }  // namespace
 
-bool RequestLog::MayPass(const Answer& answer, int& heldBack) {
-  if (logsAll_) return true;
+bool RequestLog::MayPass(const Answer& answer, int& suppressed) {
+  if (logsAll_) {
+    return true;
+  }
   const bool isProblem = answer.outcome != Outcome::kDone || !answer.error.empty();
-  return isProblem && problems_.Pass(Clock::now(), heldBack);
+  return isProblem && problems_.Pass(Clock::now(), suppressed);
 }
 
 void RequestLog::Write(const Request* request, const Answer& answer, int socket,
                        Clock::time_point begin) {
-  int heldBack = 0;
-  if (!MayPass(answer, heldBack)) return;
+  int suppressed = 0;
+  if (!MayPass(answer, suppressed)) {
+    return;
+  }
   LogLine line(LevelOf(answer), "request");
-  if (request != nullptr) line.Add("command", CommandWord(request->command));
-  if (request != nullptr && !request->path.empty()) line.Add("path", request->path);
+  if (request != nullptr) {
+    line.Add("command", CommandName(request->command));
+  }
+  if (request != nullptr && !request->path.empty()) {
+    line.Add("path", request->path);
+  }
   line.Add("outcome", NameOf(answer.outcome));
-  if (!answer.error.empty()) line.Add("error", answer.error);
+  if (!answer.error.empty()) {
+    line.Add("error", answer.error);
+  }
   AddPeer(line, socket);
   const auto took = std::chrono::duration_cast<std::chrono::microseconds>(Clock::now() - begin);
   line.Add("microseconds", took.count());
-  if (heldBack > 0) line.Add("lines_held_back", heldBack);
+  if (suppressed > 0) {
+    line.Add("suppressed", suppressed);
+  }
   line.Write();
 }
 
 void RequestLog::WriteAcceptFailure(int error) {
-  int heldBack = 0;
-  if (!acceptFailures_.Pass(Clock::now(), heldBack)) return;
+  int suppressed = 0;
+  if (!acceptFailures_.Pass(Clock::now(), suppressed)) {
+    return;
+  }
   LogLine(LogLevel::kError, "accept").Add("error", std::strerror(error)).Write();
 }
 

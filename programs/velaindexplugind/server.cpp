@@ -1,8 +1,5 @@
 #include "server.h"
 
-#include <sys/epoll.h>
-#include <sys/socket.h>
-
 #include <cerrno>
 #include <exception>
 #include <iterator>
@@ -10,40 +7,39 @@
 #include <utility>
 #include <vector>
 
-#include "peer.h"
-#include "reply.h"
+#include "posix/local_socket.h"
 
 namespace vela {
 
 namespace {
 
-/// How many connections are taken before others have their turn.
+/// How many connections are accepted before other events are handled.
 constexpr int kAcceptBatch = 16;
 
-/// How long no connection is taken when there is nothing to take it with.
+/// How long accepting pauses when the process lacks descriptors or memory for it.
 constexpr uint64_t kAcceptPause = 100000;  // microseconds
 
-/// How often clients that keep still are looked for.
+/// How often idle clients are searched for.
 constexpr uint64_t kSweepInterval = 250000;  // microseconds
 
-/// Clients that are being served come before new ones.
+/// Existing clients are served before new ones.
 constexpr int64_t kListenerPriority = SD_EVENT_PRIORITY_NORMAL + 1;
 
-/// How many requests go into one transaction; other programs must not wait for too long.
+/// How many requests are written in one transaction; other programs must not wait for too long.
 constexpr size_t kWriteBatch = 256;
 
-/// The connection that was waiting is gone; the next one may be well.
-bool IsPassing(int error) {
+/// Returns whether only the connection at the head of the queue has failed.
+bool IsTransient(int error) {
   return error == ECONNABORTED || error == EINTR || error == EPROTO || error == EPERM;
 }
 
-/// Carries jobs out whatever happens.
+/// Carries out jobs; every job gets an answer.
 void CarryOut(const RequestHandler& handler, std::list<Job>& jobs) {
   for (Job& job : jobs) {
     try {
       job.answer = handler.Handle(job.request, job.settings);
     } catch (...) {
-      // An empty line stands for the want of memory.
+      // An empty line means that memory ran out.
       job.answer.line.clear();
     }
   }
@@ -59,7 +55,7 @@ uint32_t EventsFor(Connection::State state) {
     case Connection::State::kWorking:
       break;
   }
-  // The end of the connection is reported even so.
+  // The end of the connection is reported even without a requested event.
   return 0;
 }
 
@@ -74,7 +70,7 @@ struct Server::Client {
   Connection connection;
   const Clock::time_point begin;
   EventSource source;
-  WorkerPool* pool = nullptr;  ///< that has its request in hand
+  WorkerPool* pool = nullptr;  ///< that has its request
 };
 
 Server::Server(sd_event* loop, const ServerLimits& limits, const RequestHandler& handler,
@@ -88,17 +84,23 @@ int Server::WatchListener(int listener) {
   sd_event_source* source = nullptr;
   const int result = sd_event_add_io(loop_, &source, listener, EPOLLIN, OnListener, this);
   listenerSource_.reset(source);
-  if (result < 0) return -result;
+  if (result < 0) {
+    return -result;
+  }
   return -sd_event_source_set_priority(source, kListenerPriority);
 }
 
 int Server::Start(int listener) {
   const int error = done_.Open();
-  if (error != 0) return error;
+  if (error != 0) {
+    return error;
+  }
   sd_event_source* source = nullptr;
   const int result = sd_event_add_io(loop_, &source, done_.Fd(), EPOLLIN, OnDone, this);
   doneSource_.reset(source);
-  if (result < 0) return -result;
+  if (result < 0) {
+    return -result;
+  }
   const auto work = [this](std::list<Job>& jobs) { CarryOut(handler_, jobs); };
   const auto write = [this](std::list<Job>& jobs) { writer_.CarryOut(jobs); };
   files_ = std::make_unique<WorkerPool>(limits_.workers, 1, work, done_);
@@ -135,19 +137,19 @@ int Server::OnSweep(sd_event_source* /*source*/, uint64_t /*time*/, void* server
   return 0;
 }
 
-/// Returns whether there may be more to accept at once.
+/// Returns whether more connections may be in the queue.
 bool Server::AcceptSome() {
   for (int i = 0; i < kAcceptBatch; ++i) {
     if (clients_.size() + abandonedJobs_ >= limits_.clients) {
       sd_event_source_set_enabled(listenerSource_.get(), SD_EVENT_OFF);
       return false;
     }
-    FileDescriptor socket(accept4(listener_, nullptr, nullptr, SOCK_CLOEXEC | SOCK_NONBLOCK));
+    FileDescriptor socket = AcceptLocal(listener_);
     if (socket.IsOpen()) {
-      Welcome(std::move(socket));
+      AddClient(std::move(socket));
     } else if (errno == EAGAIN) {
       return false;
-    } else if (!IsPassing(errno)) {
+    } else if (!IsTransient(errno)) {
       PauseAccepting(errno);
       return false;
     }
@@ -155,25 +157,29 @@ bool Server::AcceptSome() {
   return true;
 }
 
-/// Without a pause the loop would spin: the connection stays where it is.
+/// Without a pause the loop would spin, because the connection stays in the queue.
 void Server::PauseAccepting(int error) {
   sd_event_source* source = nullptr;
   const int result = sd_event_add_time_relative(loop_, &source, CLOCK_MONOTONIC, kAcceptPause, 0,
                                                 OnPauseEnd, this);
   pauseSource_.reset(source);
-  if (result >= 0) sd_event_source_set_enabled(listenerSource_.get(), SD_EVENT_OFF);
+  if (result >= 0) {
+    sd_event_source_set_enabled(listenerSource_.get(), SD_EVENT_OFF);
+  }
   try {
     log_.WriteAcceptFailure(error);
   } catch (const std::exception&) {
-    return;  // without memory for a line there is none
+    return;  // there is no memory for the line
   }
 }
 
 void Server::ResumeAccepting() {
-  if (listenerSource_) sd_event_source_set_enabled(listenerSource_.get(), SD_EVENT_ON);
+  if (listenerSource_) {
+    sd_event_source_set_enabled(listenerSource_.get(), SD_EVENT_ON);
+  }
 }
 
-void Server::Welcome(FileDescriptor socket) {
+void Server::AddClient(FileDescriptor socket) {
   Client* client = nullptr;
   try {
     const uint64_t id = ++lastClient_;
@@ -181,13 +187,13 @@ void Server::Welcome(FileDescriptor socket) {
     client = made.get();
     clients_.emplace(id, std::move(made));
   } catch (const std::exception&) {
-    return;  // the connection is closed
+    return;  // closes the connection
   }
-  // Most have sent their request by now.
+  // Most clients have already sent their request.
   Serve(*client, EPOLLIN);
 }
 
-/// Whatever goes wrong with a client ends its connection, no more.
+/// An error with one client closes its connection and affects nothing else.
 void Server::Serve(Client& client, uint32_t events) {
   try {
     Step(client, events);
@@ -196,7 +202,7 @@ void Server::Serve(Client& client, uint32_t events) {
   }
 }
 
-/// The client may be gone afterwards.
+/// May destroy the client.
 void Server::Step(Client& client, uint32_t events) {
   switch (client.connection.GetState()) {
     case Connection::State::kReceiving:
@@ -206,10 +212,14 @@ void Server::Step(Client& client, uint32_t events) {
       SendReply(client);
       return;
     case Connection::State::kDraining:
-      if (!client.connection.Drain()) Drop(client);
+      if (!client.connection.Drain()) {
+        Drop(client);
+      }
       return;
     case Connection::State::kWorking:
-      if ((events & (EPOLLHUP | EPOLLERR)) != 0) Drop(client);
+      if ((events & (EPOLLHUP | EPOLLERR)) != 0) {
+        Drop(client);
+      }
       return;
   }
 }
@@ -260,12 +270,12 @@ void Server::GiveToWorkers(Client& client, Request request) {
   WorkerPool* const indexPool = (place == WorkPlace::kIndexRead ? indexReads_ : indexWrites_).get();
   client.pool = place == WorkPlace::kFiles ? files_.get() : indexPool;
   client.pool->Add(job);
-  ++jobsInHand_;
+  ++pendingJobs_;
 }
 
 void Server::TakeDoneJobs() {
   for (Job& job : done_.Take()) {
-    --jobsInHand_;
+    --pendingJobs_;
     TakeDoneJob(job);
   }
   ReportIdle();
@@ -291,7 +301,9 @@ void Server::Refuse(Client& client, const std::string& error, bool drains) {
 }
 
 void Server::Finish(Client& client, const Request* request, Answer answer, bool drains) {
-  if (answer.line.empty()) answer = {kLastResortReply, Outcome::kFault, "out of memory"};
+  if (answer.line.empty()) {
+    answer = {kLastResortReply, Outcome::kFault, "out of memory"};
+  }
   log_.Write(request, answer, client.connection.Fd(), client.begin);
   client.connection.BeginReply(std::move(answer.line), drains, Clock::now());
   SendReply(client);
@@ -306,8 +318,8 @@ void Server::SendReply(Client& client) {
   }
 }
 
-/// Waits for what the connection's state asks for. A client that cannot be watched is closed when
-/// it keeps still for too long.
+/// Waits for the events that the connection's state requires. A client that cannot be watched is
+/// closed by the idle timeout.
 void Server::Watch(Client& client) {
   ArmSweep();
   const uint32_t events = EventsFor(client.connection.GetState());
@@ -323,7 +335,9 @@ void Server::Watch(Client& client) {
 }
 
 void Server::ArmSweep() {
-  if (isSweepArmed_) return;
+  if (isSweepArmed_) {
+    return;
+  }
   if (sweepSource_) {
     isSweepArmed_ = sd_event_source_set_time_relative(sweepSource_.get(), kSweepInterval) >= 0 &&
                     sd_event_source_set_enabled(sweepSource_.get(), SD_EVENT_ONESHOT) >= 0;
@@ -341,24 +355,32 @@ void Server::Sweep() {
   const Clock::time_point now = Clock::now();
   for (auto next = clients_.begin(); next != clients_.end();) {
     const Client& client = *(next++)->second;
-    if (client.connection.IsOverdue(now, limits_.clientTimeout)) Drop(client);
+    if (client.connection.IsOverdue(now, limits_.clientTimeout)) {
+      Drop(client);
+    }
   }
-  if (!clients_.empty()) ArmSweep();
+  if (!clients_.empty()) {
+    ArmSweep();
+  }
 }
 
 void Server::Drop(const Client& client) {
-  if (client.pool != nullptr) Abandon(client);
+  if (client.pool != nullptr) {
+    Abandon(client);
+  }
   clients_.erase(client.id);
-  // A pause for want of something else goes on.
-  if (!pauseSource_) ResumeAccepting();
+  // A pause has another cause and continues.
+  if (!pauseSource_) {
+    ResumeAccepting();
+  }
   ReportIdle();
 }
 
-/// Nobody waits for the answer any more. What a client wanted stored is stored nevertheless. A job
-/// that stays counts as a client: there could be any number of them otherwise.
+/// Cancels the request of a client that has disconnected, unless it is a write or has been started.
+/// A job that remains counts as a client, because there is no other limit to their number.
 void Server::Abandon(const Client& client) {
   if (client.pool != indexWrites_.get() && client.pool->Remove(client.id)) {
-    --jobsInHand_;
+    --pendingJobs_;
   } else {
     ++abandonedJobs_;
   }
@@ -366,36 +388,44 @@ void Server::Abandon(const Client& client) {
 
 void Server::ReleaseAbandoned() {
   --abandonedJobs_;
-  if (!pauseSource_) ResumeAccepting();
+  if (!pauseSource_) {
+    ResumeAccepting();
+  }
 }
 
-/// What has come in before the end is answered still.
-void Server::LetUnheardGo() {
-  std::vector<uint64_t> unheard;
+/// A request that has already arrived is still answered.
+void Server::DropClientsWithoutRequest() {
+  std::vector<uint64_t> waiting;
   for (const auto& [id, client] : clients_) {
-    if (client->connection.GetState() == Connection::State::kReceiving) unheard.push_back(id);
+    if (client->connection.GetState() == Connection::State::kReceiving) {
+      waiting.push_back(id);
+    }
   }
-  for (const uint64_t id : unheard) {
+  for (const uint64_t id : waiting) {
     Serve(*clients_.at(id), EPOLLIN);
     const auto found = clients_.find(id);
-    const bool isUnheard = found != clients_.end() &&
+    const bool isWaiting = found != clients_.end() &&
                            found->second->connection.GetState() == Connection::State::kReceiving;
-    if (isUnheard) Drop(*found->second);
+    if (isWaiting) {
+      Drop(*found->second);
+    }
   }
 }
 
-void Server::BeginStop(bool takesWaiting, std::function<void()> onIdle) {
-  while (takesWaiting && AcceptSome()) {
+void Server::BeginStop(bool acceptsQueued, std::function<void()> onIdle) {
+  while (acceptsQueued && AcceptSome()) {
   }
   listenerSource_.reset();
   pauseSource_.reset();
-  LetUnheardGo();
+  DropClientsWithoutRequest();
   onIdle_ = std::move(onIdle);
   ReportIdle();
 }
 
 void Server::ReportIdle() {
-  if (onIdle_ && clients_.empty() && jobsInHand_ == 0) onIdle_();
+  if (onIdle_ && clients_.empty() && pendingJobs_ == 0) {
+    onIdle_();
+  }
 }
 
 }  // namespace vela

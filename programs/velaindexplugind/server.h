@@ -1,4 +1,4 @@
-// The daemon's side of all connections.
+// Serves all connections of the daemon.
 #pragma once
 
 #include <systemd/sd-event.h>
@@ -19,15 +19,15 @@
 
 namespace vela {
 
-/// How much the server lets happen at once, and for how long.
+/// Limits on concurrency and time.
 struct ServerLimits {
   int workers = 4;                         ///< threads that read media files
-  size_t clients = 2048;                   ///< connections; more wait in the socket's queue
-  std::chrono::seconds clientTimeout{30};  ///< for a client that keeps still
+  size_t clients = 2048;                   ///< connections; further ones wait in the socket's queue
+  std::chrono::seconds clientTimeout{30};  ///< for an idle client
 };
 
-/// Takes connections and requests and answers them. Everything but the carrying out of requests
-/// happens on the event loop's thread.
+/// Accepts connections, receives requests and answers them. All of this happens on the event loop's
+/// thread, except that most requests are carried out by other threads.
 class Server {
  public:
   Server(sd_event* loop, const ServerLimits& limits, const RequestHandler& handler,
@@ -36,20 +36,20 @@ class Server {
   Server(const Server&) = delete;
   Server& operator=(const Server&) = delete;
 
-  /// Begins to take connections from the listening socket. Returns 0 or an errno value; throws
+  /// Starts accepting connections from the listening socket. Returns 0 or an errno value; throws
   /// std::system_error when threads cannot be started.
   int Start(int listener);
 
-  /// Takes new settings for the requests to come.
+  /// Sets the settings for the requests that follow.
   void SetSettings(const Settings& settings) { settings_ = settings; }
 
-  /// Takes no more connections, after those that wait already where `takesWaiting` says so, and
-  /// lets those go that have not sent a request. Calls `onIdle` as soon as the last one is
-  /// answered; the listening socket may be closed after the call.
-  void BeginStop(bool takesWaiting, std::function<void()> onIdle);
+  /// Stops accepting connections, with `acceptsQueued` only after those in the socket's queue, and
+  /// closes those that have not sent a request. Calls `onIdle` when the last request is answered.
+  /// The listening socket may be closed when this returns.
+  void BeginStop(bool acceptsQueued, std::function<void()> onIdle);
 
-  /// Requests that are being carried out.
-  size_t JobsInHand() const { return jobsInHand_; }
+  /// Returns the number of requests in progress.
+  size_t PendingJobs() const { return pendingJobs_; }
 
  private:
   using Clock = Connection::Clock;
@@ -65,8 +65,8 @@ class Server {
   bool AcceptSome();
   void PauseAccepting(int error);
   void ResumeAccepting();
-  void LetUnheardGo();
-  void Welcome(FileDescriptor socket);
+  void DropClientsWithoutRequest();
+  void AddClient(FileDescriptor socket);
   void Serve(Client& client, uint32_t events);
   void Step(Client& client, uint32_t events);
   void Receive(Client& client);
@@ -91,11 +91,11 @@ class Server {
   const IndexWriter& writer_;
   RequestLog& log_;
   Settings settings_;
-  std::function<void()> onIdle_;  ///< set while the server stops
+  std::function<void()> onIdle_;  ///< set while the server is stopping
 
   DoneJobs done_;
-  size_t jobsInHand_ = 0;
-  size_t abandonedJobs_ = 0;  ///< of those in hand; their clients have gone
+  size_t pendingJobs_ = 0;
+  size_t abandonedJobs_ = 0;  ///< pending ones whose clients have disconnected
   std::unordered_map<uint64_t, std::unique_ptr<Client>> clients_;
   uint64_t lastClient_ = 0;
   int listener_ = -1;
@@ -105,7 +105,7 @@ class Server {
   EventSource sweepSource_;
   bool isSweepArmed_ = false;
 
-  // The last to come and the first to go: their threads use what is above.
+  // Declared last, so destroyed first: their threads use the members above.
   std::unique_ptr<WorkerPool> files_;
   std::unique_ptr<WorkerPool> indexReads_;
   std::unique_ptr<WorkerPool> indexWrites_;

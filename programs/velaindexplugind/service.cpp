@@ -1,27 +1,26 @@
 #include "service.h"
 
-#include <sys/resource.h>
 #include <systemd/sd-daemon.h>
-#include <unistd.h>
 
-#include <time.h>
-#include <algorithm>
 #include <chrono>
-#include <csignal>
+#include <cstdint>
+#include <cstdlib>
 #include <cstring>
+#include <ctime>
 #include <exception>
 #include <memory>
 #include <optional>
 #include <string>
 
 #include "event_source.h"
-#include "group.h"
 #include "index_store.h"
 #include "index_writer.h"
 #include "instance_lock.h"
 #include "ipc/velamk_ipc.h"
 #include "listening_socket.h"
 #include "log.h"
+#include "posix/accounts.h"
+#include "posix/process_setup.h"
 #include "request_handler.h"
 #include "request_log.h"
 #include "server.h"
@@ -34,48 +33,52 @@ namespace {
 constexpr int kStarted = 0;
 constexpr int kNotStarted = 1;
 
-/// How old a request that writes to the index may become before it is its turn.
-constexpr std::chrono::milliseconds kWritePatience(5000);
+/// The age at which a request fails that waits to write to the index.
+constexpr std::chrono::milliseconds kWriteTimeout(5000);
 
-/// How long requests in hand have to come to their end.
+/// How long the daemon waits for pending requests when it stops.
 constexpr uint64_t kStopTime = 5000000;  // microseconds
 
-/// Descriptors for everything but clients: the loop and its sources, and for each worker an index
-/// and a media file.
-constexpr rlim_t kOwnDescriptors = 48;
-constexpr rlim_t kWorkerDescriptors = 4;
+/// Descriptors for everything but clients: those of the event loop, and for each worker those of an
+/// index connection and a media file.
+constexpr uint64_t kOwnDescriptors = 48;
+constexpr uint64_t kWorkerDescriptors = 4;
 
-/// Raises the process's limit for as many clients. Returns how many there can be.
-size_t MakeRoomForClients(int wanted, int workers) {
-  rlimit limit{};
-  if (getrlimit(RLIMIT_NOFILE, &limit) != 0) return static_cast<size_t>(wanted);
-  const rlim_t own = kOwnDescriptors + static_cast<rlim_t>(workers) * kWorkerDescriptors;
-  const rlim_t needed = static_cast<rlim_t>(wanted) + own;
-  if (limit.rlim_cur < needed) {
-    limit.rlim_cur = std::min(needed, limit.rlim_max);
-    setrlimit(RLIMIT_NOFILE, &limit);
-    getrlimit(RLIMIT_NOFILE, &limit);
+/// Raises the limit of open files to what `wanted` clients need, as far as permitted. Returns how
+/// many clients the limit allows.
+size_t AllowClients(int wanted, int workers) {
+  const uint64_t own = kOwnDescriptors + static_cast<uint64_t>(workers) * kWorkerDescriptors;
+  const uint64_t needed = static_cast<uint64_t>(wanted) + own;
+  const uint64_t limit = RaiseOpenFileLimit(needed);
+  if (limit >= needed) {
+    return static_cast<size_t>(wanted);
   }
-  if (limit.rlim_cur >= needed) return static_cast<size_t>(wanted);
-  const rlim_t spare = limit.rlim_cur > own ? limit.rlim_cur - own : 1;
-  return static_cast<size_t>(spare);
+  return static_cast<size_t>(limit > own ? limit - own : 1);
 }
 
-void TellManagerReload() {
+void NotifyReloading() {
   timespec now{};
   clock_gettime(CLOCK_MONOTONIC, &now);
   const long long microseconds = now.tv_sec * 1000000LL + now.tv_nsec / 1000;
   sd_notifyf(0, "RELOADING=1\nMONOTONIC_USEC=%lld", microseconds);
 }
 
+void LogGroupFailure(const std::string& path, gid_t group, int error) {
+  LogLine(LogLevel::kWarning, "database")
+      .Add("path", path)
+      .Add("gid", group)
+      .Add("error", std::strerror(error))
+      .Write();
+}
+
 class Service {
  public:
   explicit Service(const Options& options) : options_(options), log_(options.logRequests) {}
 
-  /// Returns what went wrong, empty when nothing did.
+  /// Returns an error message, empty on success.
   std::string Start();
 
-  /// Serves until a signal comes.
+  /// Serves requests until a signal stops the daemon.
   void Run();
 
  private:
@@ -106,20 +109,22 @@ class Service {
 };
 
 std::string Service::FindOptionsGroup() {
-  if (options_.group.empty()) return {};
-  gid_t id = 0;
-  std::string problem = FindGroup(options_.group, id);
-  if (problem.empty()) group_ = id;
-  return problem;
+  if (options_.group.empty()) {
+    return {};
+  }
+  group_ = FindGroup(options_.group);
+  return group_ ? std::string() : "there is no group " + options_.group;
 }
 
 std::string Service::OpenIndex() {
-  const IndexFile file = {options_.database, group_};
+  const IndexFile file = {options_.database, group_, true, LogGroupFailure};
   std::string problem = LockIndex(file, lock_);
-  if (!problem.empty()) return problem;
+  if (!problem.empty()) {
+    return problem;
+  }
   index_ = std::make_unique<IndexStore>(file);
   handler_ = std::make_unique<RequestHandler>(*index_);
-  writer_ = std::make_unique<IndexWriter>(*index_, kWritePatience);
+  writer_ = std::make_unique<IndexWriter>(*index_, kWriteTimeout);
   const IndexResult opened = index_->Open();
   return opened.IsOk() ? std::string() : file.path + ": " + opened.message;
 }
@@ -127,7 +132,9 @@ std::string Service::OpenIndex() {
 std::string Service::OpenSocket() {
   bool isTaken = false;
   const std::string problem = socket_.TakeFromManager(isTaken);
-  if (!problem.empty() || isTaken) return problem;
+  if (!problem.empty() || isTaken) {
+    return problem;
+  }
   return socket_.Make(PluginDaemonSocketPath, group_);
 }
 
@@ -135,7 +142,9 @@ void Service::LoadSettings(const char* event) {
   std::string warning;
   const Settings settings = ReadSettings(warning);
   server_->SetSettings(settings);
-  if (!warning.empty()) LogLine(LogLevel::kWarning, event).Add("problem", warning).Write();
+  if (!warning.empty()) {
+    LogLine(LogLevel::kWarning, event).Add("problem", warning).Write();
+  }
   LogLine(LogLevel::kInfo, event)
       .Add("index_version", settings.indexVersion)
       .Add("disable_convert_photo", settings.isPhotoConvertDisabled ? "yes" : "no")
@@ -152,10 +161,10 @@ int Service::OnEndSignal(sd_event_source* /*source*/, const signalfd_siginfo* in
 int Service::OnReloadSignal(sd_event_source* /*source*/, const signalfd_siginfo* /*info*/,
                             void* service) {
   try {
-    TellManagerReload();
+    NotifyReloading();
     static_cast<Service*>(service)->LoadSettings("settings");
   } catch (const std::exception&) {
-    return 0;  // the settings stay as they were
+    return 0;  // keeps the previous settings
   }
   sd_notify(0, "READY=1");
   return 0;
@@ -168,8 +177,12 @@ int Service::OnStopTime(sd_event_source* /*source*/, uint64_t /*time*/, void* se
 
 int Service::WatchSignals() {
   int result = sd_event_add_signal(loop_.get(), nullptr, SIGTERM, OnEndSignal, this);
-  if (result >= 0) result = sd_event_add_signal(loop_.get(), nullptr, SIGINT, OnEndSignal, this);
-  if (result >= 0) result = sd_event_add_signal(loop_.get(), nullptr, SIGHUP, OnReloadSignal, this);
+  if (result >= 0) {
+    result = sd_event_add_signal(loop_.get(), nullptr, SIGINT, OnEndSignal, this);
+  }
+  if (result >= 0) {
+    result = sd_event_add_signal(loop_.get(), nullptr, SIGHUP, OnReloadSignal, this);
+  }
   return result;
 }
 
@@ -177,11 +190,15 @@ std::string Service::StartServer() {
   sd_event* loop = nullptr;
   int result = sd_event_new(&loop);
   loop_.reset(loop);
-  if (result >= 0) result = WatchSignals();
-  if (result < 0) return std::string("event loop: ") + std::strerror(-result);
+  if (result >= 0) {
+    result = WatchSignals();
+  }
+  if (result < 0) {
+    return std::string("event loop: ") + std::strerror(-result);
+  }
   ServerLimits limits;
   limits.workers = options_.workers;
-  limits.clients = MakeRoomForClients(options_.maxClients, options_.workers);
+  limits.clients = AllowClients(options_.maxClients, options_.workers);
   limits.clientTimeout = std::chrono::seconds(options_.clientTimeout);
   server_ = std::make_unique<Server>(loop, limits, *handler_, *writer_, log_);
   const int error = server_->Start(socket_.Fd());
@@ -190,10 +207,18 @@ std::string Service::StartServer() {
 
 std::string Service::Start() {
   std::string problem = FindOptionsGroup();
-  if (problem.empty()) problem = OpenIndex();
-  if (problem.empty()) problem = OpenSocket();
-  if (problem.empty()) problem = StartServer();
-  if (!problem.empty()) return problem;
+  if (problem.empty()) {
+    problem = OpenIndex();
+  }
+  if (problem.empty()) {
+    problem = OpenSocket();
+  }
+  if (problem.empty()) {
+    problem = StartServer();
+  }
+  if (!problem.empty()) {
+    return problem;
+  }
   LogLine(LogLevel::kInfo, "start")
       .Add("version", VELA_VERSION)
       .Add("socket", socket_.Address())
@@ -206,16 +231,20 @@ std::string Service::Start() {
 }
 
 void Service::BeginStop(const char* signalName) {
-  // Who asks twice does not want to wait.
-  if (isStopping_) return EndLoop();
+  // The second signal ends the wait for pending requests.
+  if (isStopping_) {
+    return EndLoop();
+  }
   isStopping_ = true;
   sd_notify(0, "STOPPING=1");
-  // New clients are to see at once that nobody listens here. What the service manager listens at
-  // waits for the next daemon.
+  // New clients must fail at once when the socket is the daemon's own. In the service manager's
+  // socket they wait for the next daemon.
   const bool isOwnSocket = socket_.Unlink();
   const int result = sd_event_add_time_relative(loop_.get(), nullptr, CLOCK_MONOTONIC, kStopTime, 0,
                                                 OnStopTime, this);
-  if (result < 0) EndLoop();
+  if (result < 0) {
+    EndLoop();
+  }
   try {
     LogLine(LogLevel::kInfo, "stop").Add("signal", signalName).Write();
     server_->BeginStop(isOwnSocket, [this] { EndLoop(); });
@@ -230,22 +259,13 @@ void Service::Run() {
   if (result < 0) {
     LogLine(LogLevel::kError, "loop").Add("error", std::strerror(-result)).Write();
   }
-  const size_t inHand = server_->JobsInHand();
-  if (inHand > 0) {
-    LogLine(LogLevel::kWarning, "stop").Add("requests_left", static_cast<int64_t>(inHand)).Write();
+  const size_t pending = server_->PendingJobs();
+  if (pending > 0) {
+    LogLine(LogLevel::kWarning, "stop").Add("requests_left", static_cast<int64_t>(pending)).Write();
     socket_.Unlink();
-    // Their threads may wait for a disk that never answers; they cannot be joined.
-    _exit(kStarted);
+    // Their threads may be waiting for a disk that does not respond, so they cannot be joined.
+    std::_Exit(kStarted);
   }
-}
-
-/// Signals are for the loop alone, so that all threads have them blocked.
-void PrepareSignals() {
-  sigset_t handled;
-  sigemptyset(&handled);
-  for (const int number : {SIGTERM, SIGINT, SIGHUP}) sigaddset(&handled, number);
-  pthread_sigmask(SIG_BLOCK, &handled, nullptr);
-  std::signal(SIGPIPE, SIG_IGN);
 }
 
 }  // namespace
@@ -253,7 +273,9 @@ void PrepareSignals() {
 int RunService(const Options& options) {
   std::string problem;
   try {
-    PrepareSignals();
+    // The event loop receives these; threads started later inherit the block.
+    BlockSignals({SIGTERM, SIGINT, SIGHUP});
+    IgnoreBrokenPipes();
     Service service(options);
     problem = service.Start();
     if (problem.empty()) {

@@ -1,4 +1,4 @@
-// The daemon as a service: its beginning, its signals and its end.
+// The daemon as a service: its start, its signals and its end.
 #pragma once
 
 #include "options.h"

@@ -5,6 +5,7 @@
 #include <cstring>
 #include <optional>
 
+#include "platform/system_rules.h"
 #include "platform/vlibc.h"
 #include "whole_number.h"
 
@@ -12,12 +13,10 @@ namespace vela {
 
 namespace {
 
-constexpr char kSettingsFile[] = "/etc/velainfo.conf";
-
-/// Long enough for all values that mean something here; a longer one is cut and means nothing.
+/// Long enough for all valid values; a longer one is cut, which leaves it invalid.
 using Value = std::array<char, 64>;
 
-/// Returns whether the key is there; a file that is missing has none.
+/// Returns whether the file has the key. A missing file is not worth a warning.
 bool FindValue(const char* key, Value& value, std::string& warning) {
   const int found = VLIBCFileGetKeyValue(kSettingsFile, key, value.data(), value.size(), 0);
   if (found < 0 && VLIBCErrGet() != ENOENT) {
@@ -33,9 +32,13 @@ bool IsYes(const char* key, std::string& warning) {
 
 int32_t ReadIndexVersion(std::string& warning) {
   Value value;
-  if (!FindValue("index_version", value, warning)) return 0;
+  if (!FindValue("index_version", value, warning)) {
+    return 0;
+  }
   const std::optional<int32_t> number = ParseWholeNumber(value.data());
-  if (!number) warning = "index_version is no number from 0 to 2147483647, 0 is used";
+  if (!number) {
+    warning = "index_version is not a number from 0 to 2147483647; using 0";
+  }
   return number.value_or(0);
 }
 

@@ -1,4 +1,4 @@
-// What the machine's settings file says to the daemon.
+// The daemon's settings in the system's settings file.
 #pragma once
 
 #include <cstdint>
@@ -6,15 +6,15 @@
 
 namespace vela {
 
-/// The settings, with the defaults for what the file does not say.
+/// The settings, with defaults for those that the file does not contain.
 struct Settings {
   int32_t indexVersion = 0;
   bool isPhotoConvertDisabled = false;
   bool isVideoConvertDisabled = false;
 };
 
-/// Reads the settings file anew. `warning`, when not empty afterwards, tells about a value or file
-/// that could not be used; the default stands in for it.
+/// Reads the settings file. `warning` receives the reason why a default is used instead of a value
+/// or of the file, empty when there is none.
 Settings ReadSettings(std::string& warning);
 
 }  // namespace vela

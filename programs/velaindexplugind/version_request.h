@@ -1,12 +1,12 @@
-// The command line's side of setting index versions.
+// Setting index versions from the command line.
 #pragma once
 
 #include "options.h"
 
 namespace vela {
 
-/// Asks the running daemon to do what the options say about a directory's index version. Returns
-/// the exit status: 0, or 1 when it did not, which is then told on standard error.
+/// Asks the running daemon to set or remove a directory's index version, as the options say.
+/// Returns the exit status: 0 on success, otherwise 1 with a message on standard error.
 int RequestVersion(const Options& options);
 
 }  // namespace vela

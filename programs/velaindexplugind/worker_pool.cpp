@@ -1,32 +1,22 @@
 #include "worker_pool.h"
 
-#include <sys/eventfd.h>
-
 #include <algorithm>
-#include <cerrno>
 #include <exception>
 #include <iterator>
 #include <utility>
 
 namespace vela {
 
-int DoneJobs::Open() {
-  signal_ = FileDescriptor(eventfd(0, EFD_CLOEXEC | EFD_NONBLOCK));
-  return signal_.IsOpen() ? 0 : errno;
-}
-
 void DoneJobs::Add(std::list<Job>& jobs) {
   {
     const std::lock_guard<std::mutex> lock(mutex_);
     jobs_.splice(jobs_.end(), jobs);
   }
-  // Can fail only when the counter is full, and then the other side is sure to wake up.
-  eventfd_write(signal_.Get(), 1);
+  signal_.Set();
 }
 
 std::list<Job> DoneJobs::Take() {
-  eventfd_t count = 0;
-  eventfd_read(signal_.Get(), &count);
+  signal_.Clear();
   std::list<Job> jobs;
   const std::lock_guard<std::mutex> lock(mutex_);
   jobs.swap(jobs_);
@@ -36,7 +26,9 @@ std::list<Job> DoneJobs::Take() {
 WorkerPool::WorkerPool(int threads, size_t batch, Work work, DoneJobs& done)
     : batch_(batch), work_(std::move(work)), done_(done) {
   try {
-    for (int i = 0; i < threads; ++i) threads_.emplace_back(&WorkerPool::Run, this);
+    for (int i = 0; i < threads; ++i) {
+      threads_.emplace_back(&WorkerPool::Run, this);
+    }
   } catch (const std::exception&) {
     Stop();
     throw;
@@ -53,7 +45,9 @@ void WorkerPool::Stop() {
     isStopping_ = true;
   }
   change_.notify_all();
-  for (std::thread& thread : threads_) thread.join();
+  for (std::thread& thread : threads_) {
+    thread.join();
+  }
   threads_.clear();
 }
 
@@ -70,7 +64,9 @@ bool WorkerPool::Remove(uint64_t client) {
   const std::lock_guard<std::mutex> lock(mutex_);
   const auto found = std::find_if(waiting_.begin(), waiting_.end(),
                                   [client](const Job& job) { return job.client == client; });
-  if (found == waiting_.end()) return false;
+  if (found == waiting_.end()) {
+    return false;
+  }
   removed.splice(removed.end(), waiting_, found);
   return true;
 }
@@ -86,7 +82,9 @@ void WorkerPool::Run() {
   std::unique_lock<std::mutex> lock(mutex_);
   for (;;) {
     change_.wait(lock, [this] { return isStopping_ || !waiting_.empty(); });
-    if (isStopping_) return;
+    if (isStopping_) {
+      return;
+    }
     std::list<Job> jobs = TakeWaiting();
     lock.unlock();
     work_(jobs);

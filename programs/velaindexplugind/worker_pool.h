@@ -1,4 +1,4 @@
-// Threads for work that may have to wait for a disk.
+// Threads for work that may wait for a disk.
 #pragma once
 
 #include <chrono>
@@ -12,63 +12,63 @@
 #include <vector>
 
 #include "answer.h"
-#include "posix/file_descriptor.h"
+#include "posix/wake_up_signal.h"
 #include "request.h"
 #include "settings.h"
 
 namespace vela {
 
-/// One request on its way through a pool.
+/// One request in a pool.
 struct Job {
-  uint64_t client = 0;  ///< who asked
+  uint64_t client = 0;  ///< that sent the request
   Request request;
   Settings settings;
   Answer answer;
-  std::chrono::steady_clock::time_point arrival;  ///< when the request was there
+  std::chrono::steady_clock::time_point arrival;  ///< when the request was complete
 };
 
-/// Jobs that are done, handed back to the thread that gave them out. Nothing here takes memory, so
-/// that no job can get lost for the want of it.
+/// Finished jobs, returned to the thread that submitted them. Nothing here allocates memory, so
+/// that no job is lost when memory runs out.
 class DoneJobs {
  public:
   /// Returns 0 or an errno value.
-  int Open();
+  int Open() { return signal_.Open(); }
 
-  /// Readable when there are jobs to take.
-  int Fd() const { return signal_.Get(); }
+  /// Readable when there are finished jobs.
+  int Fd() const { return signal_.Fd(); }
 
-  /// Adds the jobs of the list.
+  /// Moves the jobs of the list here.
   void Add(std::list<Job>& jobs);
 
-  /// Takes all jobs that are there.
+  /// Removes and returns all finished jobs.
   std::list<Job> Take();
 
  private:
-  FileDescriptor signal_;
+  WakeUpSignal signal_;
   std::mutex mutex_;
   std::list<Job> jobs_;
 };
 
-/// A fixed number of threads that carry jobs out in the order they come in.
+/// A fixed number of threads that carry out jobs in the order of their arrival.
 class WorkerPool {
  public:
   /// Carries out the jobs of the list, which is not empty.
   using Work = std::function<void(std::list<Job>&)>;
 
-  /// Starts the threads. They inherit the caller's signal mask. A thread gives `work` what waits,
-  /// `batch` jobs at most. `work` must not throw. Throws std::system_error when a thread cannot be
-  /// started.
+  /// Starts the threads, which inherit the caller's signal mask. They call `work` with the waiting
+  /// jobs, at most `batch` at a time. `work` must not throw. Throws std::system_error when a thread
+  /// cannot be started.
   WorkerPool(int threads, size_t batch, Work work, DoneJobs& done);
 
-  /// Lets the jobs in hand come to their end; those that have not been begun are dropped.
+  /// Waits for the jobs in progress; those that have not been started are dropped.
   ~WorkerPool();
   WorkerPool(const WorkerPool&) = delete;
   WorkerPool& operator=(const WorkerPool&) = delete;
 
-  /// Adds the one job of the list.
+  /// Moves the one job of the list here.
   void Add(std::list<Job>& job);
 
-  /// Removes the job of a client. Returns false when it has been begun, or done.
+  /// Removes the job of a client. Returns false when it has been started or finished.
   bool Remove(uint64_t client);
 
  private:

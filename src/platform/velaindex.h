@@ -106,7 +106,7 @@ int VELAIndexImgResGet(const char* path, uint32_t* width, uint32_t* height);
 int VELAIDX_GetMediaResolution(const char* path, VELA_RESOLUTION* resolution);
 
 /// Reads rotation, duration and bit rate of the video `path` from its container; what the container
-/// does not state is 0. Returns 0, or -1 (record untouched) when the file is no readable video.
+/// does not state is 0. Returns 0, or -1 (record untouched) when the file is not a readable video.
 int VELAIDX_GetVideoMetadata(const char* path, _VIDEO_METADATA_* metadata);
 
 /// Returns whether browsers need a converted version of the video `path`: 0 when they play it as it
@@ -127,8 +127,8 @@ int VELAIDX_GetDirThumbSizeMap(const char* dir, int kind, int32_t* sizeMap);
 int VELAIDX_IndexConvertAdd(const VELA_MEDIA_INFO& photo, const VELA_MEDIA_INFO& thumbnail,
                             const Json::Value& extra);
 
-/// Appends `path` as one line to the queue file `queueFile`, which is made when missing. Returns 0,
-/// or -1 (unwritable file, path with a newline).
+/// Appends `path` as one line to the queue file `queueFile`, which is created when missing. Returns
+/// 0, or -1 (unwritable file, path with a newline).
 int WriteIndexQueue(const char* path, const char* queueFile);
 
 /// Sends `packet` to the Unix-domain socket at `socketPath` and replaces it by the reply object; by
@@ -137,7 +137,7 @@ int WriteIndexQueue(const char* path, const char* queueFile);
 int AutoSendRecvPacket(const char* socketPath, int unused, Json::Value& packet, int timeoutSeconds);
 
 /// Fills `out` from the daemon's media object; members that are missing, of another type or out of
-/// range become 0 or empty. Returns 0, or -1 when `media` is no object (`out` is then cleared).
+/// range become 0 or empty. Returns 0, or -1 when `media` is not an object (`out` is then cleared).
 int MediaInfoJson2Object(Json::Value& media, VELA_MEDIA_INFO& out);
 
 /// Returns 1 when a regular file (with `regularOnly` 0: anything) is at `path`, links followed.

@@ -15,15 +15,15 @@ class ConfParser {
   ConfParser(const ConfParser&) = delete;
   ConfParser& operator=(const ConfParser&) = delete;
 
-  /// Reads the file at `path`. Returns true on success; false when the file cannot be read or holds
-  /// a line that is no section, pair, comment or blank line.
+  /// Reads the file at `path`. Returns true on success; false when the file cannot be read or
+  /// contains a line that is not a section, pair, comment or blank line.
   bool loadFromFile(const std::string& path);
 
   /// Returns the section names in file order, each once.
   std::vector<std::string> enumSections() const;
 
-  /// Returns the leading base-10 integer of the key's value, held within the range of int;
-  /// `defaultValue` when the key is absent or its value begins with no number.
+  /// Returns the leading base-10 integer of the key's value, limited to the range of int;
+  /// `defaultValue` when the key is absent or its value does not begin with a number.
   int getInt(const std::string& section, const std::string& key, int defaultValue) const;
 
   /// Returns the key's value, or `defaultValue` when the key is absent.
@@ -35,7 +35,7 @@ class ConfParser {
   std::unique_ptr<Content> content_;
 };
 
-/// A child process to be started without a shell.
+/// A child process that is started without a shell.
 class ProcessRunner {
  public:
   /// Prepares `program` with its argument zero and up to eight arguments; the first null ends them.

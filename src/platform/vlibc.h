@@ -14,7 +14,7 @@ struct VLIBCTime {
   int64_t nanoseconds;  ///< 0 to 999,999,999
 };
 
-/// What is known of a file.
+/// The status of a file.
 struct VLIBCFileStatus {
   uint32_t mode;           ///< type and permission bits, as in st_mode
   int64_t size;            ///< bytes
@@ -36,9 +36,9 @@ struct VLIBCFileTimes {
 /// with an empty value), 0 when it is absent, -1 when the file cannot be read.
 int VLIBCFileGetKeyValue(const char* file, const char* key, char* out, size_t outSize, int flags);
 
-/// Sets `key` to `value` in the key/value file `file`, which is made when missing; readers see the
-/// old file or the new one. `flags` is 0. Returns 0, or -1 (unwritable file, or a key or value that
-/// one line cannot hold).
+/// Sets `key` to `value` in the key/value file `file`, which is created when missing; readers see
+/// the old file or the new one. `flags` is 0. Returns 0, or -1 (unwritable file, or a key or value
+/// that one line cannot hold).
 int VLIBCFileSetKeyValue(const char* file, const char* key, const char* value, int flags);
 
 /// Returns 1 when `key` is in the key/value file `file` with exactly `value`, else 0. `flags` is 0.
@@ -62,7 +62,7 @@ int VLIBCFileUTime(const char* path, int options, const VLIBCFileTimes* times);
 FILE* VLIBCPopen(const char* program, const char* mode, ...) __attribute__((sentinel));
 
 /// Closes a stream of VLIBCPopen, waits for its child and returns the child's exit status, or -1
-/// when the child was ended by a signal or the stream is none of VLIBCPopen's.
+/// when the child was ended by a signal or the stream was not opened by VLIBCPopen.
 int VLIBCPclose(FILE* stream);
 
 /// Sends `signal` (SIGTERM when 0) to every running process whose command name is `name`, except

@@ -10,6 +10,8 @@
 #include <stdexcept>
 
 #include "posix/file_descriptor.h"
+#include "posix/file_reading.h"
+#include "posix/files.h"
 
 namespace vela {
 
@@ -20,13 +22,12 @@ constexpr size_t kChunkSize = 16384;
 int AppendToEnd(int fd, std::string& content) {
   char chunk[kChunkSize];
   for (;;) {
-    const ssize_t got = read(fd, chunk, sizeof(chunk));
-    if (got == 0) return 0;
-    if (got > 0) {
-      content.append(chunk, static_cast<size_t>(got));
-    } else if (errno != EINTR) {
-      return errno;
+    size_t got = 0;
+    const int error = ReadChunk(fd, chunk, sizeof(chunk), got);
+    if (error != 0 || got == 0) {
+      return error;
     }
+    content.append(chunk, got);
   }
 }
 
@@ -59,8 +60,10 @@ int ReadToEnd(int fd, std::string& content) {
 }
 
 int ReadFile(const char* path, std::string& content) {
-  const FileDescriptor file(open(path, O_RDONLY | O_CLOEXEC | O_NONBLOCK | O_NOCTTY));
-  if (!file.IsOpen()) return errno;
+  const FileDescriptor file = OpenForReading(path);
+  if (!file.IsOpen()) {
+    return errno;
+  }
   return ReadToEnd(file.Get(), content);
 }
 

@@ -1,5 +1,6 @@
 #include "posix/file_version.h"
 
+#include <cerrno>
 #include <cstdint>
 #include <ctime>
 
@@ -22,11 +23,21 @@ bool IsSameVersion(const struct stat& a, const struct stat& b) {
 
 bool IsAtRest(const struct stat& file) {
   timespec now;
-  if (clock_gettime(CLOCK_REALTIME_COARSE, &now) != 0) return false;
+  if (clock_gettime(CLOCK_REALTIME_COARSE, &now) != 0) {
+    return false;
+  }
   constexpr int64_t kRestMilliseconds = 100;
   const int64_t age =
       (now.tv_sec - file.st_ctim.tv_sec) * 1000 + (now.tv_nsec - file.st_ctim.tv_nsec) / 1000000;
   return age > kRestMilliseconds;
+}
+
+int FileVersion::Read(const char* path) {
+  return stat(path, &status_) == 0 ? 0 : errno;
+}
+
+int FileVersion::Read(int fd) {
+  return fstat(fd, &status_) == 0 ? 0 : errno;
 }
 
 }  // namespace vela

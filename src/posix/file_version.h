@@ -3,6 +3,8 @@
 
 #include <sys/stat.h>
 
+#include <cstdint>
+
 namespace vela {
 
 /// Returns true when both records describe the same file in the same state.
@@ -12,5 +14,26 @@ bool IsSameVersion(const struct stat& a, const struct stat& b);
 /// timer tick, so a change within the same tick is not visible: only a file that has been at rest
 /// can be identified by its times.
 bool IsAtRest(const struct stat& file);
+
+/// One state of a file, links followed. The default is equal to no file's.
+class FileVersion {
+ public:
+  /// Reads the present version. Returns 0 or an errno value.
+  int Read(const char* path);
+  int Read(int fd);
+
+  /// Returns whether both are the same file in the same state.
+  bool operator==(const FileVersion& other) const { return IsSameVersion(status_, other.status_); }
+  bool operator!=(const FileVersion& other) const { return !(*this == other); }
+
+  bool IsRegular() const { return S_ISREG(status_.st_mode); }
+  bool IsAtRest() const { return vela::IsAtRest(status_); }
+
+  /// Bytes.
+  int64_t Size() const { return status_.st_size; }
+
+ private:
+  struct stat status_ = {};
+};
 
 }  // namespace vela

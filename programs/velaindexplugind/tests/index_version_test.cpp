@@ -40,7 +40,7 @@ TEST_F(IndexVersionTest, IsNoughtWhenTheSettingIsNoWholeNumber) {
     WriteFile(kSettings, std::string("index_version=\"") + value + "\"\n");
     IndexDaemon daemon;
     EXPECT_EQ(GetIndexVersion("/photos/a.jpg"), 0) << value;
-    EXPECT_NE(daemon.End(SIGTERM).err.find("index_version is no number"), std::string::npos);
+    EXPECT_NE(daemon.End(SIGTERM).err.find("index_version is not a number"), std::string::npos);
   }
 }
 

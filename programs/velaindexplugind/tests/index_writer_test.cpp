@@ -56,7 +56,7 @@ TEST_F(IndexWriterTest, FailsThoseThatHaveWaitedForTooLongOnly) {
   AddJob(jobs, Command::kPostPhotoConvert, "/a.jpg", {});
   IndexWriter(index_, std::chrono::minutes(1)).CarryOut(jobs);
   EXPECT_EQ(jobs.front().answer.outcome, Outcome::kFault);
-  EXPECT_THAT(jobs.front().answer.line, HasSubstr("other writers kept it for too long"));
+  EXPECT_THAT(jobs.front().answer.line, HasSubstr("other writers held it for too long"));
   EXPECT_EQ(jobs.back().answer.outcome, Outcome::kDone);
   EXPECT_EQ(Query("SELECT CAST(path AS TEXT) FROM posted"), Rows{"/a.jpg"});
 }

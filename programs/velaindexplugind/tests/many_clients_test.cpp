@@ -227,7 +227,7 @@ TEST_F(ManyClientsTest, WaitForALockedIndexTogetherAndNotOneAfterTheOther) {
   for (const Descriptor& connection : posting) {
     const Json::Value reply = ParseReply(ReceiveAll(connection));
     EXPECT_EQ(reply["success"], Json::Value(false));
-    EXPECT_EQ(reply["error"], "index database: other writers kept it for too long");
+    EXPECT_EQ(reply["error"], "index database: other writers held it for too long");
   }
   const auto took = std::chrono::steady_clock::now() - begin;
   EXPECT_GT(took, std::chrono::milliseconds(4500));

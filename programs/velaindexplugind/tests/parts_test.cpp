@@ -6,10 +6,10 @@
 #include <optional>
 #include <string>
 
-#include "index_path.h"
-#include "peer.h"
-#include "rate_limit.h"
+#include "index_store.h"
 #include "request.h"
+#include "request_handler.h"
+#include "request_log.h"
 #include "whole_number.h"
 
 using namespace vela;
@@ -58,7 +58,7 @@ TEST(ObjectionToTest, LeavesAllElseToEverybody) {
   for (const Command command :
        {Command::kGetMedia, Command::kGetIndexVersion, Command::kIsPhotoConvertDisabled,
         Command::kIsVideoConvertDisabled, Command::kPostPhotoConvert, Command::kPostVideoConvert}) {
-    EXPECT_EQ(ObjectionTo(command, ucred{1, geteuid() + 1, 5}), "") << CommandWord(command);
+    EXPECT_EQ(ObjectionTo(command, ucred{1, geteuid() + 1, 5}), "") << CommandName(command);
   }
 }
 

@@ -199,7 +199,7 @@ TEST_F(ServiceTest, SomethingElseThanASocketIsLeftAlone) {
   WriteFile(PluginDaemonSocketPath, "precious");
   ProgramResult result = RunDaemon();
   EXPECT_EQ(result.exitCode, 1);
-  EXPECT_THAT(result.err, HasSubstr("something else than a socket"));
+  EXPECT_THAT(result.err, HasSubstr("is not a socket"));
   EXPECT_EQ(ReadFile(PluginDaemonSocketPath), "precious");
   RemoveTree(PluginDaemonSocketPath);
 
@@ -207,7 +207,7 @@ TEST_F(ServiceTest, SomethingElseThanASocketIsLeftAlone) {
   ASSERT_EQ(symlink("/tmp/elsewhere", PluginDaemonSocketPath), 0);
   result = RunDaemon();
   EXPECT_EQ(result.exitCode, 1);
-  EXPECT_THAT(result.err, HasSubstr("something else than a socket"));
+  EXPECT_THAT(result.err, HasSubstr("is not a socket"));
   EXPECT_TRUE(Exists(PluginDaemonSocketPath));
 }
 

@@ -9,7 +9,9 @@ namespace vela {
 
 /// Copies `text` to `out` (at most `outSize` bytes, always terminated); what does not fit is cut.
 inline void CopyCut(std::string_view text, char* out, size_t outSize) {
-  if (out == nullptr || outSize == 0) return;
+  if (out == nullptr || outSize == 0) {
+    { return; }
+  }
   const size_t length = text.size() < outSize ? text.size() : outSize - 1;
   std::memcpy(out, text.data(), length);
   out[length] = '\0';

@@ -25,8 +25,8 @@ struct Section {
 
 constexpr size_t kFileSizeMax = 64 * 1024 * 1024;
 
-/// The parser's own dialect knows more than this format: values that go on in the next line,
-/// comments behind values, lines of limited length.
+/// By default inih also accepts values that continue in the next line and comments after values,
+/// and limits the length of lines.
 void SetDialect() {
   static std::once_flag isSet;
   std::call_once(isSet, [] {
@@ -40,22 +40,22 @@ void SetDialect() {
   });
 }
 
-/// Feeds the parser line by line. It knows no empty sections, cuts section names and takes a colon
-/// for an equals sign; so each section and key is noted here, and the parser is given a line with a
-/// short stand-in.
+/// Feeds inih line by line. Because inih ignores empty sections, truncates section names and treats
+/// a colon as an equals sign, sections and keys are stored here, and inih gets lines with short
+/// placeholders.
 class LineFeed {
  public:
   LineFeed(std::string_view text, std::vector<Section>& sections)
       : text_(text), sections_(sections) {}
 
-  /// The parser's reader, with the contract of fgets.
+  /// The reader for inih, which works like fgets.
   static char* Read(char* buffer, int size, void* feed);
 
-  /// The parser's handler.
+  /// The handler for inih.
   static int Store(void* feed, const char* section, const char* name, const char* value);
 
-  /// Returns whether no line was met that has no place in the format.
-  bool IsFaultless() const { return isFaultless_; }
+  /// Returns whether all lines so far were valid.
+  bool IsValid() const { return isValid_; }
 
  private:
   static constexpr std::string_view kByteOrderMark = "\xEF\xBB\xBF";
@@ -70,18 +70,22 @@ class LineFeed {
   std::string_view text_;
   std::vector<Section>& sections_;
   bool isFirstLine_ = true;
-  bool isFaultless_ = true;
+  bool isValid_ = true;
   std::string line_;    // prepared, with its newline
-  size_t given_ = 0;    // how much of it the parser has got
+  size_t given_ = 0;    // how much of it inih has read
   size_t section_ = 0;  // number from 1, 0 before the first
   std::string key_;
 };
 
 char* LineFeed::Read(char* buffer, int size, void* feed) {
   auto* self = static_cast<LineFeed*>(feed);
-  if (size < 2) return nullptr;
+  if (size < 2) {
+    return nullptr;
+  }
   const bool isLineGiven = self->given_ == self->line_.size();
-  if (isLineGiven && !self->PrepareLine()) return nullptr;
+  if (isLineGiven && !self->PrepareLine()) {
+    return nullptr;
+  }
   return self->Copy(buffer, static_cast<size_t>(size));
 }
 
@@ -94,10 +98,12 @@ char* LineFeed::Copy(char* buffer, size_t size) {
 }
 
 bool LineFeed::PrepareLine() {
-  if (text_.empty() || !isFaultless_) return false;
+  if (text_.empty() || !isValid_) {
+    return false;
+  }
   given_ = 0;
-  isFaultless_ = PrepareText(vela::Trimmed(TakeLine()));
-  return isFaultless_;
+  isValid_ = PrepareText(vela::Trimmed(TakeLine()));
+  return isValid_;
 }
 
 std::string_view LineFeed::TakeLine() {
@@ -105,36 +111,52 @@ std::string_view LineFeed::TakeLine() {
   std::string_view line = text_.substr(0, newline);
   text_.remove_prefix(newline == std::string_view::npos ? text_.size() : newline + 1);
   const bool hasMark = isFirstLine_ && line.substr(0, kByteOrderMark.size()) == kByteOrderMark;
-  if (hasMark) line.remove_prefix(kByteOrderMark.size());
+  if (hasMark) {
+    line.remove_prefix(kByteOrderMark.size());
+  }
   isFirstLine_ = false;
   return line;
 }
 
-/// Returns false for a line that has no place in the format.
+/// Returns false for an invalid line.
 bool LineFeed::PrepareText(std::string_view line) {
   line_ = "\n";
-  if (line.find('\0') != std::string_view::npos) return false;
-  if (line.empty() || line.front() == ';' || line.front() == '#') return true;
+  if (line.find('\0') != std::string_view::npos) {
+    return false;
+  }
+  if (line.empty() || line.front() == ';' || line.front() == '#') {
+    return true;
+  }
   return line.front() == '[' ? PrepareSection(line) : PreparePair(line);
 }
 
 bool LineFeed::PrepareSection(std::string_view line) {
-  if (line.find(']') != line.size() - 1) return false;
+  if (line.find(']') != line.size() - 1) {
+    return false;
+  }
   const std::string_view name = vela::Trimmed(line.substr(1, line.size() - 2));
-  if (name.empty()) return false;
+  if (name.empty()) {
+    return false;
+  }
   const auto known = std::find_if(sections_.begin(), sections_.end(),
                                   [&](const Section& section) { return section.name == name; });
   section_ = static_cast<size_t>(known - sections_.begin()) + 1;
-  if (known == sections_.end()) sections_.push_back({std::string(name), {}});
+  if (known == sections_.end()) {
+    sections_.push_back({std::string(name), {}});
+  }
   line_ = "[" + std::to_string(section_) + "]\n";
   return true;
 }
 
 bool LineFeed::PreparePair(std::string_view line) {
   const size_t equals = line.find('=');
-  if (equals == std::string_view::npos) return false;
+  if (equals == std::string_view::npos) {
+    return false;
+  }
   key_ = vela::Trimmed(line.substr(0, equals));
-  if (key_.empty()) return false;
+  if (key_.empty()) {
+    return false;
+  }
   line_ = "key";
   line_.append(line.substr(equals));
   line_ += '\n';
@@ -145,26 +167,34 @@ int LineFeed::Store(void* feed, const char* section, const char* /*name*/, const
   auto* self = static_cast<LineFeed*>(feed);
   size_t number = 0;
   std::from_chars(section, section + strlen(section), number);
-  if (number != 0) self->sections_[number - 1].values[self->key_] = value;
+  if (number != 0) {
+    self->sections_[number - 1].values[self->key_] = value;
+  }
   return 1;
 }
 
-/// Returns false when the text has a line that is no part of the format.
+/// Returns false when the text contains an invalid line.
 bool Parse(std::string_view text, std::vector<Section>& sections) {
   SetDialect();
   LineFeed feed(text, sections);
-  return ini_parse_stream(LineFeed::Read, &feed, LineFeed::Store, &feed) == 0 && feed.IsFaultless();
+  return ini_parse_stream(LineFeed::Read, &feed, LineFeed::Store, &feed) == 0 && feed.IsValid();
 }
 
 int ParseInt(std::string_view text, int defaultValue) {
   if (!text.empty() && text.front() == '+') {
     text.remove_prefix(1);
-    if (!text.empty() && text.front() == '-') return defaultValue;
+    if (!text.empty() && text.front() == '-') {
+      return defaultValue;
+    }
   }
   int number = 0;
   const auto [stop, error] = std::from_chars(text.data(), text.data() + text.size(), number);
-  if (error == std::errc::invalid_argument) return defaultValue;
-  if (error == std::errc::result_out_of_range) return text.front() == '-' ? INT_MIN : INT_MAX;
+  if (error == std::errc::invalid_argument) {
+    return defaultValue;
+  }
+  if (error == std::errc::result_out_of_range) {
+    return text.front() == '-' ? INT_MIN : INT_MAX;
+  }
   return number;
 }
 
@@ -181,7 +211,9 @@ const std::string* ConfParser::Content::Find(const std::string& section,
                                              const std::string& key) const {
   const auto named = std::find_if(sections.begin(), sections.end(),
                                   [&](const Section& one) { return one.name == section; });
-  if (named == sections.end()) return nullptr;
+  if (named == sections.end()) {
+    return nullptr;
+  }
   const auto value = named->values.find(key);
   return value == named->values.end() ? nullptr : &value->second;
 }
@@ -210,7 +242,9 @@ bool ConfParser::loadFromFile(const std::string& path) {
 std::vector<std::string> ConfParser::enumSections() const {
   std::vector<std::string> names;
   names.reserve(content_->sections.size());
-  for (const Section& section : content_->sections) names.push_back(section.name);
+  for (const Section& section : content_->sections) {
+    names.push_back(section.name);
+  }
   return names;
 }
 

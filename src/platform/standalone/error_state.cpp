@@ -11,7 +11,7 @@ struct LastError {
   int line = 0;
 };
 
-// Plain numbers and pointers without a constructor to run, so that a signal handler may set it too.
+// Has no constructor to run, so that a signal handler may set it too.
 thread_local LastError g_lastError;
 
 const char* BaseName(const char* path) {

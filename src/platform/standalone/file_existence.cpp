@@ -1,14 +1,20 @@
-#include <sys/stat.h>
+#include <optional>
 
 #include "platform/velaindex.h"
+#include "posix/files.h"
 
 int IsFileExist(const char* path, int regularOnly) {
-  struct stat status;
-  if (path == nullptr || stat(path, &status) != 0) return 0;
-  return regularOnly == 0 || S_ISREG(status.st_mode) ? 1 : 0;
+  if (path == nullptr) {
+    return 0;
+  }
+  const std::optional<vela::FileStatus> status = vela::ExamineFile(path);
+  return status && (regularOnly == 0 || status->isRegular) ? 1 : 0;
 }
 
 int IsDirExist(const char* path) {
-  struct stat status;
-  return path != nullptr && stat(path, &status) == 0 && S_ISDIR(status.st_mode) ? 1 : 0;
+  if (path == nullptr) {
+    return 0;
+  }
+  const std::optional<vela::FileStatus> status = vela::ExamineFile(path);
+  return status && status->isDirectory ? 1 : 0;
 }

@@ -18,23 +18,29 @@ VLIBCTime ToPlatformTime(const timespec& time) {
   return {time.tv_sec, time.tv_nsec};
 }
 
-/// The system gives meanings of their own to some nanosecond counts beyond a second; none of them
-/// may slip in from a caller's record.
+/// The system gives special meanings to some nanosecond values above a second; a caller's record
+/// must not be able to contain them.
 bool IsTime(const VLIBCTime& time) {
   return time.nanoseconds >= 0 && time.nanoseconds < kNanosecondsPerSecond;
 }
 
 timespec ToSystemTime(const VLIBCTime& time, bool isSet) {
-  if (!isSet) return {0, UTIME_OMIT};
+  if (!isSet) {
+    return {0, UTIME_OMIT};
+  }
   return {static_cast<time_t>(time.seconds), static_cast<long>(time.nanoseconds)};
 }
 
 }  // namespace
 
 int VLIBCFileStat(const char* path, int /*options*/, VLIBCFileStatus* out) {
-  if (path == nullptr || out == nullptr) return Fail(EINVAL);
+  if (path == nullptr || out == nullptr) {
+    return Fail(EINVAL);
+  }
   struct stat status;
-  if (stat(path, &status) != 0) return Fail(errno);
+  if (stat(path, &status) != 0) {
+    return Fail(errno);
+  }
   out->mode = status.st_mode;
   out->size = status.st_size;
   out->blocks = status.st_blocks;
@@ -45,11 +51,17 @@ int VLIBCFileStat(const char* path, int /*options*/, VLIBCFileStatus* out) {
 }
 
 int VLIBCFileUTime(const char* path, int options, const VLIBCFileTimes* times) {
-  if (path == nullptr || times == nullptr) return Fail(EINVAL);
+  if (path == nullptr || times == nullptr) {
+    return Fail(EINVAL);
+  }
   const bool setAccess = (options & kSetAccessTime) != 0;
   const bool setModification = (options & kSetModificationTime) != 0;
-  if (setAccess && !IsTime(times->access)) return Fail(EINVAL);
-  if (setModification && !IsTime(times->modification)) return Fail(EINVAL);
+  if (setAccess && !IsTime(times->access)) {
+    return Fail(EINVAL);
+  }
+  if (setModification && !IsTime(times->modification)) {
+    return Fail(EINVAL);
+  }
   const timespec pair[2] = {ToSystemTime(times->access, setAccess),
                             ToSystemTime(times->modification, setModification)};
   return utimensat(AT_FDCWD, path, pair, 0) == 0 ? 0 : Fail(errno);

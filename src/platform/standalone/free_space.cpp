@@ -12,7 +12,9 @@ uint64_t VLIBGetFsAvailSize(const char* path) {
   }
   struct statvfs volume;
   while (statvfs(path, &volume) != 0) {
-    if (errno == EINTR) continue;
+    if (errno == EINTR) {
+      continue;
+    }
     vela::SetLastError(errno);
     return 0;
   }

@@ -1,5 +1,3 @@
-#include <sys/stat.h>
-
 #include <algorithm>
 #include <cerrno>
 #include <cstdlib>
@@ -10,18 +8,19 @@
 #include <limits>
 #include <memory>
 #include <mutex>
+#include <optional>
 
 #include "platform/standalone/last_error.h"
-#include "platform/standalone/pixel_size.h"
 #include "platform/standalone/ppm_size.h"
 #include "platform/velaindex.h"
+#include "posix/files.h"
 
 namespace {
 
 using vela::Fail;
 using vela::PixelSize;
 
-/// The library's XMP parts are not safe to use from several threads without this.
+/// Exiv2's XMP code is not thread-safe without this.
 void LockXmp(void* mutex, bool isLock) {
   auto* xmpMutex = static_cast<std::recursive_mutex*>(mutex);
   if (isLock) {
@@ -31,30 +30,34 @@ void LockXmp(void* mutex, bool isLock) {
   }
 }
 
-void PrepareLibrary() {
-  static std::once_flag isPrepared;
+void InitializeLibrary() {
+  static std::once_flag isInitialized;
   static std::recursive_mutex xmpMutex;
-  std::call_once(isPrepared, [] {
+  std::call_once(isInitialized, [] {
     Exiv2::LogMsg::setLevel(Exiv2::LogMsg::mute);
     Exiv2::enableBMFF(true);
     Exiv2::XmpParser::initialize(LockXmp, &xmpMutex);
   });
 }
 
-/// Returns 0 or an errno value. Anything but a regular file could make the library wait.
+/// Returns 0 or an errno value. Exiv2 might wait for anything but a regular file.
 int CheckRegularFile(const char* path) {
-  struct stat status;
-  if (stat(path, &status) != 0) return errno;
-  if (S_ISDIR(status.st_mode)) return EISDIR;
-  return S_ISREG(status.st_mode) ? 0 : EINVAL;
+  const std::optional<vela::FileStatus> status = vela::ExamineFile(path);
+  if (!status) {
+    return errno;
+  }
+  if (status->isDirectory) {
+    return EISDIR;
+  }
+  return status->isRegular ? 0 : EINVAL;
 }
 
-// The library's pointers are of a kind that the language has withdrawn.
+// Exiv2 returns pointers of a type that C++17 no longer has.
 #pragma GCC diagnostic push
 #pragma GCC diagnostic ignored "-Wdeprecated-declarations"
 
-/// Returns null when the file is of no kind that the library knows. The library's other way to open
-/// files takes some paths for addresses of remote ones.
+/// Returns null when Exiv2 does not know the format. Its function that opens a path would take some
+/// paths for the addresses of remote files.
 std::unique_ptr<Exiv2::Image> OpenImage(const char* path) {
   Exiv2::BasicIo::AutoPtr file(new Exiv2::FileIo(path));
   return std::unique_ptr<Exiv2::Image>(Exiv2::ImageFactory::open(file).release());
@@ -62,7 +65,7 @@ std::unique_ptr<Exiv2::Image> OpenImage(const char* path) {
 
 #pragma GCC diagnostic pop
 
-/// The library also reads kinds that are no photos, some of them whole and at great cost.
+/// Exiv2 also reads formats other than photos, some of them completely and slowly.
 bool IsPhotoType(int imageType) {
   namespace type = Exiv2::ImageType;
   constexpr int kPhotoTypes[] = {type::jpeg, type::png, type::gif,  type::bmp, type::tiff,
@@ -73,7 +76,7 @@ bool IsPhotoType(int imageType) {
          std::end(kPhotoTypes);
 }
 
-/// A file that is damaged or cut behind its header still has the size that the header tells.
+/// A file that is damaged or truncated after its header still has the size in the header.
 void ReadHeader(Exiv2::Image& image) {
   try {
     image.readMetadata();
@@ -82,14 +85,18 @@ void ReadHeader(Exiv2::Image& image) {
   }
 }
 
-/// Returns an empty size when there is none to be read.
+/// Returns an empty size when none can be read.
 PixelSize ReadPixelSize(const char* path) {
   const std::unique_ptr<Exiv2::Image> image = OpenImage(path);
-  if (!image) return vela::ReadPpmSize(path);
-  if (!IsPhotoType(image->imageType())) return {};
+  if (!image) {
+    return vela::ReadPpmSize(path);
+  }
+  if (!IsPhotoType(image->imageType())) {
+    return {};
+  }
   ReadHeader(*image);
   const PixelSize size{image->pixelWidth(), image->pixelHeight()};
-  // The negative height of a bitmap says that its rows come from the top.
+  // A negative height means that the rows of a bitmap are stored from top to bottom.
   const bool isBitmap = image->imageType() == Exiv2::ImageType::bmp;
   return isBitmap ? PixelSize{size.width, std::abs(size.height)} : size;
 }
@@ -101,17 +108,23 @@ bool IsPixelCount(int64_t count) {
 }  // namespace
 
 int VELAIndexImgResGet(const char* path, uint32_t* width, uint32_t* height) {
-  if (path == nullptr || width == nullptr || height == nullptr) return Fail(EINVAL);
+  if (path == nullptr || width == nullptr || height == nullptr) {
+    return Fail(EINVAL);
+  }
   const int error = CheckRegularFile(path);
-  if (error != 0) return Fail(error);
+  if (error != 0) {
+    return Fail(error);
+  }
   PixelSize size;
   try {
-    PrepareLibrary();
+    InitializeLibrary();
     size = ReadPixelSize(path);
   } catch (...) {
     return Fail(EINVAL);
   }
-  if (!IsPixelCount(size.width) || !IsPixelCount(size.height)) return Fail(EINVAL);
+  if (!IsPixelCount(size.width) || !IsPixelCount(size.height)) {
+    return Fail(EINVAL);
+  }
   *width = static_cast<uint32_t>(size.width);
   *height = static_cast<uint32_t>(size.height);
   return 0;

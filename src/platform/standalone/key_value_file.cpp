@@ -24,38 +24,50 @@ struct FreeMemory {
   void operator()(char* memory) const { free(memory); }
 };
 
-/// Replaces `path` by the file that the link it names leads to. Returns 0 or an errno value.
+/// Replaces `path` by the target of the link at `path`. Returns 0 or an errno value.
 int FollowLink(std::string& path) {
   const std::unique_ptr<char, FreeMemory> target(realpath(path.c_str(), nullptr));
-  if (!target) return errno;
+  if (!target) {
+    return errno;
+  }
   path = target.get();
   return 0;
 }
 
-/// How far one attempt to set a value came.
+/// The result of one attempt to set a value.
 enum class Attempt { kDone, kAgain };
 
 int CreateWithValue(std::string& path, const char* key, const char* value, Attempt& attempt) {
   const int error = vela::CreateWhole(path, vela::WithValue("", key, value));
-  if (error != EEXIST) return error;
-  // Another process was faster, or a link leads to a file that is not there.
+  if (error != EEXIST) {
+    return error;
+  }
+  // Another process was faster, or the path is a link to a missing file.
   struct stat named;
   if (lstat(path.c_str(), &named) == 0 && S_ISLNK(named.st_mode)) {
     const int linkError = FollowLink(path);
-    if (linkError != 0) return linkError;
+    if (linkError != 0) {
+      return linkError;
+    }
   }
   attempt = Attempt::kAgain;
   return 0;
 }
 
-/// With the lock held: whether the locked file is still the one at `path`. A link there is
-/// followed by changing `path`, for it is the file behind it that has to be replaced.
+/// With the lock held, checks whether the locked file is still the one at `path`. When `path` is a
+/// link, changes it to the link's target, because that is the file to replace.
 int CheckIdentity(std::string& path, const struct stat& locked, Attempt& attempt) {
   struct stat named;
   attempt = Attempt::kAgain;
-  if (lstat(path.c_str(), &named) != 0) return errno == ENOENT ? 0 : errno;
-  if (S_ISLNK(named.st_mode)) return FollowLink(path);
-  if (vela::IsSameFile(locked, named)) attempt = Attempt::kDone;
+  if (lstat(path.c_str(), &named) != 0) {
+    return errno == ENOENT ? 0 : errno;
+  }
+  if (S_ISLNK(named.st_mode)) {
+    return FollowLink(path);
+  }
+  if (vela::IsSameFile(locked, named)) {
+    attempt = Attempt::kDone;
+  }
   return 0;
 }
 
@@ -66,17 +78,27 @@ int TrySetValue(std::string& path, const char* key, const char* value, Attempt& 
     return errno == ENOENT ? CreateWithValue(path, key, value, attempt) : errno;
   }
   int error = vela::LockExclusively(file.Get());
-  if (error != 0) return error;
+  if (error != 0) {
+    return error;
+  }
 
   struct stat locked;
-  if (fstat(file.Get(), &locked) != 0) return errno;
-  if (!S_ISREG(locked.st_mode)) return EINVAL;
+  if (fstat(file.Get(), &locked) != 0) {
+    return errno;
+  }
+  if (!S_ISREG(locked.st_mode)) {
+    return EINVAL;
+  }
   error = CheckIdentity(path, locked, attempt);
-  if (error != 0 || attempt == Attempt::kAgain) return error;
+  if (error != 0 || attempt == Attempt::kAgain) {
+    return error;
+  }
 
   std::string text;
   error = vela::ReadToEnd(file.Get(), text);
-  if (error != 0) return error;
+  if (error != 0) {
+    return error;
+  }
   return vela::ReplaceWhole(path, vela::WithValue(text, key, value), locked);
 }
 
@@ -85,24 +107,36 @@ int TrySetValue(std::string& path, const char* key, const char* value, Attempt& 
 int VLIBCFileGetKeyValue(const char* file, const char* key, char* out, size_t outSize,
                          int /*flags*/) {
   vela::CopyCut("", out, outSize);
-  if (file == nullptr || key == nullptr) return Fail(EINVAL);
+  if (file == nullptr || key == nullptr) {
+    return Fail(EINVAL);
+  }
   std::string text;
   const int error = vela::ReadFile(file, text);
-  if (error != 0) return Fail(error);
+  if (error != 0) {
+    return Fail(error);
+  }
   const auto value = vela::FindValue(text, key);
-  if (!value) return 0;
+  if (!value) {
+    return 0;
+  }
   vela::CopyCut(*value, out, outSize);
   return 1;
 }
 
 int VLIBCFileSetKeyValue(const char* file, const char* key, const char* value, int /*flags*/) {
-  if (file == nullptr || key == nullptr || value == nullptr) return Fail(EINVAL);
-  if (!vela::IsStorable(key, value)) return Fail(EINVAL);
+  if (file == nullptr || key == nullptr || value == nullptr) {
+    return Fail(EINVAL);
+  }
+  if (!vela::IsStorable(key, value)) {
+    return Fail(EINVAL);
+  }
   std::string path(file);
   Attempt attempt = Attempt::kAgain;
   while (attempt == Attempt::kAgain) {
     const int error = TrySetValue(path, key, value, attempt);
-    if (error != 0) return Fail(error);
+    if (error != 0) {
+      return Fail(error);
+    }
   }
   return 0;
 }

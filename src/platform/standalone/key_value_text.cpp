@@ -8,7 +8,7 @@ namespace {
 
 constexpr char kCommentMark = '#';
 
-/// A pair as it stands in a line; both parts without white space at their ends.
+/// A pair as written in a line; both parts without surrounding white space.
 struct WrittenPair {
   std::string_view key;
   std::string_view value;  // quotes and escapes included
@@ -16,9 +16,13 @@ struct WrittenPair {
 
 std::optional<WrittenPair> ReadPair(std::string_view line) {
   const std::string_view text = Trimmed(line);
-  if (text.empty() || text.front() == kCommentMark) return std::nullopt;
+  if (text.empty() || text.front() == kCommentMark) {
+    return std::nullopt;
+  }
   const size_t equals = text.find('=');
-  if (equals == std::string_view::npos) return std::nullopt;
+  if (equals == std::string_view::npos) {
+    return std::nullopt;
+  }
   return WrittenPair{Trimmed(text.substr(0, equals)), Trimmed(text.substr(equals + 1))};
 }
 
@@ -26,22 +30,30 @@ bool IsEscaped(char c) {
   return c == '"' || c == '\\';
 }
 
-/// Returns the text between the quotes; nothing when the closing one is missing.
+/// Returns the text between the quotes; nothing when the closing quote is missing.
 std::optional<std::string> Unquoted(std::string_view written) {
-  if (written.empty() || written.front() != '"') return std::nullopt;
+  if (written.empty() || written.front() != '"') {
+    return std::nullopt;
+  }
   std::string value;
   for (size_t i = 1; i < written.size(); ++i) {
     const char c = written[i];
-    if (c == '"') return value;
+    if (c == '"') {
+      return value;
+    }
     const bool isEscape = c == '\\' && i + 1 < written.size() && IsEscaped(written[i + 1]);
-    if (isEscape) ++i;
+    if (isEscape) {
+      ++i;
+    }
     value += written[i];
   }
   return std::nullopt;
 }
 
 std::string Decoded(std::string_view written) {
-  if (auto value = Unquoted(written)) return *value;
+  if (auto value = Unquoted(written)) {
+    return *value;
+  }
   return std::string(written);
 }
 
@@ -49,23 +61,27 @@ std::string MakeLine(std::string_view key, std::string_view value) {
   std::string line(key);
   line += "=\"";
   for (const char c : value) {
-    if (IsEscaped(c)) line += '\\';
+    if (IsEscaped(c)) {
+      line += '\\';
+    }
     line += c;
   }
   line += "\"\n";
   return line;
 }
 
-/// The place of one line in its text.
+/// The position of one line in its text.
 struct Line {
   size_t begin;
   size_t length;  // without the newline
-  size_t next;    // begin of the line behind it
+  size_t next;    // begin of the following line
 };
 
 Line LineAt(std::string_view text, size_t begin) {
   const size_t newline = text.find('\n', begin);
-  if (newline == std::string_view::npos) return {begin, text.size() - begin, text.size()};
+  if (newline == std::string_view::npos) {
+    return {begin, text.size() - begin, text.size()};
+  }
   return {begin, newline - begin, newline + 1};
 }
 
@@ -78,7 +94,9 @@ std::optional<FoundPair> FindPair(std::string_view text, std::string_view key) {
   for (size_t begin = 0; begin < text.size();) {
     const Line line = LineAt(text, begin);
     const auto pair = ReadPair(text.substr(line.begin, line.length));
-    if (pair && pair->key == key) return FoundPair{line, pair->value};
+    if (pair && pair->key == key) {
+      return FoundPair{line, pair->value};
+    }
     begin = line.next;
   }
   return std::nullopt;
@@ -88,7 +106,9 @@ std::optional<FoundPair> FindPair(std::string_view text, std::string_view key) {
 
 std::optional<std::string> FindValue(std::string_view text, std::string_view key) {
   const auto found = FindPair(text, key);
-  if (!found) return std::nullopt;
+  if (!found) {
+    return std::nullopt;
+  }
   return Decoded(found->value);
 }
 
@@ -101,14 +121,20 @@ std::string WithValue(std::string_view text, std::string_view key, std::string_v
     return result;
   }
   result.append(text);
-  if (!result.empty() && result.back() != '\n') result += '\n';
+  if (!result.empty() && result.back() != '\n') {
+    result += '\n';
+  }
   result.append(MakeLine(key, value));
   return result;
 }
 
 bool IsStorable(std::string_view key, std::string_view value) {
-  if (key.empty() || key.front() == kCommentMark || Trimmed(key) != key) return false;
-  if (key.find_first_of("=\n") != std::string_view::npos) return false;
+  if (key.empty() || key.front() == kCommentMark || Trimmed(key) != key) {
+    return false;
+  }
+  if (key.find_first_of("=\n") != std::string_view::npos) {
+    return false;
+  }
   return value.find('\n') == std::string_view::npos;
 }
 

@@ -3,11 +3,11 @@
 
 namespace vela {
 
-/// Keeps `code` (an errno value) and the caller's place in the source as the calling thread's last
-/// failure. Leaves errno as it is.
+/// Stores `code` (an errno value) and the caller's position in the source as the calling thread's
+/// last failure. Preserves errno.
 void SetLastError(int code, const char* file = __builtin_FILE(), int line = __builtin_LINE());
 
-/// The same for functions that report a failure by -1, which it returns.
+/// The same for functions that return -1 on failure: returns -1.
 int Fail(int code, const char* file = __builtin_FILE(), int line = __builtin_LINE());
 
 }  // namespace vela

@@ -1,21 +1,21 @@
 #include "platform/standalone/line_index.h"
 
-#include <unistd.h>
-
 #include <algorithm>
 #include <cerrno>
 #include <new>
 #include <string>
+
+#include "posix/file_reading.h"
 
 namespace vela {
 
 namespace {
 
 constexpr size_t kChunkSize = 65536;
-/// Bounds the memory of an index to 128 MiB.
-constexpr size_t kMostLines = size_t{8} << 20;
+/// Limits the memory of an index to 128 MiB.
+constexpr size_t kLinesMax = size_t{8} << 20;
 
-/// The 64-bit FNV-1a hash of a line that comes in pieces.
+/// The 64-bit FNV-1a hash of a line that is read in pieces.
 class LineHash {
  public:
   void Extend(std::string_view piece) {
@@ -35,25 +35,12 @@ uint64_t HashOf(std::string_view text) {
   return hash.Value();
 }
 
-/// Reads `size` bytes at `offset`, or what there is of them.
-std::string ReadAt(int fd, off_t offset, size_t size) {
-  std::string bytes(size, '\0');
-  size_t length = 0;
-  while (length < size) {
-    const ssize_t got =
-        pread(fd, &bytes[length], size - length, offset + static_cast<off_t>(length));
-    if (got < 0 && errno == EINTR) continue;
-    if (got <= 0) break;
-    length += static_cast<size_t>(got);
-  }
-  bytes.resize(length);
-  return bytes;
-}
-
 /// Returns whether the line that begins at `begin` equals the text.
-bool IsLineAt(int fd, off_t begin, std::string_view text) {
+bool IsLineAt(int fd, int64_t begin, std::string_view text) {
   const std::string bytes = ReadAt(fd, begin, text.size() + 1);
-  if (bytes.compare(0, text.size(), text) != 0) return false;
+  if (bytes.compare(0, text.size(), text) != 0) {
+    return false;
+  }
   return bytes.size() == text.size() || bytes.back() == '\n';
 }
 
@@ -62,29 +49,39 @@ bool IsLineAt(int fd, off_t begin, std::string_view text) {
 int LineIndex::Read(int fd) {
   char chunk[kChunkSize];
   LineHash hash;
-  off_t begin = 0;
-  off_t end = 0;
+  int64_t begin = 0;
+  int64_t end = 0;
   try {
     for (;;) {
-      const ssize_t got = read(fd, chunk, sizeof(chunk));
-      if (got < 0 && errno == EINTR) continue;
-      if (got < 0) return errno;
-      if (got == 0) break;
-      std::string_view piece(chunk, static_cast<size_t>(got));
+      size_t got = 0;
+      const int error = ReadChunk(fd, chunk, sizeof(chunk), got);
+      if (error != 0) {
+        return error;
+      }
+      if (got == 0) {
+        break;
+      }
+      std::string_view piece(chunk, got);
       while (!piece.empty()) {
         const size_t newline = piece.find('\n');
         const std::string_view part = piece.substr(0, newline);
         hash.Extend(part);
-        end += static_cast<off_t>(part.size());
-        if (newline == std::string_view::npos) break;
-        if (lines_.size() == kMostLines) return ENOMEM;
+        end += static_cast<int64_t>(part.size());
+        if (newline == std::string_view::npos) {
+          break;
+        }
+        if (lines_.size() == kLinesMax) {
+          return ENOMEM;
+        }
         lines_.push_back({hash.Value(), begin});
         hash = LineHash();
         begin = ++end;
         piece.remove_prefix(newline + 1);
       }
     }
-    if (end > begin) lines_.push_back({hash.Value(), begin});
+    if (end > begin) {
+      lines_.push_back({hash.Value(), begin});
+    }
     lines_.shrink_to_fit();
   } catch (const std::bad_alloc&) {
     return ENOMEM;
@@ -99,16 +96,18 @@ std::vector<LineIndex::Line>::const_iterator LineIndex::First(uint64_t hash) con
                           [](const Line& line, uint64_t wanted) { return line.hash < wanted; });
 }
 
-bool LineIndex::MayHold(std::string_view text) const {
+bool LineIndex::MayContain(std::string_view text) const {
   const uint64_t hash = HashOf(text);
   const auto line = First(hash);
   return line != lines_.end() && line->hash == hash;
 }
 
-bool LineIndex::Holds(int fd, std::string_view text) const {
+bool LineIndex::Contains(int fd, std::string_view text) const {
   const uint64_t hash = HashOf(text);
   for (auto line = First(hash); line != lines_.end() && line->hash == hash; ++line) {
-    if (IsLineAt(fd, line->begin, text)) return true;
+    if (IsLineAt(fd, line->begin, text)) {
+      return true;
+    }
   }
   return false;
 }

@@ -1,7 +1,5 @@
-// Where the lines of a large file are, so that it is read once and not for each question.
+// The positions of the lines of a large file, so that it is read once and not for every search.
 #pragma once
-
-#include <sys/stat.h>
 
 #include <cstdint>
 #include <string_view>
@@ -12,26 +10,26 @@ namespace vela {
 /// The lines of one version of a file.
 class LineIndex {
  public:
-  /// Reads the open file `fd` from its present position, the begin. Returns 0 or an errno value;
-  /// ENOMEM for a file of too many lines.
+  /// Reads the open file `fd`, whose position is its beginning. Returns 0 or an errno value, ENOMEM
+  /// for a file with too many lines.
   int Read(int fd);
 
-  /// Returns whether a line of the text's hash exists; without one no line equals the text.
-  bool MayHold(std::string_view text) const;
+  /// Returns whether a line has the hash of the text. If not, no line equals the text.
+  bool MayContain(std::string_view text) const;
 
   /// Returns whether a line of the open file `fd`, which must be the version that was read, equals
   /// the text.
-  bool Holds(int fd, std::string_view text) const;
+  bool Contains(int fd, std::string_view text) const;
 
  private:
   struct Line {
     uint64_t hash;
-    off_t begin;
+    int64_t begin;
   };
 
   std::vector<Line>::const_iterator First(uint64_t hash) const;
 
-  std::vector<Line> lines_;  // by hash
+  std::vector<Line> lines_;  // sorted by hash
 };
 
 }  // namespace vela

@@ -1,7 +1,5 @@
 #include "platform/standalone/line_index_cache.h"
 
-#include <fcntl.h>
-
 #include <array>
 #include <cerrno>
 #include <mutex>
@@ -9,59 +7,70 @@
 
 #include "platform/standalone/line_index.h"
 #include "posix/file_descriptor.h"
+#include "posix/file_reading.h"
 #include "posix/file_version.h"
+#include "posix/files.h"
 
 namespace vela {
 
 namespace {
 
-/// Smaller files are read as fast as they are looked up.
-constexpr off_t kSmallestIndexedFile = 65536;
+/// Smaller files are searched without an index as fast as with one.
+constexpr int64_t kSmallestIndexedFile = 65536;
 
 struct IndexedFile {
   std::string path;
-  struct stat version = {};
+  FileVersion version;
   LineIndex index;
-  bool isTooLong = false;  // for an index; known, so that it is not tried again
+  bool isTooLong = false;  // too many lines for an index; another attempt would be in vain
 };
 
-/// Holds an index for each of the few files that one process asks about, the oldest giving way.
+/// A process searches only a few files. The oldest index is replaced when there are more.
 class LineIndexCache {
  public:
   std::optional<bool> Find(const char* path, std::string_view text);
-  bool IsTooLong(const char* path, const struct stat& now);
+  bool IsTooLong(const char* path, const FileVersion& now);
   void Add(IndexedFile&& file);
 
  private:
-  const IndexedFile* Current(const char* path, const struct stat& now) const;
+  const IndexedFile* Current(const char* path, const FileVersion& now) const;
 
   std::mutex mutex_;
   std::array<IndexedFile, 4> files_;
   size_t next_ = 0;
 };
 
-const IndexedFile* LineIndexCache::Current(const char* path, const struct stat& now) const {
+const IndexedFile* LineIndexCache::Current(const char* path, const FileVersion& now) const {
   for (const IndexedFile& file : files_) {
-    if (file.path == path && IsSameVersion(file.version, now)) return &file;
+    if (file.path == path && file.version == now) {
+      return &file;
+    }
   }
   return nullptr;
 }
 
 std::optional<bool> LineIndexCache::Find(const char* path, std::string_view text) {
-  struct stat now;
-  if (stat(path, &now) != 0 || now.st_size < kSmallestIndexedFile) return std::nullopt;
+  FileVersion now;
+  if (now.Read(path) != 0 || now.Size() < kSmallestIndexedFile) {
+    return std::nullopt;
+  }
   const std::lock_guard<std::mutex> lock(mutex_);
   const IndexedFile* file = Current(path, now);
-  if (file == nullptr || file->isTooLong) return std::nullopt;
-  if (!file->index.MayHold(text)) return false;
-
-  const FileDescriptor fd(open(path, O_RDONLY | O_CLOEXEC | O_NONBLOCK | O_NOCTTY));
-  if (!fd.IsOpen() || fstat(fd.Get(), &now) != 0 || !IsSameVersion(file->version, now))
+  if (file == nullptr || file->isTooLong) {
     return std::nullopt;
-  return file->index.Holds(fd.Get(), text);
+  }
+  if (!file->index.MayContain(text)) {
+    return false;
+  }
+
+  const FileDescriptor fd = OpenForReading(path);
+  if (!fd.IsOpen() || now.Read(fd.Get()) != 0 || now != file->version) {
+    return std::nullopt;
+  }
+  return file->index.Contains(fd.Get(), text);
 }
 
-bool LineIndexCache::IsTooLong(const char* path, const struct stat& now) {
+bool LineIndexCache::IsTooLong(const char* path, const FileVersion& now) {
   const std::lock_guard<std::mutex> lock(mutex_);
   const IndexedFile* file = Current(path, now);
   return file != nullptr && file->isTooLong;
@@ -92,13 +101,23 @@ std::optional<bool> FindLineInIndex(const char* path, std::string_view text) {
 
 void IndexLines(const char* path, int fd) {
   IndexedFile file;
-  if (fstat(fd, &file.version) != 0 || !S_ISREG(file.version.st_mode)) return;
-  if (file.version.st_size < kSmallestIndexedFile || !IsAtRest(file.version)) return;
-  if (Cache().IsTooLong(path, file.version) || lseek(fd, 0, SEEK_SET) != 0) return;
+  if (file.version.Read(fd) != 0 || !file.version.IsRegular()) {
+    return;
+  }
+  if (file.version.Size() < kSmallestIndexedFile || !file.version.IsAtRest()) {
+    return;
+  }
+  if (Cache().IsTooLong(path, file.version) || Rewind(fd) != 0) {
+    return;
+  }
   const int error = file.index.Read(fd);
-  if (error != 0 && error != ENOMEM) return;
+  if (error != 0 && error != ENOMEM) {
+    return;
+  }
   file.isTooLong = error == ENOMEM;
-  if (file.isTooLong) file.index = LineIndex();
+  if (file.isTooLong) {
+    file.index = LineIndex();
+  }
   file.path = path;
   Cache().Add(std::move(file));
 }

@@ -1,4 +1,4 @@
-// The indexes of the files that were searched last.
+// Line indexes of the files that were searched most recently.
 #pragma once
 
 #include <optional>
@@ -6,12 +6,13 @@
 
 namespace vela {
 
-/// Tells from the index of the file `path` whether a line of it equals the text. Returns nothing
-/// when there is no index of the file's present version. Callable from any thread.
+/// Looks up in the index of the file `path` whether a line equals the text. Returns nothing when
+/// there is no index of the file's present version. Thread-safe.
 std::optional<bool> FindLineInIndex(const char* path, std::string_view text);
 
-/// Makes the index of the open file `fd`, found at `path`, when it is large and at rest: reading it
-/// is then worth remembering. Moves the read position; a failure leaves no index.
+/// Creates the index of the open file `fd`, whose path is `path`, when the file is large and at
+/// rest, so that an index is worth its memory. Changes the read position. Without success there is
+/// no index.
 void IndexLines(const char* path, int fd);
 
 }  // namespace vela

@@ -1,6 +1,3 @@
-#include <fcntl.h>
-#include <unistd.h>
-
 #include <cerrno>
 #include <climits>
 #include <cstring>
@@ -11,6 +8,8 @@
 #include "platform/standalone/line_index_cache.h"
 #include "platform/vlibc.h"
 #include "posix/file_descriptor.h"
+#include "posix/file_reading.h"
+#include "posix/files.h"
 
 namespace {
 
@@ -18,15 +17,15 @@ using vela::Fail;
 
 constexpr size_t kChunkSize = 65536;
 
-/// Compares the lines of a file, which comes in pieces, with one text.
+/// Compares the lines of a file, which is read in pieces, with one text.
 class LineMatcher {
  public:
   explicit LineMatcher(std::string_view wanted) : wanted_(wanted) {}
 
-  /// Takes the next piece; returns true once a line has ended that equals the text.
+  /// Takes the next piece. Returns true when a line that equals the text has ended.
   bool Feed(std::string_view piece);
 
-  /// Returns whether the last line, which no newline ends, equals the text.
+  /// Returns whether the last line, which has no newline, equals the text.
   bool IsLastLineEqual() const { return isLineOpen_ && IsEqual(); }
 
  private:
@@ -43,8 +42,12 @@ bool LineMatcher::Feed(std::string_view piece) {
   while (!piece.empty()) {
     const size_t newline = piece.find('\n');
     Extend(piece.substr(0, newline));
-    if (newline == std::string_view::npos) return false;
-    if (IsEqual()) return true;
+    if (newline == std::string_view::npos) {
+      return false;
+    }
+    if (IsEqual()) {
+      return true;
+    }
     matched_ = 0;
     isDifferent_ = false;
     isLineOpen_ = false;
@@ -55,7 +58,9 @@ bool LineMatcher::Feed(std::string_view piece) {
 
 void LineMatcher::Extend(std::string_view part) {
   isLineOpen_ = true;
-  if (isDifferent_) return;
+  if (isDifferent_) {
+    return;
+  }
   if (wanted_.substr(matched_, part.size()) != part) {
     isDifferent_ = true;
     return;
@@ -68,25 +73,34 @@ int FindLine(int fd, std::string_view wanted, bool& isFound) {
   char chunk[kChunkSize];
   LineMatcher matcher(wanted);
   for (;;) {
-    const ssize_t got = read(fd, chunk, sizeof(chunk));
-    if (got < 0 && errno == EINTR) continue;
-    if (got < 0) return errno;
-    if (got == 0) break;
-    isFound = matcher.Feed({chunk, static_cast<size_t>(got)});
-    if (isFound) return 0;
+    size_t got = 0;
+    const int error = vela::ReadChunk(fd, chunk, sizeof(chunk), got);
+    if (error != 0) {
+      return error;
+    }
+    if (got == 0) {
+      break;
+    }
+    isFound = matcher.Feed({chunk, got});
+    if (isFound) {
+      return 0;
+    }
   }
   isFound = matcher.IsLastLineEqual();
   return 0;
 }
 
-/// Searches the open file `fd`, found at `path`. Sets `isFound`. Returns 0 or an errno value.
-int FindLineInFile(const char* path, int fd, std::string_view wanted, bool& isFound) {
+/// Searches the open file `fd`, whose path is `path`. Sets `isFound`. Returns 0 or an errno value.
+int SearchOpenFile(const char* path, int fd, std::string_view wanted, bool& isFound) {
   vela::IndexLines(path, fd);
   if (const auto known = vela::FindLineInIndex(path, wanted)) {
     isFound = *known;
     return 0;
   }
-  if (lseek(fd, 0, SEEK_SET) < 0 && errno != ESPIPE) return errno;
+  const int error = vela::Rewind(fd);
+  if (error != 0 && error != ESPIPE) {
+    return error;
+  }
   return FindLine(fd, wanted, isFound);
 }
 
@@ -95,23 +109,33 @@ int SearchFile(const char* path, std::string_view wanted, bool& isFound) {
     isFound = *known;
     return 0;
   }
-  const vela::FileDescriptor fd(open(path, O_RDONLY | O_CLOEXEC | O_NONBLOCK | O_NOCTTY));
-  if (!fd.IsOpen()) return errno;
-  return FindLineInFile(path, fd.Get(), wanted, isFound);
+  const vela::FileDescriptor fd = vela::OpenForReading(path);
+  if (!fd.IsOpen()) {
+    return errno;
+  }
+  return SearchOpenFile(path, fd.Get(), wanted, isFound);
 }
 
 }  // namespace
 
 int VLIBCFileGetLine(const char* file, const char* text, char* out, size_t outSize, int /*flags*/) {
   vela::CopyCut("", out, outSize);
-  if (file == nullptr || text == nullptr) return Fail(EINVAL);
+  if (file == nullptr || text == nullptr) {
+    return Fail(EINVAL);
+  }
   const std::string_view wanted(text);
-  if (wanted.size() > INT_MAX) return Fail(EOVERFLOW);
+  if (wanted.size() > INT_MAX) {
+    return Fail(EOVERFLOW);
+  }
 
   bool isFound = false;
   const int error = SearchFile(file, wanted, isFound);
-  if (error != 0) return Fail(error);
-  if (!isFound) return 0;
+  if (error != 0) {
+    return Fail(error);
+  }
+  if (!isFound) {
+    return 0;
+  }
   vela::CopyCut(wanted, out, outSize);
   return static_cast<int>(wanted.size());
 }

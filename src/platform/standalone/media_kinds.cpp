@@ -37,8 +37,12 @@ constexpr size_t kLongestExtension = 4;
 template <size_t N>
 constexpr bool IsSortedTable(const std::array<Extension, N>& table) {
   for (size_t i = 0; i < N; ++i) {
-    if (table[i].empty() || table[i].size() > kLongestExtension) return false;
-    if (i > 0 && !(table[i - 1] < table[i])) return false;
+    if (table[i].empty() || table[i].size() > kLongestExtension) {
+      return false;
+    }
+    if (i > 0 && !(table[i - 1] < table[i])) {
+      return false;
+    }
   }
   return true;
 }
@@ -55,12 +59,18 @@ constexpr char ToLower(char c) {
 /// Returns whether `extension` is in the table, in any case of its ASCII letters.
 template <size_t N>
 bool IsIn(const std::array<Extension, N>& table, std::string_view extension) {
-  if (extension.size() > kLongestExtension) return false;
+  if (extension.size() > kLongestExtension) {
+    return false;
+  }
   char lower[kLongestExtension];
-  for (size_t i = 0; i < extension.size(); ++i) lower[i] = ToLower(extension[i]);
+  for (size_t i = 0; i < extension.size(); ++i) {
+    lower[i] = ToLower(extension[i]);
+  }
   const std::string_view wanted(lower, extension.size());
   for (const Extension known : table) {
-    if (known == wanted) return true;
+    if (known == wanted) {
+      return true;
+    }
   }
   return false;
 }
@@ -96,8 +106,12 @@ bool BlVELAIndexIsVideoOnWebFile(const char* path) {
 }
 
 int EntryNameShouldIndex(const char* name) {
-  if (name == nullptr) return 0;
+  if (name == nullptr) {
+    return 0;
+  }
   const std::string_view text(name);
-  if (text.empty() || text == "lost+found") return 0;
+  if (text.empty() || text == "lost+found") {
+    return 0;
+  }
   return text.front() == '.' || text.front() == '@' || text.front() == '#' ? 0 : 1;
 }

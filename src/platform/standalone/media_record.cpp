@@ -9,10 +9,14 @@ namespace {
 void ReadPath(const Json::Value& value, char* out, size_t outSize) {
   const char* begin = nullptr;
   const char* end = nullptr;
-  if (!value.isString() || !value.getString(&begin, &end)) return;
+  if (!value.isString() || !value.getString(&begin, &end)) {
+    return;
+  }
   const auto length = static_cast<size_t>(end - begin);
   const bool isPath = length < outSize && memchr(begin, '\0', length) == nullptr;
-  if (isPath) memcpy(out, begin, length);
+  if (isPath) {
+    memcpy(out, begin, length);
+  }
 }
 
 int32_t ReadInt32(const Json::Value& value) {
@@ -31,7 +35,9 @@ int64_t ReadInt64(const Json::Value& value) {
 
 int MediaInfoJson2Object(Json::Value& media, VELA_MEDIA_INFO& out) {
   memset(&out, 0, sizeof(out));
-  if (!media.isObject()) return -1;
+  if (!media.isObject()) {
+    return -1;
+  }
   const Json::Value& members = media;
   ReadPath(members["path"], out.path, sizeof(out.path));
   out.type = ReadInt32(members["type"]);

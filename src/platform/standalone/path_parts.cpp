@@ -8,7 +8,9 @@ namespace VELAUtils {
 
 std::string GetPathDirName(const std::string& path) {
   const size_t slash = path.rfind('/');
-  if (slash == std::string::npos) return ".";
+  if (slash == std::string::npos) {
+    return ".";
+  }
   const size_t last = path.find_last_not_of('/', slash);
   return last == std::string::npos ? "/" : path.substr(0, last + 1);
 }
@@ -20,7 +22,9 @@ std::string GetPathExt(const std::string& path) {
 }  // namespace VELAUtils
 
 const char* VELAIndexExtGet(const char* path) {
-  if (path == nullptr) return "";
+  if (path == nullptr) {
+    return "";
+  }
   // The extension ends where the path ends, so its text is terminated as well.
   return vela::ExtensionOf(path).data();
 }

@@ -1,4 +1,4 @@
-// Taking paths apart.
+// The parts of paths.
 #pragma once
 
 #include <string_view>
@@ -11,8 +11,8 @@ constexpr std::string_view LastComponentOf(std::string_view path) {
   return slash == std::string_view::npos ? path : path.substr(slash + 1);
 }
 
-/// Returns what follows the last dot of the last component, an empty end of `path` when there is no
-/// dot in it.
+/// Returns what follows the last dot of the last component; without a dot, an empty text at the end
+/// of `path`.
 constexpr std::string_view ExtensionOf(std::string_view path) {
   const std::string_view name = LastComponentOf(path);
   const size_t dot = name.rfind('.');
@@ -23,8 +23,16 @@ constexpr std::string_view ExtensionOf(std::string_view path) {
 constexpr bool HasComponent(std::string_view path, std::string_view component) {
   for (;;) {
     const size_t slash = path.find('/');
-    if (path.substr(0, slash) == component) return true;
-    if (slash == std::string_view::npos) return false;
+    if (path.substr(0, slash) == component) {
+      {
+        { return true; }
+      }
+    }
+    if (slash == std::string_view::npos) {
+      {
+        { return false; }
+      }
+    }
     path.remove_prefix(slash + 1);
   }
 }

@@ -23,7 +23,7 @@ namespace {
 using vela::ChildWatchdog;
 using vela::FileDescriptor;
 
-/// A child with the stream that its output comes through.
+/// A child and the stream of its output.
 struct PipedChild {
   FILE* stream = nullptr;
   pid_t pid = -1;
@@ -38,12 +38,14 @@ class PipedChildren {
     children_.push_back(std::move(child));
   }
 
-  /// Hands out the child of `stream`; one without a stream when it has none.
+  /// Removes and returns the child of `stream`; one without a stream when there is none.
   PipedChild Take(const FILE* stream) {
     const std::lock_guard<std::mutex> lock(mutex_);
     const auto found = std::find_if(children_.begin(), children_.end(),
                                     [&](const auto& child) { return child.stream == stream; });
-    if (found == children_.end()) return {};
+    if (found == children_.end()) {
+      return {};
+    }
     PipedChild child = std::move(*found);
     children_.erase(found);
     return child;
@@ -54,14 +56,14 @@ class PipedChildren {
   std::vector<PipedChild> children_;
 };
 
-/// Lives until the process is gone: a stream may still be open when the program ends.
+/// Never destroyed, because a stream may still be open when the program ends.
 PipedChildren& OpenChildren() {
   static auto* children = new PipedChildren;
   return *children;
 }
 
-/// Ends a child that cannot be handed out.
-void Abandon(PipedChild& child) {
+/// Kills a child that the caller does not get.
+void Discard(PipedChild& child) {
   kill(child.pid, SIGKILL);
   vela::ReapChild(child.pid);
 }
@@ -69,7 +71,9 @@ void Abandon(PipedChild& child) {
 /// Returns 0 or an errno value.
 int Watch(PipedChild& child, const char* program) {
   const std::chrono::seconds limit = vela::CurrentSettings().toolTimeout;
-  if (limit.count() == 0) return 0;
+  if (limit.count() == 0) {
+    return 0;
+  }
   child.watchdog = std::make_unique<ChildWatchdog>();
   return child.watchdog->Start(child.pid, program, limit) ? 0 : EAGAIN;
 }
@@ -77,22 +81,28 @@ int Watch(PipedChild& child, const char* program) {
 /// Starts the program with its output in a pipe. Returns 0 or an errno value.
 int Open(const char* program, std::vector<char*>& arguments, bool joinError, PipedChild& child) {
   int ends[2];
-  if (pipe2(ends, O_CLOEXEC) != 0) return errno;
+  if (pipe2(ends, O_CLOEXEC) != 0) {
+    return errno;
+  }
   FileDescriptor readEnd(ends[0]);
   FileDescriptor writeEnd(ends[1]);
   const vela::ChildStreams streams{writeEnd.Get(), joinError ? writeEnd.Get() : -1};
   int error = vela::StartChild(program, arguments.data(), streams, child.pid);
-  if (error != 0) return error;
+  if (error != 0) {
+    return error;
+  }
   writeEnd.Reset();
 
   error = Watch(child, program);
   if (error == 0) {
     child.stream = fdopen(readEnd.Get(), "r");
-    if (child.stream == nullptr) error = errno;
+    if (child.stream == nullptr) {
+      error = errno;
+    }
   }
   if (error != 0) {
     child.watchdog.reset();
-    Abandon(child);
+    Discard(child);
     return error;
   }
   readEnd.Release();
@@ -109,7 +119,9 @@ FILE* VLIBCPopen(const char* program, const char* mode, ...) {
   std::vector<char*> arguments{const_cast<char*>(program)};
   va_list list;
   va_start(list, mode);
-  while (char* argument = va_arg(list, char*)) arguments.push_back(argument);
+  while (char* argument = va_arg(list, char*)) {
+    arguments.push_back(argument);
+  }
   va_end(list);
   arguments.push_back(nullptr);
 
@@ -127,13 +139,19 @@ FILE* VLIBCPopen(const char* program, const char* mode, ...) {
 
 int VLIBCPclose(FILE* stream) {
   const PipedChild child = OpenChildren().Take(stream);
-  if (stream == nullptr || child.stream == nullptr) return vela::Fail(EINVAL);
-  // A child that still writes learns from the closed pipe that nobody listens. One that does not
-  // care goes on to its own end or its time limit.
+  if (stream == nullptr || child.stream == nullptr) {
+    return vela::Fail(EINVAL);
+  }
+  // A child that is still writing gets SIGPIPE. One that ignores it runs to its end or its time
+  // limit.
   fclose(stream);
   vela::AwaitChild(child.pid);
-  if (child.watchdog) child.watchdog->Stop();
+  if (child.watchdog) {
+    child.watchdog->Stop();
+  }
   const int status = vela::ReapChild(child.pid);
-  if (status == -1) return vela::Fail(ECHILD);
+  if (status == -1) {
+    return vela::Fail(ECHILD);
+  }
   return WIFEXITED(status) ? WEXITSTATUS(status) : vela::Fail(EINTR);
 }

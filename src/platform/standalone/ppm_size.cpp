@@ -17,19 +17,19 @@ struct CloseFile {
   void operator()(FILE* file) const { fclose(file); }
 };
 
-/// The library also reads related formats, and keeps memory of some that are damaged.
+/// Netpbm also reads related formats, and leaks memory when some of them are damaged.
 bool IsBinaryPixmap(FILE* file) {
   char magic[2] = "";
-  const bool isOne =
+  const bool isPixmap =
       fread(magic, 1, sizeof(magic), file) == sizeof(magic) && magic[0] == 'P' && magic[1] == '6';
   rewind(file);
-  return isOne;
+  return isPixmap;
 }
 
-void DropMessage(const char* /*text*/) {}
+void IgnoreMessage(const char* /*text*/) {}
 
-/// The library ends the process on any error unless it is given a place to jump to. Nothing that
-/// would have to be cleaned up may live between the two.
+/// Netpbm ends the process on any error unless it has a jmp_buf to jump to. No object with a
+/// destructor may exist between here and there.
 bool ReadHeader(FILE* file, int& width, int& height) {
   jmp_buf onError;
   if (setjmp(onError) != 0) {
@@ -47,17 +47,21 @@ bool ReadHeader(FILE* file, int& width, int& height) {
 }  // namespace
 
 PixelSize ReadPpmSize(const char* path) {
-  // The library keeps its settings for the whole process.
+  // The settings of Netpbm are global.
   static std::mutex mutex;
   const std::lock_guard<std::mutex> lock(mutex);
   const std::unique_ptr<FILE, CloseFile> file(fopen(path, "rbe"));
-  if (!file || !IsBinaryPixmap(file.get())) return {};
+  if (!file || !IsBinaryPixmap(file.get())) {
+    return {};
+  }
   pm_init("velathumb", 0);
-  pm_setusermessagefn(DropMessage);
-  pm_setusererrormsgfn(DropMessage);
+  pm_setusermessagefn(IgnoreMessage);
+  pm_setusererrormsgfn(IgnoreMessage);
   int width = 0;
   int height = 0;
-  if (!ReadHeader(file.get(), width, height)) return {};
+  if (!ReadHeader(file.get(), width, height)) {
+    return {};
+  }
   return {width, height};
 }
 

@@ -1,11 +1,17 @@
-// Pixel size of a portable pixmap, the form in which raw photos are decoded whole.
+// Pixel size of a portable pixmap, the format of fully decoded raw photos.
 #pragma once
 
-#include "platform/standalone/pixel_size.h"
+#include <cstdint>
 
 namespace vela {
 
-/// Reads the header of the file at `path`; an empty size when it is no portable pixmap.
+/// A size in pixels, as stored; zero or less when there is none.
+struct PixelSize {
+  int64_t width = 0;
+  int64_t height = 0;
+};
+
+/// Reads the header of the file at `path`; returns an empty size when it is not a portable pixmap.
 PixelSize ReadPpmSize(const char* path);
 
 }  // namespace vela

@@ -27,33 +27,44 @@ using Arguments = std::vector<std::string>;
 
 void Append(Arguments& arguments, std::initializer_list<const char*> more) {
   for (const char* argument : more) {
-    if (argument == nullptr) return;
+    if (argument == nullptr) {
+      return;
+    }
     arguments.emplace_back(argument);
   }
 }
 
-/// Returns pointers into `program` and `arguments` as exec takes them; argument zero is the program
-/// when there is none.
+/// Returns pointers into `program` and `arguments` for exec; the program is argument zero when
+/// there are no arguments.
 std::vector<char*> MakeVector(std::string& program, Arguments& arguments) {
   std::vector<char*> pointers;
   pointers.reserve(arguments.size() + 2);
-  if (arguments.empty()) pointers.push_back(program.data());
-  for (std::string& argument : arguments) pointers.push_back(argument.data());
+  if (arguments.empty()) {
+    pointers.push_back(program.data());
+  }
+  for (std::string& argument : arguments) {
+    pointers.push_back(argument.data());
+  }
   pointers.push_back(nullptr);
   return pointers;
 }
 
 vela::ChildStreams StreamsFor(bool keepOutput) {
-  if (!keepOutput) return {};
+  if (!keepOutput) {
+    return {};
+  }
   return {STDOUT_FILENO, STDERR_FILENO};
 }
 
 int ResultOf(int status) {
-  if (status == -1) return kStatusUnknown;
+  if (status == -1) {
+    return kStatusUnknown;
+  }
   return WIFEXITED(status) ? WEXITSTATUS(status) : kEndedBySignal + WTERMSIG(status);
 }
 
-/// Waits for the child's end, within the time limit of all tools, and returns the run's result.
+/// Waits for the child's end, at most for the time limit of tools, and returns the result of the
+/// run.
 int Finish(pid_t pid, const std::string& program) {
   const std::chrono::seconds limit = vela::CurrentSettings().toolTimeout;
   if (limit.count() != 0 && !vela::AwaitChildFor(pid, limit)) {
@@ -62,24 +73,27 @@ int Finish(pid_t pid, const std::string& program) {
   return ResultOf(vela::ReapChild(pid));
 }
 
-/// A run that nobody waits for: a thread does, so that the limit holds and no zombie stays. It also
-/// starts the child, which gets a signal when the thread that started it ends.
-void RunUnattended(std::string program, Arguments arguments, bool keepOutput,
-                   std::promise<int> started) {
+/// Runs the program in a thread of its own, which enforces the time limit and reaps the child. The
+/// thread also starts the child, because the child gets a signal when the thread that started it
+/// ends.
+void RunInThread(std::string program, Arguments arguments, bool keepOutput,
+                 std::promise<int> started) {
   pid_t pid = -1;
   const int error = vela::StartChild(program.c_str(), MakeVector(program, arguments).data(),
                                      StreamsFor(keepOutput), pid);
   started.set_value(error);
-  if (error == 0) Finish(pid, program);
+  if (error == 0) {
+    Finish(pid, program);
+  }
 }
 
 /// Returns 0 or an errno value.
-int StartUnattended(const std::string& program, const Arguments& arguments, bool keepOutput) {
+int StartInBackground(const std::string& program, const Arguments& arguments, bool keepOutput) {
   const vela::SignalBlock noSignals;
   try {
     std::promise<int> started;
     std::future<int> result = started.get_future();
-    std::thread(RunUnattended, program, arguments, keepOutput, std::move(started)).detach();
+    std::thread(RunInThread, program, arguments, keepOutput, std::move(started)).detach();
     return result.get();
   } catch (const std::system_error&) {
     return EAGAIN;
@@ -106,7 +120,7 @@ int ProcessRunner::run(bool wait, bool keepOutput) {
   const int error =
       wait ? vela::StartChild(program_.c_str(), MakeVector(program_, arguments_).data(),
                               StreamsFor(keepOutput), pid)
-           : StartUnattended(program_, arguments_, keepOutput);
+           : StartInBackground(program_, arguments_, keepOutput);
   if (error != 0) {
     vela::SetLastError(error);
     return kNotStarted;

@@ -20,20 +20,30 @@ using vela::FileDescriptor;
 constexpr mode_t kQueueMode = 0644;
 constexpr int kFlags = O_RDWR | O_APPEND | O_CLOEXEC | O_NONBLOCK | O_NOCTTY;
 
-/// Opens the queue file, which is made when missing, with its mode whatever the process's mask.
-/// Returns 0 or an errno value.
+/// Opens the queue file. Creates it when it is missing, with its mode whatever the umask. Returns 0
+/// or an errno value.
 int OpenQueue(const char* path, FileDescriptor& file) {
   for (;;) {
     file.Reset(open(path, kFlags));
-    if (file.IsOpen()) return 0;
-    if (errno != ENOENT) return errno;
+    if (file.IsOpen()) {
+      return 0;
+    }
+    if (errno != ENOENT) {
+      return errno;
+    }
     file.Reset(open(path, kFlags | O_CREAT | O_EXCL, kQueueMode));
-    if (file.IsOpen()) return fchmod(file.Get(), kQueueMode) == 0 ? 0 : errno;
-    if (errno != EEXIST) return errno;
-    // A link that leads nowhere stays as it is. Else made by another writer just now, and it may be
-    // renamed away again as soon.
+    if (file.IsOpen()) {
+      return fchmod(file.Get(), kQueueMode) == 0 ? 0 : errno;
+    }
+    if (errno != EEXIST) {
+      return errno;
+    }
+    // The path is a link without a target, which is left alone, or another writer has just created
+    // the file, which may be renamed again at any time.
     struct stat status;
-    if (lstat(path, &status) == 0 && S_ISLNK(status.st_mode)) return ENOENT;
+    if (lstat(path, &status) == 0 && S_ISLNK(status.st_mode)) {
+      return ENOENT;
+    }
   }
 }
 
@@ -43,53 +53,75 @@ struct Queue {
   struct stat status;
 };
 
-/// Returns 0 or an errno value. Sets `isCurrent` unless the file was renamed away or removed before
-/// the lock was had, as whoever works the queue off does.
+/// Returns 0 or an errno value. Sets `isCurrent` unless the file was renamed or removed before it
+/// was locked, which the program that processes the queue does.
 int LockQueue(const char* path, Queue& queue, bool& isCurrent) {
   int error = OpenQueue(path, queue.file);
-  if (error != 0) return error;
+  if (error != 0) {
+    return error;
+  }
   error = vela::LockExclusively(queue.file.Get());
-  if (error != 0) return error;
-  if (fstat(queue.file.Get(), &queue.status) != 0) return errno;
-  if (!S_ISREG(queue.status.st_mode)) return EINVAL;
+  if (error != 0) {
+    return error;
+  }
+  if (fstat(queue.file.Get(), &queue.status) != 0) {
+    return errno;
+  }
+  if (!S_ISREG(queue.status.st_mode)) {
+    return EINVAL;
+  }
   struct stat named;
-  if (stat(path, &named) != 0) return errno == ENOENT ? 0 : errno;
+  if (stat(path, &named) != 0) {
+    return errno == ENOENT ? 0 : errno;
+  }
   isCurrent = vela::IsSameFile(queue.status, named);
   return 0;
 }
 
-bool EndsWithinLine(const Queue& queue) {
-  if (queue.status.st_size == 0) return false;
+bool LacksFinalNewline(const Queue& queue) {
+  if (queue.status.st_size == 0) {
+    return false;
+  }
   char last = '\n';
   const ssize_t got = pread(queue.file.Get(), &last, 1, queue.status.st_size - 1);
   return got == 1 && last != '\n';
 }
 
-/// Writes the text in one piece or not at all. Returns 0 or an errno value.
-int AppendWhole(const Queue& queue, const std::string& text) {
+/// Appends the text completely or not at all. Returns 0 or an errno value.
+int AppendAtomically(const Queue& queue, const std::string& text) {
   ssize_t written;
   do {
     written = write(queue.file.Get(), text.data(), text.size());
   } while (written < 0 && errno == EINTR);
-  if (written == static_cast<ssize_t>(text.size())) return 0;
-  if (written < 0) return errno;
-  // A part of a line would be taken for another path.
+  if (written == static_cast<ssize_t>(text.size())) {
+    return 0;
+  }
+  if (written < 0) {
+    return errno;
+  }
+  // A part of a line would be read as another path.
   return ftruncate(queue.file.Get(), queue.status.st_size) == 0 ? ENOSPC : errno;
 }
 
 }  // namespace
 
 int WriteIndexQueue(const char* path, const char* queueFile) {
-  if (path == nullptr || queueFile == nullptr || *path == '\0') return Fail(EINVAL);
-  if (strchr(path, '\n') != nullptr) return Fail(EINVAL);
+  if (path == nullptr || queueFile == nullptr || *path == '\0') {
+    return Fail(EINVAL);
+  }
+  if (strchr(path, '\n') != nullptr) {
+    return Fail(EINVAL);
+  }
   Queue queue;
   for (bool isCurrent = false; !isCurrent;) {
     const int error = LockQueue(queueFile, queue, isCurrent);
-    if (error != 0) return Fail(error);
+    if (error != 0) {
+      return Fail(error);
+    }
   }
-  std::string line(EndsWithinLine(queue) ? "\n" : "");
+  std::string line(LacksFinalNewline(queue) ? "\n" : "");
   line += path;
   line += '\n';
-  const int error = AppendWhole(queue, line);
+  const int error = AppendAtomically(queue, line);
   return error == 0 ? 0 : Fail(error);
 }

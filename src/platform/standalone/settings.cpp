@@ -1,7 +1,5 @@
 #include "platform/standalone/settings.h"
 
-#include <sys/stat.h>
-
 #include <charconv>
 #include <limits>
 #include <mutex>
@@ -18,13 +16,17 @@ namespace vela {
 
 namespace {
 
-/// Returns the number that the whole text is in decimal; the largest one for a number beyond it.
+/// Parses a text of decimal digits only. Returns the largest number for one that does not fit.
 std::optional<uint32_t> ParseNumber(std::string_view text) {
   uint32_t number = 0;
   const char* end = text.data() + text.size();
   const auto [stop, error] = std::from_chars(text.data(), end, number);
-  if (stop != end || error == std::errc::invalid_argument) return std::nullopt;
-  if (error == std::errc::result_out_of_range) return std::numeric_limits<uint32_t>::max();
+  if (stop != end || error == std::errc::invalid_argument) {
+    return std::nullopt;
+  }
+  if (error == std::errc::result_out_of_range) {
+    return std::numeric_limits<uint32_t>::max();
+  }
   return number;
 }
 
@@ -35,7 +37,9 @@ std::optional<uint32_t> FindNumber(std::string_view text, std::string_view key) 
 
 void ReadSizeMap(std::string_view text, std::string_view key, int32_t& sizeMap) {
   const auto number = FindNumber(text, key);
-  if (number && *number <= uint32_t{kAllThumbSizes}) sizeMap = static_cast<int32_t>(*number);
+  if (number && *number <= uint32_t{kAllThumbSizes}) {
+    sizeMap = static_cast<int32_t>(*number);
+  }
 }
 
 Settings ParseSettings(std::string_view text) {
@@ -48,8 +52,8 @@ Settings ParseSettings(std::string_view text) {
   return settings;
 }
 
-/// The settings last read with the state of the file they come from: one look at the file's status
-/// tells whether they still hold.
+/// The settings and the version of the file they were read from, so that one stat call shows
+/// whether they are still valid.
 class SettingsCache {
  public:
   Settings Get();
@@ -57,20 +61,26 @@ class SettingsCache {
  private:
   std::mutex mutex_;
   bool isValid_ = false;
-  struct stat version_ {};
+  FileVersion version_;
   Settings settings_;
 };
 
 Settings SettingsCache::Get() {
-  struct stat now;
-  if (stat(kSettingsFile, &now) != 0) return Settings();
+  FileVersion now;
+  if (now.Read(kSettingsFile) != 0) {
+    return Settings();
+  }
   const std::lock_guard<std::mutex> lock(mutex_);
-  if (isValid_ && IsSameVersion(now, version_)) return settings_;
+  if (isValid_ && now == version_) {
+    return settings_;
+  }
 
-  // The status is older than the text read below: a change between the two is seen next time.
-  const bool isAtRest = IsAtRest(now);
+  // The version is read before the text, so that a change in between is noticed next time.
+  const bool isAtRest = now.IsAtRest();
   std::string text;
-  if (ReadFile(kSettingsFile, text) != 0) return Settings();
+  if (ReadFile(kSettingsFile, text) != 0) {
+    return Settings();
+  }
   settings_ = ParseSettings(text);
   version_ = now;
   isValid_ = isAtRest;

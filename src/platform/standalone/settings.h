@@ -1,4 +1,4 @@
-// The settings of the platform in /etc/velainfo.conf.
+// The settings in /etc/velainfo.conf that concern the platform.
 #pragma once
 
 #include <chrono>
@@ -8,14 +8,14 @@
 
 namespace vela {
 
-/// What the settings file says, with the defaults for what it does not say.
+/// The settings, with defaults for those that the file does not contain.
 struct Settings {
   int32_t photoThumbSizeMap = kAllThumbSizes;  ///< bit mask of size classes
   int32_t videoThumbSizeMap = kAllThumbSizes;  ///< bit mask of size classes
   std::chrono::seconds toolTimeout{600};       ///< 0: no limit
 };
 
-/// Returns the settings as the file holds them now; callable from any thread.
+/// Returns the settings that the file contains now. Thread-safe.
 Settings CurrentSettings();
 
 }  // namespace vela

@@ -7,7 +7,9 @@
 namespace {
 
 int GetSizeMap(int kind, int32_t* sizeMap) {
-  if (sizeMap == nullptr) return vela::Fail(EINVAL);
+  if (sizeMap == nullptr) {
+    return vela::Fail(EINVAL);
+  }
   switch (kind) {
     case THUMB_TYPE_PHOTO:
       *sizeMap = vela::CurrentSettings().photoThumbSizeMap;

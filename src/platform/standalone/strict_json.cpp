@@ -34,13 +34,17 @@ bool IsDigit(char c) {
 /// Removes the digits at the front. Returns true when there were any.
 bool SkipDigits(std::string_view& text) {
   const size_t before = text.size();
-  while (!text.empty() && IsDigit(text.front())) text.remove_prefix(1);
+  while (!text.empty() && IsDigit(text.front())) {
+    text.remove_prefix(1);
+  }
   return text.size() < before;
 }
 
 /// Removes one of `characters` from the front. Returns true when one was there.
 bool SkipOneOf(std::string_view characters, std::string_view& text) {
-  if (text.empty() || characters.find(text.front()) == std::string_view::npos) return false;
+  if (text.empty() || characters.find(text.front()) == std::string_view::npos) {
+    return false;
+  }
   text.remove_prefix(1);
   return true;
 }
@@ -48,11 +52,17 @@ bool SkipOneOf(std::string_view characters, std::string_view& text) {
 bool IsNumber(std::string_view text) {
   SkipOneOf("-", text);
   const bool isZero = SkipOneOf("0", text);
-  if (!isZero && !SkipDigits(text)) return false;
-  if (SkipOneOf(".", text) && !SkipDigits(text)) return false;
+  if (!isZero && !SkipDigits(text)) {
+    return false;
+  }
+  if (SkipOneOf(".", text) && !SkipDigits(text)) {
+    return false;
+  }
   if (SkipOneOf("eE", text)) {
     SkipOneOf("+-", text);
-    if (!SkipDigits(text)) return false;
+    if (!SkipDigits(text)) {
+      return false;
+    }
   }
   return text.empty();
 }
@@ -60,21 +70,27 @@ bool IsNumber(std::string_view text) {
 /// Returns the position after the string that begins at `begin`.
 size_t EndOfString(std::string_view text, size_t begin) {
   size_t at = begin + 1;
-  while (at < text.size() && text[at] != '"') at += text[at] == '\\' ? 2 : 1;
+  while (at < text.size() && text[at] != '"') {
+    at += text[at] == '\\' ? 2 : 1;
+  }
   return at + 1;
 }
 
-/// Returns true when the text has what the library accepts although it is not JSON: comments, and
+/// Returns true when the text contains what JsonCpp accepts although it is not JSON: comments, and
 /// numbers such as 01 or a single minus sign.
-bool IsLoose(std::string_view text) {
+bool HasExtensions(std::string_view text) {
   for (size_t at = 0; at < text.size();) {
     const char c = text[at];
-    if (c == '/') return true;
+    if (c == '/') {
+      return true;
+    }
     if (c == '"') {
       at = EndOfString(text, at);
     } else if (IsDigit(c) || c == '-' || c == '+') {
       const size_t end = text.find_first_not_of("+-.0123456789Ee", at);
-      if (!IsNumber(text.substr(at, end - at))) return true;
+      if (!IsNumber(text.substr(at, end - at))) {
+        return true;
+      }
       at = end;
     } else {
       ++at;
@@ -99,7 +115,9 @@ bool WriteJsonLine(const Json::Value& value, std::string& line) {
 bool ReadJsonObject(std::string_view text, DuplicateKeys duplicates, Json::Value& object) {
   static const Json::CharReaderBuilder lenient = MakeReaderBuilder(DuplicateKeys::kLastWins);
   static const Json::CharReaderBuilder strict = MakeReaderBuilder(DuplicateKeys::kRejected);
-  if (IsLoose(text)) return false;
+  if (HasExtensions(text)) {
+    return false;
+  }
   const Json::CharReaderBuilder& builder =
       duplicates == DuplicateKeys::kRejected ? strict : lenient;
   try {
@@ -109,7 +127,7 @@ bool ReadJsonObject(std::string_view text, DuplicateKeys duplicates, Json::Value
   } catch (const std::bad_alloc&) {
     throw;
   } catch (const std::exception&) {
-    // For example nesting beyond the library's limit.
+    // For example nested more deeply than JsonCpp allows.
     return false;
   }
 }

@@ -14,32 +14,32 @@ class VideoContainer {
   VideoContainer& operator=(const VideoContainer&) = delete;
   ~VideoContainer();
 
-  /// Opens the regular file `path` and reads its headers; called once. Returns 0 or an errno value,
-  /// EINVAL for what is no video container and ELIBACC without the video library. The other
-  /// functions are for a container that this has opened.
+  /// Opens the regular file `path` and reads its headers. To be called once and before the other
+  /// functions. Returns 0 or an errno value, EINVAL for a file that is not a video container and
+  /// ELIBACC without libavformat.
   int Open(const char* path);
 
-  /// Looks into the first packets for what the headers do not say. Returns whether that succeeded.
+  /// Reads the first packets for information that the headers lack. Returns whether that succeeded.
   bool Probe();
 
-  /// Opens the file and, where its headers name no picture stream, probes it for one. Returns as
-  /// Open, EINVAL also when there is none.
-  int OpenWithPicture(const char* path);
+  /// Opens the file and, if its headers do not list a video stream, probes for one. Returns the
+  /// same as Open, and EINVAL when there is no video stream.
+  int OpenWithVideo(const char* path);
 
-  /// The first stream that is a film's picture, not the cover picture of a piece of music; null
-  /// when none is known.
-  const AVStream* Picture() const;
+  /// Returns the first video stream that is not the cover picture of a piece of music; null when
+  /// none is known.
+  const AVStream* VideoStream() const;
 
-  /// The first sound stream; null when none is known.
-  const AVStream* Sound() const;
+  /// Returns the first audio stream; null when none is known.
+  const AVStream* AudioStream() const;
 
-  /// What the video library knows of the file.
+  /// Returns what libavformat knows about the file.
   const AVFormatContext& Format() const { return *format_; }
 
-  /// Size of the file in bytes.
+  /// Returns the size of the file in bytes.
   int64_t FileSize() const { return fileSize_; }
 
-  /// The library that has opened the file.
+  /// Returns the library that opened the file.
   const VideoLibrary& Library() const { return *library_; }
 
  private:

@@ -14,12 +14,14 @@ namespace {
 using vela::Fail;
 using vela::VideoContainer;
 
-/// Whether `name` is one of the names of the format the file was read as.
-bool IsReadAs(const VideoContainer& container, const char* name) {
+/// Returns whether `name` is one of the names of the format of the file.
+bool HasFormat(const VideoContainer& container, const char* name) {
   const char* names = container.Format().iformat->name;
   const size_t length = std::strlen(name);
   for (const char* at = names; at != nullptr; at = std::strchr(at, ',')) {
-    if (*at == ',') ++at;
+    if (*at == ',') {
+      ++at;
+    }
     if (std::strncmp(at, name, length) == 0 && (at[length] == ',' || at[length] == '\0')) {
       return true;
     }
@@ -27,39 +29,43 @@ bool IsReadAs(const VideoContainer& container, const char* name) {
   return false;
 }
 
-/// QuickTime files are read as the same format: the newer ones name their brand, the older ones
-/// none.
+/// QuickTime files have the same format in libavformat. The newer ones contain a brand of their
+/// own, the older ones none.
 bool IsMp4(const VideoContainer& container) {
   constexpr const char* kQuickTimeBrand = "qt  ";
-  if (!IsReadAs(container, "mp4")) return false;
+  if (!HasFormat(container, "mp4")) {
+    return false;
+  }
   const AVDictionaryEntry* brand =
       container.Library().getEntry(container.Format().metadata, "major_brand", nullptr, 0);
   return brand != nullptr && std::strcmp(brand->value, kQuickTimeBrand) != 0;
 }
 
-/// The other Matroska files are read as the same format, and only the name tells a web server which
-/// it is to announce.
+/// All Matroska files have the same format in libavformat, and a web server chooses the media type
+/// by the name.
 bool IsWebm(const VideoContainer& container, const char* path) {
-  return IsReadAs(container, "webm") && strcasecmp(VELAIndexExtGet(path), "webm") == 0;
+  return HasFormat(container, "webm") && strcasecmp(VELAIndexExtGet(path), "webm") == 0;
 }
 
-/// Whether the sound is in one of the codecs, or there is none.
-bool HasNoSoundBut(const VideoContainer& container, std::initializer_list<AVCodecID> codecs) {
-  const AVStream* sound = container.Sound();
-  if (sound == nullptr) return true;
-  return std::find(codecs.begin(), codecs.end(), sound->codecpar->codec_id) != codecs.end();
+/// Returns whether the audio stream uses one of the codecs, or there is none.
+bool HasNoAudioExcept(const VideoContainer& container, std::initializer_list<AVCodecID> codecs) {
+  const AVStream* audio = container.AudioStream();
+  if (audio == nullptr) {
+    return true;
+  }
+  return std::find(codecs.begin(), codecs.end(), audio->codecpar->codec_id) != codecs.end();
 }
 
-/// Whether browsers play the video as it is.
-bool IsForBrowsers(const VideoContainer& container, const char* path) {
-  switch (container.Picture()->codecpar->codec_id) {
+/// Returns whether browsers play the video without conversion.
+bool IsPlayedByBrowsers(const VideoContainer& container, const char* path) {
+  switch (container.VideoStream()->codecpar->codec_id) {
     case AV_CODEC_ID_H264:
-      return IsMp4(container) && HasNoSoundBut(container, {AV_CODEC_ID_AAC});
+      return IsMp4(container) && HasNoAudioExcept(container, {AV_CODEC_ID_AAC});
     case AV_CODEC_ID_VP8:
     case AV_CODEC_ID_VP9:
     case AV_CODEC_ID_AV1:
       return IsWebm(container, path) &&
-             HasNoSoundBut(container, {AV_CODEC_ID_VORBIS, AV_CODEC_ID_OPUS});
+             HasNoAudioExcept(container, {AV_CODEC_ID_VORBIS, AV_CODEC_ID_OPUS});
     default:
       return false;
   }
@@ -68,9 +74,13 @@ bool IsForBrowsers(const VideoContainer& container, const char* path) {
 }  // namespace
 
 int VELAIDX_IsVideoNeedConvert(const char* path) {
-  if (path == nullptr) return Fail(EINVAL);
+  if (path == nullptr) {
+    return Fail(EINVAL);
+  }
   VideoContainer container;
-  const int error = container.OpenWithPicture(path);
-  if (error != 0) return Fail(error);
-  return IsForBrowsers(container, path) ? 0 : 1;
+  const int error = container.OpenWithVideo(path);
+  if (error != 0) {
+    return Fail(error);
+  }
+  return IsPlayedByBrowsers(container, path) ? 0 : 1;
 }

@@ -1,6 +1,5 @@
-// What is used of the video library, which is loaded when the first video is asked about and not
-// with the program: with all that it needs it takes longer to load than a small directory takes to
-// work through.
+// The functions of libavformat, which is loaded for the first video and not with the program:
+// loading it with its dependencies takes longer than processing a small directory.
 #pragma once
 
 extern "C" {
@@ -8,13 +7,15 @@ extern "C" {
 #include <libavutil/display.h>
 }
 
+#include "posix/loaded_library.h"
+
 namespace vela {
 
-/// The functions of the video library that are used.
-class VideoLibrary {
+/// The functions of libavformat that are used.
+class VideoLibrary final : private LoadedLibrary {
  public:
-  /// Returns the library, loaded by the first call; null when it, or a function of it, is missing.
-  /// It prints nothing.
+  /// Returns the library, which the first call loads; null when it or one of its functions is
+  /// missing. Its own messages are switched off.
   static const VideoLibrary* Get();
 
   decltype(&::avformat_open_input) openInput = nullptr;
@@ -29,11 +30,6 @@ class VideoLibrary {
 
  private:
   VideoLibrary();
-
-  template <typename Function>
-  void Find(void* library, const char* name, Function& function);
-
-  bool isLoaded_ = false;
 };
 
 }  // namespace vela

@@ -1,4 +1,4 @@
-// White space as the text formats of the platform know it, whatever the locale.
+// White space in the text formats of the platform, whatever the locale.
 #pragma once
 
 #include <string_view>
@@ -9,10 +9,18 @@ constexpr bool IsWhiteSpace(char c) {
   return c == ' ' || (c >= '\t' && c <= '\r');
 }
 
-/// Returns `text` without white space at both ends.
+/// Returns `text` without the white space at its ends.
 constexpr std::string_view Trimmed(std::string_view text) {
-  while (!text.empty() && IsWhiteSpace(text.front())) text.remove_prefix(1);
-  while (!text.empty() && IsWhiteSpace(text.back())) text.remove_suffix(1);
+  while (!text.empty() && IsWhiteSpace(text.front())) {
+    {
+      { text.remove_prefix(1); }
+    }
+  }
+  while (!text.empty() && IsWhiteSpace(text.back())) {
+    {
+      { text.remove_suffix(1); }
+    }
+  }
   return text;
 }
 

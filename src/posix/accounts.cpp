@@ -1,13 +1,15 @@
-#include "group.h"
+#include "posix/accounts.h"
 
 #include <grp.h>
+#include <pwd.h>
+#include <unistd.h>
 
 #include <cerrno>
 #include <vector>
 
 namespace vela {
 
-std::string FindGroup(const std::string& name, gid_t& id) {
+std::optional<gid_t> FindGroup(const std::string& name) {
   std::vector<char> text(16384);
   group entry{};
   group* found = nullptr;
@@ -16,9 +18,19 @@ std::string FindGroup(const std::string& name, gid_t& id) {
     text.resize(text.size() * 2);
     error = getgrnam_r(name.c_str(), &entry, text.data(), text.size(), &found);
   }
-  if (found == nullptr) return "there is no group " + name;
-  id = entry.gr_gid;
-  return {};
+  if (found == nullptr) {
+    return std::nullopt;
+  }
+  return entry.gr_gid;
+}
+
+std::string UserName(uid_t user) {
+  const passwd* entry = getpwuid(user);
+  return entry == nullptr ? std::to_string(user) : entry->pw_name;
+}
+
+uid_t EffectiveUser() {
+  return geteuid();
 }
 
 }  // namespace vela

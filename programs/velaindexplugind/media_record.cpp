@@ -1,6 +1,4 @@
-#include "media_reader.h"
-
-#include <sys/stat.h>
+#include "media_record.h"
 
 #include <algorithm>
 #include <cerrno>
@@ -8,6 +6,7 @@
 
 #include "platform/velaindex.h"
 #include "platform/vlibc.h"
+#include "posix/files.h"
 
 namespace vela {
 
@@ -26,8 +25,10 @@ std::string ReadVideo(const std::string& path, MediaRecord& record) {
   record.rotation = metadata.rotation;
   record.duration = metadata.duration;
   record.bitrate = static_cast<uint32_t>(std::max(metadata.bitrate, 0));
-  // Who asks compares this with films that were turned upright when they were converted.
-  if (record.rotation == 90 || record.rotation == 270) std::swap(record.width, record.height);
+  // Clients compare this with converted videos, which were rotated upright by the conversion.
+  if (record.rotation == 90 || record.rotation == 270) {
+    std::swap(record.width, record.height);
+  }
   return {};
 }
 
@@ -46,16 +47,23 @@ std::string ReadPhoto(const std::string& path, MediaRecord& record) {
 
 int ReadFileState(const std::string& path, FileState& state) {
   VLIBCFileStatus status;
-  if (VLIBCFileStat(path.c_str(), 0, &status) != 0) return VLIBCErrGet();
-  if (S_ISDIR(status.mode)) return EISDIR;
-  if (!S_ISREG(status.mode)) return EINVAL;
+  if (VLIBCFileStat(path.c_str(), 0, &status) != 0) {
+    return VLIBCErrGet();
+  }
+  if (!IsRegularFileMode(status.mode)) {
+    return EINVAL;
+  }
   state = {status.size, status.modification.seconds, status.modification.nanoseconds};
   return 0;
 }
 
 std::string ReadMediaHeaders(const std::string& path, MediaRecord& record) {
-  if (BlVELAIndexIsVideoOnWebFile(path.c_str())) return ReadVideo(path, record);
-  if (BlVELAIndexIsPhotoOnWebFile(path.c_str())) return ReadPhoto(path, record);
+  if (BlVELAIndexIsVideoOnWebFile(path.c_str())) {
+    return ReadVideo(path, record);
+  }
+  if (BlVELAIndexIsPhotoOnWebFile(path.c_str())) {
+    return ReadPhoto(path, record);
+  }
   return "the name is not that of a photo or video";
 }
 

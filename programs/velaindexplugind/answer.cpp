@@ -1,22 +1,24 @@
-#include "reply.h"
+#include "answer.h"
 
 #include <json/value.h>
-#include <json/writer.h>
+
+#include <new>
+
+#include "index_connection.h"
+#include "media_record.h"
+#include "platform/standalone/strict_json.h"
 
 namespace vela {
 
 namespace {
 
-Json::StreamWriterBuilder MakeWriterBuilder() {
-  Json::StreamWriterBuilder builder;
-  builder["indentation"] = "";
-  builder["emitUTF8"] = true;
-  return builder;
-}
-
 std::string ToLine(const Json::Value& value) {
-  static const Json::StreamWriterBuilder builder = MakeWriterBuilder();
-  return Json::writeString(builder, value) + '\n';
+  std::string line;
+  // Replies contain nothing that could not be written, so the only cause is a lack of memory.
+  if (!WriteJsonLine(value, line)) {
+    throw std::bad_alloc();
+  }
+  return line;
 }
 
 Json::Value Success() {
@@ -64,6 +66,14 @@ std::string MediaReply(const std::string& path, const MediaRecord& record) {
   Json::Value reply = Success();
   reply["media"] = media;
   return ToLine(reply);
+}
+
+Answer IndexAnswer(const IndexResult& result) {
+  if (result.IsOk()) {
+    return {SuccessReply(), Outcome::kDone, {}};
+  }
+  const std::string error = "index database: " + result.message;
+  return {FailureReply(error), Outcome::kFault, error};
 }
 
 }  // namespace vela

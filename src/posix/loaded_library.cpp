@@ -1,0 +1,17 @@
+#include "posix/loaded_library.h"
+
+#include <dlfcn.h>
+
+namespace vela {
+
+LoadedLibrary::LoadedLibrary(const char* name, Binding binding)
+    : library_(dlopen(name, (binding == Binding::kNow ? RTLD_NOW : RTLD_LAZY) | RTLD_LOCAL)),
+      isLoaded_(library_ != nullptr) {}
+
+void* LoadedLibrary::Address(const char* name) {
+  void* const address = library_ == nullptr ? nullptr : dlsym(library_, name);
+  isLoaded_ = isLoaded_ && address != nullptr;
+  return address;
+}
+
+}  // namespace vela

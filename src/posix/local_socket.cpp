@@ -1,0 +1,218 @@
+#include "posix/local_socket.h"
+
+#include <fcntl.h>
+#include <poll.h>
+#include <sys/time.h>
+#include <sys/un.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <cerrno>
+#include <chrono>
+#include <cstring>
+
+namespace vela {
+
+namespace {
+
+/// Returns false for a path that an address cannot hold.
+bool MakeAddress(std::string_view path, sockaddr_un& address) {
+  address = {};
+  address.sun_family = AF_UNIX;
+  if (!FitsLocalAddress(path)) {
+    return false;
+  }
+  std::memcpy(address.sun_path, path.data(), path.size());
+  return true;
+}
+
+int ConnectTo(int socket, const sockaddr_un& address) {
+  const auto* generic = reinterpret_cast<const sockaddr*>(&address);
+  return connect(socket, generic, sizeof(address)) == 0 ? 0 : errno;
+}
+
+bool IsOver(const Deadline& deadline) {
+  return deadline.Left() == std::chrono::nanoseconds::zero();
+}
+
+bool SetBlocking(int socket, bool isBlocking) {
+  return fcntl(socket, F_SETFL, isBlocking ? 0 : O_NONBLOCK) == 0;
+}
+
+/// Limits how long a connect on this socket may block.
+bool LimitConnect(int socket, const Deadline& deadline) {
+  // Zero would mean no limit.
+  const auto left = std::max(std::chrono::ceil<std::chrono::microseconds>(deadline.Left()),
+                             std::chrono::microseconds(1));
+  timeval limit;
+  limit.tv_sec = static_cast<time_t>(left.count() / 1000000);
+  limit.tv_usec = static_cast<suseconds_t>(left.count() % 1000000);
+  return setsockopt(socket, SOL_SOCKET, SO_SNDTIMEO, &limit, sizeof(limit)) == 0;
+}
+
+/// Waits for a place in the listener's queue. Only a blocking connect can wait for that.
+int ConnectBlocking(int socket, const sockaddr_un& address, const Deadline& deadline) {
+  if (!SetBlocking(socket, true)) {
+    return errno;
+  }
+  int error = EAGAIN;
+  while ((error == EAGAIN || error == EINTR) && !IsOver(deadline)) {
+    if (!LimitConnect(socket, deadline)) {
+      return errno;
+    }
+    error = ConnectTo(socket, address);
+  }
+  if (error != 0) {
+    return error == EAGAIN || error == EINTR ? ETIMEDOUT : error;
+  }
+  return SetBlocking(socket, false) ? 0 : errno;
+}
+
+/// Waits for one of the poll `events`.
+int Await(int socket, short events, const Deadline& deadline) {
+  pollfd entry{socket, events, 0};
+  for (;;) {
+    const int ready = poll(&entry, 1, deadline.PollMilliseconds());
+    if (ready > 0) {
+      return 0;
+    }
+    if (ready < 0 && errno != EINTR) {
+      return errno;
+    }
+    if (IsOver(deadline)) {
+      return ETIMEDOUT;
+    }
+  }
+}
+
+}  // namespace
+
+FileDescriptor MakeLocalSocket() {
+  return FileDescriptor(socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC | SOCK_NONBLOCK, 0));
+}
+
+bool FitsLocalAddress(std::string_view path) {
+  return !path.empty() && path.size() < sizeof(sockaddr_un::sun_path);
+}
+
+int ConnectNow(int socket, std::string_view path) {
+  sockaddr_un address;
+  return MakeAddress(path, address) ? ConnectTo(socket, address) : ENAMETOOLONG;
+}
+
+int OpenConnection(const char* path, const Deadline& deadline, FileDescriptor& connection) {
+  sockaddr_un address;
+  if (!MakeAddress(path, address)) {
+    return ENAMETOOLONG;
+  }
+  if (access(path, F_OK) != 0) {
+    return errno;
+  }
+  connection = MakeLocalSocket();
+  if (!connection.IsOpen()) {
+    return errno;
+  }
+  const int error = ConnectTo(connection.Get(), address);
+  const bool isQueueFull = error == EAGAIN || error == EINTR;
+  return isQueueFull ? ConnectBlocking(connection.Get(), address, deadline) : error;
+}
+
+int BindLocal(int socket, std::string_view path) {
+  sockaddr_un address;
+  if (!MakeAddress(path, address)) {
+    return ENAMETOOLONG;
+  }
+  const auto* generic = reinterpret_cast<const sockaddr*>(&address);
+  return bind(socket, generic, sizeof(address)) == 0 ? 0 : errno;
+}
+
+FileDescriptor AcceptLocal(int listener) {
+  return FileDescriptor(accept4(listener, nullptr, nullptr, SOCK_CLOEXEC | SOCK_NONBLOCK));
+}
+
+int SendNow(int socket, std::string_view bytes, size_t& sent) {
+  for (;;) {
+    const ssize_t count = send(socket, bytes.data(), bytes.size(), MSG_NOSIGNAL | MSG_DONTWAIT);
+    if (count >= 0) {
+      sent = static_cast<size_t>(count);
+      return 0;
+    }
+    if (errno != EINTR) {
+      return errno;
+    }
+  }
+}
+
+int SendAll(int socket, std::string_view bytes, const Deadline& deadline) {
+  while (!bytes.empty()) {
+    size_t sent = 0;
+    int error = SendNow(socket, bytes, sent);
+    if (error == EAGAIN) {
+      error = Await(socket, POLLOUT, deadline);
+    }
+    if (error != 0) {
+      return error;
+    }
+    bytes.remove_prefix(sent);
+    if (IsOver(deadline) && !bytes.empty()) {
+      return ETIMEDOUT;
+    }
+  }
+  return 0;
+}
+
+int ReceiveNow(int socket, char* buffer, size_t size, size_t& got) {
+  for (;;) {
+    const ssize_t count = recv(socket, buffer, size, MSG_DONTWAIT);
+    if (count >= 0) {
+      got = static_cast<size_t>(count);
+      return 0;
+    }
+    if (errno != EINTR) {
+      return errno;
+    }
+  }
+}
+
+int ReceiveSome(int socket, char* buffer, size_t size, const Deadline& deadline, size_t& got) {
+  for (;;) {
+    int error = Await(socket, POLLIN, deadline);
+    if (error == 0) {
+      error = ReceiveNow(socket, buffer, size, got);
+    }
+    if (error != EAGAIN) {
+      return error;
+    }
+  }
+}
+
+void EndSending(int socket) {
+  shutdown(socket, SHUT_WR);
+}
+
+std::optional<ucred> PeerOf(int socket) {
+  ucred peer{};
+  socklen_t size = sizeof(peer);
+  if (socket < 0 || getsockopt(socket, SOL_SOCKET, SO_PEERCRED, &peer, &size) != 0) {
+    return {};
+  }
+  return peer;
+}
+
+std::string LocalAddressOf(int socket) {
+  sockaddr_un address{};
+  socklen_t size = sizeof(address);
+  auto* generic = reinterpret_cast<sockaddr*>(&address);
+  if (getsockname(socket, generic, &size) != 0) {
+    return {};
+  }
+  const size_t length = std::min<size_t>(size, sizeof(address)) - offsetof(sockaddr_un, sun_path);
+  const std::string name(address.sun_path, length);
+  // A name in the abstract namespace begins with NUL and may contain more of them.
+  if (!name.empty() && name[0] == '\0') {
+    return '@' + name.substr(1);
+  }
+  return name.substr(0, name.find('\0'));
+}
+
+}  // namespace vela
