@@ -4,7 +4,7 @@
 #include <cstring>
 
 #include "posix/accounts.h"
-#include "posix/lock_file.h"
+#include "posix/file_lock.h"
 
 namespace vela {
 

@@ -20,7 +20,7 @@
 #include "listening_socket.h"
 #include "log.h"
 #include "posix/accounts.h"
-#include "posix/process_setup.h"
+#include "posix/processes.h"
 #include "request_handler.h"
 #include "request_log.h"
 #include "server.h"

@@ -8,7 +8,7 @@
 #include "platform/system_rules.h"
 #include "platform/velaindex.h"
 #include "platform/vlibc.h"
-#include "posix/path_lock.h"
+#include "posix/file_lock.h"
 #include "posix/service_log.h"
 #include "profiles/thumbnail_profile.h"
 #include "storage/creation_queue.h"

@@ -12,7 +12,7 @@
 #include "platform/velaindex.h"
 #include "platform/vlibc.h"
 #include "posix/file_descriptor.h"
-#include "posix/path_lock.h"
+#include "posix/file_lock.h"
 #include "posix/service_log.h"
 #include "queue_run.h"
 #include "storage/creation_queue.h"

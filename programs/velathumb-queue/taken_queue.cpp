@@ -13,7 +13,7 @@
 #include "platform/velaindex.h"
 #include "platform/vlibc.h"
 #include "posix/files.h"
-#include "posix/path_lock.h"
+#include "posix/file_lock.h"
 #include "posix/service_log.h"
 #include "storage/creation_queue.h"
 

@@ -10,7 +10,6 @@
 #include <stdexcept>
 
 #include "posix/file_descriptor.h"
-#include "posix/file_reading.h"
 #include "posix/files.h"
 
 namespace vela {
@@ -31,23 +30,42 @@ int AppendToEnd(int fd, std::string& content) {
   }
 }
 
-/// Returns at most `size` bytes from the beginning, nothing after an error: the file may grow
-/// meanwhile.
-std::string ReadBytes(int fd, size_t size) {
+}  // namespace
+
+int ReadChunk(int fd, char* chunk, size_t size, size_t& got) {
+  for (;;) {
+    const ssize_t count = read(fd, chunk, size);
+    if (count >= 0) {
+      got = static_cast<size_t>(count);
+      return 0;
+    }
+    if (errno != EINTR) {
+      return errno;
+    }
+  }
+}
+
+std::string ReadAt(int fd, int64_t offset, size_t size) {
   std::string bytes(size, '\0');
   size_t length = 0;
   while (length < size) {
-    const ssize_t count = read(fd, &bytes[length], size - length);
-    if (count < 0 && errno == EINTR) continue;
-    if (count < 0) return {};
-    if (count == 0) break;
-    length += static_cast<size_t>(count);
+    const off_t position = static_cast<off_t>(offset) + static_cast<off_t>(length);
+    const ssize_t got = pread(fd, &bytes[length], size - length, position);
+    if (got < 0 && errno == EINTR) {
+      continue;
+    }
+    if (got <= 0) {
+      break;
+    }
+    length += static_cast<size_t>(got);
   }
   bytes.resize(length);
   return bytes;
 }
 
-}  // namespace
+int Rewind(int fd) {
+  return lseek(fd, 0, SEEK_SET) < 0 ? errno : 0;
+}
 
 int ReadToEnd(int fd, std::string& content) {
   try {
@@ -73,7 +91,9 @@ std::string ReadSmallFile(const std::string& path, size_t limit) {
   struct stat status = {};
   if (!file.IsOpen() || fstat(file.Get(), &status) != 0) return {};
   if (!S_ISREG(status.st_mode) || static_cast<uint64_t>(status.st_size) > limit) return {};
-  return ReadBytes(file.Get(), static_cast<size_t>(status.st_size));
+  const auto size = static_cast<size_t>(status.st_size);
+  std::string content = ReadAt(file.Get(), 0, size);
+  return content.size() == size ? content : std::string();
 }
 
 int WriteAll(int fd, std::string_view content) {

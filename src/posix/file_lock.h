@@ -1,7 +1,11 @@
-// Exclusive locks on files that are replaced or renamed while others wait for the lock.
+// Locks on files, which may be renamed or removed while others wait for the lock.
 #pragma once
 
-#include <sys/stat.h>
+#include <cstdint>
+#include <ctime>
+#include <string>
+
+#include "posix/file_descriptor.h"
 
 namespace vela {
 
@@ -16,7 +20,34 @@ int TryLockExclusively(int fd);
 /// Releases the lock on the open file `fd`, also for processes that share the descriptor.
 void Unlock(int fd);
 
-/// Returns true when both records describe the same file.
-bool IsSameFile(const struct stat& a, const struct stat& b);
+/// Locks the file `path` exclusively, without waiting, until `lock` is closed. Creates it when it
+/// is missing, for its owner only; never follows a symbolic link. Returns 0, EWOULDBLOCK when
+/// another process holds the lock, or another errno value.
+int LockFile(const std::string& path, FileDescriptor& lock);
+
+/// Returns true when the open file `fd` is the one at `path`.
+bool IsAtPath(int fd, const std::string& path);
+
+/// A file with an exclusive lock, and its state under the lock.
+struct LockedFile {
+  FileDescriptor file;  ///< the lock is released with it
+  int64_t size = 0;     ///< bytes
+  time_t modified = 0;  ///< time of the last modification
+};
+
+/// Opens the regular file `path` for reading and locks it exclusively, without waiting. Returns 0
+/// or an errno value: EWOULDBLOCK when another process holds a lock, EINVAL for anything but a
+/// regular file, ENOENT also when the file was renamed or removed before the lock was there.
+int LockFileAt(const std::string& path, LockedFile& locked);
+
+/// Returns true when another process holds an exclusive lock on the file or directory `path`; false
+/// when that cannot be opened.
+bool IsLocked(const std::string& path);
+
+/// Opens the lock file `path`, created with mode 0644 when missing, and takes a lock that no child
+/// inherits: it is free as soon as this process ends. With `wait` waits for the present holder.
+/// Returns the open file, or none with errno set: EAGAIN or EACCES when another process has the
+/// lock.
+FileDescriptor TakeProcessLock(const std::string& path, bool wait);
 
 }  // namespace vela

@@ -10,6 +10,7 @@
 #include "posix/file_content.h"
 #include "posix/file_descriptor.h"
 #include "posix/file_lock.h"
+#include "posix/file_version.h"
 
 namespace vela {
 

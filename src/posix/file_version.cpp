@@ -4,8 +4,6 @@
 #include <cstdint>
 #include <ctime>
 
-#include "posix/file_lock.h"
-
 namespace vela {
 
 namespace {
@@ -15,6 +13,10 @@ bool IsSameTime(const timespec& a, const timespec& b) {
 }
 
 }  // namespace
+
+bool IsSameFile(const struct stat& a, const struct stat& b) {
+  return a.st_dev == b.st_dev && a.st_ino == b.st_ino;
+}
 
 bool IsSameVersion(const struct stat& a, const struct stat& b) {
   return IsSameFile(a, b) && a.st_size == b.st_size && IsSameTime(a.st_mtim, b.st_mtim) &&

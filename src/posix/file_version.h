@@ -7,6 +7,9 @@
 
 namespace vela {
 
+/// Returns true when both records describe the same file.
+bool IsSameFile(const struct stat& a, const struct stat& b);
+
 /// Returns true when both records describe the same file in the same state.
 bool IsSameVersion(const struct stat& a, const struct stat& b);
 

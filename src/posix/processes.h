@@ -1,7 +1,10 @@
-// This process and others.
+// The set-up of this process, and the state of others.
 #pragma once
 
 #include <sys/types.h>
+
+#include <cstdint>
+#include <initializer_list>
 
 namespace vela {
 
@@ -21,5 +24,15 @@ void HoldStandardDescriptors();
 
 /// From now on files get exactly the modes that they are created with.
 void CreateFilesWithExactModes();
+
+/// Raises the limit of open files to `wanted`, as far as permitted. Returns the limit that is then
+/// in effect, `wanted` when it is unknown.
+uint64_t RaiseOpenFileLimit(uint64_t wanted);
+
+/// Blocks the signals in the calling thread and in all threads that it starts.
+void BlockSignals(std::initializer_list<int> signals);
+
+/// Makes a write to a closed pipe or socket fail instead of ending the process.
+void IgnoreBrokenPipes();
 
 }  // namespace vela

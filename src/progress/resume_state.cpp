@@ -1,7 +1,5 @@
 #include "progress/resume_state.h"
 
-#include <sys/time.h>
-
 #include "platform/system_rules.h"
 #include "platform/velaindex.h"
 #include "progress/velamk_progress.h"

@@ -1,7 +1,5 @@
 #include "progress/velamk_progress.h"
 
-#include <sys/time.h>
-
 #include <algorithm>
 #include <cstdint>
 #include <cstdio>

@@ -2,7 +2,7 @@
 // paused.
 #pragma once
 
-struct timeval;
+#include <sys/time.h>
 
 /// Returns the integer value of `key` ("total", "completed", "total_thumb", "completed_thumb") in
 /// the progress file of `kind` (a THUMB_TYPE); 0 for another kind and for a value that is missing

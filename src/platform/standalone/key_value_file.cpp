@@ -14,6 +14,7 @@
 #include "posix/file_descriptor.h"
 #include "posix/file_lock.h"
 #include "posix/file_replacement.h"
+#include "posix/file_version.h"
 
 namespace {
 

@@ -5,7 +5,7 @@
 #include <new>
 #include <string>
 
-#include "posix/file_reading.h"
+#include "posix/file_content.h"
 
 namespace vela {
 

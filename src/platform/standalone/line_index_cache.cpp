@@ -6,8 +6,8 @@
 #include <string>
 
 #include "platform/standalone/line_index.h"
+#include "posix/file_content.h"
 #include "posix/file_descriptor.h"
-#include "posix/file_reading.h"
 #include "posix/file_version.h"
 #include "posix/files.h"
 

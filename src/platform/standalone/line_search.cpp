@@ -7,8 +7,8 @@
 #include "platform/standalone/last_error.h"
 #include "platform/standalone/line_index_cache.h"
 #include "platform/vlibc.h"
+#include "posix/file_content.h"
 #include "posix/file_descriptor.h"
-#include "posix/file_reading.h"
 #include "posix/files.h"
 
 namespace {

@@ -11,6 +11,7 @@
 #include "platform/velaindex.h"
 #include "posix/file_descriptor.h"
 #include "posix/file_lock.h"
+#include "posix/file_version.h"
 
 namespace {
 
