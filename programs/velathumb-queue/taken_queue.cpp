@@ -12,8 +12,8 @@
 #include "platform/system_rules.h"
 #include "platform/velaindex.h"
 #include "platform/vlibc.h"
-#include "posix/files.h"
 #include "posix/file_lock.h"
+#include "posix/files.h"
 #include "posix/service_log.h"
 #include "storage/creation_queue.h"
 

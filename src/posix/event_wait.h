@@ -1,4 +1,4 @@
-// Waits for the end of a child, a signal to stop, or a new queue.
+// Waiting for the end of a child, a signal to stop, or a change of a file.
 #pragma once
 
 #include <chrono>
@@ -9,7 +9,7 @@
 
 namespace vela {
 
-/// Waits for all events that the runner handles. Blocks SIGCHLD, SIGTERM and SIGINT for the
+/// Waits for the events of a service that runs children. Blocks SIGCHLD, SIGTERM and SIGINT for the
 /// process.
 class EventWait {
  public:

@@ -1,4 +1,4 @@
-#include "event_wait.h"
+#include "posix/event_wait.h"
 
 #include <poll.h>
 #include <sys/inotify.h>
