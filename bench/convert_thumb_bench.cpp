@@ -1,10 +1,9 @@
-// What the converter costs beside ImageMagick with the same arguments, beside vipsthumbnail making
-// the largest output alone, and beside the floor: a scaled decode and the encodes alone, as djpeg
-// and cjpeg do them.
+// Compares the converter with ImageMagick (same arguments), with vipsthumbnail (largest output
+// only) and with a floor: only a scaled decode and the encodes, by djpeg and cjpeg.
 //
 // usage: convert_thumb_bench CONVERT-THUMB DIRECTORY
 //
-// Makes its photos in the directory and leaves them there.
+// Creates its photos in the directory and keeps them.
 
 #include <algorithm>
 #include <cstdio>
@@ -29,7 +28,7 @@ struct Paths {
   std::string directory;
 };
 
-/// What the six outputs of one photo cost.
+/// The cost of the six outputs of one photo.
 struct Comparison {
   Cost converter;
   Cost imageMagick;
@@ -37,7 +36,7 @@ struct Comparison {
   std::optional<Cost> floor;
 };
 
-/// The commands of a subject one after another.
+/// Runs the commands of a subject one after another.
 Cost RunAll(const std::vector<Command>& commands) {
   Cost sum;
   for (const Command& command : commands) {
@@ -61,7 +60,7 @@ Comparison Compare(const BenchPhoto& photo, const Paths& paths) {
       Subject({ours}), Subject({SixOutputs(kImageMagick, path, paths.directory)}),
       Subject({LargestByVips(path, paths.directory)})};
   if (IsJpeg(photo)) {
-    TimedRun(ours);  // the floor encodes its outputs
+    TimedRun(ours);  // the floor uses its outputs
     subjects.push_back(Subject(DecodeAndEncodes(path, photo.width, paths.directory)));
   }
   const std::vector<Cost> best = LeastOf(kRounds, subjects);
@@ -77,7 +76,7 @@ void PrintHeading(const char* text) {
               "peak");
 }
 
-/// Times: how often this goes into what ImageMagick takes.
+/// "times" is ImageMagick's cost divided by this one.
 void PrintCost(const char* name, const Cost& cost, const Cost& imageMagick) {
   std::printf("  %-28s %7.1f ms %6.2f %7.1f ms %6.2f %6.1f MiB\n", name, cost.wallSeconds * 1e3,
               imageMagick.wallSeconds / cost.wallSeconds, cost.cpuSeconds * 1e3,
@@ -85,7 +84,7 @@ void PrintCost(const char* name, const Cost& cost, const Cost& imageMagick) {
 }
 
 void Print(const BenchPhoto& photo, const Comparison& comparison) {
-  std::printf("%s\n", photo.says);
+  std::printf("%s\n", photo.description);
   PrintCost("converter", comparison.converter, comparison.imageMagick);
   PrintCost("ImageMagick", comparison.imageMagick, comparison.imageMagick);
   PrintCost("vipsthumbnail, largest alone", comparison.vips, comparison.imageMagick);
@@ -107,7 +106,7 @@ void MeasureAll(const std::vector<BenchPhoto>& photos, const Paths& paths) {
   }
 }
 
-/// One small output of a tiny photo, beside a program that does nothing.
+/// One small output of a tiny photo, compared with a program that does nothing.
 void MeasureStart(const char* extension, const Paths& paths) {
   constexpr int kRuns = 100;
   const std::string photo = MakePhoto({"tiny", 16, 16, extension, false}, paths.directory);

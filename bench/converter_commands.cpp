@@ -47,7 +47,8 @@ void AppendLast(Command& command, const std::string& directory) {
   command.push_back(PathOf(kOutputs[kLast], directory));
 }
 
-/// The smallest number of eighths that leaves the photo half as large again as the first output.
+/// Returns the smallest number of eighths at which the photo is at least one and a half times as
+/// large as the first output.
 std::string ScaleFor(int width) {
   int eighths = 1;
   while (eighths < 8 && width * eighths / 8 * 2 < kOutputs[0].side * 3) {

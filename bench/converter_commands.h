@@ -1,4 +1,4 @@
-// The command lines that the converter's benchmark compares.
+// The command lines that the benchmark of the converter compares.
 #pragma once
 
 #include <string>
@@ -10,20 +10,20 @@ using Command = std::vector<std::string>;
 
 constexpr char kImageMagick[] = "/usr/bin/convert-im6.q16";
 
-/// Six sharpened outputs of a photo in one run, as velathumb asks for them, written to `directory`.
+/// Six sharpened outputs of a photo in one run, as requested by velathumb, written to `directory`.
 /// `program`: the converter or ImageMagick.
 Command SixOutputs(const std::string& program, const std::string& photo,
                    const std::string& directory);
 
-/// The smallest of the six alone.
+/// Only the smallest of the six.
 Command SmallestOutput(const std::string& program, const std::string& photo,
                        const std::string& directory);
 
-/// The largest of the six alone, made by vipsthumbnail.
+/// Only the largest of the six, made by vipsthumbnail.
 Command LargestByVips(const std::string& photo, const std::string& directory);
 
-/// What cannot be left out: a decode of the JPEG (`width` pixels wide) at a fraction of its size,
-/// and the encodes of the six outputs, which SixOutputs has to have made in `directory`.
+/// The unavoidable work: decoding the JPEG (`width` pixels wide) at a fraction of its size, and
+/// encoding the six outputs, which SixOutputs must have created in `directory`.
 std::vector<Command> DecodeAndEncodes(const std::string& photo, int width,
                                       const std::string& directory);
 

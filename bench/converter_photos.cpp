@@ -9,7 +9,7 @@ namespace vela_bench {
 
 namespace {
 
-bool IsThere(const std::string& path) {
+bool Exists(const std::string& path) {
   return access(path.c_str(), R_OK) == 0;
 }
 
@@ -17,7 +17,7 @@ std::string SizeText(const BenchPhoto& photo) {
   return std::to_string(photo.width) + "x" + std::to_string(photo.height);
 }
 
-/// Detail at every scale and the grain of a sensor.
+/// Creates detail at every scale and sensor noise.
 void MakeBaseline(const BenchPhoto& photo, const std::string& path) {
   TimedRun({kImageMagick, "-seed", "1", "-size", SizeText(photo), "plasma:sienna-steelblue",
             "-attenuate", "0.2", "+noise", "Gaussian", "-sampling-factor", "2x2", "-quality", "92",
@@ -49,11 +49,11 @@ bool IsJpeg(const BenchPhoto& photo) {
 std::string MakePhoto(const BenchPhoto& photo, const std::string& directory) {
   const std::string stem = directory + "/" + SizeText(photo);
   const std::string baseline = stem + ".jpg";
-  if (!IsThere(baseline)) {
+  if (!Exists(baseline)) {
     MakeBaseline(photo, baseline);
   }
   const std::string path = stem + (photo.progressive ? "p." : ".") + photo.extension;
-  if (!IsThere(path)) {
+  if (!Exists(path)) {
     TimedRun({kImageMagick, baseline, "-interlace", photo.progressive ? "Plane" : "None", path});
   }
   return path;

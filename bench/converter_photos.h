@@ -1,4 +1,4 @@
-// The photos of the converter's benchmark.
+// The photos for the benchmark of the converter.
 #pragma once
 
 #include <string>
@@ -7,22 +7,22 @@
 namespace vela_bench {
 
 struct BenchPhoto {
-  const char* says;
+  const char* description;
   int width;              ///< pixels
   int height;             ///< pixels
-  const char* extension;  ///< and so the format
+  const char* extension;  ///< selects the format
   bool progressive;       ///< JPEG only
 };
 
 /// Baseline JPEGs from the smallest to the largest.
 std::vector<BenchPhoto> BaselinePhotos();
 
-/// The other kinds.
+/// Progressive JPEGs and other formats.
 std::vector<BenchPhoto> OtherPhotos();
 
 bool IsJpeg(const BenchPhoto& photo);
 
-/// Makes the photo in `directory` unless it is there; returns its path.
+/// Creates the photo in `directory` unless it exists; returns its path.
 std::string MakePhoto(const BenchPhoto& photo, const std::string& directory);
 
 }  // namespace vela_bench

@@ -1,11 +1,11 @@
-// Keeps programs on one processor.
+// Restricts programs to one processor.
 #pragma once
 
 #include <sched.h>
 
 namespace vela_bench {
 
-/// While it lives, this process and what it starts run on one of the processors they may use.
+/// During its lifetime, this process and its children run on one of the available processors.
 class OneProcessor {
  public:
   OneProcessor();
@@ -17,7 +17,7 @@ class OneProcessor {
   cpu_set_t before_ = {};
 };
 
-/// How many processors this process may use.
+/// Returns the number of processors that this process may use.
 int UsableProcessors();
 
 }  // namespace vela_bench

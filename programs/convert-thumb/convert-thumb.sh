@@ -1,11 +1,11 @@
 #!/bin/sh
-# Stands at /usr/vela/bin/convert-thumb in front of ImageMagick's convert, which is linked as
+# Installed as /usr/vela/bin/convert-thumb in front of ImageMagick's convert, which is linked as
 # /usr/vela/lib/convert-thumb so that the process keeps its name.
 #
-# ImageMagick takes a photo's name for more than a name: one with a wildcard stands for other files,
-# or makes it read the photo's content as a list of further arguments, options to write elsewhere
-# included; a number format or a doubled percent sign in front of a page selection names another
-# file. Such a photo is refused here, and gets its failure markers, rather than another's picture.
+# Some file names have a special meaning to ImageMagick: wildcards match other files, "@" makes it read
+# the content of the file as further arguments, which may write to other files, and a number format or
+# a doubled percent sign before a page selection refers to another file. Photos with such names are
+# rejected here, so that they get failure markers instead of the picture of another photo.
 set -eu
 LC_ALL=C
 export LC_ALL

@@ -1,30 +1,28 @@
 // convert-thumb: makes all thumbnails of a photo in one run.
 
-#include <fcntl.h>
-#include <sys/stat.h>
-
 #include <cerrno>
+#include <cstddef>
 #include <cstring>
 #include <exception>
 #include <memory>
 #include <new>
-#include <optional>
 #include <string>
+#include <variant>
 #include <vector>
 
-#include "command_line/plan_parser.h"
-#include "confinement/confinement.h"
-#include "confinement/memory_limit.h"
-#include "confinement/resource_limits.h"
-#include "confinement/writable_places.h"
+#include "command_line/command_line.h"
+#include "command_line/writable_paths.h"
 #include "decoding/photo_opener.h"
-#include "encoding/unfinished_outputs.h"
-#include "failure_line.h"
 #include "imagemagick/image_magick.h"
 #include "posix/file_descriptor.h"
-#include "thumbnails.h"
+#include "process/confinement.h"
+#include "process/failure_report.h"
+#include "process/resource_limits.h"
+#include "process/source_file.h"
+#include "process/unfinished_outputs.h"
+#include "process/write_signals.h"
+#include "thumbnails/thumbnails.h"
 #include "turning/jpeg_turn.h"
-#include "write_signals.h"
 
 namespace vela {
 
@@ -33,71 +31,70 @@ namespace {
 constexpr int kDone = 0;
 constexpr int kFailed = 1;
 
-/// Returns only when ImageMagick could not be started.
-int LeaveToImageMagick(const std::vector<std::string>& arguments, size_t memoryLimit) {
-  HandOver(arguments, memoryLimit);
+/// Returns only if ImageMagick could not be started.
+int LeaveToImageMagick(const CommandLine& line, size_t memoryLimit) {
+  HandOver(line, memoryLimit);
   return kFailed;
 }
 
-bool IsRegularFile(int descriptor) {
-  struct stat status;
-  return fstat(descriptor, &status) == 0 && S_ISREG(status.st_mode);
-}
-
-int Convert(const ConversionPlan& plan, const std::vector<std::string>& arguments,
-            size_t memoryLimit) {
-  // Opening must not wait when the source is a pipe.
-  const FileDescriptor file(
-      open(plan.source.c_str(), O_RDONLY | O_CLOEXEC | O_NOCTTY | O_NONBLOCK));
+int Convert(const ConversionPlan& plan, const CommandLine& line, size_t memoryLimit) {
+  const FileDescriptor file = OpenForReading(plan.source);
   if (!file.IsOpen()) {
-    TellFailure("cannot open %s: %s", plan.source.c_str(), std::strerror(errno));
+    ReportFailure("cannot open %s: %s", plan.source.c_str(), std::strerror(errno));
     return kFailed;
   }
-  if (!IsRegularFile(file.Get())) {
-    return LeaveToImageMagick(arguments, memoryLimit);
+  if (TypeOf(file.Get()) != FileType::kRegular) {
+    return LeaveToImageMagick(line, memoryLimit);
   }
   const std::unique_ptr<PhotoReader> reader = OpenPhoto(file.Get(), plan, memoryLimit);
-  if (reader == nullptr) {
-    return LeaveToImageMagick(arguments, memoryLimit);
+  if (reader == nullptr || !CanMakeThumbnails(reader->Traits(), plan)) {
+    return LeaveToImageMagick(line, memoryLimit);
   }
   ConfineToThisProgram();
   return MakeThumbnails(*reader, plan, memoryLimit) ? kDone : kFailed;
 }
 
-int TurnFile(const TurnPlan& plan, const std::vector<std::string>& arguments, size_t memoryLimit) {
-  const FileTurn turn = TurnJpegFile(plan.path, plan.quarterTurns, memoryLimit);
-  if (turn == FileTurn::kImpossible) {
-    return LeaveToImageMagick(arguments, memoryLimit);
+int Turn(const TurnPlan& plan, const CommandLine& line, size_t memoryLimit) {
+  switch (TurnJpegFile(plan.path, plan.quarterTurns, memoryLimit)) {
+    case FileTurn::kDone:
+      return kDone;
+    case FileTurn::kImpossible:
+      return LeaveToImageMagick(line, memoryLimit);
+    case FileTurn::kFailed:
+      break;
   }
-  return turn == FileTurn::kDone ? kDone : kFailed;
+  return kFailed;
 }
 
-int Run(const std::vector<std::string>& arguments, size_t memoryLimit) {
-  if (const std::optional<TurnPlan> turn = ParseTurn(arguments)) {
-    return TurnFile(*turn, arguments, memoryLimit);
+int Run(const CommandLine& line, size_t memoryLimit) {
+  if (const auto* const turn = std::get_if<TurnPlan>(&line.task)) {
+    return Turn(*turn, line, memoryLimit);
   }
-  const std::optional<ConversionPlan> plan = ParseConversion(arguments);
-  return plan ? Convert(*plan, arguments, memoryLimit) : LeaveToImageMagick(arguments, memoryLimit);
+  if (const auto* const conversion = std::get_if<ConversionPlan>(&line.task)) {
+    return Convert(*conversion, line, memoryLimit);
+  }
+  return LeaveToImageMagick(line, memoryLimit);
 }
 
 int RunMain(int argc, char** argv) {
   int status = kFailed;
   try {
-    const std::vector<std::string> arguments(argv + (argc > 0 ? 1 : 0), argv + argc);
+    const CommandLine line =
+        ParseCommandLine(std::vector<std::string>(argv + (argc > 0 ? 1 : 0), argv + argc));
     IgnoreWriteSignals();
-    EndCleanlyOnFatalSignals();
+    CleanUpOnFatalSignals();
     const size_t memoryLimit = ConversionMemoryLimit();
     LimitResources(memoryLimit);
-    Confine(FindWritablePlaces(arguments));
-    status = Run(arguments, memoryLimit);
+    Confine(FindWritablePaths(line));
+    status = Run(line, memoryLimit);
   } catch (const std::bad_alloc&) {
-    TellFailure("out of memory");
+    ReportFailure("out of memory");
   } catch (const std::exception& error) {
-    TellFailure("%s", error.what());
+    ReportFailure("%s", error.what());
   }
   if (status != kDone) {
-    RemoveNotedOutputs();
-    WriteFailureLine();
+    RemoveRegisteredOutputs();
+    PrintFailure();
   }
   return status;
 }

@@ -1,7 +1,7 @@
 // The time limit of a child whose output is read with blocking calls.
 #pragma once
 
-#include <sys/types.h>
+#include "posix/child_process.h"
 
 #include <chrono>
 #include <condition_variable>

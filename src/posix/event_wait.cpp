@@ -7,8 +7,7 @@
 #include <algorithm>
 #include <cerrno>
 #include <csignal>
-
-#include "platform/velautils.h"
+#include <filesystem>
 
 namespace vela {
 
@@ -26,7 +25,7 @@ int EventWait::Open(const std::string& watchedFile) {
   if (!signals_.IsOpen() || !changes_.IsOpen()) {
     return errno;
   }
-  const std::string directory = VELAUtils::GetPathDirName(watchedFile);
+  const std::string directory = std::filesystem::path(watchedFile).parent_path();
   constexpr uint32_t kChanges = IN_CREATE | IN_MOVED_TO | IN_CLOSE_WRITE;
   return inotify_add_watch(changes_.Get(), directory.c_str(), kChanges) >= 0 ? 0 : errno;
 }

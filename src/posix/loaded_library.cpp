@@ -14,4 +14,13 @@ void* LoadedLibrary::Address(const char* name) {
   return address;
 }
 
+std::string LoadedLibrary::DirectoryOfAddress(const void* address) {
+  Dl_info info = {};
+  if (dladdr(address, &info) == 0 || info.dli_fname == nullptr) {
+    return "";
+  }
+  const std::string file = info.dli_fname;
+  return file.substr(0, file.rfind('/') + 1);
+}
+
 }  // namespace vela

@@ -1,11 +1,12 @@
-// The converter's command line: arguments, each but the first behind a zero byte.
+// The converter's command line: arguments separated by zero bytes.
 
 #include <cstdlib>
 #include <string>
+#include <variant>
 #include <vector>
 
-#include "command_line/plan_parser.h"
-#include "confinement/writable_places.h"
+#include "command_line/command_line.h"
+#include "command_line/writable_paths.h"
 
 using namespace vela;
 
@@ -29,8 +30,8 @@ bool IsWhole(const OutputPlan& output) {
   return hasBox && hasQuality && !output.path.empty();
 }
 
-bool CanBeWritten(const std::string& path, const WritablePlaces& places) {
-  for (const std::string& file : places.files) {
+bool CanBeWritten(const std::string& path, const WritablePaths& paths) {
+  for (const std::string& file : paths.files) {
     if (file == path) {
       return true;
     }
@@ -41,21 +42,24 @@ bool CanBeWritten(const std::string& path, const WritablePlaces& places) {
 }  // namespace
 
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
-  const std::vector<std::string> arguments = Split(data, size);
-  const WritablePlaces places = FindWritablePlaces(arguments);
-  if (FindSourceArgument(arguments) > arguments.size()) {
+  const CommandLine line = ParseCommandLine(Split(data, size));
+  const WritablePaths paths = FindWritablePaths(line);
+  if (line.sourceIndex > line.arguments.size()) {
     std::abort();
   }
-  const std::optional<TurnPlan> turn = ParseTurn(arguments);
-  if (turn && (turn->quarterTurns < 1 || turn->quarterTurns > 3)) {
+  const auto* const turn = std::get_if<TurnPlan>(&line.task);
+  if (turn != nullptr && (turn->quarterTurns < 1 || turn->quarterTurns > 3)) {
     std::abort();
   }
-  const std::optional<ConversionPlan> plan = ParseConversion(arguments);
-  if (plan && plan->outputs.empty()) {
+  const auto* const conversion = std::get_if<ConversionPlan>(&line.task);
+  if (conversion == nullptr) {
+    return 0;
+  }
+  if (conversion->outputs.empty()) {
     std::abort();
   }
-  for (const OutputPlan& output : plan ? plan->outputs : std::vector<OutputPlan>()) {
-    if (!IsWhole(output) || !CanBeWritten(output.path, places)) {
+  for (const OutputPlan& output : conversion->outputs) {
+    if (!IsWhole(output) || !CanBeWritten(output.path, paths)) {
       std::abort();
     }
   }

@@ -8,10 +8,10 @@
 #include <memory>
 
 #include "decoding/photo_opener.h"
-#include "encoding/unfinished_outputs.h"
 #include "input_file.h"
 #include "posix/file_descriptor.h"
-#include "thumbnails.h"
+#include "process/unfinished_outputs.h"
+#include "thumbnails/thumbnails.h"
 
 using namespace vela;
 
@@ -54,12 +54,16 @@ bool IsSmall(const PhotoReader& reader) {
 
 }  // namespace
 
-/// A million runs in one process would fill its list.
-bool NoteOutput(const std::string& /*path*/) {
+namespace vela {
+
+// Replace those of the program, whose list would grow with every run.
+bool RegisterOutput(const std::string& /*path*/) {
   return true;
 }
 
-void ForgetOutput(const std::string& /*path*/) {}
+void UnregisterOutput(const std::string& /*path*/) {}
+
+}  // namespace vela
 
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
   const InputFile input(data, size);
@@ -72,9 +76,9 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
   const int quarterTurns = static_cast<int>(size % 2);
   plan.outputs = {MakeOutput(first.Path(), {100, 80, false}, quarterTurns),
                   MakeOutput(second.Path(), {20, 20, true}, quarterTurns)};
-  const Descriptor file(open(input.Path().c_str(), O_RDONLY | O_CLOEXEC));
+  const FileDescriptor file(open(input.Path().c_str(), O_RDONLY | O_CLOEXEC));
   const std::unique_ptr<PhotoReader> reader = OpenPhoto(file.Get(), plan, kMemoryLimit);
-  if (reader == nullptr || !IsSmall(*reader)) {
+  if (reader == nullptr || !CanMakeThumbnails(reader->Traits(), plan) || !IsSmall(*reader)) {
     return 0;
   }
   if (MakeThumbnails(*reader, plan, kMemoryLimit) &&

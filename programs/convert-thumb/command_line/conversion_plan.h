@@ -4,22 +4,10 @@
 #include <string>
 #include <vector>
 
+#include "picture/thumbnail_size.h"
+#include "picture/unsharp.h"
+
 namespace vela {
-
-/// The box that a thumbnail is scaled to; a picture that is smaller keeps its size.
-struct ThumbnailBox {
-  int width = 0;      ///< pixels, at least 1
-  int height = 0;     ///< pixels, at least 1
-  bool fill = false;  ///< the box is a minimum for both sides, not a maximum
-};
-
-/// Parameters of the sharpening.
-struct UnsharpMask {
-  double radius = 0;        ///< pixels; 0: chosen from `sigma`
-  double sigma = 1;         ///< pixels, more than 0
-  double amount = 1;        ///< share of the difference that is added
-  double threshold = 0.05;  ///< share of the whole range that a difference has to reach
-};
 
 /// One change of the picture after scaling.
 struct Step {
@@ -37,11 +25,17 @@ struct OutputPlan {
   std::string path;
 };
 
-/// A whole run: the first thumbnail is made from the source, every other one from the first.
+/// The thumbnails of one photo: the first is made from the photo, all others from the first.
 struct ConversionPlan {
   std::string source;
-  bool firstPageOnly = false;       ///< any further pages of the source are left alone
+  bool firstPageOnly = false;       ///< ignore further pages of the source
   std::vector<OutputPlan> outputs;  ///< at least one
+};
+
+/// A file to be turned in place.
+struct TurnPlan {
+  std::string path;
+  int quarterTurns = 0;  ///< clockwise, 1 to 3
 };
 
 }  // namespace vela

@@ -1,25 +1,25 @@
 #include "command_line/option_values.h"
 
-#include <strings.h>
-
 #include <charconv>
+
+#include "command_line/file_name.h"
 
 namespace vela {
 
 namespace {
 
-constexpr int kLargestSide = 65535;
-constexpr int kLargestTurn = 360000;
-constexpr double kLargestRadius = 50;
-constexpr double kLargestSigma = 15;
-constexpr double kSmallestSigma = 0.01;
-constexpr double kLargestAmount = 100;
+constexpr int kMaxSide = 65535;
+constexpr int kMaxTurn = 360000;
+constexpr double kMaxRadius = 50;
+constexpr double kMaxSigma = 15;
+constexpr double kMinSigma = 0.01;
+constexpr double kMaxAmount = 100;
 
 bool IsDigit(char character) {
   return character >= '0' && character <= '9';
 }
 
-/// Reads a fraction such as "0.8" or ".8" off the front of `text`.
+/// Removes a fraction such as "0.8" or ".8" from the front of `text` and returns it.
 std::optional<double> TakeFraction(std::string& text) {
   size_t length = 0;
   while (length < text.size() && (IsDigit(text[length]) || text[length] == '.')) {
@@ -35,7 +35,8 @@ std::optional<double> TakeFraction(std::string& text) {
   return value;
 }
 
-/// Reads `mark` and the fraction behind it into `value`, which stays when the mark is not there.
+/// Removes `mark` and the fraction after it and stores that in `value`; without the mark, `value`
+/// is left alone.
 bool TakeMarkedFraction(std::string& text, char mark, double& value) {
   if (text.empty() || text.front() != mark) {
     return true;
@@ -48,27 +49,23 @@ bool TakeMarkedFraction(std::string& text, char mark, double& value) {
   return fraction.has_value();
 }
 
-bool IsUsual(const UnsharpMask& mask) {
-  return mask.radius <= kLargestRadius && mask.sigma >= kSmallestSigma &&
-         mask.sigma <= kLargestSigma && mask.amount <= kLargestAmount && mask.threshold <= 1;
+bool IsInRange(const UnsharpMask& mask) {
+  return mask.radius <= kMaxRadius && mask.sigma >= kMinSigma && mask.sigma <= kMaxSigma &&
+         mask.amount <= kMaxAmount && mask.threshold <= 1;
 }
 
 bool HasJpegExtension(const std::string& path) {
-  const size_t dot = path.find_last_of("./");
-  if (dot == std::string::npos || path[dot] != '.') {
-    return false;
-  }
-  const char* extension = path.c_str() + dot + 1;
-  return strcasecmp(extension, "jpg") == 0 || strcasecmp(extension, "jpeg") == 0;
+  const std::string_view extension = ExtensionOf(path);
+  return EqualsIgnoringCase(extension, "jpg") || EqualsIgnoringCase(extension, "jpeg");
 }
 
 }  // namespace
 
-std::optional<int> ParseWholeNumber(const std::string& text, int least, int most) {
+std::optional<int> ParseWholeNumber(const std::string& text, int min, int max) {
   int value = 0;
   const char* const last = text.data() + text.size();
   const auto [end, error] = std::from_chars(text.data(), last, value);
-  if (error != std::errc() || end != last || text.front() == '-' || value < least || value > most) {
+  if (error != std::errc() || end != last || text.front() == '-' || value < min || value > max) {
     return std::nullopt;
   }
   return value;
@@ -84,9 +81,9 @@ std::optional<ThumbnailBox> ParseThumbnailBox(const std::string& text) {
   if (flags != ">" && flags != ">^") {
     return std::nullopt;
   }
-  const std::optional<int> width = ParseWholeNumber(text.substr(0, cross), 1, kLargestSide);
+  const std::optional<int> width = ParseWholeNumber(text.substr(0, cross), 1, kMaxSide);
   const std::optional<int> height =
-      ParseWholeNumber(text.substr(cross + 1, mark - cross - 1), 1, kLargestSide);
+      ParseWholeNumber(text.substr(cross + 1, mark - cross - 1), 1, kMaxSide);
   if (!width || !height) {
     return std::nullopt;
   }
@@ -103,14 +100,14 @@ std::optional<UnsharpMask> ParseUnsharpMask(const std::string& text) {
     return std::nullopt;
   }
   mask.radius = *radius;
-  if (!IsUsual(mask)) {
+  if (!IsInRange(mask)) {
     return std::nullopt;
   }
   return mask;
 }
 
 std::optional<int> ParseQuarterTurns(const std::string& text) {
-  const std::optional<int> degrees = ParseWholeNumber(text, 0, kLargestTurn);
+  const std::optional<int> degrees = ParseWholeNumber(text, 0, kMaxTurn);
   if (!degrees || *degrees % 90 != 0) {
     return std::nullopt;
   }

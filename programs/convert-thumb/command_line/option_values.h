@@ -1,4 +1,4 @@
-// The values that options carry.
+// Parses the values of options.
 #pragma once
 
 #include <optional>
@@ -8,21 +8,21 @@
 
 namespace vela {
 
-/// A whole number without sign, from `least` to `most`; empty for any other text.
-std::optional<int> ParseWholeNumber(const std::string& text, int least, int most);
+/// Parses a whole number without a sign, from `min` to `max`; empty for any other text.
+std::optional<int> ParseWholeNumber(const std::string& text, int min, int max);
 
-/// "WxH>" or "WxH>^", both sides in pixels from 1 to 65535; empty for any other text.
+/// Parses "WxH>" or "WxH>^", both sides in pixels from 1 to 65535; empty for any other text.
 std::optional<ThumbnailBox> ParseThumbnailBox(const std::string& text);
 
-/// "RADIUS[xSIGMA][+AMOUNT][+THRESHOLD]" in decimal fractions, missing parts as UnsharpMask has
-/// them. Empty for any other text and for sizes that no photo is sharpened with.
+/// Parses "RADIUS[xSIGMA][+AMOUNT][+THRESHOLD]" in decimal fractions; missing parts have the
+/// defaults of UnsharpMask. Empty for any other text and for values out of the supported range.
 std::optional<UnsharpMask> ParseUnsharpMask(const std::string& text);
 
-/// Degrees clockwise as quarter turns, 0 to 3; empty when it is no multiple of 90.
+/// Parses degrees clockwise and returns quarter turns, 0 to 3; empty unless a multiple of 90.
 std::optional<int> ParseQuarterTurns(const std::string& text);
 
-/// The file name that an output argument stands for: a doubled percent sign is a single one. Empty
-/// when the text has any other percent sign or names anything but a JPEG file.
+/// Returns the file name of an output argument, in which "%%" represents a percent sign. Empty when
+/// the text contains any other percent sign or does not name a JPEG file.
 std::optional<std::string> ParseOutputPath(const std::string& text);
 
 }  // namespace vela

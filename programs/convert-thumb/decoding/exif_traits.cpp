@@ -20,7 +20,7 @@ using OwnedExif = std::unique_ptr<ExifData, ExifDataUnref>;
 OwnedExif Load(const uint8_t* data, size_t size) {
   OwnedExif exif(exif_data_new());
   if (exif != nullptr) {
-    // Repairs would change values of tags that are wrong, and take time.
+    // Would repair wrong tags, which changes their values and takes time.
     exif_data_unset_option(exif.get(), EXIF_DATA_OPTION_FOLLOW_SPECIFICATION);
     exif_data_load_data(exif.get(), data, static_cast<unsigned>(size));
   }
@@ -39,7 +39,7 @@ int ShortOf(const OwnedExif& exif, ExifTag tag) {
   return exif_get_short(entry->data, exif_data_get_byte_order(exif.get()));
 }
 
-/// 0 when the tag is absent or no density.
+/// Returns 0 when the tag is missing or invalid.
 int DensityOf(const OwnedExif& exif, ExifTag tag) {
   const ExifEntry* const entry = EntryOf(exif, tag);
   if (entry == nullptr || entry->format != EXIF_FORMAT_RATIONAL || entry->size < 8) {
@@ -50,10 +50,10 @@ int DensityOf(const OwnedExif& exif, ExifTag tag) {
     return 0;
   }
   return static_cast<int>(
-      std::min(static_cast<double>(value.numerator) / value.denominator, double{kLargestDensity}));
+      std::min(static_cast<double>(value.numerator) / value.denominator, double{kMaxDensity}));
 }
 
-void TakeDensity(const OwnedExif& exif, JpegDensity& density) {
+void ReadDensity(const OwnedExif& exif, JpegDensity& density) {
   const int x = DensityOf(exif, EXIF_TAG_X_RESOLUTION);
   const int y = DensityOf(exif, EXIF_TAG_Y_RESOLUTION);
   const int unit = ShortOf(exif, EXIF_TAG_RESOLUTION_UNIT);
@@ -69,7 +69,7 @@ void TakeDensity(const OwnedExif& exif, JpegDensity& density) {
 
 }  // namespace
 
-void TakeExifTraits(const uint8_t* data, size_t size, PhotoTraits& traits) {
+void ReadExifTraits(const uint8_t* data, size_t size, PhotoTraits& traits) {
   const OwnedExif exif = Load(data, size);
   if (exif == nullptr) {
     return;
@@ -78,7 +78,7 @@ void TakeExifTraits(const uint8_t* data, size_t size, PhotoTraits& traits) {
   if (orientation >= 1 && orientation <= 8) {
     traits.orientation = orientation;
   }
-  TakeDensity(exif, traits.density);
+  ReadDensity(exif, traits.density);
 }
 
 }  // namespace vela

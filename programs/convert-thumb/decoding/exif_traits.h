@@ -1,15 +1,15 @@
-// Reads what matters for thumbnails from EXIF data.
+// The EXIF data that affects thumbnails.
 #pragma once
 
 #include <cstddef>
 #include <cstdint>
 
-#include "decoding/photo_traits.h"
+#include "picture/photo_traits.h"
 
 namespace vela {
 
-/// Takes orientation and density from the data of an APP1 segment, "Exif" marking included, into
-/// `traits`; leaves alone what the data does not say.
-void TakeExifTraits(const uint8_t* data, size_t size, PhotoTraits& traits);
+/// Stores the orientation and density of an APP1 segment, which starts with "Exif", in `traits`.
+/// Leaves values alone that the data does not contain.
+void ReadExifTraits(const uint8_t* data, size_t size, PhotoTraits& traits);
 
 }  // namespace vela

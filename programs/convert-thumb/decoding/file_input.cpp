@@ -1,9 +1,8 @@
 #include "decoding/file_input.h"
 
-#include <unistd.h>
-
 #include <algorithm>
-#include <cerrno>
+
+#include "process/source_file.h"
 
 namespace vela {
 
@@ -20,16 +19,13 @@ int FileInput::Read(unsigned char* bytes, int size) {
 }
 
 bool FileInput::Fill() {
-  const auto room = static_cast<off_t>(buffer_.size());
-  const auto size = static_cast<size_t>(std::min(room, kMostBytes - place_));
-  ssize_t count = 0;
-  do {
-    count = pread(descriptor_, buffer_.data(), size, place_);
-  } while (count < 0 && errno == EINTR);
+  const auto capacity = static_cast<int64_t>(buffer_.size());
+  const auto size = static_cast<size_t>(std::min(capacity, kMaxBytes - offset_));
+  const int64_t count = ReadSomeAt(descriptor_, buffer_.data(), size, offset_);
   if (count <= 0) {
     return false;
   }
-  place_ += count;
+  offset_ += count;
   begin_ = 0;
   end_ = static_cast<size_t>(count);
   return true;

@@ -1,33 +1,32 @@
-// Feeds libraries that ask for bytes by a function.
+// Input for libraries that read through a callback.
 #pragma once
-
-#include <sys/types.h>
 
 #include <array>
 #include <cstddef>
+#include <cstdint>
 
 namespace vela {
 
-/// Reads the beginning of a file, whatever place its descriptor reads from, and leaves that alone.
+/// Reads a file from its start, regardless of the descriptor's position, which it leaves alone.
 class FileInput {
  public:
-  /// No photo that is decoded here has more in front of its first samples. A file that goes on and
-  /// on before them was made to waste time.
-  static constexpr off_t kMostBytes = off_t{16} << 20;
+  /// Real photos have less data than this in front of the first samples; files with more were
+  /// crafted to waste time.
+  static constexpr int64_t kMaxBytes = int64_t{16} << 20;
 
   explicit FileInput(int descriptor) : descriptor_(descriptor) {}
 
-  /// Reads up to `size` bytes to `bytes`; returns how many, fewer only at the file's end or behind
-  /// kMostBytes.
+  /// Reads up to `size` bytes. Returns their number, which is smaller only at the end of the file
+  /// or after kMaxBytes.
   int Read(unsigned char* bytes, int size);
 
  private:
   bool Fill();
 
   int descriptor_;
-  off_t place_ = 0;  ///< in the file, behind the buffer
+  int64_t offset_ = 0;  ///< in the file, after the buffer
   std::array<unsigned char, 65536> buffer_;
-  size_t begin_ = 0;  ///< of what has not been handed out
+  size_t begin_ = 0;  ///< of the bytes that have not been read
   size_t end_ = 0;
 };
 

@@ -1,11 +1,41 @@
 #include "decoding/gif_frame.h"
 
 #include "decoding/file_input.h"
-#include "decoding/gif_library.h"
+#include "posix/loaded_library.h"
+
+#include <gif_lib.h>
 
 namespace vela {
 
 namespace {
+
+/// The functions of giflib that are used. It is loaded for a GIF only.
+class GifLibrary final : private LoadedLibrary {
+ public:
+  /// Returns the library, loaded by the first call; null when it, or one of its functions, is
+  /// missing.
+  static const GifLibrary* Get() {
+    static const GifLibrary library;
+    return library.IsLoaded() ? &library : nullptr;
+  }
+
+  decltype(&::DGifOpen) open = nullptr;
+  decltype(&::DGifCloseFile) close = nullptr;
+  decltype(&::DGifGetRecordType) getRecordType = nullptr;
+  decltype(&::DGifGetImageDesc) getImage = nullptr;
+  decltype(&::DGifGetExtension) getExtension = nullptr;
+  decltype(&::DGifGetExtensionNext) getExtensionNext = nullptr;
+
+ private:
+  GifLibrary() : LoadedLibrary("libgif.so.7") {
+    Find("DGifOpen", open);
+    Find("DGifCloseFile", close);
+    Find("DGifGetRecordType", getRecordType);
+    Find("DGifGetImageDesc", getImage);
+    Find("DGifGetExtension", getExtension);
+    Find("DGifGetExtensionNext", getExtensionNext);
+  }
+};
 
 int ReadInput(GifFileType* gif, GifByteType* bytes, int size) {
   return static_cast<FileInput*>(gif->UserData)->Read(bytes, size);
@@ -34,7 +64,7 @@ bool FindFrame(const GifLibrary& library, GifFileType* gif) {
   return false;
 }
 
-bool Fills(const GifFileType& gif) {
+bool CoversPicture(const GifFileType& gif) {
   const GifImageDesc& frame = gif.Image;
   return frame.Left == 0 && frame.Top == 0 && frame.Width == gif.SWidth &&
          frame.Height == gif.SHeight;
@@ -42,7 +72,7 @@ bool Fills(const GifFileType& gif) {
 
 }  // namespace
 
-bool FirstFrameFillsGif(int descriptor) {
+bool FirstFrameCoversGif(int descriptor) {
   const GifLibrary* const library = GifLibrary::Get();
   if (library == nullptr) {
     return false;
@@ -52,9 +82,9 @@ bool FirstFrameFillsGif(int descriptor) {
   if (gif == nullptr) {
     return false;
   }
-  const bool fills = FindFrame(*library, gif) && Fills(*gif);
+  const bool covers = FindFrame(*library, gif) && CoversPicture(*gif);
   library->close(gif, nullptr);
-  return fills;
+  return covers;
 }
 
 }  // namespace vela

@@ -1,10 +1,10 @@
-// Tells where a GIF's first frame lies, which libvips does not.
+// The position of the first frame of a GIF, which libvips does not report.
 #pragma once
 
 namespace vela {
 
-/// Whether the first frame of the file under `descriptor` takes up the whole picture. False also
-/// when that cannot be told. Leaves the place where the descriptor reads alone.
-bool FirstFrameFillsGif(int descriptor);
+/// Returns true when the first frame of the file covers the whole picture, false also when that
+/// cannot be determined. Leaves the descriptor's position alone.
+bool FirstFrameCoversGif(int descriptor);
 
 }  // namespace vela

@@ -8,7 +8,7 @@
 
 #include "decoding/exif_traits.h"
 #include "decoding/jpeg_source.h"
-#include "jpeg_errors.h"
+#include "picture/jpeg_errors.h"
 #include "picture/resize.h"
 
 #include <jerror.h>
@@ -23,25 +23,25 @@ constexpr unsigned kLongestMarker = 65533;
 constexpr char kExifName[] = "Exif";
 constexpr char kFaxName[] = "G3FAX";
 
-/// Sizes in eighths at which decoding takes less time than at the full size.
+/// Scales, in eighths, at which decoding takes less time than at full size.
 constexpr std::array<unsigned, 5> kReductions = {1, 2, 3, 4, 5};
 constexpr unsigned kFullScale = 8;
-/// A reduced picture that is hardly larger than the thumbnail shows the blocks it was made of.
-constexpr double kReserve = 1.5;
-/// Decoding this many pixels takes too little time to lose anything for it.
+/// Scaling a reduced picture that is hardly larger than the thumbnail makes its blocks visible.
+constexpr double kMinExcess = 1.5;
+/// Decoding this many pixels takes so little time that quality is not reduced for it.
 constexpr uint64_t kFewPixels = 2000000;
-/// Where ImageMagick leaves samples out, a reduced picture, which holds averages of all of them, is
-/// less like its result. Up to this many pixels, and wherever it leaves many out, likeness counts
-/// more than time.
+/// Where ImageMagick skips samples, a reduced picture, which holds averages of all samples, differs
+/// more from its result. Up to this many pixels, and wherever ImageMagick skips many, similarity
+/// takes priority over time.
 constexpr uint64_t kManyPixels = 16000000;
 constexpr double kFineGrid = 0.75;
 
-/// A picture whose scans take more than this to read was made to waste time.
-constexpr int kMostScans = 500;
+/// A picture with more scans was crafted to waste time.
+constexpr int kMaxScans = 500;
 
-void WatchScans(j_common_ptr info) {
-  if (reinterpret_cast<j_decompress_ptr>(info)->input_scan_number > kMostScans) {
-    ERREXIT1(info, JERR_BAD_PROG_SCRIPT, kMostScans);
+void LimitScans(j_common_ptr info) {
+  if (reinterpret_cast<j_decompress_ptr>(info)->input_scan_number > kMaxScans) {
+    ERREXIT1(info, JERR_BAD_PROG_SCRIPT, kMaxScans);
   }
 }
 
@@ -76,11 +76,12 @@ struct JpegReader::State {
 
   uint64_t Pixels() const { return static_cast<uint64_t>(info.image_width) * info.image_height; }
 
-  bool IsDecodable() const {
-    return HasUsualComponents() && info.data_precision == 8 && Pixels() <= kMostPixels && !IsFax();
+  bool IsSupported() const {
+    return HasSupportedComponents() && info.data_precision == 8 && Pixels() <= kMaxPixels &&
+           !IsFax();
   }
 
-  bool HasUsualComponents() const {
+  bool HasSupportedComponents() const {
     return info.num_components == 1 || info.num_components == 3 ||
            (info.num_components == 4 && info.out_color_space == JCS_CMYK);
   }
@@ -95,7 +96,7 @@ struct JpegReader::State {
     return false;
   }
 
-  void TakeFrameTraits() {
+  void ReadFrameTraits() {
     traits.colour = info.num_components == 3;
     traits.palette = info.num_components == 1;
     traits.space = SpaceOf(info.num_components);
@@ -103,17 +104,17 @@ struct JpegReader::State {
       traits.sampling[static_cast<size_t>(i)] = {info.comp_info[i].h_samp_factor,
                                                  info.comp_info[i].v_samp_factor};
     }
-    // A density of 1 in 1 says nothing.
+    // A density of 1 by 1 is a placeholder.
     if (info.saw_JFIF_marker != 0 && info.X_density != 1 && info.Y_density != 1) {
       traits.density = {info.density_unit, info.X_density, info.Y_density};
     }
   }
 
-  void TakeExif() {
+  void ReadExif() {
     for (const jpeg_marker_struct* marker = info.marker_list; marker != nullptr;
          marker = marker->next) {
       if (marker->marker == kExifMarker && BeginsWith(*marker, kExifName)) {
-        TakeExifTraits(marker->data, marker->data_length, traits);
+        ReadExifTraits(marker->data, marker->data_length, traits);
         return;
       }
     }
@@ -121,12 +122,12 @@ struct JpegReader::State {
 
   static ColourSpace SpaceOf(int components) {
     if (components == 4) {
-      return ColourSpace::kInks;
+      return ColourSpace::kCmyk;
     }
     return components == 1 ? ColourSpace::kGrey : ColourSpace::kRgb;
   }
 
-  bool TakeColourProfile() {
+  bool ReadColourProfile() {
     JOCTET* data = nullptr;
     unsigned size = 0;
     if (!CallJpegLibrary(errors, [&] { jpeg_read_icc_profile(&info, &data, &size); })) {
@@ -139,25 +140,25 @@ struct JpegReader::State {
     return true;
   }
 
-  bool Serves(unsigned eighths, PictureSize needed) const {
-    return ScaledSide(info.image_width, eighths) >= kReserve * needed.width &&
-           ScaledSide(info.image_height, eighths) >= kReserve * needed.height;
+  bool IsLargeEnough(unsigned eighths, PictureSize needed) const {
+    return ScaledSide(info.image_width, eighths) >= kMinExcess * needed.width &&
+           ScaledSide(info.image_height, eighths) >= kMinExcess * needed.height;
   }
 
-  /// Whether the samples that ImageMagick picks have to be there.
-  bool HasToBeThinnedOut(PictureSize needed) const {
+  /// Returns true when the samples that ImageMagick picks are needed.
+  bool MustBePresampled(PictureSize needed) const {
     const PictureSize full = {static_cast<int>(info.image_width),
                               static_cast<int>(info.image_height)};
-    return IsThinnedOut(full, needed) &&
+    return IsPresampled(full, needed) &&
            (Pixels() <= kManyPixels || kGridFactor * needed.width < kFineGrid * full.width);
   }
 
   unsigned ChooseScale(PictureSize needed) const {
-    if (Pixels() <= kFewPixels || HasToBeThinnedOut(needed)) {
+    if (Pixels() <= kFewPixels || MustBePresampled(needed)) {
       return kFullScale;
     }
     for (const unsigned eighths : kReductions) {
-      if (Serves(eighths, needed)) {
+      if (IsLargeEnough(eighths, needed)) {
         return eighths;
       }
     }
@@ -172,9 +173,9 @@ JpegReader::JpegReader(int descriptor, size_t memoryLimit) : state_(std::make_un
   if (!state.created) {
     return;
   }
-  const auto most = static_cast<size_t>(std::numeric_limits<long>::max());
-  state.info.mem->max_memory_to_use = static_cast<long>(memoryLimit < most ? memoryLimit : most);
-  state.progress.progress_monitor = WatchScans;
+  const auto max = static_cast<size_t>(std::numeric_limits<long>::max());
+  state.info.mem->max_memory_to_use = static_cast<long>(memoryLimit < max ? memoryLimit : max);
+  state.progress.progress_monitor = LimitScans;
   state.info.progress = &state.progress;
   ReadJpegFrom(state.source, descriptor, state.info);
 }
@@ -188,12 +189,12 @@ bool JpegReader::ReadHeader() {
                       jpeg_save_markers(&state.info, kProfileMarker, kLongestMarker);
                       jpeg_read_header(&state.info, TRUE);
                     });
-  if (!read || !state.IsDecodable()) {
+  if (!read || !state.IsSupported()) {
     return false;
   }
-  state.TakeFrameTraits();
-  state.TakeExif();
-  return state.TakeColourProfile();
+  state.ReadFrameTraits();
+  state.ReadExif();
+  return state.ReadColourProfile();
 }
 
 PictureSize JpegReader::FullSize() const {

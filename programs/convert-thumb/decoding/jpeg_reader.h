@@ -1,4 +1,4 @@
-// Decodes a JPEG row by row, at a fraction of its size where that is enough.
+// Decodes a JPEG row by row, at a fraction of its size where that is sufficient.
 #pragma once
 
 #include <cstddef>
@@ -11,15 +11,14 @@ namespace vela {
 
 class JpegReader final : public PhotoReader {
  public:
-  /// Reads from `descriptor`, which has to stay open as long as the reader is used. `memoryLimit`:
-  /// bytes that the decoder may use.
+  /// `descriptor`: open as long as the reader is used. `memoryLimit`: bytes that the decoder may
+  /// use.
   JpegReader(int descriptor, size_t memoryLimit);
   ~JpegReader() override;
   JpegReader(const JpegReader&) = delete;
   JpegReader& operator=(const JpegReader&) = delete;
 
-  /// False when this is no JPEG that can be decoded here: damaged before its first pixel, or of an
-  /// unusual kind.
+  /// Returns false when the file is damaged before its first pixel or of an unsupported kind.
   bool ReadHeader() override;
   PictureSize FullSize() const override;
   const PhotoTraits& Traits() const override;

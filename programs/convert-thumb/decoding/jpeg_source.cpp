@@ -1,8 +1,6 @@
 #include "decoding/jpeg_source.h"
 
-#include <unistd.h>
-
-#include <cerrno>
+#include "process/source_file.h"
 
 #include <jerror.h>
 
@@ -18,17 +16,9 @@ void Start(j_decompress_ptr info) {
   SourceOf(info).started = false;
 }
 
-ssize_t ReadAgainAfterSignals(int descriptor, JOCTET* buffer, size_t size) {
-  ssize_t count = 0;
-  do {
-    count = read(descriptor, buffer, size);
-  } while (count < 0 && errno == EINTR);
-  return count;
-}
-
 boolean Fill(j_decompress_ptr info) {
   JpegSource& source = SourceOf(info);
-  ssize_t count = ReadAgainAfterSignals(source.descriptor, source.buffer, kJpegSourceBuffer);
+  int64_t count = ReadSome(source.descriptor, source.buffer, kJpegSourceBuffer);
   if (count < 0 || (count == 0 && !source.started)) {
     ERREXIT(info, JERR_INPUT_EMPTY);
   }

@@ -1,4 +1,4 @@
-// Feeds the JPEG decoder from a file descriptor.
+// Input of the JPEG decoder from a file descriptor.
 #pragma once
 
 #include <cstddef>
@@ -10,7 +10,7 @@ namespace vela {
 
 constexpr size_t kJpegSourceBuffer = 65536;
 
-/// Its first member is the library's own part.
+/// The first member is the library's part.
 struct JpegSource {
   jpeg_source_mgr manager;
   int descriptor;
@@ -18,8 +18,8 @@ struct JpegSource {
   JOCTET buffer[kJpegSourceBuffer];
 };
 
-/// Makes `info` read from `descriptor`, from where it stands. A file that ends too early is
-/// decoded as far as it goes; an empty one is the library's error.
+/// Makes `info` read from `descriptor`, starting at its position. A truncated file is decoded as
+/// far as possible; an empty one is an error of the library.
 void ReadJpegFrom(JpegSource& source, int descriptor, jpeg_decompress_struct& info);
 
 }  // namespace vela

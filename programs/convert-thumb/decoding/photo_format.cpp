@@ -1,10 +1,10 @@
 #include "decoding/photo_format.h"
 
-#include <unistd.h>
-
 #include <cstddef>
 #include <string>
 #include <string_view>
+
+#include "process/source_file.h"
 
 namespace vela {
 
@@ -12,7 +12,7 @@ namespace {
 
 using std::literals::string_view_literals::operator""sv;
 
-constexpr size_t kBeginning = 16;
+constexpr size_t kSignatureBytes = 16;
 
 struct Signature {
   size_t offset;
@@ -40,12 +40,12 @@ constexpr Signature kSignatures[] = {
 }  // namespace
 
 PhotoFormat FormatOf(int descriptor) {
-  char buffer[kBeginning];
-  const ssize_t count = pread(descriptor, buffer, sizeof buffer, 0);
-  const std::string_view beginning(buffer, count > 0 ? static_cast<size_t>(count) : 0);
+  char buffer[kSignatureBytes];
+  const int64_t count = ReadSomeAt(descriptor, buffer, sizeof buffer, 0);
+  const std::string_view start(buffer, count > 0 ? static_cast<size_t>(count) : 0);
   for (const Signature& signature : kSignatures) {
-    if (beginning.size() >= signature.offset &&
-        beginning.compare(signature.offset, signature.bytes.size(), signature.bytes) == 0) {
+    if (start.size() >= signature.offset &&
+        start.compare(signature.offset, signature.bytes.size(), signature.bytes) == 0) {
       return signature.format;
     }
   }

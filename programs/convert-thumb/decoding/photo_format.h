@@ -1,4 +1,4 @@
-// Tells the format of a photo from its first bytes.
+// Detects the format of a photo from its first bytes.
 #pragma once
 
 namespace vela {
@@ -15,8 +15,8 @@ enum class PhotoFormat {
   kJpeg2000,
 };
 
-/// The format of an open file, whatever its name; kUnknown for any other one and when it cannot be
-/// read. Leaves the place where the descriptor reads alone.
+/// Returns the format of an open file, regardless of its name; kUnknown for any other format and
+/// when it cannot be read. Leaves the descriptor's position alone.
 PhotoFormat FormatOf(int descriptor);
 
 }  // namespace vela

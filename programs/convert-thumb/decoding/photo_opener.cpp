@@ -1,24 +1,20 @@
 #include "decoding/photo_opener.h"
 
-#include <strings.h>
+#include <utility>
 
+#include "command_line/file_name.h"
 #include "decoding/jpeg_reader.h"
 #include "decoding/photo_format.h"
 #include "decoding/pnm_reader.h"
 #include "decoding/vips_reader.h"
-#include "thumbnails.h"
 
 namespace vela {
 
 namespace {
 
 bool HasTiffExtension(const std::string& path) {
-  const size_t dot = path.rfind('.');
-  if (dot == std::string::npos) {
-    return false;
-  }
-  const char* const extension = path.c_str() + dot + 1;
-  return strcasecmp(extension, "tif") == 0 || strcasecmp(extension, "tiff") == 0;
+  const std::string_view extension = ExtensionOf(path);
+  return EqualsIgnoringCase(extension, "tif") || EqualsIgnoringCase(extension, "tiff");
 }
 
 std::unique_ptr<PhotoReader> MakeReader(int descriptor, const ConversionPlan& plan,
@@ -30,7 +26,7 @@ std::unique_ptr<PhotoReader> MakeReader(int descriptor, const ConversionPlan& pl
   if (format == PhotoFormat::kPnm) {
     return std::make_unique<PnmReader>(descriptor, plan.firstPageOnly);
   }
-  // Raw photos of many cameras are built like a TIFF, of which the first page is a tiny preview.
+  // Many camera raw formats are based on TIFF, with a tiny preview as the first page.
   if (format == PhotoFormat::kUnknown ||
       (format == PhotoFormat::kTiff && !HasTiffExtension(plan.source))) {
     return nullptr;
@@ -44,10 +40,7 @@ std::unique_ptr<PhotoReader> MakeReader(int descriptor, const ConversionPlan& pl
 std::unique_ptr<PhotoReader> OpenPhoto(int descriptor, const ConversionPlan& plan,
                                        size_t memoryLimit) {
   std::unique_ptr<PhotoReader> reader = MakeReader(descriptor, plan, memoryLimit);
-  if (reader == nullptr || !reader->ReadHeader() || !CanMakeThumbnails(reader->Traits(), plan)) {
-    return nullptr;
-  }
-  return reader;
+  return reader != nullptr && reader->ReadHeader() ? std::move(reader) : nullptr;
 }
 
 }  // namespace vela

@@ -1,4 +1,4 @@
-// Finds the decoder of a photo.
+// Chooses the decoder of a photo.
 #pragma once
 
 #include <cstddef>
@@ -9,9 +9,9 @@
 
 namespace vela {
 
-/// A reader of the photo under `descriptor`, which is the plan's source and stays open as long as
-/// the reader is used; its header has been read. Null when the outputs of such a photo are
-/// ImageMagick's work. `memoryLimit`: bytes that the decoder may use.
+/// Returns a reader that has read the header of the photo; null when the photo has to be left to
+/// ImageMagick. `descriptor`: the plan's source, open as long as the reader is used. `memoryLimit`:
+/// bytes that the decoder may use.
 std::unique_ptr<PhotoReader> OpenPhoto(int descriptor, const ConversionPlan& plan,
                                        size_t memoryLimit);
 

@@ -10,15 +10,16 @@ namespace vela {
 namespace {
 
 template <typename Sample>
-constexpr int kEnd = (1 << (8 * static_cast<int>(sizeof(Sample)))) - 1;
+constexpr int kMaxSample = (1 << (8 * static_cast<int>(sizeof(Sample)))) - 1;
 
-/// Finer than 8 bits: a mixture of two colours has values between theirs.
+/// Writes 16 bits even for 8-bit samples: a mixture of two colours has values between theirs.
 template <typename Sample>
 void PutOnBackground(const Sample* in, int width, int bands, const Background& background,
                      uint16_t* out) {
-  constexpr float kScale = kBrightest / static_cast<float>(kEnd<Sample>);
+  constexpr float kScale = kBrightest / static_cast<float>(kMaxSample<Sample>);
   for (int x = 0; x < width; ++x) {
-    const float opacity = static_cast<float>(in[bands - 1]) / static_cast<float>(kEnd<Sample>);
+    const float opacity =
+        static_cast<float>(in[bands - 1]) / static_cast<float>(kMaxSample<Sample>);
     for (int band = 0; band + 1 < bands; ++band) {
       const float sample = kScale * static_cast<float>(in[band]);
       const float behind = background[static_cast<size_t>(band)];
@@ -31,13 +32,13 @@ void PutOnBackground(const Sample* in, int width, int bands, const Background& b
 template <typename Sample>
 void Invert(const Sample* in, size_t samples, Sample* out) {
   for (size_t i = 0; i < samples; ++i) {
-    out[i] = static_cast<Sample>(kEnd<Sample> - in[i]);
+    out[i] = static_cast<Sample>(kMaxSample<Sample> - in[i]);
   }
 }
 
 template <typename Sample>
 void MakeLumaChroma(const Sample* in, int width, int bands, uint16_t* out) {
-  constexpr float kScale = kBrightest / static_cast<float>(kEnd<Sample>);
+  constexpr float kScale = kBrightest / static_cast<float>(kMaxSample<Sample>);
   for (int x = 0; x < width; ++x) {
     const float red = kScale * static_cast<float>(in[0]);
     const float green = kScale * static_cast<float>(in[1]);

@@ -1,4 +1,4 @@
-// Rows of samples as a decoder has them, made into rows of a photo.
+// Converts rows as a decoder delivers them to rows of a photo.
 #pragma once
 
 #include <array>
@@ -7,13 +7,13 @@
 
 namespace vela {
 
-/// What has to be done to a decoder's row.
+/// How a decoder's row is converted.
 enum class RowChange {
   kNone,
-  kOnBackground,       ///< the last sample of each pixel is its opacity
-  kInvert,             ///< amounts of ink become shares of light
-  kLumaChroma,         ///< of red, green and blue, brightness and colour differences are made
-  kThroughLumaChroma,  ///< the same, and red, green and blue again
+  kOnBackground,       ///< blend with the background; the last sample of each pixel is its opacity
+  kInvert,             ///< CMYK as amounts of ink to ColourSpace::kCmyk
+  kLumaChroma,         ///< RGB to brightness and colour differences
+  kThroughLumaChroma,  ///< the same, and back to RGB
 };
 
 /// A row of `width` pixels of `bands` samples of `sampleSize` bytes (1 or 2).
@@ -24,17 +24,17 @@ struct DecodedRow {
   size_t sampleSize;
 };
 
-/// What shows through, samples from 0 to kBrightest.
+/// The colour behind transparent pixels, samples from 0 to kBrightest.
 using Background = std::array<float, 3>;
 
-/// Samples of a pixel after the change.
+/// Returns the number of samples per pixel after the conversion.
 int ChangedBands(RowChange change, int bands);
 
-/// Bytes of a sample after the change.
+/// Returns the bytes per sample after the conversion.
 size_t ChangedSampleSize(RowChange change, size_t sampleSize);
 
-/// Writes the changed row to `out`, which has room for it and is aligned for its samples. Changes
-/// to brightness take 3 bands, or 4 of which they drop the last.
+/// Writes the converted row to `out`, which has room for it and is aligned for its samples.
+/// kLumaChroma and kThroughLumaChroma require 3 bands, or 4, of which the last is dropped.
 void ChangeRow(const DecodedRow& row, RowChange change, const Background& background, uint8_t* out);
 
 }  // namespace vela

@@ -9,23 +9,23 @@ namespace vela {
 
 namespace {
 
-/// The smallest exponent, in 100,000ths, from which on ImageMagick takes samples for linear.
-constexpr png_fixed_point kLinearExponent = 75000;
+/// The smallest exponent, in 100,000ths, for which ImageMagick treats samples as linear.
+constexpr png_fixed_point kMinLinearExponent = 75000;
 constexpr int kPerCentimetre = 2;
 constexpr png_uint_32 kCentimetres = 100;
 
-/// Memory is set aside for what a chunk claims to hold.
-constexpr png_alloc_size_t kLargestChunk = png_alloc_size_t{16} << 20;
-/// The limit does not hold for all of these, and what they hold is not asked for. Each name ends
-/// with a null.
+/// libpng allocates the size that a chunk claims to have.
+constexpr png_alloc_size_t kMaxChunk = png_alloc_size_t{16} << 20;
+/// The limit does not apply to all of these, and their content is not needed. Each name ends with a
+/// null.
 constexpr png_byte kSkippedChunks[] = "eXIf\0tEXt\0zTXt\0iTXt\0sPLT\0hIST";
 constexpr int kSkippedChunkCount = sizeof kSkippedChunks / 5;
 
-/// The callbacks get no more than the library's own structure.
+/// Global because callbacks only get libpng's own structure.
 const VipsLibrary* library = nullptr;
 
-void LeaveLibrary(png_structp png, png_const_charp) {
-  library->leavePng(png, 1);
+void AbortCall(png_structp png, png_const_charp) {
+  library->abortPng(png, 1);
 }
 
 void IgnoreWarning(png_structp, png_const_charp) {}
@@ -33,7 +33,7 @@ void IgnoreWarning(png_structp, png_const_charp) {}
 void ReadInput(png_structp png, png_bytep bytes, size_t size) {
   auto* const file = static_cast<FileInput*>(library->getPngInput(png));
   if (file->Read(bytes, static_cast<int>(size)) != static_cast<int>(size)) {
-    library->leavePng(png, 1);
+    library->abortPng(png, 1);
   }
 }
 
@@ -43,7 +43,7 @@ struct PngStructures {
   png_infop info = nullptr;
 
   PngStructures() {
-    png = library->createPng(PNG_LIBPNG_VER_STRING, nullptr, LeaveLibrary, IgnoreWarning);
+    png = library->createPng(PNG_LIBPNG_VER_STRING, nullptr, AbortCall, IgnoreWarning);
     info = png == nullptr ? nullptr : library->createPngInfo(png);
   }
   ~PngStructures() {
@@ -55,22 +55,21 @@ struct PngStructures {
   PngStructures& operator=(const PngStructures&) = delete;
 };
 
-/// An error of the library jumps back here. Nothing that would have to be cleaned up may live
-/// between the two.
+/// Errors of the library jump back to setjmp, past any destructors in between.
 bool ReadInfo(png_structp png, png_infop info, FileInput& file) {
   std::jmp_buf* const onError = library->setPngJump(png, std::longjmp, sizeof(std::jmp_buf));
   if (onError == nullptr || setjmp(*onError) != 0) {
     return false;
   }
   library->setPngReader(png, &file, ReadInput);
-  library->limitPngChunks(png, kLargestChunk);
+  library->limitPngChunks(png, kMaxChunk);
   library->skipPngChunks(png, PNG_HANDLE_CHUNK_NEVER, kSkippedChunks, kSkippedChunkCount);
   library->readPngInfo(png, info);
   return true;
 }
 
 int ToDensity(png_uint_32 perUnit, png_uint_32 divisor) {
-  return static_cast<int>(std::min(perUnit / divisor, png_uint_32{kLargestDensity}));
+  return static_cast<int>(std::min(perUnit / divisor, png_uint_32{kMaxDensity}));
 }
 
 JpegDensity DensityOf(png_structp png, png_infop info) {
@@ -92,7 +91,7 @@ PngHeader HeaderOf(png_structp png, png_infop info) {
   PngHeader header;
   png_fixed_point exponent = 0;
   header.bitDepth = library->getPngDepth(png, info);
-  header.linear = library->getPngGamma(png, info, &exponent) != 0 && exponent >= kLinearExponent;
+  header.linear = library->getPngGamma(png, info, &exponent) != 0 && exponent >= kMinLinearExponent;
   header.density = DensityOf(png, info);
   return header;
 }

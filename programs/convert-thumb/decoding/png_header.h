@@ -1,21 +1,21 @@
-// Reads what a PNG says in front of its samples and libvips does not hand on.
+// Properties of a PNG that libvips does not report.
 #pragma once
 
 #include <optional>
 
-#include "decoding/photo_traits.h"
 #include "decoding/vips_library.h"
+#include "picture/photo_traits.h"
 
 namespace vela {
 
 struct PngHeader {
   int bitDepth = 8;
-  bool linear = false;  ///< samples are said to be proportional to light
+  bool linear = false;  ///< samples are declared proportional to light
   JpegDensity density;
 };
 
-/// Of the file under `descriptor`; empty when it cannot be read. Leaves the place where the
-/// descriptor reads alone.
+/// Reads the chunks before the samples; empty when that fails. Leaves the descriptor's position
+/// alone.
 std::optional<PngHeader> ReadPngHeader(const VipsLibrary& vips, int descriptor);
 
 }  // namespace vela

@@ -1,32 +1,58 @@
 #include "decoding/pnm_reader.h"
 
-#include <fcntl.h>
-#include <sys/stat.h>
-#include <unistd.h>
+#include <csetjmp>
+#include <cstdio>
 
-#include "decoding/netpbm_library.h"
+#include "posix/loaded_library.h"
+#include "process/source_file.h"
+
+extern "C" {
+#include <netpbm/pam.h>
+}
 
 namespace vela {
 
 namespace {
 
-constexpr sample kByteEnd = 255;
-constexpr sample kWordEnd = 65535;
+constexpr sample kMaxByte = 255;
+constexpr sample kMaxWord = 65535;
 
-FILE* OpenAgain(int descriptor) {
-  const int copy = fcntl(descriptor, F_DUPFD_CLOEXEC, 0);
-  if (copy < 0) {
-    return nullptr;
-  }
-  FILE* const file = fdopen(copy, "rb");
-  if (file == nullptr) {
-    close(copy);
-  }
-  return file;
-}
+void DropMessage(const char*) {}
 
-/// An error of the library jumps back here. Nothing that would have to be cleaned up may live
-/// between the two.
+/// The functions of libnetpbm that are used. It is loaded for a photo that needs it only. It keeps
+/// global state, so one thread at a time may use it.
+class NetpbmLibrary final : private LoadedLibrary {
+ public:
+  /// Returns the library, loaded by the first call, with its messages turned off; null when it, or
+  /// one of its functions, is missing.
+  static const NetpbmLibrary* Get() {
+    static const NetpbmLibrary library;
+    return library.IsLoaded() ? &library : nullptr;
+  }
+
+  /// Sets where errors jump to; without that they end the process.
+  decltype(&::pm_setjmpbuf) setJump = nullptr;
+  decltype(&::pnm_readpaminit) readHeader = nullptr;
+
+ private:
+  NetpbmLibrary() : LoadedLibrary("libnetpbm.so.11") {
+    decltype(&::pm_init) initialise = nullptr;
+    decltype(&::pm_setusermessagefn) setMessage = nullptr;
+    decltype(&::pm_setusererrormsgfn) setErrorMessage = nullptr;
+    Find("pm_init", initialise);
+    Find("pm_setusermessagefn", setMessage);
+    Find("pm_setusererrormsgfn", setErrorMessage);
+    Find("pm_setjmpbuf", setJump);
+    Find("pnm_readpaminit", readHeader);
+    if (IsLoaded()) {
+      initialise("convert-thumb", 0);
+      setMessage(DropMessage);
+      setErrorMessage(DropMessage);
+    }
+  }
+};
+
+/// Errors of the library jump back to setjmp, past any destructors in between.
 bool ReadHeaderOf(const NetpbmLibrary& netpbm, FILE* file, pam& header) {
   std::jmp_buf onError;
   if (setjmp(onError) != 0) {
@@ -39,15 +65,14 @@ bool ReadHeaderOf(const NetpbmLibrary& netpbm, FILE* file, pam& header) {
   return true;
 }
 
-bool IsUsual(const pam& header) {
+bool IsSupported(const pam& header) {
   return header.width > 0 && header.height > 0 &&
-         static_cast<uint64_t>(header.width) * static_cast<uint64_t>(header.height) <=
-             kMostPixels &&
+         static_cast<uint64_t>(header.width) * static_cast<uint64_t>(header.height) <= kMaxPixels &&
          (header.depth == 1 || header.depth == 3) &&
-         (header.maxval == kByteEnd || header.maxval == kWordEnd);
+         (header.maxval == kMaxByte || header.maxval == kMaxWord);
 }
 
-/// Makes samples of two bytes, the higher one first.
+/// Converts big-endian samples of two bytes in place.
 void JoinBytes(uint8_t* row, size_t samples) {
   auto* const joined = reinterpret_cast<uint16_t*>(row);
   for (size_t i = 0; i < samples; ++i) {
@@ -58,30 +83,30 @@ void JoinBytes(uint8_t* row, size_t samples) {
 }  // namespace
 
 PnmReader::PnmReader(int descriptor, bool firstPageOnly)
-    : file_(OpenAgain(descriptor)), firstPageOnly_(firstPageOnly) {}
+    : descriptor_(descriptor), file_(OpenStream(descriptor)), firstPageOnly_(firstPageOnly) {}
 
 bool PnmReader::ReadHeader() {
   const NetpbmLibrary* const netpbm = NetpbmLibrary::Get();
   pam header = {};
   if (netpbm == nullptr || file_ == nullptr || !ReadHeaderOf(*netpbm, file_.get(), header) ||
-      !IsUsual(header)) {
+      !IsSupported(header)) {
     return false;
   }
   size_ = {header.width, header.height};
   channels_ = static_cast<int>(header.depth);
-  sampleSize_ = header.maxval == kByteEnd ? sizeof(uint8_t) : sizeof(uint16_t);
+  sampleSize_ = header.maxval == kMaxByte ? sizeof(uint8_t) : sizeof(uint16_t);
   traits_.space = channels_ == 1 ? ColourSpace::kGrey : ColourSpace::kRgb;
-  return firstPageOnly_ || !IsFollowed();
+  return firstPageOnly_ || !HasMoreData();
 }
 
 size_t PnmReader::RowBytes() const {
   return static_cast<size_t>(size_.width) * static_cast<size_t>(channels_) * sampleSize_;
 }
 
-bool PnmReader::IsFollowed() const {
-  struct stat status;
+bool PnmReader::HasMoreData() const {
   const int64_t end = ftello(file_.get()) + static_cast<int64_t>(RowBytes()) * size_.height;
-  return fstat(fileno(file_.get()), &status) != 0 || status.st_size > end;
+  const int64_t size = SizeOf(descriptor_);
+  return size < 0 || size > end;
 }
 
 bool PnmReader::Start(PictureSize) {

@@ -1,5 +1,5 @@
-// Reads PGM and PPM photos with binary samples, as which camera raw files arrive. libvips would map
-// the whole file into memory, and takes longer to load than reading such a photo takes.
+// Reads PGM and PPM photos with binary samples, the formats of decoded camera raw files. libvips
+// would map the whole file into memory, and takes longer to load than such a photo takes to read.
 #pragma once
 
 #include <cstdio>
@@ -12,10 +12,12 @@ namespace vela {
 
 class PnmReader final : public PhotoReader {
  public:
-  /// Reads from `descriptor`. `firstPageOnly`: leave further pictures in the file alone.
+  /// `descriptor`: open as long as the reader is used. `firstPageOnly`: ignore further pictures in
+  /// the file.
   PnmReader(int descriptor, bool firstPageOnly);
 
-  /// False also when the brightest sample is neither 255 nor 65535, or more than a picture follows.
+  /// Returns false also when the largest sample value is neither 255 nor 65535, or when the file
+  /// has further pictures that are not ignored.
   bool ReadHeader() override;
   PictureSize FullSize() const override { return size_; }
   const PhotoTraits& Traits() const override { return traits_; }
@@ -34,8 +36,9 @@ class PnmReader final : public PhotoReader {
   };
 
   size_t RowBytes() const;
-  bool IsFollowed() const;
+  bool HasMoreData() const;
 
+  int descriptor_;
   std::unique_ptr<FILE, CloseFile> file_;
   bool firstPageOnly_;
   PictureSize size_;

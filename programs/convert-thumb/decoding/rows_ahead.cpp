@@ -5,13 +5,13 @@
 #include <system_error>
 
 #include "picture/sample_loops.h"
-#include "worker_threads.h"
+#include "process/worker_threads.h"
 
 namespace vela {
 
 namespace {
 
-/// Threads meet once a batch.
+/// The threads synchronise once per batch.
 constexpr int kBatchRows = 32;
 constexpr int kBatches = 3;
 
@@ -43,7 +43,7 @@ void RowsAhead::StartThread() {
   try {
     thread_ = std::thread([this] { Work(); });
   } catch (const std::system_error&) {
-    // Rows are then decoded when they are read.
+    // ReadRow then decodes the rows itself.
   }
 }
 

@@ -1,4 +1,4 @@
-// Decodes a photo in a thread of its own, a few rows ahead of the one that scales it.
+// Decodes a photo in a separate thread, a few rows ahead of the thread that scales it.
 #pragma once
 
 #include <condition_variable>
@@ -9,14 +9,14 @@
 #include <vector>
 
 #include "decoding/photo_reader.h"
-#include "picture/row_source.h"
+#include "picture/rows.h"
 
 namespace vela {
 
 class RowsAhead final : public RowSource {
  public:
-  /// The rows of a reader that has been started. Until this object ends, nobody else may use the
-  /// reader but to ask for its sizes.
+  /// `reader`: has been started. Until this object is destroyed, other code must not use it except
+  /// to query its sizes.
   explicit RowsAhead(PhotoReader& reader);
   ~RowsAhead() override;
   RowsAhead(const RowsAhead&) = delete;
@@ -27,7 +27,7 @@ class RowsAhead final : public RowSource {
   int Channels() const override { return reader_.Channels(); }
   bool ReadRow(float* row) override;
 
-  /// Bytes that the rows ahead take of a reader that has been started.
+  /// Returns the memory in bytes of the buffered rows for a reader that has been started.
   static size_t Memory(const PhotoReader& reader);
 
  private:
@@ -46,10 +46,10 @@ class RowsAhead final : public RowSource {
   std::vector<uint8_t> rows_;
   int next_ = 0;  ///< row to be read
 
-  std::mutex mutex_;  ///< of all below but the thread itself
+  std::mutex mutex_;  ///< guards everything below except the thread itself
   std::condition_variable changed_;
-  int decoded_ = 0;   ///< batches that can be read
-  int released_ = 0;  ///< batches that have been read
+  int decoded_ = 0;   ///< number of batches that can be read
+  int released_ = 0;  ///< number of batches that have been read
   bool failed_ = false;
   bool stopped_ = false;
   std::thread thread_;

@@ -1,9 +1,8 @@
 #include "decoding/tiff_colours.h"
 
-#include <fcntl.h>
-#include <unistd.h>
-
 #include <cstdint>
+
+#include "process/source_file.h"
 
 namespace vela {
 
@@ -18,36 +17,36 @@ TiffColours ColoursOf(uint16_t photometric, uint16_t compression) {
     case PHOTOMETRIC_MINISBLACK:
     case PHOTOMETRIC_RGB:
     case PHOTOMETRIC_SEPARATED:
-      return TiffColours::kUsual;
+      return TiffColours::kSupported;
     case PHOTOMETRIC_PALETTE:
       return TiffColours::kPalette;
     case PHOTOMETRIC_YCBCR:
-      // The JPEG library makes red, green and blue of them.
-      return compression == COMPRESSION_JPEG ? TiffColours::kUsual : TiffColours::kUnusual;
+      // The JPEG library converts them to RGB.
+      return compression == COMPRESSION_JPEG ? TiffColours::kSupported : TiffColours::kUnsupported;
     default:
-      return TiffColours::kUnusual;
+      return TiffColours::kUnsupported;
   }
 }
 
 }  // namespace
 
 TiffColours ReadTiffColours(const VipsLibrary& vips, int descriptor) {
-  const int copy = fcntl(descriptor, F_DUPFD_CLOEXEC, 0);
-  if (copy < 0) {
-    return TiffColours::kUnusual;
+  FileDescriptor copy = Duplicate(descriptor);
+  if (!copy.IsOpen()) {
+    return TiffColours::kUnsupported;
   }
-  TIFF* const tiff = vips.openTiff(copy, kNoName, kReadWithoutMapping);
+  TIFF* const tiff = vips.openTiff(copy.Get(), kNoName, kReadWithoutMapping);
   if (tiff == nullptr) {
-    close(copy);
-    return TiffColours::kUnusual;
+    return TiffColours::kUnsupported;
   }
+  copy.Release();
   uint16_t photometric = 0;
   uint16_t compression = 0;
   const bool known = vips.getTiffField(tiff, TIFFTAG_PHOTOMETRIC, &photometric) != 0 &&
                      vips.getTiffField(tiff, TIFFTAG_COMPRESSION, &compression) != 0;
   vips.closeTiff(tiff);
-  lseek(descriptor, 0, SEEK_SET);
-  return known ? ColoursOf(photometric, compression) : TiffColours::kUnusual;
+  Rewind(descriptor);
+  return known ? ColoursOf(photometric, compression) : TiffColours::kUnsupported;
 }
 
 }  // namespace vela

@@ -1,4 +1,4 @@
-// Tells how a TIFF stores its colours, which libvips does not.
+// How a TIFF stores its colours, which libvips does not report.
 #pragma once
 
 #include "decoding/vips_library.h"
@@ -6,12 +6,12 @@
 namespace vela {
 
 enum class TiffColours {
-  kUsual,    ///< read by libvips as they are
-  kPalette,  ///< the same; each pixel is the number of a colour
-  kUnusual,  ///< read otherwise, or not at all
+  kSupported,    ///< libvips reads them unchanged
+  kPalette,      ///< the same; each pixel is an index into a palette
+  kUnsupported,  ///< libvips converts them or cannot read them
 };
 
-/// Of the first picture in the file under `descriptor`, which reads from its start afterwards.
+/// Examines the first picture in the file. Sets the descriptor's position to the start of the file.
 TiffColours ReadTiffColours(const VipsLibrary& vips, int descriptor);
 
 }  // namespace vela

@@ -1,6 +1,5 @@
 #include "decoding/vips_library.h"
 
-#include <dlfcn.h>
 #include <gmodule.h>
 
 #include <cstdlib>
@@ -13,25 +12,25 @@ namespace {
 
 constexpr char kLibraryName[] = "libvips.so.42";
 constexpr char kProgramName[] = "convert-thumb";
-/// Where libvips looks for modules; scanning them takes longer than a thumbnail.
+/// Where libvips looks for modules; scanning them takes longer than making a thumbnail.
 constexpr char kModulesVariable[] = "VIPSHOME";
 constexpr char kNoDirectory[] = "/dev/null";
 
-/// Damage is told by the results of calls.
+/// Errors are reported by the results of calls.
 void IgnoreMessage(const gchar*, GLogLevelFlags, const gchar*, gpointer) {}
 
-/// Keeps libvips from its modules as long as it lives; ImageMagick may still need the variable.
+/// Hides the modules from libvips during its lifetime; ImageMagick may need the variable later.
 class ModulesHidden {
  public:
   ModulesHidden() {
     if (const char* const value = std::getenv(kModulesVariable)) {
-      former_ = value;
+      original_ = value;
     }
     setenv(kModulesVariable, kNoDirectory, 1);
   }
   ~ModulesHidden() {
-    if (former_) {
-      setenv(kModulesVariable, former_->c_str(), 1);
+    if (original_) {
+      setenv(kModulesVariable, original_->c_str(), 1);
     } else {
       unsetenv(kModulesVariable);
     }
@@ -40,22 +39,12 @@ class ModulesHidden {
   ModulesHidden& operator=(const ModulesHidden&) = delete;
 
  private:
-  std::optional<std::string> former_;
+  std::optional<std::string> original_;
 };
-
-/// The directory of the file that `function` comes from, with its last slash.
-std::string DirectoryOf(const void* function) {
-  Dl_info info = {};
-  if (dladdr(function, &info) == 0 || info.dli_fname == nullptr) {
-    return "";
-  }
-  const std::string file = info.dli_fname;
-  return file.substr(0, file.rfind('/') + 1);
-}
 
 }  // namespace
 
-VipsLibrary::VipsLibrary() : LoadedLibrary(kLibraryName, RTLD_LAZY) {
+VipsLibrary::VipsLibrary() : LoadedLibrary(kLibraryName, Binding::kLazy) {
   Find("vips_source_new_from_descriptor", openDescriptor);
   Find("vips_pngload_source", loadPng);
   Find("vips_tiffload_source", loadTiff);
@@ -71,13 +60,13 @@ VipsLibrary::VipsLibrary() : LoadedLibrary(kLibraryName, RTLD_LAZY) {
   Find("vips_region_new", newRegion);
   Find("vips_region_prepare", prepareRegion);
   Find("vips_error_buffer", errorBuffer);
-  Find("vips_thread_shutdown", leaveThread);
+  Find("vips_thread_shutdown", shutDownThread);
   Find("g_object_unref", unref);
   Find("png_create_read_struct", createPng);
   Find("png_create_info_struct", createPngInfo);
   Find("png_destroy_read_struct", destroyPng);
   Find("png_set_longjmp_fn", setPngJump);
-  Find("png_longjmp", leavePng);
+  Find("png_longjmp", abortPng);
   Find("png_set_read_fn", setPngReader);
   Find("png_set_chunk_malloc_max", limitPngChunks);
   Find("png_set_keep_unknown_chunks", skipPngChunks);
@@ -107,13 +96,13 @@ VipsLibrary::VipsLibrary() : LoadedLibrary(kLibraryName, RTLD_LAZY) {
 
 bool VipsLibrary::Start() {
   setLogHandler_(IgnoreMessage, nullptr);
-  // libvips puts its own in their place only when it opens its first TIFF.
+  // libvips installs its own handlers only when it opens its first TIFF.
   setTiffErrorHandler_(nullptr);
   setTiffWarningHandler_(nullptr);
   const ModulesHidden hidden;
   const bool started = initialise_(kProgramName) == 0;
   if (started) {
-    // Every picture is read once, by a thread of its own.
+    // Every picture is read once, in a separate thread.
     setCache_(0);
     setConcurrency_(1);
   }
@@ -121,9 +110,9 @@ bool VipsLibrary::Start() {
 }
 
 void VipsLibrary::LoadHeifModule() const {
-  const std::string path = DirectoryOf(reinterpret_cast<const void*>(initialise_)) +
-                           "vips-modules-" + std::to_string(version_(0)) + "." +
-                           std::to_string(version_(1)) + "/vips-heif.so";
+  const std::string path = DirectoryOf(initialise_) + "vips-modules-" +
+                           std::to_string(version_(0)) + "." + std::to_string(version_(1)) +
+                           "/vips-heif.so";
   openModule_(path.c_str(), G_MODULE_BIND_LAZY);
 }
 

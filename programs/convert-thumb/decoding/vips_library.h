@@ -1,5 +1,5 @@
-// What is used of libvips, which is loaded for a photo that needs it and not with the program:
-// loading it takes many times as long as a JPEG's thumbnails.
+// libvips, which is loaded only for photos that need it: loading it takes many times as long as
+// making the thumbnails of a JPEG.
 #pragma once
 
 #include <png.h>
@@ -7,18 +7,18 @@
 #include <vips/vips.h>
 #include <webp/demux.h>
 
-#include "loaded_library.h"
+#include "posix/loaded_library.h"
 
 namespace vela {
 
-/// The functions of libvips, and of the libraries below it, that are used.
+/// The functions that are used of libvips and of its dependencies.
 class VipsLibrary final : private LoadedLibrary {
  public:
-  /// Returns the library, loaded and started by the first call, without its loadable modules; null
-  /// when it, or a function of it, is missing.
+  /// Returns the library, loaded and initialised by the first call, without its loadable modules;
+  /// null when it, or one of its functions, is missing.
   static const VipsLibrary* Get();
 
-  /// Loads the module that reads HEIC and AVIF; without it loadHeif fails.
+  /// Loads the module for HEIC and AVIF, which loadHeif needs.
   void LoadHeifModule() const;
 
   decltype(&::vips_source_new_from_descriptor) openDescriptor = nullptr;
@@ -36,13 +36,13 @@ class VipsLibrary final : private LoadedLibrary {
   decltype(&::vips_region_new) newRegion = nullptr;
   decltype(&::vips_region_prepare) prepareRegion = nullptr;
   decltype(&::vips_error_buffer) errorBuffer = nullptr;
-  decltype(&::vips_thread_shutdown) leaveThread = nullptr;
+  decltype(&::vips_thread_shutdown) shutDownThread = nullptr;
   decltype(&::g_object_unref) unref = nullptr;
   decltype(&::png_create_read_struct) createPng = nullptr;
   decltype(&::png_create_info_struct) createPngInfo = nullptr;
   decltype(&::png_destroy_read_struct) destroyPng = nullptr;
   decltype(&::png_set_longjmp_fn) setPngJump = nullptr;
-  decltype(&::png_longjmp) leavePng = nullptr;
+  decltype(&::png_longjmp) abortPng = nullptr;
   decltype(&::png_set_read_fn) setPngReader = nullptr;
   decltype(&::png_set_chunk_malloc_max) limitPngChunks = nullptr;
   decltype(&::png_set_keep_unknown_chunks) skipPngChunks = nullptr;

@@ -17,7 +17,7 @@ namespace vela {
 
 namespace {
 
-/// What the decoders that go from top to bottom hand out at a time.
+/// Number of rows that sequential decoders deliver at once.
 constexpr int kStripRows = 16;
 constexpr Background kWhite = {kBrightest, kBrightest, kBrightest};
 constexpr char kInterlaced[] = "interlaced";
@@ -54,8 +54,8 @@ VipsImage* Load(const VipsLibrary& vips, VipsSource* source, PhotoFormat format)
   return image;
 }
 
-/// Whether rows of these samples can be made into a photo's.
-bool HasUsualSamples(const VipsImage& image) {
+/// Returns true when ChangeRow supports these samples.
+bool HasSupportedSamples(const VipsImage& image) {
   const bool wide = image.BandFmt == VIPS_FORMAT_USHORT;
   if ((image.BandFmt != VIPS_FORMAT_UCHAR && !wide) || image.Coding != VIPS_CODING_NONE) {
     return false;
@@ -87,7 +87,7 @@ struct VipsReader::State {
   VipsSource* source = nullptr;
   VipsImage* image = nullptr;
   VipsRegion* region = nullptr;
-  TiffColours tiffColours = TiffColours::kUsual;
+  TiffColours tiffColours = TiffColours::kSupported;
   PngHeader pngHeader;
   PhotoTraits traits;
   RowChange change = RowChange::kNone;
@@ -125,22 +125,23 @@ struct VipsReader::State {
     return streamed ? 0 : Pixels() * static_cast<uint64_t>(image->Bands) * SampleBytes();
   }
 
-  bool TakePngHeader() {
+  bool CheckPngHeader() {
     const std::optional<PngHeader> header = ReadPngHeader(*vips, file.descriptor);
     pngHeader = header.value_or(PngHeader());
     return header && !header->linear;
   }
 
-  /// Whether libvips reads the file as ImageMagick does, as far as it does not tell itself.
-  bool IsReadAsMeant() {
+  /// Returns false when libvips would interpret the file differently from ImageMagick, as far as
+  /// the picture that it returns does not show that.
+  bool IsInterpretedAlike() {
     switch (file.format) {
       case PhotoFormat::kTiff:
         tiffColours = ReadTiffColours(*vips, file.descriptor);
-        return tiffColours != TiffColours::kUnusual;
+        return tiffColours != TiffColours::kUnsupported;
       case PhotoFormat::kPng:
-        return TakePngHeader();
+        return CheckPngHeader();
       case PhotoFormat::kGif:
-        return FirstFrameFillsGif(file.descriptor);
+        return FirstFrameCoversGif(file.descriptor);
       default:
         return true;
     }
@@ -152,12 +153,12 @@ struct VipsReader::State {
     return image != nullptr;
   }
 
-  bool IsDecodable() const {
-    return HasUsualSamples(*image) && Pixels() <= kMostPixels &&
+  bool IsSupported() const {
+    return HasSupportedSamples(*image) && Pixels() <= kMaxPixels &&
            (file.firstPageOnly || !HasFurtherPages(*vips, image, file.format));
   }
 
-  void TakeTraits() {
+  void ReadTraits() {
     traits = ReadVipsTraits(*vips, image, file.format);
     traits.palette = traits.palette || tiffColours == TiffColours::kPalette;
     if (file.format == PhotoFormat::kPng) {
@@ -165,19 +166,19 @@ struct VipsReader::State {
     }
   }
 
-  /// Of an animation libvips makes every frame transparent when one of them is. False when the
-  /// first frame has to be left to ImageMagick.
-  bool TakeFirstFrame() {
+  /// libvips makes every frame of an animation transparent when one of them is. Returns false when
+  /// the first frame is not supported.
+  bool CheckFirstFrame() {
     if (file.format != PhotoFormat::kWebp || !HasFurtherPages(*vips, image, file.format)) {
       return true;
     }
     const WebpFrame frame = ReadFirstWebpFrame(*vips, file.descriptor);
     traits.transparent = frame == WebpFrame::kTransparent;
-    return frame != WebpFrame::kUnusual && (HasOpacity(*image) || !traits.transparent);
+    return frame != WebpFrame::kUnsupported && (HasOpacity(*image) || !traits.transparent);
   }
 
-  /// Opacity is ignored. What the file stores are brightness and colour differences, which
-  /// ImageMagick makes red, green and blue of first only where a profile says which.
+  /// Opacity is ignored. The file stores brightness and colour differences, which ImageMagick
+  /// converts to RGB before other steps only if there is a colour profile.
   void ChooseHeifChange() {
     if (traits.colourProfile.empty()) {
       change = RowChange::kLumaChroma;
@@ -192,7 +193,7 @@ struct VipsReader::State {
       ChooseHeifChange();
     } else if (image->Type == VIPS_INTERPRETATION_CMYK) {
       change = RowChange::kInvert;
-      traits.space = ColourSpace::kInks;
+      traits.space = ColourSpace::kCmyk;
     } else if (HasOpacity(*image)) {
       change = RowChange::kOnBackground;
       background = ReadVipsBackground(*vips, image, std::min(pngHeader.bitDepth, 8));
@@ -207,12 +208,12 @@ struct VipsReader::State {
     return region->data + static_cast<size_t>(y - region->valid.top) * VIPS_REGION_LSKIP(region);
   }
 
-  void TakeError() {
+  void StoreError() {
     error = vips->errorBuffer();
     error.erase(std::min(error.find('\n'), error.size()));
   }
 
-  /// ImageMagick makes pictures of most damaged GIFs, so it gets what libvips cannot decode.
+  /// ImageMagick can read most damaged GIFs, so those that libvips cannot decode are left to it.
   bool IsDamagedGif() {
     if (file.format != PhotoFormat::kGif || WholePictureBytes() > memoryLimit) {
       return false;
@@ -229,14 +230,14 @@ struct VipsReader::State {
   }
 
   bool PrepareRows() {
-    // The library's objects belong to the thread that makes them, and rows may be read by another
-    // one than the header.
+    // A region belongs to the thread that creates it, and rows may be read by another thread than
+    // the header.
     if (region == nullptr) {
       region = vips->newRegion(image);
     }
     const VipsRect rows = {0, next, image->Xsize, std::min(kStripRows, image->Ysize - next)};
     if (region == nullptr || vips->prepareRegion(region, &rows) != 0) {
-      TakeError();
+      StoreError();
       return false;
     }
     prepared = next + rows.height;
@@ -258,12 +259,12 @@ bool VipsReader::ReadHeader() {
   if (state.vips == nullptr) {
     return false;
   }
-  if (!state.IsReadAsMeant() || !state.Open() || !state.IsDecodable()) {
+  if (!state.IsInterpretedAlike() || !state.Open() || !state.IsSupported()) {
     return false;
   }
-  state.TakeTraits();
+  state.ReadTraits();
   state.ChooseChange();
-  return state.TakeFirstFrame() && !state.IsDamagedGif();
+  return state.CheckFirstFrame() && !state.IsDamagedGif();
 }
 
 PictureSize VipsReader::FullSize() const {
@@ -311,9 +312,9 @@ bool VipsReader::ReadRow(uint8_t* row) {
 }
 
 void VipsReader::LeaveThread() {
-  // It holds memory that belongs to the thread.
+  // The region holds memory of the thread.
   state_->DropRegion();
-  state_->vips->leaveThread();
+  state_->vips->shutDownThread();
 }
 
 const char* VipsReader::Error() const {

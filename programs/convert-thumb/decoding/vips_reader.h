@@ -1,4 +1,4 @@
-// Decodes photos of most formats by libvips.
+// Decodes photos of most formats with libvips.
 #pragma once
 
 #include <cstddef>
@@ -10,23 +10,23 @@
 
 namespace vela {
 
-/// What VipsReader reads.
+/// The file that VipsReader reads.
 struct VipsSourceFile {
   int descriptor = -1;                         ///< open as long as the reader is used
-  PhotoFormat format = PhotoFormat::kUnknown;  ///< any but kJpeg and kPnm
-  bool firstPageOnly = false;                  ///< leave further pages alone
+  PhotoFormat format = PhotoFormat::kUnknown;  ///< anything but kJpeg and kPnm
+  bool firstPageOnly = false;                  ///< ignore further pages
 };
 
 class VipsReader final : public PhotoReader {
  public:
-  /// `memoryLimit`: bytes that a picture which is decoded whole may take.
+  /// `memoryLimit`: bytes that a picture may take that cannot be decoded row by row.
   VipsReader(const VipsSourceFile& file, size_t memoryLimit);
   ~VipsReader() override;
   VipsReader(const VipsReader&) = delete;
   VipsReader& operator=(const VipsReader&) = delete;
 
-  /// False also for libvips not being there, for several pages when not only the first is to be
-  /// read, and for kinds of pictures that are not decoded here.
+  /// Returns false also without libvips, for several pages that are not ignored, and for
+  /// unsupported kinds of pictures.
   bool ReadHeader() override;
   PictureSize FullSize() const override;
   const PhotoTraits& Traits() const override;

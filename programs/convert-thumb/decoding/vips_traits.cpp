@@ -14,7 +14,7 @@ constexpr char kBackground[] = "background";
 constexpr char kPaletteDepth[] = "palette-bit-depth";
 constexpr double kMillimetresPerInch = 25.4;
 constexpr double kMillimetresPerCentimetre = 10;
-/// What turning a density into millimetres and back may lose.
+/// Rounding error of converting a density to millimetres and back.
 constexpr double kDensityError = 1e-3;
 constexpr int kPerInch = 1;
 constexpr int kPerCentimetre = 2;
@@ -40,7 +40,7 @@ int IntOf(const VipsLibrary& vips, VipsImage* image, const char* name, int other
 
 int ToDensity(double perMillimetre, double millimetres) {
   return static_cast<int>(
-      std::clamp(perMillimetre * millimetres + kDensityError, 0.0, double{kLargestDensity}));
+      std::clamp(perMillimetre * millimetres + kDensityError, 0.0, double{kMaxDensity}));
 }
 
 bool IsPerCentimetre(const VipsLibrary& vips, VipsImage* image) {
@@ -50,9 +50,9 @@ bool IsPerCentimetre(const VipsLibrary& vips, VipsImage* image) {
          std::strcmp(unit, kCentimetres) == 0;
 }
 
-void TakeDensity(const VipsLibrary& vips, VipsImage* image, PhotoFormat format,
+void ReadDensity(const VipsLibrary& vips, VipsImage* image, PhotoFormat format,
                  JpegDensity& density) {
-  // One in a millimetre is what a picture without any density has.
+  // One per millimetre is the default of a picture without a density.
   if (image->Xres == 1 && image->Yres == 1) {
     return;
   }
@@ -75,7 +75,7 @@ bool HasVipsField(const VipsLibrary& vips, VipsImage* image, const char* name) {
 }
 
 bool HasFurtherPages(const VipsLibrary& vips, VipsImage* image, PhotoFormat format) {
-  // Of JPEG 2000 the sizes that can be decoded are counted.
+  // For JPEG 2000, this is the number of available resolutions.
   return format != PhotoFormat::kJpeg2000 && IntOf(vips, image, VIPS_META_N_PAGES, 1) > 1;
 }
 
@@ -87,11 +87,11 @@ Background ReadVipsBackground(const VipsLibrary& vips, VipsImage* image, int bit
       vips.getDoubles(image, kBackground, &samples, &count) != 0 || count < 1) {
     return background;
   }
-  // Grey is told as it is stored; of 16 bits only the upper 8.
-  const double end = (1 << (count == 1 ? bits : 8)) - 1;
+  // A grey value is reported with its stored depth, of 16 bits only the upper 8.
+  const double max = (1 << (count == 1 ? bits : 8)) - 1;
   for (size_t i = 0; i < background.size(); ++i) {
     const double sample = samples[std::min(i, static_cast<size_t>(count) - 1)];
-    background[i] = static_cast<float>(std::clamp(sample / end, 0.0, 1.0)) * kBrightest;
+    background[i] = static_cast<float>(std::clamp(sample / max, 0.0, 1.0)) * kBrightest;
   }
   return background;
 }
@@ -101,13 +101,13 @@ PhotoTraits ReadVipsTraits(const VipsLibrary& vips, VipsImage* image, PhotoForma
   traits.palette = IsPalette(vips, image, format);
   traits.colourProfile = BlobOf(vips, image, VIPS_META_ICC_NAME);
   traits.orientation = IntOf(vips, image, VIPS_META_ORIENTATION, 1);
-  TakeDensity(vips, image, format, traits.density);
+  ReadDensity(vips, image, format, traits.density);
   const std::vector<uint8_t> exif = BlobOf(vips, image, VIPS_META_EXIF_NAME);
   if (!exif.empty() && format != PhotoFormat::kPng) {
-    TakeExifTraits(exif.data(), exif.size(), traits);
+    ReadExifTraits(exif.data(), exif.size(), traits);
   }
   if (format == PhotoFormat::kHeif || format == PhotoFormat::kPng) {
-    // Of HEIF the decoder has turned the picture already; of PNG ImageMagick ignores this.
+    // The decoder has already turned a HEIF picture; for PNG, ImageMagick ignores the orientation.
     traits.orientation = 1;
   }
   return traits;

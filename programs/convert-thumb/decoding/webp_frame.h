@@ -1,4 +1,4 @@
-// Tells of an animated WebP's first frame what libvips does not.
+// Properties of the first frame of an animated WebP that libvips does not report.
 #pragma once
 
 #include "decoding/vips_library.h"
@@ -8,11 +8,11 @@ namespace vela {
 enum class WebpFrame {
   kOpaque,
   kTransparent,
-  kUnusual,  ///< not as large as the whole picture, or unreadable
+  kUnsupported,  ///< smaller than the picture, or unreadable
 };
 
-/// The first frame of the file under `descriptor`, each frame of which says for itself whether it
-/// has transparent parts. Leaves the place where the descriptor reads alone.
+/// Examines the first frame of the file; every frame has its own transparency. Leaves the
+/// descriptor's position alone.
 WebpFrame ReadFirstWebpFrame(const VipsLibrary& vips, int descriptor);
 
 }  // namespace vela

@@ -4,24 +4,24 @@
 #include <array>
 #include <cmath>
 
-#include "jpeg_errors.h"
+#include "picture/jpeg_errors.h"
 #include "picture/sample_loops.h"
 
 namespace vela {
 
 namespace {
 
-/// Above this the slower transform is worth its time.
-constexpr int kFastTransformQuality = 90;
-/// Between the samples of a colour, in steps of a picture.
-constexpr float kSmallestDifference = 0.5;
-/// From here on colour is stored as finely as brightness, unless the photo says otherwise.
-constexpr int kFineColourQuality = 90;
+/// Above this quality, the slower transform is worth its time.
+constexpr int kMaxFastTransformQuality = 90;
+/// Smallest difference between the samples of a pixel with colour, in samples of a picture.
+constexpr float kMinColourDifference = 0.5;
+/// From this quality on, chroma is not subsampled unless that of the photo is.
+constexpr int kMinFullChromaQuality = 90;
 
 using Sampling = std::array<JpegSampling, 3>;
 
-/// Whether a JPEG that stores its components together can have these factors, which one that
-/// stores them one after the other need not care for.
+/// Returns true when a JPEG with interleaved components can have these factors. JPEGs with separate
+/// components are less limited.
 bool IsStorable(const Sampling& sampling) {
   int blocks = 0;
   for (const JpegSampling& component : sampling) {
@@ -30,19 +30,19 @@ bool IsStorable(const Sampling& sampling) {
   return blocks <= C_MAX_BLOCKS_IN_MCU;
 }
 
-/// Compares whole rows without leaving early, which the compiler makes vector instructions of.
+/// Has no early exit, so that the compiler can vectorise the loop.
 bool IsGreyRow(const float* row, int width) {
   float difference = 0;
   for (int x = 0; x < width; ++x) {
     difference = std::max({difference, std::fabs(row[0] - row[1]), std::fabs(row[1] - row[2])});
     row += 3;
   }
-  return difference < kSmallestDifference;
+  return difference < kMinColourDifference;
 }
 
 }  // namespace
 
-/// The library's compressor with the memory that it writes to.
+/// The library's compressor with its output buffer.
 class JpegEncoder::Compressor {
  public:
   Compressor() {
@@ -51,7 +51,7 @@ class JpegEncoder::Compressor {
   }
   ~Compressor() {
     if (created_ && info_.dest != nullptr && bytes_ != nullptr) {
-      // While it compresses, only the library knows where the bytes have been moved to.
+      // During compression, only the library knows the current address of the buffer.
       info_.dest->term_destination(&info_);
     }
     std::free(bytes_);
@@ -81,7 +81,7 @@ class JpegEncoder::Compressor {
     return CallJpegLibrary(errors_, [&] { jpeg_finish_compress(&info_); });
   }
 
-  /// Why the last call failed.
+  /// Returns why the last call failed.
   const char* Error() const { return errors_.message; }
 
   EncodedJpeg TakeResult() {
@@ -102,7 +102,7 @@ class JpegEncoder::Compressor {
     jpeg_set_defaults(&info_);
     jpeg_set_quality(&info_, quality, TRUE);
     info_.optimize_coding = TRUE;
-    info_.dct_method = quality <= kFastTransformQuality ? JDCT_IFAST : JDCT_ISLOW;
+    info_.dct_method = quality <= kMaxFastTransformQuality ? JDCT_IFAST : JDCT_ISLOW;
     info_.density_unit = static_cast<UINT8>(traits.density.unit);
     info_.X_density = static_cast<UINT16>(traits.density.x);
     info_.Y_density = static_cast<UINT16>(traits.density.y);
@@ -117,7 +117,7 @@ class JpegEncoder::Compressor {
         info_.comp_info[i].h_samp_factor = sampling.horizontal;
         info_.comp_info[i].v_samp_factor = sampling.vertical;
       }
-    } else if (quality >= kFineColourQuality) {
+    } else if (quality >= kMinFullChromaQuality) {
       for (int i = 0; i < info_.num_components; ++i) {
         info_.comp_info[i].h_samp_factor = 1;
         info_.comp_info[i].v_samp_factor = 1;

@@ -8,9 +8,9 @@
 #include <string>
 #include <vector>
 
-#include "decoding/photo_traits.h"
+#include "picture/photo_traits.h"
 #include "picture/picture.h"
-#include "picture/row_sink.h"
+#include "picture/rows.h"
 #include "picture/thumbnail_size.h"
 
 namespace vela {
@@ -19,21 +19,21 @@ struct FreeEncoded {
   void operator()(unsigned char* memory) const { std::free(memory); }
 };
 
-/// The bytes of a file, or why there are none.
+/// An encoded file, or an error.
 struct EncodedJpeg {
   std::unique_ptr<unsigned char, FreeEncoded> bytes;
   size_t size = 0;
-  std::string error;  ///< in the JPEG library's words; empty when there are bytes
+  std::string error;  ///< message of the JPEG library; empty on success
 
   bool IsComplete() const { return bytes != nullptr; }
 };
 
-/// Encodes rows as they come. Colour is stored as finely as in the photo that `traits` are of,
-/// where a JPEG with its components together can be; a colour picture without any colour is stored
-/// as grey. The colour profile goes along when `withProfile`.
+/// Encodes rows as they arrive. The chroma sampling is that of the photo, if a JPEG with
+/// interleaved components can have it. A colour picture that contains only grey is stored as grey.
 class JpegEncoder final : public RowSink {
  public:
-  /// `channels`: 1 or 3. `quality`: 1 to 100. `traits` have to outlive this.
+  /// `channels`: 1 or 3. `traits`: of the photo; have to outlive this. `quality`: 1 to 100.
+  /// `withProfile`: store the photo's colour profile.
   JpegEncoder(PictureSize size, int channels, const PhotoTraits& traits, int quality,
               bool withProfile);
   ~JpegEncoder() override;
@@ -42,13 +42,13 @@ class JpegEncoder final : public RowSink {
 
   bool Put(const float* row) override;
 
-  /// Why a row was refused; empty when none was.
+  /// Returns why a row was rejected; empty if none was.
   std::string Error() const;
 
-  /// The file, after the last row.
+  /// Returns the file. Called after the last row.
   EncodedJpeg Finish();
 
-  /// What there is instead of a file when a row was refused.
+  /// Returns the error when a row was rejected.
   EncodedJpeg Failure() const;
 
  private:
@@ -65,11 +65,11 @@ class JpegEncoder final : public RowSink {
   int quality_;
   bool withProfile_;
   std::vector<uint8_t> row_;   ///< to be written
-  std::vector<uint8_t> grey_;  ///< rows before the first that is not grey, a sample a pixel
-  std::unique_ptr<Compressor> compressor_;  ///< from that row on
+  std::vector<uint8_t> grey_;  ///< rows before the first that is not grey, one sample per pixel
+  std::unique_ptr<Compressor> compressor_;  ///< created for the first row that is not grey
 };
 
-/// Encodes a whole picture.
+/// Encodes a whole picture; parameters as for JpegEncoder.
 EncodedJpeg EncodeJpeg(const Picture& picture, const PhotoTraits& traits, int quality,
                        bool withProfile);
 

@@ -10,11 +10,11 @@ namespace vela {
 namespace {
 
 constexpr char kInMemory[] = "MAGICK_MEMORY_LIMIT";
-/// In files that are mapped, whose memory the kernel can take back. What is larger is read and
-/// written piece by piece, which takes five times as long.
+/// For memory-mapped files, whose memory the kernel can reclaim. Larger pictures are read and
+/// written in pieces, which takes five times as long.
 constexpr char kInMappedFiles[] = "MAGICK_MAP_LIMIT";
 
-/// The bytes that a text such as "64MiB" stands for; less than 0 for none.
+/// Parses a size such as "64MiB"; negative if the text is not a number.
 double Bytes(const char* text) {
   constexpr char kPrefixes[] = "kmgt";
   constexpr double kThousand = 1000;

@@ -1,12 +1,12 @@
-// Tells ImageMagick how much it may use.
+// Resource limits of ImageMagick.
 #pragma once
 
 #include <cstddef>
 
 namespace vela {
 
-/// Puts limits into the environment that let ImageMagick keep a picture in files, instead of
-/// failing for want of memory, well before it takes `memoryLimit` bytes. Lower ones stay.
+/// Sets limits in the environment that make ImageMagick keep a picture in files, instead of running
+/// out of memory, well before it uses `memoryLimit` bytes. Existing lower limits stay.
 void LimitImageMagick(size_t memoryLimit);
 
 }  // namespace vela

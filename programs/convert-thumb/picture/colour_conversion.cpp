@@ -11,13 +11,13 @@ constexpr float kMiddleStep = 128 * kJpegStep;
 constexpr float kRedWeight = 0.299F;
 constexpr float kGreenWeight = 0.587F;
 constexpr float kBlueWeight = 0.114F;
-/// Bring the colour differences into the range of a sample.
+/// Scale the colour differences to the range of a sample.
 constexpr float kBlueScale = 2 * (1 - kBlueWeight);
 constexpr float kRedScale = 2 * (1 - kRedWeight);
 
-Picture InksToRgb(const Picture& inks) {
-  Picture rgb(inks.width, inks.height, 3);
-  const uint16_t* in = inks.samples.data();
+Picture CmykToRgb(const Picture& cmyk) {
+  Picture rgb(cmyk.width, cmyk.height, 3);
+  const uint16_t* in = cmyk.samples.data();
   for (size_t i = 0; i < rgb.samples.size(); i += 3) {
     const float black = static_cast<float>(in[3]) / kBrightest;
     for (size_t channel = 0; channel < 3; ++channel) {
@@ -44,8 +44,8 @@ void LumaChromaToRgb(uint16_t* samples, size_t pixels) {
 }
 
 void ConvertToRgb(Picture& picture, ColourSpace from) {
-  if (from == ColourSpace::kInks) {
-    picture = InksToRgb(picture);
+  if (from == ColourSpace::kCmyk) {
+    picture = CmykToRgb(picture);
   } else if (from == ColourSpace::kLumaChroma) {
     LumaChromaToRgb(picture.samples.data(), picture.samples.size() / 3);
   }

@@ -4,21 +4,20 @@
 #include <cstddef>
 #include <cstdint>
 
-#include "picture/colour_space.h"
 #include "picture/picture.h"
 
 namespace vela {
 
-/// Makes red, green and blue of a picture in the space `from`; leaves grey and red, green and blue
-/// as they are. Inks are taken for ideal ones.
+/// Converts a picture in the space `from` to RGB; does nothing for grey and RGB. CMYK is converted
+/// without a colour profile, as if the inks were ideal.
 void ConvertToRgb(Picture& picture, ColourSpace from);
 
-/// Makes red, green and blue of `pixels` times brightness and both colour differences.
+/// Converts `pixels` pixels of brightness and two colour differences to RGB.
 void LumaChromaToRgb(uint16_t* samples, size_t pixels);
 
-/// Writes brightness and both colour differences of a colour (each from 0 to kBrightest) to `out`.
-/// ImageMagick reads the middle of the differences' 256 steps, 128, as half a step more than the
-/// middle of the range, and so is this pair of conversions.
+/// Writes the brightness and the two colour differences of a colour (each from 0 to kBrightest) to
+/// `out`. Like ImageMagick, this function writes the neutral value of the differences as step 128
+/// of 256, half a step above the middle of the range that LumaChromaToRgb uses.
 void RgbToLumaChroma(float red, float green, float blue, uint16_t* out);
 
 }  // namespace vela

@@ -1,24 +1,23 @@
-// Scales rows as they come: first from top to bottom, then from left to right.
+// Scales rows as they arrive, vertically before horizontally.
 #pragma once
 
 #include <cstddef>
 #include <vector>
 
-#include "picture/resize.h"
-#include "picture/resize_filter.h"
+#include "picture/picture.h"
+#include "picture/resize_plan.h"
 #include "picture/row_block.h"
-#include "picture/row_sink.h"
 #include "picture/row_window.h"
-#include "picture/thumbnail_size.h"
+#include "picture/rows.h"
 
 namespace vela {
 
-/// Where overshoot is cut between the two directions, it shows which of them comes first: at hard
-/// edges of full contrast. RowScaler, with the other order, is faster.
+/// Samples are clamped after each direction, so at hard edges of full contrast the order of the
+/// directions makes a difference. RowScaler, with the other order, is faster.
 class ColumnScaler final : public RowSink {
  public:
-  /// Scales a picture of size `from` with `channels` samples a pixel. `next`, which has to outlive
-  /// this, gets the rows.
+  /// Scales a picture of size `from` with `channels` samples a pixel and passes the rows to `next`,
+  /// which has to outlive this.
   ColumnScaler(PictureSize from, int channels, const ResizePlan& plan, RowSink& next);
 
   bool Put(const float* row) override;

@@ -7,9 +7,33 @@
 
 namespace vela {
 
-/// Rows from the top, pixels from the left, the samples of a pixel side by side: one, three or
-/// four. Samples are finer than those of a JPEG: what one step rounds off, the quantisation of the
-/// JPEG that is made at the end would make many times larger.
+struct PictureSize {
+  int width = 0;   ///< pixels
+  int height = 0;  ///< pixels
+};
+
+/// What the samples of a pixel mean.
+enum class ColourSpace {
+  kGrey,
+  kRgb,
+  kLumaChroma,  ///< brightness and two colour differences, with zero in the middle of their range
+  kCmyk,        ///< cyan, magenta, yellow and black, each inverted: 0 is full ink
+};
+
+/// Returns true when a thumbnail can be stored in this space.
+constexpr bool IsStorable(ColourSpace space) {
+  return space == ColourSpace::kGrey || space == ColourSpace::kRgb;
+}
+
+/// Returns true when the colour profile of a picture in this space stays valid after the picture is
+/// converted to RGB.
+constexpr bool IsProfileValidInRgb(ColourSpace space) {
+  return space == ColourSpace::kRgb;
+}
+
+/// Rows from the top, pixels from the left, the samples of a pixel next to each other: one, three
+/// or four. Samples are finer than those of a JPEG, because the quantisation of the JPEG that is
+/// made at the end would amplify the rounding errors of each step.
 struct Picture {
   int width = 0;                  ///< pixels
   int height = 0;                 ///< pixels
@@ -23,16 +47,18 @@ struct Picture {
         channels(pictureChannels),
         samples(RowSize() * static_cast<size_t>(pictureHeight)) {}
 
+  PictureSize Size() const { return {width, height}; }
   size_t RowSize() const { return static_cast<size_t>(width) * static_cast<size_t>(channels); }
   uint16_t* Row(int y) { return samples.data() + RowSize() * static_cast<size_t>(y); }
   const uint16_t* Row(int y) const { return samples.data() + RowSize() * static_cast<size_t>(y); }
 };
 
+/// The largest sample.
 constexpr float kBrightest = 65535;
-/// A step of a JPEG's samples, which end at 255.
+/// One step of a JPEG's 8-bit samples, in samples of a picture.
 constexpr int kJpegStep = 257;
 
-/// A value as the nearest sample, what lies outside of the range as its end.
+/// Returns the nearest sample; values out of range are clamped.
 inline uint16_t ToSample(float value) {
   const float rounded = value + 0.5F;
   return static_cast<uint16_t>(

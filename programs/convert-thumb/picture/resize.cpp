@@ -3,16 +3,13 @@
 #include <vector>
 
 #include "picture/column_scaler.h"
-#include "picture/picture_maker.h"
 #include "picture/row_scaler.h"
 
 namespace vela {
 
 namespace {
 
-constexpr double kThinningArea = 0.1;
-constexpr int kSmallestGrid = 128;
-/// Rows of the result that the larger filter reaches over.
+/// Rows of the result that the larger filter covers.
 constexpr size_t kFilterHeight = 6;
 
 bool PassRows(RowSource& source, RowSink& out) {
@@ -28,28 +25,12 @@ bool PassRows(RowSource& source, RowSink& out) {
 
 }  // namespace
 
-bool IsThinnedOut(PictureSize from, PictureSize to) {
-  const double horizontal = static_cast<double>(to.width) / from.width;
-  const double vertical = static_cast<double>(to.height) / from.height;
-  return horizontal * vertical <= kThinningArea && kGridFactor * to.width >= kSmallestGrid &&
-         kGridFactor * to.height >= kSmallestGrid;
-}
-
-bool IsScaledDownFirst(PictureSize from, PictureSize to) {
-  return static_cast<double>(to.width) / from.width <= static_cast<double>(to.height) / from.height;
-}
-
-std::vector<Contribution> ContributionsOf(int length, int newLength, const ResizePlan& plan) {
-  return MakeContributions(length, newLength, plan.coarse ? kGridFactor * newLength : 0,
-                           plan.filter);
-}
-
 size_t ResizeMemory(PictureSize from, int channels, const ResizePlan& plan) {
   const size_t rowSize = static_cast<size_t>(from.width) * static_cast<size_t>(channels);
   const size_t shrunkRows = static_cast<size_t>(from.height / plan.size.height) + 1;
   const size_t scaledRow = static_cast<size_t>(plan.size.width) * static_cast<size_t>(channels);
   const size_t result = scaledRow * static_cast<size_t>(plan.size.height);
-  // Two copies of a block of rows before it is scaled from left to right, and two after.
+  // Two copies of a block of rows before it is scaled horizontally, and two after.
   const size_t blocks = 2 * kBlockRows * (rowSize + scaledRow);
   const size_t windowRow = plan.columnsFirst ? rowSize : scaledRow;
   return (kFilterHeight * shrunkRows * windowRow + blocks) * sizeof(float) +
@@ -74,8 +55,9 @@ bool Resize(RowSource& source, const ResizePlan& plan, RowSink& out) {
 }
 
 std::optional<Picture> Resize(RowSource& source, const ResizePlan& plan) {
-  PictureMaker maker(plan.size, source.Channels());
-  return Resize(source, plan, maker) ? std::optional<Picture>(maker.Take()) : std::nullopt;
+  Picture picture(plan.size.width, plan.size.height, source.Channels());
+  PictureWriter writer(picture);
+  return Resize(source, plan, writer) ? std::optional<Picture>(std::move(picture)) : std::nullopt;
 }
 
 }  // namespace vela

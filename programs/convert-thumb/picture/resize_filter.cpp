@@ -36,12 +36,12 @@ double Support(FilterKind kind) {
   return kind == FilterKind::kLanczos ? kLanczosLobes : kMitchellSupport;
 }
 
-/// Where a sample of the grid takes its value from.
-int NearestSample(int place, int grid, int length) {
-  return static_cast<int>((place + 0.5 - kTiny) * length / grid);
+/// Returns the index of the sample that is nearest to a point of the grid.
+int NearestSample(int point, int grid, int length) {
+  return static_cast<int>((point + 0.5 - kTiny) * length / grid);
 }
 
-/// The filter of one scaled sample, centred over the samples it is made of.
+/// The filter of one scaled sample, centred over the samples it is computed from.
 struct Window {
   double centre = 0;
   double scale = 1;
@@ -49,10 +49,10 @@ struct Window {
   int end = 0;
 };
 
-Window WindowOf(int place, double factor, int length, FilterKind kind) {
+Window WindowOf(int index, double factor, int length, FilterKind kind) {
   Window window;
   window.scale = std::max(1 / factor + kTiny, 1.0);
-  window.centre = (place + 0.5) / factor + kTiny;
+  window.centre = (index + 0.5) / factor + kTiny;
   const double reach = window.scale * Support(kind);
   window.first = static_cast<int>(std::max(window.centre - reach + 0.5, 0.0));
   window.end = static_cast<int>(std::min<double>(window.centre + reach + 0.5, length));
@@ -60,16 +60,16 @@ Window WindowOf(int place, double factor, int length, FilterKind kind) {
 }
 
 Contribution ContributionOf(const Window& window, int length, int grid, FilterKind kind) {
-  const auto source = [&](int place) {
-    return grid > 0 ? NearestSample(place, grid, length) : place;
+  const auto source = [&](int index) {
+    return grid > 0 ? NearestSample(index, grid, length) : index;
   };
   Contribution contribution;
   contribution.first = source(window.first);
   std::vector<double> weights(static_cast<size_t>(source(window.end - 1) - contribution.first + 1));
   double sum = 0;
-  for (int place = window.first; place < window.end; ++place) {
-    const double weight = Weight(kind, (place - window.centre + 0.5) / window.scale);
-    weights[static_cast<size_t>(source(place) - contribution.first)] += weight;
+  for (int index = window.first; index < window.end; ++index) {
+    const double weight = Weight(kind, (index - window.centre + 0.5) / window.scale);
+    weights[static_cast<size_t>(source(index) - contribution.first)] += weight;
     sum += weight;
   }
   contribution.weights.reserve(weights.size());
@@ -86,9 +86,9 @@ std::vector<Contribution> MakeContributions(int length, int newLength, int grid,
   const double factor = static_cast<double>(newLength) / filtered;
   std::vector<Contribution> contributions;
   contributions.reserve(static_cast<size_t>(newLength));
-  for (int place = 0; place < newLength; ++place) {
+  for (int index = 0; index < newLength; ++index) {
     contributions.push_back(
-        ContributionOf(WindowOf(place, factor, filtered, kind), length, grid, kind));
+        ContributionOf(WindowOf(index, factor, filtered, kind), length, grid, kind));
   }
   return contributions;
 }

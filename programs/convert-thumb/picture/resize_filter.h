@@ -1,27 +1,27 @@
-// How much each sample of a line adds to each sample of the scaled line.
+// The filter weights of scaling a row or column.
 #pragma once
 
 #include <vector>
 
 namespace vela {
 
-/// Shape of the filter.
+/// Shape of a filter.
 enum class FilterKind {
   kLanczos,   ///< sinc windowed by a sinc, three lobes
-  kMitchell,  ///< cubic of Mitchell and Netravali
+  kMitchell,  ///< the Mitchell-Netravali cubic
 };
 
-/// The samples that one scaled sample is made of.
+/// The source samples that one scaled sample is computed from.
 struct Contribution {
-  int first = 0;               ///< place of the first one
-  std::vector<float> weights;  ///< from there on; their sum is 1
+  int first = 0;               ///< index of the first one
+  std::vector<float> weights;  ///< of that one and those after it; their sum is 1
 
   int End() const { return first + static_cast<int>(weights.size()); }
 };
 
-/// Contributions to a line of `newLength` samples made from one of `length`, both at least 1. With
-/// `grid` above 0 the line is first reduced or stretched to that many samples by taking the nearest
-/// one, and the filter works on these.
+/// Returns the contributions to each of `newLength` samples that a row or column of `length`
+/// samples is scaled to, both at least 1. If `grid` is positive, the filter is applied to that many
+/// nearest samples instead of all of them.
 std::vector<Contribution> MakeContributions(int length, int newLength, int grid, FilterKind kind);
 
 }  // namespace vela

@@ -1,4 +1,4 @@
-// Gathers rows to be scaled together.
+// Collects rows that are scaled together.
 #pragma once
 
 #include <algorithm>
@@ -10,9 +10,10 @@
 
 namespace vela {
 
+/// Interleaves up to kBlockRows rows, so that vector instructions work on all of them at once.
 class RowBlock {
  public:
-  /// For the rows of a picture `height` rows high; `rowSize`: samples a row.
+  /// `rowSize`: samples in a row. `height`: rows of the picture.
   RowBlock(size_t rowSize, int height)
       : rowSize_(rowSize),
         stride_(PaddedSize(rowSize)),
@@ -20,11 +21,11 @@ class RowBlock {
         rows_(stride_ * kBlockRows),
         lanes_(stride_ * kBlockRows) {}
 
-  /// Where the next row is to be written.
+  /// Returns where to write the next row before TakeRow is called.
   float* NextRow() { return rows_.data() + static_cast<size_t>(filled_) * stride_; }
 
-  /// Takes that row. Returns how many rows the block has when it is full or its last row was the
-  /// picture's last; else 0.
+  /// Adds that row. Returns the number of rows in the block when it is full or has reached the end
+  /// of the picture, otherwise 0.
   int TakeRow() {
     ++filled_;
     --rowsLeft_;
@@ -35,12 +36,13 @@ class RowBlock {
     return std::exchange(filled_, 0);
   }
 
+  /// Adds a copy of `row`; returns the same as TakeRow.
   int Put(const float* row) {
     std::copy_n(row, rowSize_, NextRow());
     return TakeRow();
   }
 
-  /// The full block, the samples of one place side by side.
+  /// Returns the full block: sample by sample, that sample of every row.
   const float* Lanes() const { return lanes_.data(); }
 
  private:

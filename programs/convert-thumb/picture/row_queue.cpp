@@ -4,13 +4,13 @@
 #include <exception>
 #include <system_error>
 
-#include "worker_threads.h"
+#include "process/worker_threads.h"
 
 namespace vela {
 
 namespace {
 
-/// Threads meet once a batch.
+/// The threads synchronise once per batch.
 constexpr size_t kBatchRows = 8;
 constexpr size_t kRows = 4 * kBatchRows;
 
@@ -24,7 +24,7 @@ RowQueue::RowQueue(size_t rowSize, RowSink& next) : rowSize_(rowSize), next_(nex
 }
 
 RowQueue::~RowQueue() {
-  EndThread(false);
+  StopThread(false);
 }
 
 bool RowQueue::Put(const float* row) {
@@ -39,7 +39,7 @@ bool RowQueue::Put(const float* row) {
   if (filled_ % kBatchRows == 0) {
     {
       const std::lock_guard<std::mutex> lock(mutex_);
-      given_ = filled_;
+      ready_ = filled_;
     }
     changed_.notify_all();
   }
@@ -47,25 +47,25 @@ bool RowQueue::Put(const float* row) {
 }
 
 bool RowQueue::Finish() {
-  EndThread(true);
+  StopThread(true);
   return !failed_;
 }
 
 void RowQueue::StartThread() {
   try {
-    thread_ = std::thread([this] { PassRowsOn(); });
+    thread_ = std::thread([this] { ProcessRows(); });
   } catch (const std::system_error&) {
-    // Rows are then passed on by Put.
+    // Put then calls the next step directly.
   }
 }
 
-void RowQueue::EndThread(bool finish) {
+void RowQueue::StopThread(bool finish) {
   if (!thread_.joinable()) {
     return;
   }
   {
     const std::lock_guard<std::mutex> lock(mutex_);
-    given_ = filled_;
+    ready_ = filled_;
     finished_ = finish;
     stopped_ = !finish;
   }
@@ -75,18 +75,18 @@ void RowQueue::EndThread(bool finish) {
 
 bool RowQueue::WaitForRoom() {
   std::unique_lock<std::mutex> lock(mutex_);
-  changed_.wait(lock, [this] { return failed_ || filled_ + kBatchRows <= passed_ + kRows; });
+  changed_.wait(lock, [this] { return failed_ || filled_ + kBatchRows <= processed_ + kRows; });
   return !failed_;
 }
 
-void RowQueue::PassRowsOn() noexcept {
+void RowQueue::ProcessRows() noexcept {
   size_t row = 0;
   for (size_t end = WaitForRows(row); end > row; end = WaitForRows(row)) {
-    const bool taken = PassOn(row, end);
+    const bool taken = ProcessBatch(row, end);
     row = end;
     {
       const std::lock_guard<std::mutex> lock(mutex_);
-      passed_ = row;
+      processed_ = row;
       failed_ = !taken;
     }
     changed_.notify_all();
@@ -98,11 +98,11 @@ void RowQueue::PassRowsOn() noexcept {
 
 size_t RowQueue::WaitForRows(size_t next) {
   std::unique_lock<std::mutex> lock(mutex_);
-  changed_.wait(lock, [&] { return stopped_ || finished_ || given_ > next; });
-  return stopped_ ? next : std::min(given_, next + kBatchRows);
+  changed_.wait(lock, [&] { return stopped_ || finished_ || ready_ > next; });
+  return stopped_ ? next : std::min(ready_, next + kBatchRows);
 }
 
-bool RowQueue::PassOn(size_t begin, size_t end) {
+bool RowQueue::ProcessBatch(size_t begin, size_t end) {
   try {
     for (size_t row = begin; row < end; ++row) {
       if (!next_.Put(Row(row))) {

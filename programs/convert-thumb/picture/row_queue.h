@@ -1,4 +1,4 @@
-// Passes rows on in a thread of its own.
+// Passes rows to the next step in a separate thread.
 #pragma once
 
 #include <condition_variable>
@@ -7,14 +7,14 @@
 #include <thread>
 #include <vector>
 
-#include "picture/row_sink.h"
+#include "picture/rows.h"
 
 namespace vela {
 
 class RowQueue final : public RowSink {
  public:
-  /// `rowSize`: samples a row. `next` has to outlive this and is used by nobody else until Finish.
-  /// With one processor only, rows are passed on by Put.
+  /// `rowSize`: samples in a row. `next` has to outlive this and must not be used by other code
+  /// until Finish. With a single processor, Put calls `next` directly.
   RowQueue(size_t rowSize, RowSink& next);
   ~RowQueue() override;
   RowQueue(const RowQueue&) = delete;
@@ -22,16 +22,16 @@ class RowQueue final : public RowSink {
 
   bool Put(const float* row) override;
 
-  /// Waits until the last row has been passed on. False when a row was refused.
+  /// Waits until the last row has been processed. Returns false when a row was rejected.
   bool Finish();
 
  private:
   void StartThread();
-  void EndThread(bool finish);
+  void StopThread(bool finish);
   bool WaitForRoom();
-  void PassRowsOn() noexcept;
+  void ProcessRows() noexcept;
   size_t WaitForRows(size_t next);
-  bool PassOn(size_t begin, size_t end);
+  bool ProcessBatch(size_t begin, size_t end);
   float* Row(size_t number);
 
   size_t rowSize_;
@@ -39,10 +39,10 @@ class RowQueue final : public RowSink {
   RowSink& next_;
   size_t filled_ = 0;  ///< rows written
 
-  std::mutex mutex_;  ///< of all below but the thread itself
+  std::mutex mutex_;  ///< guards everything below except the thread itself
   std::condition_variable changed_;
-  size_t given_ = 0;  ///< rows that can be passed on
-  size_t passed_ = 0;
+  size_t ready_ = 0;  ///< rows that can be processed
+  size_t processed_ = 0;
   bool finished_ = false;
   bool stopped_ = false;
   bool failed_ = false;

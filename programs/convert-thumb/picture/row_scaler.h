@@ -1,27 +1,25 @@
-// Scales rows as they come and passes the scaled rows on.
+// Scales rows as they arrive, horizontally before vertically.
 #pragma once
 
 #include <cstddef>
 #include <vector>
 
-#include "picture/resize.h"
-#include "picture/resize_filter.h"
+#include "picture/picture.h"
+#include "picture/resize_plan.h"
 #include "picture/row_block.h"
-#include "picture/row_sink.h"
 #include "picture/row_window.h"
-#include "picture/thumbnail_size.h"
+#include "picture/rows.h"
 
 namespace vela {
 
-/// Scales blocks of rows: first from left to right, then from top to bottom.
+/// Scales blocks of rows.
 class BlockScaler {
  public:
-  /// Scales a picture of size `from` with `channels` samples a pixel. `next`, which has to outlive
-  /// this, gets the rows.
+  /// Scales a picture of size `from` with `channels` samples a pixel and passes the rows to `next`,
+  /// which has to outlive this.
   BlockScaler(PictureSize from, int channels, const ResizePlan& plan, RowSink& next);
 
-  /// Takes the next `rows` rows, whose samples of one place lie side by side. False when `next`
-  /// refuses a row.
+  /// Takes the next `rows` rows, interleaved by RowBlock. Returns false when `next` rejects a row.
   bool Put(const float* lanes, int rows);
 
  private:
@@ -40,11 +38,12 @@ class BlockScaler {
 /// Scales the rows of a picture, one after another.
 class RowScaler {
  public:
-  /// The same as BlockScaler's.
+  /// Parameters as for BlockScaler.
   RowScaler(PictureSize from, int channels, const ResizePlan& plan, RowSink& next);
 
-  /// Where the next row may be written, to be taken by TakeRow.
+  /// Returns where to write the next row before TakeRow is called.
   float* NextRow() { return block_.NextRow(); }
+  /// Processes that row. Returns false when the next step rejects a row.
   bool TakeRow() {
     const int rows = block_.TakeRow();
     return rows == 0 || scaler_.Put(block_.Lanes(), rows);

@@ -14,7 +14,7 @@ size_t LongestContribution(const std::vector<Contribution>& contributions) {
   return longest;
 }
 
-/// Rows are written while the filter needs every row before them.
+/// The next rows are written while the filter still needs all rows before them.
 size_t WindowRows(const std::vector<Contribution>& contributions, size_t atOnce) {
   return (LongestContribution(contributions) / atOnce + 2) * atOnce;
 }
@@ -27,7 +27,7 @@ RowWindow::RowWindow(const std::vector<Contribution>& contributions, size_t stri
 void RowWindow::Filter(const Contribution& contribution, float* out) {
   weighted_.clear();
   for (size_t i = 0; i < contribution.weights.size(); ++i) {
-    // A thinned-out picture leaves most rows out.
+    // A presampled picture skips most rows.
     if (contribution.weights[i] != 0) {
       weighted_.push_back({Row(contribution.first + static_cast<int>(i)), contribution.weights[i]});
     }

@@ -1,4 +1,4 @@
-// Keeps the rows that a filter from top to bottom still needs.
+// Keeps the rows that a vertical filter still needs.
 #pragma once
 
 #include <cstddef>
@@ -11,18 +11,19 @@ namespace vela {
 
 class RowWindow {
  public:
-  /// `contributions`: to the rows that will be filtered. `stride`: of a row in memory, samples.
-  /// `atOnce`: rows that are written before the next one is filtered.
+  /// `contributions`: of all rows of the result. `stride`: distance of rows in memory, samples.
+  /// `atOnce`: number of rows that are written before the next one is filtered.
   RowWindow(const std::vector<Contribution>& contributions, size_t stride, size_t atOnce);
 
-  /// Where the row `y` of the picture is kept; `atOnce` rows from a multiple of it lie together.
-  float* Row(int y) { return rows_.data() + Place(y); }
+  /// Returns where row `y` of the picture is kept; `atOnce` rows starting at a multiple of it are
+  /// contiguous.
+  float* Row(int y) { return rows_.data() + Offset(y); }
 
-  /// Writes the filtered row to `out`, which has room for a stride.
+  /// Writes the filtered row to `out`, which has room for `stride` samples.
   void Filter(const Contribution& contribution, float* out);
 
  private:
-  size_t Place(int y) const { return static_cast<size_t>(y) % count_ * stride_; }
+  size_t Offset(int y) const { return static_cast<size_t>(y) % count_ * stride_; }
 
   size_t stride_;
   size_t count_;

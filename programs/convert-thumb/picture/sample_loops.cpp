@@ -7,7 +7,7 @@
 
 namespace vela {
 
-// Chosen when the program starts: the wider instructions where the processor has them.
+// The variant for the widest instructions that the processor supports is chosen at program start.
 #ifdef CONVERT_THUMB_VECTOR_CLONES
 #define VECTOR_CLONES __attribute__((target_clones("arch=x86-64-v4", "arch=x86-64-v3", "default")))
 #else
@@ -18,7 +18,7 @@ namespace vela {
 
 namespace {
 
-/// Sums are made of so many samples at a time that they stay in the processor's first cache.
+/// Sums are computed for a number of samples that fits into the first-level cache.
 constexpr size_t kTile = 512;
 constexpr size_t kPadding = 32;
 static_assert(kTile % kPadding == 0);
@@ -28,13 +28,13 @@ constexpr size_t kFewRows = 4;
 /// Four neighbouring samples anywhere in memory.
 using Four = float __attribute__((vector_size(16), aligned(4), may_alias));
 
-INLINE float Cut(float sample) {
+INLINE float Clamp(float sample) {
   const float positive = sample < 0 ? 0 : sample;
   return positive > kBrightest ? kBrightest : positive;
 }
 
-/// Adds up to four rows at a time, so that the sum is loaded and stored less often. `Keep`: they
-/// add to what the sum is.
+/// Adds up to four rows at a time, so that the sum is loaded and stored less often. `Keep`: add to
+/// the existing sum.
 template <size_t Count, bool Keep>
 INLINE void AddRows(const WeightedRow* rows, size_t from, float* __restrict sum, size_t size) {
   const float* samples[Count];
@@ -135,7 +135,7 @@ INLINE void FilterPixels(const std::vector<Contribution>& contributions, const f
       }
     }
     for (size_t i = 0; i < kPixel; ++i) {
-      out[i] = Cut(sums[i]);
+      out[i] = Clamp(sums[i]);
     }
     out += kPixel;
   }
@@ -155,9 +155,9 @@ VECTOR_CLONES void SumRows(const WeightedRow* rows, size_t count, float* out, si
     for (size_t row = kFewRows; row < count; row += kFewRows) {
       AddFewRows<true>(rows + row, std::min(count - row, kFewRows), from, sum, tile);
     }
-    // Overshoot is cut between the two directions, as it is after them.
+    // Overshoot is clamped after each direction.
     for (size_t i = 0; i < tile; ++i) {
-      sum[i] = Cut(sum[i]);
+      sum[i] = Clamp(sum[i]);
     }
   }
 }
@@ -240,7 +240,7 @@ VECTOR_CLONES void SharpenRow(const float* row, const float* blurred, float amou
   for (size_t i = 0; i < size; ++i) {
     const float difference = row[i] - blurred[i];
     const float share = 2 * std::fabs(difference) < threshold ? 0.0F : amount;
-    out[i] = Cut(row[i] + difference * share);
+    out[i] = Clamp(row[i] + difference * share);
   }
 }
 

@@ -20,8 +20,7 @@ PictureSize ThumbnailSize(PictureSize size, const ThumbnailBox& box) {
   const double horizontal = static_cast<double>(box.width) / size.width;
   const double vertical = static_cast<double>(box.height) / size.height;
   const double scale = box.fill ? std::max(horizontal, vertical) : std::min(horizontal, vertical);
-  // Past the size of a JPEG's largest side nothing is kept: the comparison below takes the old
-  // side.
+  // Keeps the product within the range of int. Enlarged sides are cut to the old size below anyway.
   const double bounded = std::min(scale, 2.0);
   return {std::min(size.width, ScaledSide(size.width, bounded)),
           std::min(size.height, ScaledSide(size.height, bounded))};

@@ -45,48 +45,49 @@ void Transpose(Picture& picture) {
   picture = std::move(turned);
 }
 
-/// A turn or mirroring is a transposition (or none) and then mirroring in two directions (or not).
-struct Movement {
+/// Every rotation or mirroring is an optional transposition followed by optional mirroring in each
+/// direction.
+struct Transformation {
   bool transpose;
   bool leftRight;
   bool topBottom;
 };
 
-void Move(Picture& picture, const Movement& movement) {
-  if (movement.transpose) {
+void Apply(Picture& picture, const Transformation& transformation) {
+  if (transformation.transpose) {
     Transpose(picture);
   }
-  if (movement.leftRight) {
+  if (transformation.leftRight) {
     MirrorLeftRight(picture);
   }
-  if (movement.topBottom) {
+  if (transformation.topBottom) {
     MirrorTopBottom(picture);
   }
 }
 
-constexpr std::array<Movement, 4> kTurns = {
+constexpr std::array<Transformation, 4> kTurns = {
     {{false, false, false}, {true, true, false}, {false, true, true}, {true, false, true}}};
 
-constexpr int kFirstOrientation = 1;
-constexpr std::array<Movement, 8> kOrientations = {{{false, false, false},
-                                                    {false, true, false},
-                                                    {false, true, true},
-                                                    {false, false, true},
-                                                    {true, false, false},
-                                                    {true, true, false},
-                                                    {true, true, true},
-                                                    {true, false, true}}};
+constexpr int kMinOrientation = 1;
+constexpr std::array<Transformation, 8> kOrientations = {{{false, false, false},
+                                                          {false, true, false},
+                                                          {false, true, true},
+                                                          {false, false, true},
+                                                          {true, false, false},
+                                                          {true, true, false},
+                                                          {true, true, true},
+                                                          {true, false, true}}};
 
 }  // namespace
 
 void Turn(Picture& picture, int quarterTurns) {
-  Move(picture, kTurns[static_cast<size_t>(quarterTurns)]);
+  Apply(picture, kTurns[static_cast<size_t>(quarterTurns)]);
 }
 
-void Straighten(Picture& picture, int orientation) {
-  const int place = orientation - kFirstOrientation;
-  if (place >= 0 && place < static_cast<int>(kOrientations.size())) {
-    Move(picture, kOrientations[static_cast<size_t>(place)]);
+void ApplyOrientation(Picture& picture, int orientation) {
+  const int index = orientation - kMinOrientation;
+  if (index >= 0 && index < static_cast<int>(kOrientations.size())) {
+    Apply(picture, kOrientations[static_cast<size_t>(index)]);
   }
 }
 

@@ -1,15 +1,15 @@
-// Turns and mirrors pictures.
+// Rotates and mirrors pictures.
 #pragma once
 
 #include "picture/picture.h"
 
 namespace vela {
 
-/// Turns the picture clockwise by `quarterTurns` times 90 degrees.
+/// Rotates the picture clockwise by `quarterTurns` (0 to 3) times 90 degrees.
 void Turn(Picture& picture, int quarterTurns);
 
-/// Turns and mirrors a picture that was taken with this EXIF orientation (2 to 8) so that it stands
-/// upright; leaves it alone for any other value.
-void Straighten(Picture& picture, int orientation);
+/// Rotates and mirrors a picture with this EXIF orientation (2 to 8) so that it is upright; does
+/// nothing for any other value.
+void ApplyOrientation(Picture& picture, int orientation);
 
 }  // namespace vela

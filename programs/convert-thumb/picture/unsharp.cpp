@@ -9,22 +9,22 @@ namespace vela {
 
 namespace {
 
-constexpr double kSmallestWeight = 1.0 / 65535;
-/// The bell is averaged over this many points a sample.
+constexpr double kMinWeight = 1.0 / 65535;
+/// The Gaussian is averaged over this many points per sample.
 constexpr int kPointsPerSample = 3;
 
-double Bell(double x, double sigma) {
+double Gaussian(double x, double sigma) {
   return std::exp(-x * x / (2 * sigma * sigma));
 }
 
-/// How far to both sides the bell is worth computing.
+/// Returns the distance at which the weights of the Gaussian become negligible.
 int AutomaticReach(double sigma) {
   for (int reach = 2;; ++reach) {
     double sum = 1;
     for (int i = 1; i <= reach; ++i) {
-      sum += 2 * Bell(i, sigma);
+      sum += 2 * Gaussian(i, sigma);
     }
-    if (Bell(reach, sigma) / sum < kSmallestWeight) {
+    if (Gaussian(reach, sigma) / sum < kMinWeight) {
       return reach - 1;
     }
   }
@@ -37,14 +37,15 @@ int Reach(const UnsharpMask& mask) {
   return mask.radius > 0 ? 1 : AutomaticReach(mask.sigma);
 }
 
-/// One side of the bell from its middle; over both sides the weights sum up to 1.
+/// Returns one half of the Gaussian, starting at its centre; the weights of both halves add up
+/// to 1.
 std::vector<float> MakeKernel(const UnsharpMask& mask) {
   const int reach = Reach(mask);
   std::vector<double> half(static_cast<size_t>(reach) + 1);
   for (int i = 0; i <= reach; ++i) {
     for (int point = -(kPointsPerSample / 2); point <= kPointsPerSample / 2; ++point) {
       half[static_cast<size_t>(i)] +=
-          Bell(i * kPointsPerSample + point, kPointsPerSample * mask.sigma);
+          Gaussian(i * kPointsPerSample + point, kPointsPerSample * mask.sigma);
     }
   }
   double sum = half[0];
@@ -59,21 +60,6 @@ std::vector<float> MakeKernel(const UnsharpMask& mask) {
   return kernel;
 }
 
-/// Writes rows over those of a picture.
-class PictureRewriter final : public RowSink {
- public:
-  explicit PictureRewriter(Picture& picture) : picture_(picture) {}
-
-  bool Put(const float* row) override {
-    RoundToPicture(row, picture_.Row(next_++), picture_.RowSize());
-    return true;
-  }
-
- private:
-  Picture& picture_;
-  int next_ = 0;
-};
-
 }  // namespace
 
 RowSharpener::RowSharpener(PictureSize size, int channels, const UnsharpMask& mask, RowSink& next)
@@ -87,7 +73,7 @@ RowSharpener::RowSharpener(PictureSize size, int channels, const UnsharpMask& ma
       stride_(PaddedSize(rowSize_)),
       margin_(static_cast<size_t>(reach_) * channels_),
       rowsHeld_(2 * reach_ + 1),
-      rows_(static_cast<size_t>(rowsHeld_) * RoomOfRow()),
+      rows_(static_cast<size_t>(rowsHeld_) * PaddedRowSize()),
       blurred_(static_cast<size_t>(rowsHeld_) * stride_),
       sum_(stride_),
       sharpened_(stride_),
@@ -95,13 +81,13 @@ RowSharpener::RowSharpener(PictureSize size, int channels, const UnsharpMask& ma
       next_(next) {}
 
 bool RowSharpener::Put(const float* row) {
-  TakeRow(row);
+  StoreRow(row);
   BlurRow(read_);
   ++read_;
-  // The row that comes last ends the wait of those before it.
+  // The last row completes all rows that are still pending.
   const int end = read_ == height_ ? height_ : read_ - reach_;
-  for (; made_ < end; ++made_) {
-    if (!FinishRow(made_)) {
+  for (; done_ < end; ++done_) {
+    if (!FinishRow(done_)) {
       return false;
     }
   }
@@ -112,17 +98,17 @@ size_t RowSharpener::Memory(PictureSize size, int channels, const UnsharpMask& m
   const auto reach = static_cast<size_t>(Reach(mask));
   const size_t stride = PaddedSize(static_cast<size_t>(size.width) * static_cast<size_t>(channels));
   const size_t margins = 2 * reach * static_cast<size_t>(channels);
-  // Rows as they came and blurred rows; a blurred and a sharpened one more.
+  // Source rows and blurred rows, plus one blurred and one sharpened row.
   const size_t held = 2 * reach + 1;
   return (held * (margins + stride + stride) + 2 * stride) * sizeof(float);
 }
 
-size_t RowSharpener::RoomOfRow() const {
+size_t RowSharpener::PaddedRowSize() const {
   return margin_ + stride_ + margin_;
 }
 
 float* RowSharpener::Row(int y) {
-  return rows_.data() + static_cast<size_t>(y % rowsHeld_) * RoomOfRow() + margin_;
+  return rows_.data() + static_cast<size_t>(y % rowsHeld_) * PaddedRowSize() + margin_;
 }
 
 float* RowSharpener::Blurred(int y) {
@@ -130,10 +116,10 @@ float* RowSharpener::Blurred(int y) {
   return blurred_.data() + static_cast<size_t>(inside % rowsHeld_) * stride_;
 }
 
-void RowSharpener::TakeRow(const float* row) {
+void RowSharpener::StoreRow(const float* row) {
   float* const own = Row(read_);
   std::copy_n(row, rowSize_, own);
-  // The first and the last pixel are repeated to both sides.
+  // The first and the last pixel are repeated into the margins.
   float* const left = own - margin_;
   for (size_t i = 0; i < margin_; ++i) {
     left[i] = row[i % channels_];
@@ -161,8 +147,8 @@ bool RowSharpener::FinishRow(int y) {
 }
 
 void Sharpen(Picture& picture, const UnsharpMask& mask) {
-  PictureRewriter rewriter(picture);
-  RowSharpener sharpener({picture.width, picture.height}, picture.channels, mask, rewriter);
+  PictureWriter writer(picture);
+  RowSharpener sharpener(picture.Size(), picture.channels, mask, writer);
   std::vector<float> row(picture.RowSize());
   for (int y = 0; y < picture.height; ++y) {
     WidenRow(picture.Row(y), row.data(), row.size());

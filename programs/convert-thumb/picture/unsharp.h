@@ -4,19 +4,25 @@
 #include <cstddef>
 #include <vector>
 
-#include "command_line/conversion_plan.h"
 #include "picture/picture.h"
-#include "picture/row_sink.h"
+#include "picture/rows.h"
 #include "picture/sample_loops.h"
-#include "picture/thumbnail_size.h"
 
 namespace vela {
 
-/// Adds to every sample its difference from the blurred picture, as `mask` says.
+/// Parameters of the sharpening.
+struct UnsharpMask {
+  double radius = 0;        ///< pixels; 0: derived from `sigma`
+  double sigma = 1;         ///< pixels, positive
+  double amount = 1;        ///< factor of the difference that is added
+  double threshold = 0.05;  ///< smallest difference that is added, as a share of the full range
+};
+
+/// Adds to every sample its difference from the blurred picture, according to `mask`.
 void Sharpen(Picture& picture, const UnsharpMask& mask);
 
-/// The same to rows as they come, which it passes on: each one when the last row that its blur
-/// needs is there.
+/// The same for rows as they arrive: each is passed on as soon as the last row that its blur needs
+/// has arrived.
 class RowSharpener final : public RowSink {
  public:
   /// `next` has to outlive this.
@@ -24,14 +30,14 @@ class RowSharpener final : public RowSink {
 
   bool Put(const float* row) override;
 
-  /// Bytes that sharpening a picture of that size takes besides the picture.
+  /// Returns the bytes that sharpening a picture of that size needs in addition to the picture.
   static size_t Memory(PictureSize size, int channels, const UnsharpMask& mask);
 
  private:
-  size_t RoomOfRow() const;
+  size_t PaddedRowSize() const;
   float* Row(int y);
   float* Blurred(int y);
-  void TakeRow(const float* row);
+  void StoreRow(const float* row);
   void BlurRow(int y);
   bool FinishRow(int y);
 
@@ -39,20 +45,20 @@ class RowSharpener final : public RowSink {
   size_t channels_;
   float amount_;
   float threshold_;
-  std::vector<float> kernel_;  ///< one side of the bell from its middle
+  std::vector<float> kernel_;  ///< one half of the Gaussian, starting at its centre
   int reach_;
   size_t rowSize_;  ///< samples
-  size_t stride_;   ///< of a blurred row in memory, samples
-  size_t margin_;   ///< samples that a row is continued by to both sides
+  size_t stride_;   ///< distance of blurred rows in memory, samples
+  size_t margin_;   ///< samples that a row is extended by on both sides
   int rowsHeld_;
   std::vector<float> rows_;
-  std::vector<float> blurred_;  ///< from left to right
+  std::vector<float> blurred_;  ///< horizontally
   std::vector<float> sum_;
   std::vector<float> sharpened_;
   std::vector<WeightedPair> pairs_;
   RowSink& next_;
   int read_ = 0;
-  int made_ = 0;  ///< rows passed on
+  int done_ = 0;  ///< rows passed on
 };
 
 }  // namespace vela

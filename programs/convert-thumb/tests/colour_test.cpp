@@ -28,7 +28,7 @@ Picture OnePixel(std::vector<uint16_t> samples) {
 TEST(ColourConversion, InksTakeTheirShareOfLight) {
   // Cyan ink leaves half of the red, black ink leaves half of everything.
   Picture picture = OnePixel({32768, kLight, kLight, 32768});
-  ConvertToRgb(picture, ColourSpace::kInks);
+  ConvertToRgb(picture, ColourSpace::kCmyk);
   EXPECT_EQ(picture.channels, 3);
   EXPECT_EQ(picture.samples, (std::vector<uint16_t>{16384, 32768, 32768}));
 }

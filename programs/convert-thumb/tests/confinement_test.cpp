@@ -26,8 +26,8 @@
 #include <system_error>
 #include <thread>
 
-#include "confinement/confinement.h"
 #include "converter_fixture.h"
+#include "process/confinement.h"
 #include "support/files.h"
 #include "support/images.h"
 #include "support/seccomp_fail.h"

@@ -13,10 +13,10 @@
 #include <cstring>
 #include <thread>
 
-#include "confinement/resource_limits.h"
 #include "converter_fixture.h"
 #include "hostile_pictures.h"
 #include "measured_run.h"
+#include "process/resource_limits.h"
 #include "support/files.h"
 #include "support/image_checks.h"
 #include "support/images.h"

@@ -91,23 +91,23 @@ TEST(Resizing, MirrorsLikeThePicture) {
     picture.samples[i] = static_cast<uint16_t>(i * 2654435761U >> 8);
   }
   Picture mirrored = picture;
-  Straighten(mirrored, 3);
+  ApplyOrientation(mirrored, 3);
   PictureRows rows(picture);
   PictureRows mirroredRows(mirrored);
   const ResizePlan plan{{13, 7}, FilterKind::kMitchell, false, false};
   const auto scaled = Resize(rows, plan);
   auto scaledMirrored = Resize(mirroredRows, plan);
   ASSERT_TRUE(scaled && scaledMirrored);
-  Straighten(*scaledMirrored, 3);
+  ApplyOrientation(*scaledMirrored, 3);
   for (size_t i = 0; i < scaled->samples.size(); ++i) {
     EXPECT_NEAR(scaled->samples[i], scaledMirrored->samples[i], 2);
   }
 }
 
 TEST(Resizing, ThinsOutWhatShrinksByMuch) {
-  EXPECT_TRUE(IsThinnedOut({4000, 3000}, {1000, 750}));
-  EXPECT_FALSE(IsThinnedOut({4000, 3000}, {1280, 960}));
-  EXPECT_FALSE(IsThinnedOut({4000, 3000}, {25, 19}));
+  EXPECT_TRUE(IsPresampled({4000, 3000}, {1000, 750}));
+  EXPECT_FALSE(IsPresampled({4000, 3000}, {1280, 960}));
+  EXPECT_FALSE(IsPresampled({4000, 3000}, {25, 19}));
 }
 
 /// The picture's samples of one channel, as a picture of their own.
@@ -175,10 +175,10 @@ TEST_P(Channels, AreTurnedAlike) {
   const Picture picture = NoisyPicture(7, 5, GetParam());
   for (int orientation = 1; orientation <= 8; ++orientation) {
     Picture upright = picture;
-    Straighten(upright, orientation);
+    ApplyOrientation(upright, orientation);
     for (int channel = 0; channel < GetParam(); ++channel) {
       Picture expected = ChannelOf(picture, channel);
-      Straighten(expected, orientation);
+      ApplyOrientation(expected, orientation);
       ExpectNear(ChannelOf(upright, channel), expected, 0);
     }
   }
@@ -250,7 +250,7 @@ TEST(Turning, MovesEverySample) {
 TEST(Turning, KeepsTheSamplesOfAPixelTogether) {
   Picture picture(2, 1, 3);
   picture.samples = {1, 2, 3, 4, 5, 6};
-  Straighten(picture, 2);
+  ApplyOrientation(picture, 2);
   EXPECT_THAT(picture.samples, ElementsAre(4, 5, 6, 1, 2, 3));
   Turn(picture, 1);
   EXPECT_THAT(picture.samples, ElementsAre(4, 5, 6, 1, 2, 3));

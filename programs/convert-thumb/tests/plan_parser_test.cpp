@@ -1,7 +1,11 @@
-#include "command_line/plan_parser.h"
+#include "command_line/command_line.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
+
+#include <optional>
+#include <utility>
+#include <variant>
 
 #include "command_line.h"
 
@@ -10,7 +14,22 @@ using namespace vela;
 namespace vela_test {
 namespace {
 
+using ::testing::ElementsAre;
 using ::testing::SizeIs;
+
+template <typename Task>
+std::optional<Task> ParseTask(std::vector<std::string> arguments) {
+  const vela::CommandLine line = ParseCommandLine(std::move(arguments));
+  const Task* const task = std::get_if<Task>(&line.task);
+  return task == nullptr ? std::nullopt : std::optional<Task>(*task);
+}
+
+const auto ParseConversion = ParseTask<ConversionPlan>;
+const auto ParseTurn = ParseTask<TurnPlan>;
+
+size_t FindSourceArgument(std::vector<std::string> arguments) {
+  return ParseCommandLine(std::move(arguments)).sourceIndex;
+}
 
 TEST(PlanParser, ReadsAnyNumberOfOutputs) {
   for (size_t count = 1; count <= 6; ++count) {
@@ -119,6 +138,16 @@ TEST(SourceArgument, IsTheFirstThatIsNoOption) {
   EXPECT_EQ(FindSourceArgument({"-rotate", "90", "/a.jpg", "/a.jpg"}), 2U);
   EXPECT_EQ(FindSourceArgument({"/a.jpg"}), 0U);
   EXPECT_EQ(FindSourceArgument({}), 0U);
+}
+
+TEST(ParsedCommandLine, NamesOutputsAndScratchDirectoryOfAnUnknownTask) {
+  const auto line = ParseCommandLine(
+      {"a.gif[0]", "-write", "1.gif", "-define", "registry:temporary-path=/x", "-write", "2.gif"});
+  EXPECT_TRUE(std::holds_alternative<UnknownTask>(line.task));
+  EXPECT_EQ(line.sourceIndex, 0U);
+  EXPECT_EQ(line.sourceFile, "a.gif");
+  EXPECT_THAT(line.outputIndices, ElementsAre(2U, 6U));
+  EXPECT_EQ(line.scratchDirectory, "/x");
 }
 
 TEST(PlanParser, ReadsATurnInPlace) {

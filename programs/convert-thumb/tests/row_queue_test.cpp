@@ -9,7 +9,7 @@
 #include <numeric>
 #include <vector>
 
-#include "worker_threads.h"
+#include "process/worker_threads.h"
 
 using namespace vela;
 

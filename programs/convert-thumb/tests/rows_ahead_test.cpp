@@ -9,7 +9,7 @@
 #include <new>
 #include <vector>
 
-#include "worker_threads.h"
+#include "process/worker_threads.h"
 
 using namespace vela;
 

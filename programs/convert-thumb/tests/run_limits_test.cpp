@@ -13,13 +13,12 @@
 #include <thread>
 #include <vector>
 
-#include "confinement/memory_limit.h"
-#include "confinement/resource_limits.h"
 #include "converter_fixture.h"
-#include "encoding/output_file.h"
-#include "encoding/unfinished_outputs.h"
 #include "imagemagick/image_magick_limits.h"
 #include "posix/file_descriptor.h"
+#include "process/output_file.h"
+#include "process/resource_limits.h"
+#include "process/unfinished_outputs.h"
 #include "support/files.h"
 #include "support/images.h"
 #include "support/stub_files.h"
@@ -81,8 +80,8 @@ TEST_F(RunLimits, AreToldOfWhenTheyMakeNoSense) {
     ::testing::internal::CaptureStderr();
     EXPECT_EQ(ConversionMemoryLimit(), 512 * kMebibyte) << text;
     EXPECT_EQ(::testing::internal::GetCapturedStderr(),
-              "convert-thumb: /etc/velainfo.conf: convert_memory_limit is no number of bytes, "
-              "536870912 is taken\n")
+              "convert-thumb: /etc/velainfo.conf: convert_memory_limit is not a number of bytes, "
+              "using 536870912\n")
         << text;
   }
 }
@@ -135,8 +134,8 @@ TEST_F(RunLimits, EndAnEndlessRun) {
   EXPECT_EQ(StatusOf([] {
               LimitResources(100 * kMebibyte);
               const rlimit limit = LimitOf(RLIMIT_CPU);
-              return limit.rlim_cur == kMostProcessorSeconds && limit.rlim_max > limit.rlim_cur &&
-                             limit.rlim_max < 2 * kMostProcessorSeconds
+              return limit.rlim_cur == kMaxProcessorSeconds && limit.rlim_max > limit.rlim_cur &&
+                             limit.rlim_max < 2 * kMaxProcessorSeconds
                          ? 0
                          : 1;
             }),
@@ -152,9 +151,9 @@ TEST_F(RunLimits, EndCleanly) {
       WriteFile(path, "part");
     }
     EXPECT_EQ(StatusOf([&] {
-                EndCleanlyOnFatalSignals();
-                std::thread([&] { NoteOutput(one); }).join();
-                NoteOutput(two);
+                CleanUpOnFatalSignals();
+                std::thread([&] { RegisterOutput(one); }).join();
+                RegisterOutput(two);
                 raise(signal);
                 return 0;
               }),
@@ -197,7 +196,7 @@ TEST_F(RunLimits, LetNoOutputBeginOnceTheRunIsEnding) {
   const std::string path = directory_ + "/late.jpg";
   const unsigned char byte = 0;
   EXPECT_EQ(StatusOf([&] {
-              RemoveNotedOutputs();
+              RemoveRegisteredOutputs();
               return WriteOutputFile(path, &byte, 1) ? 1 : 0;
             }),
             0);
@@ -213,10 +212,10 @@ TEST_F(RunLimits, RemoveNothingThatIsNotTheRuns) {
   ASSERT_EQ(symlink("/dev/null", device.c_str()), 0);
   EXPECT_EQ(StatusOf([&] {
               for (const std::string& path : {forgotten, pipe, device}) {
-                NoteOutput(path);
+                RegisterOutput(path);
               }
-              ForgetOutput(forgotten);
-              RemoveNotedOutputs();
+              UnregisterOutput(forgotten);
+              RemoveRegisteredOutputs();
               return 0;
             }),
             0);

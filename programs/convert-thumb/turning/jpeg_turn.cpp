@@ -1,19 +1,15 @@
 #include "turning/jpeg_turn.h"
 
-#include <fcntl.h>
-#include <sys/stat.h>
-#include <unistd.h>
-
 #include <cerrno>
 #include <cstring>
-#include <memory>
 #include <optional>
 #include <vector>
 
-#include "encoding/output_file.h"
-#include "failure_line.h"
-#include "posix/file_descriptor.h"
-#include "turning/turbojpeg_library.h"
+#include "posix/loaded_library.h"
+#include "process/failure_report.h"
+#include "process/output_file.h"
+
+#include <turbojpeg.h>
 
 namespace vela {
 
@@ -21,51 +17,37 @@ namespace {
 
 constexpr TJXOP kOperations[] = {TJXOP_NONE, TJXOP_ROT90, TJXOP_ROT180, TJXOP_ROT270};
 
-/// A coefficient for each of three samples a pixel, of the old picture and of the turned one.
+/// A coefficient for each of three samples per pixel, of both the old and the turned picture.
 constexpr size_t kBytesPerPixel = 2 * 3 * sizeof(short);
 
-struct FileContent {
-  std::vector<unsigned char> bytes;
-  struct stat status = {};
+/// The functions of libturbojpeg that are used. It is loaded only when a file is to be turned:
+/// thumbnails do not need it.
+class TurbojpegLibrary final : private LoadedLibrary {
+ public:
+  /// Returns the library, loaded by the first call; null when it, or one of its functions, is
+  /// missing.
+  static const TurbojpegLibrary* Get() {
+    static const TurbojpegLibrary library;
+    return library.IsLoaded() ? &library : nullptr;
+  }
+
+  decltype(&::tjInitTransform) initTransform = nullptr;
+  decltype(&::tjDecompressHeader3) readHeader = nullptr;
+  decltype(&::tjTransform) transform = nullptr;
+  decltype(&::tjDestroy) destroy = nullptr;
+  decltype(&::tjFree) freeBuffer = nullptr;
+
+ private:
+  TurbojpegLibrary() : LoadedLibrary("libturbojpeg.so.0") {
+    Find("tjInitTransform", initTransform);
+    Find("tjDecompressHeader3", readHeader);
+    Find("tjTransform", transform);
+    Find("tjDestroy", destroy);
+    Find("tjFree", freeBuffer);
+  }
 };
 
-bool ReadAll(int descriptor, std::vector<unsigned char>& bytes) {
-  size_t done = 0;
-  while (done < bytes.size()) {
-    const ssize_t got = read(descriptor, bytes.data() + done, bytes.size() - done);
-    if (got < 0 && errno == EINTR) {
-      continue;
-    }
-    if (got <= 0) {
-      return false;
-    }
-    done += static_cast<size_t>(got);
-  }
-  return true;
-}
-
-/// Whether nothing but its name leads to it, and nothing but its status and content belongs to it.
-bool CanBeReplaced(int descriptor, const struct stat& status) {
-  return S_ISREG(status.st_mode) && status.st_nlink == 1 && status.st_uid == geteuid() &&
-         status.st_gid == getegid() && !HasExtendedAttributes(descriptor);
-}
-
-/// Empty when it cannot be replaced, cannot be read, or is larger than `limit` bytes.
-std::optional<FileContent> ReadFile(const std::string& path, size_t limit) {
-  const FileDescriptor file(
-      open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NOCTTY | O_NONBLOCK | O_NOFOLLOW));
-  FileContent content;
-  if (!file.IsOpen() || fstat(file.Get(), &content.status) != 0 ||
-      !CanBeReplaced(file.Get(), content.status) ||
-      static_cast<size_t>(content.status.st_size) > limit) {
-    return std::nullopt;
-  }
-  content.bytes.resize(static_cast<size_t>(content.status.st_size));
-  return ReadAll(file.Get(), content.bytes) ? std::optional<FileContent>(std::move(content))
-                                            : std::nullopt;
-}
-
-/// The library's transformer and the turned file that it makes.
+/// The library's transformer and the turned file that it produces.
 class Transformer {
  public:
   explicit Transformer(const TurbojpegLibrary& library)
@@ -111,17 +93,16 @@ class Transformer {
 }  // namespace
 
 FileTurn TurnJpegFile(const std::string& path, int quarterTurns, size_t memoryLimit) {
-  const std::optional<FileContent> content = ReadFile(path, memoryLimit);
-  const TurbojpegLibrary* const library = content ? TurbojpegLibrary::Get() : nullptr;
+  const std::optional<ReplaceableFile> file = ReadReplaceableFile(path, memoryLimit);
+  const TurbojpegLibrary* const library = file ? TurbojpegLibrary::Get() : nullptr;
   if (library == nullptr) {
     return FileTurn::kImpossible;
   }
   Transformer transformer(*library);
-  if (!transformer.Fits(content->bytes, memoryLimit) ||
-      !transformer.Turn(content->bytes, quarterTurns)) {
+  if (!transformer.Fits(file->bytes, memoryLimit) || !transformer.Turn(file->bytes, quarterTurns)) {
     return FileTurn::kImpossible;
   }
-  switch (ReplaceFile(path, transformer.Turned(), transformer.Size(), content->status)) {
+  switch (ReplaceFile(path, transformer.Turned(), transformer.Size(), file->attributes)) {
     case Replacement::kDone:
       return FileTurn::kDone;
     case Replacement::kImpossible:
@@ -129,7 +110,7 @@ FileTurn TurnJpegFile(const std::string& path, int quarterTurns, size_t memoryLi
     case Replacement::kFailed:
       break;
   }
-  TellFailure("cannot replace %s: %s", path.c_str(), std::strerror(errno));
+  ReportFailure("cannot replace %s: %s", path.c_str(), std::strerror(errno));
   return FileTurn::kFailed;
 }
 

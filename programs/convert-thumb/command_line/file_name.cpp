@@ -1,0 +1,36 @@
+#include "command_line/file_name.h"
+
+#include <algorithm>
+
+namespace vela {
+
+namespace {
+
+char ToLower(char character) {
+  constexpr char kDistance = 'a' - 'A';
+  return character >= 'A' && character <= 'Z' ? static_cast<char>(character + kDistance)
+                                              : character;
+}
+
+}  // namespace
+
+bool EqualsIgnoringCase(std::string_view a, std::string_view b) {
+  return std::equal(a.begin(), a.end(), b.begin(), b.end(),
+                    [](char left, char right) { return ToLower(left) == ToLower(right); });
+}
+
+std::string_view ExtensionOf(std::string_view path) {
+  const size_t dot = path.find_last_of("./");
+  return dot == std::string_view::npos || path[dot] != '.' ? std::string_view()
+                                                           : path.substr(dot + 1);
+}
+
+std::string DirectoryOf(const std::string& path) {
+  const size_t slash = path.rfind('/');
+  if (slash == std::string::npos) {
+    return ".";
+  }
+  return slash == 0 ? "/" : path.substr(0, slash);
+}
+
+}  // namespace vela

@@ -1,0 +1,18 @@
+// The parts of file names.
+#pragma once
+
+#include <string>
+#include <string_view>
+
+namespace vela {
+
+/// Returns true when both texts are the same apart from the case of ASCII letters.
+bool EqualsIgnoringCase(std::string_view a, std::string_view b);
+
+/// Returns what follows the last dot of the file name in `path`; empty when there is no dot.
+std::string_view ExtensionOf(std::string_view path);
+
+/// Returns the directory of the file at `path`, "." when the path does not name one.
+std::string DirectoryOf(const std::string& path);
+
+}  // namespace vela

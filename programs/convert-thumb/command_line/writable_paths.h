@@ -1,0 +1,13 @@
+// Where a command line may change files.
+#pragma once
+
+#include "command_line/command_line.h"
+#include "process/landlock.h"
+
+namespace vela {
+
+/// Returns the outputs with their directories, the directory for temporary files and /dev/null. The
+/// paths need not exist.
+WritablePaths FindWritablePaths(const CommandLine& line);
+
+}  // namespace vela

@@ -1,0 +1,133 @@
+#include "process/child_program.h"
+
+#include <sys/prctl.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <csignal>
+#include <cstring>
+#include <optional>
+
+#include "process/failure_report.h"
+#include "process/write_signals.h"
+
+namespace vela {
+
+namespace {
+
+constexpr int kForwardedSignals[] = {SIGTERM, SIGINT, SIGHUP, SIGQUIT};
+constexpr int kFailed = 1;
+/// Added to a signal number, the exit status that shells report for a program ended by a signal.
+constexpr int kEndedBySignal = 128;
+
+volatile pid_t g_child = 0;
+
+void ForwardSignal(int signal) {
+  const int error = errno;
+  kill(g_child, signal);
+  errno = error;
+}
+
+sigset_t ForwardedSignals() {
+  sigset_t signals;
+  sigemptyset(&signals);
+  for (const int signal : kForwardedSignals) {
+    sigaddset(&signals, signal);
+  }
+  return signals;
+}
+
+/// Signals that this process ignores stay ignored: the child inherits that.
+void ForwardSignals() {
+  struct sigaction action = {};
+  action.sa_handler = ForwardSignal;
+  action.sa_flags = SA_RESTART;
+  for (const int signal : kForwardedSignals) {
+    struct sigaction former = {};
+    sigaction(signal, nullptr, &former);
+    if (former.sa_handler != SIG_IGN) {
+      sigaction(signal, &action, nullptr);
+    }
+  }
+}
+
+[[noreturn]] void ExecuteProgram(const char* program, char* const* arguments, pid_t parent,
+                                 const sigset_t& mask) {
+  prctl(PR_SET_PDEATHSIG, SIGKILL);
+  // The parent may have died before that call.
+  if (getppid() == parent) {
+    sigprocmask(SIG_SETMASK, &mask, nullptr);
+    execv(program, arguments);
+    ReportFailure("%s: %s", program, std::strerror(errno));
+    IgnoreWriteSignals();
+    PrintFailure();
+  }
+  _exit(kFailed);
+}
+
+[[noreturn]] void ExitLike(int waitStatus) {
+  if (WIFEXITED(waitStatus)) {
+    _exit(WEXITSTATUS(waitStatus));
+  }
+  const int signal = WTERMSIG(waitStatus);
+  std::signal(signal, SIG_DFL);
+  sigset_t only;
+  sigemptyset(&only);
+  sigaddset(&only, signal);
+  sigprocmask(SIG_UNBLOCK, &only, nullptr);
+  kill(getpid(), signal);
+  _exit(kEndedBySignal + signal);
+}
+
+/// A process that ignores SIGCHLD gets no exit status of its children.
+void ResetChildSignal() {
+  struct sigaction action = {};
+  action.sa_handler = SIG_DFL;
+  sigaction(SIGCHLD, &action, nullptr);
+}
+
+/// Returns the wait status of the child; empty, with errno set, when it cannot be determined.
+std::optional<int> WaitForExit(pid_t child) {
+  int status = 0;
+  while (waitpid(child, &status, 0) < 0) {
+    if (errno != EINTR) {
+      return std::nullopt;
+    }
+  }
+  return status;
+}
+
+}  // namespace
+
+void ReplaceProcess(const char* program, char* const* arguments) {
+  execv(program, arguments);
+}
+
+void RunInChildAndExit(const char* program, char* const* arguments) {
+  const pid_t self = getpid();
+  const sigset_t forwarded = ForwardedSignals();
+  sigset_t mask;
+  // Until there is a child to forward them to.
+  sigprocmask(SIG_BLOCK, &forwarded, &mask);
+  ResetChildSignal();
+  const pid_t child = fork();
+  if (child == 0) {
+    ExecuteProgram(program, arguments, self, mask);
+  }
+  if (child > 0) {
+    g_child = child;
+    ForwardSignals();
+  }
+  const int error = errno;
+  sigprocmask(SIG_SETMASK, &mask, nullptr);
+  if (child < 0) {
+    errno = error;
+    return;
+  }
+  if (const std::optional<int> status = WaitForExit(child)) {
+    ExitLike(*status);
+  }
+}
+
+}  // namespace vela

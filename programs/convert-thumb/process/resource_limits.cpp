@@ -1,0 +1,111 @@
+#include "process/resource_limits.h"
+
+#include <sys/resource.h>
+
+#include <algorithm>
+#include <charconv>
+#include <cstdio>
+#include <limits>
+#include <optional>
+#include <string_view>
+#include <system_error>
+
+#include "platform/vlibc.h"
+#include "process/worker_threads.h"
+
+namespace vela {
+
+namespace {
+
+/// From SIGXCPU until the kernel kills the process.
+constexpr rlim_t kSecondsToEnd = 5;
+/// The only size that also keeps crash handlers, which read core dumps from a pipe, from being run.
+constexpr rlim_t kNoCoreDump = 1;
+
+constexpr char kSystemSettings[] = "/etc/velainfo.conf";
+constexpr char kKey[] = "convert_memory_limit";
+constexpr size_t kDefaultLimit = CONVERT_THUMB_MEMORY_LIMIT;
+
+/// Returns how often the suffix of a number doubles it; empty for an unknown suffix.
+std::optional<int> Doublings(std::string_view unit) {
+  constexpr std::string_view kUnits = "kmg";
+  constexpr int kDoublingsEach = 10;
+  if (unit.empty()) {
+    return 0;
+  }
+  const size_t index = kUnits.find(static_cast<char>(unit.front() | 0x20));
+  if (unit.size() > 1 || index == std::string_view::npos) {
+    return std::nullopt;
+  }
+  return kDoublingsEach * static_cast<int>(index + 1);
+}
+
+/// Empty unless the text is a size of at least 1 byte.
+std::optional<size_t> ParseSize(std::string_view text) {
+  const char* const last = text.data() + text.size();
+  size_t number = 0;
+  const auto [end, error] = std::from_chars(text.data(), last, number);
+  if (error != std::errc() || number == 0) {
+    return std::nullopt;
+  }
+  const std::optional<int> doublings =
+      Doublings(std::string_view(end, static_cast<size_t>(last - end)));
+  if (!doublings || number > std::numeric_limits<size_t>::max() >> *doublings) {
+    return std::nullopt;
+  }
+  return number << *doublings;
+}
+
+void Lower(int resource, rlim_t soft, rlim_t hard) {
+  const auto kind = static_cast<__rlimit_resource>(resource);
+  rlimit limit = {};
+  if (getrlimit(kind, &limit) != 0) {
+    return;
+  }
+  limit.rlim_max = std::min(limit.rlim_max, hard);
+  limit.rlim_cur = std::min({limit.rlim_cur, limit.rlim_max, soft});
+  setrlimit(kind, &limit);
+}
+
+void LimitMemory(size_t memoryLimit) {
+// A sanitizer reserves many times the memory of any limit.
+#if !defined(CONVERT_THUMB_SANITIZED)
+  const size_t besides = kMemoryBesides + kStackMemory * ProcessorCount();
+  const size_t most = std::numeric_limits<size_t>::max() - besides;
+  const rlim_t limit = std::min(memoryLimit, most) + besides;
+  Lower(RLIMIT_DATA, limit, limit);
+#else
+  static_cast<void>(memoryLimit);
+#endif
+}
+
+}  // namespace
+
+size_t ConversionMemoryLimit() {
+  char text[64] = "";
+  if (VLIBCFileGetKeyValue(kSystemSettings, kKey, text, sizeof text, 0) <= 0 || *text == '\0') {
+    return kDefaultLimit;
+  }
+  const std::optional<size_t> limit = ParseSize(text);
+  if (!limit) {
+    std::fprintf(stderr, "convert-thumb: %s: %s is not a number of bytes, using %zu\n",
+                 kSystemSettings, kKey, kDefaultLimit);
+  }
+  return limit.value_or(kDefaultLimit);
+}
+
+void LimitResources(size_t memoryLimit) {
+  LimitMemory(memoryLimit);
+  Lower(RLIMIT_CPU, kMaxProcessorSeconds, kMaxProcessorSeconds + kSecondsToEnd);
+}
+
+void DisableCoreDumps() {
+  rlimit limit = {};
+  getrlimit(RLIMIT_CORE, &limit);
+  limit.rlim_max = std::min(limit.rlim_max, kNoCoreDump);
+  // Raised where it was 0, which would not keep crash handlers from being run.
+  limit.rlim_cur = limit.rlim_max;
+  setrlimit(RLIMIT_CORE, &limit);
+}
+
+}  // namespace vela

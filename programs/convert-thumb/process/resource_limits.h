@@ -1,0 +1,31 @@
+// Limits on the memory and processor time of a conversion.
+#pragma once
+
+#include <cstddef>
+
+namespace vela {
+
+/// Processor time of all threads together; more than a picture of 100 megapixels takes on a slow
+/// machine.
+constexpr unsigned kMaxProcessorSeconds = 600;
+
+/// What the program and its libraries need in addition to the picture, in bytes, and a thread stack
+/// for each processor, since libraries start that many threads.
+constexpr size_t kMemoryBesides = size_t{64} << 20;
+constexpr size_t kStackMemory = size_t{8} << 20;
+
+/// Returns the memory limit of a conversion in bytes: `convert_memory_limit` of the system
+/// settings, a number that a suffix K, M or G multiplies by 1024, 1024^2 or 1024^3. If it is absent
+/// or empty, the default of the build (VELA_CONVERT_MEMORY_LIMIT); the same, after one line on
+/// standard error, if it is invalid.
+size_t ConversionMemoryLimit();
+
+/// From now on, allocations fail when this process, or the program that replaces it, has used
+/// `memoryLimit` bytes plus the above, and it gets SIGXCPU when its processor time is used up.
+/// Existing lower limits stay.
+void LimitResources(size_t memoryLimit);
+
+/// Makes sure that a crash leaves no core dump, neither as a file nor with a crash handler.
+void DisableCoreDumps();
+
+}  // namespace vela

@@ -1,0 +1,51 @@
+// Opening and reading the files that photos come from.
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+#include <cstdio>
+#include <string>
+
+#include "posix/file_content.h"
+#include "posix/file_descriptor.h"
+#include "posix/files.h"
+
+namespace vela {
+
+enum class FileType {
+  kNone,  ///< there is no such file, or it cannot be examined
+  kRegular,
+  kDirectory,
+  kPipe,
+  kOther,  ///< a device or a socket
+};
+
+/// Returns the type of the file at `path`, following symbolic links. Async-signal-safe.
+FileType TypeOf(const std::string& path);
+FileType TypeOf(int descriptor);
+
+/// Opens a file as OpenForReading does, for a descriptor that is passed to another program: reads
+/// through it wait for data as usual.
+FileDescriptor OpenForProgram(const std::string& path);
+
+/// Returns a second descriptor of the same open file; not open, with errno set, on failure.
+FileDescriptor Duplicate(int descriptor);
+
+/// Returns a stream that reads from a duplicate of the descriptor; null on failure.
+std::FILE* OpenStream(int descriptor);
+
+/// Returns the size of an open file in bytes; -1 on failure.
+int64_t SizeOf(int descriptor);
+
+/// Reads up to `size` bytes at the descriptor's position. Returns the number of bytes, 0 at the end
+/// of the file and -1 on failure.
+int64_t ReadSome(int descriptor, void* bytes, size_t size);
+
+/// The same from `offset`; leaves the descriptor's position alone.
+int64_t ReadSomeAt(int descriptor, void* bytes, size_t size, int64_t offset);
+
+/// Reads exactly `size` bytes at the descriptor's position. Returns false on failure or when the
+/// file ends earlier.
+bool ReadExactly(int descriptor, void* bytes, size_t size);
+
+}  // namespace vela

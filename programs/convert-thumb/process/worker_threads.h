@@ -1,0 +1,20 @@
+// Parallel work on the available processors.
+#pragma once
+
+#include <cstddef>
+#include <functional>
+
+namespace vela {
+
+/// Returns the number of processors that this process may use.
+size_t ProcessorCount();
+
+/// Returns true when this process may use more than one processor.
+bool HasSecondProcessor();
+
+/// Calls `work` with every number below `count`, in two threads if there is a second processor;
+/// each thread takes the next number that is still open. Stops when a call returns false; returns
+/// false in that case.
+bool DoInTwoThreads(size_t count, const std::function<bool(size_t)>& work);
+
+}  // namespace vela
