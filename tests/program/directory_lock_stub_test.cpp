@@ -1,42 +1,27 @@
 // The lock that keeps instances out of each other's directories.
-#include <gmock/gmock.h>
-#include <gtest/gtest.h>
 #include <signal.h>
 #include <unistd.h>
 
 #include <cerrno>
-#include <string>
 
 #include "program/stub_program_test.h"
-#include "support/files.h"
 #include "support/seccomp_fail.h"
-#include "support/system_log.h"
 
 namespace vela_test {
 namespace {
 
-using ::testing::ElementsAre;
-using ::testing::IsEmpty;
-
-constexpr const char* kPhoto = "/tmp/photos/a.jpg";
 constexpr const char* kRoot = "/tmp/photos/@eaDir";
 constexpr const char* kRefused = "velathumb:849 Failed to lock /tmp/photos/@eaDir";
 
-class InstanceLock : public StubProgramTest {
- protected:
-  void SetUp() override {
-    StubProgramTest::SetUp();
-    MakePhoto(kPhoto);
-  }
-};
+using InstanceLock = OnePhotoTest;
 
-TEST_F(InstanceLock, LockedDirectoryIsPassedOverAtOnce) {
+TEST_F(InstanceLock, LockedDirectoryIsSkippedAtOnce) {
   MakeDirectories(MetadataDirOf(kPhoto));
   WriteFile(Marker(kPhoto, "M"), "");
   const DaemonPeer daemon;
   const HeldLock lock(kRoot);
   ASSERT_TRUE(lock.IsHeld());
-  EXPECT_GOOD_END(Run());
+  EXPECT_SUCCESS(Run());
   EXPECT_THAT(daemon.Commands(), IsEmpty());
   EXPECT_THAT(Converter().Calls(), IsEmpty());
   EXPECT_THAT(MetadataOf(kPhoto), ElementsAre("VELAPHOTO_THUMB_M.fail"));
@@ -44,20 +29,17 @@ TEST_F(InstanceLock, LockedDirectoryIsPassedOverAtOnce) {
   EXPECT_THAT(ErrorLines(), ElementsAre(kRefused));
 }
 
-TEST_F(InstanceLock, SecondInstancePassesOverTheDirectoryOfTheFirst) {
+TEST_F(InstanceLock, SecondInstanceSkipsTheDirectoryOfTheFirst) {
   MakePhoto("/tmp/other/b.jpg");
-  PauseConverter();
   DaemonPeer daemon;
-  Program first = Start();
-  ASSERT_TRUE(IsConverterPaused());
-  EXPECT_GOOD_END(Run({kPhotos, "/tmp/other"}));
+  Program first = StartAndPause();
+  EXPECT_SUCCESS(Run({kPhotos, "/tmp/other"}));
   EXPECT_THAT(RequestsOf(daemon), ElementsAre("GET_INDEX_VERSION /tmp/photos/a.jpg",
                                               "GET_INDEX_VERSION /tmp/other/b.jpg",
                                               "POST_PHOTO_CONVERT /tmp/other/b.jpg"));
   EXPECT_THAT(ErrorLines(), ElementsAre(kRefused));
-  Go();
-  EXPECT_GOOD_END(*first.Wait());
-  EXPECT_THAT(ReportedPhotos(daemon), ElementsAre("/tmp/other/b.jpg", kPhoto));
+  GoAndFinish(first);
+  EXPECT_THAT(ReportedPhotos(RequestsOf(daemon)), ElementsAre("/tmp/other/b.jpg", kPhoto));
 }
 
 TEST_F(InstanceLock, IsHeldForEachConversionOfTheDirectory) {
@@ -66,26 +48,20 @@ TEST_F(InstanceLock, IsHeldForEachConversionOfTheDirectory) {
     ResetSandbox();
     SetUp();
     MakePhoto("/tmp/photos/b.jpg");
-    PauseConverter(call);
-    Program program = Start();
-    ASSERT_TRUE(IsConverterPaused());
+    Program program = StartAndPause(call);
     EXPECT_FALSE(HeldLock(kRoot).IsHeld()) << call;
-    Go();
-    EXPECT_GOOD_END(*program.Wait());
+    GoAndFinish(program);
     EXPECT_TRUE(HeldLock(kRoot).IsHeld()) << call;
   }
 }
 
-TEST_F(InstanceLock, IsOnTheDirectoryAtWorkOnly) {
+TEST_F(InstanceLock, IsOnTheDirectoryInProgressOnly) {
   MakePhoto("/tmp/other/b.jpg");
   MakeDirectories("/tmp/other/@eaDir");
-  PauseConverter(3);
-  Program program = Start({kPhotos, "/tmp/other"});
-  ASSERT_TRUE(IsConverterPaused());
+  Program program = StartAndPause(3, {kPhotos, "/tmp/other"});
   EXPECT_TRUE(HeldLock(kRoot).IsHeld());
   EXPECT_FALSE(HeldLock("/tmp/other/@eaDir").IsHeld());
-  Go();
-  EXPECT_GOOD_END(*program.Wait());
+  GoAndFinish(program);
 }
 
 TEST_F(InstanceLock, IsReleasedBeforeTheDirectoryIsQueued) {
@@ -96,45 +72,41 @@ TEST_F(InstanceLock, IsReleasedBeforeTheDirectoryIsQueued) {
   Program program = Start();
   ASSERT_TRUE(daemon.WaitForRequests(2));
   EXPECT_TRUE(WaitUntilUnlocked(kRoot));
-  // Not by its end: it still waits for the queue file.
+  // The program has not ended: it still waits for the queue file.
   EXPECT_FALSE(program.Wait(std::chrono::milliseconds(50)).has_value());
-  EXPECT_EQ("", ReadFile(kQueue));
+  EXPECT_EQ(ReadFile(kQueue), "");
 }
 
 TEST_F(InstanceLock, IsNotInheritedByTheConverter) {
-  EXPECT_GOOD_END(Run());
-  ASSERT_EQ(2U, Converter().Calls().size());
+  EXPECT_SUCCESS(Run());
+  ASSERT_THAT(Converter().Calls(), SizeIs(2));
   for (const StubCall& call : Converter().Calls()) {
-    EXPECT_EQ(3U, call.descriptors.size());
+    EXPECT_EQ(call.descriptors.size(), 3U);
     for (const OpenDescriptor& descriptor : call.descriptors) {
-      EXPECT_NE(kRoot, descriptor.target);
+      EXPECT_NE(descriptor.target, kRoot);
     }
   }
 }
 
-TEST_F(InstanceLock, DiesWithItsInstance) {
-  PauseConverter();
-  Program program = Start();
-  ASSERT_TRUE(IsConverterPaused());
+TEST_F(InstanceLock, EndsWithItsInstance) {
+  Program program = StartAndPause();
   program.Kill(SIGKILL);
   program.Wait();
   EXPECT_TRUE(HeldLock(kRoot).IsHeld());
 }
 
-TEST_F(InstanceLock, VolumeWithoutLocksIsPassedOver) {
+TEST_F(InstanceLock, VolumeWithoutLocksIsSkipped) {
   const DaemonPeer daemon;
-  ProgramOptions options;
-  options.beforeExec = {SeccompFail(FlockCalls(), ENOLCK)};
-  EXPECT_GOOD_END(Run({kPhotos}, options));
+  EXPECT_SUCCESS(Run({kPhotos}, WithSteps({SeccompFail(FlockCalls(), ENOLCK)})));
   EXPECT_THAT(daemon.Commands(), IsEmpty());
   EXPECT_THAT(ErrorLines(), ElementsAre(kRefused));
 }
 
 TEST_F(InstanceLock, LinkToTheSameDirectoryIsTheSameLock) {
-  ASSERT_EQ(0, symlink(kPhotos, "/tmp/link"));
+  ASSERT_EQ(symlink(kPhotos, "/tmp/link"), 0);
   MakeDirectories(kRoot);
   const HeldLock lock(kRoot);
-  EXPECT_GOOD_END(Run({"/tmp/link"}));
+  EXPECT_SUCCESS(Run({"/tmp/link"}));
   EXPECT_THAT(ErrorLines(), ElementsAre("velathumb:849 Failed to lock /tmp/link/@eaDir"));
 }
 

@@ -1,21 +1,11 @@
-// The stop before a volume is full.
-#include <gmock/gmock.h>
-#include <gtest/gtest.h>
-
+// Stopping before a volume is full.
 #include <cstdint>
-#include <memory>
-#include <string>
 
 #include "program/stub_program_test.h"
-#include "support/files.h"
 #include "support/mounts.h"
-#include "support/system_log.h"
 
 namespace vela_test {
 namespace {
-
-using ::testing::ElementsAre;
-using ::testing::IsEmpty;
 
 constexpr uint64_t kThreshold = 0x40000000;
 constexpr const char* kVolume = "/tmp/volume";
@@ -33,7 +23,7 @@ class DiskGuard : public StubProgramTest {
 
   void TearDown() override { volume_.reset(); }
 
-  /// Puts a photo with its metadata directory, so that making it takes nothing of the volume.
+  /// Makes a photo with its metadata directory, so that the program needs no space to make that.
   static std::string Put(const std::string& path) {
     MakePhoto(path);
     MakeDirectories(MetadataDirOf(path));
@@ -42,7 +32,7 @@ class DiskGuard : public StubProgramTest {
 
   void SetAvailable(uint64_t bytes) const {
     volume_->SetAvailable(bytes);
-    ASSERT_EQ(bytes, volume_->Available());
+    ASSERT_EQ(volume_->Available(), bytes);
   }
 
  private:
@@ -54,15 +44,12 @@ TEST_F(DiskGuard, ExactlyTheThresholdIsEnoughForOnePhoto) {
   const std::string second = Put("/tmp/volume/d/b.jpg");
   const std::string third = Put("/tmp/volume/d/c.jpg");
   SetAvailable(kThreshold);
-  const DaemonPeer daemon;
-  EXPECT_GOOD_END(Run({"/tmp/volume/d"}));
-  // The thumbnails of the first photo take away what the second one would need.
-  EXPECT_THAT(MetadataOf(first), ElementsAre("VELAPHOTO_THUMB_B.jpg", "VELAPHOTO_THUMB_M.jpg",
-                                             "VELAPHOTO_THUMB_XL.jpg"));
+  EXPECT_THAT(ReportedPhotos(RunWithDaemon({"/tmp/volume/d"})), ElementsAre(first));
+  // The thumbnails of the first photo use the space that the second one would need.
+  EXPECT_EQ(MetadataOf(first), kThumbsOfFirstRun);
   EXPECT_THAT(MetadataOf(second), IsEmpty());
-  EXPECT_THAT(ReportedPhotos(daemon), ElementsAre(first));
-  EXPECT_EQ(3, Progress("completed_thumb"));
-  EXPECT_EQ("/tmp/volume/d\n", ReadFile(kQueue));
+  EXPECT_EQ(Progress("completed_thumb"), 3);
+  EXPECT_EQ(ReadFile(kQueue), "/tmp/volume/d\n");
   EXPECT_THAT(ErrorLines(), ElementsAre(NearlyFull(second)));
   EXPECT_TRUE(HeldLock("/tmp/volume/d/@eaDir").IsHeld());
 }
@@ -74,7 +61,7 @@ TEST_F(DiskGuard, OnePageBelowStopsAtOnce) {
   WriteFile(Marker("/tmp/volume/d/b.jpg", "M"), "");
   SetAvailable(kThreshold - SmallVolume::PageSize());
   const DaemonPeer daemon;
-  EXPECT_GOOD_END(Run({"/tmp/volume/d"}));
+  EXPECT_SUCCESS(Run({"/tmp/volume/d"}));
   EXPECT_THAT(daemon.Commands(), IsEmpty());
   EXPECT_THAT(Converter().Calls(), IsEmpty());
   EXPECT_THAT(MetadataOf(first), IsEmpty());
@@ -90,29 +77,27 @@ TEST_F(DiskGuard, StopsThisDirectoryOnly) {
   const std::string below = Put("/tmp/volume/2/below/a.jpg");
   const std::string elsewhere = MakePhoto("/tmp/photos/a.jpg");
   SetAvailable(kThreshold - SmallVolume::PageSize());
-  const DaemonPeer daemon;
-  EXPECT_GOOD_END(Run({"/tmp/volume/1", "R:/tmp/volume/2", kPhotos}));
-  EXPECT_THAT(ReportedPhotos(daemon), ElementsAre(elsewhere));
+  EXPECT_THAT(ReportedPhotos(RunWithDaemon({"/tmp/volume/1", "R:/tmp/volume/2", kPhotos})),
+              ElementsAre(elsewhere));
   EXPECT_THAT(ErrorLines(), ElementsAre(NearlyFull(first), NearlyFull(second), NearlyFull(below)));
   EXPECT_THAT(ConvertedSources(), ElementsAre(elsewhere, Thumb(elsewhere, "XL")));
 }
 
-TEST_F(DiskGuard, LetsPhotosPassThatNeedNothing) {
+TEST_F(DiskGuard, DoesNotConcernPhotosThatNeedNothing) {
   WriteFile(kSettings, kThreePhasesSizeMap);
   const std::string first = Put("/tmp/volume/d/a.jpg");
   const std::string second = Put("/tmp/volume/d/b.jpg");
   PutThumbs(first, {"XL", "M", "B", "S"});
   SetAvailable(kThreshold - SmallVolume::PageSize());
-  const DaemonPeer daemon;
-  EXPECT_GOOD_END(Run({"/tmp/volume/d"}));
-  EXPECT_THAT(RequestsOf(daemon), ElementsAre("POST_PHOTO_CONVERT /tmp/volume/d/a.jpg"));
+  EXPECT_THAT(RunWithDaemon({"/tmp/volume/d"}),
+              ElementsAre("POST_PHOTO_CONVERT /tmp/volume/d/a.jpg"));
   EXPECT_THAT(ErrorLines(), ElementsAre(NearlyFull(second)));
 }
 
 TEST_F(DiskGuard, FullVolumeStopsToo) {
   const std::string photo = Put("/tmp/volume/d/a.jpg");
   SetAvailable(0);
-  EXPECT_GOOD_END(Run({"/tmp/volume/d"}));
+  EXPECT_SUCCESS(Run({"/tmp/volume/d"}));
   EXPECT_THAT(ErrorLines(), ElementsAre(NearlyFull(photo)));
 }
 

@@ -1,22 +1,12 @@
 // The removal of a photo's old failure markers.
-#include <gmock/gmock.h>
-#include <gtest/gtest.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
-#include <string>
-#include <vector>
-
 #include "program/stub_program_test.h"
-#include "support/files.h"
 #include "support/mounts.h"
-#include "support/system_log.h"
 
 namespace vela_test {
 namespace {
-
-using ::testing::ElementsAre;
-using ::testing::IsEmpty;
 
 class FailMarkers : public StubProgramTest {
  protected:
@@ -25,18 +15,15 @@ class FailMarkers : public StubProgramTest {
     WriteFile(kSettings, kThreePhasesSizeMap);
   }
 
-  static std::string In(const std::string& name) { return std::string(kPhotos) + "/" + name; }
-
   /// A photo that needs no thumbnails.
   static std::string PutDonePhoto(const std::string& name) {
-    MakePhoto(In(name));
-    PutThumbs(In(name), {"XL", "M", "B", "S"});
-    return In(name);
+    MakePhoto(InPhotos(name));
+    PutThumbs(InPhotos(name), {"XL", "M", "B", "S"});
+    return InPhotos(name);
   }
 };
 
 TEST_F(FailMarkers, AreRemovedAlsoWhenNothingIsToBeMade) {
-  const DaemonPeer daemon;
   const std::string photo = PutDonePhoto("a.jpg");
   WriteFile(Marker(photo, "XL"), "");
   WriteFile(Marker(photo, "L"), "");
@@ -44,7 +31,7 @@ TEST_F(FailMarkers, AreRemovedAlsoWhenNothingIsToBeMade) {
   WriteFile(MetadataDirOf(photo) + "/.hidden.fail", "");
   WriteFile(MetadataDirOf(photo) + "/fail", "");
   WriteFile(MetadataDirOf(photo) + "/x.fail.txt", "");
-  EXPECT_GOOD_END(Run());
+  RunWithDaemon();
   EXPECT_THAT(MetadataOf(photo),
               ElementsAre(".hidden.fail", "VELAPHOTO_THUMB_B.jpg", "VELAPHOTO_THUMB_M.jpg",
                           "VELAPHOTO_THUMB_S.jpg", "VELAPHOTO_THUMB_XL.jpg", "fail", "x.fail.txt"));
@@ -53,79 +40,76 @@ TEST_F(FailMarkers, AreRemovedAlsoWhenNothingIsToBeMade) {
 
 TEST_F(FailMarkers, OfOtherPhotosStay) {
   PutDonePhoto("a.jpg");
-  // No photo of that name any more.
-  WriteFile(Marker(In("gone.jpg"), "XL"), "");
-  EXPECT_GOOD_END(Run());
-  EXPECT_THAT(MetadataOf(In("gone.jpg")), ElementsAre("VELAPHOTO_THUMB_XL.fail"));
+  // There is no photo of that name any more.
+  WriteFile(Marker(InPhotos("gone.jpg"), "XL"), "");
+  EXPECT_SUCCESS(Run());
+  EXPECT_THAT(MetadataOf(InPhotos("gone.jpg")), ElementsAre("VELAPHOTO_THUMB_XL.fail"));
 }
 
 /// A photo whose name is a pattern, and a name that this pattern would match.
-struct Names {
+struct Names : NamedRow {
   const char* photo;
   const char* neighbour;
 };
 
 class PatternNames : public FailMarkers, public ::testing::WithParamInterface<Names> {};
 
-TEST_P(PatternNames, AreNotTakenForPatterns) {
+TEST_P(PatternNames, AreNotPatterns) {
   const std::string photo = PutDonePhoto(GetParam().photo);
   WriteFile(Marker(photo, "M"), "");
-  WriteFile(Marker(In(GetParam().neighbour), "M"), "");
-  EXPECT_GOOD_END(Run());
+  WriteFile(Marker(InPhotos(GetParam().neighbour), "M"), "");
+  EXPECT_SUCCESS(Run());
   EXPECT_FALSE(Exists(Marker(photo, "M")));
-  EXPECT_TRUE(Exists(Marker(In(GetParam().neighbour), "M")));
+  EXPECT_TRUE(Exists(Marker(InPhotos(GetParam().neighbour), "M")));
 }
 
 INSTANTIATE_TEST_SUITE_P(Names, PatternNames,
-                         ::testing::Values(Names{"a[1].jpg", "a1.jpg"}, Names{"*.jpg", "z.jpg"},
-                                           Names{"b?.jpg", "bb.jpg"}, Names{"c\\d.jpg", "cd.jpg"},
-                                           Names{"[a-z].jpg", "q.jpg"}));
+                         ::testing::Values(Names{"Set", "a[1].jpg", "a1.jpg"},
+                                           Names{"Star", "*.jpg", "z.jpg"},
+                                           Names{"QuestionMark", "b?.jpg", "bb.jpg"},
+                                           Names{"Backslash", "c\\d.jpg", "cd.jpg"},
+                                           Names{"Range", "[a-z].jpg", "q.jpg"}),
+                         RowName<Names>);
 
-TEST_F(FailMarkers, DirectoryNamesAreNotTakenForPatternsEither) {
+TEST_F(FailMarkers, DirectoryNamesAreNotPatternsEither) {
   const std::string photo = "/tmp/[ab]*/x.jpg";
   MakePhoto(photo);
   PutThumbs(photo, {"XL", "M", "B", "S"});
   WriteFile(Marker(photo, "M"), "");
   WriteFile(Marker("/tmp/a/x.jpg", "M"), "");
-  EXPECT_GOOD_END(Run({"/tmp/[ab]*"}));
+  EXPECT_SUCCESS(Run({"/tmp/[ab]*"}));
   EXPECT_FALSE(Exists(Marker(photo, "M")));
   EXPECT_TRUE(Exists(Marker("/tmp/a/x.jpg", "M")));
 }
 
-TEST_F(FailMarkers, OneThatStaysIsLoggedAndThePhotoIsTaken) {
-  const DaemonPeer daemon;
-  const std::string photo = MakePhoto(In("a[1]%s.jpg"));
+TEST_F(FailMarkers, FailureToRemoveOneIsLoggedAndThePhotoIsProcessed) {
+  const std::string photo = MakePhoto(InPhotos("a[1]%s.jpg"));
   WriteFile(MetadataDirOf(photo) + "/1.fail", "");
   MakeDirectories(MetadataDirOf(photo) + "/2.fail");
   WriteFile(MetadataDirOf(photo) + "/3.fail", "");
-  EXPECT_GOOD_END(Run());
+  EXPECT_THAT(ReportedPhotos(RunWithDaemon()), ElementsAre(photo));
   EXPECT_THAT(MetadataOf(photo), ElementsAre("2.fail", "VELAPHOTO_THUMB_B.jpg",
                                              "VELAPHOTO_THUMB_M.jpg", "VELAPHOTO_THUMB_XL.jpg"));
-  EXPECT_THAT(ReportedPhotos(daemon), ElementsAre(photo));
   EXPECT_THAT(ErrorLines(), ElementsAre("velathumb:880 Failed to remove files by pattern "
                                         "[/tmp/photos/@eaDir/a[1]%s.jpg/*.fail]"));
 }
 
 TEST_F(FailMarkers, ReadOnlyMetadataIsLogged) {
-  const DaemonPeer daemon;
   const std::string photo = PutDonePhoto("a.jpg");
   WriteFile(Marker(photo, "XL"), "");
   const ReadOnlyMount mount(MetadataDirOf(photo));
-  EXPECT_GOOD_END(Run());
-  EXPECT_THAT(ReportedPhotos(daemon), ElementsAre(photo));
+  EXPECT_THAT(ReportedPhotos(RunWithDaemon()), ElementsAre(photo));
   EXPECT_THAT(ErrorLines(), ElementsAre("velathumb:880 Failed to remove files by pattern "
                                         "[/tmp/photos/@eaDir/a.jpg/*.fail]"));
 }
 
 TEST_F(FailMarkers, FailedPhotosAreTriedAgain) {
-  const std::string photo = MakePhoto(In("a.jpg"));
+  const std::string photo = MakePhoto(InPhotos("a.jpg"));
   Converter().PlanCall(1, StubPlan().Exit(1));
-  EXPECT_GOOD_END(Run());
-  EXPECT_THAT(MetadataOf(photo), ElementsAre("VELAPHOTO_THUMB_B.fail", "VELAPHOTO_THUMB_M.fail",
-                                             "VELAPHOTO_THUMB_S.fail", "VELAPHOTO_THUMB_XL.fail"));
-  EXPECT_GOOD_END(Run());
-  EXPECT_THAT(MetadataOf(photo), ElementsAre("VELAPHOTO_THUMB_B.jpg", "VELAPHOTO_THUMB_M.jpg",
-                                             "VELAPHOTO_THUMB_XL.jpg"));
+  EXPECT_SUCCESS(Run());
+  EXPECT_EQ(MetadataOf(photo), kAllMarkers);
+  EXPECT_SUCCESS(Run());
+  EXPECT_EQ(MetadataOf(photo), kThumbsOfFirstRun);
 }
 
 }  // namespace

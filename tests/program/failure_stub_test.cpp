@@ -1,243 +1,169 @@
 // What a failed conversion leaves: markers, counts and reports.
-#include <gmock/gmock.h>
-#include <gtest/gtest.h>
 #include <signal.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
-#include <mutex>
-#include <string>
-#include <vector>
-
-#include "program/callback_daemon.h"
 #include "program/stub_program_test.h"
-#include "support/files.h"
-#include "support/images.h"
 #include "support/mounts.h"
-#include "support/system_log.h"
 
 namespace vela_test {
 namespace {
 
-using ::testing::ElementsAre;
-using ::testing::IsEmpty;
+using Failure = OnePhotoTest;
 
-constexpr const char* kPhoto = "/tmp/photos/a.jpg";
-constexpr const char* kReport = "POST_PHOTO_CONVERT /tmp/photos/a.jpg";
-constexpr const char* kQuestion = "GET_INDEX_VERSION /tmp/photos/a.jpg";
+const Strings kPhase1And2Failed = {"VELAPHOTO_THUMB_B.fail", "VELAPHOTO_THUMB_M.jpg",
+                                   "VELAPHOTO_THUMB_S.fail", "VELAPHOTO_THUMB_XL.jpg"};
+const Strings kPhase2Failed = {"VELAPHOTO_THUMB_B.jpg", "VELAPHOTO_THUMB_M.jpg",
+                               "VELAPHOTO_THUMB_S.fail", "VELAPHOTO_THUMB_XL.jpg"};
 
-class Failure : public StubProgramTest {
- protected:
-  void SetUp() override {
-    StubProgramTest::SetUp();
-    MakePhoto(kPhoto);
-  }
-
-  /// Runs it; returns the requests.
-  static std::vector<std::string> RunAndGetRequests() {
-    const DaemonPeer daemon;
-    EXPECT_GOOD_END(Run());
-    return RequestsOf(daemon);
-  }
-
-  static void ExpectProgress(int completed, int completedThumb) {
-    EXPECT_EQ(completed, Progress("completed"));
-    EXPECT_EQ(completedThumb, Progress("completed_thumb"));
-  }
-
-  /// Everything of the photo failed, and was counted and reported once.
-  static void ExpectAllFailed() {
-    EXPECT_THAT(MetadataOf(kPhoto),
-                ElementsAre("VELAPHOTO_THUMB_B.fail", "VELAPHOTO_THUMB_M.fail",
-                            "VELAPHOTO_THUMB_S.fail", "VELAPHOTO_THUMB_XL.fail"));
-    ExpectProgress(1, 4);
-    EXPECT_THAT(ProgressKeys(), ElementsAre("completed", "completed_thumb"));
-    EXPECT_FALSE(Exists(kQueue));
-  }
+/// A run in which a converter call fails.
+struct FailedRun : NamedRow {
+  Strings thumbs;    ///< size classes that are there before
+  int call;          ///< the call that fails
+  StubPlan plan;     ///< what it does
+  Strings metadata;  ///< what is there afterwards
+  int completedThumb;
+  ::testing::Matcher<Strings> errors = IsEmpty();
 };
 
-TEST_F(Failure, Phase0TakesTheLaterPhasesWithIt) {
-  Converter().Plan(StubPlan().Exit(1));
-  EXPECT_THAT(RunAndGetRequests(), ElementsAre(kQuestion, kReport));
-  EXPECT_EQ(1U, Converter().Calls().size());
-  ExpectAllFailed();
-  EXPECT_THAT(ErrorLines(), IsEmpty());
-}
+class FailedConversion : public Failure, public ::testing::WithParamInterface<FailedRun> {};
 
-TEST_F(Failure, Phase0TakesAwayTheThumbnailsOfAllPhases) {
-  PutThumbs(kPhoto, {"XL", "B", "S"});
-  Converter().Plan(StubPlan().Exit(1));
-  EXPECT_THAT(RunAndGetRequests(), ElementsAre(kQuestion, kReport));
-  ExpectAllFailed();
-}
-
-TEST_F(Failure, Phase0IsCountedBeforeItIsReported) {
-  Converter().Plan(StubPlan().Exit(1));
-  std::string seen;
-  CallbackDaemon daemon([&](const std::string& command, const std::string&) {
-    if (command == "POST_PHOTO_CONVERT") {
-      seen = ReadFile(kPhotoProgress);
-    }
-    return kDone;
-  });
-  EXPECT_GOOD_END(Run());
-  daemon.Stop();
-  EXPECT_EQ("completed=\"1\"\ncompleted_thumb=\"4\"\n", seen);
-}
-
-TEST_F(Failure, Phase0AfterItsOwnSuccessIsNotUndoneByPhase1) {
-  Converter().PlanCall(2, StubPlan().Exit(1));
-  EXPECT_THAT(RunAndGetRequests(), ElementsAre(kQuestion, kReport));
-  EXPECT_EQ(2U, Converter().Calls().size());
-  EXPECT_THAT(MetadataOf(kPhoto), ElementsAre("VELAPHOTO_THUMB_B.fail", "VELAPHOTO_THUMB_M.jpg",
-                                              "VELAPHOTO_THUMB_S.fail", "VELAPHOTO_THUMB_XL.jpg"));
-  ExpectProgress(1, 4);
+TEST_P(FailedConversion, IsMarkedCountedAndReportedOnce) {
+  const FailedRun& run = GetParam();
+  PutThumbs(kPhoto, run.thumbs);
+  Converter().PlanCall(run.call, run.plan);
+  EXPECT_THAT(RunWithDaemon(), ElementsAre(kVersionRequest, kReport));
+  EXPECT_THAT(Converter().Calls(), SizeIs(run.call));
+  EXPECT_EQ(MetadataOf(kPhoto), run.metadata);
+  ExpectProgress(1, run.completedThumb);
+  // The thumbnails of an earlier call have been counted already.
+  EXPECT_EQ(ProgressKeys(), run.call == 1 ? Strings({"completed", "completed_thumb"})
+                                          : Strings({"completed_thumb", "completed"}));
   EXPECT_FALSE(Exists(kQueue));
-  EXPECT_THAT(ErrorLines(), IsEmpty());
+  EXPECT_THAT(ErrorLines(), run.errors);
 }
 
-TEST_F(Failure, Phase1AloneCountsTheLaterPhases) {
-  PutThumbs(kPhoto, {"XL", "M", "S"});
-  Converter().Plan(StubPlan().Exit(1));
-  EXPECT_THAT(RunAndGetRequests(), ElementsAre(kQuestion, kReport));
-  EXPECT_THAT(MetadataOf(kPhoto), ElementsAre("VELAPHOTO_THUMB_B.fail", "VELAPHOTO_THUMB_M.jpg",
-                                              "VELAPHOTO_THUMB_S.fail", "VELAPHOTO_THUMB_XL.jpg"));
-  ExpectProgress(1, 2);
-  EXPECT_THAT(ProgressKeys(), ElementsAre("completed", "completed_thumb"));
-  EXPECT_FALSE(Exists(kQueue));
-}
+const StubPlan kFails = StubPlan().Exit(1);
+const StubPlan kOmitsM = StubPlan().WriteOutputs(1);
+const StubPlan kMakesTinyM = StubPlan().WriteOutputs(1).WriteOutputsOfSize(1, 1);
+const StubPlan kPhotoGrows = StubPlan().WriteOutputs().AppendToSource(1 << 20);
+const std::string kTinyM =
+    "velamk_photo_thumb:441 [Error] file size of dest path: 1, " + Thumb(kPhoto, "M");
 
-TEST_F(Failure, Phase2StandsForItself) {
-  PutThumbs(kPhoto, {"XL", "M", "B"});
-  Converter().Plan(StubPlan().Exit(1));
-  EXPECT_THAT(RunAndGetRequests(), ElementsAre(kQuestion, kReport));
-  EXPECT_THAT(MetadataOf(kPhoto), ElementsAre("VELAPHOTO_THUMB_B.jpg", "VELAPHOTO_THUMB_M.jpg",
-                                              "VELAPHOTO_THUMB_S.fail", "VELAPHOTO_THUMB_XL.jpg"));
-  ExpectProgress(1, 1);
-  EXPECT_FALSE(Exists(kQueue));
-  EXPECT_THAT(ErrorLines(), IsEmpty());
-}
+INSTANTIATE_TEST_SUITE_P(
+    Conversions, FailedConversion,
+    ::testing::Values(
+        FailedRun{"Phase0TakesLaterPhasesWithIt", {}, 1, kFails, kAllMarkers, 4},
+        FailedRun{"Phase0RemovesAllThumbnails", {"XL", "B", "S"}, 1, kFails, kAllMarkers, 4},
+        FailedRun{"Phase1DoesNotUndoPhase0", {}, 2, kFails, kPhase1And2Failed, 4},
+        FailedRun{"Phase1AloneCountsPhase2", {"XL", "M", "S"}, 1, kFails, kPhase1And2Failed, 2},
+        FailedRun{"Phase2Alone", {"XL", "M", "B"}, 1, kFails, kPhase2Failed, 1},
+        FailedRun{"PhotoGrows", {}, 1, kPhotoGrows, kAllMarkers, 4, SizeIs(1)},
+        FailedRun{"ThumbnailMissing", {}, 1, kOmitsM, kAllMarkers, 4, SizeIs(1)},
+        FailedRun{"ThumbnailTooSmall", {}, 1, kMakesTinyM, kAllMarkers, 4, ElementsAre(kTinyM)}),
+    RowName<FailedRun>);
 
-TEST_F(Failure, IsCountedByTheProfilesOfEachPhase) {
-  WriteProfileFile(kProfiles, {{"thumb_xl", 1280, 90, std::nullopt, "VELAPHOTO_THUMB_XL.jpg", 0},
-                               {"thumb_l", 800, 90, std::nullopt, "VELAPHOTO_THUMB_L.jpg", 1},
-                               {"thumb_b", 640, 90, std::nullopt, "VELAPHOTO_THUMB_B.jpg", 1},
-                               {"thumb_m", 320, 90, std::nullopt, "VELAPHOTO_THUMB_M.jpg", 2},
-                               {"thumb_sm", 240, 90, std::nullopt, "VELAPHOTO_THUMB_SM.jpg", 2},
-                               {"thumb_s", 120, 90, std::nullopt, "VELAPHOTO_THUMB_S.jpg", 2}});
-  Converter().PlanCall(2, StubPlan().Exit(1));
-  RunAndGetRequests();
-  ExpectProgress(1, 6);
-  Converter().PlanCall(3, StubPlan().Exit(1));
-  RunAndGetRequests();  // phase 1 again
-  ExpectProgress(2, 11);
-  Converter().PlanCall(5, StubPlan().Exit(1));
-  RunAndGetRequests();  // phase 1 succeeds
-  ExpectProgress(2, 13);
-  RunAndGetRequests();  // phase 2
-  ExpectProgress(3, 16);
-}
-
-TEST_F(Failure, DoesNotStopTheOtherPhotos) {
-  MakePhoto("/tmp/photos/b.jpg");
-  MakePhoto("/tmp/photos/c.jpg");
-  Converter().PlanWhen("/tmp/photos/b.jpg", StubPlan().Exit(1));
-  const DaemonPeer daemon;
-  EXPECT_GOOD_END(Run());
-  EXPECT_THAT(ReportedPhotos(daemon),
-              ElementsAre(kPhoto, "/tmp/photos/b.jpg", "/tmp/photos/c.jpg"));
-  EXPECT_TRUE(Exists(Thumb(kPhoto, "B")));
-  EXPECT_TRUE(Exists(Marker("/tmp/photos/b.jpg", "B")));
-  EXPECT_TRUE(Exists(Thumb("/tmp/photos/c.jpg", "B")));
-  ExpectProgress(1, 10);
-  EXPECT_EQ("/tmp/photos\n", ReadFile(kQueue));
-}
-
-TEST_F(Failure, ConverterThatCannotBeStarted) {
-  RemoveTool(kConverterPath);
-  EXPECT_THAT(RunAndGetRequests(), ElementsAre(kQuestion, kReport));
-  ExpectAllFailed();
-}
-
-TEST_F(Failure, ConverterThatIsKilled) {
+TEST_F(Failure, OfAKilledConverterIsMarked) {
   Converter().Plan(StubPlan().WriteOutputs(1).DieBySignal(SIGKILL));
-  EXPECT_THAT(RunAndGetRequests(), ElementsAre(kQuestion, kReport));
+  EXPECT_THAT(RunWithDaemon(), ElementsAre(kVersionRequest, kReport));
   ExpectProgress(1, 4);
   EXPECT_TRUE(Exists(Marker(kPhoto, "XL")));
   EXPECT_FALSE(Exists(Thumb(kPhoto, "XL")));
 }
 
-TEST_F(Failure, ConverterThatIsEndedByHandDoesNotEndTheRun) {
+TEST_F(Failure, IsCountedBeforeItIsReported) {
+  Converter().Plan(kFails);
+  std::string seen;
+  RunAndLook([&](const std::string& request) {
+    if (request == kReport) {
+      seen = ReadFile(kPhotoProgress);
+    }
+  });
+  EXPECT_EQ(seen, "completed=\"1\"\ncompleted_thumb=\"4\"\n");
+}
+
+TEST_F(Failure, IsTheSameForAConverterThatCannotBeStarted) {
+  RemoveTool(kConverterPath);
+  EXPECT_THAT(RunWithDaemon(), ElementsAre(kVersionRequest, kReport));
+  EXPECT_EQ(MetadataOf(kPhoto), kAllMarkers);
+  ExpectProgress(1, 4);
+  EXPECT_THAT(ProgressKeys(), ElementsAre("completed", "completed_thumb"));
+  EXPECT_FALSE(Exists(kQueue));
+}
+
+TEST_F(Failure, IsCountedByTheProfilesOfEachPhase) {
+  WriteProfileFile(kProfiles, {Profile("XL", 1280, 0), Profile("L", 800, 1), Profile("B", 640, 1),
+                               Profile("M", 320, 2), Profile("SM", 240, 2), Profile("S", 120, 2)});
+  Converter().PlanCall(2, kFails);
+  RunWithDaemon();
+  ExpectProgress(1, 6);
+  Converter().PlanCall(3, kFails);
+  RunWithDaemon();  // phase 1 again
+  ExpectProgress(2, 11);
+  Converter().PlanCall(5, kFails);
+  RunWithDaemon();  // phase 1 succeeds
+  ExpectProgress(2, 13);
+  RunWithDaemon();  // phase 2
+  ExpectProgress(3, 16);
+}
+
+TEST_F(Failure, DoesNotStopTheOtherPhotos) {
+  MakePhotos({"b.jpg", "c.jpg"});
+  Converter().PlanWhen("/tmp/photos/b.jpg", kFails);
+  EXPECT_THAT(ReportedPhotos(RunWithDaemon()),
+              ElementsAre(kPhoto, "/tmp/photos/b.jpg", "/tmp/photos/c.jpg"));
+  EXPECT_TRUE(Exists(Thumb(kPhoto, "B")));
+  EXPECT_TRUE(Exists(Marker("/tmp/photos/b.jpg", "B")));
+  EXPECT_TRUE(Exists(Thumb("/tmp/photos/c.jpg", "B")));
+  ExpectProgress(1, 10);
+  EXPECT_EQ(ReadFile(kQueue), "/tmp/photos\n");
+}
+
+TEST_F(Failure, ConverterEndedBySigtermDoesNotEndTheRun) {
   Converter().PlanCall(1, StubPlan().DieBySignal(SIGTERM));
   MakePhoto("/tmp/photos/b.jpg");
-  EXPECT_THAT(RunAndGetRequests(), ElementsAre(kQuestion, kReport,                     //
-                                               "GET_INDEX_VERSION /tmp/photos/b.jpg",  //
-                                               "POST_PHOTO_CONVERT /tmp/photos/b.jpg"));
+  EXPECT_THAT(RunWithDaemon(), ElementsAre(kVersionRequest, kReport,               //
+                                           "GET_INDEX_VERSION /tmp/photos/b.jpg",  //
+                                           "POST_PHOTO_CONVERT /tmp/photos/b.jpg"));
   EXPECT_TRUE(Exists(Thumb("/tmp/photos/b.jpg", "B")));
-}
-
-TEST_F(Failure, ConverterThatLeavesOutOneThumbnail) {
-  Converter().Plan(StubPlan().WriteOutputs(1));
-  EXPECT_THAT(RunAndGetRequests(), ElementsAre(kQuestion, kReport));
-  ExpectAllFailed();
-  EXPECT_EQ(1U, ErrorLines().size());
-}
-
-TEST_F(Failure, ConverterThatMakesAUselessThumbnail) {
-  Converter().Plan(StubPlan().WriteOutputs(1).WriteOutputsOfSize(1, 1));
-  EXPECT_THAT(RunAndGetRequests(), ElementsAre(kQuestion, kReport));
-  ExpectAllFailed();
-  EXPECT_THAT(ErrorLines(),
-              ElementsAre("velamk_photo_thumb:441 [Error] file size of dest path: 1, " +
-                          Thumb(kPhoto, "M")));
-}
-
-TEST_F(Failure, PhotoThatGrowsWhileItIsConverted) {
-  Converter().PlanCall(1, StubPlan().WriteOutputs().AppendToSource(1 << 20));
-  EXPECT_THAT(RunAndGetRequests(), ElementsAre(kQuestion, kReport));
-  ExpectAllFailed();
 }
 
 TEST_F(Failure, MetadataThatCannotBeWritten) {
   MakeDirectories(MetadataDirOf(kPhoto));
   const ReadOnlyMount mount(MetadataDirOf(kPhoto));
-  EXPECT_THAT(RunAndGetRequests(), ElementsAre(kQuestion, kReport));
+  EXPECT_THAT(RunWithDaemon(), ElementsAre(kVersionRequest, kReport));
   EXPECT_THAT(MetadataOf(kPhoto), IsEmpty());
   ExpectProgress(1, 4);
 }
 
 TEST_F(Failure, FileInPlaceOfThePhotosMetadataDirectory) {
   WriteFile(MetadataDirOf(kPhoto), "mine");
-  EXPECT_THAT(RunAndGetRequests(), ElementsAre(kQuestion, kReport));
-  EXPECT_EQ("mine", ReadFile(MetadataDirOf(kPhoto)));
+  EXPECT_THAT(RunWithDaemon(), ElementsAre(kVersionRequest, kReport));
+  EXPECT_EQ(ReadFile(MetadataDirOf(kPhoto)), "mine");
   ExpectProgress(1, 4);
 }
 
 /// Something happens to the photo's files while the daemon is asked for the index version.
 class WhileTheDaemonIsAsked : public Failure {
  protected:
-  /// Runs it, with `happening` at the question; returns the requests.
-  template <typename Happening>
-  static std::vector<std::string> RunWith(const Happening& happening) {
-    std::mutex mutex;
-    std::vector<std::string> requests;
-    CallbackDaemon daemon([&](const std::string& command, const std::string& path) {
-      const std::lock_guard<std::mutex> lock(mutex);
-      requests.push_back(command + " " + path);
-      if (command == "GET_INDEX_VERSION") {
+  /// Runs the program with `happening` at the version request. Returns the requests.
+  static Strings RunWith(const std::function<void()>& happening) {
+    return RunAndLook([&](const std::string& request) {
+      if (request == kVersionRequest) {
         happening();
       }
-      return kDone;
     });
-    EXPECT_GOOD_END(Run());
-    daemon.Stop();
-    return requests;
+  }
+
+  /// Same, with one of the thumbnails that are there removed.
+  static Strings RunAndRemove(const std::string& sizeClass) {
+    return RunWith([&] { ASSERT_EQ(unlink(Thumb(kPhoto, sizeClass).c_str()), 0); });
   }
 };
 
 TEST_F(WhileTheDaemonIsAsked, PhotoVanishes) {
-  // There is nothing to convert; what would be made of its thumbnails is given up.
-  EXPECT_THAT(RunWith([] { ASSERT_EQ(0, unlink(kPhoto)); }), ElementsAre(kQuestion, kReport));
+  // There is nothing to convert; the thumbnails of the later phases are marked as failed.
+  EXPECT_THAT(RunWith([] { ASSERT_EQ(unlink(kPhoto), 0); }), ElementsAre(kVersionRequest, kReport));
   EXPECT_THAT(Converter().Calls(), IsEmpty());
   EXPECT_THAT(MetadataOf(kPhoto), ElementsAre("VELAPHOTO_THUMB_B.fail", "VELAPHOTO_THUMB_S.fail"));
   ExpectProgress(1, 4);
@@ -245,74 +171,58 @@ TEST_F(WhileTheDaemonIsAsked, PhotoVanishes) {
 }
 
 TEST_F(WhileTheDaemonIsAsked, PhotoBecomesADirectory) {
-  EXPECT_THAT(RunWith([] {
-                ASSERT_EQ(0, unlink(kPhoto));
-                ASSERT_EQ(0, mkdir(kPhoto, 0777));
-              }),
-              ElementsAre(kQuestion, kReport));
+  const auto replace = [] {
+    ASSERT_EQ(unlink(kPhoto), 0);
+    ASSERT_EQ(mkdir(kPhoto, 0777), 0);
+  };
+  EXPECT_THAT(RunWith(replace), ElementsAre(kVersionRequest, kReport));
   EXPECT_THAT(Converter().Calls(), IsEmpty());
-  ExpectAllFailed();
+  EXPECT_EQ(MetadataOf(kPhoto), kAllMarkers);
+  ExpectProgress(1, 4);
+  EXPECT_THAT(ProgressKeys(), ElementsAre("completed", "completed_thumb"));
+  EXPECT_FALSE(Exists(kQueue));
   EXPECT_THAT(ErrorLines(),
               ElementsAre("velamk_photo_thumb:121 [Error] not a regular file: /tmp/photos/a.jpg"));
 }
 
-TEST_F(WhileTheDaemonIsAsked, ReferenceVanishesBeforePhase1) {
-  PutThumbs(kPhoto, {"XL", "M"});
-  EXPECT_THAT(RunWith([] { ASSERT_EQ(0, unlink(Thumb(kPhoto, "XL").c_str())); }),
-              ElementsAre(kQuestion));
-  EXPECT_THAT(Converter().Calls(), IsEmpty());
-  EXPECT_THAT(MetadataOf(kPhoto), ElementsAre("VELAPHOTO_THUMB_M.jpg"));
+/// The photo is skipped: no conversion, no counting and no report.
+void ExpectSkipped(const Strings& requests) {
+  EXPECT_THAT(requests, ElementsAre(kVersionRequest));
+  EXPECT_THAT(ConvertedSources(), IsEmpty());
   EXPECT_FALSE(Exists(kPhotoProgress));
   EXPECT_FALSE(Exists(kQueue));
   EXPECT_THAT(ErrorLines(), IsEmpty());
+}
+
+TEST_F(WhileTheDaemonIsAsked, ReferenceVanishesBeforePhase1) {
+  PutThumbs(kPhoto, {"XL", "M"});
+  ExpectSkipped(RunAndRemove("XL"));
+  EXPECT_THAT(MetadataOf(kPhoto), ElementsAre("VELAPHOTO_THUMB_M.jpg"));
 }
 
 TEST_F(WhileTheDaemonIsAsked, ReferenceVanishesBeforePhase2) {
   PutThumbs(kPhoto, {"XL", "M", "B"});
-  EXPECT_THAT(RunWith([] { ASSERT_EQ(0, unlink(Thumb(kPhoto, "XL").c_str())); }),
-              ElementsAre(kQuestion));
-  EXPECT_THAT(Converter().Calls(), IsEmpty());
-  EXPECT_FALSE(Exists(kPhotoProgress));
-  EXPECT_THAT(ErrorLines(), IsEmpty());
+  ExpectSkipped(RunAndRemove("XL"));
 }
 
 TEST_F(WhileTheDaemonIsAsked, OtherThumbnailsVanishingDoNotMatter) {
   PutThumbs(kPhoto, {"XL", "M"});
-  EXPECT_THAT(RunWith([] { ASSERT_EQ(0, unlink(Thumb(kPhoto, "M").c_str())); }),
-              ElementsAre(kQuestion, kReport));
+  EXPECT_THAT(RunAndRemove("M"), ElementsAre(kVersionRequest, kReport));
   EXPECT_THAT(ConvertedSources(), ElementsAre(Thumb(kPhoto, "XL")));
 }
 
-class NoReference : public Failure {
- protected:
-  void SetUp() override {
-    Failure::SetUp();
-    WriteProfileFile(kProfiles, {{"thumb_b", 640, 90, std::nullopt, "VELAPHOTO_THUMB_B.jpg", 1},
-                                 {"thumb_s", 120, 90, std::nullopt, "VELAPHOTO_THUMB_S.jpg", 2}});
-  }
-};
-
-TEST_F(NoReference, PhotoIsPassedOverInPhase1) {
-  EXPECT_THAT(RunAndGetRequests(), ElementsAre(kQuestion));
-  EXPECT_THAT(Converter().Calls(), IsEmpty());
+TEST_F(Failure, PhotoWithoutReferenceIsSkipped) {
+  WriteProfileFile(kProfiles, {Profile("B", 640, 1), Profile("S", 120, 2)});
+  ExpectSkipped(RunWithDaemon());
   EXPECT_THAT(MetadataOf(kPhoto), IsEmpty());
-  EXPECT_FALSE(Exists(kPhotoProgress));
-  EXPECT_FALSE(Exists(kQueue));
-  EXPECT_THAT(ErrorLines(), IsEmpty());
-}
-
-TEST_F(NoReference, PhotoIsPassedOverInPhase2) {
   PutThumbs(kPhoto, {"B"});
-  EXPECT_THAT(RunAndGetRequests(), ElementsAre(kQuestion));
-  EXPECT_THAT(Converter().Calls(), IsEmpty());
-  EXPECT_FALSE(Exists(kPhotoProgress));
-  EXPECT_THAT(ErrorLines(), IsEmpty());
+  ExpectSkipped(RunWithDaemon());
 }
 
-TEST_F(NoReference, OtherThumbnailsDoNotTakeItsPlace) {
+TEST_F(Failure, OtherThumbnailsDoNotTakeThePlaceOfTheReference) {
+  WriteProfileFile(kProfiles, {Profile("B", 640, 1), Profile("S", 120, 2)});
   PutThumbs(kPhoto, {"XL", "M"});
-  EXPECT_THAT(RunAndGetRequests(), ElementsAre(kQuestion));
-  EXPECT_THAT(Converter().Calls(), IsEmpty());
+  ExpectSkipped(RunWithDaemon());
 }
 
 }  // namespace

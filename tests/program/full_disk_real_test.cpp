@@ -4,18 +4,13 @@
 #include <thread>
 
 #include "program/real_program_test.h"
-#include "support/build_paths.h"
-#include "support/daemon_peer.h"
-#include "support/images.h"
 #include "support/mounts.h"
-#include "support/stub_tool.h"
-#include "support/system_log.h"
 
 namespace vela_test::real {
 
 namespace {
 
-/// Above what the program wants to be free before it converts a photo.
+/// More than the free space that the program requires to convert a photo.
 constexpr uint64_t kRoomy = 1200ULL << 20U;
 
 class FullDisk : public RealProgramTest {
@@ -36,7 +31,7 @@ class FullDisk : public RealProgramTest {
     volume_->SetAvailable(kRoomy);
   }
 
-  /// No thumbnail of this phase at all: markers, or nothing where even they found no room.
+  /// No thumbnail of these kinds: markers, or nothing when there was no room for markers either.
   static bool HasNoThumbs(const std::string& photo, const std::vector<Kind>& kinds) {
     return std::none_of(kinds.begin(), kinds.end(),
                         [&](const Kind& kind) { return Exists(ThumbOf(photo, kind)); });
@@ -56,12 +51,12 @@ TEST_F(FullDisk, FullBeforeTheFirstOutput) {
   Make();
   EXPECT_EQ(converter.Calls().size(), 1U);
   EXPECT_TRUE(ThumbsBelow(kPhotos).empty());
-  // The next photo finds the volume too full to begin with.
-  EXPECT_EQ(ErrorLines(), std::vector<std::string>{
-                              "velathumb:893 Stopping creating thumbs as the disk space is near "
-                              "full, " +
-                              InPhotos("b.jpg")});
-  // Nothing is left for good: with room again, everything is made.
+  // The volume is too full to start the next photo.
+  EXPECT_EQ(ErrorLines(),
+            Strings{"velathumb:893 Stopping creating thumbs as the disk space is near "
+                    "full, " +
+                    InPhotos("b.jpg")});
+  // The failure is not permanent: with room again, everything is made.
   MakeRoom();
   InstallRealConverter();
   Make();
@@ -81,7 +76,7 @@ TEST_F(FullDisk, FullBetweenTwoOutputs) {
   EXPECT_TRUE(OnlyWholeThumbsBelow(kPhotos));
 }
 
-// Room for one page more each time, so that the end of the room lies everywhere in the outputs.
+// Room for one page more each time, so that the volume is full at every point of the outputs.
 TEST_F(FullDisk, FullAnywhereInTheOutputs) {
   WriteKinds(kProfiles, FullKinds());
   const std::string photo = MakeDetailedPhoto("a.jpg");

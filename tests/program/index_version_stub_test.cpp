@@ -1,22 +1,10 @@
-// What the index version that the daemon tells is used for.
-#include <gmock/gmock.h>
-#include <gtest/gtest.h>
-
+// How the index version is used.
 #include <algorithm>
-#include <string>
-#include <vector>
 
 #include "program/stub_program_test.h"
-#include "support/files.h"
-#include "support/system_log.h"
 
 namespace vela_test {
 namespace {
-
-using ::testing::ElementsAre;
-using ::testing::IsEmpty;
-
-constexpr const char* kPhoto = "/tmp/photos/a.jpg";
 
 bool Contains(const StubCall& call, const std::string& argument) {
   return std::find(call.arguments.begin(), call.arguments.end(), argument) != call.arguments.end();
@@ -31,49 +19,46 @@ std::vector<long> CountIn(const std::vector<StubCall>& calls, const std::string&
   return counts;
 }
 
-class IndexVersion : public StubProgramTest {
+class IndexVersion : public OnePhotoTest {
  protected:
-  void SetUp() override {
-    StubProgramTest::SetUp();
-    MakePhoto(kPhoto);
-  }
-
   static void RunTwice(const DaemonReply& version) {
     DaemonPeer daemon;
     daemon.Answer("GET_INDEX_VERSION", version);
-    EXPECT_GOOD_END(Run());
-    EXPECT_GOOD_END(Run());
+    EXPECT_SUCCESS(Run());
+    EXPECT_SUCCESS(Run());
   }
 };
 
-/// A reply, and whether it makes the converter turn the photos upright.
-struct Reply {
+/// A reply, and whether it makes the converter rotate the photos.
+struct Reply : NamedRow {
   const char* text;
-  bool turns;
+  bool rotates;
 };
 
 class EachReply : public IndexVersion, public ::testing::WithParamInterface<Reply> {};
 
-TEST_P(EachReply, DecidesWhoTurnsThePhoto) {
+TEST_P(EachReply, DecidesWhetherTheConverterRotates) {
   RunTwice(DaemonReply::Line(GetParam().text));
   // Two thumbnails in phase 0, one in phases 1 and 2 each.
-  const auto expected = GetParam().turns ? ElementsAre(2, 1, 1) : ElementsAre(0, 0, 0);
+  const auto expected = GetParam().rotates ? ElementsAre(2, 1, 1) : ElementsAre(0, 0, 0);
   EXPECT_THAT(CountIn(Converter().Calls(), "-auto-orient"), expected);
   EXPECT_THAT(CountIn(Converter().Calls(), "-rotate"), ElementsAre(0, 0, 0));
 }
 
-INSTANTIATE_TEST_SUITE_P(Replies, EachReply,
-                         ::testing::Values(Reply{"{\"success\":true,\"version\":-1}", true},
-                                           Reply{"{\"success\":true,\"version\":0}", true},
-                                           Reply{"{\"success\":true,\"version\":1}", false},
-                                           Reply{"{\"success\":true,\"version\":2}", false},
-                                           Reply{"{\"success\":true}", true},
-                                           Reply{"{\"success\":false,\"version\":2}", true},
-                                           Reply{"{\"version\":2}", true}, Reply{"{}", true},
-                                           Reply{"nonsense", true}));
+INSTANTIATE_TEST_SUITE_P(
+    Replies, EachReply,
+    ::testing::Values(Reply{"VersionBelow0", "{\"success\":true,\"version\":-1}", true},
+                      Reply{"Version0", "{\"success\":true,\"version\":0}", true},
+                      Reply{"Version1", "{\"success\":true,\"version\":1}", false},
+                      Reply{"Version2", "{\"success\":true,\"version\":2}", false},
+                      Reply{"NoVersion", "{\"success\":true}", true},
+                      Reply{"Failure", "{\"success\":false,\"version\":2}", true},
+                      Reply{"NoSuccess", "{\"version\":2}", true}, Reply{"Empty", "{}", true},
+                      Reply{"NoJson", "nonsense", true}),
+    RowName<Reply>);
 
 TEST_F(IndexVersion, IsNotKnownWithoutDaemon) {
-  EXPECT_GOOD_END(Run());
+  EXPECT_SUCCESS(Run());
   EXPECT_THAT(CountIn(Converter().Calls(), "-auto-orient"), ElementsAre(2, 1));
 }
 
@@ -87,9 +72,9 @@ TEST_F(IndexVersion, IsAskedForEachPhotoAnew) {
   MakePhoto("/tmp/photos/b.jpg");
   DaemonPeer daemon;
   daemon.AnswerNext(DaemonReply::Line("{\"success\":true,\"version\":1}"));
-  EXPECT_GOOD_END(Run());
+  EXPECT_SUCCESS(Run());
   const auto calls = Converter().Calls();
-  ASSERT_EQ(4U, calls.size());
+  ASSERT_EQ(calls.size(), 4U);
   EXPECT_FALSE(Contains(calls[0], "-auto-orient"));
   EXPECT_FALSE(Contains(calls[1], "-auto-orient"));
   EXPECT_TRUE(Contains(calls[2], "-auto-orient"));
@@ -98,25 +83,24 @@ TEST_F(IndexVersion, IsAskedForEachPhotoAnew) {
 
 TEST_F(IndexVersion, IsAskedOnceAPhotoAndRun) {
   const DaemonPeer daemon;
-  EXPECT_GOOD_END(Run());
+  EXPECT_SUCCESS(Run());
   EXPECT_THAT(daemon.Commands(), ElementsAre("GET_INDEX_VERSION", "POST_PHOTO_CONVERT"));
 }
 
-TEST_F(IndexVersion, NoRotationIsLookedForInLaterPhases) {
-  // A reference of another shape than the photo would show itself in trial pictures.
+TEST_F(IndexVersion, RotationIsNotDetectedInLaterPhases) {
+  // A reference of another shape than the photo would cause trial images.
   DaemonPeer daemon;
   daemon.SetIndexVersion(2);
   PutThumbs(kPhoto, {"XL", "M"});
-  EXPECT_GOOD_END(Run());
-  EXPECT_GOOD_END(Run());
+  EXPECT_SUCCESS(Run());
+  EXPECT_SUCCESS(Run());
   EXPECT_THAT(ConvertedSources(), ElementsAre(Thumb(kPhoto, "XL"), Thumb(kPhoto, "XL")));
 }
 
-TEST_F(IndexVersion, NoRotationIsLookedForInAnOldIndex) {
-  const DaemonPeer daemon;
+TEST_F(IndexVersion, RotationIsNotDetectedInAnOldIndex) {
   const StubTool compare(kComparePath);
   PutThumbs(kPhoto, {"XL", "B", "S"});
-  EXPECT_GOOD_END(Run());
+  RunWithDaemon();
   EXPECT_THAT(ConvertedSources(), ElementsAre(kPhoto));
   EXPECT_THAT(compare.Calls(), IsEmpty());
 }
@@ -124,9 +108,9 @@ TEST_F(IndexVersion, NoRotationIsLookedForInAnOldIndex) {
 TEST_F(IndexVersion, ReportThatIsRefusedIsLoggedOnly) {
   DaemonPeer daemon;
   daemon.Answer("POST_PHOTO_CONVERT", DaemonReply::Line("{\"success\":false}"));
-  EXPECT_GOOD_END(Run());
-  EXPECT_EQ(3, Progress("completed_thumb"));
-  EXPECT_EQ("/tmp/photos\n", ReadFile(kQueue));
+  EXPECT_SUCCESS(Run());
+  EXPECT_EQ(Progress("completed_thumb"), 3);
+  EXPECT_EQ(ReadFile(kQueue), "/tmp/photos\n");
   EXPECT_THAT(ErrorLines(), ElementsAre("velamk_ipc:137 fail"));
 }
 

@@ -1,11 +1,7 @@
 // Several instances of the program over the same photos at once.
-#include <map>
 #include <set>
 
 #include "program/real_program_test.h"
-#include "support/build_paths.h"
-#include "support/images.h"
-#include "support/stub_tool.h"
 
 namespace vela_test::real {
 
@@ -13,7 +9,7 @@ namespace {
 
 constexpr const char* kTree = "R:/tmp/photos";
 
-/// What a converter call was for: its source, and the first box, which tells the phase.
+/// What a converter call was for: its source, and the first box, which identifies the phase.
 struct Work {
   std::string source;
   std::string box;
@@ -28,7 +24,7 @@ void PrintTo(const Work& work, std::ostream* out) {
 }
 
 Work WorkOf(const StubCall& call) {
-  const std::vector<std::string> parameters = call.Parameters();
+  const Strings parameters = call.Parameters();
   Work work;
   work.source = parameters.size() > 2 ? parameters[2] : "";
   for (size_t i = 0; i + 1 < parameters.size() && work.box.empty(); ++i) {
@@ -57,10 +53,10 @@ class Instances : public RealProgramTest {
     }
   }
 
-  /// Starts that many instances at once and waits for all.
-  void RunTogether(int instances, const std::vector<std::string>& directories) const {
+  /// Starts this number of instances at once and waits for all.
+  void RunTogether(int instances, const Strings& directories) const {
     const auto before = PhotosBelow(kPhotos);
-    std::vector<std::string> arguments = {kProfiles};
+    Strings arguments = {kProfiles};
     arguments.insert(arguments.end(), directories.begin(), directories.end());
     std::vector<Program> programs;
     for (int i = 0; i < instances; ++i) {
@@ -72,7 +68,7 @@ class Instances : public RealProgramTest {
       EXPECT_EQ(result->exitCode, 0) << result->err;
     }
     EXPECT_TRUE(PhotosBelow(kPhotos) == before) << "a run touched a photo";
-    EXPECT_EQ(PidFiles(), std::vector<std::string>());
+    EXPECT_THAT(PidFiles(), IsEmpty());
   }
 
   /// How often each piece of work was done.
@@ -111,7 +107,7 @@ class Instances : public RealProgramTest {
     }
   }
 
-  /// The last run finds whatever the others have left.
+  /// The last run completes what the others have left.
   void ExpectAllDoneAfterALastRun() {
     Make({kTree});
     Make({kTree});
@@ -127,7 +123,7 @@ class Instances : public RealProgramTest {
   void ExpectSharedTree(int instances) {
     MakePhotos(8, 4);
     RunTogether(instances, {kTree});
-    // All photos have been through phases 0 and 1 by now, whoever was there first.
+    // All photos have been through phases 0 and 1 by now, whichever instance took them.
     for (const std::string& photo : photos_) {
       EXPECT_TRUE(HasThumbs(photo, OfPhase(kinds_, 0)));
       EXPECT_TRUE(HasThumbs(photo, OfPhase(kinds_, 1)));
@@ -143,7 +139,7 @@ class Instances : public RealProgramTest {
   }
 
   std::optional<StubTool> converter_;
-  std::vector<std::string> photos_;
+  Strings photos_;
 };
 
 }  // namespace
@@ -156,7 +152,7 @@ TEST_F(Instances, FourShareATree) {
   ExpectSharedTree(4);
 }
 
-// One instance holds the directory for all of its photos; the others leave at once.
+// One instance locks the directory for all of its photos; the others skip it at once.
 TEST_F(Instances, FourOverOneDirectory) {
   MakePhotos(1, 12);
   RunTogether(4, {InPhotos("d0")});
@@ -171,11 +167,11 @@ TEST_F(Instances, FourOverOneDirectory) {
 
 TEST_F(Instances, OppositeOrdersOfTheSameDirectories) {
   MakePhotos(4, 3);
-  std::vector<std::string> up = {kProfiles};
+  Strings up = {kProfiles};
   for (int d = 0; d < 4; ++d) {
     up.push_back(InPhotos("d" + std::to_string(d)));
   }
-  std::vector<std::string> down(up.rbegin(), up.rend() - 1);
+  Strings down(up.rbegin(), up.rend() - 1);
   down.insert(down.begin(), kProfiles);
   Program first = StartProgram(VelathumbPath(), up);
   Program second = StartProgram(VelathumbPath(), down);

@@ -1,4 +1,4 @@
-// The program ended by a signal at any moment of a run.
+// Ending the program by a signal at any moment of a run.
 #include <algorithm>
 #include <chrono>
 #include <csignal>
@@ -8,10 +8,6 @@
 #include <thread>
 
 #include "program/real_program_test.h"
-#include "support/build_paths.h"
-#include "support/daemon_peer.h"
-#include "support/images.h"
-#include "support/stub_tool.h"
 
 namespace vela_test::real {
 
@@ -24,16 +20,15 @@ using std::chrono::steady_clock;
 constexpr const char* kTree = "R:/tmp/photos";
 constexpr const char* kConverterName = "convert-thumb";
 
-/// A quarter of the trials of a signal; four tests share them out.
+/// The trials of a signal in one test.
 constexpr int kTrials = 50;
 
-/// What the program may take to end after SIGTERM.
+/// Time limit for the end of the program after SIGTERM.
 constexpr milliseconds kPromptEnd(1000);
 
 class Interruption : public RealProgramTest {
  protected:
-  /// Copies of a photo in four directories, so that a signal also meets the change from one to the
-  /// next.
+  /// Copies of a photo in four directories, so that a signal may also come between two directories.
   void MakePhotos(int perDirectory, const std::string& original = MakeJpeg("/tmp/small.jpg")) {
     for (int i = 0; i < 4 * perDirectory; ++i) {
       const std::string name = "d" + std::to_string(i % 4) + "/" + std::to_string(i) + ".jpg";
@@ -44,20 +39,20 @@ class Interruption : public RealProgramTest {
     before_ = PhotosBelow(kPhotos);
   }
 
-  /// A photo with much detail: the converter spends a good part of its time on writing.
+  /// A photo with much detail, whose thumbnails take long to write.
   static std::string MakeDetailedPhoto() {
     Draw({"-size", "640x480", "-seed", "7", "plasma:red-blue", "-quality", "92",
           "/tmp/detailed.jpg"});
     return "/tmp/detailed.jpg";
   }
 
-  /// As before the first run.
+  /// Restores the state before the first run.
   static void ForgetRuns() {
     for (int i = 0; i < 4; ++i) {
       RemoveTree(InPhotos("d" + std::to_string(i) + "/@eaDir"));
     }
     RemoveTree(kQueue);
-    RemoveTree("/var/spool/conv_progress_photo");
+    RemoveTree(kPhotoProgress);
   }
 
   static bool HasEnded(Program& program) { return program.Wait(milliseconds(0)).has_value(); }
@@ -78,7 +73,7 @@ class Interruption : public RealProgramTest {
     return "/var/run/velathumb." + std::to_string(program.Pid()) + ".pid";
   }
 
-  /// Sends SIGTERM, after which the program has to end at once and leave nothing running.
+  /// Sends SIGTERM, after which the program must end promptly and leave no process running.
   static void Terminate(Program& program) {
     const auto sent = steady_clock::now();
     program.Kill(SIGTERM);
@@ -86,7 +81,7 @@ class Interruption : public RealProgramTest {
     ASSERT_TRUE(result) << "still there a second after the signal";
     EXPECT_EQ(result->exitCode, 1);
     EXPECT_EQ(result->signal, 0);
-    EXPECT_EQ(PidFiles(), std::vector<std::string>());
+    EXPECT_THAT(PidFiles(), IsEmpty());
     const auto left = sent + kPromptEnd - steady_clock::now();
     EXPECT_TRUE(WaitUntilNoneIsCalled(
         kConverterName, static_cast<int>(std::chrono::duration_cast<milliseconds>(left).count())));
@@ -97,8 +92,8 @@ class Interruption : public RealProgramTest {
     EXPECT_TRUE(PhotosBelow(kPhotos) == before_) << "the run touched a photo";
   }
 
-  /// Whole trials with a moment each, until one fails. Half of the moments lie close to the start,
-  /// where processes and files come into being, half anywhere in the run.
+  /// Runs trials at random moments until one fails. Half of the moments are close to the start,
+  /// when processes and files are created, half anywhere in the run.
   void Repeat(int trials, milliseconds longest,
               const std::function<void(microseconds moment)>& trial) {
     const unsigned seed = std::random_device()();
@@ -113,7 +108,7 @@ class Interruption : public RealProgramTest {
     }
   }
 
-  /// Ends a run after `moment`; another one, earlier, when that was done before.
+  /// Terminates a run after `moment`; tries again earlier when the run was done before.
   static void TerminateOneRun(microseconds moment) {
     for (;;) {
       ForgetRuns();
@@ -127,7 +122,7 @@ class Interruption : public RealProgramTest {
     }
   }
 
-  /// SIGTERM at random moments of runs that each begin with nothing made.
+  /// SIGTERM at random moments of runs that start without thumbnails.
   void TerminateRuns() {
     kinds_ = FullKinds();
     WriteKinds(kProfiles, kinds_);
@@ -149,7 +144,7 @@ class Interruption : public RealProgramTest {
       ExpectNoHarm();
       EXPECT_TRUE(Exists(stale));
       Make({kTree});
-      EXPECT_EQ(PidFiles(), std::vector<std::string>());
+      EXPECT_THAT(PidFiles(), IsEmpty());
       ExpectThumbs(0);
       ExpectThumbs(1);
       Make({kTree});
@@ -158,7 +153,7 @@ class Interruption : public RealProgramTest {
     });
   }
 
-  /// Kills a run after `moment`; another one, earlier, when that was done before. Returns its pid
+  /// Kills a run after `moment`; tries again earlier when the run was done before. Returns its pid
   /// file.
   static std::string KillOneRun(microseconds moment) {
     for (;;) {
@@ -176,8 +171,8 @@ class Interruption : public RealProgramTest {
     }
   }
 
-  /// What the killed program had just started may hold its lock until it becomes the converter, and
-  /// ends by itself a little later.
+  /// A child of the killed program may hold its lock until it becomes the converter, which then
+  /// ends by itself.
   static void AwaitChildrenOfKilledRun() {
     EXPECT_TRUE(WaitUntilNoneIsCalled("velathumb", 10000));
     EXPECT_TRUE(WaitUntilNoneIsCalled(kConverterName, 10000));
@@ -189,46 +184,27 @@ class Interruption : public RealProgramTest {
     }
   }
 
-  std::vector<std::string> photos_;
+  Strings photos_;
   std::map<std::string, PhotoState> before_;
 };
 
 }  // namespace
 
-TEST_F(Interruption, SigtermAtRandomMoments1) {
+/// A quarter of the trials of a signal.
+class InterruptionAtRandomMoments : public Interruption,
+                                    public ::testing::WithParamInterface<int> {};
+
+TEST_P(InterruptionAtRandomMoments, Sigterm) {
   TerminateRuns();
 }
 
-TEST_F(Interruption, SigtermAtRandomMoments2) {
-  TerminateRuns();
-}
-
-TEST_F(Interruption, SigtermAtRandomMoments3) {
-  TerminateRuns();
-}
-
-TEST_F(Interruption, SigtermAtRandomMoments4) {
-  TerminateRuns();
-}
-
-TEST_F(Interruption, SigkillAtRandomMoments1) {
+TEST_P(InterruptionAtRandomMoments, Sigkill) {
   KillRuns();
 }
 
-TEST_F(Interruption, SigkillAtRandomMoments2) {
-  KillRuns();
-}
+INSTANTIATE_TEST_SUITE_P(Quarters, InterruptionAtRandomMoments, ::testing::Range(1, 5));
 
-TEST_F(Interruption, SigkillAtRandomMoments3) {
-  KillRuns();
-}
-
-TEST_F(Interruption, SigkillAtRandomMoments4) {
-  KillRuns();
-}
-
-// A converter that was about to start when the signal came would otherwise be seen only by chance:
-// the real one is done too soon.
+// The real converter is too fast to be about to start when the signal comes, except by chance.
 TEST_F(Interruption, SigtermAroundTheStartOfAHangingConverter) {
   MakePhotos(1);
   const StubTool converter(kConverterPath);
@@ -273,12 +249,12 @@ TEST_F(Interruption, SigtermEndsTheConvertersOfOtherInstances) {
   const auto result = program.Wait(kPromptEnd);
   ASSERT_TRUE(result);
   EXPECT_EQ(result->exitCode, 1);
-  // The other one takes the end of its converter for a failure and goes on to its own end.
+  // The other instance treats the end of its converter as a failure and continues.
   const auto otherResult = other.Wait(milliseconds(10000));
   ASSERT_TRUE(otherResult);
   EXPECT_EQ(otherResult->exitCode, 0);
   EXPECT_TRUE(IsMarkedFailed(photos_[0], kinds_));
-  EXPECT_EQ(PidFiles(), std::vector<std::string>());
+  EXPECT_THAT(PidFiles(), IsEmpty());
 }
 
 TEST_F(Interruption, SigtermWhileTheDaemonIsSilent) {
@@ -291,7 +267,7 @@ TEST_F(Interruption, SigtermWhileTheDaemonIsSilent) {
     Program program = StartRun();
     const auto end = steady_clock::now() + std::chrono::seconds(10);
     const auto isAsked = [&] {
-      const std::vector<std::string> commands = daemon.Commands();
+      const Strings commands = daemon.Commands();
       return std::count(commands.begin(), commands.end(), command) > 0;
     };
     while (!isAsked() && steady_clock::now() < end) {

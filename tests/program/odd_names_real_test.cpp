@@ -1,13 +1,8 @@
 // Photos and directories whose names mean something to shells, to the C library or to the
-// converter. Every photo has a colour of its own, so that a thumbnail tells whose it is.
+// converter. Every photo has a colour of its own, which identifies its thumbnails.
 #include <algorithm>
-#include <map>
 
 #include "program/real_program_test.h"
-#include "support/daemon_peer.h"
-#include "support/images.h"
-#include "support/stub_tool.h"
-#include "support/system_log.h"
 
 namespace vela_test::real {
 
@@ -15,73 +10,40 @@ namespace {
 
 /// Names without extension that the converter opens like any other: it gets each name as one
 /// argument, in an absolute path.
-std::vector<std::string> OpenableNames() {
-  return {"two words",
-          " leading space",
-          "trailing space ",
-          "'single'",
-          "\"double\"",
-          "it's",
-          "%",
-          "%%",
-          "100%",
-          "%d",
-          "%04d",
-          "%s%n",
-          "%f.%e",
-          "a:b",
-          "jpg:x",
-          "png:jpg:x",
-          "http:x",
-          "msl:x",
-          ":",
-          "new\nline",
-          "\n",
-          "tab\there",
-          "return\r",
-          "\x01\x7f",
-          "-dash",
-          "-",
-          "--version",
-          "-write",
-          "+append",
-          "\xff\xfe\x80",
-          "\xe9t\xe9",
-          "\xf0\x9f\x93\xb7",
-          "~",
-          "~root",
-          "$HOME",
-          "$(id)",
-          "`id`",
-          ";",
-          "a;b",
-          "a&b",
-          "a|b",
-          "|id",
-          "<in>out",
-          "back\\slash",
-          "\\",
-          "@file",
-          "@",
-          ".hidden",
-          "..",
-          "...",
-          "#1",
-          "!",
-          "(",
-          ")",
-          "a=b",
-          "a,b",
-          "10x10",
-          "^"};
+Strings OpenableNames() {
+  const Strings groups[] = {
+      {"two words", " leading space", "trailing space ", "'single'", "\"double\"", "it's"},
+      {"%", "%%", "100%", "%d", "%04d", "%s%n", "%f.%e"},
+      {"a:b", "jpg:x", "png:jpg:x", "http:x", "msl:x", ":"},
+      {"new\nline", "\n", "tab\there", "return\r", "\x01\x7f"},
+      {"-dash", "-", "--version", "-write", "+append"},
+      {"\xff\xfe\x80", "\xe9t\xe9", "\xf0\x9f\x93\xb7"},
+      {"~", "~root", "$HOME", "$(id)", "`id`", ";", "a;b", "a&b", "a|b", "|id", "<in>out"},
+      {"back\\slash", "\\", "@file", "@", ".hidden", "..", "...", "#1", "!", "(", ")"},
+      {"a=b", "a,b", "10x10", "^"},
+  };
+  Strings names;
+  for (const Strings& group : groups) {
+    names.insert(names.end(), group.begin(), group.end());
+  }
+  return names;
 }
 
 /// Names that ImageMagick takes for a list of file names, because of the wildcard in them: it reads
 /// the photo as text and then looks for files called like its bytes. The script in front of it
 /// refuses them.
-std::vector<std::string> WildcardNames() {
+Strings WildcardNames() {
   return {"[1]", "a[1]", "x[0]",  "[a-z]", "a[2x2]", "a[",      "a]",      "*",    "a*",
           "?",   "a?c",  "{a,b}", "{",     "}",      "%[fx:1]", "${HOME}", "x[0]y"};
+}
+
+/// Both except "..", which cannot be the name of a new directory.
+Strings DirectoryNames() {
+  Strings names = OpenableNames();
+  const Strings wildcards = WildcardNames();
+  names.insert(names.end(), wildcards.begin(), wildcards.end());
+  names.erase(std::find(names.begin(), names.end(), ".."));
+  return names;
 }
 
 std::string Longest(const std::string& extension) {
@@ -98,7 +60,15 @@ class OddNames : public RealProgramTest {
     return path;
   }
 
-  /// Makes a photo of a name that ImageMagick would misread; only then it is to fail.
+  void AddPhotos(const Strings& names, const Strings& extensions) {
+    for (const std::string& name : names) {
+      for (const std::string& extension : extensions) {
+        AddPhoto(InPhotos(name + extension));
+      }
+    }
+  }
+
+  /// Makes a photo whose name ImageMagick would misread; with ImageMagick it has to fail.
   void AddMisreadPhoto(const std::string& path) {
     AddPhoto(path);
     if (!IsOwnConverterReal()) {
@@ -132,15 +102,13 @@ class OddNames : public RealProgramTest {
   }
 
   std::map<std::string, int> colours_;  // path to palette index
-  std::vector<std::string> failing_;
+  Strings failing_;
 };
 
 }  // namespace
 
 TEST_F(OddNames, JpegsOfAnyOpenableName) {
-  for (const std::string& name : OpenableNames()) {
-    AddPhoto(InPhotos(name + ".jpg"));
-  }
+  AddPhotos(OpenableNames(), {".jpg"});
   AddPhoto(InPhotos(Longest(".jpg")));
   const DaemonPeer daemon;
   Make();
@@ -150,21 +118,19 @@ TEST_F(OddNames, JpegsOfAnyOpenableName) {
   ExpectOwnPictures(kinds_);
   EXPECT_EQ(Progress("completed"), static_cast<int>(colours_.size()));
   EXPECT_EQ(Progress("completed_thumb"), 6 * static_cast<int>(colours_.size()));
-  EXPECT_EQ(ErrorLines(), std::vector<std::string>());
+  EXPECT_THAT(ErrorLines(), IsEmpty());
   ExpectNothingLeftToMake();
 }
 
 TEST_F(OddNames, PngsOfAnyOpenableName) {
-  for (const std::string& name : OpenableNames()) {
-    AddPhoto(InPhotos(name + ".png"));
-  }
+  AddPhotos(OpenableNames(), {".png"});
   AddPhoto(InPhotos(Longest(".png")));
   Make();
   ExpectOwnPictures(OfPhase(kinds_, 0));
   ExpectOwnPictures(OfPhase(kinds_, 1));
 }
 
-// What the index would not take for a photo gets no thumbnail, whatever its name would open.
+// Files that are no photos for the index get no thumbnail.
 TEST_F(OddNames, NamesThatAreNoPhotos) {
   MakeJpeg("/tmp/photo.jpg");
   for (const char* name : {"x.jpg ", "x.jpg\n", "._x.jpg", "jpg", "x", ".jpg."}) {
@@ -174,16 +140,13 @@ TEST_F(OddNames, NamesThatAreNoPhotos) {
   EXPECT_FALSE(Exists(InPhotos("@eaDir")));
 }
 
-// The photos that a wildcard would find lie beside it, before and behind it in the order.
-TEST_F(OddNames, WildcardsHoldNothingUp) {
+// The photos that a wildcard would match are beside it, before and after it in the order.
+TEST_F(OddNames, WildcardsStopNothing) {
   for (const std::string& name : WildcardNames()) {
     AddMisreadPhoto(InPhotos(name + ".jpg"));
     AddMisreadPhoto(InPhotos(name + ".png"));
   }
-  for (const char* name : {"1", "a", "b", "a1", "abc", "x", "x0", "a2x2", "z", "!"}) {
-    AddPhoto(InPhotos(std::string(name) + ".jpg"));
-    AddPhoto(InPhotos(std::string(name) + ".png"));
-  }
+  AddPhotos({"1", "a", "b", "a1", "abc", "x", "x0", "a2x2", "z", "!"}, {".jpg", ".png"});
   Make();
   Make();
   ExpectOwnPicturesOrMarkers();
@@ -193,10 +156,10 @@ TEST_F(OddNames, WildcardsHoldNothingUp) {
   EXPECT_EQ(Progress("completed_thumb"), 6 * (2 * failures + good));
 }
 
-// Markers of one photo go away without those of another that its name would match as a pattern.
+// Removing the markers of a photo spares those of another that its name would match as a pattern.
 TEST_F(OddNames, MarkersOfWildcardNamesAreTheirOwn) {
-  const std::vector<std::string> broken = {InPhotos("a[1].jpg"), InPhotos("a1.jpg"),
-                                           InPhotos("*.jpg"), InPhotos("back\\slash.jpg")};
+  const Strings broken = {InPhotos("a[1].jpg"), InPhotos("a1.jpg"), InPhotos("*.jpg"),
+                          InPhotos("back\\slash.jpg")};
   for (const std::string& photo : broken) {
     WriteFile(photo, "no photo");
   }
@@ -215,17 +178,15 @@ TEST_F(OddNames, MarkersOfWildcardNamesAreTheirOwn) {
 
 // Formats with several pages are opened by their name with a page number behind it, which is no
 // existing file: ImageMagick then expands what it finds in the name.
-TEST_F(OddNames, PagedFormatsOfAnyNameWithoutMeaning) {
+TEST_F(OddNames, PagedFormatsOfNamesWithoutMeaning) {
   for (const std::string& name : OpenableNames()) {
     if (name.find('%') == std::string::npos) {
       AddPhoto(InPhotos(name + ".tif"));
     }
   }
   AddPhoto(InPhotos(Longest(".tif")));
-  for (const char* name : {"100%", "a%", "two words", "a:b", "jpg:x", "-dash", "@file", "|id"}) {
-    AddPhoto(InPhotos(std::string(name) + ".gif"));
-    AddPhoto(InPhotos(std::string(name) + ".webp"));
-  }
+  AddPhotos({"100%", "a%", "two words", "a:b", "jpg:x", "-dash", "@file", "|id"},
+            {".gif", ".webp"});
   Make();
   Make();
   ExpectOwnPictures(kinds_);
@@ -245,13 +206,9 @@ TEST_F(OddNames, PagedFormatsThatCouldBeMisread) {
 }
 
 TEST_F(OddNames, DirectoriesOfAnyName) {
-  std::vector<std::string> directories;
-  std::vector<std::string> names = OpenableNames();
-  for (const std::string& name : WildcardNames()) {
-    names.push_back(name);
-  }
+  Strings directories;
+  Strings names = DirectoryNames();
   names.push_back(Longest(""));
-  names.erase(std::find(names.begin(), names.end(), ".."));
   for (const std::string& name : names) {
     directories.push_back(InPhotos(name));
     MakeDirectories(directories.back());
@@ -261,9 +218,9 @@ TEST_F(OddNames, DirectoriesOfAnyName) {
   Make(directories);
   ExpectOwnPictures(OfPhase(kinds_, 0));
   ExpectOwnPictures(OfPhase(kinds_, 1));
-  // Each waits in the queue for its last phase, but those that a line cannot hold.
-  std::vector<std::string> queued;
-  std::vector<std::string> unqueued;
+  // Each is queued for its last phase, except those that a line cannot hold.
+  Strings queued;
+  Strings unqueued;
   for (const std::string& directory : directories) {
     if (directory.find('\n') == std::string::npos) {
       queued.push_back(directory);
@@ -278,15 +235,8 @@ TEST_F(OddNames, DirectoriesOfAnyName) {
 }
 
 TEST_F(OddNames, TreeOfOddDirectories) {
-  std::vector<std::string> names = OpenableNames();
-  for (const std::string& name : WildcardNames()) {
-    names.push_back(name);
-  }
-  std::vector<std::string> refused;
-  for (const std::string& name : names) {
-    if (name == "..") {
-      continue;
-    }
+  Strings refused;
+  for (const std::string& name : DirectoryNames()) {
     const std::string directory = InPhotos(name + "/below " + name);
     MakeDirectories(directory);
     if (std::string(".@#").find(name[0]) == std::string::npos) {
@@ -299,14 +249,14 @@ TEST_F(OddNames, TreeOfOddDirectories) {
   Make({"R:" + std::string(kPhotos)});
   ExpectOwnPictures(kinds_);
   for (const std::string& photo : refused) {
-    EXPECT_FALSE(Exists(MetadataOf(photo))) << photo;
+    EXPECT_FALSE(Exists(MetadataDirOf(photo))) << photo;
   }
 }
 
-// A relative directory comes first in the converter's arguments, where some beginnings mean an
+// A relative directory comes first in the converter's arguments, where some prefixes mean an
 // option, a list or a format.
 TEST_F(OddNames, RelativeDirectories) {
-  std::vector<std::string> directories;
+  Strings directories;
   for (const char* name : {"plain", "./dot", "two words", "~", "~root", ":x", "%d", "[1]", "*",
                            "--", "$HOME", "|id", ";", "a\\b", "(", "../photos/up"}) {
     directories.emplace_back(name);

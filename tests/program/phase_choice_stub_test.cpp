@@ -1,52 +1,29 @@
-// Which phase a photo is in, told from the thumbnails it has.
-#include <gmock/gmock.h>
-#include <gtest/gtest.h>
-
-#include <ctime>
-#include <string>
-#include <vector>
-
+// Which phase a photo is in, by the thumbnails that it has.
 #include "program/stub_program_test.h"
-#include "support/files.h"
 #include "support/images.h"
-#include "support/system_log.h"
 
 namespace vela_test {
 namespace {
 
-using ::testing::ElementsAre;
-using ::testing::IsEmpty;
-
-constexpr const char* kPhoto = "/tmp/photos/a.jpg";
-constexpr const char* kReport = "POST_PHOTO_CONVERT /tmp/photos/a.jpg";
-constexpr const char* kQuestion = "GET_INDEX_VERSION /tmp/photos/a.jpg";
-
-/// The system asks for more kinds than the profiles make, unless a test says otherwise: the status
-/// of a photo is never "nothing needed" then, and the choice of the phase decides.
-class PhaseChoice : public StubProgramTest {
+/// The system asks for more size classes than the profiles make, unless a test says otherwise: the
+/// status of a photo is never "nothing needed" then, and the choice of the phase decides.
+class PhaseChoice : public OnePhotoTest {
  protected:
-  void SetUp() override {
-    StubProgramTest::SetUp();
-    MakePhoto(kPhoto);
-  }
-
-  /// Runs it; returns the requests.
-  static std::vector<std::string> RunAndGetRequests() {
-    const DaemonPeer daemon;
-    EXPECT_GOOD_END(Run());
+  static Strings RunAndGetRequests() {
+    const Strings requests = RunWithDaemon();
     EXPECT_THAT(ErrorLines(), IsEmpty());
-    return RequestsOf(daemon);
+    return requests;
   }
 
-  /// Size classes of the thumbnails that the converter made, with the source each call took them
-  /// from: "photo: 1280 320".
-  std::vector<std::string> Made() const {
-    std::vector<std::string> made;
+  /// Sizes of the thumbnails that the converter made, with the source of each call:
+  /// "photo: 1280 320".
+  Strings Made() const {
+    Strings made;
     for (const StubCall& call : Converter().Calls()) {
-      std::string line = SourceOf(call) == kPhoto ? "photo:" : SourceOf(call) + ":";
-      if (SourceOf(call) == Thumb(kPhoto, "XL")) {
-        line = "XL:";
-      }
+      const std::string source = SourceOf(call);
+      std::string line = source == kPhoto                ? "photo:"
+                         : source == Thumb(kPhoto, "XL") ? "XL:"
+                                                         : source + ":";
       for (const std::string& argument : call.arguments) {
         if (argument.compare(0, 10, "jpeg:size=") == 0) {
           line += " " + argument.substr(10, argument.find('x') - 10);
@@ -57,210 +34,186 @@ class PhaseChoice : public StubProgramTest {
     return made;
   }
 
-  static void Empty(const std::string& path, size_t bytes) { WriteFileOfSize(path, bytes); }
+  static void PutOldThumbs(const Strings& sizeClasses) {
+    MakeDirectories(MetadataDirOf(kPhoto));
+    for (const std::string& sizeClass : sizeClasses) {
+      MakeJpeg(OldThumb(kPhoto, sizeClass));
+    }
+  }
 
   /// Dates a thumbnail a second before the photo.
-  static void MakeOld(const std::string& path) {
-    SetFileTime(path, ModificationTime(kPhoto).seconds - 1);
+  static void MakeOutdated(const std::string& sizeClass) {
+    SetFileTime(Thumb(kPhoto, sizeClass), ModificationTime(kPhoto).seconds - 1);
   }
 };
 
-TEST_F(PhaseChoice, PhotoThatNeedsNothingIsReportedOnly) {
-  WriteFile(kSettings, kThreePhasesSizeMap);
-  PutThumbs(kPhoto, {"XL", "M", "B", "S"});
+const Strings kAllClasses = {"XL", "M", "B", "S"};
+
+/// A photo that has everything: only a report, and no other trace.
+struct CompletePhoto : NamedRow {
+  const char* settings;      ///< content of the settings file, none when null
+  Strings thumbs;            ///< size classes that are there
+  const char* oneByteThumb;  ///< one of them that is cut to a byte, none when null
+  bool hasOlderNames = false;
+};
+
+class NothingToMake : public PhaseChoice, public ::testing::WithParamInterface<CompletePhoto> {};
+
+TEST_P(NothingToMake, IsReportedOnly) {
+  const CompletePhoto& photo = GetParam();
+  if (photo.settings != nullptr) {
+    WriteFile(kSettings, photo.settings);
+  }
+  if (photo.hasOlderNames) {
+    PutOldThumbs(photo.thumbs);
+  } else {
+    PutThumbs(kPhoto, photo.thumbs);
+  }
+  if (photo.oneByteThumb != nullptr) {
+    WriteFileOfSize(Thumb(kPhoto, photo.oneByteThumb), 1);
+  }
   EXPECT_THAT(RunAndGetRequests(), ElementsAre(kReport));
   EXPECT_THAT(Made(), IsEmpty());
-  EXPECT_FALSE(Exists(kPhotoProgress));
-  EXPECT_FALSE(Exists(kQueue));
-}
-
-TEST_F(PhaseChoice, StatusComesBeforeThePhases) {
-  // What the system does not ask for is not made, whatever the profiles say.
-  WriteFile(kSettings, kThreePhasesSizeMap);
-  PutThumbs(kPhoto, {"XL", "M", "B", "S"});
-  Empty(Thumb(kPhoto, "XL"), 1);  // too small for its phase, but there
-  EXPECT_THAT(RunAndGetRequests(), ElementsAre(kReport));
-  EXPECT_THAT(Made(), IsEmpty());
-}
-
-TEST_F(PhaseChoice, NoWantedSizeAtAllIsNothingNeeded) {
-  WriteFile(kSettings, "photo_thumb_size_map=\"0\"\n");
-  EXPECT_THAT(RunAndGetRequests(), ElementsAre(kReport));
-  EXPECT_THAT(MetadataOf(kPhoto), IsEmpty());
+  EXPECT_THAT(MetadataOf(kPhoto), SizeIs(photo.thumbs.size()));
   EXPECT_TRUE(IsDirectory(MetadataDirOf(kPhoto)));
-}
-
-TEST_F(PhaseChoice, CompletePhasesAreReportedOnly) {
-  PutThumbs(kPhoto, {"XL", "M", "B", "S"});
-  EXPECT_THAT(RunAndGetRequests(), ElementsAre(kReport));
-  EXPECT_THAT(Made(), IsEmpty());
   EXPECT_FALSE(Exists(kPhotoProgress));
   EXPECT_FALSE(Exists(kQueue));
 }
 
-TEST_F(PhaseChoice, Phase0WithoutOneThumbnail) {
-  PutThumbs(kPhoto, {"XL", "B", "S"});
-  EXPECT_THAT(RunAndGetRequests(), ElementsAre(kQuestion, kReport));
-  EXPECT_THAT(Made(), ElementsAre("photo: 320"));
-  // Phase 1 follows, though nothing is left to be made of it.
-  EXPECT_EQ(3, Progress("completed_thumb"));
-  EXPECT_EQ(0, Progress("completed"));
-  EXPECT_EQ("/tmp/photos\n", ReadFile(kQueue));
+// What the system does not ask for is not made, whatever the profiles say: the status of the photo
+// is checked first, and a file of one byte is enough for it.
+INSTANTIATE_TEST_SUITE_P(
+    Photos, NothingToMake,
+    ::testing::Values(
+        CompletePhoto{"ByItsStatus", kThreePhasesSizeMap, kAllClasses, nullptr},
+        CompletePhoto{"ByItsStatusBeforeItsPhases", kThreePhasesSizeMap, kAllClasses, "XL"},
+        CompletePhoto{"BecauseNoSizeIsWanted", "photo_thumb_size_map=\"0\"\n", {}, nullptr},
+        CompletePhoto{"ByItsPhases", nullptr, kAllClasses, nullptr},
+        CompletePhoto{"ByItsStatusWithOlderNames", kThreePhasesSizeMap, kAllClasses, nullptr,
+                      true}),
+    RowName<CompletePhoto>);
+
+/// The phase that is due, by the thumbnails that are missing, outdated or too small.
+struct DuePhase : NamedRow {
+  Strings thumbs;    ///< size classes that are there
+  Strings outdated;  ///< of these, dated before the photo
+  Strings empty;     ///< of these, without content
+  Strings made;
+  int completed;
+  int completedThumb;
+  bool queued;
+};
+
+class IncompletePhoto : public PhaseChoice, public ::testing::WithParamInterface<DuePhase> {};
+
+TEST_P(IncompletePhoto, GetsWhatItsFirstDuePhaseMakes) {
+  PutThumbs(kPhoto, GetParam().thumbs);
+  for (const std::string& sizeClass : GetParam().outdated) {
+    MakeOutdated(sizeClass);
+  }
+  for (const std::string& sizeClass : GetParam().empty) {
+    WriteFileOfSize(Thumb(kPhoto, sizeClass), 0);
+  }
+  EXPECT_THAT(RunAndGetRequests(), ElementsAre(kVersionRequest, kReport));
+  EXPECT_EQ(Made(), GetParam().made);
+  ExpectProgress(GetParam().completed, GetParam().completedThumb);
+  EXPECT_EQ(Exists(kQueue) ? ReadFile(kQueue) : "", GetParam().queued ? "/tmp/photos\n" : "");
+  for (const std::string& sizeClass : GetParam().empty) {
+    EXPECT_GT(FileSize(Thumb(kPhoto, sizeClass)), 1);
+  }
 }
 
-TEST_F(PhaseChoice, Phase1) {
-  PutThumbs(kPhoto, {"XL", "M", "S"});
-  EXPECT_THAT(RunAndGetRequests(), ElementsAre(kQuestion, kReport));
-  EXPECT_THAT(Made(), ElementsAre("XL: 640"));
-  EXPECT_EQ(1, Progress("completed_thumb"));
-  EXPECT_EQ(0, Progress("completed"));
-  EXPECT_EQ("/tmp/photos\n", ReadFile(kQueue));
-}
-
-TEST_F(PhaseChoice, Phase2) {
-  PutThumbs(kPhoto, {"XL", "M", "B"});
-  EXPECT_THAT(RunAndGetRequests(), ElementsAre(kQuestion, kReport));
-  EXPECT_THAT(Made(), ElementsAre("XL: 120"));
-  EXPECT_EQ(1, Progress("completed_thumb"));
-  EXPECT_EQ(1, Progress("completed"));
-  EXPECT_FALSE(Exists(kQueue));
-}
-
-TEST_F(PhaseChoice, EmptyThumbnailIsMadeAgain) {
-  PutThumbs(kPhoto, {"XL", "M", "B", "S"});
-  Empty(Thumb(kPhoto, "M"), 0);
-  RunAndGetRequests();
-  EXPECT_THAT(Made(), ElementsAre("photo: 320"));
-  EXPECT_GT(FileSize(Thumb(kPhoto, "M")), 1);
-}
-
-TEST_F(PhaseChoice, EmptyThumbnailOfALaterPhaseIsMadeAgain) {
-  PutThumbs(kPhoto, {"XL", "M", "B", "S"});
-  Empty(Thumb(kPhoto, "S"), 0);
-  RunAndGetRequests();
-  EXPECT_THAT(Made(), ElementsAre("XL: 120"));
-}
+// Phase 1 follows phase 0 even though it may have nothing left to make.
+INSTANTIATE_TEST_SUITE_P(
+    Phases, IncompletePhoto,
+    ::testing::Values(
+        DuePhase{"Phase0Missing", {"XL", "B", "S"}, {}, {}, {"photo: 320"}, 0, 3, true},
+        DuePhase{"Phase1Missing", {"XL", "M", "S"}, {}, {}, {"XL: 640"}, 0, 1, true},
+        DuePhase{"Phase2Missing", {"XL", "M", "B"}, {}, {}, {"XL: 120"}, 1, 1, false},
+        DuePhase{"Phase0Empty", kAllClasses, {}, {"M"}, {"photo: 320"}, 0, 3, true},
+        DuePhase{"Phase2Empty", kAllClasses, {}, {"S"}, {"XL: 120"}, 1, 1, false},
+        DuePhase{"Phase0Outdated", kAllClasses, {"M"}, {}, {"photo: 320"}, 0, 3, true},
+        DuePhase{"Phase1Outdated", kAllClasses, {"B"}, {}, {"XL: 640"}, 0, 1, true},
+        DuePhase{"Phase2Outdated", kAllClasses, {"S"}, {}, {"XL: 120"}, 1, 1, false},
+        DuePhase{"EarliestFirst", {"XL", "M"}, {"XL"}, {}, {"photo: 1280", "XL: 640"}, 0, 3, true}),
+    RowName<DuePhase>);
 
 TEST_F(PhaseChoice, ThumbnailOfOneByteMakesItsPhaseDue) {
-  // It is no file that has to be made again, but none that a complete phase may have either.
-  PutThumbs(kPhoto, {"XL", "M", "B", "S"});
-  Empty(Thumb(kPhoto, "M"), 1);
-  EXPECT_THAT(RunAndGetRequests(), ElementsAre(kQuestion, kReport));
-  EXPECT_EQ(3, Progress("completed_thumb"));
-  EXPECT_EQ("/tmp/photos\n", ReadFile(kQueue));
+  // A file of one byte is not made again, but its phase is not complete either.
+  PutThumbs(kPhoto, kAllClasses);
+  WriteFileOfSize(Thumb(kPhoto, "M"), 1);
+  EXPECT_THAT(RunAndGetRequests(), ElementsAre(kVersionRequest, kReport));
+  EXPECT_EQ(Progress("completed_thumb"), 3);
+  EXPECT_EQ(ReadFile(kQueue), "/tmp/photos\n");
 }
 
 TEST_F(PhaseChoice, ThumbnailOfTwoBytesIsComplete) {
-  PutThumbs(kPhoto, {"XL", "M", "B", "S"});
-  Empty(Thumb(kPhoto, "M"), 2);
+  PutThumbs(kPhoto, kAllClasses);
+  WriteFileOfSize(Thumb(kPhoto, "M"), 2);
   EXPECT_THAT(RunAndGetRequests(), ElementsAre(kReport));
 }
 
-TEST_F(PhaseChoice, OutdatedPhase0IsMadeAgainAndTheOthersBehindIt) {
-  PutThumbs(kPhoto, {"XL", "M", "B", "S"});
-  for (const char* sizeClass : {"XL", "M", "B", "S"}) {
-    MakeOld(Thumb(kPhoto, sizeClass));
+TEST_F(PhaseChoice, OutdatedPhotoIsMadeAgainInTwoRuns) {
+  PutThumbs(kPhoto, kAllClasses);
+  for (const std::string& sizeClass : kAllClasses) {
+    MakeOutdated(sizeClass);
   }
-  EXPECT_THAT(RunAndGetRequests(), ElementsAre(kQuestion, kReport));
+  EXPECT_THAT(RunAndGetRequests(), ElementsAre(kVersionRequest, kReport));
   EXPECT_THAT(Made(), ElementsAre("photo: 1280 320", "XL: 640"));
-  EXPECT_EQ(3, Progress("completed_thumb"));
-  EXPECT_THAT(RunAndGetRequests(), ElementsAre(kQuestion, kReport));
+  EXPECT_EQ(Progress("completed_thumb"), 3);
+  EXPECT_THAT(RunAndGetRequests(), ElementsAre(kVersionRequest, kReport));
   EXPECT_THAT(Made(), ElementsAre("photo: 1280 320", "XL: 640", "XL: 120"));
-  EXPECT_EQ(4, Progress("completed_thumb"));
-  EXPECT_EQ(1, Progress("completed"));
+  ExpectProgress(1, 4);
   EXPECT_THAT(RunAndGetRequests(), ElementsAre(kReport));
-}
-
-TEST_F(PhaseChoice, OneOutdatedThumbnailIsMadeAgain) {
-  PutThumbs(kPhoto, {"XL", "M", "B", "S"});
-  MakeOld(Thumb(kPhoto, "M"));
-  RunAndGetRequests();
-  EXPECT_THAT(Made(), ElementsAre("photo: 320"));
-}
-
-TEST_F(PhaseChoice, OutdatedPhase1IsMadeAgain) {
-  PutThumbs(kPhoto, {"XL", "M", "B", "S"});
-  MakeOld(Thumb(kPhoto, "B"));
-  RunAndGetRequests();
-  EXPECT_THAT(Made(), ElementsAre("XL: 640"));
-  EXPECT_EQ("/tmp/photos\n", ReadFile(kQueue));
-}
-
-TEST_F(PhaseChoice, OutdatedPhase2IsMadeAgain) {
-  PutThumbs(kPhoto, {"XL", "M", "B", "S"});
-  MakeOld(Thumb(kPhoto, "S"));
-  RunAndGetRequests();
-  EXPECT_THAT(Made(), ElementsAre("XL: 120"));
-  EXPECT_EQ(1, Progress("completed"));
-}
-
-TEST_F(PhaseChoice, EarlierPhaseComesFirst) {
-  PutThumbs(kPhoto, {"XL", "M"});
-  MakeOld(Thumb(kPhoto, "XL"));
-  RunAndGetRequests();
-  EXPECT_THAT(Made(), ElementsAre("photo: 1280", "XL: 640"));
 }
 
 TEST_F(PhaseChoice, ThumbnailOfThePhotosOwnSecondIsUpToDate) {
-  PutThumbs(kPhoto, {"XL", "M", "B", "S"});
+  PutThumbs(kPhoto, kAllClasses);
   const int64_t second = ModificationTime(kPhoto).seconds;
   SetFileTime(kPhoto, second, 999999999);
-  for (const char* sizeClass : {"XL", "M", "B", "S"}) {
+  for (const std::string& sizeClass : kAllClasses) {
     SetFileTime(Thumb(kPhoto, sizeClass), second, 0);
   }
   EXPECT_THAT(RunAndGetRequests(), ElementsAre(kReport));
 }
 
-TEST_F(PhaseChoice, OlderNamesAreAccepted) {
-  WriteProfileFile(kProfiles, {{"thumb_xl", 1280, 90, std::nullopt, "VELAPHOTO:THUMB_XL.jpg", 0},
-                               {"thumb_b", 640, 90, std::nullopt, "VELAPHOTO:THUMB_B.jpg", 1},
-                               {"thumb_s", 120, 90, std::nullopt, "VELAPHOTO:THUMB_S.jpg", 2}});
-  for (const char* sizeClass : {"XL", "B", "S"}) {
-    MakeDirectories(MetadataDirOf(kPhoto));
-    MakeJpeg(OldThumb(kPhoto, sizeClass));
+class OlderNames : public PhaseChoice {
+ protected:
+  void SetUp() override {
+    PhaseChoice::SetUp();
+    WriteProfileFile(kProfiles, {{"thumb_xl", 1280, 90, std::nullopt, "VELAPHOTO:THUMB_XL.jpg", 0},
+                                 {"thumb_b", 640, 90, std::nullopt, "VELAPHOTO:THUMB_B.jpg", 1},
+                                 {"thumb_s", 120, 90, std::nullopt, "VELAPHOTO:THUMB_S.jpg", 2}});
   }
+};
+
+TEST_F(OlderNames, AreAccepted) {
+  PutOldThumbs({"XL", "B", "S"});
   EXPECT_THAT(RunAndGetRequests(), ElementsAre(kReport));
   EXPECT_THAT(Made(), IsEmpty());
 }
 
-TEST_F(PhaseChoice, OlderNamesAreAcceptedByTheStatusWhateverTheProfilesSay) {
-  WriteFile(kSettings, kThreePhasesSizeMap);
-  MakeDirectories(MetadataDirOf(kPhoto));
-  for (const char* sizeClass : {"XL", "M", "B", "S"}) {
-    MakeJpeg(OldThumb(kPhoto, sizeClass));
-  }
-  EXPECT_THAT(RunAndGetRequests(), ElementsAre(kReport));
-  EXPECT_THAT(Made(), IsEmpty());
-}
-
-TEST_F(PhaseChoice, ReferenceMayHaveItsOlderName) {
-  WriteProfileFile(kProfiles, {{"thumb_xl", 1280, 90, std::nullopt, "VELAPHOTO:THUMB_XL.jpg", 0},
-                               {"thumb_b", 640, 90, std::nullopt, "VELAPHOTO:THUMB_B.jpg", 1}});
-  MakeDirectories(MetadataDirOf(kPhoto));
-  MakeJpeg(OldThumb(kPhoto, "XL"));
+TEST_F(OlderNames, AreAcceptedForTheReference) {
+  PutOldThumbs({"XL"});
   RunAndGetRequests();
   EXPECT_THAT(ConvertedSources(), ElementsAre(OldThumb(kPhoto, "XL")));
   EXPECT_TRUE(Exists(Thumb(kPhoto, "B")));
   EXPECT_FALSE(Exists(OldThumb(kPhoto, "B")));
 }
 
-TEST_F(PhaseChoice, CurrentNameOfTheReferenceComesFirst) {
-  WriteProfileFile(kProfiles, {{"thumb_xl", 1280, 90, std::nullopt, "VELAPHOTO:THUMB_XL.jpg", 0},
-                               {"thumb_b", 640, 90, std::nullopt, "VELAPHOTO:THUMB_B.jpg", 1}});
+TEST_F(OlderNames, AreUsedForTheReferenceAfterTheCurrentName) {
   PutThumbs(kPhoto, {"XL"});
-  MakeJpeg(OldThumb(kPhoto, "XL"));
+  PutOldThumbs({"XL"});
   RunAndGetRequests();
   EXPECT_THAT(ConvertedSources(), ElementsAre(Thumb(kPhoto, "XL")));
 }
 
 TEST_F(PhaseChoice, EachPhotoHasItsOwnPhase) {
-  MakePhoto("/tmp/photos/b.jpg");
-  MakePhoto("/tmp/photos/c.jpg");
-  MakePhoto("/tmp/photos/d.jpg");
+  MakePhotos({"b.jpg", "c.jpg", "d.jpg"});
   PutThumbs("/tmp/photos/b.jpg", {"XL", "M"});
   PutThumbs("/tmp/photos/c.jpg", {"XL", "M", "B"});
-  PutThumbs("/tmp/photos/d.jpg", {"XL", "M", "B", "S"});
-  EXPECT_THAT(RunAndGetRequests(), ElementsAre(kQuestion, kReport,                      //
+  PutThumbs("/tmp/photos/d.jpg", kAllClasses);
+  EXPECT_THAT(RunAndGetRequests(), ElementsAre(kVersionRequest, kReport,                //
                                                "GET_INDEX_VERSION /tmp/photos/b.jpg",   //
                                                "POST_PHOTO_CONVERT /tmp/photos/b.jpg",  //
                                                "GET_INDEX_VERSION /tmp/photos/c.jpg",   //
@@ -269,17 +222,16 @@ TEST_F(PhaseChoice, EachPhotoHasItsOwnPhase) {
   EXPECT_THAT(ConvertedSources(),
               ElementsAre(kPhoto, Thumb(kPhoto, "XL"), Thumb("/tmp/photos/b.jpg", "XL"),
                           Thumb("/tmp/photos/c.jpg", "XL")));
-  EXPECT_EQ(5, Progress("completed_thumb"));
-  EXPECT_EQ(1, Progress("completed"));
+  ExpectProgress(1, 5);
 }
 
-TEST_F(PhaseChoice, PhotoFromTheFutureIsDoneInTwoRunsToo) {
+TEST_F(PhaseChoice, PhotoFromTheFutureTakesTwoRunsToo) {
   SetFileTimeFromNow(kPhoto, 3600);
-  const int64_t second = ModificationTime(kPhoto).seconds;
-  EXPECT_THAT(RunAndGetRequests(), ElementsAre(kQuestion, kReport));
-  EXPECT_EQ((FileTime{second, 0}), ModificationTime(Thumb(kPhoto, "XL")));
-  EXPECT_EQ((FileTime{second, 0}), ModificationTime(Thumb(kPhoto, "B")));
-  EXPECT_THAT(RunAndGetRequests(), ElementsAre(kQuestion, kReport));
+  const FileTime second = {ModificationTime(kPhoto).seconds, 0};
+  EXPECT_THAT(RunAndGetRequests(), ElementsAre(kVersionRequest, kReport));
+  EXPECT_EQ(ModificationTime(Thumb(kPhoto, "XL")), second);
+  EXPECT_EQ(ModificationTime(Thumb(kPhoto, "B")), second);
+  EXPECT_THAT(RunAndGetRequests(), ElementsAre(kVersionRequest, kReport));
   EXPECT_THAT(RunAndGetRequests(), ElementsAre(kReport));
   EXPECT_THAT(Made(), ElementsAre("photo: 1280 320", "XL: 640", "XL: 120"));
 }

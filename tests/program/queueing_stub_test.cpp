@@ -1,132 +1,98 @@
 // The queue of directories that need a later run.
-#include <gmock/gmock.h>
-#include <gtest/gtest.h>
-
-#include <string>
-
-#include "program/callback_daemon.h"
 #include "program/stub_program_test.h"
-#include "support/files.h"
 #include "support/mounts.h"
-#include "support/system_log.h"
 
 namespace vela_test {
 namespace {
 
-using ::testing::ElementsAre;
-using ::testing::IsEmpty;
-
-class Queueing : public StubProgramTest {
- protected:
-  static std::string In(const std::string& name) { return std::string(kPhotos) + "/" + name; }
-};
+using Queueing = StubProgramTest;
 
 TEST_F(Queueing, ADirectoryIsWrittenOnceHoweverManyPhotosNeedIt) {
-  for (const char* name : {"a.jpg", "b.jpg", "c.jpg"}) {
-    MakePhoto(In(name));
-  }
-  EXPECT_GOOD_END(Run());
-  EXPECT_EQ("/tmp/photos\n", ReadFile(kQueue));
-  EXPECT_EQ(0644, ModeOf(kQueue));
+  MakePhotos({"a.jpg", "b.jpg", "c.jpg"});
+  EXPECT_SUCCESS(Run());
+  EXPECT_EQ(ReadFile(kQueue), "/tmp/photos\n");
+  EXPECT_EQ(ModeOf(kQueue), 0644);
 }
 
 TEST_F(Queueing, OnePhotoOfSeveralIsEnough) {
-  for (const char* name : {"a.jpg", "b.jpg", "c.jpg"}) {
-    MakePhoto(In(name));
-  }
-  PutThumbs(In("c.jpg"), {"XL", "M", "B"});
-  Converter().PlanWhen(In("b.jpg"), StubPlan().Exit(1));
-  EXPECT_GOOD_END(Run());
-  EXPECT_EQ("/tmp/photos\n", ReadFile(kQueue));
+  MakePhotos({"a.jpg", "b.jpg", "c.jpg"});
+  PutThumbs(InPhotos("c.jpg"), {"XL", "M", "B"});
+  Converter().PlanWhen(InPhotos("b.jpg"), StubPlan().Exit(1));
+  EXPECT_SUCCESS(Run());
+  EXPECT_EQ(ReadFile(kQueue), "/tmp/photos\n");
 }
 
 TEST_F(Queueing, IsNotDoneWithoutPhase1) {
-  for (const char* name : {"a.jpg", "b.jpg", "c.jpg"}) {
-    MakePhoto(In(name));
-  }
-  PutThumbs(In("a.jpg"), {"XL", "M", "B"});
-  PutThumbs(In("c.jpg"), {"XL", "M", "B", "S"});
-  Converter().PlanWhen(In("b.jpg"), StubPlan().Exit(1));
-  EXPECT_GOOD_END(Run());
+  MakePhotos({"a.jpg", "b.jpg", "c.jpg"});
+  PutThumbs(InPhotos("a.jpg"), {"XL", "M", "B"});
+  PutThumbs(InPhotos("c.jpg"), {"XL", "M", "B", "S"});
+  Converter().PlanWhen(InPhotos("b.jpg"), StubPlan().Exit(1));
+  EXPECT_SUCCESS(Run());
   EXPECT_FALSE(Exists(kQueue));
 }
 
 TEST_F(Queueing, IsDoneAtTheEndOfThePass) {
-  MakePhoto(In("a.jpg"));
-  MakePhoto(In("b.jpg"));
+  MakePhotos({"a.jpg", "b.jpg"});
   bool early = false;
-  CallbackDaemon daemon([&](const std::string&, const std::string&) {
-    early = early || Exists(kQueue);
-    return kDone;
-  });
-  EXPECT_GOOD_END(Run());
-  daemon.Stop();
+  RunAndLook([&](const std::string&) { early = early || Exists(kQueue); });
   EXPECT_FALSE(early);
   EXPECT_TRUE(Exists(kQueue));
 }
 
 TEST_F(Queueing, IsDoneForEachDirectoryAtItsEnd) {
-  MakePhoto("/tmp/1/a.jpg");
-  MakePhoto("/tmp/2/a.jpg");
-  MakePhoto("/tmp/3/a.jpg");
+  MakePhotosIn({"/tmp/1", "/tmp/2", "/tmp/3"});
   PutThumbs("/tmp/2/a.jpg", {"XL", "M", "B"});
   Converter().PlanWhen(Thumb("/tmp/2/a.jpg", "XL"),
                        StubPlan().WriteOutputs().Run("/bin/cp", {kQueue, "/tmp/queue"}).Exit(0));
-  EXPECT_GOOD_END(Run({"/tmp/1", "/tmp/2", "R:/tmp/3"}));
-  EXPECT_EQ("/tmp/1\n", ReadFile("/tmp/queue"));
-  EXPECT_EQ("/tmp/1\n/tmp/3\n", ReadFile(kQueue));
+  EXPECT_SUCCESS(Run({"/tmp/1", "/tmp/2", "R:/tmp/3"}));
+  EXPECT_EQ(ReadFile("/tmp/queue"), "/tmp/1\n");
+  EXPECT_EQ(ReadFile(kQueue), "/tmp/1\n/tmp/3\n");
 }
 
 TEST_F(Queueing, AddsToWhatIsThere) {
-  MakePhoto(In("a.jpg"));
+  MakePhoto(InPhotos("a.jpg"));
   WriteFile(kQueue, "/somewhere/else\nR:/a/tree\n");
-  EXPECT_GOOD_END(Run());
-  EXPECT_EQ("/somewhere/else\nR:/a/tree\n/tmp/photos\n", ReadFile(kQueue));
+  EXPECT_SUCCESS(Run());
+  EXPECT_EQ(ReadFile(kQueue), "/somewhere/else\nR:/a/tree\n/tmp/photos\n");
 }
 
 TEST_F(Queueing, TouchesNoOtherFileOfTheSpoolDirectory) {
-  MakePhoto(In("a.jpg"));
-  EXPECT_GOOD_END(Run());
+  MakePhoto(InPhotos("a.jpg"));
+  EXPECT_SUCCESS(Run());
   EXPECT_THAT(ListDirectory("/var/spool"),
               ElementsAre("conv_progress_photo", "thumb_create.queue"));
 }
 
 TEST_F(Queueing, FailureIsLogged) {
-  const DaemonPeer daemon;
-  MakePhoto(In("a.jpg"));
+  MakePhoto(InPhotos("a.jpg"));
   MakeDirectories(kQueue);
-  EXPECT_GOOD_END(Run());
+  RunWithDaemon();
   EXPECT_THAT(ErrorLines(),
               ElementsAre("velathumb:1112 Failed to write [/tmp/photos] to thumb queue"));
   EXPECT_TRUE(HeldLock("/tmp/photos/@eaDir").IsHeld());
 }
 
 TEST_F(Queueing, FailureDoesNotStopTheNextDirectory) {
-  const DaemonPeer daemon;
-  MakePhoto("/tmp/1/a.jpg");
-  MakePhoto("/tmp/2%s/a.jpg");
+  MakePhotosIn({"/tmp/1", "/tmp/2%s"});
   MakeDirectories(kQueue);
-  EXPECT_GOOD_END(Run({"/tmp/1", "/tmp/2%s"}));
-  EXPECT_THAT(ReportedPhotos(daemon), ElementsAre("/tmp/1/a.jpg", "/tmp/2%s/a.jpg"));
+  EXPECT_THAT(ReportedPhotos(RunWithDaemon({"/tmp/1", "/tmp/2%s"})),
+              ElementsAre("/tmp/1/a.jpg", "/tmp/2%s/a.jpg"));
   EXPECT_THAT(ErrorLines(),
               ElementsAre("velathumb:1112 Failed to write [/tmp/1] to thumb queue",
                           "velathumb:1112 Failed to write [/tmp/2%s] to thumb queue"));
 }
 
 TEST_F(Queueing, DirectoryThatNoLineCanHoldIsLogged) {
-  const DaemonPeer daemon;
   MakePhoto("/tmp/two\nlines/a.jpg");
-  EXPECT_GOOD_END(Run({"/tmp/two\nlines"}));
+  RunWithDaemon({"/tmp/two\nlines"});
   EXPECT_THAT(ErrorLines(),
               ElementsAre("velathumb:1112 Failed to write [/tmp/two\nlines] to thumb queue"));
 }
 
 TEST_F(Queueing, ReadOnlySpoolDirectoryIsLoggedThroughout) {
-  const DaemonPeer daemon;
-  MakePhoto(In("a.jpg"));
+  MakePhoto(InPhotos("a.jpg"));
   const ReadOnlyMount mount("/var/spool");
-  EXPECT_GOOD_END(Run());
-  EXPECT_THAT(ReportedPhotos(daemon), ElementsAre(In("a.jpg")));
+  EXPECT_THAT(ReportedPhotos(RunWithDaemon()), ElementsAre(InPhotos("a.jpg")));
   const std::string progress =
       "velamk_progress:115 VLIBCFileSetKeyValue fail: /var/spool/conv_progress_photo";
   EXPECT_THAT(ErrorLines(),

@@ -1,23 +1,15 @@
 // Thumbnails of camera raw photos, with the real tools.
-#include <gmock/gmock.h>
+
+#include <optional>
 
 #include "program/real_program_test.h"
-#include "support/build_paths.h"
-#include "support/daemon_peer.h"
-#include "support/images.h"
-#include "support/raw_photos.h"
-#include "support/stub_tool.h"
-#include "support/system_log.h"
 
 namespace vela_test::real {
 
 namespace {
 
-using ::testing::ElementsAre;
-using ::testing::IsEmpty;
-
-std::vector<std::vector<std::string>> ParametersOf(const StubTool& tool) {
-  std::vector<std::vector<std::string>> parameters;
+std::vector<Strings> ParametersOf(const StubTool& tool) {
+  std::vector<Strings> parameters;
   for (const StubCall& call : tool.Calls()) {
     parameters.push_back(call.Parameters());
   }
@@ -29,20 +21,7 @@ class RawThumbs : public RealProgramTest {
   void SetUp() override {
     RealProgramTest::SetUp();
     InstallRealExiftool();
-  }
-
-  /// A raw photo of the quadrants, larger than every thumbnail; its preview is as large as the
-  /// largest when it has one.
-  static RawRecipe Recipe(bool hasPreview) {
-    RawRecipe recipe;
-    recipe.width = 240;
-    recipe.height = 160;
-    if (hasPreview) {
-      recipe.preview.emplace();
-      recipe.preview->width = 120;
-      recipe.preview->height = 80;
-    }
-    return recipe;
+    daemon_.emplace();
   }
 
   static std::string MakeRaw(const RawRecipe& recipe, const std::string& name = "a.dng") {
@@ -51,13 +30,13 @@ class RawThumbs : public RealProgramTest {
     return InPhotos(name);
   }
 
-  /// All thumbnails are there and show this; nothing else is left beside them.
+  /// All thumbnails are there and show these quadrants; there are no other files.
   void ExpectThumbs(const std::string& photo, const std::string& letters) const {
     EXPECT_TRUE(HasThumbs(photo, kinds_));
     for (const Kind& kind : kinds_) {
       EXPECT_EQ(QuadrantLetters(ThumbOf(photo, kind)), letters) << kind.name;
     }
-    EXPECT_EQ(ListDirectory(MetadataOf(photo)).size(), kinds_.size());
+    EXPECT_THAT(ListDirectory(MetadataDirOf(photo)), SizeIs(kinds_.size()));
   }
 
   void ExpectMade(const RawRecipe& recipe, const std::string& letters) {
@@ -65,7 +44,7 @@ class RawThumbs : public RealProgramTest {
     Make();
     EXPECT_TRUE(HasThumbs(photo, OfPhase(kinds_, 0)));
     EXPECT_TRUE(HasThumbs(photo, OfPhase(kinds_, 1)));
-    EXPECT_EQ(ListDirectory(MetadataOf(photo)).size(), 4U);
+    EXPECT_EQ(ListDirectory(MetadataDirOf(photo)).size(), 4U);
     EXPECT_EQ(Progress("completed"), 0);
     EXPECT_EQ(Progress("completed_thumb"), 4);
     Make();
@@ -74,15 +53,16 @@ class RawThumbs : public RealProgramTest {
     EXPECT_EQ(Progress("completed_thumb"), 6);
     ExpectNothingLeftToMake();
   }
+
+  std::optional<DaemonPeer> daemon_;
 };
 
 }  // namespace
 
 TEST_F(RawThumbs, AreMadeOfTheFullDecode) {
-  const DaemonPeer daemon;
   const StubTool dcraw(kDcrawPath);
   dcraw.Plan(StubPlan().PassThrough(HostPath(kDcrawPath)));
-  ExpectMade(Recipe(false), "RGBY");
+  ExpectMade(RawRecipeOf(), "RGBY");
   const std::string photo = InPhotos("a.dng");
   // Later phases do not decode again.
   EXPECT_THAT(ParametersOf(dcraw),
@@ -92,21 +72,19 @@ TEST_F(RawThumbs, AreMadeOfTheFullDecode) {
 }
 
 TEST_F(RawThumbs, AreMadeOfThePreview) {
-  const DaemonPeer daemon;
   const StubTool dcraw(kDcrawPath);
   dcraw.Plan(StubPlan().PassThrough(HostPath(kDcrawPath)));
-  ExpectMade(Recipe(true), "RGBY");
+  ExpectMade(RawRecipeOf(120, 80), "RGBY");
   const std::string photo = InPhotos("a.dng");
   EXPECT_THAT(ParametersOf(dcraw),
               ElementsAre(ElementsAre("-e", "-c", photo), ElementsAre("-i", "-v", photo)));
   EXPECT_THAT(ErrorLines(), IsEmpty());
 }
 
-TEST_F(RawThumbs, StandAsThePhotoWasHeld) {
-  const DaemonPeer daemon;
+TEST_F(RawThumbs, AreOrientedAsThePhoto) {
   for (const bool hasPreview : {false, true}) {
     for (const int orientation : {1, 3, 6, 8}) {
-      RawRecipe recipe = Recipe(hasPreview);
+      RawRecipe recipe = hasPreview ? RawRecipeOf(120, 80) : RawRecipeOf();
       recipe.orientation = orientation;
       MakeRaw(recipe, std::to_string(orientation) + (hasPreview ? "p.dng" : ".dng"));
     }
@@ -120,21 +98,19 @@ TEST_F(RawThumbs, StandAsThePhotoWasHeld) {
   }
 }
 
-TEST_F(RawThumbs, StandAsTheTagOfAnUprightPreviewSays) {
-  const DaemonPeer daemon;
-  RawRecipe recipe = Recipe(true);
+TEST_F(RawThumbs, AreTurnedAsTheTagOfAnUprightPreviewSays) {
+  RawRecipe recipe = RawRecipeOf(120, 80);
   recipe.rotation = 270;
   ExpectMade(recipe, LettersAfterTurn(270));
   EXPECT_THAT(ErrorLines(),
-              ElementsAre("velathumb:650 Failed to rotate " + MetadataOf(InPhotos("a.dng")) +
+              ElementsAre("velathumb:650 Failed to rotate " + MetadataDirOf(InPhotos("a.dng")) +
                           "/VELAPHOTO_THUMB_RAW.jpg to 270 degree"));
 }
 
 TEST_F(RawThumbs, OfDamagedPhotosAreMarkedAndTheNextPhotoIsMade) {
-  const DaemonPeer daemon;
   WriteFile(InPhotos("a.nef"), "no photo");
   WriteFile(InPhotos("b.dng"), "");
-  const std::string good = MakeRaw(Recipe(false), "c.dng");
+  const std::string good = MakeRaw(RawRecipeOf(), "c.dng");
   const std::string folder = SharedMediaDirectory();
   const bool hasCamera = IsRegularFile(folder + "/camera_raw.crw");
   if (hasCamera) {
@@ -155,7 +131,7 @@ TEST_F(RawThumbs, OfDamagedPhotosAreMarkedAndTheNextPhotoIsMade) {
   if (hasCamera) {
     EXPECT_TRUE(HasThumbs(InPhotos("d.crw"), kinds_));
   }
-  // Whatever became of the cut ones: what they were decoded to is gone.
+  // The decoded copies are gone, also those of the truncated photos.
   for (const std::string& path : ListTree(kPhotos)) {
     EXPECT_EQ(path.find("RAW"), std::string::npos) << path;
     EXPECT_EQ(path.find("Temp_"), std::string::npos) << path;

@@ -1,12 +1,8 @@
 // A photo whose owner turned its thumbnails keeps them turned when they are made again, with the
 // real tools.
+#include <optional>
+
 #include "program/real_program_test.h"
-#include "support/build_paths.h"
-#include "support/daemon_peer.h"
-#include "support/images.h"
-#include "support/raw_photos.h"
-#include "support/stub_tool.h"
-#include "support/system_log.h"
 
 namespace vela_test::real {
 
@@ -17,17 +13,15 @@ class TurnedThumbs : public RealProgramTest, public ::testing::WithParamInterfac
   void SetUp() override {
     RealProgramTest::SetUp();
     InstallRealExiftool();
+    daemon_.emplace();
+    daemon_->SetIndexVersion(1);
     kinds_ = {{"XL", 120, true, 0}, {"L", 100, true, 1}, {"B", 80, false, 2}};
     WriteKinds(kProfiles, kinds_);
   }
 
-  static void DateBack(const std::string& photo, int seconds) {
-    SetFileTimeFromNow(photo, -seconds);
-  }
-
-  /// Makes everything; then the owner turns all thumbnails, and that a while ago.
+  /// Makes everything, then turns all thumbnails as their owner and dates them back.
   void MakeAndTurn(const std::string& photo) {
-    DateBack(photo, 3000);
+    SetFileTimeFromNow(photo, -3000);
     Make();
     Make();
     ASSERT_TRUE(HasThumbs(photo, kinds_));
@@ -38,9 +32,9 @@ class TurnedThumbs : public RealProgramTest, public ::testing::WithParamInterfac
     }
   }
 
-  /// The photo is touched after that; every thumbnail is made anew and stands as its owner wanted.
+  /// Touches the photo; every thumbnail is made again and keeps the turn of its owner.
   void TouchAndExpectTurn(const std::string& photo) {
-    DateBack(photo, 1000);
+    SetFileTimeFromNow(photo, -1000);
     const auto before = ThumbsBelow(kPhotos);
     Make();
     Make();
@@ -52,73 +46,44 @@ class TurnedThumbs : public RealProgramTest, public ::testing::WithParamInterfac
       ASSERT_EQ(after.count(path), 1U);
       EXPECT_FALSE(before.at(path) == after.at(path)) << "it is the old one";
     }
-    EXPECT_EQ(ListDirectory(MetadataOf(photo)).size(), kinds_.size());
-    EXPECT_EQ(ErrorLines(), std::vector<std::string>());
+    EXPECT_THAT(ListDirectory(MetadataDirOf(photo)), SizeIs(kinds_.size()));
+    EXPECT_THAT(ErrorLines(), IsEmpty());
     ExpectNothingLeftToMake();
   }
 
-  static std::string PhotoOf(int width, int height, int quality = 95) {
-    JpegRecipe recipe;
-    recipe.width = width;
-    recipe.height = height;
-    recipe.quality = quality;
-    return MakeJpeg(InPhotos("a.jpg"), recipe);
+  void ExpectTurnKept(const std::string& photo) {
+    MakeAndTurn(photo);
+    TouchAndExpectTurn(photo);
   }
 
-  static std::string RawPhoto(bool hasPreview) {
-    RawRecipe recipe;
-    recipe.width = 240;
-    recipe.height = 160;
-    if (hasPreview) {
-      recipe.preview.emplace();
-      recipe.preview->width = 240;
-      recipe.preview->height = 160;
-    }
-    return MakeRawPhoto(InPhotos("a.dng"), recipe);
-  }
+  std::optional<DaemonPeer> daemon_;
 };
 
 }  // namespace
 
 TEST_P(TurnedThumbs, OfALandscape) {
-  DaemonPeer daemon;
-  daemon.SetIndexVersion(1);
-  const std::string photo = PhotoOf(240, 160);
-  MakeAndTurn(photo);
-  TouchAndExpectTurn(photo);
+  ExpectTurnKept(MakeJpeg(InPhotos("a.jpg"), RecipeOf(240, 160)));
 }
 
 TEST_P(TurnedThumbs, OfAPortrait) {
-  DaemonPeer daemon;
-  daemon.SetIndexVersion(1);
-  const std::string photo = PhotoOf(160, 240);
-  MakeAndTurn(photo);
-  TouchAndExpectTurn(photo);
+  ExpectTurnKept(MakeJpeg(InPhotos("a.jpg"), RecipeOf(160, 240)));
 }
 
-TEST_P(TurnedThumbs, OfAPhotoThatIsSavedAnew) {
-  DaemonPeer daemon;
-  daemon.SetIndexVersion(1);
-  const std::string photo = PhotoOf(240, 160);
+TEST_P(TurnedThumbs, OfAPhotoThatIsSavedAgain) {
+  JpegRecipe recipe = RecipeOf(240, 160);
+  const std::string photo = MakeJpeg(InPhotos("a.jpg"), recipe);
   MakeAndTurn(photo);
-  PhotoOf(240, 160, 50);
+  recipe.quality = 50;
+  MakeJpeg(photo, recipe);
   TouchAndExpectTurn(photo);
 }
 
 TEST_P(TurnedThumbs, OfARawPhotoWithAPreview) {
-  DaemonPeer daemon;
-  daemon.SetIndexVersion(1);
-  const std::string photo = RawPhoto(true);
-  MakeAndTurn(photo);
-  TouchAndExpectTurn(photo);
+  ExpectTurnKept(MakeRawPhoto(InPhotos("a.dng"), RawRecipeOf(240, 160)));
 }
 
 TEST_P(TurnedThumbs, OfARawPhotoWithoutPreview) {
-  DaemonPeer daemon;
-  daemon.SetIndexVersion(1);
-  const std::string photo = RawPhoto(false);
-  MakeAndTurn(photo);
-  TouchAndExpectTurn(photo);
+  ExpectTurnKept(MakeRawPhoto(InPhotos("a.dng"), RawRecipeOf()));
 }
 
 INSTANTIATE_TEST_SUITE_P(Degrees, TurnedThumbs, ::testing::Values(0, 90, 180, 270));

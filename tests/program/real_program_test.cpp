@@ -10,9 +10,6 @@
 #include <ostream>
 #include <thread>
 
-#include "support/build_paths.h"
-#include "support/stub_tool.h"
-
 namespace vela_test::real {
 
 namespace {
@@ -118,17 +115,12 @@ std::string WriteKinds(const std::string& path, const std::vector<Kind>& kinds) 
   return WriteProfileFile(path, sections);
 }
 
-std::string MetadataOf(const std::string& photo) {
-  const size_t slash = photo.rfind('/');
-  return photo.substr(0, slash) + "/@eaDir" + photo.substr(slash);
-}
-
 std::string ThumbOf(const std::string& photo, const Kind& kind) {
-  return MetadataOf(photo) + "/VELAPHOTO_THUMB_" + kind.name + ".jpg";
+  return Thumb(photo, kind.name);
 }
 
 std::string MarkerOf(const std::string& photo, const Kind& kind) {
-  return MetadataOf(photo) + "/VELAPHOTO_THUMB_" + kind.name + ".fail";
+  return Marker(photo, kind.name);
 }
 
 bool operator==(const PhotoState& a, const PhotoState& b) {
@@ -213,20 +205,6 @@ std::map<std::string, ThumbState> ThumbsBelow(const std::string& directory) {
   return ::testing::AssertionSuccess();
 }
 
-int Progress(const std::string& key) {
-  const std::string file = "/var/spool/conv_progress_photo";
-  if (!Exists(file)) {
-    return 0;
-  }
-  const std::string beginning = key + "=\"";
-  for (const std::string& line : ReadLines(file)) {
-    if (line.compare(0, beginning.size(), beginning) == 0) {
-      return std::atoi(line.c_str() + beginning.size());
-    }
-  }
-  return 0;
-}
-
 std::vector<pid_t> ProcessesCalled(const std::string& name) {
   std::vector<pid_t> found;
   for (const std::string& entry : ListDirectory("/proc")) {
@@ -248,8 +226,8 @@ bool WaitUntilNoneIsCalled(const std::string& name, int milliseconds) {
   return true;
 }
 
-std::vector<std::string> PidFiles() {
-  std::vector<std::string> found;
+Strings PidFiles() {
+  Strings found;
   for (const std::string& name : ListDirectory("/var/run")) {
     if (name.compare(0, 10, "velathumb.") == 0) {
       found.push_back(name);
@@ -258,7 +236,7 @@ std::vector<std::string> PidFiles() {
   return found;
 }
 
-void Draw(const std::vector<std::string>& arguments) {
+void Draw(const Strings& arguments) {
   const ProgramResult result = RunProgram(kImageMagickPath, arguments);
   EXPECT_EQ(result.exitCode, 0) << result.err;
 }
@@ -273,6 +251,24 @@ void MakePlainPhoto(const std::string& path, int paletteIndex, int width, int he
         "xc:" + HexColour(PaletteColour(paletteIndex)), "-colorspace", "sRGB", plainName});
   CopyFile(plainName, path);
   RemoveTree(plainName);
+}
+
+JpegRecipe RecipeOf(int width, int height, int orientation) {
+  JpegRecipe recipe;
+  recipe.width = width;
+  recipe.height = height;
+  recipe.orientation = orientation;
+  return recipe;
+}
+
+RawRecipe RawRecipeOf(int previewWidth, int previewHeight) {
+  RawRecipe recipe;
+  recipe.width = 240;
+  recipe.height = 160;
+  if (previewWidth > 0) {
+    recipe.preview = RecipeOf(previewWidth, previewHeight);
+  }
+  return recipe;
 }
 
 int PaletteIndexOf(const std::string& thumb) {
@@ -300,18 +296,15 @@ void RealProgramTest::SetUp() {
   MakeDirectories(kPhotos);
 }
 
-void RealProgramTest::Make(const std::vector<std::string>& directories,
-                           const ProgramOptions& options) {
+void RealProgramTest::Make(const Strings& directories, const ProgramOptions& options) {
   const auto before = PhotosBelow(kPhotos);
-  std::vector<std::string> arguments = {kProfiles};
-  arguments.insert(arguments.end(), directories.begin(), directories.end());
-  const ProgramResult result = RunProgram(VelathumbPath(), arguments, options);
+  const ProgramResult result = RunProgram(VelathumbPath(), ArgumentsFor(directories), options);
   EXPECT_EQ(result.exitCode, 0) << result.err;
   EXPECT_EQ(result.err, "");
   EXPECT_TRUE(PhotosBelow(kPhotos) == before) << "the run touched a photo";
 }
 
-void RealProgramTest::ExpectNothingLeftToMake(const std::vector<std::string>& directories) {
+void RealProgramTest::ExpectNothingLeftToMake(const Strings& directories) {
   const auto before = ThumbsBelow(kPhotos);
   Make(directories);
   EXPECT_EQ(ThumbsBelow(kPhotos), before);

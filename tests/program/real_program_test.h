@@ -1,6 +1,7 @@
 // Fixture for tests of the whole program with the real converter on real images.
 #pragma once
 
+#include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <sys/types.h>
 
@@ -9,17 +10,26 @@
 #include <string>
 #include <vector>
 
+#include "program/program_paths.h"
+#include "support/build_paths.h"
+#include "support/daemon_peer.h"
 #include "support/files.h"
 #include "support/image_checks.h"
+#include "support/images.h"
 #include "support/profile_file.h"
 #include "support/program.h"
+#include "support/raw_photos.h"
 #include "support/sandbox.h"
+#include "support/stub_tool.h"
+#include "support/system_log.h"
 
 namespace vela_test::real {
 
-constexpr const char* kPhotos = "/tmp/photos";
-constexpr const char* kProfiles = "/tmp/profiles.conf";
-constexpr const char* kQueue = "/var/spool/thumb_create.queue";
+using ::testing::ElementsAre;
+using ::testing::IsEmpty;
+using ::testing::SizeIs;
+
+using Strings = std::vector<std::string>;
 
 /// One thumbnail that a profile file asks for.
 struct Kind {
@@ -40,8 +50,7 @@ std::vector<Kind> OfPhase(const std::vector<Kind>& kinds, int phase);
 
 std::string WriteKinds(const std::string& path, const std::vector<Kind>& kinds);
 
-/// Paths that belong to a photo.
-std::string MetadataOf(const std::string& photo);
+/// Thumbnail and failure marker of a photo.
 std::string ThumbOf(const std::string& photo, const Kind& kind);
 std::string MarkerOf(const std::string& photo, const Kind& kind);
 
@@ -56,7 +65,7 @@ void PrintTo(const PhotoState& state, std::ostream* out);
 /// Every file below `directory` that is not in a metadata directory, by its relative path.
 std::map<std::string, PhotoState> PhotosBelow(const std::string& directory);
 
-/// What tells a thumbnail from one that was made anew.
+/// What differs in a thumbnail that was made again.
 struct ThumbState {
   ino_t inode = 0;
   FileTime modified;
@@ -76,9 +85,6 @@ std::map<std::string, ThumbState> ThumbsBelow(const std::string& directory);
 /// Whether each kind has an empty failure marker and no thumbnail.
 ::testing::AssertionResult IsMarkedFailed(const std::string& photo, const std::vector<Kind>& kinds);
 
-/// Photo progress: the value of a key, 0 when it is not there.
-int Progress(const std::string& key);
-
 /// Processes of the sandbox by their command name.
 std::vector<pid_t> ProcessesCalled(const std::string& name);
 
@@ -91,11 +97,17 @@ std::vector<std::string> PidFiles();
 /// Runs ImageMagick with these arguments; a failure fails the test.
 void Draw(const std::vector<std::string>& arguments);
 
-/// Colours that can be told from one another after any conversion; `index` below 125.
+/// Colours that can be distinguished after any conversion; `index` below 125.
 Rgb PaletteColour(int index);
 
 /// Makes a photo of one palette colour under any name with the extension of a format.
 void MakePlainPhoto(const std::string& path, int paletteIndex, int width = 160, int height = 120);
+
+/// A JPEG of this size.
+JpegRecipe RecipeOf(int width, int height, int orientation = 0);
+
+/// A raw photo of 240 x 160 pixels, without preview or with one of this size.
+RawRecipe RawRecipeOf(int previewWidth = 0, int previewHeight = 0);
 
 /// Index of the palette colour that the whole thumbnail shows, -1 when it shows several or is no
 /// whole JPEG.
@@ -114,9 +126,6 @@ class RealProgramTest : public SandboxTest {
 
   /// Makes a run over everything below kPhotos, which must leave each thumbnail as it is.
   void ExpectNothingLeftToMake(const std::vector<std::string>& directories = {kPhotos});
-
-  /// A path in kPhotos.
-  static std::string InPhotos(const std::string& name) { return std::string(kPhotos) + "/" + name; }
 
   std::vector<Kind> kinds_;
 };

@@ -4,16 +4,10 @@
 #include <sys/file.h>
 #include <unistd.h>
 
-#include <algorithm>
-#include <cctype>
 #include <chrono>
-#include <cstddef>
-#include <cstdlib>
 #include <thread>
 
-#include "platform/vlibc.h"
 #include "support/build_paths.h"
-#include "support/files.h"
 #include "support/images.h"
 
 namespace vela_test {
@@ -34,10 +28,8 @@ std::string StringMember(const std::string& json, const std::string& name) {
   return json.substr(valueBegin, json.find('"', valueBegin) - valueBegin);
 }
 
-std::vector<std::string> Arguments(const std::vector<std::string>& directories) {
-  std::vector<std::string> arguments = {kProfiles};
-  arguments.insert(arguments.end(), directories.begin(), directories.end());
-  return arguments;
+std::string RequestText(const DaemonRequest& request) {
+  return request.command + " " + StringMember(request.bytes, "path");
 }
 
 }  // namespace
@@ -49,21 +41,9 @@ std::vector<ProfileSection> ThreePhases() {
           {"thumb_m", 320, 75, std::nullopt, "VELAPHOTO_THUMB_M.jpg", 0}};
 }
 
-std::string MetadataDirOf(const std::string& photo) {
-  const size_t slash = photo.rfind('/');
-  return photo.substr(0, slash) + "/@eaDir" + photo.substr(slash);
-}
-
-std::string Thumb(const std::string& photo, const std::string& sizeClass) {
-  return MetadataDirOf(photo) + "/VELAPHOTO_THUMB_" + sizeClass + ".jpg";
-}
-
-std::string OldThumb(const std::string& photo, const std::string& sizeClass) {
-  return MetadataDirOf(photo) + "/VELAPHOTO:THUMB_" + sizeClass + ".jpg";
-}
-
-std::string Marker(const std::string& photo, const std::string& sizeClass) {
-  return MetadataDirOf(photo) + "/VELAPHOTO_THUMB_" + sizeClass + ".fail";
+ProfileSection Profile(const std::string& sizeClass, int size, int phase) {
+  return {
+      "thumb_" + sizeClass, size, 80, std::nullopt, "VELAPHOTO_THUMB_" + sizeClass + ".jpg", phase};
 }
 
 std::string MakePhoto(const std::string& path) {
@@ -72,38 +52,49 @@ std::string MakePhoto(const std::string& path) {
   return path;
 }
 
-void PutThumbs(const std::string& photo, const std::vector<std::string>& sizeClasses) {
+void MakePhotos(const Strings& names) {
+  for (const std::string& name : names) {
+    MakePhoto(InPhotos(name));
+  }
+}
+
+void MakePhotosIn(const Strings& directories) {
+  for (const std::string& directory : directories) {
+    MakePhoto(directory + "/a.jpg");
+  }
+}
+
+void PutThumbs(const std::string& photo, const Strings& sizeClasses) {
   for (const std::string& sizeClass : sizeClasses) {
     MakeDirectories(MetadataDirOf(photo));
     MakeJpeg(Thumb(photo, sizeClass));
   }
 }
 
-std::vector<std::string> MetadataOf(const std::string& photo) {
+Strings MetadataOf(const std::string& photo) {
   return ListDirectory(MetadataDirOf(photo));
 }
 
-int Progress(const std::string& key) {
-  char value[64] = "";
-  VLIBCFileGetKeyValue(kPhotoProgress, key.c_str(), value, sizeof value, 0);
-  return std::atoi(value);
-}
-
-std::vector<std::string> ProgressKeys() {
-  std::vector<std::string> keys;
+Strings ProgressKeys() {
+  Strings keys;
   for (const std::string& line : ReadLines(kPhotoProgress)) {
     keys.push_back(line.substr(0, line.find_first_of(" =")));
   }
   return keys;
 }
 
+void ExpectProgress(int completed, int completedThumb) {
+  EXPECT_EQ(Progress("completed"), completed);
+  EXPECT_EQ(Progress("completed_thumb"), completedThumb);
+}
+
 std::string SourceOf(const StubCall& call) {
-  const std::vector<std::string> parameters = call.Parameters();
+  const Strings parameters = call.Parameters();
   return parameters.size() > 2 && parameters[0] == "-define" ? parameters[2] : "";
 }
 
-std::vector<std::string> ConvertedSources() {
-  std::vector<std::string> sources;
+Strings ConvertedSources() {
+  Strings sources;
   for (const StubCall& call : AllStubCalls()) {
     if (call.path == kConverterPath) {
       sources.push_back(SourceOf(call));
@@ -112,41 +103,41 @@ std::vector<std::string> ConvertedSources() {
   return sources;
 }
 
-std::vector<std::string> WithoutRandomNames(std::vector<std::string> arguments) {
-  const std::string beginning = "/VELAPHOTO.tmp.";
-  const std::string end = ".jpg";
-  constexpr size_t kRandomLength = 6;
-  for (std::string& argument : arguments) {
-    const size_t at = argument.rfind(beginning);
-    if (at == std::string::npos ||
-        argument.size() != at + beginning.size() + kRandomLength + end.size()) {
-      continue;
-    }
-    const auto random = argument.begin() + static_cast<std::ptrdiff_t>(at + beginning.size());
-    if (std::all_of(random, random + kRandomLength,
-                    [](unsigned char c) { return std::isalnum(c); })) {
-      std::fill(random, random + kRandomLength, '?');
-    }
-  }
-  return arguments;
-}
-
-std::vector<std::string> RequestsOf(const DaemonPeer& daemon) {
-  std::vector<std::string> requests;
+Strings RequestsOf(const DaemonPeer& daemon) {
+  Strings requests;
   for (const DaemonRequest& request : daemon.Requests()) {
-    requests.push_back(request.command + " " + StringMember(request.bytes, "path"));
+    requests.push_back(RequestText(request));
   }
   return requests;
 }
 
-std::vector<std::string> ReportedPhotos(const DaemonPeer& daemon) {
-  std::vector<std::string> photos;
-  for (const DaemonRequest& request : daemon.Requests()) {
-    if (request.command == "POST_PHOTO_CONVERT") {
-      photos.push_back(StringMember(request.bytes, "path"));
+Strings ReportedPhotos(const Strings& requests) {
+  const std::string command = "POST_PHOTO_CONVERT ";
+  Strings photos;
+  for (const std::string& request : requests) {
+    if (request.compare(0, command.size(), command) == 0) {
+      photos.push_back(request.substr(command.size()));
     }
   }
   return photos;
+}
+
+ProgramOptions InDirectory(const std::string& workingDirectory) {
+  ProgramOptions options;
+  options.workingDirectory = workingDirectory;
+  return options;
+}
+
+ProgramOptions WithUmask(mode_t umask) {
+  ProgramOptions options;
+  options.umask = umask;
+  return options;
+}
+
+ProgramOptions WithSteps(const std::vector<BeforeExec>& beforeExec) {
+  ProgramOptions options;
+  options.beforeExec = beforeExec;
+  return options;
 }
 
 HeldLock::HeldLock(const std::string& path)
@@ -159,8 +150,8 @@ HeldLock::~HeldLock() {
   }
 }
 
-bool WaitUntilUnlocked(const std::string& path, int milliseconds) {
-  const auto end = std::chrono::steady_clock::now() + std::chrono::milliseconds(milliseconds);
+bool WaitUntilUnlocked(const std::string& path) {
+  const auto end = std::chrono::steady_clock::now() + std::chrono::seconds(10);
   while (!HeldLock(path).IsHeld()) {
     if (std::chrono::steady_clock::now() > end) {
       return false;
@@ -177,27 +168,46 @@ void StubProgramTest::SetUp() {
   converter_ = std::make_unique<StubTool>(kConverterPath);
 }
 
-ProgramResult StubProgramTest::Run(const std::vector<std::string>& directories,
-                                   const ProgramOptions& options) {
-  return RunProgram(VelathumbPath(), Arguments(directories), options);
+ProgramResult StubProgramTest::Run(const Strings& directories, const ProgramOptions& options) {
+  return RunProgram(VelathumbPath(), ArgumentsFor(directories), options);
 }
 
-Program StubProgramTest::Start(const std::vector<std::string>& directories,
-                               const ProgramOptions& options) {
-  return StartProgram(VelathumbPath(), Arguments(directories), options);
+Program StubProgramTest::Start(const Strings& directories, const ProgramOptions& options) {
+  return StartProgram(VelathumbPath(), ArgumentsFor(directories), options);
 }
 
-void StubProgramTest::PauseConverter(int call) const {
+Strings StubProgramTest::RunWithDaemon(const Strings& directories, const ProgramOptions& options) {
+  const DaemonPeer daemon;
+  EXPECT_SUCCESS(Run(directories, options));
+  return RequestsOf(daemon);
+}
+
+Strings StubProgramTest::RunAndLook(const std::function<void(const std::string&)>& look) {
+  DaemonPeer daemon;
+  const auto lookAt = [&](const DaemonRequest& request) { look(RequestText(request)); };
+  daemon.Answer("GET_INDEX_VERSION",
+                DaemonReply::Line("{\"success\":true,\"version\":0}").Meanwhile(lookAt));
+  daemon.Answer("POST_PHOTO_CONVERT", DaemonReply::Line("{\"success\":true}").Meanwhile(lookAt));
+  EXPECT_SUCCESS(Run());
+  return RequestsOf(daemon);
+}
+
+Program StubProgramTest::StartAndPause(int call, const Strings& directories,
+                                       const ProgramOptions& options) const {
   Converter().PlanCall(
       call, StubPlan().WriteOutputs().CreateFile(kPausedFile).WaitForFile(kGoFile).Exit(0));
-}
-
-bool StubProgramTest::IsConverterPaused() {
-  return WaitUntilExists(kPausedFile);
+  Program program = Start(directories, options);
+  EXPECT_TRUE(WaitUntilExists(kPausedFile));
+  return program;
 }
 
 void StubProgramTest::Go() {
   WriteFile(kGoFile, "");
+}
+
+void StubProgramTest::GoAndFinish(Program& program) {
+  Go();
+  EXPECT_SUCCESS(*program.Wait());
 }
 
 }  // namespace vela_test

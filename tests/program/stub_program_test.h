@@ -1,73 +1,94 @@
 // Fixture for tests of the whole program against a recording converter.
 #pragma once
 
+#include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
-#include <map>
+#include <functional>
 #include <memory>
+#include <optional>
 #include <string>
 #include <vector>
 
+#include "program/program_paths.h"
 #include "support/daemon_peer.h"
+#include "support/files.h"
+#include "support/named_rows.h"
 #include "support/profile_file.h"
 #include "support/program.h"
 #include "support/sandbox.h"
 #include "support/stub_tool.h"
+#include "support/system_log.h"
 
 namespace vela_test {
 
-constexpr const char* kPhotos = "/tmp/photos";
-constexpr const char* kProfiles = "/tmp/profiles.conf";
-constexpr const char* kQueue = "/var/spool/thumb_create.queue";
-constexpr const char* kPhotoProgress = "/var/spool/conv_progress_photo";
+using ::testing::ElementsAre;
+using ::testing::IsEmpty;
+using ::testing::SizeIs;
+using Strings = std::vector<std::string>;
+
+constexpr const char* kPhoto = "/tmp/photos/a.jpg";
 constexpr const char* kSettings = "/etc/velainfo.conf";
+
+/// The requests that a photo conversion makes for kPhoto.
+constexpr const char* kVersionRequest = "GET_INDEX_VERSION /tmp/photos/a.jpg";
+constexpr const char* kReport = "POST_PHOTO_CONVERT /tmp/photos/a.jpg";
 
 /// XL and M in phase 0 (XL is the one that the later phases are made from), B in phase 1, S in
 /// phase 2.
 std::vector<ProfileSection> ThreePhases();
 
-/// What is needed of those profiles, as a size map for the system settings.
+/// A profile whose thumbnail has the usual file name of its size class.
+ProfileSection Profile(const std::string& sizeClass, int size, int phase);
+
+/// A size map for the system settings that asks for the thumbnails of ThreePhases().
 constexpr const char* kThreePhasesSizeMap = "photo_thumb_size_map=\"23\"\n";
 
-/// `path` as a path of the photo's metadata directory.
-std::string MetadataDirOf(const std::string& photo);
-
-/// Thumbnail of a size class ("XL", "M", ...) of a photo, under its current or its older name.
-std::string Thumb(const std::string& photo, const std::string& sizeClass);
-std::string OldThumb(const std::string& photo, const std::string& sizeClass);
-
-/// Failure marker of a size class of a photo.
-std::string Marker(const std::string& photo, const std::string& sizeClass);
+/// What a photo's metadata directory holds after one run, after two runs, and after a failure of
+/// all phases.
+const Strings kThumbsOfFirstRun = {"VELAPHOTO_THUMB_B.jpg", "VELAPHOTO_THUMB_M.jpg",
+                                   "VELAPHOTO_THUMB_XL.jpg"};
+const Strings kAllThumbs = {"VELAPHOTO_THUMB_B.jpg", "VELAPHOTO_THUMB_M.jpg",
+                            "VELAPHOTO_THUMB_S.jpg", "VELAPHOTO_THUMB_XL.jpg"};
+const Strings kAllMarkers = {"VELAPHOTO_THUMB_B.fail", "VELAPHOTO_THUMB_M.fail",
+                             "VELAPHOTO_THUMB_S.fail", "VELAPHOTO_THUMB_XL.fail"};
 
 /// Makes a small photo, dated a minute back so that everything made of it is newer.
 std::string MakePhoto(const std::string& path);
 
+/// Makes several of them in kPhotos.
+void MakePhotos(const Strings& names);
+
+/// Makes a photo "a.jpg" in each of these directories, which are made too.
+void MakePhotosIn(const Strings& directories);
+
 /// Puts thumbnails of these size classes (whole small pictures, dated now) beside a photo.
-void PutThumbs(const std::string& photo, const std::vector<std::string>& sizeClasses);
+void PutThumbs(const std::string& photo, const Strings& sizeClasses);
 
-/// Names of what is in a photo's metadata directory.
-std::vector<std::string> MetadataOf(const std::string& photo);
-
-/// Photo progress: the value of a key, 0 when it is not there.
-int Progress(const std::string& key);
+/// Names of the files in a photo's metadata directory.
+Strings MetadataOf(const std::string& photo);
 
 /// Keys of the photo progress file in file order: a new key is appended to the file.
-std::vector<std::string> ProgressKeys();
+Strings ProgressKeys();
+
+void ExpectProgress(int completed, int completedThumb);
 
 /// The source argument of a converter call.
 std::string SourceOf(const StubCall& call);
 
 /// The source arguments of all converter calls so far, in order.
-std::vector<std::string> ConvertedSources();
-
-/// The arguments with the random part of temporary names replaced by "??????".
-std::vector<std::string> WithoutRandomNames(std::vector<std::string> arguments);
+Strings ConvertedSources();
 
 /// Each request as "<command> <path>".
-std::vector<std::string> RequestsOf(const DaemonPeer& daemon);
+Strings RequestsOf(const DaemonPeer& daemon);
 
-/// Paths of the photos reported to the daemon, in order.
-std::vector<std::string> ReportedPhotos(const DaemonPeer& daemon);
+/// Paths of the photos that are reported by such requests, in order.
+Strings ReportedPhotos(const Strings& requests);
+
+/// Options that differ from the usual ones in one setting.
+ProgramOptions InDirectory(const std::string& workingDirectory);
+ProgramOptions WithUmask(mode_t umask);
+ProgramOptions WithSteps(const std::vector<BeforeExec>& beforeExec);
 
 /// Takes the exclusive lock of a directory or file without waiting, for as long as the object
 /// lives.
@@ -78,7 +99,7 @@ class HeldLock {
   HeldLock(const HeldLock&) = delete;
   HeldLock& operator=(const HeldLock&) = delete;
 
-  /// Whether nobody else had it.
+  /// Whether the lock was free.
   bool IsHeld() const { return held_; }
 
  private:
@@ -86,8 +107,8 @@ class HeldLock {
   bool held_;
 };
 
-/// Waits until the lock of a directory or file can be had, at most `milliseconds`.
-bool WaitUntilUnlocked(const std::string& path, int milliseconds = 10000);
+/// Waits until the lock of a directory or file is free, at most ten seconds. Returns whether it is.
+bool WaitUntilUnlocked(const std::string& path);
 
 /// A sandbox with the profile file, an empty photo directory and a converter that works.
 class StubProgramTest : public SandboxTest {
@@ -95,16 +116,26 @@ class StubProgramTest : public SandboxTest {
   void SetUp() override;
 
   /// Runs the program with the usual profile file.
-  static ProgramResult Run(const std::vector<std::string>& directories = {kPhotos},
+  static ProgramResult Run(const Strings& directories = {kPhotos},
                            const ProgramOptions& options = ProgramOptions());
-  static Program Start(const std::vector<std::string>& directories = {kPhotos},
+  static Program Start(const Strings& directories = {kPhotos},
                        const ProgramOptions& options = ProgramOptions());
 
-  /// Makes the converter's call with this number stop after its outputs until Go() is called.
-  void PauseConverter(int call = 1) const;
-  /// Waits until it has stopped there; whether it did.
-  static bool IsConverterPaused();
+  /// Runs the program, which must succeed, with a daemon whose index has version 0. Returns the
+  /// requests as "<command> <path>".
+  static Strings RunWithDaemon(const Strings& directories = {kPhotos},
+                               const ProgramOptions& options = ProgramOptions());
+
+  /// The same over kPhotos; `look` is called with each request before the daemon answers it.
+  static Strings RunAndLook(const std::function<void(const std::string& request)>& look);
+
+  /// Starts the program and waits until the converter's call with this number has made its outputs.
+  /// The call does not end before Go().
+  Program StartAndPause(int call = 1, const Strings& directories = {kPhotos},
+                        const ProgramOptions& options = ProgramOptions()) const;
   static void Go();
+  /// Go(); then waits for the end of the program, which must succeed.
+  static void GoAndFinish(Program& program);
 
   const StubTool& Converter() const { return *converter_; }
   StubTool& Converter() { return *converter_; }
@@ -113,13 +144,22 @@ class StubProgramTest : public SandboxTest {
   std::unique_ptr<StubTool> converter_;
 };
 
-/// Ends well, as a run has to whatever became of its photos.
-#define EXPECT_GOOD_END(result)                           \
+/// The same with a photo at kPhoto.
+class OnePhotoTest : public StubProgramTest {
+ protected:
+  void SetUp() override {
+    StubProgramTest::SetUp();
+    MakePhoto(kPhoto);
+  }
+};
+
+/// Exit status 0 and no output, which every run has whatever became of its photos.
+#define EXPECT_SUCCESS(result)                            \
   do {                                                    \
     const ::vela_test::ProgramResult endedRun = (result); \
-    EXPECT_EQ(0, endedRun.exitCode);                      \
-    EXPECT_EQ("", endedRun.out);                          \
-    EXPECT_EQ("", endedRun.err);                          \
+    EXPECT_EQ(endedRun.exitCode, 0);                      \
+    EXPECT_EQ(endedRun.out, "");                          \
+    EXPECT_EQ(endedRun.err, "");                          \
   } while (false)
 
 }  // namespace vela_test

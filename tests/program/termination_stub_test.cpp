@@ -1,23 +1,15 @@
-// The end by SIGTERM.
-#include <gmock/gmock.h>
-#include <gtest/gtest.h>
+// Termination by SIGTERM.
 #include <signal.h>
 
 #include <chrono>
-#include <string>
 #include <thread>
 
 #include "program/stub_program_test.h"
-#include "support/files.h"
-#include "support/system_log.h"
 
 namespace vela_test {
 namespace {
 
 using ::testing::Each;
-using ::testing::ElementsAre;
-using ::testing::IsEmpty;
-using ::testing::SizeIs;
 using ::testing::StartsWith;
 
 constexpr const char* kRoot = "/tmp/photos/@eaDir";
@@ -27,8 +19,7 @@ class Termination : public StubProgramTest {
  protected:
   void SetUp() override {
     StubProgramTest::SetUp();
-    MakePhoto("/tmp/photos/a.jpg");
-    MakePhoto("/tmp/photos/b.jpg");
+    MakePhotos({"a.jpg", "b.jpg"});
     Converter().PlanCall(1, StubPlan()
                                 .WriteOutputs(1)
                                 .CreateFile("/tmp/here")
@@ -36,14 +27,19 @@ class Termination : public StubProgramTest {
                                 .WriteOutputs());
   }
 
-  /// Starts the program, waits for its first conversion and sends the signal; how it ended.
-  static ProgramResult Terminate(const ProgramOptions& options = ProgramOptions()) {
-    Program program = Start({kPhotos, "/tmp/other"}, options);
-    EXPECT_TRUE(WaitUntilExists("/tmp/here"));
-    program.Kill(SIGTERM);
+  /// Sends the signal. Returns how the program ended.
+  static ProgramResult End(Program& program, int signal = SIGTERM) {
+    program.Kill(signal);
     const auto end = program.Wait(kSoon);
     EXPECT_TRUE(end.has_value());
     return end.value_or(ProgramResult());
+  }
+
+  /// Starts the program and sends SIGTERM during its first conversion. Returns how it ended.
+  static ProgramResult Terminate(const ProgramOptions& options = ProgramOptions()) {
+    Program program = Start({kPhotos, "/tmp/other"}, options);
+    EXPECT_TRUE(WaitUntilExists("/tmp/here"));
+    return End(program);
   }
 
   pid_t ConverterPid() const {
@@ -54,9 +50,9 @@ class Termination : public StubProgramTest {
 
 TEST_F(Termination, ExitsWithOne) {
   const ProgramResult result = Terminate();
-  EXPECT_EQ(1, result.exitCode);
-  EXPECT_EQ("", result.out);
-  EXPECT_EQ("", result.err);
+  EXPECT_EQ(result.exitCode, 1);
+  EXPECT_EQ(result.out, "");
+  EXPECT_EQ(result.err, "");
 }
 
 TEST_F(Termination, RemovesThePidFileOfThisInstanceOnly) {
@@ -68,7 +64,7 @@ TEST_F(Termination, RemovesThePidFileOfThisInstanceOnly) {
 TEST_F(Termination, EndsTheConverter) {
   Terminate();
   EXPECT_TRUE(WaitUntilGone("/proc/" + std::to_string(ConverterPid())));
-  EXPECT_EQ(0U, Converter().Calls()[0].endSequence);
+  EXPECT_EQ(Converter().Calls()[0].endSequence, 0U);
 }
 
 TEST_F(Termination, EndsTheConvertersOfOthersToo) {
@@ -78,13 +74,10 @@ TEST_F(Termination, EndsTheConvertersOfOthersToo) {
   Program converter = StartProgram(kConverterPath, {"other"});
   Program sleeper = StartProgram("/bin/sleep", {"60"});
   ASSERT_TRUE(WaitUntilExists("/tmp/other.here"));
-  program.Kill(SIGTERM);
-  const auto end = program.Wait(kSoon);
-  ASSERT_TRUE(end.has_value());
-  EXPECT_EQ(1, end->exitCode);
+  EXPECT_EQ(End(program).exitCode, 1);
   const auto converterEnd = converter.Wait(kSoon);
   ASSERT_TRUE(converterEnd.has_value());
-  EXPECT_EQ(SIGTERM, converterEnd->signal);
+  EXPECT_EQ(converterEnd->signal, SIGTERM);
   EXPECT_FALSE(sleeper.Wait(std::chrono::milliseconds(50)).has_value());
 }
 
@@ -102,7 +95,7 @@ TEST_F(Termination, CleansUpNothingElse) {
   EXPECT_THAT(left, Each(StartsWith("VELAPHOTO.tmp.")));
   EXPECT_FALSE(Exists(kPhotoProgress));
   EXPECT_FALSE(Exists(kQueue));
-  EXPECT_THAT(ReportedPhotos(daemon), IsEmpty());
+  EXPECT_THAT(ReportedPhotos(RequestsOf(daemon)), IsEmpty());
   EXPECT_THAT(ErrorLines(), IsEmpty());
 }
 
@@ -117,33 +110,22 @@ TEST_F(Termination, StartsNothingMore) {
 TEST_F(Termination, DoesNotWaitForAConverterThatWillNotEnd) {
   Converter().PlanCall(
       1, StubPlan().IgnoreSignal(SIGTERM).CreateFile("/tmp/here").WaitForFile("/tmp/never"));
-  EXPECT_EQ(1, Terminate().exitCode);
+  EXPECT_EQ(Terminate().exitCode, 1);
   EXPECT_THAT(ListDirectory("/run"), IsEmpty());
   EXPECT_TRUE(HeldLock(kRoot).IsHeld());
 }
 
-TEST_F(Termination, WorksWhenTheCallerIgnoresTheEndOfItsChildren) {
-  ProgramOptions options;
-  options.beforeExec = {IgnoreSignal(SIGCHLD)};
-  EXPECT_EQ(1, Terminate(options).exitCode);
-  EXPECT_THAT(ListDirectory("/run"), IsEmpty());
-  EXPECT_TRUE(WaitUntilGone("/proc/" + std::to_string(ConverterPid())));
-}
-
-TEST_F(Termination, WorksWhenTheCallerIgnoresSigTerm) {
-  ProgramOptions options;
-  options.beforeExec = {IgnoreSignal(SIGTERM)};
-  EXPECT_EQ(1, Terminate(options).exitCode);
-  EXPECT_THAT(ListDirectory("/run"), IsEmpty());
-}
-
-TEST_F(Termination, WorksWithoutStandardDescriptors) {
-  ProgramOptions options;
-  options.closeInput = options.closeOutput = options.closeError = true;
-  EXPECT_EQ(1, Terminate(options).exitCode);
-  EXPECT_THAT(ListDirectory("/run"), IsEmpty());
-  EXPECT_TRUE(WaitUntilGone("/proc/" + std::to_string(ConverterPid())));
-  EXPECT_TRUE(HeldLock(kRoot).IsHeld());
+TEST_F(Termination, WorksHoweverTheProgramWasStarted) {
+  ProgramOptions closed;
+  closed.closeInput = closed.closeOutput = closed.closeError = true;
+  for (const ProgramOptions& options :
+       {WithSteps({IgnoreSignal(SIGCHLD)}), WithSteps({IgnoreSignal(SIGTERM)}), closed}) {
+    SetUp();
+    EXPECT_EQ(Terminate(options).exitCode, 1);
+    EXPECT_THAT(ListDirectory("/run"), IsEmpty());
+    EXPECT_TRUE(WaitUntilGone("/proc/" + std::to_string(ConverterPid())));
+    EXPECT_TRUE(HeldLock(kRoot).IsHeld());
+  }
 }
 
 TEST_F(Termination, WorksWhileTheDaemonIsSilent) {
@@ -151,10 +133,7 @@ TEST_F(Termination, WorksWhileTheDaemonIsSilent) {
   daemon.AnswerNext(DaemonReply::Silence());
   Program program = Start();
   ASSERT_TRUE(daemon.WaitForRequests(1));
-  program.Kill(SIGTERM);
-  const auto end = program.Wait(kSoon);
-  ASSERT_TRUE(end.has_value());
-  EXPECT_EQ(1, end->exitCode);
+  EXPECT_EQ(End(program).exitCode, 1);
   EXPECT_THAT(ListDirectory("/run"), IsEmpty());
   EXPECT_THAT(Converter().Calls(), IsEmpty());
   EXPECT_TRUE(HeldLock(kRoot).IsHeld());
@@ -169,39 +148,30 @@ TEST_F(Termination, WorksWhileTheQueueIsLocked) {
   Program program = Start();
   ASSERT_TRUE(daemon.WaitForRequests(4));
   ASSERT_TRUE(WaitUntilUnlocked(kRoot));
-  program.Kill(SIGTERM);
-  const auto end = program.Wait(kSoon);
-  ASSERT_TRUE(end.has_value());
-  EXPECT_EQ(1, end->exitCode);
-  EXPECT_EQ("", ReadFile(kQueue));
+  EXPECT_EQ(End(program).exitCode, 1);
+  EXPECT_EQ(ReadFile(kQueue), "");
 }
 
 TEST_F(Termination, OtherSignalsKeepTheirMeaning) {
   Program program = Start();
   ASSERT_TRUE(WaitUntilExists("/tmp/here"));
-  program.Kill(SIGINT);
-  const auto end = program.Wait(kSoon);
-  ASSERT_TRUE(end.has_value());
-  EXPECT_EQ(SIGINT, end->signal);
+  EXPECT_EQ(End(program, SIGINT).signal, SIGINT);
   EXPECT_THAT(ListDirectory("/run"), SizeIs(1));
 }
 
-/// A signal that lands at some moment of a run, however early.
-class TerminationAtAnyTime : public StubProgramTest, public ::testing::WithParamInterface<int> {};
+/// A signal at some moment of a run, however early.
+class TerminationAtAnyTime : public Termination, public ::testing::WithParamInterface<int> {};
 
 TEST_P(TerminationAtAnyTime, EndsPromptlyAndLeavesNoPidFile) {
-  for (const char* name : {"a.jpg", "b.jpg", "c.jpg"}) {
-    MakePhoto(std::string("/tmp/photos/") + name);
-  }
+  Converter().PlanCall(1, StubPlan::Normal());
+  MakePhoto("/tmp/photos/c.jpg");
   const DaemonPeer daemon;
   Program program = Start();
   std::this_thread::sleep_for(std::chrono::microseconds(GetParam()));
-  program.Kill(SIGTERM);
-  const auto end = program.Wait(kSoon);
-  ASSERT_TRUE(end.has_value());
-  // Before the handler is there, the signal ends the program as it does any.
-  EXPECT_TRUE(end->exitCode == 1 || end->exitCode == 0 || end->signal == SIGTERM)
-      << end->exitCode << " " << end->signal;
+  const ProgramResult end = End(program);
+  // Before the handler is installed, the signal has its default effect.
+  EXPECT_TRUE(end.exitCode == 1 || end.exitCode == 0 || end.signal == SIGTERM)
+      << end.exitCode << " " << end.signal;
   EXPECT_THAT(ListDirectory("/run"), IsEmpty());
   EXPECT_TRUE(!Exists(kRoot) || HeldLock(kRoot).IsHeld());
 }

@@ -1,18 +1,20 @@
-// What real thumbnails carry and show for the photo formats there are.
+// Metadata and content of real thumbnails for all photo formats.
 #include <algorithm>
 
 #include "program/real_program_test.h"
-#include "support/build_paths.h"
-#include "support/daemon_peer.h"
-#include "support/images.h"
 
 namespace vela_test::real {
 
 namespace {
 
-/// All thumbnails of a photo that are taken up to phase 2 by two runs.
 class ThumbContent : public RealProgramTest {
  protected:
+  /// Makes all phases.
+  void MakeAll() {
+    Make();
+    Make();
+  }
+
   void ExpectQuadrants(const std::string& photo, const std::string& letters = "RGBY") const {
     EXPECT_TRUE(HasThumbs(photo, kinds_));
     for (const Kind& kind : kinds_) {
@@ -22,7 +24,7 @@ class ThumbContent : public RealProgramTest {
 };
 
 bool IsRawPhoto(const std::string& name) {
-  static const std::vector<std::string> kRaw = {"crw", "dng", "nef"};
+  static const Strings kRaw = {"crw", "dng", "nef"};
   return std::count(kRaw.begin(), kRaw.end(), name.substr(name.rfind('.') + 1)) > 0;
 }
 
@@ -44,9 +46,7 @@ bool IsNear(const Rgb& colour, int red, int green, int blue) {
 }  // namespace
 
 TEST_F(ThumbContent, NoMetadataButTheColourProfile) {
-  JpegRecipe recipe;
-  recipe.width = 240;
-  recipe.height = 160;
+  JpegRecipe recipe = RecipeOf(240, 160);
   recipe.orientation = 1;
   recipe.exif = true;
   recipe.xmp = true;
@@ -56,8 +56,7 @@ TEST_F(ThumbContent, NoMetadataButTheColourProfile) {
   const std::string photo = MakeJpeg(InPhotos("a.jpg"), recipe);
   const JpegMetadata before = ReadJpegMetadata(photo);
   ASSERT_TRUE(before.exif && before.xmp && before.iptc && before.icc && before.comment);
-  Make();
-  Make();
+  MakeAll();
   for (const Kind& kind : kinds_) {
     SCOPED_TRACE(kind.name);
     ASSERT_TRUE(IsWholeJpeg(ThumbOf(photo, kind)));
@@ -101,8 +100,7 @@ TEST_F(ThumbContent, NoColourProfileWhereThePhotoHasNone) {
 
 TEST_F(ThumbContent, TransparentPngOnWhite) {
   const std::string photo = MakeTransparentPng(InPhotos("a.png"), 240, 160);
-  Make();
-  Make();
+  MakeAll();
   EXPECT_TRUE(HasThumbs(photo, kinds_));
   for (const Kind& kind : kinds_) {
     SCOPED_TRACE(kind.name);
@@ -116,19 +114,18 @@ TEST_F(ThumbContent, TransparentPngOnWhite) {
 }
 
 TEST_F(ThumbContent, FirstPageOnly) {
-  const std::vector<std::string> photos = {
+  const Strings photos = {
       MakeAnimatedGif(InPhotos("frames.gif"), 4, 240, 160),
       MakeMultiPageTiff(InPhotos("pages.tif"), 3, 240, 160),
       MakeMultiPageTiff(InPhotos("PAGES.TIFF"), 2, 240, 160),
       InPhotos("frames.webp"),
   };
   Draw({InPhotos("frames.gif"), InPhotos("frames.webp")});
-  Make();
-  Make();
+  MakeAll();
   for (const std::string& photo : photos) {
     ExpectQuadrants(photo);
-    // Nothing for the other pages under numbered names.
-    for (const std::string& name : ListDirectory(MetadataOf(photo))) {
+    // No files with numbered names for the other pages.
+    for (const std::string& name : ListDirectory(MetadataDirOf(photo))) {
       EXPECT_EQ(name.compare(0, 16, "VELAPHOTO_THUMB_"), 0) << photo << " " << name;
     }
   }
@@ -140,21 +137,19 @@ TEST_F(ThumbContent, LayeredPsdAsAWhole) {
   MakeImage("/tmp/whole.png", 240, 160);
   Draw({"/tmp/whole.png", "(", "-size", "240x160", "xc:grey", ")", "(", "-size", "90x90",
         "xc:black", ")", "-type", "TrueColor", photo});
-  Make();
-  Make();
+  MakeAll();
   ExpectQuadrants(photo);
 }
 
 TEST_F(ThumbContent, EveryFormatWithASinglePicture) {
-  std::vector<std::string> photos;
+  Strings photos;
   for (const char* extension :
        {"jpg", "JPEG", "jpe", "png", "PNG", "gif", "bmp", "tif", "tiff", "webp", "heic", "psd"}) {
     const std::string made = MakeImage("/tmp/made." + std::string(extension), 240, 160);
     photos.push_back(InPhotos("photo." + std::string(extension)));
     CopyFile(made, photos.back());
   }
-  Make();
-  Make();
+  MakeAll();
   for (const std::string& photo : photos) {
     ExpectQuadrants(photo);
   }
@@ -162,13 +157,10 @@ TEST_F(ThumbContent, EveryFormatWithASinglePicture) {
 }
 
 TEST_F(ThumbContent, CmykJpegInItsColours) {
-  JpegRecipe recipe;
-  recipe.width = 240;
-  recipe.height = 160;
+  JpegRecipe recipe = RecipeOf(240, 160);
   recipe.colour = JpegColour::kCmyk;
   const std::string photo = MakeJpeg(InPhotos("print.jpg"), recipe);
-  Make();
-  Make();
+  MakeAll();
   ExpectQuadrants(photo);
   for (const Kind& kind : kinds_) {
     EXPECT_EQ(DecodeJpeg(ThumbOf(photo, kind))->Components(), 3);
@@ -176,16 +168,13 @@ TEST_F(ThumbContent, CmykJpegInItsColours) {
 }
 
 TEST_F(ThumbContent, GreyJpegStaysGrey) {
-  JpegRecipe recipe;
-  recipe.width = 240;
-  recipe.height = 160;
+  JpegRecipe recipe = RecipeOf(240, 160);
   recipe.colour = JpegColour::kGrey;
   const std::string photo = MakeJpeg(InPhotos("grey.jpg"), recipe);
   const auto source = DecodeJpeg(photo);
   ASSERT_TRUE(source);
   ASSERT_EQ(source->Components(), 1);
-  Make();
-  Make();
+  MakeAll();
   EXPECT_TRUE(HasThumbs(photo, kinds_));
   for (const Kind& kind : kinds_) {
     const auto thumb = DecodeJpeg(ThumbOf(photo, kind));
@@ -200,7 +189,7 @@ TEST_F(ThumbContent, GreyJpegStaysGrey) {
   }
 }
 
-// What is no photo leaves markers for every kind, counts as finished and holds nothing up.
+// A file that is no photo gets markers for every kind, counts as completed and stops nothing.
 TEST_F(ThumbContent, FilesThatAreNoPhotos) {
   const std::string good = MakeJpeg(InPhotos("m.jpg"));
   const std::string last = MakeJpeg(InPhotos("z.jpg"));
@@ -210,8 +199,7 @@ TEST_F(ThumbContent, FilesThatAreNoPhotos) {
   WriteFile(InPhotos("empty.tif"), "");
   WriteFile(InPhotos("text.png"), "no picture");
   WriteFileOfSize(InPhotos("zeros.gif"), 5000);
-  Make();
-  Make();
+  MakeAll();
   for (const char* name :
        {"empty.jpg", "one.jpg", "text.jpg", "empty.tif", "text.png", "zeros.gif"}) {
     EXPECT_TRUE(IsMarkedFailed(InPhotos(name), kinds_));
@@ -229,29 +217,25 @@ TEST_F(ThumbContent, RepairedPhotoLosesItsMarkers) {
   Make();
   EXPECT_TRUE(IsMarkedFailed(photo, kinds_));
   MakeJpeg(photo);
-  Make();
-  Make();
+  MakeAll();
   EXPECT_TRUE(HasThumbs(photo, kinds_));
 }
 
-TEST_F(ThumbContent, CutJpegHoldsNothingUp) {
+TEST_F(ThumbContent, CutJpegStopsNothing) {
   const std::string first = MakeJpeg(InPhotos("a.jpg"));
   const std::string cut = MakeTruncatedJpeg(InPhotos("cut.jpg"), 640, 480);
   const std::string last = MakeJpeg(InPhotos("z.jpg"));
-  Make();
-  Make();
+  MakeAll();
   EXPECT_TRUE(HasThumbs(first, kinds_));
   EXPECT_TRUE(HasThumbs(last, kinds_));
-  // The converter may accept what there is of it.
+  // The converter may accept the part that is there.
   EXPECT_TRUE(HasThumbs(cut, kinds_) || IsMarkedFailed(cut, kinds_));
 }
 
 // Files as cameras and phones wrote them, beside some of our own.
 TEST_F(ThumbContent, CameraFilesInFullSize) {
   CopyFile(SourceDirectory() + "/config/thumb-profiles.conf", kProfiles);
-  JpegRecipe recipe;
-  recipe.width = 1800;
-  recipe.height = 1350;
+  JpegRecipe recipe = RecipeOf(1800, 1350);
   recipe.orientation = 8;
   recipe.iccProfile = true;
   MakeJpeg(InPhotos("own.jpg"), recipe);
@@ -264,8 +248,7 @@ TEST_F(ThumbContent, CameraFilesInFullSize) {
     }
   }
   const std::vector<Kind> kinds = FullKinds();
-  Make();
-  Make();
+  MakeAll();
   EXPECT_TRUE(OnlyWholeThumbsBelow(kPhotos));
   for (const auto& [name, state] : PhotosBelow(kPhotos)) {
     SCOPED_TRACE(name);

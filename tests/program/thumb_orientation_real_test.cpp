@@ -1,10 +1,7 @@
-// Which way up real thumbnails are.
+// The orientation of real thumbnails.
 #include <cmath>
 
 #include "program/real_program_test.h"
-#include "support/build_paths.h"
-#include "support/daemon_peer.h"
-#include "support/images.h"
 
 namespace vela_test::real {
 
@@ -18,11 +15,7 @@ class ThumbOrientation : public RealProgramTest {
   void SetUp() override {
     RealProgramTest::SetUp();
     for (int orientation = 1; orientation <= 8; ++orientation) {
-      JpegRecipe recipe;
-      recipe.width = kWidth;
-      recipe.height = kHeight;
-      recipe.orientation = orientation;
-      MakeJpeg(Photo(orientation), recipe);
+      MakeJpeg(Photo(orientation), RecipeOf(kWidth, kHeight, orientation));
     }
   }
 
@@ -30,7 +23,7 @@ class ThumbOrientation : public RealProgramTest {
     return InPhotos("orientation_" + std::to_string(orientation) + ".jpg");
   }
 
-  /// The quadrants and the shape; a tag that is left would turn the picture a second time.
+  /// Checks the quadrants and the shape; a remaining tag would turn the picture a second time.
   static void ExpectThumb(int orientation, const Kind& kind, const std::string& letters,
                           bool portrait) {
     SCOPED_TRACE("orientation " + std::to_string(orientation) + " " + kind.name);
@@ -42,18 +35,14 @@ class ThumbOrientation : public RealProgramTest {
     EXPECT_EQ(ReadJpegMetadata(path).orientation, 0);
   }
 
-  void ExpectUpright() const {
+  /// Two runs; all thumbnails are upright, or else as stored.
+  void ExpectMade(bool upright) {
+    Make();
+    Make();
     for (int orientation = 1; orientation <= 8; ++orientation) {
       for (const Kind& kind : kinds_) {
-        ExpectThumb(orientation, kind, LettersAfterOrientation(orientation), orientation >= 5);
-      }
-    }
-  }
-
-  void ExpectAsStored() const {
-    for (int orientation = 1; orientation <= 8; ++orientation) {
-      for (const Kind& kind : kinds_) {
-        ExpectThumb(orientation, kind, "RGBY", false);
+        ExpectThumb(orientation, kind, upright ? LettersAfterOrientation(orientation) : "RGBY",
+                    upright && orientation >= 5);
       }
     }
   }
@@ -75,9 +64,9 @@ double MeanDifference(const DecodedImage& a, const DecodedImage& b, bool mirrorX
   return sum / (3 * kPoints * kPoints);
 }
 
-/// Whether two pictures of the same shape are the same way up: mirrored or turned they would differ
-/// far more than by what cameras and encoders do to them.
-bool IsSameWayUp(const DecodedImage& a, const DecodedImage& b) {
+/// Whether two pictures of the same shape have the same orientation: mirrored or turned they would
+/// differ far more than cameras and encoders make them differ.
+bool HaveSameOrientation(const DecodedImage& a, const DecodedImage& b) {
   const double difference = MeanDifference(a, b, false, false);
   return 2 * difference < MeanDifference(a, b, true, false) &&
          2 * difference < MeanDifference(a, b, false, true) &&
@@ -87,46 +76,29 @@ bool IsSameWayUp(const DecodedImage& a, const DecodedImage& b) {
 }  // namespace
 
 TEST_F(ThumbOrientation, UprightWithoutDaemon) {
-  Make();
-  Make();
-  ExpectUpright();
+  ExpectMade(true);
   ExpectNothingLeftToMake();
 }
 
-TEST_F(ThumbOrientation, UprightWithIndexOfVersionZero) {
+/// Index versions up to 0 leave the rotation to the converter.
+class ThumbOrientationByIndex : public ThumbOrientation,
+                                public ::testing::WithParamInterface<int> {};
+
+TEST_P(ThumbOrientationByIndex, IsUprightOrAsStored) {
   DaemonPeer daemon;
-  daemon.SetIndexVersion(0);
-  Make();
-  Make();
-  ExpectUpright();
+  daemon.SetIndexVersion(GetParam());
+  ExpectMade(GetParam() == 0);
 }
 
-TEST_F(ThumbOrientation, AsStoredWithIndexOfVersionOne) {
-  DaemonPeer daemon;
-  daemon.SetIndexVersion(1);
-  Make();
-  Make();
-  ExpectAsStored();
-}
+INSTANTIATE_TEST_SUITE_P(Versions, ThumbOrientationByIndex, ::testing::Values(0, 1, 7));
 
-TEST_F(ThumbOrientation, AsStoredWithIndexOfALaterVersion) {
-  DaemonPeer daemon;
-  daemon.SetIndexVersion(7);
-  Make();
-  Make();
-  ExpectAsStored();
-}
-
-// One photo of a camera, stored in all the ways that its owner could hold it, gives one picture.
+// One photo of a camera, stored in all orientations, gives one picture.
 TEST_F(ThumbOrientation, CameraPhotosOfAllOrientationsGiveOnePicture) {
   const std::string folder = SharedMediaDirectory();
-  std::vector<std::vector<std::string>> sets(1);
-  JpegRecipe upright;
-  upright.width = kWidth;
-  upright.height = kHeight;
-  sets[0] = {MakeJpeg(InPhotos("upright.jpg"), upright), Photo(1)};
+  std::vector<Strings> sets(1);
+  sets[0] = {MakeJpeg(InPhotos("upright.jpg"), RecipeOf(kWidth, kHeight)), Photo(1)};
   for (const char* series : {"landscape_", "portrait_"}) {
-    std::vector<std::string> set;
+    Strings set;
     for (const std::string& name : ListDirectory(folder.empty() ? kPhotos : folder)) {
       if (name.compare(0, std::string(series).size(), series) == 0) {
         CopyFile(folder + "/" + name, InPhotos(name));
@@ -137,7 +109,7 @@ TEST_F(ThumbOrientation, CameraPhotosOfAllOrientationsGiveOnePicture) {
   }
   Make();
   Make();
-  for (const std::vector<std::string>& set : sets) {
+  for (const Strings& set : sets) {
     for (const std::string& photo : set) {
       for (const Kind& kind : kinds_) {
         SCOPED_TRACE(photo + " " + kind.name);
@@ -146,7 +118,7 @@ TEST_F(ThumbOrientation, CameraPhotosOfAllOrientationsGiveOnePicture) {
         ASSERT_TRUE(thumb && first);
         EXPECT_EQ(thumb->Width(), first->Width());
         EXPECT_EQ(thumb->Height(), first->Height());
-        EXPECT_TRUE(IsSameWayUp(*thumb, *first));
+        EXPECT_TRUE(HaveSameOrientation(*thumb, *first));
       }
     }
   }

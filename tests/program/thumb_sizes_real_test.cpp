@@ -3,8 +3,6 @@
 #include <cmath>
 
 #include "program/real_program_test.h"
-#include "support/build_paths.h"
-#include "support/images.h"
 
 namespace vela_test::real {
 
@@ -16,7 +14,7 @@ struct PhotoSize {
   int height;
 };
 
-/// How much of its size a photo loses in a thumbnail; never above 1.
+/// The scale of a thumbnail relative to its photo, at most 1.
 double ScaleFor(const PhotoSize& photo, const Kind& kind) {
   const int side =
       kind.fills ? std::min(photo.width, photo.height) : std::max(photo.width, photo.height);
@@ -90,9 +88,9 @@ TEST_F(ThumbSizes, KeepTheAspectOfOddSizes) {
   ExpectSizes(photos, kinds_);
 }
 
-// The converter's outputs are put in order of size after each has got its way of scaling, which
-// then stays with the place in the order: a mixture of both ways comes out turned round.
-TEST_F(ThumbSizes, MixedWaysOfOnePhaseTurnRound) {
+// The converter's outputs are sorted by size after the scaling of each has been chosen by its
+// place: a mixture of both ways of scaling comes out exchanged.
+TEST_F(ThumbSizes, MixedScalingOfOnePhaseIsExchanged) {
   WriteKinds(kProfiles,
              {{"S", 40, false, 0}, {"M", 64, true, 0}, {"B", 80, false, 0}, {"XL", 120, true, 0}});
   const PhotoSize photo = {"a.jpg", 240, 160};

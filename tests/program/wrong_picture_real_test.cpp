@@ -1,13 +1,12 @@
 // A thumbnail never shows another photo's picture, even when ImageMagick would take a photo's name
 // for a pattern or its content for a list of names.
 #include "program/real_program_test.h"
-#include "support/images.h"
 
 namespace vela_test::real {
 
 namespace {
 
-/// Palette indexes: far apart in every way of looking at them.
+/// Palette indexes of very different colours.
 constexpr int kRed = 100;
 constexpr int kGreen = 20;
 
@@ -19,10 +18,10 @@ class WrongPicture : public RealProgramTest {
     RemoveTree(kPhotos);
     MakeDirectories(DirectoryOf(photo));
     MakeDirectories(DirectoryOf(other));
-    // Different shapes: a picture on top of the other leaves some of that to be seen.
+    // Different shapes, so that neither picture can cover the other one completely.
     MakePlainPhoto(InPhotos(photo), kRed, 120, 200);
     MakePlainPhoto(InPhotos(other), kGreen, 200, 120);
-    const std::vector<std::string> directories = {DirectoryOf(photo), DirectoryOf(other)};
+    const Strings directories = {DirectoryOf(photo), DirectoryOf(other)};
     Make(directories);
     Make(directories);
     ExpectPicture(InPhotos(photo), kRed);
@@ -87,7 +86,7 @@ TEST_F(WrongPicture, NumbersInPagedNames) {
   ExpectOwnOrFailed("%d/p.tif", "0/p.tif");
 }
 
-// ImageMagick leaves out the percent sign in front of a bracket.
+// ImageMagick drops the percent sign in front of a bracket.
 TEST_F(WrongPicture, PropertiesInPagedNames) {
   ExpectOwnOrFailed("%[x].tif", "[x].tif");
   ExpectOwnOrFailed("%[x]/p.tif", "[x]/p.tif");

@@ -1,18 +1,9 @@
 // The distance of two images, with a recording stub and with the real tool.
-#include <gmock/gmock.h>
-#include <signal.h>
-
-#include <string>
-
 #include "source/rotation_check.h"
 #include "source/source_fixture.h"
-#include "support/images.h"
 
 namespace vela_test {
 namespace {
-
-using ::testing::ElementsAre;
-using ::testing::IsEmpty;
 
 constexpr int kUnknown = 65535;
 constexpr const char* kFirst = "/tmp/photos/first.jpg";
@@ -25,12 +16,9 @@ class Distance : public SourceTest {
     compare.Plan(plan);
     return CompareImagesMAE(kFirst, kSecond);
   }
-  static int DistanceIn(const std::string& printed) {
-    return DistanceAfter(StubPlan().PrintError(printed).Exit(1));
-  }
 };
 
-TEST_F(Distance, IsAskedOfCompare) {
+TEST_F(Distance, IsMeasuredByCompare) {
   const StubTool compare(kComparePath);
   compare.Plan(StubPlan().PrintError("2841.73 (0.0433621)\n").Exit(1));
   EXPECT_EQ(CompareImagesMAE(kFirst, kSecond), 2841);
@@ -46,36 +34,36 @@ TEST_F(Distance, IsReadFromBothOutputs) {
   EXPECT_EQ(DistanceAfter(StubPlan().Print("14 ").PrintError("15 \n")), 14);
 }
 
-TEST_F(Distance, IsTheWholePartOfTheFirstWord) {
-  EXPECT_EQ(DistanceIn("0 (0)"), 0);
-  EXPECT_EQ(DistanceIn("0.99 (0)"), 0);
-  EXPECT_EQ(DistanceIn("65535 (1)\n"), 65535);
-  EXPECT_EQ(DistanceIn("-3 (0)"), -3);
-  EXPECT_EQ(DistanceIn("7 "), 7);
-  EXPECT_EQ(DistanceIn("word 5"), 0);
-  EXPECT_EQ(DistanceIn(" 5 6"), 0);
+struct Printed : NamedRow {
+  std::string text;
+  int distance;
+};
+
+class PrintedDistance : public Distance, public ::testing::WithParamInterface<Printed> {};
+
+TEST_P(PrintedDistance, IsRead) {
+  EXPECT_EQ(DistanceAfter(StubPlan().PrintError(GetParam().text).Exit(1)), GetParam().distance);
 }
 
-TEST_F(Distance, IsReadFromTheFirstLineOnly) {
-  EXPECT_EQ(DistanceIn("5 (0)\n6 (0)\n"), 5);
-  EXPECT_EQ(DistanceIn("warning\n6 (0)\n"), kUnknown);
-  EXPECT_EQ(DistanceIn("\n6 (0)\n"), kUnknown);
-}
-
-TEST_F(Distance, IsUnknownWithoutASpace) {
-  EXPECT_EQ(DistanceIn("2841.73"), kUnknown);
-  EXPECT_EQ(DistanceIn("2841.73\t(0)\n"), kUnknown);
-  EXPECT_EQ(DistanceIn("\n"), kUnknown);
-  EXPECT_EQ(DistanceIn(std::string(255, '1') + " 5\n"), kUnknown);
-}
-
-TEST_F(Distance, IsReadFromThe255BytesThatALineBeginsWith) {
-  EXPECT_EQ(DistanceIn("5 " + std::string(100000, 'x') + "\n"), 5);
-  EXPECT_EQ(DistanceIn(std::string(252, '0') + "25 5\n"), 25);
-}
+// The distance is the whole part of the first word; a line is read up to its first 255 bytes.
+INSTANTIATE_TEST_SUITE_P(
+    Outputs, PrintedDistance,
+    ::testing::Values(Printed{"Zero", "0 (0)", 0}, Printed{"Fraction", "0.99 (0)", 0},
+                      Printed{"Largest", "65535 (1)\n", 65535}, Printed{"Negative", "-3 (0)", -3},
+                      Printed{"NumberAndSpace", "7 ", 7}, Printed{"Word", "word 5", 0},
+                      Printed{"LeadingSpace", " 5 6", 0}, Printed{"FirstLine", "5 (0)\n6 (0)\n", 5},
+                      Printed{"WarningLine", "warning\n6 (0)\n", kUnknown},
+                      Printed{"EmptyFirstLine", "\n6 (0)\n", kUnknown},
+                      Printed{"NoSpace", "2841.73", kUnknown},
+                      Printed{"Tab", "2841.73\t(0)\n", kUnknown},
+                      Printed{"Newline", "\n", kUnknown},
+                      Printed{"SpaceAfter255Bytes", std::string(255, '1') + " 5\n", kUnknown},
+                      Printed{"LongLine", "5 " + std::string(100000, 'x') + "\n", 5},
+                      Printed{"SpaceWithin255Bytes", std::string(252, '0') + "25 5\n", 25},
+                      Printed{"Nothing", "", kUnknown}),
+    RowName<Printed>);
 
 TEST_F(Distance, IsUnknownWithoutOutput) {
-  EXPECT_EQ(DistanceIn(""), kUnknown);
   EXPECT_EQ(DistanceAfter(StubPlan()), kUnknown);
   EXPECT_EQ(DistanceAfter(StubPlan().DieBySignal(SIGSEGV)), kUnknown);
   EXPECT_THAT(ErrorLines(), IsEmpty());

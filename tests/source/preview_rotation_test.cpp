@@ -1,28 +1,20 @@
 // How far a raw photo's preview is turned.
-#include <gmock/gmock.h>
-#include <signal.h>
 
-#include <optional>
-#include <string>
+#include <functional>
 
 #include "source/orientation.h"
 #include "source/source_fixture.h"
-#include "support/images.h"
-#include "support/raw_photos.h"
 
 namespace vela_test {
 namespace {
 
-using ::testing::ElementsAre;
-using ::testing::IsEmpty;
-
-constexpr const char* kPreview = "/tmp/photos/preview.jpg";
+constexpr const char* kPicture = "/tmp/photos/preview.jpg";
 
 void MakePreview(int orientation) {
   JpegRecipe recipe;
   recipe.orientation = orientation;
   recipe.exif = true;
-  MakeJpeg(kPreview, recipe);
+  MakeJpeg(kPicture, recipe);
 }
 
 class PreviewRotation : public SourceTest {
@@ -36,77 +28,85 @@ class PreviewRotation : public SourceTest {
   static int RotationAfter(const StubPlan& plan) {
     const StubTool exiftool(kExiftoolPath);
     exiftool.Plan(plan);
-    return GetRawPreviewRotation(kRaw, kPreview);
+    return GetRawPreviewRotation(kRaw, kPicture);
   }
   static int RotationIn(const std::string& printed) {
     return RotationAfter(StubPlan().Print(printed));
   }
 
-  /// Nobody asks for the raw photo's rotation; the preview is used as it is.
+  /// The raw photo's rotation is not read; the preview is used as it is.
   static void ExpectNotAsked() {
     const StubTool exiftool(kExiftoolPath);
     exiftool.Plan(StubPlan().Print("Rotation: 90\n"));
-    EXPECT_EQ(GetRawPreviewRotation(kRaw, kPreview), 0);
+    EXPECT_EQ(GetRawPreviewRotation(kRaw, kPicture), 0);
     EXPECT_THAT(exiftool.Calls(), IsEmpty());
   }
 };
 
-TEST_F(PreviewRotation, IsAskedOfExiftool) {
+TEST_F(PreviewRotation, IsReadByExiftool) {
   const StubTool exiftool(kExiftoolPath);
   exiftool.Plan(StubPlan().Print("Rotation: 90\n"));
-  EXPECT_EQ(GetRawPreviewRotation(kRaw, kPreview), 90);
+  EXPECT_EQ(GetRawPreviewRotation(kRaw, kPicture), 90);
   ASSERT_EQ(ParametersOf(exiftool.Calls()), (ArgumentLists{{"-S", "-Rotation", kRaw}}));
   EXPECT_EQ(exiftool.Calls().front().arguments.front(), kExiftoolPath);
   EXPECT_THAT(ErrorLines(), IsEmpty());
 }
 
-TEST_F(PreviewRotation, IsTheNumberThatTheTagBeginsWith) {
-  EXPECT_EQ(RotationIn("Rotation: 0\n"), 0);
-  EXPECT_EQ(RotationIn("Rotation: 180\n"), 180);
-  EXPECT_EQ(RotationIn("Rotation:270\n"), 270);
-  EXPECT_EQ(RotationIn("Rotation: \t 90 \r\n"), 90);
-  EXPECT_EQ(RotationIn("Rotation: 90 degrees\n"), 90);
-  EXPECT_EQ(RotationIn("Rotation: 90.5\n"), 90);
-  EXPECT_EQ(RotationIn("Rotation: -90\n"), -90);
-  EXPECT_EQ(RotationIn("Rotation: Rotate 90 CW\n"), 0);
-  EXPECT_EQ(RotationIn("Rotation: 0x5a\n"), 0);
+struct Printed : NamedRow {
+  std::string text;
+  int rotation;
+};
+
+class PrintedRotation : public PreviewRotation, public ::testing::WithParamInterface<Printed> {};
+
+TEST_P(PrintedRotation, IsRead) {
+  EXPECT_EQ(RotationIn(GetParam().text), GetParam().rotation);
 }
 
-TEST_F(PreviewRotation, OfTheLastLineHolds) {
-  EXPECT_EQ(RotationIn("Rotation: 90\nRotation: 180\n"), 180);
-  EXPECT_EQ(RotationIn("Rotation: 90\nOwner: 5\nRotation: 270\nModel: 6\n"), 270);
-  EXPECT_EQ(RotationIn("Rotation: 90\nRotation: none\n"), 0);
-  EXPECT_EQ(RotationIn("Rotation: 90\nRotation: \n"), 0);
-}
+// The number that the tag begins with.
+INSTANTIATE_TEST_SUITE_P(Values, PrintedRotation,
+                         ::testing::Values(Printed{"Zero", "Rotation: 0\n", 0},
+                                           Printed{"Half", "Rotation: 180\n", 180},
+                                           Printed{"NoSpace", "Rotation:270\n", 270},
+                                           Printed{"WhiteSpace", "Rotation: \t 90 \r\n", 90},
+                                           Printed{"Unit", "Rotation: 90 degrees\n", 90},
+                                           Printed{"Fraction", "Rotation: 90.5\n", 90},
+                                           Printed{"Negative", "Rotation: -90\n", -90},
+                                           Printed{"Words", "Rotation: Rotate 90 CW\n", 0},
+                                           Printed{"Hexadecimal", "Rotation: 0x5a\n", 0},
+                                           Printed{"NoNewline", "Rotation: 270", 270},
+                                           Printed{"Nothing", "", 0}),
+                         RowName<Printed>);
 
-TEST_F(PreviewRotation, IsNotInOtherLines) {
-  EXPECT_EQ(RotationIn("Rotation: 90\nRotation:\n"), 90);
-  EXPECT_EQ(RotationIn("Rotation: 90\nRotation\n"), 90);
-  EXPECT_EQ(RotationIn("AutoRotation: 90\n"), 0);
-  EXPECT_EQ(RotationIn("rotation: 90\n"), 0);
-  EXPECT_EQ(RotationIn(" Rotation: 90\n"), 0);
-  EXPECT_EQ(RotationIn("Rotation : 90\n"), 0);
-  EXPECT_EQ(RotationIn("Owner: Rotation: 90\n"), 0);
-}
+// The last line with the tag counts; a line longer than 255 bytes is read as several.
+const std::string kLongOwner = "Owner: " + std::string(100000, 'x');
 
-TEST_F(PreviewRotation, IsReadFromALineWithoutNewline) {
-  EXPECT_EQ(RotationIn("Rotation: 270"), 270);
-}
-
-TEST_F(PreviewRotation, IsFoundBehindALongLine) {
-  EXPECT_EQ(RotationIn("Owner: " + std::string(100000, 'x') + "\nRotation: 90\n"), 90);
-  EXPECT_EQ(RotationIn(std::string(255, 'x') + "Rotation: 90\n"), 90);
-  EXPECT_EQ(RotationIn(std::string(254, 'x') + "Rotation: 90\n"), 0);
-}
+INSTANTIATE_TEST_SUITE_P(
+    Lines, PrintedRotation,
+    ::testing::Values(Printed{"Last", "Rotation: 90\nRotation: 180\n", 180},
+                      Printed{"LastAmongOthers",
+                              "Rotation: 90\nOwner: 5\nRotation: 270\nModel: 6\n", 270},
+                      Printed{"LastIsAWord", "Rotation: 90\nRotation: none\n", 0},
+                      Printed{"LastIsASpace", "Rotation: 90\nRotation: \n", 0},
+                      Printed{"LastIsEmpty", "Rotation: 90\nRotation:\n", 90},
+                      Printed{"LastHasNoColon", "Rotation: 90\nRotation\n", 90},
+                      Printed{"LongerName", "AutoRotation: 90\n", 0},
+                      Printed{"OtherCase", "rotation: 90\n", 0},
+                      Printed{"LeadingSpace", " Rotation: 90\n", 0},
+                      Printed{"SpaceBeforeColon", "Rotation : 90\n", 0},
+                      Printed{"InAnotherValue", "Owner: Rotation: 90\n", 0},
+                      Printed{"AfterALongLine", kLongOwner + "\nRotation: 90\n", 90},
+                      Printed{"After255Bytes", std::string(255, 'x') + "Rotation: 90\n", 90},
+                      Printed{"After254Bytes", std::string(254, 'x') + "Rotation: 90\n", 0}),
+    RowName<Printed>);
 
 TEST_F(PreviewRotation, IsNoneWithoutOutput) {
-  EXPECT_EQ(RotationIn(""), 0);
   EXPECT_EQ(RotationAfter(StubPlan().PrintError("Rotation: 90\n")), 0);
   EXPECT_EQ(RotationAfter(StubPlan().Exit(1)), 0);
   EXPECT_THAT(ErrorLines(), IsEmpty());
 }
 
-TEST_F(PreviewRotation, GoesByTheOutputNotByTheStatus) {
+TEST_F(PreviewRotation, DependsOnTheOutputNotOnTheStatus) {
   EXPECT_EQ(RotationAfter(StubPlan().Print("Rotation: 90\n").Exit(1)), 90);
   EXPECT_EQ(RotationAfter(StubPlan().Print("Rotation: 90\nRot").DieBySignal(SIGSEGV)), 90);
   EXPECT_EQ(RotationAfter(StubPlan().Print("Rot").DieBySignal(SIGSEGV)), 0);
@@ -114,14 +114,14 @@ TEST_F(PreviewRotation, GoesByTheOutputNotByTheStatus) {
 
 TEST_F(PreviewRotation, NeedsExiftool) {
   RemoveTool(kExiftoolPath);
-  EXPECT_EQ(GetRawPreviewRotation(kRaw, kPreview), 0);
+  EXPECT_EQ(GetRawPreviewRotation(kRaw, kPicture), 0);
   EXPECT_THAT(ErrorLines(),
               ElementsAre("velathumb:196 [Error] VLIBCPopen: /usr/vela/bin/exiftool -S -Rotation "
                           "/tmp/photos/a.dng"));
 }
 
-TEST_F(PreviewRotation, IsNoneForAPreviewThatSaysHowItStands) {
-  for (int orientation = 2; orientation <= 8; ++orientation) {
+TEST_F(PreviewRotation, IsNoneForAPreviewThatIsNotUpright) {
+  for (const int orientation : {0, 2, 3, 4, 5, 6, 7, 8, 9}) {  // 0: no such tag, 9: no such value
     SCOPED_TRACE(orientation);
     MakePreview(orientation);
     ExpectNotAsked();
@@ -129,53 +129,30 @@ TEST_F(PreviewRotation, IsNoneForAPreviewThatSaysHowItStands) {
   EXPECT_THAT(ErrorLines(), IsEmpty());
 }
 
-TEST_F(PreviewRotation, IsNoneForAPreviewWithoutOrientation) {
-  MakePreview(0);
-  ExpectNotAsked();
-  EXPECT_THAT(ErrorLines(), IsEmpty());
-}
-
-TEST_F(PreviewRotation, IsNoneForAnOrientationThatDoesNotExist) {
-  MakePreview(9);
-  ExpectNotAsked();
-  EXPECT_THAT(ErrorLines(), IsEmpty());
-}
-
-class PreviewWithoutExif : public PreviewRotation {
- protected:
-  static void ExpectLogged() {
-    ExpectNotAsked();
-    EXPECT_THAT(ErrorLines(),
-                ElementsAre("velathumb:696 velathumb (696) File not readable or no EXIF data in "
-                            "file /tmp/photos/preview.jpg.\n"));
-  }
+struct BadPreview : NamedRow {
+  std::function<void()> make;
 };
 
-TEST_F(PreviewWithoutExif, IsNotTurned) {
-  MakeJpeg(kPreview);
-  ExpectLogged();
+class PreviewWithoutExif : public PreviewRotation,
+                           public ::testing::WithParamInterface<BadPreview> {};
+
+TEST_P(PreviewWithoutExif, IsLoggedAndNotTurned) {
+  RemoveTree(kPicture);
+  GetParam().make();
+  ExpectNotAsked();
+  EXPECT_THAT(ErrorLines(),
+              ElementsAre("velathumb:696 velathumb (696) File not readable or no EXIF data in "
+                          "file /tmp/photos/preview.jpg.\n"));
 }
 
-TEST_F(PreviewWithoutExif, BecauseItIsMissing) {
-  RemoveTree(kPreview);
-  ExpectLogged();
-}
-
-TEST_F(PreviewWithoutExif, BecauseItIsNoPicture) {
-  WriteFile(kPreview, "no picture");
-  ExpectLogged();
-}
-
-TEST_F(PreviewWithoutExif, BecauseItIsEmpty) {
-  WriteFile(kPreview, "");
-  ExpectLogged();
-}
-
-TEST_F(PreviewWithoutExif, BecauseItIsADirectory) {
-  RemoveTree(kPreview);
-  MakeDirectories(kPreview);
-  ExpectLogged();
-}
+INSTANTIATE_TEST_SUITE_P(
+    Previews, PreviewWithoutExif,
+    ::testing::Values(BadPreview{"Picture", [] { MakeJpeg(kPicture); }},
+                      BadPreview{"Missing", [] {}},
+                      BadPreview{"Text", [] { WriteFile(kPicture, "no picture"); }},
+                      BadPreview{"Empty", [] { WriteFile(kPicture, ""); }},
+                      BadPreview{"Directory", [] { MakeDirectories(kPicture); }}),
+    RowName<BadPreview>);
 
 class RealRotation : public PreviewRotation {
  protected:
@@ -188,7 +165,7 @@ class RealRotation : public PreviewRotation {
     RawRecipe recipe;
     recipe.rotation = stated;
     MakeRawPhoto(kRaw, recipe);
-    return GetRawPreviewRotation(kRaw, kPreview);
+    return GetRawPreviewRotation(kRaw, kPicture);
   }
 };
 
@@ -201,8 +178,8 @@ TEST_F(RealRotation, IsWhatTheRawPhotoStates) {
 }
 
 TEST_F(RealRotation, IsNoneForABrokenOrMissingRawPhoto) {
-  EXPECT_EQ(GetRawPreviewRotation(kRaw, kPreview), 0);  // its content is no photo
-  EXPECT_EQ(GetRawPreviewRotation("/tmp/photos/missing.dng", kPreview), 0);
+  EXPECT_EQ(GetRawPreviewRotation(kRaw, kPicture), 0);  // its content is no photo
+  EXPECT_EQ(GetRawPreviewRotation("/tmp/photos/missing.dng", kPicture), 0);
   EXPECT_THAT(ErrorLines(), IsEmpty());
 }
 

@@ -1,39 +1,22 @@
 // From a raw photo to an ordinary image, with recording stubs.
-#include <gmock/gmock.h>
-#include <signal.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
-#include <optional>
-#include <string>
-
 #include "source/raw_image.h"
 #include "source/source_fixture.h"
-#include "support/images.h"
-#include "support/mounts.h"
 
 using namespace vela;
 
 namespace vela_test {
 namespace {
 
-using ::testing::ElementsAre;
-using ::testing::IsEmpty;
-
-const std::string kPreview = InThumbDir("VELAPHOTO_THUMB_RAW.jpg");
-const std::string kPpm = InThumbDir("RAW_TEMP.ppm");
 const std::string kDecodeFailure = "velathumb:660 Failed to convert raw /tmp/photos/a.dng to pnm";
 const std::string kTurned =
     "velathumb:650 Failed to rotate /tmp/photos/@eaDir/a.dng/VELAPHOTO_THUMB_RAW.jpg to 90 degree";
 
 /// The bytes of a preview of this size.
 std::string PreviewOf(int width, int height, int orientation = 6) {
-  JpegRecipe recipe;
-  recipe.width = width;
-  recipe.height = height;
-  recipe.orientation = orientation;
-  recipe.exif = true;
-  const std::string bytes = ReadFile(MakeJpeg("/tmp/preview.jpg", recipe));
+  const std::string bytes = ReadFile(MakePicture("/tmp/preview.jpg", width, height, orientation));
   RemoveTree("/tmp/preview.jpg");
   return bytes;
 }
@@ -57,7 +40,7 @@ class RawConvert : public SourceTest {
   void PlanPreviewOf(int width, int height) {
     PlanPreview(StubPlan().Print(PreviewOf(width, height)));
   }
-  /// A preview that is large enough and upright, of a photo that was held otherwise.
+  /// A preview that is large enough and marked upright, of a photo with another rotation.
   void PlanTurnedPreview(const std::string& rotation) {
     PlanPreview(StubPlan().Print(PreviewOf(100, 80, 1)));
     exiftool_->Plan(StubPlan().Print("Rotation: " + rotation + "\n"));
@@ -92,7 +75,7 @@ class RawConvert : public SourceTest {
   std::optional<StubTool> exiftool_;
 };
 
-class RawPreview : public RawConvert {};
+using RawPreview = RawConvert;
 
 TEST_F(RawPreview, AsLargeAsTheLargestProfileIsEnough) {
   PlanPreviewOf(100, 80);
@@ -101,7 +84,7 @@ TEST_F(RawPreview, AsLargeAsTheLargestProfileIsEnough) {
   EXPECT_THAT(ErrorLines(), IsEmpty());
 }
 
-TEST_F(RawPreview, StandingIsMeasuredByItsHeight) {
+TEST_F(RawPreview, IsMeasuredByItsLongerSide) {
   PlanPreviewOf(80, 100);
   ExpectPreview();
 }
@@ -165,7 +148,7 @@ TEST_F(RawPreview, IsTurnedInPlace) {
   ASSERT_EQ(ParametersOf(converter_->Calls()),
             (ArgumentLists{{"-rotate", "90", kPreview, kPreview}}));
   EXPECT_EQ(converter_->Calls().front().arguments.front(), kConverterPath);
-  // The line that announces a turn speaks of a failure; it always did.
+  // The line says "Failed" although this is the announcement of a turn.
   EXPECT_THAT(ErrorLines(), ElementsAre(kTurned));
 }
 
@@ -188,7 +171,7 @@ TEST_F(RawPreview, IsNotTurnedByNothing) {
   EXPECT_THAT(ErrorLines(), IsEmpty());
 }
 
-TEST_F(RawPreview, ThatIsNotTurnedIsUsedAsItIsAndNothingIsSaid) {
+TEST_F(RawPreview, ThatCannotBeTurnedIsSilentlyUsedAsItIs) {
   PlanTurnedPreview("90");
   for (const auto& plan : {StubPlan().Exit(1), StubPlan().DieBySignal(SIGSEGV)}) {
     converter_->Plan(plan);
@@ -219,7 +202,7 @@ TEST_F(RawPreview, IsUsedAsItIsWithoutExiftool) {
                                         "/usr/vela/bin/exiftool -S -Rotation /tmp/photos/a.dng"));
 }
 
-class RawDecode : public RawConvert {};
+using RawDecode = RawConvert;
 
 TEST_F(RawDecode, ThatGivesNothingIsAFailure) {
   PlanDecode(StubPlan().PrintError("a.dng: unexpected end of file\n").Exit(1));
@@ -235,8 +218,8 @@ TEST_F(RawDecode, NeedsTheDecoder) {
                                         kDecodeFailure));
 }
 
-TEST_F(RawDecode, OfADecoderThatDiesHalfWayIsUsed) {
-  // What of it is a picture is for the converter to judge.
+TEST_F(RawDecode, OfADecoderThatCrashesIsUsed) {
+  // Whether it is a picture is for the converter to decide.
   PlanDecode(StubPlan().Print("full decode").DieBySignal(SIGSEGV));
   ExpectFullDecode();
 }
@@ -272,7 +255,7 @@ TEST_F(RawDecode, OnAFullVolumeLeavesNothing) {
                           "velathumb:590 write failed, path=" + kPpm + full, kDecodeFailure));
 }
 
-TEST_F(RawDecode, TakesThePlaceThatTheStoredPartOfAPreviewHad) {
+TEST_F(RawDecode, UsesTheSpaceOfARemovedPartialPreview) {
   SmallVolume volume(kThumbDir, 1U << 20U);
   WriteFile(InThumbDir("other"), "x");
   volume.SetAvailable(2 * SmallVolume::PageSize());
@@ -281,30 +264,20 @@ TEST_F(RawDecode, TakesThePlaceThatTheStoredPartOfAPreviewHad) {
   EXPECT_THAT(ThumbDirFiles(), ElementsAre("RAW_TEMP.ppm", "other"));
 }
 
-class RawFile : public RawConvert {
- protected:
-  void ExpectRefused() const {
+using RawFile = RawConvert;
+
+TEST_F(RawFile, ThatIsNoRegularFileIsRefused) {
+  const std::vector<std::function<void()>> kinds = {[] {},  // missing
+                                                    [] { MakeDirectories(kRaw); },
+                                                    [] { ASSERT_EQ(mkfifo(kRaw, 0666), 0); }};
+  for (const auto& make : kinds) {
+    RemoveTree(kRaw);
+    make();
+    ClearLog();
     ExpectNothing();
-    EXPECT_THAT(dcraw_->Calls(), IsEmpty());
     EXPECT_THAT(ErrorLines(), ElementsAre("velathumb:628 /tmp/photos/a.dng is not regular file"));
   }
-};
-
-TEST_F(RawFile, ThatIsMissing) {
-  RemoveTree(kRaw);
-  ExpectRefused();
-}
-
-TEST_F(RawFile, ThatIsADirectory) {
-  RemoveTree(kRaw);
-  MakeDirectories(kRaw);
-  ExpectRefused();
-}
-
-TEST_F(RawFile, ThatIsAPipe) {
-  RemoveTree(kRaw);
-  ASSERT_EQ(mkfifo(kRaw, 0666), 0);
-  ExpectRefused();
+  EXPECT_THAT(dcraw_->Calls(), IsEmpty());
 }
 
 TEST_F(RawFile, ThatIsALinkToAPhotoIsAPhoto) {
@@ -337,13 +310,13 @@ TEST_F(RawFile, WhoseBlocksShrinkIsNotUsed) {
   ExpectNothing();
 }
 
-TEST_F(RawFile, WhoseBlocksStayIsUsedWhateverElseChanges) {
+TEST_F(RawFile, WhoseBlocksStayIsUsedDespiteOtherChanges) {
   PlanDecode(StubPlan().Print("full decode").GrowSizeOnly(kRaw, 100000).SetFileTime(kRaw, 5));
   ExpectFullDecode();
   EXPECT_EQ(FileSize(kRaw), 120000);
 }
 
-TEST_F(RawFile, ThatGoesMeanwhileIsNotUsed) {
+TEST_F(RawFile, ThatIsRemovedMeanwhileIsNotUsed) {
   PlanDecode(StubPlan().Print("full decode").Remove(kRaw));
   ExpectNothing();
   EXPECT_THAT(ErrorLines(), IsEmpty());

@@ -1,24 +1,15 @@
 // The decoder's output as a file.
-#include <gmock/gmock.h>
-#include <signal.h>
 
-#include <string>
 #include <thread>
 
 #include "source/raw_image.h"
 #include "source/source_fixture.h"
-#include "support/image_checks.h"
-#include "support/mounts.h"
 #include "support/quiet_thread.h"
-#include "support/raw_photos.h"
 
 using namespace vela;
 
 namespace vela_test {
 namespace {
-
-using ::testing::ElementsAre;
-using ::testing::IsEmpty;
 
 constexpr const char* kOut = "/tmp/volume/out";
 
@@ -84,7 +75,7 @@ TEST_F(RawCopy, OfNothingIsAFailure) {
   EXPECT_THAT(ErrorLines(), IsEmpty());
 }
 
-TEST_F(RawCopy, GoesByTheOutputNotByTheStatus) {
+TEST_F(RawCopy, DependsOnTheOutputNotOnTheStatus) {
   EXPECT_TRUE(CopyAfter(StubPlan().Print("half a picture").Exit(1)));
   EXPECT_TRUE(CopyAfter(StubPlan().Print("half a picture").DieBySignal(SIGSEGV)));
   EXPECT_EQ(ReadFile(kOut), "half a picture");
@@ -98,53 +89,56 @@ TEST_F(RawCopy, NeedsTheDecoder) {
   EXPECT_THAT(ErrorLines(), ElementsAre("velathumb:569 VLIBCPopen [/usr/bin/dcraw -w -c] failed"));
 }
 
-TEST_F(RawCopy, NeedsAPlace) {
-  RemoveTree("/tmp/volume");
-  EXPECT_FALSE(CopyAfter(StubPlan().Print("picture")));
-  EXPECT_THAT(ErrorLines(), ElementsAre("velathumb:574 fopen failed, path=/tmp/volume/out, "
-                                        "errno=2"));
-}
-
-TEST_F(RawCopy, NeedsAPlaceThatMayBeWritten) {
-  const ReadOnlyMount readOnly("/tmp/volume");
-  EXPECT_FALSE(CopyAfter(StubPlan().Print("picture")));
-  EXPECT_THAT(ErrorLines(), ElementsAre("velathumb:574 fopen failed, path=/tmp/volume/out, "
-                                        "errno=30"));
-}
-
-TEST_F(RawCopy, DoesNotReplaceADirectory) {
+TEST_F(RawCopy, NeedsAPlaceThatCanBeWritten) {
+  const std::string failed = "velathumb:574 fopen failed, path=/tmp/volume/out, errno=";
+  const StubPlan plan = StubPlan().Print("picture");
+  {
+    const ReadOnlyMount readOnly("/tmp/volume");
+    EXPECT_FALSE(CopyAfter(plan));
+  }
   MakeDirectories(kOut);
-  EXPECT_FALSE(CopyAfter(StubPlan().Print("picture")));
-  EXPECT_THAT(ErrorLines(), ElementsAre("velathumb:574 fopen failed, path=/tmp/volume/out, "
-                                        "errno=21"));
+  EXPECT_FALSE(CopyAfter(plan));
+  RemoveTree("/tmp/volume");
+  EXPECT_FALSE(CopyAfter(plan));
+  EXPECT_THAT(ErrorLines(), ElementsAre(failed + "30", failed + "21", failed + "2"));
 }
 
-TEST_F(RawCopy, NeedsRoom) {
-  SmallVolume volume("/tmp/volume", 1U << 20U);
-  WriteFile("/tmp/volume/other", "x");
-  volume.SetAvailable(0);
+constexpr const char* kNoRoom =
+    "velathumb:590 write failed, path=/tmp/volume/out, No space left on device";
+
+/// A small volume at the place of the copy.
+class RawCopyOnASmallVolume : public RawCopy {
+ protected:
+  void SetUp() override {
+    RawCopy::SetUp();
+    volume_.emplace("/tmp/volume", 1U << 20U);
+    WriteFile("/tmp/volume/other", "x");
+  }
+
+  void TearDown() override {
+    volume_.reset();
+    RawCopy::TearDown();
+  }
+
+  std::optional<SmallVolume> volume_;
+};
+
+TEST_F(RawCopyOnASmallVolume, NeedsRoom) {
+  volume_->SetAvailable(0);
   EXPECT_FALSE(CopyAfter(StubPlan().Print("picture")));
-  EXPECT_THAT(ErrorLines(),
-              ElementsAre("velathumb:590 write failed, path=/tmp/volume/out, No space left on "
-                          "device"));
+  EXPECT_THAT(ErrorLines(), ElementsAre(kNoRoom));
 }
 
-TEST_F(RawCopy, NeedsRoomToItsEnd) {
-  SmallVolume volume("/tmp/volume", 1U << 20U);
-  WriteFile("/tmp/volume/other", "x");
-  volume.SetAvailable(4 * SmallVolume::PageSize());
+TEST_F(RawCopyOnASmallVolume, NeedsRoomToItsEnd) {
+  volume_->SetAvailable(4 * SmallVolume::PageSize());
   // Each piece that is read fills one page of the volume, so that none is written in part.
   EXPECT_FALSE(CopyAfter(StubPlan().PrintRepeated(std::string(4096, 'x'), 64)));
   EXPECT_EQ(FileSize(kOut), static_cast<int64_t>(4 * SmallVolume::PageSize()));
-  EXPECT_THAT(ErrorLines(),
-              ElementsAre("velathumb:590 write failed, path=/tmp/volume/out, No space left on "
-                          "device"));
+  EXPECT_THAT(ErrorLines(), ElementsAre(kNoRoom));
 }
 
-TEST_F(RawCopy, IsNotContinuedAfterAShortWrite) {
-  SmallVolume volume("/tmp/volume", 1U << 20U);
-  WriteFile("/tmp/volume/other", "x");
-  volume.SetAvailable(4096);
+TEST_F(RawCopyOnASmallVolume, IsNotContinuedAfterAShortWrite) {
+  volume_->SetAvailable(4096);
   std::thread prompter = StartQuietThread([] {
     while (FileSize(kOut) < 100) {
       std::this_thread::yield();

@@ -1,38 +1,14 @@
 // From a raw photo to an ordinary image, with the real tools on real raw photos.
-#include <gmock/gmock.h>
-
-#include <algorithm>
-#include <memory>
-#include <string>
-#include <vector>
 
 #include "source/raw_image.h"
 #include "source/source_fixture.h"
 #include "support/build_paths.h"
-#include "support/image_checks.h"
 #include "support/program.h"
-#include "support/raw_photos.h"
 
 using namespace vela;
 
 namespace vela_test {
 namespace {
-
-using ::testing::ElementsAre;
-using ::testing::IsEmpty;
-
-const std::string kPreview = InThumbDir("VELAPHOTO_THUMB_RAW.jpg");
-const std::string kPpm = InThumbDir("RAW_TEMP.ppm");
-
-RawRecipe WithPreview(int width, int height) {
-  RawRecipe recipe;
-  recipe.width = 240;
-  recipe.height = 160;
-  recipe.preview.emplace();
-  recipe.preview->width = width;
-  recipe.preview->height = height;
-  return recipe;
-}
 
 class RealRaw : public SourceTest {
  protected:
@@ -50,7 +26,7 @@ class RealRaw : public SourceTest {
     return ConvertRawToJpeg({"/tmp/photos", list}, raw, kThumbDir);
   }
 
-  /// What is there afterwards is what was returned, and nothing else.
+  /// The returned file, and no other, is there.
   static void ExpectOnly(const std::string& result) {
     if (result.empty()) {
       EXPECT_THAT(ThumbDirFiles(), IsEmpty());
@@ -69,7 +45,7 @@ class RealRaw : public SourceTest {
 };
 
 TEST_F(RealRaw, GivesItsPreviewWhenThatIsLargeEnough) {
-  MakeRawPhoto(kRaw, WithPreview(120, 80));
+  MakeRawPhoto(kRaw, RawWithPreview(120, 80));
   EXPECT_EQ(Convert(120), kPreview);
   ExpectOnly(kPreview);
   EXPECT_EQ(QuadrantLetters(kPreview), "RGBY");
@@ -78,7 +54,7 @@ TEST_F(RealRaw, GivesItsPreviewWhenThatIsLargeEnough) {
 }
 
 TEST_F(RealRaw, IsDecodedWhenThePreviewIsTooSmall) {
-  MakeRawPhoto(kRaw, WithPreview(120, 80));
+  MakeRawPhoto(kRaw, RawWithPreview(120, 80));
   EXPECT_EQ(Convert(121), kPpm);
   ExpectOnly(kPpm);
   EXPECT_EQ(LettersOfPpm(kPpm), "RGBY");
@@ -94,7 +70,7 @@ TEST_F(RealRaw, IsDecodedWhenItHasNoPreview) {
 }
 
 TEST_F(RealRaw, IsDecodedWhenItsPreviewIsCut) {
-  RawRecipe recipe = WithPreview(120, 80);
+  RawRecipe recipe = RawWithPreview(120, 80);
   recipe.previewBytes = 100;
   MakeRawPhoto(kRaw, recipe);
   EXPECT_EQ(Convert(16), kPpm);
@@ -104,7 +80,7 @@ TEST_F(RealRaw, IsDecodedWhenItsPreviewIsCut) {
 TEST_F(RealRaw, HasItsPreviewTurnedAsItStates) {
   for (const int degrees : {0, 90, 180, 270}) {
     SCOPED_TRACE(degrees);
-    RawRecipe recipe = WithPreview(120, 80);
+    RawRecipe recipe = RawWithPreview(120, 80);
     recipe.rotation = degrees;
     MakeRawPhoto(kRaw, recipe);
     ClearLog();
@@ -115,8 +91,8 @@ TEST_F(RealRaw, HasItsPreviewTurnedAsItStates) {
   }
 }
 
-TEST_F(RealRaw, HeldOtherwiseHasAPreviewThatSaysSo) {
-  RawRecipe recipe = WithPreview(120, 80);
+TEST_F(RealRaw, WithAnOrientationHasAPreviewWithThisTag) {
+  RawRecipe recipe = RawWithPreview(120, 80);
   recipe.orientation = 6;
   recipe.rotation = 90;
   MakeRawPhoto(kRaw, recipe);
@@ -127,7 +103,7 @@ TEST_F(RealRaw, HeldOtherwiseHasAPreviewThatSaysSo) {
   EXPECT_EQ(LettersOfPpm(kPpm), LettersAfterOrientation(6));
 }
 
-TEST_F(RealRaw, ThatIsNoneGivesNothing) {
+TEST_F(RealRaw, ThatIsNoPhotoGivesNothing) {
   for (const std::string& content :
        {std::string(), std::string("no photo"), std::string(5000, '\0')}) {
     WriteFile(kRaw, content);
@@ -141,7 +117,7 @@ TEST_F(RealRaw, ThatIsNoneGivesNothing) {
 
 class RawOfAnyMaker : public RealRaw {
  protected:
-  /// Converts it in an empty directory; nothing but the result is left.
+  /// Converts it in an empty directory, where nothing but the result remains.
   std::string ConvertAnew(int largest, const std::string& raw) {
     RemoveTree(kThumbDir);
     MakeDirectories(kThumbDir);
@@ -162,7 +138,7 @@ class RawOfAnyMaker : public RealRaw {
 };
 
 TEST_F(RawOfAnyMaker, GivesPreviewOrFullDecode) {
-  ExpectWhole(MakeRawPhoto("/tmp/own/a.dng", WithPreview(120, 80)), 120, 240);
+  ExpectWhole(MakeRawPhoto("/tmp/own/a.dng", RawWithPreview(120, 80)), 120, 240);
   const std::string camera = SharedMediaDirectory() + "/camera_raw.crw";
   if (IsRegularFile(camera)) {
     ExpectWhole(camera, 1440, 2176);
@@ -170,7 +146,7 @@ TEST_F(RawOfAnyMaker, GivesPreviewOrFullDecode) {
 }
 
 TEST_F(RawOfAnyMaker, LeavesOneImageOrNoneWhenItIsCut) {
-  const std::string whole = ReadFile(MakeRawPhoto("/tmp/own/a.dng", WithPreview(120, 80)));
+  const std::string whole = ReadFile(MakeRawPhoto("/tmp/own/a.dng", RawWithPreview(120, 80)));
   for (const size_t part : {1U, 10U, 50U, 99U}) {
     WriteFile("/tmp/own/cut.dng", whole.substr(0, whole.size() * part / 100));
     ConvertAnew(120, "/tmp/own/cut.dng");

@@ -1,25 +1,16 @@
 // The pixel size of photos, raw and not.
-#include <gmock/gmock.h>
-#include <signal.h>
 
 #include <cstdint>
-#include <string>
-#include <vector>
 
 #include "source/raw_image.h"
 #include "source/source_fixture.h"
-#include "support/images.h"
-#include "support/raw_photos.h"
 
 namespace vela_test {
 namespace {
 
-using ::testing::ElementsAre;
-using ::testing::IsEmpty;
-
 constexpr const char* kNone = "none, sizes untouched";
 
-/// Size as text, or what became of a failure.
+/// The size as text, or what a failure left.
 std::string Described(int result, uint32_t width, uint32_t height) {
   const std::string size = std::to_string(width) + "x" + std::to_string(height);
   if (result == 0) {
@@ -44,7 +35,7 @@ std::string SizeOf(const std::string& path) {
 
 class RawSize : public SourceTest {
  protected:
-  /// The size that is read of a decoder doing this.
+  /// The size that is read from a decoder that does this.
   static std::string SizeAfter(const StubPlan& plan) {
     const StubTool decoder(kDcrawPath);
     decoder.Plan(plan);
@@ -55,7 +46,7 @@ class RawSize : public SourceTest {
   }
 };
 
-TEST_F(RawSize, IsAskedOfTheDecoder) {
+TEST_F(RawSize, IsReadByTheDecoder) {
   const StubTool decoder(kDcrawPath);
   decoder.Plan(StubPlan().Print("Output size: 4000 x 3000\n"));
   EXPECT_EQ(RawSizeOf(kRaw), "4000x3000");
@@ -64,65 +55,60 @@ TEST_F(RawSize, IsAskedOfTheDecoder) {
   EXPECT_THAT(ErrorLines(), IsEmpty());
 }
 
-TEST_F(RawSize, IsFoundAmongOtherLines) {
-  EXPECT_EQ(SizeIn("\n"
-                   "Filename: a.dng\n"
-                   "Thumb size:   160 x 120\n"
-                   "Full size:    640 x 480\n"
-                   "Image size:   630 x 470\n"
-                   "Output size:  600 x 400\n"
-                   "Raw colors: 3\n"),
-            "600x400");
+struct Printed : NamedRow {
+  std::string text;
+  std::string size;
+};
+
+class PrintedSize : public RawSize, public ::testing::WithParamInterface<Printed> {};
+
+TEST_P(PrintedSize, IsRead) {
+  EXPECT_EQ(SizeIn(GetParam().text), GetParam().size);
 }
 
-TEST_F(RawSize, OfTheFirstGoodLineHolds) {
-  EXPECT_EQ(SizeIn("Output size: 3 x 4\nOutput size: 5 x 6\n"), "3x4");
-  EXPECT_EQ(SizeIn("Output size: wide\nOutput size: 5 x 6\n"), "5x6");
-}
+// Two numbers with an x, which a picture can have.
+INSTANTIATE_TEST_SUITE_P(
+    Values, PrintedSize,
+    ::testing::Values(Printed{"NoSpaces", "Output size:3x4\n", "3x4"},
+                      Printed{"Tab", "Output size:\t3 x 4 pixels\n", "3x4"},
+                      Printed{"NoNewline", "Output size: 30 x 40", "30x40"},
+                      Printed{"NoValue", "Output size:\n", kNone},
+                      Printed{"Space", "Output size: \n", kNone},
+                      Printed{"OneNumber", "Output size: 3\n", kNone},
+                      Printed{"NoHeight", "Output size: 3 x\n", kNone},
+                      Printed{"NoWidth", "Output size: x 4\n", kNone},
+                      Printed{"OtherWord", "Output size: 3 by 4\n", kNone},
+                      Printed{"Largest", "Output size: 4294967295 x 1\n", "4294967295x1"},
+                      Printed{"TooWide", "Output size: 4294967296 x 1\n", kNone},
+                      Printed{"TooHigh", "Output size: 1 x 99999999999999999999999\n", kNone},
+                      Printed{"ZeroWidth", "Output size: 0 x 4\n", kNone},
+                      Printed{"ZeroHeight", "Output size: 3 x 0\n", kNone},
+                      Printed{"Negative", "Output size: -3 x 4\n", kNone}),
+    RowName<Printed>);
 
-TEST_F(RawSize, IsNotThatOfOtherLines) {
-  EXPECT_EQ(SizeIn("Image size: 3 x 4\nFull size: 5 x 6\n"), kNone);
-  EXPECT_EQ(SizeIn(" Output size: 3 x 4\n"), kNone);
-  EXPECT_EQ(SizeIn("Output size : 3 x 4\n"), kNone);
-  EXPECT_EQ(SizeIn("output size: 3 x 4\n"), kNone);
-  EXPECT_EQ(SizeIn("Output size 3 x 4\n"), kNone);
-  EXPECT_EQ(SizeIn("The Output size: 3 x 4\n"), kNone);
-}
+const std::string kLongOwner = "Owner: " + std::string(10000, 'x');
+const char* const kSeveralSizes =
+    "\nFilename: a.dng\nThumb size:   160 x 120\nFull size:    640 x 480\n"
+    "Image size:   630 x 470\nOutput size:  600 x 400\nRaw colors: 3\n";
 
-TEST_F(RawSize, IsTwoNumbersWithAnX) {
-  EXPECT_EQ(SizeIn("Output size:3x4\n"), "3x4");
-  EXPECT_EQ(SizeIn("Output size:\t3 x 4 pixels\n"), "3x4");
-  EXPECT_EQ(SizeIn("Output size:\n"), kNone);
-  EXPECT_EQ(SizeIn("Output size: \n"), kNone);
-  EXPECT_EQ(SizeIn("Output size: 3\n"), kNone);
-  EXPECT_EQ(SizeIn("Output size: 3 x\n"), kNone);
-  EXPECT_EQ(SizeIn("Output size: 3 by 4\n"), kNone);
-  EXPECT_EQ(SizeIn("Output size: x 4\n"), kNone);
-}
-
-TEST_F(RawSize, IsOneThatAPictureCanHave) {
-  EXPECT_EQ(SizeIn("Output size: 4294967295 x 1\n"), "4294967295x1");
-  EXPECT_EQ(SizeIn("Output size: 4294967296 x 1\n"), kNone);
-  EXPECT_EQ(SizeIn("Output size: 1 x 99999999999999999999999\n"), kNone);
-  EXPECT_EQ(SizeIn("Output size: 0 x 4\n"), kNone);
-  EXPECT_EQ(SizeIn("Output size: 3 x 0\n"), kNone);
-  EXPECT_EQ(SizeIn("Output size: -3 x 4\n"), kNone);
-}
-
-TEST_F(RawSize, IsReadFromALineWithoutNewline) {
-  EXPECT_EQ(SizeIn("Output size: 30 x 40"), "30x40");
-}
-
-TEST_F(RawSize, IsFoundBehindALongLine) {
-  EXPECT_EQ(SizeIn("Owner: " + std::string(10000, 'x') + "\nOutput size: 3 x 4\n"), "3x4");
-}
-
-TEST_F(RawSize, OfTheRestOfALongLineIsReadAsALine) {
-  // What lies behind the first 255 bytes of a line is looked at as if it were one.
-  EXPECT_EQ(SizeIn(std::string(255, 'x') + "Output size: 3 x 4\n"), "3x4");
-  EXPECT_EQ(SizeIn(std::string(254, 'x') + "Output size: 3 x 4\n"), kNone);
-  EXPECT_EQ(SizeIn(std::string(256, 'x') + "Output size: 3 x 4\n"), kNone);
-}
+// The first good line counts; what follows the first 255 bytes of a line is read as another line.
+INSTANTIATE_TEST_SUITE_P(
+    Lines, PrintedSize,
+    ::testing::Values(
+        Printed{"AmongOthers", kSeveralSizes, "600x400"},
+        Printed{"First", "Output size: 3 x 4\nOutput size: 5 x 6\n", "3x4"},
+        Printed{"FirstGoodOne", "Output size: wide\nOutput size: 5 x 6\n", "5x6"},
+        Printed{"OtherNames", "Image size: 3 x 4\nFull size: 5 x 6\n", kNone},
+        Printed{"LeadingSpace", " Output size: 3 x 4\n", kNone},
+        Printed{"SpaceBeforeColon", "Output size : 3 x 4\n", kNone},
+        Printed{"OtherCase", "output size: 3 x 4\n", kNone},
+        Printed{"NoColon", "Output size 3 x 4\n", kNone},
+        Printed{"LongerName", "The Output size: 3 x 4\n", kNone},
+        Printed{"AfterALongLine", kLongOwner + "\nOutput size: 3 x 4\n", "3x4"},
+        Printed{"After255Bytes", std::string(255, 'x') + "Output size: 3 x 4\n", "3x4"},
+        Printed{"After254Bytes", std::string(254, 'x') + "Output size: 3 x 4\n", kNone},
+        Printed{"After256Bytes", std::string(256, 'x') + "Output size: 3 x 4\n", kNone}),
+    RowName<Printed>);
 
 TEST_F(RawSize, IsMissingInAnEmptyOutput) {
   EXPECT_EQ(SizeIn(""), kNone);
@@ -130,16 +116,10 @@ TEST_F(RawSize, IsMissingInAnEmptyOutput) {
   EXPECT_THAT(ErrorLines(), IsEmpty());
 }
 
-TEST_F(RawSize, IsNotReadFromTheErrorOutput) {
+TEST_F(RawSize, DependsOnTheOutputNotOnTheStatus) {
   EXPECT_EQ(SizeAfter(StubPlan().PrintError("Output size: 3 x 4\n")), kNone);
-}
-
-TEST_F(RawSize, OfADecoderThatFailsAfterwardsHolds) {
   EXPECT_EQ(SizeAfter(StubPlan().Print("Output size: 3 x 4\n").Exit(1)), "3x4");
   EXPECT_EQ(SizeAfter(StubPlan().Print("Output size: 3 x 4\n").DieBySignal(SIGSEGV)), "3x4");
-}
-
-TEST_F(RawSize, OfADecoderThatDiesHalfWay) {
   EXPECT_EQ(SizeAfter(StubPlan().Print("Full size: 3 x 4\nOutput si").DieBySignal(SIGSEGV)), kNone);
   EXPECT_THAT(ErrorLines(), IsEmpty());
 }
@@ -152,7 +132,7 @@ TEST_F(RawSize, NeedsTheDecoder) {
       ElementsAre("velathumb:83 [Error] VLIBCPopen: /usr/bin/dcraw -i -v /tmp/photos/a.dng"));
 }
 
-class PhotoSize : public SourceTest {};
+using PhotoSize = SourceTest;
 
 TEST_F(PhotoSize, OfARawPhotoIsThatOfItsFullDecode) {
   RawRecipe recipe;
@@ -171,7 +151,7 @@ TEST_F(PhotoSize, OfABrokenRawPhoto) {
   EXPECT_THAT(ErrorLines(), IsEmpty());
 }
 
-TEST_F(PhotoSize, IsAskedOfTheDecoderForRawNamesOnly) {
+TEST_F(PhotoSize, IsReadByTheDecoderForRawNamesOnly) {
   const StubTool decoder(kDcrawPath);
   decoder.Plan(StubPlan().Print("Output size: 3 x 4\n"));
   for (const char* name : {"a.dng", "a.NEF", "a.b.Cr2"}) {

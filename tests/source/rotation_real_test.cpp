@@ -1,28 +1,16 @@
-// The turn of thumbnails is recognised from the photo alone, with the real tools on real pictures.
-#include <gmock/gmock.h>
-
-#include <string>
-#include <vector>
+// The rotation of thumbnails is recognised from the photo alone, with the real tools.
 
 #include "profiles/photo_thumb_plan.h"
 #include "source/raw_image.h"
 #include "source/rotation_check.h"
 #include "source/source_fixture.h"
 #include "support/build_paths.h"
-#include "support/image_checks.h"
-#include "support/images.h"
 #include "support/program.h"
-#include "support/raw_photos.h"
 
 using namespace vela;
 
 namespace vela_test {
 namespace {
-
-using ::testing::ElementsAre;
-using ::testing::IsEmpty;
-
-constexpr const char* kPhoto = "/tmp/photos/a.jpg";
 
 class RealTurn : public SourceTest {
  protected:
@@ -41,7 +29,7 @@ class RealTurn : public SourceTest {
     MakeJpeg(kPhoto, recipe);
   }
 
-  /// Makes the thumbnails as for an owner who turned them.
+  /// Makes thumbnails that their owner has turned.
   void PutThumbs(int degrees, const std::string& source = kPhoto) const {
     RemoveTree(kThumbDir);
     ASSERT_EQ(CreatePhotoThumbs(Job(), 0, source, kThumbDir, false, false, degrees), 0);
@@ -78,7 +66,7 @@ TEST_P(EachTurn, OfAPortrait) {
   ExpectRecognised();
 }
 
-TEST_P(EachTurn, OfAPhotoThatWasSavedAnew) {
+TEST_P(EachTurn, OfAPhotoThatWasSavedAgain) {
   PutPhoto(240, 160);
   PutThumbs(degrees_);
   PutPhoto(240, 160, 40);
@@ -102,8 +90,8 @@ TEST_P(EachTurn, ByASmallThumbnailAlone) {
 }
 
 TEST_P(EachTurn, IsDoneTwiceToThumbnailsBelowTheLargestOfARun) {
-  // Each of them is made of the largest, which is turned already, and is turned as it was. The
-  // check goes by the largest.
+  // They are made from the largest one, which is turned already, and are turned once more. The
+  // check uses the largest one.
   PutPhoto(240, 160);
   PutThumbs(degrees_);
   EXPECT_EQ(QuadrantLetters(InThumbDir("VELAPHOTO_THUMB_M.jpg")),
@@ -122,8 +110,8 @@ TEST_P(EachTurn, OfARawPhotosFullDecode) {
   ExpectRecognised(decoded);
 }
 
-// A picture with all that cameras see, where there is one.
-TEST_P(EachTurn, OfACameraPhotoSavedAnew) {
+// A real camera picture, if this machine has one.
+TEST_P(EachTurn, OfACameraPhotoSavedAgain) {
   const std::string camera = SharedMediaDirectory() + "/no_exif.jpg";
   if (IsRegularFile(camera)) {
     CopyFile(camera, kPhoto);
@@ -173,7 +161,7 @@ TEST_F(RealTurn, IsNoneForAnUnreadablePhoto) {
   EXPECT_THAT(ThumbDirFiles(), ElementsAre("VELAPHOTO_THUMB_M.jpg", "VELAPHOTO_THUMB_XL.jpg"));
 }
 
-TEST_F(RealTurn, CannotBeToldWithoutCompare) {
+TEST_F(RealTurn, IsUnknownWithoutCompare) {
   RemoveTool(kComparePath);
   PutPhoto(240, 160);
   PutThumbs(180);
@@ -183,7 +171,7 @@ TEST_F(RealTurn, CannotBeToldWithoutCompare) {
   EXPECT_THAT(ThumbDirFiles(), ElementsAre("VELAPHOTO_THUMB_M.jpg", "VELAPHOTO_THUMB_XL.jpg"));
 }
 
-TEST_F(RealTurn, OfAPlainPictureIsADraw) {
+TEST_F(RealTurn, OfAPlainPictureIsAmbiguous) {
   WriteFile("/tmp/plain.pgm", "P5\n240 160\n255\n" + std::string(240 * 160, '\x80'));
   const ProgramResult drawn = RunProgram(kConverterPath, {"/tmp/plain.pgm", kPhoto});
   ASSERT_EQ(drawn.exitCode, 0) << drawn.err;

@@ -1,24 +1,35 @@
-// A raw photo, its metadata directory, the profiles of a run and what the log says of them.
+// Fixture: a metadata directory and the profiles of a run.
 #pragma once
 
 #include <gmock/gmock.h>
+#include <signal.h>
 #include <sys/wait.h>
 
 #include <cerrno>
 #include <memory>
+#include <optional>
 #include <string>
 #include <vector>
 
 #include "profiles/directory_job.h"
 #include "profiles/thumbnail_profile.h"
 #include "support/files.h"
+#include "support/image_checks.h"
 #include "support/images.h"
+#include "support/mounts.h"
+#include "support/named_rows.h"
+#include "support/raw_photos.h"
 #include "support/sandbox.h"
 #include "support/stub_tool.h"
 #include "support/system_log.h"
 
 namespace vela_test {
 
+using ::testing::ElementsAre;
+using ::testing::IsEmpty;
+using ::testing::SizeIs;
+
+constexpr const char* kPhoto = "/tmp/photos/a.jpg";
 constexpr const char* kRaw = "/tmp/photos/a.dng";
 constexpr const char* kThumbDir = "/tmp/photos/@eaDir/a.dng";
 
@@ -27,13 +38,30 @@ inline std::string InThumbDir(const std::string& name) {
   return std::string(kThumbDir) + "/" + name;
 }
 
-/// Makes a JPEG of this size without any metadata. Returns `path`.
-inline std::string MakePicture(const std::string& path, int width, int height) {
+/// Makes a JPEG of this size without any metadata but an orientation, if given. Returns `path`.
+inline std::string MakePicture(const std::string& path, int width, int height,
+                               int orientation = 0) {
   JpegRecipe recipe;
   recipe.width = width;
   recipe.height = height;
+  recipe.orientation = orientation;
   return MakeJpeg(path, recipe);
 }
+
+/// A raw photo of 240 x 160 pixels with a preview of this size.
+inline RawRecipe RawWithPreview(int width, int height) {
+  RawRecipe recipe;
+  recipe.width = 240;
+  recipe.height = 160;
+  recipe.preview.emplace();
+  recipe.preview->width = width;
+  recipe.preview->height = height;
+  return recipe;
+}
+
+/// Where the full decode and the preview of kRaw are stored.
+const std::string kPpm = InThumbDir("RAW_TEMP.ppm");
+const std::string kPreview = InThumbDir("VELAPHOTO_THUMB_RAW.jpg");
 
 class SourceTest : public SandboxTest {
  protected:

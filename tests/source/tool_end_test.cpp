@@ -1,22 +1,17 @@
-// Tools that have more to say than is read of them, or will not end: each is waited for.
-#include <gmock/gmock.h>
-#include <signal.h>
+// Tools that print more than is read, or do not end: each is waited for.
 
 #include <chrono>
 #include <functional>
-#include <string>
-#include <vector>
 
 #include "source/orientation.h"
 #include "source/raw_image.h"
 #include "source/rotation_check.h"
 #include "source/source_fixture.h"
-#include "support/images.h"
 
 namespace vela_test {
 namespace {
 
-constexpr const char* kPreview = "/tmp/photos/preview.jpg";
+constexpr const char* kPicture = "/tmp/photos/preview.jpg";
 constexpr const char* kOut = "/tmp/photos/out";
 constexpr size_t kManyTimes = 4000;
 
@@ -39,8 +34,8 @@ int ReadSize() {
 std::vector<Reader> Readers() {
   return {
       {kDcrawPath, "Output size: 12 x 34\n", ReadSize, 12},
-      {kExiftoolPath, "Rotation: 90\n", [] { return GetRawPreviewRotation(kRaw, kPreview); }, 90},
-      {kComparePath, "56 (0.1)\n", [] { return CompareImagesMAE(kRaw, kPreview); }, 56},
+      {kExiftoolPath, "Rotation: 90\n", [] { return GetRawPreviewRotation(kRaw, kPicture); }, 90},
+      {kComparePath, "56 (0.1)\n", [] { return CompareImagesMAE(kRaw, kPicture); }, 56},
       {kDcrawPath, "picture", [] { return DcrawToFile(kRaw, kOut, "-w") ? 1 : 0; }, 1}};
 }
 
@@ -50,12 +45,12 @@ class ToolEnd : public SourceTest {
     SourceTest::SetUp();
     JpegRecipe upright;
     upright.orientation = 1;
-    MakeJpeg(kPreview, upright);
+    MakeJpeg(kPicture, upright);
     WriteFile(kRaw, "raw");
   }
 
-  /// Each reader gets its answer of a tool that prints it between these steps, and has waited for
-  /// the tool's end when it comes back.
+  /// Each reader gets its answer from a tool with this plan, and the tool has ended when the reader
+  /// returns.
   static void ExpectAnswered(const std::function<StubPlan(const std::string&)>& plan) {
     for (const Reader& reader : Readers()) {
       SCOPED_TRACE(reader.tool + std::string(": ") + reader.printed);
@@ -82,7 +77,7 @@ TEST_F(ToolEnd, OfOneThatPrintsMuchMoreAndFails) {
   });
 }
 
-TEST_F(ToolEnd, OfOneThatComplainsAtLength) {
+TEST_F(ToolEnd, OfOneThatPrintsManyErrors) {
   ExpectAnswered([](const auto& printed) {
     return StubPlan()
         .Print(printed)
@@ -91,7 +86,7 @@ TEST_F(ToolEnd, OfOneThatComplainsAtLength) {
   });
 }
 
-TEST_F(ToolEnd, OfOneThatDoesNotCareWhetherAnybodyListens) {
+TEST_F(ToolEnd, OfOneThatIgnoresSigpipe) {
   ExpectAnswered([](const auto& printed) {
     return StubPlan()
         .IgnoreSignal(SIGPIPE)
@@ -103,12 +98,12 @@ TEST_F(ToolEnd, OfOneThatDoesNotCareWhetherAnybodyListens) {
   });
 }
 
-TEST_F(ToolEnd, IsAwaitedWhenItsOutputEndsBefore) {
+TEST_F(ToolEnd, IsWaitedForWhenItsOutputEndsBefore) {
   ExpectAnswered(
       [](const auto& printed) { return StubPlan().Print(printed).CloseOutput().Sleep(20); });
 }
 
-TEST_F(ToolEnd, OfOneWhoseOutputFindsNoPlace) {
+TEST_F(ToolEnd, OfOneWhoseOutputCannotBeStored) {
   const StubTool tool(kDcrawPath);
   tool.Plan(StubPlan().IgnoreSignal(SIGPIPE).PrintRepeated(kKilobyte, kManyTimes).Exit(0));
   EXPECT_FALSE(DcrawToFile(kRaw, "/tmp/nowhere/out", "-w"));

@@ -1,11 +1,6 @@
 // Lines of a tool's output and what they state.
 #include "source/tool_output.h"
 
-#include <gmock/gmock.h>
-
-#include <string>
-#include <vector>
-
 #include "platform/vlibc.h"
 #include "source/source_fixture.h"
 
@@ -14,12 +9,9 @@ using namespace vela;
 namespace vela_test {
 namespace {
 
-using ::testing::ElementsAre;
-using ::testing::IsEmpty;
-
 class ToolLines : public SourceTest {
  protected:
-  /// What is read of a tool that prints this.
+  /// The lines that are read from a tool that prints this.
   static std::vector<std::string> LinesOf(const std::string& printed) {
     const StubTool tool(kDcrawPath);
     tool.Plan(StubPlan().Print(printed));

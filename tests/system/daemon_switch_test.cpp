@@ -1,4 +1,4 @@
-// The daemon's switch and the runner that heeds it.
+// The daemon's switch, which the runner obeys.
 #include <gtest/gtest.h>
 
 #include <chrono>

@@ -43,7 +43,7 @@ unsigned Seed() {
   return kSeed + static_cast<unsigned>(GTEST_FLAG_GET(random_seed));
 }
 
-/// Who is killed when: each about as often, the runner last.
+/// The order of the kills: each program about as often, the runner last.
 std::vector<Victim> MakePlan(std::mt19937* random) {
   std::vector<Victim> plan;
   for (int i = 0; i < kKills - 1; ++i) {
@@ -95,7 +95,7 @@ class KilledProgramsTest : public SandboxTest {
   int topUps_ = 0;
 };
 
-/// Sees to it that there is work left to be killed at.
+/// Makes sure that there is work left to interrupt.
 void KilledProgramsTest::TopUp() {
   if (Machine::HasQueue()) {
     return;
@@ -145,7 +145,7 @@ void KilledProgramsTest::ExpectThumbsOrMarkers() const {
   }
 }
 
-/// What the library says of each photo that can be read: also that no thumbnail is older than it.
+/// The status of each photo that can be read, which also means that no thumbnail is older than it.
 void KilledProgramsTest::ExpectNothingMissing() const {
   constexpr int32_t kAskForClasses = -1;
   for (const std::string& photo : library_->Photos()) {
@@ -160,7 +160,7 @@ void KilledProgramsTest::ExpectNothingMissing() const {
   }
 }
 
-/// What was worked on once only may have been posted to a daemon that was dead.
+/// A photo that was processed only once may have been posted to a dead daemon.
 void KilledProgramsTest::ExpectPosted() const {
   const std::set<std::string> posted = PostedPhotos();
   for (const std::string& photo : library_->Photos()) {
@@ -199,13 +199,13 @@ void KilledProgramsTest::ExpectAllDone() const {
 TEST_F(KilledProgramsTest, InTheEndEverythingIsDoneAndNothingIsLost) {
   std::cout << "seed " << Seed() << std::endl;
   const auto began = std::chrono::steady_clock::now();
-  const auto tell = [&](const char* what) {
+  const auto log = [&](const char* what) {
     const auto passed = std::chrono::steady_clock::now() - began;
     std::cout << std::chrono::duration_cast<milliseconds>(passed).count() << " ms: " << what
               << std::endl;
   };
   machine_->StartDaemon();
-  // The only time in this test: whatever is killed, nobody asks for this directory again.
+  // The only request for this directory in this test, whatever is killed.
   Enqueue({library_->LoneEntry()});
   Enqueue(library_->Entries());
   machine_->StartFollowingRunner();
@@ -213,13 +213,13 @@ TEST_F(KilledProgramsTest, InTheEndEverythingIsDoneAndNothingIsLost) {
   if (HasFatalFailure()) {
     return;
   }
-  tell("killed a hundred times");
+  log("killed a hundred times");
 
-  // What the killed ones have left is worked off by a runner that takes it up, one velathumb at a
-  // time: two that add to a counter at once can lose an addition.
+  // A runner processes what the killed programs have left, one velathumb at a time: two that add to
+  // a counter at once can lose an addition.
   machine_->KillRunner();
   ASSERT_EQ(Machine::RunRunner().exitCode, 0);
-  tell("worked off");
+  log("queue processed");
   EXPECT_FALSE(Machine::HasQueue());
   ExpectThumbsOrMarkers();
   ExpectNothingMissing();
@@ -242,7 +242,7 @@ TEST_F(KilledProgramsTest, InTheEndEverythingIsDoneAndNothingIsLost) {
   Enqueue(library_->Videos(), kVideoQueueFile);
   const ProgramResult last = Machine::RunRunner({"--check-videos"});
   EXPECT_EQ(last.exitCode, 0) << last.err;
-  tell("undisturbed run");
+  log("undisturbed run");
   EXPECT_FALSE(Machine::HasQueue());
   ExpectAllDone();
   // The damaged photo is alone in its directory, so that this does not come back.
@@ -255,16 +255,16 @@ TEST_F(KilledProgramsTest, InTheEndEverythingIsDoneAndNothingIsLost) {
     EXPECT_EQ(name.find(".pid"), std::string::npos) << name;
   }
 
-  VELA_MEDIA_INFO film = {};
-  EXPECT_EQ(GetMediaFromPluginDB(THUMB_TYPE_VIDEO, library_->Videos().front().c_str(), film), 0);
-  EXPECT_EQ(film.width, 64);
-  EXPECT_EQ(film.height, 48);
+  VELA_MEDIA_INFO video = {};
+  EXPECT_EQ(GetMediaFromPluginDB(THUMB_TYPE_VIDEO, library_->Videos().front().c_str(), video), 0);
+  EXPECT_EQ(video.width, 64);
+  EXPECT_EQ(video.height, 48);
   const auto daemon = machine_->StopDaemon();
   ASSERT_TRUE(daemon);
   EXPECT_EQ(daemon->exitCode, 0) << daemon->err;
   ExpectPosted();
   EXPECT_THAT(AskIndexDatabase("PRAGMA integrity_check"), ElementsAre("ok"));
-  tell("checked");
+  log("checked");
   std::cout << topUps_ << " times more work, " << incomplete << " photos to do in the end, "
             << missing << " thumbnails" << std::endl;
 }

@@ -41,7 +41,7 @@ void ExpectKilled(std::optional<Program>* program, const char* name) {
   (*program)->Kill(SIGKILL);
   const auto result = (*program)->Wait(seconds(10));
   ASSERT_TRUE(result) << name;
-  // One that had ended before on its own has something to say.
+  // A program that had ended by itself before printed the reason.
   EXPECT_EQ(result->signal, SIGKILL) << name << ": " << result->exitCode << '\n' << result->err;
   program->reset();
 }

@@ -1,4 +1,4 @@
-// The photos and videos that the programs work on, and what has become of them.
+// The photos and videos that the programs process, and the state of their thumbnails.
 #pragma once
 
 #include <set>
@@ -7,7 +7,7 @@
 
 namespace vela_test {
 
-/// What is there of a photo's six thumbnails.
+/// The state of a photo's six thumbnails.
 struct PhotoState {
   int thumbs = 0;                   ///< whole JPEGs
   int markers = 0;                  ///< failure markers in place of one
@@ -29,7 +29,7 @@ class PhotoLibrary {
   /// Makes a directory with `count` photos, one of them raw, that is not among the entries.
   void AddLoneDirectory(int count);
 
-  /// What to put into the queue so that everything but the lone directory is worked on.
+  /// The queue entries for everything but the lone directory.
   std::vector<std::string> Entries() const { return entries_; }
 
   /// The directory that is not among these.
@@ -54,7 +54,7 @@ class PhotoLibrary {
   std::vector<std::string> videos_;
 };
 
-/// Looks at a photo's thumbnails; an unreadable one is told as a failure of the test.
+/// Reads a photo's thumbnails; an unreadable one fails the test.
 PhotoState StateOf(const std::string& photo);
 
 }  // namespace vela_test

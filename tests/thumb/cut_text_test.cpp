@@ -1,9 +1,6 @@
 // Texts as a fixed-size buffer would hold them.
 #include "posix/cut_text.h"
-
-#include <gtest/gtest.h>
-
-#include <string>
+#include "thumb/thumb_test.h"
 
 using namespace vela;
 
@@ -11,20 +8,20 @@ namespace vela_test {
 namespace {
 
 TEST(CutText, KeepsWhatFitsWithItsTerminator) {
-  EXPECT_EQ("", CutText(""));
-  EXPECT_EQ("abc", CutText("abc"));
-  EXPECT_EQ(std::string(4095, 'a'), CutText(std::string(4095, 'a')));
+  EXPECT_EQ(CutText(""), "");
+  EXPECT_EQ(CutText("abc"), "abc");
+  EXPECT_EQ(CutText(std::string(4095, 'a')), std::string(4095, 'a'));
 }
 
 TEST(CutText, CutsTheRest) {
-  EXPECT_EQ(std::string(4095, 'a'), CutText(std::string(4095, 'a') + "b"));
-  EXPECT_EQ(std::string(4095, 'a'), CutText(std::string(10000, 'a')));
+  EXPECT_EQ(CutText(std::string(4095, 'a') + "b"), std::string(4095, 'a'));
+  EXPECT_EQ(CutText(std::string(10000, 'a')), std::string(4095, 'a'));
 }
 
 TEST(CutText, KnowsOtherSizes) {
-  EXPECT_EQ("abc", CutText("abcd", 4));
-  EXPECT_EQ("abcd", CutText("abcd", 5));
-  EXPECT_EQ("", CutText("abcd", 1));
+  EXPECT_EQ(CutText("abcd", 4), "abc");
+  EXPECT_EQ(CutText("abcd", 5), "abcd");
+  EXPECT_EQ(CutText("abcd", 1), "");
 }
 
 }  // namespace

@@ -1,32 +1,14 @@
 // The lock that keeps a second instance out of a directory.
 #include "thumb/directory_lock.h"
 
-#include <fcntl.h>
-#include <gmock/gmock.h>
-#include <gtest/gtest.h>
 #include <sys/file.h>
-#include <sys/stat.h>
-#include <unistd.h>
 
-#include <cerrno>
-#include <string>
-
-#include "support/files.h"
-#include "support/privileges.h"
-#include "support/sandbox.h"
-#include "support/seccomp_fail.h"
-#include "support/system_log.h"
-#include "thumb/fork_call.h"
-#include "thumb/open_files.h"
+#include "thumb/thumb_test.h"
 
 using namespace vela;
 
 namespace vela_test {
 namespace {
-
-using ::testing::ElementsAre;
-using ::testing::IsEmpty;
-using ::testing::SizeIs;
 
 constexpr const char* kRoot = "/tmp/@eaDir";
 
@@ -48,7 +30,7 @@ class LockedDirectory : public SandboxTest {
   }
 };
 
-TEST_F(LockedDirectory, KeepsEverybodyOut) {
+TEST_F(LockedDirectory, ExcludesAllOthers) {
   const DirectoryLock lock(kRoot);
   EXPECT_TRUE(lock.IsHeld());
   EXPECT_FALSE(CanBeLockedElsewhere(LOCK_EX));
@@ -62,7 +44,7 @@ TEST_F(LockedDirectory, IsFreeAfterTheEnd) {
   EXPECT_THAT(DescriptorsOf(kRoot), IsEmpty());
 }
 
-TEST_F(LockedDirectory, IsReleasedAtTheEndWhoeverElseHasTheDescriptor) {
+TEST_F(LockedDirectory, IsReleasedAtTheEndDespiteACopyOfTheDescriptor) {
   int copy = -1;
   {
     const DirectoryLock lock(kRoot);
@@ -76,7 +58,7 @@ TEST_F(LockedDirectory, IsReleasedAtTheEndWhoeverElseHasTheDescriptor) {
 TEST_F(LockedDirectory, IsNotInheritedByPrograms) {
   const DirectoryLock lock(kRoot);
   ASSERT_THAT(DescriptorsOf(kRoot), SizeIs(1));
-  EXPECT_EQ(FD_CLOEXEC, fcntl(DescriptorsOf(kRoot)[0], F_GETFD));
+  EXPECT_EQ(fcntl(DescriptorsOf(kRoot)[0], F_GETFD), FD_CLOEXEC);
 }
 
 TEST_F(LockedDirectory, IsNotWaitedFor) {
@@ -88,15 +70,15 @@ TEST_F(LockedDirectory, IsNotWaitedFor) {
   EXPECT_THAT(ErrorLines(), ElementsAre("velathumb:849 Failed to lock /tmp/@eaDir"));
 }
 
-TEST_F(LockedDirectory, TheLoserLeavesTheOthersLockAlone) {
+TEST_F(LockedDirectory, IsNotReleasedByAFailedAttempt) {
   const DirectoryLock first(kRoot);
   { const DirectoryLock second(kRoot); }
   EXPECT_FALSE(CanBeLockedElsewhere());
 }
 
-TEST_F(LockedDirectory, ASharedLockOfAnotherKeepsItOutToo) {
+TEST_F(LockedDirectory, IsNotGrantedBesideASharedLock) {
   const int other = open(kRoot, O_RDONLY | O_CLOEXEC);
-  ASSERT_EQ(0, flock(other, LOCK_SH));
+  ASSERT_EQ(flock(other, LOCK_SH), 0);
   EXPECT_FALSE(DirectoryLock(kRoot).IsHeld());
   close(other);
   EXPECT_THAT(ErrorLines(), ElementsAre("velathumb:849 Failed to lock /tmp/@eaDir"));
@@ -104,12 +86,13 @@ TEST_F(LockedDirectory, ASharedLockOfAnotherKeepsItOutToo) {
 
 TEST_F(LockedDirectory, LogsAVolumeWithoutLocks) {
   const BeforeExec refuseLocks = SeccompFail(FlockCalls(), ENOLCK);
-  EXPECT_EQ(0, ForkCall([&] {
+  EXPECT_EQ(ForkCall([&] {
               return refuseLocks() == 0 && !DirectoryLock(kRoot).IsHeld() &&
                              DescriptorsOf(kRoot).empty()
                          ? 0
                          : 1;
-            }));
+            }),
+            0);
   EXPECT_THAT(ErrorLines(), ElementsAre("velathumb:849 Failed to lock /tmp/@eaDir"));
 }
 
@@ -119,24 +102,25 @@ TEST_F(LockedDirectory, LogsADirectoryThatIsMissing) {
 }
 
 TEST_F(LockedDirectory, LogsADirectoryThatMayNotBeRead) {
-  ASSERT_EQ(0, chmod(kRoot, 0333));
+  ASSERT_EQ(chmod(kRoot, 0333), 0);
   const WithoutCapabilities ordinary;
   EXPECT_FALSE(DirectoryLock(kRoot).IsHeld());
   EXPECT_THAT(ErrorLines(), ElementsAre("velathumb:844 Failed to open /tmp/@eaDir"));
 }
 
 TEST_F(LockedDirectory, NeedsNoWritePermission) {
-  ASSERT_EQ(0, chmod(kRoot, 0555));
+  ASSERT_EQ(chmod(kRoot, 0555), 0);
   const WithoutCapabilities ordinary;
   EXPECT_TRUE(DirectoryLock(kRoot).IsHeld());
 }
 
-TEST_F(LockedDirectory, APipeOfThatNameMakesNobodyWait) {
-  ASSERT_EQ(0, mkfifo("/tmp/pipe", 0666));
-  EXPECT_EQ(0, ForkCall([] {
+TEST_F(LockedDirectory, DoesNotBlockOnAPipe) {
+  ASSERT_EQ(mkfifo("/tmp/pipe", 0666), 0);
+  EXPECT_EQ(ForkCall([] {
               const DirectoryLock lock("/tmp/pipe");
               return 0;
-            }));
+            }),
+            0);
 }
 
 }  // namespace

@@ -1,25 +1,12 @@
-// The step of the recursive walk, and what is asked before a directory is worked on.
+// The step of the recursive walk, and the checks before a directory is processed.
 #include "thumb/directory_walk.h"
 
-#include <gmock/gmock.h>
-#include <gtest/gtest.h>
-#include <sys/stat.h>
-#include <unistd.h>
-
-#include <string>
-
-#include "support/files.h"
-#include "support/mounts.h"
-#include "support/system_log.h"
-#include "thumb/pass_test.h"
+#include "thumb/thumb_test.h"
 
 using namespace vela;
 
 namespace vela_test {
 namespace {
-
-using ::testing::ElementsAre;
-using ::testing::IsEmpty;
 
 /// What the platform's walk expects.
 constexpr int kContinue = 0;
@@ -27,10 +14,10 @@ constexpr int kSkipSubtree = 2;
 
 constexpr const char* kProfileFile = "/tmp/profiles.conf";
 
-/// A directory that has been worked on shows it by a line about this link.
+/// A directory that has been processed shows it by a line about this link.
 void PutTrace(const std::string& dir) {
   MakeDirectories(dir);
-  ASSERT_EQ(0, symlink("nowhere", (dir + "/trace.jpg").c_str()));
+  ASSERT_EQ(symlink("nowhere", (dir + "/trace.jpg").c_str()), 0);
 }
 
 std::string TraceOf(const std::string& dir) {
@@ -47,30 +34,30 @@ class WalkStep : public PassTest {
   }
 };
 
-TEST_F(WalkStep, GoesOnBehindADirectory) {
-  EXPECT_EQ(kContinue, Step(kDir, FTW_D));
+TEST_F(WalkStep, ContinuesAfterADirectory) {
+  EXPECT_EQ(Step(kDir, FTW_D), kContinue);
 }
 
-TEST_F(WalkStep, GoesOnBehindADirectoryThatIsGone) {
-  EXPECT_EQ(kContinue, Step("/tmp/missing", FTW_D));
+TEST_F(WalkStep, ContinuesAfterADirectoryThatIsGone) {
+  EXPECT_EQ(Step("/tmp/missing", FTW_D), kContinue);
   EXPECT_THAT(ErrorLines(), IsEmpty());
 }
 
-TEST_F(WalkStep, PassesOverEverythingElse) {
+TEST_F(WalkStep, SkipsEverythingElse) {
   for (const int typeFlag : {FTW_F, FTW_DNR, FTW_NS, FTW_SL, FTW_SLN, FTW_DP}) {
-    EXPECT_EQ(kSkipSubtree, Step(kDir, typeFlag)) << typeFlag;
+    EXPECT_EQ(Step(kDir, typeFlag), kSkipSubtree) << typeFlag;
   }
 }
 
 TEST_F(WalkStep, RefusesByTheLastNameOfThePath) {
   for (const char* name : {"@eaDir", "@tmp", "#recycle", ".hidden", "lost+found"}) {
-    EXPECT_EQ(kSkipSubtree, Step(std::string(kDir) + "/" + name, FTW_D)) << name;
-    EXPECT_EQ(kContinue, Step(std::string("/tmp/") + name + "/photos", FTW_D)) << name;
+    EXPECT_EQ(Step(std::string(kDir) + "/" + name, FTW_D), kSkipSubtree) << name;
+    EXPECT_EQ(Step(std::string("/tmp/") + name + "/photos", FTW_D), kContinue) << name;
   }
-  EXPECT_EQ(kSkipSubtree, Step(".hidden", FTW_D));
+  EXPECT_EQ(Step(".hidden", FTW_D), kSkipSubtree);
 }
 
-TEST_F(WalkStep, WorksOnNothingButAcceptedDirectories) {
+TEST_F(WalkStep, ProcessesAcceptedDirectoriesOnly) {
   const std::string refused = std::string(kDir) + "/@tmp";
   PutTrace(refused);
   PutTrace(kDir);
@@ -82,7 +69,7 @@ TEST_F(WalkStep, WorksOnNothingButAcceptedDirectories) {
 
 class DirectoryRun : public PassTest {
  protected:
-  /// Runs it; returns what it wrote to standard error.
+  /// Runs it. Returns what it wrote to standard error.
   static std::string Run(const std::string& dir, const std::string& profiles = kProfileFile) {
     ::testing::internal::CaptureStderr();
     RunDirectoryJob(dir, profiles);
@@ -90,46 +77,46 @@ class DirectoryRun : public PassTest {
   }
 };
 
-TEST_F(DirectoryRun, WorksOnTheDirectory) {
+TEST_F(DirectoryRun, ProcessesTheDirectory) {
   PutTrace(kDir);
-  EXPECT_EQ("", Run(kDir));
+  EXPECT_EQ(Run(kDir), "");
   EXPECT_THAT(ErrorLines(), ElementsAre(TraceOf(kDir)));
 }
 
-TEST_F(DirectoryRun, TellsAProfileFileThatCannotBeLoaded) {
+TEST_F(DirectoryRun, ReportsAProfileFileThatCannotBeLoaded) {
   PutTrace(kDir);
   WriteFile(kProfileFile, "neither section nor key\n");
-  EXPECT_EQ("Failed to parse /tmp/profiles.conf", Run(kDir));
+  EXPECT_EQ(Run(kDir), "Failed to parse /tmp/profiles.conf");
   MakeDirectories("/tmp/100%s");
-  EXPECT_EQ("Failed to parse /tmp/100%s", Run(kDir, "/tmp/100%s"));
+  EXPECT_EQ(Run(kDir, "/tmp/100%s"), "Failed to parse /tmp/100%s");
   EXPECT_THAT(ErrorLines(), IsEmpty());
 }
 
-TEST_F(DirectoryRun, PassesOverWhatIsMissingInSilence) {
-  EXPECT_EQ("", Run("/tmp/missing"));
-  EXPECT_EQ("", Run(""));
+TEST_F(DirectoryRun, SilentlySkipsWhatIsMissing) {
+  EXPECT_EQ(Run("/tmp/missing"), "");
+  EXPECT_EQ(Run(""), "");
   PutTrace(kDir);
-  EXPECT_EQ("", Run(kDir, "/tmp/missing.conf"));
-  EXPECT_EQ("", Run(kDir, ""));
+  EXPECT_EQ(Run(kDir, "/tmp/missing.conf"), "");
+  EXPECT_EQ(Run(kDir, ""), "");
   EXPECT_THAT(ErrorLines(), IsEmpty());
 }
 
-TEST_F(DirectoryRun, AsksForThePermissionBeforeItReadsTheProfiles) {
+TEST_F(DirectoryRun, ChecksThePermissionBeforeItReadsTheProfiles) {
   WriteFile(kProfileFile, "neither section nor key\n");
   const ReadOnlyMount mount(kDir);
-  EXPECT_EQ("", Run(kDir));
+  EXPECT_EQ(Run(kDir), "");
 }
 
-TEST_F(DirectoryRun, PassesOverDirectoriesThatMayHaveNoMetadata) {
+TEST_F(DirectoryRun, SkipsDirectoriesThatMayHaveNoMetadata) {
   PutTrace(kMetadata);
-  EXPECT_EQ("", Run(kMetadata));
-  EXPECT_EQ("", Run(kMetadataRoot));
+  EXPECT_EQ(Run(kMetadata), "");
+  EXPECT_EQ(Run(kMetadataRoot), "");
   WriteFile("/tmp/file", "");
-  EXPECT_EQ("", Run("/tmp/file"));
+  EXPECT_EQ(Run("/tmp/file"), "");
   EXPECT_THAT(ErrorLines(), IsEmpty());
 }
 
-class TreeRun : public PassTest {};
+using TreeRun = PassTest;
 
 TEST_F(TreeRun, GivesEachDirectoryTheProfileFileOfTheLatestRun) {
   PutTrace(kDir);
@@ -137,8 +124,8 @@ TEST_F(TreeRun, GivesEachDirectoryTheProfileFileOfTheLatestRun) {
   WriteFile("/tmp/bad.conf", "neither section nor key\n");
   ::testing::internal::CaptureStderr();
   RunDirectoryTree(kDir, "/tmp/bad.conf");
-  EXPECT_EQ("Failed to parse /tmp/bad.confFailed to parse /tmp/bad.conf",
-            ::testing::internal::GetCapturedStderr());
+  EXPECT_EQ(::testing::internal::GetCapturedStderr(),
+            "Failed to parse /tmp/bad.confFailed to parse /tmp/bad.conf");
   EXPECT_THAT(ErrorLines(), IsEmpty());
   RunDirectoryTree(kDir, kProfileFile);
   EXPECT_THAT(ErrorLines(), ElementsAre(TraceOf(kDir), TraceOf(std::string(kDir) + "/sub")));

@@ -1,29 +1,10 @@
 // Making directories and removing files by pattern.
 #include "storage/file_helpers.h"
 
-#include <gmock/gmock.h>
-#include <gtest/gtest.h>
-#include <sys/stat.h>
-#include <unistd.h>
-
-#include <cerrno>
-#include <string>
-
-#include "posix/glob_matches.h"
-#include "support/files.h"
-#include "support/mounts.h"
-#include "support/privileges.h"
-#include "support/sandbox.h"
-#include "support/seccomp_fail.h"
-#include "support/system_log.h"
-#include "thumb/fork_call.h"
-#include "thumb/zero_mask.h"
+#include "thumb/thumb_test.h"
 
 namespace vela_test {
 namespace {
-
-using ::testing::ElementsAre;
-using ::testing::IsEmpty;
 
 /// The line of a directory that could not be made.
 std::string MkdirLine(const std::string& path, int error) {
@@ -36,18 +17,18 @@ class CheckCreateDir : public SandboxTest {
   ZeroMask mask_;
 };
 
-TEST_F(CheckCreateDir, MakesMissingDirectoryForEverybody) {
-  EXPECT_EQ(1, checkCreateDir("/tmp/made"));
+TEST_F(CheckCreateDir, MakesAMissingDirectoryWritableByAll) {
+  EXPECT_EQ(checkCreateDir("/tmp/made"), 1);
   EXPECT_TRUE(IsDirectory("/tmp/made"));
-  EXPECT_EQ(0777, ModeOf("/tmp/made"));
+  EXPECT_EQ(ModeOf("/tmp/made"), 0777);
   EXPECT_THAT(ErrorLines(), IsEmpty());
 }
 
 TEST_F(CheckCreateDir, LeavesAnExistingDirectoryAsItIs) {
   WriteFile("/tmp/there/file", "x");
-  ASSERT_EQ(0, chmod("/tmp/there", 0750));
-  EXPECT_EQ(1, checkCreateDir("/tmp/there"));
-  EXPECT_EQ(0750, ModeOf("/tmp/there"));
+  ASSERT_EQ(chmod("/tmp/there", 0750), 0);
+  EXPECT_EQ(checkCreateDir("/tmp/there"), 1);
+  EXPECT_EQ(ModeOf("/tmp/there"), 0750);
   EXPECT_THAT(ListDirectory("/tmp/there"), ElementsAre("file"));
   EXPECT_THAT(ErrorLines(), IsEmpty());
 }
@@ -55,72 +36,52 @@ TEST_F(CheckCreateDir, LeavesAnExistingDirectoryAsItIs) {
 TEST_F(CheckCreateDir, DoesNotEvenTryToMakeWhatIsThere) {
   MakeDirectories("/tmp/there");
   const BeforeExec refuseMkdir = SeccompFail(MkdirCalls(), ENOSPC);
-  EXPECT_EQ(1, ForkCall([&] { return refuseMkdir() == 0 ? checkCreateDir("/tmp/there") : 99; }));
+  EXPECT_EQ(ForkCall([&] { return refuseMkdir() == 0 ? checkCreateDir("/tmp/there") : 99; }), 1);
   EXPECT_THAT(ErrorLines(), IsEmpty());
   // The refusal does hold: what is missing shows it.
-  EXPECT_EQ(0, ForkCall([&] { return refuseMkdir() == 0 ? checkCreateDir("/tmp/missing") : 99; }));
+  EXPECT_EQ(ForkCall([&] { return refuseMkdir() == 0 ? checkCreateDir("/tmp/missing") : 99; }), 0);
   EXPECT_THAT(ErrorLines(), ElementsAre(MkdirLine("/tmp/missing", ENOSPC)));
 }
 
-TEST_F(CheckCreateDir, FollowsLinkToDirectory) {
+TEST_F(CheckCreateDir, AnythingOfThatNameCountsAsThere) {
   MakeDirectories("/tmp/there");
-  ASSERT_EQ(0, symlink("there", "/tmp/link"));
-  EXPECT_EQ(1, checkCreateDir("/tmp/link"));
-  EXPECT_THAT(ErrorLines(), IsEmpty());
-}
-
-TEST_F(CheckCreateDir, AFileOfThatNameCountsAsThere) {
   WriteFile("/tmp/file", "content");
-  EXPECT_EQ(1, checkCreateDir("/tmp/file"));
-  EXPECT_EQ("content", ReadFile("/tmp/file"));
-  EXPECT_THAT(ErrorLines(), IsEmpty());
-}
-
-TEST_F(CheckCreateDir, ALinkToNowhereCountsAsThere) {
-  ASSERT_EQ(0, symlink("nowhere", "/tmp/link"));
-  EXPECT_EQ(1, checkCreateDir("/tmp/link"));
+  ASSERT_EQ(symlink("there", "/tmp/link"), 0);
+  ASSERT_EQ(symlink("nowhere", "/tmp/dangling"), 0);
+  for (const char* path : {"/tmp/file", "/tmp/link", "/tmp/dangling"}) {
+    EXPECT_EQ(checkCreateDir(path), 1) << path;
+  }
+  EXPECT_EQ(ReadFile("/tmp/file"), "content");
   EXPECT_FALSE(Exists("/tmp/nowhere"));
   EXPECT_THAT(ErrorLines(), IsEmpty());
 }
 
 TEST_F(CheckCreateDir, MissingParentIsASilentFailure) {
-  EXPECT_EQ(0, checkCreateDir("/tmp/missing/dir"));
+  EXPECT_EQ(checkCreateDir("/tmp/missing/dir"), 0);
   EXPECT_FALSE(Exists("/tmp/missing"));
-  EXPECT_EQ(0, checkCreateDir(""));
+  EXPECT_EQ(checkCreateDir(""), 0);
   EXPECT_THAT(ErrorLines(), IsEmpty());
 }
 
-TEST_F(CheckCreateDir, LogsAParentThatIsAFile) {
-  WriteFile("/tmp/file", "");
-  EXPECT_EQ(0, checkCreateDir("/tmp/file/dir"));
-  EXPECT_THAT(ErrorLines(), ElementsAre(MkdirLine("/tmp/file/dir", ENOTDIR)));
-}
-
-TEST_F(CheckCreateDir, LogsAReadOnlyVolume) {
+TEST_F(CheckCreateDir, LogsTheReasonOfAFailure) {
+  WriteFile("/tmp/100%s%n", "");
   MakeDirectories("/tmp/volume");
   const ReadOnlyMount mount("/tmp/volume");
-  EXPECT_EQ(0, checkCreateDir("/tmp/volume/dir"));
-  EXPECT_THAT(ErrorLines(), ElementsAre(MkdirLine("/tmp/volume/dir", EROFS)));
-}
-
-TEST_F(CheckCreateDir, LogsAMissingPermission) {
   MakeDirectories("/tmp/closed");
-  ASSERT_EQ(0, chmod("/tmp/closed", 0555));
+  ASSERT_EQ(chmod("/tmp/closed", 0555), 0);
   const WithoutCapabilities ordinary;
-  EXPECT_EQ(0, checkCreateDir("/tmp/closed/dir"));
-  EXPECT_THAT(ErrorLines(), ElementsAre(MkdirLine("/tmp/closed/dir", EACCES)));
-}
-
-TEST_F(CheckCreateDir, LogsANameThatIsTooLong) {
-  const std::string path = "/tmp/" + std::string(256, 'n');
-  EXPECT_EQ(0, checkCreateDir(path));
-  EXPECT_THAT(ErrorLines(), ElementsAre(MkdirLine(path, ENAMETOOLONG)));
-}
-
-TEST_F(CheckCreateDir, LogsThePathAsItIs) {
-  WriteFile("/tmp/100%s%n", "");
-  EXPECT_EQ(0, checkCreateDir("/tmp/100%s%n/dir"));
-  EXPECT_THAT(ErrorLines(), ElementsAre(MkdirLine("/tmp/100%s%n/dir", ENOTDIR)));
+  struct {
+    std::string path;
+    int error;
+  } const rows[] = {{"/tmp/100%s%n/dir", ENOTDIR},
+                    {"/tmp/volume/dir", EROFS},
+                    {"/tmp/closed/dir", EACCES},
+                    {"/tmp/" + std::string(256, 'n'), ENAMETOOLONG}};
+  for (const auto& row : rows) {
+    ClearLog();
+    EXPECT_EQ(checkCreateDir(row.path), 0);
+    EXPECT_THAT(ErrorLines(), ElementsAre(MkdirLine(row.path, row.error)));
+  }
 }
 
 class RemoveByPattern : public SandboxTest {
@@ -130,97 +91,102 @@ class RemoveByPattern : public SandboxTest {
     MakeDirectories("/tmp/d");
   }
 
-  static void Touch(const std::string& name) { WriteFile("/tmp/d/" + name, "x"); }
+  static void Touch(const std::vector<std::string>& names) {
+    for (const std::string& name : names) {
+      WriteFile("/tmp/d/" + name, "x");
+    }
+  }
 };
 
 TEST_F(RemoveByPattern, RemovesWhatMatchesAndNothingElse) {
-  for (const char* name : {"a.fail", "b.fail", "c.jpg", "d.fail.jpg", ".hidden.fail"}) {
-    Touch(name);
-  }
-  EXPECT_EQ(0, RemoveFilesByPattern("/tmp/d/*.fail"));
+  Touch({"a.fail", "b.fail", "c.jpg", "d.fail.jpg", ".hidden.fail"});
+  EXPECT_EQ(RemoveFilesByPattern("/tmp/d/*.fail"), 0);
   EXPECT_THAT(ListDirectory("/tmp/d"), ElementsAre(".hidden.fail", "c.jpg", "d.fail.jpg"));
 }
 
-TEST_F(RemoveByPattern, NothingToRemoveIsNoFailure) {
-  Touch("c.jpg");
-  EXPECT_EQ(0, RemoveFilesByPattern("/tmp/d/*.fail"));
-  EXPECT_EQ(0, RemoveFilesByPattern("/tmp/missing/*.fail"));
-  EXPECT_EQ(0, RemoveFilesByPattern("/tmp/d/plain"));
-  EXPECT_EQ(0, RemoveFilesByPattern(""));
+TEST_F(RemoveByPattern, SucceedsWithoutAMatch) {
+  Touch({"c.jpg"});
+  EXPECT_EQ(RemoveFilesByPattern("/tmp/d/*.fail"), 0);
+  EXPECT_EQ(RemoveFilesByPattern("/tmp/missing/*.fail"), 0);
+  EXPECT_EQ(RemoveFilesByPattern("/tmp/d/plain"), 0);
+  EXPECT_EQ(RemoveFilesByPattern(""), 0);
   EXPECT_THAT(ListDirectory("/tmp/d"), ElementsAre("c.jpg"));
   EXPECT_THAT(ErrorLines(), IsEmpty());
 }
 
-TEST_F(RemoveByPattern, OneThatStaysKeepsNoOtherFromBeingRemoved) {
-  Touch("a.fail");
+TEST_F(RemoveByPattern, RemovesTheOthersWhenOneCannotBeRemoved) {
+  Touch({"a.fail"});
   MakeDirectories("/tmp/d/b.fail");
-  Touch("c.fail");
-  EXPECT_EQ(-1, RemoveFilesByPattern("/tmp/d/*.fail"));
+  Touch({"c.fail"});
+  EXPECT_EQ(RemoveFilesByPattern("/tmp/d/*.fail"), -1);
   EXPECT_THAT(ListDirectory("/tmp/d"), ElementsAre("b.fail"));
   EXPECT_THAT(ErrorLines(), IsEmpty());
 }
 
-TEST_F(RemoveByPattern, TellsAReadOnlyVolume) {
-  Touch("a.fail");
+TEST_F(RemoveByPattern, FailsOnAReadOnlyVolume) {
+  Touch({"a.fail"});
   const ReadOnlyMount mount("/tmp/d");
-  EXPECT_EQ(-1, RemoveFilesByPattern("/tmp/d/*.fail"));
+  EXPECT_EQ(RemoveFilesByPattern("/tmp/d/*.fail"), -1);
   EXPECT_THAT(ListDirectory("/tmp/d"), ElementsAre("a.fail"));
 }
 
-TEST_F(RemoveByPattern, ADirectoryThatCannotBeReadHoldsNoMatch) {
-  Touch("a.fail");
-  ASSERT_EQ(0, chmod("/tmp/d", 0333));
+TEST_F(RemoveByPattern, FindsNoMatchInAnUnreadableDirectory) {
+  Touch({"a.fail"});
+  ASSERT_EQ(chmod("/tmp/d", 0333), 0);
   {
     const WithoutCapabilities ordinary;
-    EXPECT_EQ(0, RemoveFilesByPattern("/tmp/d/*.fail"));
+    EXPECT_EQ(RemoveFilesByPattern("/tmp/d/*.fail"), 0);
   }
   EXPECT_TRUE(Exists("/tmp/d/a.fail"));
 }
 
 TEST_F(RemoveByPattern, RemovesLinksNotWhatTheyLeadTo) {
-  Touch("kept.jpg");
-  ASSERT_EQ(0, symlink("kept.jpg", "/tmp/d/a.fail"));
-  ASSERT_EQ(0, symlink("nowhere", "/tmp/d/b.fail"));
-  EXPECT_EQ(0, RemoveFilesByPattern("/tmp/d/*.fail"));
+  Touch({"kept.jpg"});
+  ASSERT_EQ(symlink("kept.jpg", "/tmp/d/a.fail"), 0);
+  ASSERT_EQ(symlink("nowhere", "/tmp/d/b.fail"), 0);
+  EXPECT_EQ(RemoveFilesByPattern("/tmp/d/*.fail"), 0);
   EXPECT_THAT(ListDirectory("/tmp/d"), ElementsAre("kept.jpg"));
 }
 
 TEST_F(RemoveByPattern, TakesShellPatterns) {
-  for (const char* name : {"a1", "a2", "a3", "b1", "ab1"}) {
-    Touch(name);
-  }
-  EXPECT_EQ(0, RemoveFilesByPattern("/tmp/d/a[12]"));
+  Touch({"a1", "a2", "a3", "b1", "ab1"});
+  EXPECT_EQ(RemoveFilesByPattern("/tmp/d/a[12]"), 0);
   EXPECT_THAT(ListDirectory("/tmp/d"), ElementsAre("a3", "ab1", "b1"));
-  EXPECT_EQ(0, RemoveFilesByPattern("/tmp/d/?1"));
+  EXPECT_EQ(RemoveFilesByPattern("/tmp/d/?1"), 0);
   EXPECT_THAT(ListDirectory("/tmp/d"), ElementsAre("a3", "ab1"));
 }
 
 /// Each name is a pattern that would match the other one, if it were taken as a pattern.
-struct PatternName {
-  const char* name;
+struct PatternName : NamedRow {
+  const char* own;
   const char* neighbour;
 };
 
 class EscapedPattern : public SandboxTest, public ::testing::WithParamInterface<PatternName> {};
 
 TEST_P(EscapedPattern, MatchesOnlyThePathItself) {
-  const std::string own = std::string("/tmp/") + GetParam().name;
+  const std::string own = std::string("/tmp/") + GetParam().own;
   const std::string neighbour = std::string("/tmp/") + GetParam().neighbour;
   WriteFile(own + "/x.fail", "");
   WriteFile(neighbour + "/x.fail", "");
-  EXPECT_EQ(0, RemoveFilesByPattern(vela::EscapePattern(own) + "/*.fail"));
+  EXPECT_EQ(RemoveFilesByPattern(vela::EscapePattern(own) + "/*.fail"), 0);
   EXPECT_THAT(ListDirectory(own), IsEmpty());
   EXPECT_THAT(ListDirectory(neighbour), ElementsAre("x.fail"));
 }
 
-INSTANTIATE_TEST_SUITE_P(
-    Names, EscapedPattern,
-    ::testing::Values(PatternName{"a[1].jpg", "a1.jpg"}, PatternName{"*.jpg", "z.jpg"},
-                      PatternName{"b?.jpg", "bb.jpg"}, PatternName{"c\\d.jpg", "cd.jpg"},
-                      PatternName{"[!a].jpg", "b.jpg"}, PatternName{"[", "]"},
-                      PatternName{"]", "["}, PatternName{"{e,f}.jpg", "e.jpg"},
-                      PatternName{"~", "root"}, PatternName{"plain.jpg", "plainxjpg"},
-                      PatternName{"\xe4\xff.jpg", "\xe4.jpg"}));
+INSTANTIATE_TEST_SUITE_P(Names, EscapedPattern,
+                         ::testing::Values(PatternName{"Set", "a[1].jpg", "a1.jpg"},
+                                           PatternName{"Star", "*.jpg", "z.jpg"},
+                                           PatternName{"QuestionMark", "b?.jpg", "bb.jpg"},
+                                           PatternName{"Backslash", "c\\d.jpg", "cd.jpg"},
+                                           PatternName{"NegatedSet", "[!a].jpg", "b.jpg"},
+                                           PatternName{"OpeningBracket", "[", "]"},
+                                           PatternName{"ClosingBracket", "]", "["},
+                                           PatternName{"Braces", "{e,f}.jpg", "e.jpg"},
+                                           PatternName{"Tilde", "~", "root"},
+                                           PatternName{"Dot", "plain.jpg", "plainxjpg"},
+                                           PatternName{"Bytes", "\xe4\xff.jpg", "\xe4.jpg"}),
+                         RowName<PatternName>);
 
 }  // namespace
 }  // namespace vela_test

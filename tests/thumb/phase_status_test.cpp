@@ -1,25 +1,12 @@
 // Whether the thumbnails of a phase are there and up to date, and the marking of failed phases.
 #include "thumb/phase_status.h"
 
-#include <gmock/gmock.h>
-#include <gtest/gtest.h>
-#include <sys/stat.h>
-#include <unistd.h>
-
-#include <string>
-
-#include "support/files.h"
-#include "support/mounts.h"
-#include "support/system_log.h"
-#include "thumb/pass_test.h"
+#include "thumb/thumb_test.h"
 
 using namespace vela;
 
 namespace vela_test {
 namespace {
-
-using ::testing::ElementsAre;
-using ::testing::IsEmpty;
 
 constexpr int64_t kNow = 1700000000;
 
@@ -33,79 +20,74 @@ class PhaseOutdated : public PassTest {
   bool IsOutdated(int phase) const { return IsPhaseThumbOutdated(Job(), phase, kPhoto, kMetadata); }
 };
 
-TEST_F(PhaseOutdated, MissingThumbnailsAreNotOutdated) {
-  for (const int phase : {0, 1, 2, kAllPhases}) {
-    EXPECT_FALSE(IsOutdated(phase)) << phase;
+/// Thumbnails with their dates relative to the photo, and whether they make a phase outdated.
+struct DatedThumbs : NamedRow {
+  struct Thumb {
+    const char* sizeClass;
+    int64_t seconds;
+    int64_t nanoseconds;
+  };
+  std::vector<Thumb> thumbs;
+  int phase;
+  bool isOutdated;
+};
+
+class DatedPhase : public PhaseOutdated, public ::testing::WithParamInterface<DatedThumbs> {};
+
+TEST_P(DatedPhase, IsOutdatedByAnyThumbnailOfAnEarlierSecond) {
+  for (const size_t bytes : {10U, 0U}) {  // an empty thumbnail counts by its date only
+    for (const DatedThumbs::Thumb& thumb : GetParam().thumbs) {
+      PutFile(Thumb(thumb.sizeClass), bytes, kNow + thumb.seconds, thumb.nanoseconds);
+    }
+    EXPECT_EQ(IsOutdated(GetParam().phase), GetParam().isOutdated) << bytes;
   }
 }
 
-TEST_F(PhaseOutdated, CountsWholeSeconds) {
-  PutFile(Thumb("B"), 10, kNow - 1, 999999999);
-  EXPECT_TRUE(IsOutdated(1));
-  SetFileTime(Thumb("B"), kNow, 0);  // 500 ns before the photo
-  EXPECT_FALSE(IsOutdated(1));
-  SetFileTime(Thumb("B"), kNow + 1);
-  EXPECT_FALSE(IsOutdated(1));
-}
-
-TEST_F(PhaseOutdated, OneOfSeveralIsEnough) {
-  PutFile(Thumb("M"), 10, kNow);
-  PutFile(Thumb("XL"), 10, kNow);
-  EXPECT_FALSE(IsOutdated(0));
-  SetFileTime(Thumb("XL"), kNow - 1);
-  EXPECT_TRUE(IsOutdated(0));
-  SetFileTime(Thumb("XL"), kNow);
-  SetFileTime(Thumb("M"), kNow - 1);
-  EXPECT_TRUE(IsOutdated(0));
-}
-
-TEST_F(PhaseOutdated, MissingOnesDoNotHideAnOutdatedOne) {
-  PutFile(Thumb("XL"), 10, kNow - 1);
-  EXPECT_TRUE(IsOutdated(0));
-}
-
-TEST_F(PhaseOutdated, OtherPhasesDoNotCount) {
-  PutFile(Thumb("B"), 10, kNow - 1);
-  EXPECT_FALSE(IsOutdated(0));
-  EXPECT_TRUE(IsOutdated(1));
-  EXPECT_FALSE(IsOutdated(2));
-  EXPECT_TRUE(IsOutdated(kAllPhases));
-}
-
-TEST_F(PhaseOutdated, EmptyThumbnailsCountByTheirDateOnly) {
-  PutFile(Thumb("B"), 0, kNow);
-  EXPECT_FALSE(IsOutdated(1));
-  SetFileTime(Thumb("B"), kNow - 1);
-  EXPECT_TRUE(IsOutdated(1));
-}
+INSTANTIATE_TEST_SUITE_P(
+    Thumbs, DatedPhase,
+    ::testing::Values(DatedThumbs{"NoneInPhase0", {}, 0, false},
+                      DatedThumbs{"NoneInPhase1", {}, 1, false},
+                      DatedThumbs{"NoneInPhase2", {}, 2, false},
+                      DatedThumbs{"NoneAtAll", {}, kAllPhases, false},
+                      DatedThumbs{"SecondBefore", {{"B", -1, 999999999}}, 1, true},
+                      DatedThumbs{"SameSecond", {{"B", 0, 0}}, 1, false},
+                      DatedThumbs{"SecondAfter", {{"B", 1, 0}}, 1, false},
+                      DatedThumbs{"BothUpToDate", {{"M", 0, 0}, {"XL", 0, 0}}, 0, false},
+                      DatedThumbs{"LargerOutdated", {{"M", 0, 0}, {"XL", -1, 0}}, 0, true},
+                      DatedThumbs{"SmallerOutdated", {{"M", -1, 0}, {"XL", 0, 0}}, 0, true},
+                      DatedThumbs{"OneMissing", {{"XL", -1, 0}}, 0, true},
+                      DatedThumbs{"OfALaterPhase", {{"B", -1, 0}}, 0, false},
+                      DatedThumbs{"OfAnEarlierPhase", {{"B", -1, 0}}, 2, false},
+                      DatedThumbs{"AllPhasesTogether", {{"B", -1, 0}}, kAllPhases, true}),
+    RowName<DatedThumbs>);
 
 TEST_F(PhaseOutdated, KnowsOlderNames) {
   UseProfiles({{"thumb_b", 640, 80, std::nullopt, "VELAPHOTO:THUMB_B.jpg", 1}});
   PutFile(OldThumb("B"), 10, kNow - 1);
   EXPECT_TRUE(IsOutdated(1));
-  // The current name is looked at first.
+  // The current name comes first.
   PutFile(Thumb("B"), 10, kNow);
   EXPECT_FALSE(IsOutdated(1));
 }
 
 TEST_F(PhaseOutdated, MissingPhotoOutdatesNothing) {
   PutFile(Thumb("B"), 10, kNow - 1);
-  ASSERT_EQ(0, unlink(kPhoto));
+  ASSERT_EQ(unlink(kPhoto), 0);
   EXPECT_FALSE(IsOutdated(1));
   EXPECT_THAT(ErrorLines(), IsEmpty());
 }
 
 TEST_F(PhaseOutdated, LooksAtThePhotoNotAtTheLinkToIt) {
   PutFile("/tmp/elsewhere", 10, kNow);
-  ASSERT_EQ(0, unlink(kPhoto));
-  ASSERT_EQ(0, symlink("/tmp/elsewhere", kPhoto));
+  ASSERT_EQ(unlink(kPhoto), 0);
+  ASSERT_EQ(symlink("/tmp/elsewhere", kPhoto), 0);
   PutFile(Thumb("B"), 10, kNow);
   EXPECT_FALSE(IsOutdated(1));
   SetFileTime("/tmp/elsewhere", kNow + 1);
   EXPECT_TRUE(IsOutdated(1));
 }
 
-TEST_F(PhaseOutdated, PhaseWithoutProfilesIsNot) {
+TEST_F(PhaseOutdated, PhaseWithoutProfilesIsNotOutdated) {
   UseProfiles({{"thumb_b", 640, 80, std::nullopt, "VELAPHOTO_THUMB_B.jpg", 1}});
   PutFile(Thumb("XL"), 10, kNow - 1);
   PutFile(Thumb("S"), 10, kNow - 1);
@@ -118,35 +100,40 @@ class PhaseComplete : public PassTest {
   bool IsComplete(int phase) const { return IsPhaseThumbComplete(Job(), phase, kMetadata); }
 };
 
-TEST_F(PhaseComplete, NeedsEveryThumbnail) {
-  EXPECT_FALSE(IsComplete(0));
-  WriteFileOfSize(Thumb("M"), 2);
-  EXPECT_FALSE(IsComplete(0));
-  WriteFileOfSize(Thumb("XL"), 2);
-  EXPECT_TRUE(IsComplete(0));
-  ASSERT_EQ(0, unlink(Thumb("M").c_str()));
-  EXPECT_FALSE(IsComplete(0));
-}
+/// Thumbnails with their sizes, and whether they complete a phase.
+struct SizedThumbs : NamedRow {
+  struct Thumb {
+    const char* sizeClass;
+    size_t bytes;
+  };
+  std::vector<Thumb> thumbs;
+  int phase;
+  bool isComplete;
+};
 
-TEST_F(PhaseComplete, NeedsTwoBytesInEach) {
-  WriteFileOfSize(Thumb("M"), 2);
-  for (const size_t bytes : {0U, 1U}) {
-    WriteFileOfSize(Thumb("XL"), bytes);
-    EXPECT_FALSE(IsComplete(0)) << bytes;
+class SizedPhase : public PhaseComplete, public ::testing::WithParamInterface<SizedThumbs> {};
+
+TEST_P(SizedPhase, IsCompleteWithTwoBytesInEachThumbnail) {
+  for (const SizedThumbs::Thumb& thumb : GetParam().thumbs) {
+    WriteFileOfSize(Thumb(thumb.sizeClass), thumb.bytes);
   }
-  WriteFileOfSize(Thumb("XL"), 2);
-  EXPECT_TRUE(IsComplete(0));
-  WriteFileOfSize(Thumb("M"), 1);
-  EXPECT_FALSE(IsComplete(0));
+  EXPECT_EQ(IsComplete(GetParam().phase), GetParam().isComplete);
 }
 
-TEST_F(PhaseComplete, OtherPhasesDoNotCount) {
-  WriteFileOfSize(Thumb("B"), 2);
-  EXPECT_FALSE(IsComplete(0));
-  EXPECT_TRUE(IsComplete(1));
-  EXPECT_FALSE(IsComplete(2));
-  EXPECT_FALSE(IsComplete(kAllPhases));
-}
+INSTANTIATE_TEST_SUITE_P(
+    Thumbs, SizedPhase,
+    ::testing::Values(SizedThumbs{"None", {}, 0, false},
+                      SizedThumbs{"SmallerOnly", {{"M", 2}}, 0, false},
+                      SizedThumbs{"LargerOnly", {{"XL", 2}}, 0, false},
+                      SizedThumbs{"Both", {{"M", 2}, {"XL", 2}}, 0, true},
+                      SizedThumbs{"LargerEmpty", {{"M", 2}, {"XL", 0}}, 0, false},
+                      SizedThumbs{"LargerOfOneByte", {{"M", 2}, {"XL", 1}}, 0, false},
+                      SizedThumbs{"SmallerOfOneByte", {{"M", 1}, {"XL", 2}}, 0, false},
+                      SizedThumbs{"OfALaterPhase", {{"B", 2}}, 0, false},
+                      SizedThumbs{"OfItsOwnPhase", {{"B", 2}}, 1, true},
+                      SizedThumbs{"OfAnEarlierPhase", {{"B", 2}}, 2, false},
+                      SizedThumbs{"OnePhaseOfAll", {{"B", 2}}, kAllPhases, false}),
+    RowName<SizedThumbs>);
 
 TEST_F(PhaseComplete, AllPhasesTogether) {
   for (const char* sizeClass : {"S", "M", "B", "XL"}) {
@@ -160,12 +147,12 @@ TEST_F(PhaseComplete, KnowsOlderNames) {
   UseProfiles({{"thumb_b", 640, 80, std::nullopt, "VELAPHOTO:THUMB_B.jpg", 1}});
   WriteFileOfSize(OldThumb("B"), 2);
   EXPECT_TRUE(IsComplete(1));
-  // The current name is looked at first.
+  // The current name comes first.
   WriteFileOfSize(Thumb("B"), 1);
   EXPECT_FALSE(IsComplete(1));
 }
 
-TEST_F(PhaseComplete, PhaseWithoutProfilesIs) {
+TEST_F(PhaseComplete, PhaseWithoutProfilesIsComplete) {
   UseProfiles({{"thumb_b", 640, 80, std::nullopt, "VELAPHOTO_THUMB_B.jpg", 1}});
   EXPECT_TRUE(IsComplete(0));
   EXPECT_FALSE(IsComplete(1));
@@ -178,50 +165,50 @@ class MarkFailed : public PassTest {
 };
 
 TEST_F(MarkFailed, PutsAMarkerForEachProfileOfThePhase) {
-  EXPECT_EQ(2, MarkPhaseFailed(Job(), 0, kMetadata));
+  EXPECT_EQ(MarkPhaseFailed(Job(), 0, kMetadata), 2);
   EXPECT_THAT(Metadata(), ElementsAre("VELAPHOTO_THUMB_M.fail", "VELAPHOTO_THUMB_XL.fail"));
-  EXPECT_EQ(1, MarkPhaseFailed(Job(), 1, kMetadata));
-  EXPECT_EQ(1, MarkPhaseFailed(Job(), 2, kMetadata));
+  EXPECT_EQ(MarkPhaseFailed(Job(), 1, kMetadata), 1);
+  EXPECT_EQ(MarkPhaseFailed(Job(), 2, kMetadata), 1);
   EXPECT_THAT(Metadata(), ElementsAre("VELAPHOTO_THUMB_B.fail", "VELAPHOTO_THUMB_M.fail",
                                       "VELAPHOTO_THUMB_S.fail", "VELAPHOTO_THUMB_XL.fail"));
 }
 
 TEST_F(MarkFailed, AllAtOnce) {
-  EXPECT_EQ(4, MarkAllProfilesFailed(Job(), kMetadata));
+  EXPECT_EQ(MarkAllProfilesFailed(Job(), kMetadata), 4);
   EXPECT_THAT(Metadata(), ElementsAre("VELAPHOTO_THUMB_B.fail", "VELAPHOTO_THUMB_M.fail",
                                       "VELAPHOTO_THUMB_S.fail", "VELAPHOTO_THUMB_XL.fail"));
 }
 
-TEST_F(MarkFailed, MarkersAreEmptyAndForEverybody) {
+TEST_F(MarkFailed, MarkersAreEmptyAndWritableByAll) {
   MarkPhaseFailed(Job(), 1, kMetadata);
   const std::string marker = std::string(kMetadata) + "/VELAPHOTO_THUMB_B.fail";
-  EXPECT_EQ(0, FileSize(marker));
-  EXPECT_EQ(0777, ModeOf(marker));
+  EXPECT_EQ(FileSize(marker), 0);
+  EXPECT_EQ(ModeOf(marker), 0777);
 }
 
-TEST_F(MarkFailed, TakesAwayTheThumbnailsOfThePhaseOnly) {
+TEST_F(MarkFailed, RemovesTheThumbnailsOfThePhaseOnly) {
   UseProfiles({{"thumb_m", 320, 80, std::nullopt, "VELAPHOTO_THUMB_M.jpg", 0},
                {"thumb_b", 640, 80, std::nullopt, "VELAPHOTO:THUMB_B.jpg", 1}});
   for (const std::string& path : {Thumb("M"), Thumb("B"), OldThumb("B")}) {
     WriteFile(path, "xx");
   }
-  EXPECT_EQ(1, MarkPhaseFailed(Job(), 1, kMetadata));
+  EXPECT_EQ(MarkPhaseFailed(Job(), 1, kMetadata), 1);
   EXPECT_THAT(Metadata(), ElementsAre("VELAPHOTO_THUMB_B.fail", "VELAPHOTO_THUMB_M.jpg"));
 }
 
-TEST_F(MarkFailed, NoProfileNoMarker) {
+TEST_F(MarkFailed, MakesNoMarkerWithoutProfiles) {
   UseProfiles({});
-  EXPECT_EQ(0, MarkAllProfilesFailed(Job(), kMetadata));
+  EXPECT_EQ(MarkAllProfilesFailed(Job(), kMetadata), 0);
   for (const int phase : {0, 1, 2}) {
-    EXPECT_EQ(0, MarkPhaseFailed(Job(), phase, kMetadata));
+    EXPECT_EQ(MarkPhaseFailed(Job(), phase, kMetadata), 0);
   }
   EXPECT_THAT(Metadata(), IsEmpty());
 }
 
 TEST_F(MarkFailed, CountsProfilesAlsoWhenNoMarkerCanBeMade) {
   const ReadOnlyMount mount(kMetadata);
-  EXPECT_EQ(4, MarkAllProfilesFailed(Job(), kMetadata));
-  EXPECT_EQ(2, MarkPhaseFailed(Job(), 0, kMetadata));
+  EXPECT_EQ(MarkAllProfilesFailed(Job(), kMetadata), 4);
+  EXPECT_EQ(MarkPhaseFailed(Job(), 0, kMetadata), 2);
   EXPECT_THAT(Metadata(), IsEmpty());
   EXPECT_THAT(ErrorLines(), IsEmpty());
 }

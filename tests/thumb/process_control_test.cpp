@@ -1,82 +1,59 @@
 // Pid files and the end by SIGTERM.
 #include "thumb/process_control.h"
 
-#include <gmock/gmock.h>
-#include <gtest/gtest.h>
-#include <signal.h>
-#include <sys/stat.h>
 #include <sys/syscall.h>
-#include <sys/wait.h>
-#include <unistd.h>
 
-#include <cerrno>
-#include <chrono>
-#include <string>
-
-#include "support/files.h"
-#include "support/mounts.h"
-#include "support/program.h"
-#include "support/sandbox.h"
-#include "support/seccomp_fail.h"
-#include "support/stub_tool.h"
-#include "support/system_log.h"
-#include "thumb/fork_call.h"
-#include "thumb/open_files.h"
-#include "thumb/zero_mask.h"
+#include "thumb/thumb_test.h"
 
 namespace vela_test {
 namespace {
-
-using ::testing::ElementsAre;
-using ::testing::IsEmpty;
 
 std::string PidFileOf(pid_t pid) {
   return "/var/run/velathumb." + std::to_string(pid) + ".pid";
 }
 
 class OwnPidFile : public SandboxTest {
+ protected:
+  const std::string name_ = "velathumb." + std::to_string(getpid()) + ".pid";
+  const std::string path_ = "/var/run/" + name_;
+
  private:
   ZeroMask mask_;
 };
 
-TEST_F(OwnPidFile, IsEmptyAndReadableForEverybody) {
-  EXPECT_EQ(PidFileOf(getpid()), CreatePidFile());
-  EXPECT_TRUE(IsRegularFile(PidFileOf(getpid())));
-  EXPECT_EQ(0, FileSize(PidFileOf(getpid())));
-  EXPECT_EQ(0644, ModeOf(PidFileOf(getpid())));
-  EXPECT_THAT(ListDirectory("/run"), ElementsAre("velathumb." + std::to_string(getpid()) + ".pid"));
+TEST_F(OwnPidFile, IsEmptyAndReadableForAll) {
+  EXPECT_EQ(CreatePidFile(), path_);
+  EXPECT_TRUE(IsRegularFile(path_));
+  EXPECT_EQ(FileSize(path_), 0);
+  EXPECT_EQ(ModeOf(path_), 0644);
+  EXPECT_THAT(ListDirectory("/run"), ElementsAre(name_));
+  EXPECT_THAT(DescriptorsOf("/run/" + name_), IsEmpty());
   EXPECT_THAT(ErrorLines(), IsEmpty());
 }
 
 TEST_F(OwnPidFile, CarriesTheProcessIdOfAnyLength) {
-  const int result = ForkCall([] { return CreatePidFile() == PidFileOf(getpid()) ? 0 : 1; });
-  EXPECT_EQ(0, result);
+  EXPECT_EQ(ForkCall([] { return CreatePidFile() == PidFileOf(getpid()) ? 0 : 1; }), 0);
 }
 
-TEST_F(OwnPidFile, IsClosed) {
+TEST_F(OwnPidFile, MayExistAlready) {
+  WriteFile(path_, "left behind");
   CreatePidFile();
-  EXPECT_THAT(DescriptorsOf("/run/velathumb." + std::to_string(getpid()) + ".pid"), IsEmpty());
-}
-
-TEST_F(OwnPidFile, TakesOverAFileThatIsThere) {
-  WriteFile(PidFileOf(getpid()), "left behind");
-  CreatePidFile();
-  EXPECT_EQ("left behind", ReadFile(PidFileOf(getpid())));
+  EXPECT_EQ(ReadFile(path_), "left behind");
   EXPECT_THAT(ErrorLines(), IsEmpty());
 }
 
 TEST_F(OwnPidFile, FailureIsLoggedWithItsReason) {
-  MakeDirectories(PidFileOf(getpid()));
-  EXPECT_EQ(PidFileOf(getpid()), CreatePidFile());
-  EXPECT_THAT(ErrorLines(), ElementsAre("velathumb:1133 Failed to open " + PidFileOf(getpid()) +
-                                        ". (Is a directory)"));
+  MakeDirectories(path_);
+  EXPECT_EQ(CreatePidFile(), path_);
+  EXPECT_THAT(ErrorLines(),
+              ElementsAre("velathumb:1133 Failed to open " + path_ + ". (Is a directory)"));
 }
 
 TEST_F(OwnPidFile, ReadOnlyRunDirectoryIsLogged) {
   const ReadOnlyMount mount("/run");
-  EXPECT_EQ(PidFileOf(getpid()), CreatePidFile());
-  EXPECT_THAT(ErrorLines(), ElementsAre("velathumb:1133 Failed to open " + PidFileOf(getpid()) +
-                                        ". (Read-only file system)"));
+  EXPECT_EQ(CreatePidFile(), path_);
+  EXPECT_THAT(ErrorLines(),
+              ElementsAre("velathumb:1133 Failed to open " + path_ + ". (Read-only file system)"));
 }
 
 class StalePidFiles : public SandboxTest {
@@ -105,14 +82,42 @@ class StalePidFiles : public SandboxTest {
   }
 };
 
-TEST_F(StalePidFiles, OfProcessesThatAreGoneAreRemoved) {
-  EXPECT_FALSE(IsKept(std::to_string(GonePid())));
+TEST_F(StalePidFiles, AreThoseOfProcessesThatAreGone) {
+  const std::string gone = std::to_string(GonePid());
+  const std::string own = std::to_string(getpid());
+  struct {
+    const char* description;
+    std::string middle;
+    bool isKept;
+  } const rows[] = {
+      {"a process that is gone", gone, false},
+      {"this process", own, true},
+      {"process 1", "1", true},
+      {"a number that ends at a letter: gone", gone + "abc", false},
+      {"a number that ends at a letter: running", own + "abc", true},
+      {"a number that ends at a dot: gone", gone + ".old", false},
+      {"a number that ends at a dot: gone before running", gone + "." + own, false},
+      {"a number that ends at a dot: running before gone", own + "." + gone, true},
+      {"a word before the dot", "old." + gone, true},
+      {"dots in a row are one", "." + gone, false},
+      {"letters", "abc", true},
+      {"zero", "0", true},
+      {"two zeros", "00", true},
+      {"a letter before the number", "x1", true},
+      {"minus zero", "-0", true},
+      {"nothing", "", true},
+      {"a space", " ", true},
+      {"the largest process id", "2147483647", false},
+      {"2^32 + 1, process 1 if it were cut", "4294967297", false},
+      {"2^63 - 1", "9223372036854775807", false},
+      {"2^64 + 1, process 1 if it were cut", "18446744073709551617", false},
+      {"far too large", "99999999999999999999999", false},
+  };
+  for (const auto& row : rows) {
+    SCOPED_TRACE(row.description);
+    EXPECT_EQ(IsKept(row.middle), row.isKept);
+  }
   EXPECT_THAT(ErrorLines(), IsEmpty());
-}
-
-TEST_F(StalePidFiles, OfRunningProcessesAreKept) {
-  EXPECT_TRUE(IsKept(std::to_string(getpid())));
-  EXPECT_TRUE(IsKept("1"));
 }
 
 TEST_F(StalePidFiles, RunningProcessesAreNotTouched) {
@@ -121,7 +126,7 @@ TEST_F(StalePidFiles, RunningProcessesAreNotTouched) {
   EXPECT_FALSE(sleeper.Wait(std::chrono::milliseconds(50)).has_value());
 }
 
-TEST_F(StalePidFiles, AreFoundWhicheverTheyAre) {
+TEST_F(StalePidFiles, AreAllFound) {
   const std::string gone = std::to_string(GonePid());
   const std::string running = Put(std::to_string(getpid()));
   const std::string first = Put("0" + gone);
@@ -134,59 +139,20 @@ TEST_F(StalePidFiles, AreFoundWhicheverTheyAre) {
   EXPECT_FALSE(Exists(third));
 }
 
-TEST_F(StalePidFiles, NamesWithoutNumberAreKept) {
-  for (const char* middle : {"abc", "0", "00", "x1", "-0", "", " "}) {
-    EXPECT_TRUE(IsKept(middle)) << "'" << middle << "'";
-  }
-  EXPECT_THAT(ErrorLines(), IsEmpty());
-}
-
-TEST_F(StalePidFiles, NumberEndsAtTheFirstOtherCharacter) {
-  EXPECT_FALSE(IsKept(std::to_string(GonePid()) + "abc"));
-  EXPECT_TRUE(IsKept(std::to_string(getpid()) + "abc"));
-}
-
-TEST_F(StalePidFiles, NumberEndsAtTheFirstDot) {
-  const std::string gone = std::to_string(GonePid());
-  const std::string own = std::to_string(getpid());
-  EXPECT_FALSE(IsKept(gone + ".old"));
-  EXPECT_FALSE(IsKept(gone + "." + own));
-  EXPECT_TRUE(IsKept(own + "." + gone));
-  EXPECT_TRUE(IsKept("old." + gone));
-  // Dots in a row are one.
-  EXPECT_FALSE(IsKept("." + gone));
-}
-
-TEST_F(StalePidFiles, NumbersThatNoProcessHasAreOfNoProcess) {
-  // 2^32 + 1 and 2^64 + 1 would be process 1 if they were cut.
-  for (const char* number : {"2147483647", "4294967297", "9223372036854775807",
-                             "18446744073709551617", "99999999999999999999999"}) {
-    EXPECT_FALSE(IsKept(number)) << number;
-  }
-  EXPECT_THAT(ErrorLines(), IsEmpty());
-}
-
 TEST_F(StalePidFiles, RefusedProbeCountsAsGone) {
-  const std::string path = Put(std::to_string(getpid()));
-  const BeforeExec refuseKill = SeccompFail({SYS_kill}, EPERM);
-  EXPECT_EQ(0, ForkCall([&] {
-              const int result = refuseKill();
-              KillThumbProcesses();
-              return result;
-            }));
-  EXPECT_FALSE(Exists(path));
-}
-
-TEST_F(StalePidFiles, NothingIsProbedForNamesWithoutNumber) {
-  // A probe of process 0 would reach the caller's own group and find it alive.
+  // A probe of process 0, as for names without a number, would reach the caller's own group and
+  // find it alive: none is made.
+  const std::string own = Put(std::to_string(getpid()));
   const std::string word = Put("word");
   const std::string zero = Put("0");
   const BeforeExec refuseKill = SeccompFail({SYS_kill}, EPERM);
-  EXPECT_EQ(0, ForkCall([&] {
+  EXPECT_EQ(ForkCall([&] {
               const int result = refuseKill();
               KillThumbProcesses();
               return result;
-            }));
+            }),
+            0);
+  EXPECT_FALSE(Exists(own));
   EXPECT_TRUE(Exists(word));
   EXPECT_TRUE(Exists(zero));
 }
@@ -241,13 +207,13 @@ class EndBySigTerm : public SandboxTest {
 
 TEST_F(EndBySigTerm, RemovesThePidFileAndExitsWithOne) {
   WriteFile(PidFileOf(getpid()), "");
-  EXPECT_EQ(1, EndInChild());
+  EXPECT_EQ(EndInChild(), 1);
   EXPECT_THAT(ListDirectory("/run"), ElementsAre("velathumb." + std::to_string(getpid()) + ".pid"));
   EXPECT_THAT(ErrorLines(), IsEmpty());
 }
 
 TEST_F(EndBySigTerm, ExitsWithoutPidFileToo) {
-  EXPECT_EQ(1, EndInChild(false));
+  EXPECT_EQ(EndInChild(false), 1);
   EXPECT_THAT(ErrorLines(), IsEmpty());
 }
 
@@ -257,10 +223,10 @@ TEST_F(EndBySigTerm, EndsEveryConverterWhoeverStartedIt) {
   Program converter = StartProgram(kConverterPath, {});
   Program other = StartProgram("/bin/sleep", {"60"});
   ASSERT_TRUE(WaitUntilExists("/tmp/here"));
-  EXPECT_EQ(1, EndInChild());
+  EXPECT_EQ(EndInChild(), 1);
   const auto end = converter.Wait();
   ASSERT_TRUE(end.has_value());
-  EXPECT_EQ(SIGTERM, end->signal);
+  EXPECT_EQ(end->signal, SIGTERM);
   EXPECT_FALSE(other.Wait(std::chrono::milliseconds(50)).has_value());
 }
 

@@ -1,32 +1,16 @@
-// Which instances are at work.
+// Which instances are running.
 #include "thumb/running_instances.h"
 
-#include <gmock/gmock.h>
-#include <signal.h>
 #include <sys/mount.h>
 #include <sys/prctl.h>
-#include <sys/stat.h>
-#include <sys/wait.h>
-#include <unistd.h>
-
-#include <chrono>
-#include <string>
-#include <vector>
 
 #include "support/environment_failure.h"
-#include "support/files.h"
-#include "support/privileges.h"
-#include "support/program.h"
-#include "support/sandbox.h"
+#include "thumb/thumb_test.h"
 
 using namespace vela;
 
 namespace vela_test {
 namespace {
-
-using ::testing::ElementsAre;
-using ::testing::IsEmpty;
-using ::testing::UnorderedElementsAre;
 
 void MakePidFile(const std::string& number) {
   WriteFile("/var/run/velathumb." + number + ".pid", "");
@@ -76,7 +60,7 @@ TEST_F(Instances, DoNotEndWithTheirPidFilesButWithTheirProcesses) {
   EXPECT_TRUE(Exists("/var/run/velathumb." + std::to_string(velathumb.Pid()) + ".pid"));
 }
 
-TEST_F(Instances, AreNotOtherProgramsThatHaveGotTheNumber) {
+TEST_F(Instances, AreNotOtherProgramsWithTheNumber) {
   for (const char* name : {"sleep", "velathumb-queue", "velathum", "xvelathumb"}) {
     const Program other = StartAs(name);
     MakePidFile(std::to_string(other.Pid()));
@@ -84,7 +68,7 @@ TEST_F(Instances, AreNotOtherProgramsThatHaveGotTheNumber) {
   }
 }
 
-TEST_F(Instances, AreNotWhatNamesNoProcess) {
+TEST_F(Instances, AreNotNamesWithoutAProcess) {
   for (const char* number : {"0", "-1", "x", "", "4000000", "99999999999999999999"}) {
     MakePidFile(number);
   }
@@ -92,21 +76,21 @@ TEST_F(Instances, AreNotWhatNamesNoProcess) {
   EXPECT_THAT(RunningInstances(), IsEmpty());
 }
 
-/// For as long as the object lives, /proc shows only processes that may be looked into.
-class SecretiveProcesses {
+/// For as long as the object lives, /proc shows only processes that may be inspected.
+class HiddenProcesses {
  public:
-  SecretiveProcesses() {
+  HiddenProcesses() {
     if (mount("proc", "/proc", "proc", MS_NOSUID | MS_NODEV | MS_NOEXEC, "hidepid=ptraceable") !=
         0) {
       EnvironmentFailureWithErrno("cannot mount a /proc that hides processes");
     }
   }
-  ~SecretiveProcesses() { umount2("/proc", MNT_DETACH); }
-  SecretiveProcesses(const SecretiveProcesses&) = delete;
-  SecretiveProcesses& operator=(const SecretiveProcesses&) = delete;
+  ~HiddenProcesses() { umount2("/proc", MNT_DETACH); }
+  HiddenProcesses(const HiddenProcesses&) = delete;
+  HiddenProcesses& operator=(const HiddenProcesses&) = delete;
 };
 
-/// A process that nobody without capabilities may look into.
+/// A process that cannot be inspected without capabilities.
 class ClosedProcess {
  public:
   ClosedProcess() : pid_(fork()) {
@@ -130,11 +114,11 @@ class ClosedProcess {
   const pid_t pid_;
 };
 
-TEST_F(Instances, MayBeProcessesThatMayNotBeLookedAt) {
+TEST_F(Instances, MayBeProcessesThatCannotBeInspected) {
   const ClosedProcess closed;
   MakePidFile(std::to_string(closed.Pid()));
-  EXPECT_THAT(RunningInstances(), IsEmpty()) << "whoever may look sees another program";
-  const SecretiveProcesses secretive;
+  EXPECT_THAT(RunningInstances(), IsEmpty()) << "it is seen to be another program";
+  const HiddenProcesses hidden;
   MakePidFile("4000000");
   const WithoutCapabilities ordinary;
   ASSERT_FALSE(Exists("/proc/" + std::to_string(closed.Pid())));

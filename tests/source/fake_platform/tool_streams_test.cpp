@@ -1,18 +1,14 @@
-// How the tools are started and what is made of a stream that cannot be read; the platform's piped
-// child is played here.
+// How the tools are started and what happens when their stream cannot be read, with a fake of the
+// platform's piped child.
 #include <fcntl.h>
-#include <gmock/gmock.h>
 
 #include <cstdarg>
-#include <string>
-#include <vector>
 
 #include "platform/vlibc.h"
 #include "source/orientation.h"
 #include "source/raw_image.h"
 #include "source/rotation_check.h"
 #include "source/source_fixture.h"
-#include "support/images.h"
 
 namespace {
 
@@ -45,9 +41,6 @@ int VLIBCPclose(FILE* stream) {
 
 namespace vela_test {
 namespace {
-
-using ::testing::ElementsAre;
-using ::testing::IsEmpty;
 
 class ToolStreams : public SourceTest {
  protected:
@@ -113,7 +106,7 @@ TEST_F(ToolStreams, ThatAreMissingAreNotClosed) {
   EXPECT_EQ(ErrorLines().size(), 3U);
 }
 
-TEST_F(ToolStreams, AreClosedWhenTheOutputFindsNoPlace) {
+TEST_F(ToolStreams, AreClosedWhenTheOutputCannotBeStored) {
   Give("picture");
   EXPECT_FALSE(DcrawToFile(kRaw, "/tmp/nowhere/out", "-w"));
   EXPECT_EQ(g_child.closed, 1);

@@ -1,31 +1,17 @@
-// What the pass does with the source of a photo: the decoded copy of a raw photo, and the turn that
-// its owner gave it.
-#include <gmock/gmock.h>
-#include <gtest/gtest.h>
-#include <sys/stat.h>
+// What the pass does with the source of a photo: the decoded copy of a raw photo, and the rotation
+// of its thumbnails.
 
-#include <algorithm>
-#include <memory>
-#include <string>
-#include <vector>
+#include <optional>
 
-#include "support/daemon_peer.h"
-#include "support/images.h"
-#include "support/stub_tool.h"
-#include "support/system_log.h"
 #include "thumb/directory_pass.h"
 #include "thumb/fake_platform/index_fake.h"
 #include "thumb/fake_platform/source_fake.h"
-#include "thumb/pass_test.h"
+#include "thumb/thumb_test.h"
 
 using namespace vela;
 
 namespace vela_test {
 namespace {
-
-using ::testing::ElementsAre;
-using ::testing::IsEmpty;
-using ::testing::SizeIs;
 
 constexpr const char* kRaw = "/tmp/photos/a.NEF";
 constexpr const char* kRawMetadata = "/tmp/photos/@eaDir/a.NEF";
@@ -38,9 +24,8 @@ class PhotoSource : public PassTest {
  protected:
   void SetUp() override {
     PassTest::SetUp();
-    converter_ = std::make_unique<StubTool>(kConverterPath);
-    daemon_ = std::make_unique<DaemonPeer>();
-    source_ = std::make_unique<SourceFake>();
+    converter_.emplace(kConverterPath);
+    daemon_.emplace();
   }
 
   /// Puts a photo dated at this distance from now, seconds.
@@ -59,7 +44,7 @@ class PhotoSource : public PassTest {
     return sources;
   }
 
-  /// The turns that each call is told, in degrees.
+  /// The turns that each call is to make, in degrees.
   std::vector<std::vector<std::string>> Turns() const {
     std::vector<std::vector<std::string>> turns;
     for (const StubCall& call : converter_->Calls()) {
@@ -73,14 +58,9 @@ class PhotoSource : public PassTest {
     return turns;
   }
 
-  const StubTool& Converter() const { return *converter_; }
-  DaemonPeer& Daemon() const { return *daemon_; }
-  SourceFake& Source() const { return *source_; }
-
- private:
-  std::unique_ptr<StubTool> converter_;
-  std::unique_ptr<DaemonPeer> daemon_;
-  std::unique_ptr<SourceFake> source_;
+  std::optional<StubTool> converter_;
+  std::optional<DaemonPeer> daemon_;
+  SourceFake source_;
 };
 
 class RawSource : public PhotoSource {
@@ -88,9 +68,8 @@ class RawSource : public PhotoSource {
   void SetUp() override {
     PhotoSource::SetUp();
     PutPhoto(kRaw);
-    Source().decode = [](const std::string& metadataDir) {
-      const std::string copy = metadataDir + "/decoded.jpg";
-      MakeJpeg(copy);
+    source_.decode = [](const std::string& metadataDir) {
+      const std::string copy = MakeJpeg(metadataDir + "/decoded.jpg");
       SetFileTime(copy, kCopyTime, 5);
       return copy;
     };
@@ -99,14 +78,10 @@ class RawSource : public PhotoSource {
 
 TEST_F(RawSource, IsDecodedIntoItsMetadataDirectory) {
   RunPass();
-  ASSERT_THAT(Source().decodings, SizeIs(1));
-  EXPECT_EQ(kRaw, Source().decodings[0].path);
-  EXPECT_EQ(kRawMetadata, Source().decodings[0].metadataDir);
-  EXPECT_EQ(4U, Source().decodings[0].profiles);
-}
-
-TEST_F(RawSource, ThumbnailsAreMadeOfTheDecodedCopy) {
-  RunPass();
+  ASSERT_THAT(source_.decodings, SizeIs(1));
+  EXPECT_EQ(source_.decodings[0].path, kRaw);
+  EXPECT_EQ(source_.decodings[0].metadataDir, kRawMetadata);
+  EXPECT_EQ(source_.decodings[0].profiles, 4U);
   EXPECT_THAT(Sources(), ElementsAre(kCopy, kRawReference));
   EXPECT_THAT(
       ListDirectory(kRawMetadata),
@@ -114,25 +89,25 @@ TEST_F(RawSource, ThumbnailsAreMadeOfTheDecodedCopy) {
   EXPECT_THAT(ErrorLines(), IsEmpty());
 }
 
-TEST_F(RawSource, DaemonIsAskedAboutTheCopyAndToldOfThePhoto) {
+TEST_F(RawSource, VersionRequestNamesTheCopyAndReportThePhoto) {
   RunPass();
-  ASSERT_THAT(Daemon().Requests(), SizeIs(2));
-  EXPECT_EQ(std::string("{\"command\":\"GET_INDEX_VERSION\",\"path\":\"") + kCopy + "\"}\n",
-            Daemon().Requests()[0].bytes);
-  EXPECT_EQ(std::string("{\"command\":\"POST_PHOTO_CONVERT\",\"path\":\"") + kRaw + "\"}\n",
-            Daemon().Requests()[1].bytes);
+  ASSERT_THAT(daemon_->Requests(), SizeIs(2));
+  EXPECT_EQ(daemon_->Requests()[0].bytes,
+            std::string("{\"command\":\"GET_INDEX_VERSION\",\"path\":\"") + kCopy + "\"}\n");
+  EXPECT_EQ(daemon_->Requests()[1].bytes,
+            std::string("{\"command\":\"POST_PHOTO_CONVERT\",\"path\":\"") + kRaw + "\"}\n");
 }
 
 TEST_F(RawSource, PhotoItselfIsRegistered) {
   const IndexFake index;
   RunPass();
   ASSERT_THAT(index.Calls(), SizeIs(1));
-  EXPECT_STREQ(kRaw, index.Calls()[0].photo.path);
-  EXPECT_STREQ(kRawReference, index.Calls()[0].thumbnail.path);
+  EXPECT_STREQ(index.Calls()[0].photo.path, kRaw);
+  EXPECT_STREQ(index.Calls()[0].thumbnail.path, kRawReference);
 }
 
 TEST_F(RawSource, CopyIsRemovedBeforePhase1) {
-  Converter().PlanCall(
+  converter_->PlanCall(
       2, StubPlan().WriteOutputs().Run("/bin/mv", {kCopy, "/tmp/still.there"}).Exit(0));
   RunPass();
   EXPECT_THAT(Sources(), SizeIs(2));
@@ -141,7 +116,7 @@ TEST_F(RawSource, CopyIsRemovedBeforePhase1) {
 }
 
 TEST_F(RawSource, CopyIsRemovedAfterAFailureToo) {
-  Converter().Plan(StubPlan().Exit(1));
+  converter_->Plan(StubPlan().Exit(1));
   RunPass();
   EXPECT_THAT(ListDirectory(kRawMetadata),
               ElementsAre("VELAPHOTO_THUMB_B.fail", "VELAPHOTO_THUMB_M.fail",
@@ -150,60 +125,51 @@ TEST_F(RawSource, CopyIsRemovedAfterAFailureToo) {
 }
 
 TEST_F(RawSource, CopyKeepsItsDateForAPhotoOfThePast) {
-  Converter().PlanCall(1, StubPlan().WriteOutputs().Run("/bin/cp", {"-p", kCopy, "/tmp/copy"}));
+  converter_->PlanCall(1, StubPlan().WriteOutputs().Run("/bin/cp", {"-p", kCopy, "/tmp/copy"}));
   RunPass();
-  EXPECT_EQ((FileTime{kCopyTime, 5}), ModificationTime("/tmp/copy"));
+  EXPECT_EQ(ModificationTime("/tmp/copy"), (FileTime{kCopyTime, 5}));
 }
 
 TEST_F(RawSource, CopyIsDatedLikeAPhotoOfTheFuture) {
   SetFileTimeFromNow(kRaw, 3600);
   const int64_t second = ModificationTime(kRaw).seconds;
   SetFileTime(kRaw, second, 123456789);
-  Converter().PlanCall(1, StubPlan().WriteOutputs().Run("/bin/cp", {"-p", kCopy, "/tmp/copy"}));
+  converter_->PlanCall(1, StubPlan().WriteOutputs().Run("/bin/cp", {"-p", kCopy, "/tmp/copy"}));
   RunPass();
-  EXPECT_EQ((FileTime{second, 0}), ModificationTime("/tmp/copy"));
-  EXPECT_EQ((FileTime{second, 0}), AccessTime("/tmp/copy"));
-  EXPECT_EQ((FileTime{second, 0}), ModificationTime(kRawReference));
+  EXPECT_EQ(ModificationTime("/tmp/copy"), (FileTime{second, 0}));
+  EXPECT_EQ(AccessTime("/tmp/copy"), (FileTime{second, 0}));
+  EXPECT_EQ(ModificationTime(kRawReference), (FileTime{second, 0}));
+  EXPECT_EQ(ModificationTime(kRaw), (FileTime{second, 123456789}));
 }
 
-TEST_F(RawSource, PhotoOfTheFutureKeepsItsOwnDate) {
-  SetFileTimeFromNow(kRaw, 3600);
-  const FileTime before = ModificationTime(kRaw);
-  RunPass();
-  EXPECT_EQ(before, ModificationTime(kRaw));
+TEST_F(RawSource, CopyThatIsNoFileIsSilentlySkipped) {
+  for (const bool isDirectory : {true, false}) {
+    source_.decode = [=](const std::string& metadataDir) {
+      const std::string copy = metadataDir + (isDirectory ? "/directory" : "/missing.jpg");
+      if (isDirectory) {
+        MakeDirectories(copy);
+      }
+      return copy;
+    };
+    RunPass();
+    EXPECT_THAT(daemon_->Commands(), IsEmpty());
+    EXPECT_THAT(Sources(), IsEmpty());
+    EXPECT_FALSE(Exists(kProgress));
+    EXPECT_THAT(ListDirectory(kRawMetadata), ElementsAre("directory"));
+    EXPECT_THAT(ErrorLines(), IsEmpty());
+  }
 }
 
-TEST_F(RawSource, CopyThatIsNoFileIsPassedOverInSilence) {
-  Source().decode = [](const std::string& metadataDir) {
-    MakeDirectories(metadataDir + "/decoded.jpg");
-    return metadataDir + "/decoded.jpg";
-  };
-  RunPass();
-  EXPECT_THAT(Daemon().Commands(), IsEmpty());
-  EXPECT_THAT(Sources(), IsEmpty());
-  EXPECT_FALSE(Exists(kProgress));
-  EXPECT_THAT(ListDirectory(kRawMetadata), ElementsAre("decoded.jpg"));
-  EXPECT_THAT(ErrorLines(), IsEmpty());
-}
-
-TEST_F(RawSource, CopyThatIsMissingIsPassedOverInSilence) {
-  Source().decode = [](const std::string& metadataDir) { return metadataDir + "/missing.jpg"; };
-  RunPass();
-  EXPECT_THAT(Daemon().Commands(), IsEmpty());
-  EXPECT_FALSE(Exists(kProgress));
-  EXPECT_THAT(ErrorLines(), IsEmpty());
-}
-
-TEST_F(RawSource, FailedDecodingGivesThePhotoUp) {
-  Source().decode = nullptr;
+TEST_F(RawSource, FailedDecodingMarksThePhotoAsFailed) {
+  source_.decode = nullptr;
   RunPass();
   EXPECT_THAT(ListDirectory(kRawMetadata),
               ElementsAre("VELAPHOTO_THUMB_B.fail", "VELAPHOTO_THUMB_M.fail",
                           "VELAPHOTO_THUMB_S.fail", "VELAPHOTO_THUMB_XL.fail"));
-  EXPECT_EQ("completed=\"1\"\ncompleted_thumb=\"4\"\n", ReadFile(kProgress));
-  EXPECT_THAT(Daemon().Commands(), ElementsAre("POST_PHOTO_CONVERT"));
+  EXPECT_EQ(ReadFile(kProgress), "completed=\"1\"\ncompleted_thumb=\"4\"\n");
+  EXPECT_THAT(daemon_->Commands(), ElementsAre("POST_PHOTO_CONVERT"));
   EXPECT_THAT(Sources(), IsEmpty());
-  EXPECT_THAT(Source().rotations, IsEmpty());
+  EXPECT_THAT(source_.rotations, IsEmpty());
 }
 
 TEST_F(RawSource, IsDecodedInPhase0Only) {
@@ -212,16 +178,16 @@ TEST_F(RawSource, IsDecodedInPhase0Only) {
   }
   RunPass();
   RunPass();
-  EXPECT_THAT(Source().decodings, IsEmpty());
+  EXPECT_THAT(source_.decodings, IsEmpty());
   EXPECT_THAT(Sources(), ElementsAre(kRawReference, kRawReference));
 }
 
-TEST_F(RawSource, RotationIsLookedForInTheCopy) {
-  Daemon().SetIndexVersion(1);
+TEST_F(RawSource, RotationIsDetectedInTheCopy) {
+  daemon_->SetIndexVersion(1);
   RunPass();
-  ASSERT_THAT(Source().rotations, SizeIs(1));
-  EXPECT_EQ(kCopy, Source().rotations[0].path);
-  EXPECT_EQ(kRawMetadata, Source().rotations[0].metadataDir);
+  ASSERT_THAT(source_.rotations, SizeIs(1));
+  EXPECT_EQ(source_.rotations[0].path, kCopy);
+  EXPECT_EQ(source_.rotations[0].metadataDir, kRawMetadata);
 }
 
 class OrdinarySource : public PhotoSource {
@@ -234,7 +200,7 @@ class OrdinarySource : public PhotoSource {
 
 TEST_F(OrdinarySource, IsNotDecodedAndStays) {
   RunPass();
-  EXPECT_THAT(Source().decodings, IsEmpty());
+  EXPECT_THAT(source_.decodings, IsEmpty());
   EXPECT_TRUE(Exists(kPhoto));
 }
 
@@ -242,43 +208,43 @@ TEST_F(OrdinarySource, OfTheFutureKeepsItsDate) {
   SetFileTimeFromNow(kPhoto, 3600);
   const FileTime before = ModificationTime(kPhoto);
   RunPass();
-  EXPECT_EQ(before, ModificationTime(kPhoto));
+  EXPECT_EQ(ModificationTime(kPhoto), before);
 }
 
 TEST_F(OrdinarySource, RotationOfANewIndexIsAppliedInPhase0Only) {
-  Daemon().SetIndexVersion(1);
-  Source().rotation = 270;
+  daemon_->SetIndexVersion(1);
+  source_.rotation = 270;
   RunPass();
-  ASSERT_THAT(Source().rotations, SizeIs(1));
-  EXPECT_EQ(kPhoto, Source().rotations[0].path);
-  EXPECT_EQ(kMetadata, Source().rotations[0].metadataDir);
-  EXPECT_EQ(4U, Source().rotations[0].profiles);
+  ASSERT_THAT(source_.rotations, SizeIs(1));
+  EXPECT_EQ(source_.rotations[0].path, kPhoto);
+  EXPECT_EQ(source_.rotations[0].metadataDir, kMetadata);
+  EXPECT_EQ(source_.rotations[0].profiles, 4U);
   EXPECT_THAT(Turns(), ElementsAre(ElementsAre("270", "270"), IsEmpty()));
 }
 
-TEST_F(OrdinarySource, NoRotationIsLookedForInAnOldIndex) {
-  Source().rotation = 90;
+TEST_F(OrdinarySource, RotationIsNotDetectedInAnOldIndex) {
+  source_.rotation = 90;
   RunPass();
-  EXPECT_THAT(Source().rotations, IsEmpty());
+  EXPECT_THAT(source_.rotations, IsEmpty());
   EXPECT_THAT(Turns(), ElementsAre(IsEmpty(), IsEmpty()));
 }
 
-TEST_F(OrdinarySource, NoRotationIsLookedForInLaterPhases) {
-  Daemon().SetIndexVersion(2);
-  Source().rotation = 180;
+TEST_F(OrdinarySource, RotationIsNotDetectedInLaterPhases) {
+  daemon_->SetIndexVersion(2);
+  source_.rotation = 180;
   for (const char* sizeClass : {"XL", "M"}) {
     MakeJpeg(Thumb(sizeClass));
   }
   RunPass();
   RunPass();
-  EXPECT_THAT(Source().rotations, IsEmpty());
+  EXPECT_THAT(source_.rotations, IsEmpty());
   EXPECT_THAT(Turns(), ElementsAre(IsEmpty(), IsEmpty()));
 }
 
 TEST_F(OrdinarySource, RotationOfOnePhotoIsNotThatOfTheNext) {
   PutPhoto(std::string(kDir) + "/b.jpg");
-  Daemon().AnswerNext(DaemonReply::Line("{\"success\":true,\"version\":1}"));
-  Source().rotation = 90;
+  daemon_->AnswerNext(DaemonReply::Line("{\"success\":true,\"version\":1}"));
+  source_.rotation = 90;
   RunPass();
   EXPECT_THAT(Turns(), ElementsAre(ElementsAre("90", "90"), IsEmpty(), IsEmpty(), IsEmpty()));
 }
