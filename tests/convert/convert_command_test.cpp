@@ -1,14 +1,9 @@
 // The converter's arguments, part by part.
-#include <gmock/gmock.h>
-
 #include <functional>
-#include <string>
-#include <vector>
 
 #include "convert/convert_command.h"
+#include "convert/convert_fixture.h"
 #include "platform/velautils.h"
-#include "support/sandbox.h"
-#include "support/stub_tool.h"
 
 using namespace vela;
 
@@ -18,13 +13,11 @@ namespace {
 using ::testing::ElementsAre;
 using ::testing::IsEmpty;
 
-using Words = std::vector<std::string>;
-
-class ConvertCommand : public SandboxTest {
+class ConvertCommand : public QuietTest {
  protected:
   using AddArguments = std::function<void(VELAUtils::ProcessRunner& runner)>;
 
-  /// What reaches the converter when these arguments are all it gets.
+  /// The parameters that the converter gets from this call alone.
   static Words Arguments(const AddArguments& add) {
     const StubTool converter(kConverterPath);
     converter.Plan(StubPlan());
@@ -60,26 +53,7 @@ class ConvertCommand : public SandboxTest {
   }
 };
 
-const Words kPlainOptions = {"-define",  "jpeg:size=320x320", "-thumbnail",
-                             "320x320>", "-quality",          "90"};
-
-/// `words`, one list behind the other.
-Words Joined(const std::vector<Words>& lists) {
-  Words joined;
-  for (const Words& list : lists) {
-    joined.insert(joined.end(), list.begin(), list.end());
-  }
-  return joined;
-}
-
-TEST_F(ConvertCommand, OptionsOfANewSetting) {
-  EXPECT_EQ(Options(PhotoThumbSetting()),
-            Joined({kPlainOptions, {"+profile", "!icc,*", "-flatten", "-colorspace", "sRGB"}}));
-}
-
-TEST_F(ConvertCommand, EveryOptionOff) {
-  EXPECT_EQ(Options(Plain()), kPlainOptions);
-}
+const Words kPlainOptions = WordsOf("-define jpeg:size=320x320 -thumbnail 320x320> -quality 90");
 
 TEST_F(ConvertCommand, EveryOptionOn) {
   PhotoThumbSetting setting;
@@ -91,28 +65,32 @@ TEST_F(ConvertCommand, EveryOptionOn) {
   setting.rotate = 270;
   setting.unsharp = "0.5x0.5+1.25+0.0";
   setting.colorspace = "Gray";
-  EXPECT_THAT(Options(setting),
-              ElementsAre("-define", "jpeg:size=1280x960", "-thumbnail", "1280x960>^", "-quality",
-                          "75", "+profile", "!icc,*", "-flatten", "-auto-orient", "-rotate", "270",
-                          "-unsharp", "0.5x0.5+1.25+0.0", "-colorspace", "Gray"));
+  EXPECT_EQ(
+      Options(setting),
+      WordsOf(
+          "-define jpeg:size=1280x960 -thumbnail 1280x960>^ -quality 75 +profile "
+          "!icc,* -flatten -auto-orient -rotate 270 -unsharp 0.5x0.5+1.25+0.0 -colorspace Gray"));
 }
 
-TEST_F(ConvertCommand, EveryOptionAlone) {
-  PhotoThumbSetting setting = Plain();
-  setting.stripProfiles = true;
-  EXPECT_EQ(Options(setting), Joined({kPlainOptions, {"+profile", "!icc,*"}}));
-  setting = Plain();
-  setting.flatten = true;
-  EXPECT_EQ(Options(setting), Joined({kPlainOptions, {"-flatten"}}));
-  PhotoThumbSetting upright(Plain());
-  upright.autoOrient = true;
-  EXPECT_EQ(Options(upright), Joined({kPlainOptions, {"-auto-orient"}}));
-  PhotoThumbSetting sharp(Plain());
-  sharp.unsharp = "  as it is %d";
-  EXPECT_EQ(Options(sharp), Joined({kPlainOptions, {"-unsharp", "  as it is %d"}}));
-  PhotoThumbSetting coloured(Plain());
-  coloured.colorspace = "CMYK";
-  EXPECT_EQ(Options(coloured), Joined({kPlainOptions, {"-colorspace", "CMYK"}}));
+TEST_F(ConvertCommand, SingleOptions) {
+  EXPECT_EQ(Options(PhotoThumbSetting()),
+            Joined({kPlainOptions, {"+profile", "!icc,*", "-flatten", "-colorspace", "sRGB"}}));
+  const struct {
+    void (*change)(PhotoThumbSetting& setting);
+    Words words;
+  } cases[] = {
+      {[](PhotoThumbSetting&) {}, {}},
+      {[](PhotoThumbSetting& s) { s.stripProfiles = true; }, {"+profile", "!icc,*"}},
+      {[](PhotoThumbSetting& s) { s.flatten = true; }, {"-flatten"}},
+      {[](PhotoThumbSetting& s) { s.autoOrient = true; }, {"-auto-orient"}},
+      {[](PhotoThumbSetting& s) { s.unsharp = "  as it is %d"; }, {"-unsharp", "  as it is %d"}},
+      {[](PhotoThumbSetting& s) { s.colorspace = "CMYK"; }, {"-colorspace", "CMYK"}},
+  };
+  for (const auto& c : cases) {
+    PhotoThumbSetting setting = Plain();
+    c.change(setting);
+    EXPECT_EQ(Options(setting), Joined({kPlainOptions, c.words}));
+  }
 }
 
 TEST_F(ConvertCommand, OnlyPositiveRotationsArePassed) {
@@ -132,11 +110,11 @@ TEST_F(ConvertCommand, NumbersArePassedAsTheyAre) {
   setting.width = 0;
   setting.height = -7;
   setting.quality = -2147483647;
-  EXPECT_THAT(Options(setting), ElementsAre("-define", "jpeg:size=0x-7", "-thumbnail", "0x-7>",
-                                            "-quality", "-2147483647"));
+  EXPECT_EQ(Options(setting),
+            WordsOf("-define jpeg:size=0x-7 -thumbnail 0x-7> -quality -2147483647"));
 }
 
-TEST_F(ConvertCommand, FirstOutputIsACopyOfThePhotoWhichThenGoes) {
+TEST_F(ConvertCommand, FirstOutputIsACopyOfThePhotoWhichIsThenDeleted) {
   PhotoThumbSetting setting = Plain();
   setting.tempPath = "/tmp/100%.jpg";
   EXPECT_EQ(Arguments([&](VELAUtils::ProcessRunner& r) { AddFirstOutput(r, setting); }),
@@ -156,20 +134,22 @@ TEST_F(ConvertCommand, LastOutputEndsTheCommand) {
   EXPECT_EQ(LastOutput("/tmp/t.jpg"), Joined({kPlainOptions, {"/tmp/t.jpg"}}));
 }
 
-TEST_F(ConvertCommand, PercentSignsOfOutputsAreEscaped) {
-  EXPECT_EQ(LastOutput("%/50%%d %s%").back(), "%%/50%%%%d %%s%%");
-}
-
-TEST_F(ConvertCommand, OutputsAreCutAtTheirBuffer) {
+TEST_F(ConvertCommand, OutputsAreEscapedAndThenTruncatedBetweenEscapes) {
   const std::string fits(8191, 'p');
-  EXPECT_EQ(LastOutput(fits).back(), fits);
-  EXPECT_EQ(LastOutput(fits + "q").back(), fits);
-  EXPECT_EQ(LastOutput(std::string(20000, 'p')).back(), fits);
-}
-
-TEST_F(ConvertCommand, OutputsAreCutAfterEscapingAndNeverInsideAnEscape) {
-  EXPECT_EQ(LastOutput(std::string(5000, '%')).back(), std::string(8190, '%'));
-  EXPECT_EQ(LastOutput("p" + std::string(5000, '%')).back(), "p" + std::string(8190, '%'));
+  const struct {
+    std::string path;
+    std::string argument;
+  } cases[] = {
+      {"%/50%%d %s%", "%%/50%%%%d %%s%%"},
+      {fits, fits},
+      {fits + "q", fits},
+      {std::string(20000, 'p'), fits},
+      {std::string(5000, '%'), std::string(8190, '%')},
+      {"p" + std::string(5000, '%'), "p" + std::string(8190, '%')},
+  };
+  for (const auto& c : cases) {
+    EXPECT_EQ(LastOutput(c.path).back(), c.argument) << c.path.substr(0, 20);
+  }
 }
 
 TEST_F(ConvertCommand, LongArgumentsArePassedWhole) {
@@ -191,7 +171,7 @@ TEST_F(ConvertCommand, ScratchFilesGoIntoTheOutputDirectoryOfTheFirstSetting) {
               ElementsAre("-define", "registry:temporary-path=/tmp/first 100%"));
 }
 
-TEST_F(ConvertCommand, ScratchFilesGoWhereTheConverterLikesWithoutOutputDirectory) {
+TEST_F(ConvertCommand, ThereIsNoScratchOptionWithoutOutputDirectory) {
   PhotoConvertJob job;
   EXPECT_THAT(TempPathDefine(job), IsEmpty());
   job.settings.resize(2);
@@ -199,7 +179,7 @@ TEST_F(ConvertCommand, ScratchFilesGoWhereTheConverterLikesWithoutOutputDirector
   EXPECT_THAT(TempPathDefine(job), IsEmpty());
 }
 
-TEST_F(ConvertCommand, TheScratchOptionIsCutAtItsBuffer) {
+TEST_F(ConvertCommand, TheScratchOptionIsTruncatedAtItsBuffer) {
   const std::string option = "registry:temporary-path=";
   PhotoConvertJob job;
   job.settings.resize(1);

@@ -1,17 +1,15 @@
 // A photo, the directory of its thumbnails and a recording converter.
 #pragma once
 
-#include <gmock/gmock.h>
-
 #include <optional>
 #include <string>
 #include <vector>
 
 #include "convert/velamk_photo_thumb.h"
+#include "quiet_test.h"
 #include "support/files.h"
-#include "support/sandbox.h"
 #include "support/stub_tool.h"
-#include "support/system_log.h"
+#include "words.h"
 
 namespace vela_test {
 
@@ -51,10 +49,10 @@ inline PhotoConvertJob MakeJob(const std::vector<int>& widths) {
   return job;
 }
 
-class ConvertTest : public SandboxTest {
+class ConvertTest : public QuietTest {
  protected:
   void SetUp() override {
-    SandboxTest::SetUp();
+    QuietTest::SetUp();
     converter_.emplace(kConverterPath);
     WriteFileOfSize(kPhoto, 20000);
     MakeDirectories(kOutDir);

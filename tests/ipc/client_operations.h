@@ -1,12 +1,16 @@
-// The six operations of the plugin daemon's client, so that a test can go through them all.
+// The six operations of the plugin daemon's client, for tests that loop over all of them.
 #pragma once
 
+#include <json/json.h>
+
 #include <functional>
+#include <memory>
 #include <string>
 #include <vector>
 
 #include "ipc/velamk_ipc.h"
 #include "platform/velaindex.h"
+#include "quiet_test.h"
 
 namespace vela_test {
 
@@ -14,9 +18,9 @@ namespace vela_test {
 struct ClientOperation {
   std::string command;   ///< the command word it sends
   bool sendsPath;        ///< whether its request names a path
-  int failure;           ///< what `call` gives when the daemon did not carry it out
+  int failure;           ///< what `call` returns when the daemon did not carry it out
   std::string failLine;  ///< what it then writes to the system log
-  /// Calls it for a path; gives its result, false as 0 and true as 1, 0 where it has none.
+  /// Calls it for a path; returns its result, a bool as 0 or 1, 0 for none.
   std::function<int(const char* path)> call;
 };
 
@@ -44,6 +48,27 @@ inline std::vector<ClientOperation> ClientOperations() {
          return 0;
        }},
   };
+}
+
+/// Tests of the client's operations.
+class ClientTest : public QuietTest {
+ protected:
+  static constexpr const char* kPath = "/volume1/photo/a.jpg";
+
+  /// Calls the operation, which has to fail with its value and its log line.
+  static void ExpectFailure(const ClientOperation& operation) {
+    EXPECT_EQ(operation.call(kPath), operation.failure) << operation.command;
+    EXPECT_THAT(TakeErrorLines(), ::testing::ElementsAre(operation.failLine));
+  }
+};
+
+/// The JSON value of the text; fails the test when there is none.
+inline Json::Value Parsed(const std::string& text) {
+  Json::Value value;
+  std::string errors;
+  const std::unique_ptr<Json::CharReader> reader(Json::CharReaderBuilder().newCharReader());
+  EXPECT_TRUE(reader->parse(text.data(), text.data() + text.size(), &value, &errors)) << errors;
+  return value;
 }
 
 }  // namespace vela_test

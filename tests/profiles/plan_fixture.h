@@ -1,7 +1,6 @@
 // A photo, its metadata directory, the profiles of a run and a recording converter.
 #pragma once
 
-#include <gmock/gmock.h>
 #include <sys/stat.h>
 
 #include <memory>
@@ -11,10 +10,10 @@
 #include <vector>
 
 #include "profiles/photo_thumb_plan.h"
+#include "quiet_test.h"
 #include "support/files.h"
-#include "support/sandbox.h"
 #include "support/stub_tool.h"
-#include "support/system_log.h"
+#include "words.h"
 
 namespace vela_test {
 
@@ -27,10 +26,10 @@ inline std::string InEaDir(const std::string& name) {
   return std::string(kEaDir) + "/" + name;
 }
 
-class PlanTest : public SandboxTest {
+class PlanTest : public QuietTest {
  protected:
   void SetUp() override {
-    SandboxTest::SetUp();
+    QuietTest::SetUp();
     mask_ = umask(0);  // as the program runs
     converter_.emplace(kConverterPath);
     WriteFile(kPhoto, "photo");
@@ -38,7 +37,10 @@ class PlanTest : public SandboxTest {
     MakeDirectories(kEaDir);
   }
 
-  void TearDown() override { umask(mask_); }
+  void TearDown() override {
+    umask(mask_);
+    QuietTest::TearDown();
+  }
 
   StubTool& Converter() { return *converter_; }
 

@@ -1,4 +1,4 @@
-// The record of a profile and the lists' lookups.
+// Profiles and lookups in lists of them.
 #include <gmock/gmock.h>
 
 #include <climits>
@@ -6,6 +6,8 @@
 #include <string>
 
 #include "profiles/thumbnail_profile.h"
+
+using namespace vela;
 
 namespace vela_test {
 namespace {
@@ -17,7 +19,7 @@ const ThumbnailProfile* Add(ThumbnailProfileList& list, int size, int phase) {
   return profile;
 }
 
-TEST(ProfileRecord, GivesWhatItWasMadeOf) {
+TEST(ProfileRecord, ReturnsItsArguments) {
   const ThumbnailProfile profile(640, 75, "1x1", "VELAPHOTO:THUMB_B.jpg", 9);
   EXPECT_EQ(profile.size(), 640);
   EXPECT_EQ(profile.quality(), 75);
@@ -74,7 +76,7 @@ TEST(ProfileList, CountsByPhase) {
   }
 }
 
-TEST(ProfileList, GivesProfilesByPhaseAndPosition) {
+TEST(ProfileList, FindsProfilesByPhaseAndPosition) {
   ThumbnailProfileList list;
   const ThumbnailProfile* first = Add(list, 1, 1);
   const ThumbnailProfile* second = Add(list, 2, 0);
@@ -92,7 +94,7 @@ TEST(ProfileList, GivesProfilesByPhaseAndPosition) {
   }
 }
 
-TEST(ProfileList, GivesNothingPastTheEnd) {
+TEST(ProfileList, FindsNothingPastTheEnd) {
   ThumbnailProfileList list;
   Add(list, 1, 0);
   Add(list, 2, 1);

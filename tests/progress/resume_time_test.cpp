@@ -1,18 +1,15 @@
-// The time until which conversion rests.
-#include <gmock/gmock.h>
+// The time until which conversion is paused.
 #include <sys/stat.h>
 #include <sys/time.h>
 
 #include <cerrno>
 #include <cstdio>
 #include <ctime>
-#include <string>
 
 #include "progress/velamk_progress.h"
+#include "quiet_test.h"
 #include "support/files.h"
 #include "support/privileges.h"
-#include "support/sandbox.h"
-#include "support/system_log.h"
 
 namespace vela_test {
 namespace {
@@ -20,12 +17,11 @@ namespace {
 using ::testing::AllOf;
 using ::testing::ElementsAre;
 using ::testing::Ge;
-using ::testing::IsEmpty;
 using ::testing::Le;
 
 constexpr const char* kSettings = "/etc/velainfo.conf";
 
-class ResumeTime : public SandboxTest {
+class ResumeTime : public QuietTest {
  protected:
   static void Store(const std::string& value) {
     WriteFile(kSettings, "thumb_conv_resume_time=\"" + value + "\"\n");
@@ -40,56 +36,45 @@ class ResumeTime : public SandboxTest {
     return wait.tv_sec;
   }
 
-  /// Reads the time, which fails with this error.
-  static void ExpectFailedRead(int error) {
+  static std::string FailedReadLine(int error) {
     char line[128];
     std::snprintf(line, sizeof line,
                   "velamk_progress:176 VLIBCFileGetKeyValue(thumb_conv_resume_time) failed, "
                   "velaerr=0x%04X",
                   static_cast<unsigned>(error));
-    ClearLog();
+    return line;
+  }
+
+  /// Reads the time, which fails with this error.
+  static void ExpectFailedRead(int error) {
     EXPECT_EQ(GetThumbConvResumeTime(), 0);
-    EXPECT_THAT(ErrorLines(), ElementsAre(line));
+    EXPECT_THAT(TakeErrorLines(), ElementsAre(FailedReadLine(error)));
   }
 };
 
 TEST_F(ResumeTime, IsTheStoredTime) {
   WriteFile(kSettings, "thumb_conv_paused=\"1\"\nthumb_conv_resume_time=\"1700000000\"\n");
   EXPECT_EQ(GetThumbConvResumeTime(), 1700000000);
-  EXPECT_THAT(ErrorLines(), IsEmpty());
-}
-
-TEST_F(ResumeTime, IsZeroWhenNoneIsStored) {
   WriteFile(kSettings, "thumb_conv_paused=\"1\"\n");
   EXPECT_EQ(GetThumbConvResumeTime(), 0);
-  EXPECT_THAT(ErrorLines(), IsEmpty());
 }
 
 TEST_F(ResumeTime, IsReadAsALeadingNumber) {
-  Store("");
-  EXPECT_EQ(GetThumbConvResumeTime(), 0);
-  Store("abc");
-  EXPECT_EQ(GetThumbConvResumeTime(), 0);
-  Store("12abc");
-  EXPECT_EQ(GetThumbConvResumeTime(), 12);
-  Store("-5");
-  EXPECT_EQ(GetThumbConvResumeTime(), -5);
-  Store("010");
-  EXPECT_EQ(GetThumbConvResumeTime(), 10);
-  EXPECT_THAT(ErrorLines(), IsEmpty());
-}
-
-TEST_F(ResumeTime, GoesBeyondTheYear2038) {
-  Store("1099511627776");
-  EXPECT_EQ(GetThumbConvResumeTime(), 1099511627776);
-  EXPECT_EQ(IsThumbConvResumeTimeReached(), 0);
-}
-
-TEST_F(ResumeTime, IsReadUpToAThousandCharacters) {
-  Store(std::string(1022, '0') + "5");
-  EXPECT_EQ(GetThumbConvResumeTime(), 5);
-  Store(std::string(1023, '0') + "5");
-  EXPECT_EQ(GetThumbConvResumeTime(), 0);
+  const struct {
+    std::string value;
+    time_t time;
+  } cases[] = {{"", 0},
+               {"abc", 0},
+               {"12abc", 12},
+               {"-5", -5},
+               {"010", 10},
+               {"1099511627776", 1099511627776},  // after 2038
+               {std::string(1022, '0') + "5", 5},
+               {std::string(1023, '0') + "5", 0}};  // cut at its buffer
+  for (const auto& c : cases) {
+    Store(c.value);
+    EXPECT_EQ(GetThumbConvResumeTime(), c.time) << c.value;
+  }
 }
 
 TEST_F(ResumeTime, AFailedReadIsLoggedWithItsError) {
@@ -108,35 +93,20 @@ TEST_F(ResumeTime, AFailedReadCountsAsReached) {
   RemoveTree(kSettings);
   EXPECT_EQ(IsThumbConvResumeTimeReached(), 1);
   EXPECT_EQ(Wait(), 0);
+  EXPECT_THAT(TakeErrorLines(), ElementsAre(FailedReadLine(ENOENT), FailedReadLine(ENOENT)));
 }
 
-TEST_F(ResumeTime, AMissingTimeIsReached) {
+TEST_F(ResumeTime, IsReachedUnlessItIsAheadOrNegative) {
   WriteFile(kSettings, "");
   EXPECT_EQ(IsThumbConvResumeTimeReached(), 1);
-}
-
-TEST_F(ResumeTime, APastTimeIsReached) {
-  Store(0);
-  EXPECT_EQ(IsThumbConvResumeTimeReached(), 1);
-  Store(1700000000);
-  EXPECT_EQ(IsThumbConvResumeTimeReached(), 1);
-}
-
-TEST_F(ResumeTime, TheCurrentSecondIsReached) {
-  Store(std::time(nullptr));
-  EXPECT_EQ(IsThumbConvResumeTimeReached(), 1);
-}
-
-TEST_F(ResumeTime, ATimeAheadIsNotReached) {
-  Store(std::time(nullptr) + 30);
-  EXPECT_EQ(IsThumbConvResumeTimeReached(), 0);
-}
-
-TEST_F(ResumeTime, ANegativeTimeIsNeverReached) {
-  Store(-5);
-  EXPECT_EQ(IsThumbConvResumeTimeReached(), 0);
-  Store(-1);
-  EXPECT_EQ(IsThumbConvResumeTimeReached(), 0);
+  for (const long reached : {0L, 1700000000L, static_cast<long>(std::time(nullptr))}) {
+    Store(reached);
+    EXPECT_EQ(IsThumbConvResumeTimeReached(), 1) << reached;
+  }
+  for (const long notReached : {-5L, -1L, std::time(nullptr) + 30L, 1099511627776L}) {
+    Store(notReached);
+    EXPECT_EQ(IsThumbConvResumeTimeReached(), 0) << notReached;
+  }
 }
 
 TEST_F(ResumeTime, TheWaitIsTheTimeLeft) {
@@ -147,7 +117,7 @@ TEST_F(ResumeTime, TheWaitIsTheTimeLeft) {
   EXPECT_THAT(wait, AllOf(Le(1000), Ge(1000 - (after - before))));
 }
 
-TEST_F(ResumeTime, TheWaitForATimeOfThePastIsZero) {
+TEST_F(ResumeTime, TheWaitForAPastTimeIsZero) {
   Store(std::time(nullptr) - 5);
   EXPECT_EQ(Wait(), 0);
   Store(-5);

@@ -1,5 +1,5 @@
-// Files so deep or so long of name that no path leads to them. Each is removed with its object: the
-// sandbox removes by paths.
+// Files that are too deep or have too long a name for any path. Each is removed by its object,
+// because the sandbox removes files by path.
 #pragma once
 
 #include <fcntl.h>
@@ -20,7 +20,7 @@ inline Descriptor OpenDirectory(const std::string& path, int above = AT_FDCWD) {
   return Descriptor(openat(above, path.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
 }
 
-/// Makes an empty file in an open directory; whether that went well.
+/// Makes an empty file in an open directory; returns whether that succeeded.
 inline bool MakeFileAt(const Descriptor& directory, const std::string& name) {
   return Descriptor(openat(directory.Get(), name.c_str(), O_WRONLY | O_CREAT | O_CLOEXEC, 0644))
       .IsOpen();
@@ -42,8 +42,8 @@ class FileInDirectory {
   std::string name_;
 };
 
-/// `depth` directories called `name`, one in the other, the first in `top`, and in each of them the
-/// empty file `file`.
+/// `depth` directories called `name`, each inside the previous one, the first in `top`, and in each
+/// of them the empty file `file`.
 class DeepTree {
  public:
   DeepTree(const std::string& top, const std::string& name, int depth, const std::string& file)
@@ -56,7 +56,7 @@ class DeepTree {
       EXPECT_TRUE(MakeFileAt(directory, file)) << level;
     }
   }
-  /// Takes the first level away and puts the next in its place, until none is left.
+  /// Removes the first level and puts the next in its place, until none is left.
   ~DeepTree() {
     const std::string rest = first_.substr(0, first_.rfind('/')) + "/.rest";
     for (int level = 0; level < depth_; ++level) {

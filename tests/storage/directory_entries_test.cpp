@@ -1,32 +1,30 @@
-// The entries of a directory.
-#include "posix/directory_entries.h"
-#include "posix/cut_text.h"
-
-#include <gmock/gmock.h>
+// The entries of a directory and walks through the directories of a tree.
 #include <sys/stat.h>
 #include <unistd.h>
 
-#include <string>
+#include <stdexcept>
 
+#include "posix/cut_text.h"
+#include "quiet_test.h"
+#include "storage/directory_tree.h"
 #include "storage/velamk_thumb_status.h"
 #include "support/files.h"
 #include "support/privileges.h"
-#include "support/sandbox.h"
-#include "support/system_log.h"
 
 using namespace vela;
 
 namespace vela_test {
 namespace {
 
-using ::testing::IsEmpty;
+using ::testing::ElementsAre;
+using ::testing::UnorderedElementsAre;
 
 constexpr const char* kDir = "/tmp/dir";
 
-class EntryCount : public SandboxTest {
+class EntryCount : public QuietTest {
  protected:
   void SetUp() override {
-    SandboxTest::SetUp();
+    QuietTest::SetUp();
     MakeDirectories(kDir);
   }
 };
@@ -44,20 +42,20 @@ TEST_F(EntryCount, HasEntriesOfAllKindsAndNames) {
   EXPECT_EQ(CountDirEntries(kDir), 10);
 }
 
-TEST_F(EntryCount, GoesBeyondOneRead) {
+TEST_F(EntryCount, IsNotLimitedToOneRead) {
   for (int i = 0; i < 3000; ++i) {
     WriteFile(std::string(kDir) + "/" + std::to_string(i) + std::string(200, 'n'), "");
   }
   EXPECT_EQ(CountDirEntries(kDir), 3002);
 }
 
-TEST_F(EntryCount, IsThatOfTheDirectoryBehindALink) {
+TEST_F(EntryCount, FollowsALinkToADirectory) {
   WriteFile("/tmp/dir/a", "");
   ASSERT_EQ(symlink(kDir, "/tmp/link"), 0);
   EXPECT_EQ(CountDirEntries("/tmp/link"), 3);
 }
 
-TEST_F(EntryCount, IsZeroForWhatIsNoDirectory) {
+TEST_F(EntryCount, IsZeroForAnythingButADirectory) {
   WriteFile("/tmp/file", "");
   EXPECT_EQ(CountDirEntries("/tmp/file"), 0);
   EXPECT_EQ(CountDirEntries("/tmp/nowhere"), 0);
@@ -68,7 +66,6 @@ TEST_F(EntryCount, IsZeroForADirectoryThatCannotBeOpened) {
   ASSERT_EQ(chmod(kDir, 0333), 0);
   const WithoutCapabilities ordinary;
   EXPECT_EQ(CountDirEntries(kDir), 0);
-  EXPECT_THAT(ErrorLines(), IsEmpty());
 }
 
 TEST_F(EntryCount, LeavesNoDescriptorOpen) {
@@ -89,6 +86,54 @@ TEST(EntryPath, IsCutToAPathsLength) {
   EXPECT_EQ(vela::JoinPath(dir.c_str(), "1234"), dir + "/1234");
   EXPECT_EQ(vela::JoinPath(dir.c_str(), "12345"), dir + "/1234");
   EXPECT_EQ(vela::JoinPath(dir.c_str(), std::string(255, '1').c_str()), dir + "/1111");
+}
+
+constexpr const char* kTop = "/tmp/tree";
+
+class DirectoryTree : public QuietTest {
+ protected:
+  void SetUp() override {
+    QuietTest::SetUp();
+    MakeDirectories("/tmp/tree/a/b/c/d");
+  }
+
+  /// The directories that a visitor is shown which throws at the one of this path.
+  static std::vector<std::string> VisitedUntil(const std::string& last) {
+    std::vector<std::string> visited;
+    const auto visit = [&](const char* path, bool /*isReadable*/) {
+      visited.emplace_back(path);
+      if (path == last) {
+        throw std::runtime_error("enough at " + last);
+      }
+    };
+    try {
+      EXPECT_EQ(ForEachIndexedDirectory(kTop, visit), 0);
+      EXPECT_NE(visited.back(), last) << "the exception was lost";
+    } catch (const std::runtime_error& error) {
+      EXPECT_EQ(error.what(), "enough at " + last);
+    }
+    return visited;
+  }
+};
+
+TEST_F(DirectoryTree, AVisitorThatThrowsEndsTheWalkWithItsException) {
+  EXPECT_THAT(VisitedUntil("/tmp/tree/a/b"), ElementsAre(kTop, "/tmp/tree/a", "/tmp/tree/a/b"));
+  const auto visit = [](const char* /*path*/, bool /*isReadable*/) { throw 42; };
+  EXPECT_THROW(ForEachIndexedDirectory(kTop, visit), int);
+}
+
+TEST_F(DirectoryTree, AVisitorThatThrowsLeavesNoDescriptorOpen) {
+  const std::vector<std::string> before = ListDirectory("/proc/self/fd");
+  for (const char* last : {"/tmp/tree", "/tmp/tree/a/b", "/tmp/tree/a/b/c/d"}) {
+    VisitedUntil(last);
+    EXPECT_EQ(ListDirectory("/proc/self/fd"), before) << last;
+  }
+}
+
+TEST_F(DirectoryTree, TheNextWalkIsWhole) {
+  VisitedUntil("/tmp/tree/a/b");
+  EXPECT_THAT(VisitedUntil(""), UnorderedElementsAre(kTop, "/tmp/tree/a", "/tmp/tree/a/b",
+                                                     "/tmp/tree/a/b/c", "/tmp/tree/a/b/c/d"));
 }
 
 }  // namespace

@@ -1,16 +1,13 @@
 // The scans of trees with queues of a million lines.
-#include <gmock/gmock.h>
-
 #include <chrono>
 #include <cstdio>
 #include <ostream>
-#include <string>
 #include <thread>
 
+#include "quiet_test.h"
 #include "storage/creation_queue.h"
 #include "storage/velamk_thumb_status.h"
 #include "support/files.h"
-#include "support/sandbox.h"
 
 using namespace vela;
 
@@ -27,7 +24,7 @@ long long BytesRead() {
   return bytes;
 }
 
-/// Lets a file become old enough to be known again by its times.
+/// Waits until the times of a file are old enough to detect later changes.
 void Rest() {
   std::this_thread::sleep_for(std::chrono::milliseconds(200));
 }
@@ -36,7 +33,7 @@ std::string OtherEntry(int number) {
   return "/tmp/other/media/" + std::to_string(number);
 }
 
-/// A scan and the tree that it goes through: one file that needs work in each directory.
+/// A scan and the tree that it walks, with one file that needs work in each directory.
 struct ScanCase {
   const char* title;
   const char* queueFile;
@@ -44,16 +41,16 @@ struct ScanCase {
   bool isVideo;
 };
 
-/// Instead of the addresses of its members, which the test would be known by.
+/// Shows the title instead of the addresses of the members, which would become part of test names.
 void PrintTo(const ScanCase& scan, std::ostream* out) {
   *out << scan.title;
 }
 
-class LongQueue : public SandboxTest, public ::testing::WithParamInterface<ScanCase> {
+class LongQueue : public QuietTest, public ::testing::WithParamInterface<ScanCase> {
  protected:
   /// Makes a queue with ten entries of the tree in it, last touched a moment ago.
   void SetUp() override {
-    SandboxTest::SetUp();
+    QuietTest::SetUp();
     WriteFile("/etc/velainfo.conf", "photo_thumb_size_map=\"1\"\nvideo_thumb_size_map=\"1\"\n");
     for (int i = 0; i < GetParam().directories; ++i) {
       WriteFile(DirectoryName(i) + (GetParam().isVideo ? "/a.mp4" : "/a.jpg"), "media");
@@ -74,7 +71,7 @@ class LongQueue : public SandboxTest, public ::testing::WithParamInterface<ScanC
 
   static std::string DirectoryName(int number) { return "/tmp/tree/d" + std::to_string(number); }
 
-  /// What the service would find in the queue for the directory.
+  /// The queue entry for the directory.
   static std::string Entry(int number) {
     return DirectoryName(number) + (GetParam().isVideo ? "/a.mp4" : "");
   }
@@ -89,11 +86,11 @@ class LongQueue : public SandboxTest, public ::testing::WithParamInterface<ScanC
     return photos;
   }
 
-  /// The work in the tree without what so many entries keep.
+  /// The work in the tree without that of the queued entries.
   static int WorkBut(int waiting) { return GetParam().directories - waiting; }
 };
 
-TEST_P(LongQueue, IsReadOnceAndNotForEachQuestion) {
+TEST_P(LongQueue, IsReadOnceAndNotForEachLookup) {
   const long long before = BytesRead();
   EXPECT_EQ(CountWork(), WorkBut(kWaiting));
   const long long read = BytesRead() - before;
@@ -123,12 +120,12 @@ TEST_P(LongQueue, AChangeBetweenTwoScansIsSeen) {
 INSTANTIATE_TEST_SUITE_P(
     Queues, LongQueue,
     ::testing::Values(ScanCase{"WaitingPhotos", kPhotoQueue.file, 1000, false},
-                      ScanCase{"PhotosInWork", kPhotoQueue.tempFile, 1000, false},
+                      ScanCase{"PhotosInProgress", kPhotoQueue.tempFile, 1000, false},
                       ScanCase{"WaitingVideos", kVideoQueue.file, 200, true},
-                      ScanCase{"VideosInWork", kVideoQueue.tempFile, 200, true}),
+                      ScanCase{"VideosInProgress", kVideoQueue.tempFile, 200, true}),
     [](const ::testing::TestParamInfo<ScanCase>& scan) { return std::string(scan.param.title); });
 
-class LongVideoQueues : public SandboxTest {};
+class LongVideoQueues : public QuietTest {};
 
 TEST_F(LongVideoQueues, AreEachReadOnceForTheWorkInThem) {
   constexpr int kWaitingLines = 200000;

@@ -2,10 +2,13 @@
 #pragma once
 
 #include <cstdint>
+#include <cstdio>
 #include <string>
+#include <vector>
 
+#include "platform/vlibc.h"
+#include "quiet_test.h"
 #include "support/files.h"
-#include "support/sandbox.h"
 
 namespace vela_test {
 
@@ -25,15 +28,16 @@ constexpr int kBitL = 8;
 constexpr int kBitXL = 16;
 constexpr int kBitSM = 32;
 
+constexpr const char* kSettings = "/etc/velainfo.conf";
 constexpr int64_t kMediaTime = 1600000000;
 
 /// A media file dated kMediaTime and its metadata directory, which the tests fill.
-class MediaTest : public SandboxTest {
+class MediaTest : public QuietTest {
  protected:
   explicit MediaTest(const std::string& name) : media_("/tmp/media/" + name), name_(name) {}
 
   void SetUp() override {
-    SandboxTest::SetUp();
+    QuietTest::SetUp();
     WriteFile(media_, "media");
     SetFileTime(media_, kMediaTime);
     MakeDirectories(EaDir());
@@ -48,6 +52,20 @@ class MediaTest : public SandboxTest {
     WriteFileOfSize(Derived(file), bytes);
     SetFileTime(Derived(file), kMediaTime + seconds);
     return Derived(file);
+  }
+
+  void Remove(const std::string& file) const { RemoveTree(Derived(file)); }
+
+  /// The names of the derived files.
+  std::vector<std::string> Left() const { return ListDirectory(EaDir()); }
+
+  /// The log line about a missing metadata directory; call it right after the call that failed.
+  static std::string NoDirectoryLine(int line, const std::string& path) {
+    char place[512];
+    std::snprintf(place, sizeof place, "velamk_util:%d VELAEADirPath error [0x%04X %s:%d] on ",
+                  line, static_cast<unsigned>(VLIBCErrGet()), VLIBCErrorGetFile(),
+                  VLIBCErrorGetLine());
+    return place + path;
   }
 
  private:
@@ -71,6 +89,11 @@ inline std::string PathOfLength(size_t length, const std::string& ending) {
   directory += "/" + std::string(rest - half, 'r');
   MakeDirectories(directory);
   return directory + "/" + ending;
+}
+
+/// The directory part of a path.
+inline std::string DirectoryOf(const std::string& path) {
+  return path.substr(0, path.rfind('/'));
 }
 
 }  // namespace vela_test

@@ -1,4 +1,4 @@
-// Directories of photos and what is still to be done in them.
+// Directories of media files and the work that is pending in them.
 #pragma once
 
 #include <ostream>
@@ -34,8 +34,8 @@ inline void MakePhoto(const std::string& path) {
   SetFileTime(path, kMediaTime);
 }
 
-/// Gives the media file `dir`/`name` the thumbnails that `sizeMap` names, `seconds` younger than
-/// it.
+/// Makes the thumbnails of the media file `dir`/`name` that `sizeMap` has the bits of, `seconds`
+/// younger than it.
 inline void MakeThumbs(const std::string& dir, const std::string& name, int sizeMap,
                        int64_t seconds = 1) {
   for (int row = 0; row < 6; ++row) {
@@ -46,6 +46,19 @@ inline void MakeThumbs(const std::string& dir, const std::string& name, int size
     }
   }
 }
+
+/// A test with a directory to fill.
+class TreeTest : public QuietTest {
+ protected:
+  static constexpr const char* kTop = "/tmp/tree";
+
+  void SetUp() override {
+    QuietTest::SetUp();
+    MakeDirectories(kTop);
+  }
+
+  static std::string In(const std::string& name) { return std::string(kTop) + "/" + name; }
+};
 
 /// A path of exactly `length` bytes below /tmp that is a directory.
 inline std::string DirectoryOfLength(size_t length) {

@@ -1,21 +1,18 @@
 // The table of size classes and the size map.
-#include <gmock/gmock.h>
-
 #include <climits>
-#include <string>
 
+#include "quiet_test.h"
 #include "storage/media_fixture.h"
 #include "storage/velamk_util.h"
-#include "support/sandbox.h"
-#include "support/system_log.h"
+
+using namespace vela;
 
 namespace vela_test {
 namespace {
 
 using ::testing::ElementsAre;
-using ::testing::IsEmpty;
 
-class SizeClass : public SandboxTest {};
+class SizeClass : public QuietTest {};
 
 TEST_F(SizeClass, TableHasSixRowsInTheOrderOfTheirValues) {
   const EAThumbInfo* table = nullptr;
@@ -55,13 +52,12 @@ TEST_F(SizeClass, SizeStrings) {
   for (int value = 0; value < 6; ++value) {
     EXPECT_STREQ(GetEAThumbSizeString(value), expected[value]);
   }
-  EXPECT_THAT(ErrorLines(), IsEmpty());
 }
 
 TEST_F(SizeClass, ANegativeValueHasNoSizeString) {
   EXPECT_EQ(GetEAThumbSizeString(-1), nullptr);
   EXPECT_EQ(GetEAThumbSizeString(INT_MIN), nullptr);
-  EXPECT_THAT(ErrorLines(),
+  EXPECT_THAT(TakeErrorLines(),
               ElementsAre("velamk_util:47 Bad parameters.", "velamk_util:47 Bad parameters."));
 }
 
@@ -78,7 +74,6 @@ TEST_F(SizeClass, EveryNameBelongsToExactlyOneBit) {
       EXPECT_EQ(IsThumbInSizeMap(name, ~63), 0);
     }
   }
-  EXPECT_THAT(ErrorLines(), IsEmpty());
 }
 
 TEST_F(SizeClass, SmIsNotS) {
@@ -93,9 +88,8 @@ TEST_F(SizeClass, AnyOtherNameIsLoggedAndRefused) {
         "VELAPHOTO_THUMB_M.jpg ", "VELAPHOTO-THUMB_M.jpg", "VELAPHOTO:THUMB:M.jpg",
         "VELAPHOTO_THUMB_M.fail", "50%s%n.jpg"}) {
     SCOPED_TRACE(name);
-    ClearLog();
     EXPECT_EQ(IsThumbInSizeMap(name.c_str(), -1), 0);
-    EXPECT_THAT(ErrorLines(),
+    EXPECT_THAT(TakeErrorLines(),
                 ElementsAre("velamk_util:113 [Error] invalid thumb filename: " + name));
   }
 }

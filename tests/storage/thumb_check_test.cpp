@@ -1,228 +1,182 @@
-// The check-and-clean pass over the thumbnails of one media file.
-#include <gmock/gmock.h>
-
-#include <cstdio>
-#include <optional>
-#include <string>
-#include <vector>
-
-#include "platform/vlibc.h"
-#include "storage/media_fixture.h"
+// The pass that checks the thumbnails of one media file and removes bad ones.
+#include "named_case.h"
 #include "storage/velamk_util.h"
-#include "support/daemon_peer.h"
-#include "support/files.h"
+#include "storage/video_fixture.h"
 #include "support/images.h"
-#include "support/system_log.h"
+
+using namespace vela;
 
 namespace vela_test {
 namespace {
 
-using ::testing::Each;
 using ::testing::ElementsAre;
 using ::testing::IsEmpty;
 using ::testing::MatchesRegex;
 using ::testing::SizeIs;
-using ::testing::UnorderedElementsAre;
+using ::testing::UnorderedElementsAreArray;
 
-constexpr const char* kLandscape = R"({"success":true,"media":{"width":640,"height":480}})";
-constexpr const char* kPortrait = R"({"success":true,"media":{"width":480,"height":640}})";
+/// What a derived file is; an outdated one is landscape and older than its video.
+enum Kind { kLandscape, kPortrait, kOutdated, kEmpty };
 
-class ThumbCheck : public MediaTest {
- protected:
-  ThumbCheck() : MediaTest("film.mp4") {}
+constexpr const char* kS = kThumbNames[0];
+constexpr const char* kM = kThumbNames[1];
+constexpr const char* kB = kThumbNames[2];
+constexpr const char* kXL = kThumbNames[4];
+constexpr const char* kSM = kThumbNames[5];
+constexpr const char* kOldM = kOldThumbNames[1];
+constexpr const char* kOldXL = kOldThumbNames[4];
+constexpr const char* kMarker = "VELAPHOTO_THUMB_M.fail";
 
-  void SetUp() override {
-    MediaTest::SetUp();
-    daemon_.emplace();
-    SetRecord(kLandscape);
-  }
-
-  void SetRecord(const std::string& reply) {
-    daemon_->Answer("GET_MEDIA_FROM_PLUGIN_DB", DaemonReply::Line(reply));
-  }
-
-  int Check(int sizeMap) const { return CheckEAThumbs(Media().c_str(), sizeMap); }
-
-  void MakeThumb(const std::string& name, int width = 64, int height = 48, int64_t seconds = 0) {
-    JpegRecipe recipe;
-    recipe.width = width;
-    recipe.height = height;
-    MakeJpeg(Derived(name), recipe);
-    SetFileTime(Derived(name), kMediaTime + seconds);
-  }
-  void MakeLandscape(const std::string& name) { MakeThumb(name, 64, 48); }
-  void MakePortrait(const std::string& name) { MakeThumb(name, 48, 64); }
-
-  std::vector<DaemonRequest> Requests() const { return daemon_->Requests(); }
-  std::vector<std::string> Left() const { return ListDirectory(EaDir()); }
-
- private:
-  std::optional<DaemonPeer> daemon_;  // not before the sandbox is reset
+struct DerivedFile {
+  const char* name;
+  Kind kind;
 };
 
-TEST_F(ThumbCheck, EverythingThereAndGood) {
+struct ThumbCase : NamedCase {
+  const char* record;
+  std::vector<DerivedFile> files;
+  int sizeMap;
+  int isComplete;
+  std::vector<std::string> left;
+  size_t requests;
+};
+
+class ThumbCheck : public VideoTest {
+ protected:
+  int Check(int sizeMap) const { return CheckEAThumbs(Media().c_str(), sizeMap); }
+
+  void Make(const DerivedFile& file) const {
+    if (file.kind == kEmpty) {
+      WriteFile(Derived(file.name), "");
+      return;
+    }
+    JpegRecipe recipe;
+    recipe.width = file.kind == kPortrait ? 48 : 64;
+    recipe.height = file.kind == kPortrait ? 64 : 48;
+    MakeJpeg(Derived(file.name), recipe);
+    SetFileTime(Derived(file.name), kMediaTime - (file.kind == kOutdated ? 1 : 0));
+  }
+};
+
+class CheckedThumbs : public ThumbCheck, public ::testing::WithParamInterface<ThumbCase> {};
+
+TEST_P(CheckedThumbs, AreJudged) {
+  const ThumbCase& row = GetParam();
+  SetRecord(row.record);
+  for (const DerivedFile& file : row.files) {
+    Make(file);
+  }
+  EXPECT_EQ(Check(row.sizeMap), row.isComplete);
+  EXPECT_THAT(Left(), UnorderedElementsAreArray(row.left));
+  EXPECT_EQ(RequestCount(), row.requests);
+}
+
+constexpr const char* kWide = kLandscapeRecord;
+constexpr const char* kTall = kPortraitRecord;
+
+const ThumbCase kCases[] = {
+    {"MissingThumb", kWide, {{kS, kLandscape}, {kMarker, kEmpty}}, 3, 0, {kMarker, kS}, 1},
+    {"NoWantedSize", kWide, {{kM, kPortrait}, {kS, kEmpty}}, 0, 1, {kM, kS}, 0},
+    {"UnwantedSize",
+     kWide,
+     {{kS, kPortrait}, {kM, kPortrait}, {kB, kLandscape}},
+     kBitM | kBitB,
+     0,
+     {kS, kB},
+     2},
+    {"OutdatedUnderBothNames", kWide, {{kM, kOutdated}, {kOldM, kLandscape}}, kBitM, 0, {}, 0},
+    {"Empty", kWide, {{kM, kEmpty}}, kBitM, 0, {}, 0},
+    {"OutdatedOlderName", kWide, {{kOldM, kOutdated}}, kBitM, 0, {}, 0},
+    {"OutdatedBesideCurrentName",
+     kWide,
+     {{kM, kLandscape}, {kOldM, kOutdated}},
+     kBitM,
+     1,
+     {kM, kOldM},
+     1},
+    {"LandscapeOfPortrait", kTall, {{kM, kLandscape}, {kOldM, kLandscape}}, kBitM, 0, {}, 1},
+    {"PortraitOfLandscape", kWide, {{kM, kPortrait}}, kBitM, 0, {}, 1},
+    {"PortraitOlderName", kWide, {{kOldM, kPortrait}}, kBitM, 0, {}, 1},
+    {"PortraitOfPortrait",
+     kTall,
+     {{kM, kPortrait}, {kOldXL, kPortrait}},
+     kBitM | kBitXL,
+     1,
+     {kM, kOldXL},
+     2},
+    {"SeveralBadOnes",
+     kWide,
+     {{kS, kPortrait}, {kOldM, kOutdated}, {kB, kLandscape}, {kXL, kEmpty}, {kSM, kPortrait}},
+     63,
+     0,
+     {kB},
+     3},
+};
+INSTANTIATE_TEST_SUITE_P(Video, CheckedThumbs, ::testing::ValuesIn(kCases), CaseName());
+
+TEST_F(ThumbCheck, EveryThumbIsThereAndGood) {
   for (const char* name : kThumbNames) {
-    MakeLandscape(name);
+    Make({name, kLandscape});
   }
   EXPECT_EQ(Check(-1), 1);
   EXPECT_EQ(Check(63), 1);
   EXPECT_THAT(Left(), SizeIs(6));
-  EXPECT_THAT(ErrorLines(), IsEmpty());
 }
 
-TEST_F(ThumbCheck, EveryClassIsLookedFor) {
+TEST_F(ThumbCheck, EveryClassIsFoundUnderBothNames) {
   for (int row = 0; row < 6; ++row) {
-    SCOPED_TRACE(kThumbNames[row]);
-    EXPECT_EQ(Check(1 << row), 0);
-    MakeLandscape(kThumbNames[row]);
-    EXPECT_EQ(Check(1 << row), 1);
-    RemoveTree(Derived(kThumbNames[row]));
-    MakeLandscape(kOldThumbNames[row]);
-    EXPECT_EQ(Check(1 << row), 1);
-    RemoveTree(Derived(kOldThumbNames[row]));
+    for (const char* name : {kThumbNames[row], kOldThumbNames[row]}) {
+      SCOPED_TRACE(name);
+      EXPECT_EQ(Check(1 << row), 0);
+      Make({name, kLandscape});
+      EXPECT_EQ(Check(1 << row), 1);
+      Remove(name);
+    }
   }
 }
 
-TEST_F(ThumbCheck, AMissingThumbRemovesNothing) {
-  MakeLandscape(kThumbNames[0]);
-  WriteFile(Derived("VELAPHOTO_THUMB_M.fail"), "");
-  EXPECT_EQ(Check(kBitS | kBitM), 0);
-  EXPECT_THAT(Left(), ElementsAre("VELAPHOTO_THUMB_M.fail", "VELAPHOTO_THUMB_S.jpg"));
-  EXPECT_THAT(ErrorLines(), IsEmpty());
-}
-
-TEST_F(ThumbCheck, NothingWantedIsNothingTouched) {
-  MakePortrait(kThumbNames[1]);
-  WriteFile(Derived(kThumbNames[0]), "");
-  EXPECT_EQ(Check(0), 1);
-  EXPECT_THAT(Left(), SizeIs(2));
-  EXPECT_THAT(Requests(), IsEmpty());
-}
-
-TEST_F(ThumbCheck, OnlyWantedClassesAreCleaned) {
-  MakePortrait(kThumbNames[0]);
-  MakePortrait(kThumbNames[1]);
-  MakeLandscape(kThumbNames[2]);
-  EXPECT_EQ(Check(kBitM | kBitB), 0);
-  EXPECT_THAT(Left(), UnorderedElementsAre(kThumbNames[0], kThumbNames[2]));
-}
-
-TEST_F(ThumbCheck, AnOutdatedThumbIsRemovedUnderBothNames) {
-  MakeThumb(kThumbNames[1], 64, 48, -1);
-  MakeThumb(kOldThumbNames[1], 64, 48, 0);
-  EXPECT_EQ(Check(kBitM), 0);
-  EXPECT_THAT(Left(), IsEmpty());
-  EXPECT_THAT(Requests(), IsEmpty());
-}
-
-TEST_F(ThumbCheck, AnEmptyThumbIsRemoved) {
-  WriteFile(Derived(kThumbNames[1]), "");
-  EXPECT_EQ(Check(kBitM), 0);
-  EXPECT_THAT(Left(), IsEmpty());
-}
-
-TEST_F(ThumbCheck, AnOutdatedThumbOfTheOlderNameIsRemoved) {
-  MakeThumb(kOldThumbNames[1], 64, 48, -1);
-  EXPECT_EQ(Check(kBitM), 0);
-  EXPECT_THAT(Left(), IsEmpty());
-}
-
-TEST_F(ThumbCheck, TheCurrentNameGoesBeforeTheOlderOne) {
-  MakeThumb(kThumbNames[1], 64, 48, 0);
-  MakeThumb(kOldThumbNames[1], 48, 64, -1);
-  EXPECT_EQ(Check(kBitM), 1);
-  EXPECT_THAT(Left(), SizeIs(2));
-}
-
-TEST_F(ThumbCheck, ALandscapeThumbOfAPortraitFilmIsRemovedUnderBothNames) {
-  SetRecord(kPortrait);
-  MakeLandscape(kThumbNames[1]);
-  MakeLandscape(kOldThumbNames[1]);
-  EXPECT_EQ(Check(kBitM), 0);
-  EXPECT_THAT(Left(), IsEmpty());
-}
-
-TEST_F(ThumbCheck, APortraitThumbOfALandscapeFilmIsRemoved) {
-  MakePortrait(kThumbNames[1]);
-  EXPECT_EQ(Check(kBitM), 0);
-  EXPECT_THAT(Left(), IsEmpty());
-}
-
-TEST_F(ThumbCheck, ThumbsOfAPortraitFilmArePortrait) {
-  SetRecord(kPortrait);
-  MakePortrait(kThumbNames[1]);
-  MakePortrait(kOldThumbNames[4]);
-  EXPECT_EQ(Check(kBitM | kBitXL), 1);
-  EXPECT_THAT(Left(), SizeIs(2));
-}
-
-TEST_F(ThumbCheck, TheOrientationIsThatOfTheThumbFound) {
-  MakePortrait(kOldThumbNames[1]);
-  EXPECT_EQ(Check(kBitM), 0);
-  EXPECT_THAT(Left(), IsEmpty());
-}
-
-TEST_F(ThumbCheck, TheIndexIsAskedAboutTheFilm) {
-  MakeLandscape(kThumbNames[1]);
+TEST_F(ThumbCheck, TheRecordIsThatOfTheVideo) {
+  Make({kM, kLandscape});
   Check(kBitM);
-  ASSERT_THAT(Requests(), SizeIs(1));
-  EXPECT_EQ(Requests().front().bytes,
-            "{\"command\":\"GET_MEDIA_FROM_PLUGIN_DB\",\"path\":\"/tmp/media/film.mp4\","
-            "\"type\":1}\n");
+  EXPECT_THAT(Requests(), ElementsAre(kMediaRequest));
 }
 
-TEST_F(ThumbCheck, OneCallRemovesAllThatIsBad) {
-  MakePortrait(kThumbNames[0]);
-  MakeThumb(kOldThumbNames[1], 64, 48, -1);
-  MakeLandscape(kThumbNames[2]);
-  WriteFile(Derived(kThumbNames[4]), "");
-  MakePortrait(kThumbNames[5]);
-  EXPECT_EQ(Check(63), 0);
-  EXPECT_THAT(Left(), ElementsAre(kThumbNames[2]));
-}
-
-TEST_F(ThumbCheck, AThumbOfAFilmThatIsGoneIsJudgedByItsOrientation) {
+TEST_F(ThumbCheck, AThumbOfAMissingVideoIsJudgedByItsOrientation) {
   RemoveTree(Media());
-  MakeLandscape(kThumbNames[1]);
+  const char* line = "velamk_util:64 Fail to get /tmp/media/film.mp4 file information";
+  Make({kM, kLandscape});
   EXPECT_EQ(Check(kBitM), 1);
-  EXPECT_THAT(ErrorLines(),
-              ElementsAre("velamk_util:64 Fail to get /tmp/media/film.mp4 file information"));
-  MakePortrait(kThumbNames[1]);
+  EXPECT_THAT(TakeErrorLines(), ElementsAre(line));
+  Make({kM, kPortrait});
   EXPECT_EQ(Check(kBitM), 0);
   EXPECT_THAT(Left(), IsEmpty());
+  EXPECT_THAT(TakeErrorLines(), ElementsAre(line));
 }
 
-TEST_F(ThumbCheck, AnUnknownFilmIsLandscape) {
-  SetRecord(R"({"success":false})");
-  MakeLandscape(kThumbNames[0]);
-  MakePortrait(kThumbNames[1]);
+TEST_F(ThumbCheck, AnUnknownVideoIsLandscape) {
+  SetRecord(kNoRecord);
+  Make({kS, kLandscape});
+  Make({kM, kPortrait});
   EXPECT_EQ(Check(kBitS | kBitM), 0);
-  EXPECT_THAT(Left(), ElementsAre(kThumbNames[0]));
-  const std::string unknown =
-      "velamk_util:128 fail to get media from plugin db: /tmp/media/film.mp4";
-  EXPECT_THAT(ErrorLines(),
-              ElementsAre("velamk_ipc:30 fail", unknown, "velamk_ipc:30 fail", unknown));
+  EXPECT_THAT(Left(), ElementsAre(kS));
+  EXPECT_THAT(TakeErrorLines(),
+              ElementsAre(kDaemonFailed, kUnknownOrientation, kDaemonFailed, kUnknownOrientation));
 }
 
-TEST_F(ThumbCheck, NoPathIsRefused) {
+TEST_F(ThumbCheck, ANullPathIsRefused) {
+  const char* line = "velamk_util:545 Bad parameters.";
   EXPECT_EQ(CheckEAThumbs(nullptr, 63), 0);
   EXPECT_EQ(CheckEAThumbs(nullptr, 0), 0);
-  EXPECT_THAT(ErrorLines(),
-              ElementsAre("velamk_util:545 Bad parameters.", "velamk_util:545 Bad parameters."));
+  EXPECT_THAT(TakeErrorLines(), ElementsAre(line, line));
 }
 
 TEST_F(ThumbCheck, AFileWithoutMetadataDirectoryIsRefused) {
   const std::string inside = Derived("inside.mp4");
   EXPECT_EQ(CheckEAThumbs(inside.c_str(), 0), 0);
-  char expected[512];
-  std::snprintf(expected, sizeof expected,
-                "velamk_util:550 VELAEADirPath error [0x%04X %s:%d] on %s",
-                static_cast<unsigned>(VLIBCErrGet()), VLIBCErrorGetFile(), VLIBCErrorGetLine(),
-                inside.c_str());
-  EXPECT_THAT(ErrorLines(), ElementsAre(expected));
-  EXPECT_THAT(ErrorLines(),
-              Each(MatchesRegex("velamk_util:550 VELAEADirPath error \\[0x[0-9A-F]{4} "
-                                "[^ :]+:[1-9][0-9]*\\] on /tmp/media/.*")));
+  const std::string expected = NoDirectoryLine(550, inside);
+  EXPECT_THAT(expected, MatchesRegex("velamk_util:550 VELAEADirPath error \\[0x[0-9A-F]{4} "
+                                     "[^ :]+:[1-9][0-9]*\\] on /tmp/media/.*"));
+  EXPECT_THAT(TakeErrorLines(), ElementsAre(expected));
 }
 
 }  // namespace

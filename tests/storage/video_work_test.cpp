@@ -1,16 +1,10 @@
 // Whether one video needs work.
-#include <gmock/gmock.h>
+#include <utility>
 
-#include <optional>
-#include <string>
-
-#include "storage/media_fixture.h"
+#include "named_case.h"
 #include "storage/velamk_thumb_status.h"
-#include "support/daemon_peer.h"
-#include "support/files.h"
-#include "support/films.h"
+#include "storage/video_fixture.h"
 #include "support/images.h"
-#include "support/system_log.h"
 
 namespace vela_test {
 namespace {
@@ -18,39 +12,26 @@ namespace {
 using ::testing::ElementsAre;
 using ::testing::IsEmpty;
 
-constexpr const char* kLandscape = R"({"success":true,"media":{"width":640,"height":480}})";
-constexpr const char* kPortrait = R"({"success":true,"media":{"width":480,"height":640}})";
+/// What the video itself is; browsers play only the playable one.
+enum Content { kText, kPlayable, kUnplayable };
 
-/// A browser plays it.
-FilmRecipe PlayableFilm() {
-  return FilmRecipe();
-}
+enum Thumbs { kNone, kAll, kAllButSm, kMediumOnly };
 
-/// No browser plays it.
-FilmRecipe ForeignFilm() {
-  FilmRecipe recipe;
-  recipe.videoCodec = "mpeg4";
-  recipe.format = "avi";
-  return recipe;
-}
-
-/// A video, the file of which is text unless a test makes it a film.
-class VideoWork : public MediaTest {
+class VideoWork : public VideoTest {
  protected:
-  VideoWork() : MediaTest("film.mp4") {}
-
-  void SetUp() override {
-    MediaTest::SetUp();
-    daemon_.emplace();
-    SetRecord(kLandscape);
+  static void Make(const std::string& path, Content content) {
+    if (content == kText) {
+      WriteFile(path, "text");
+      return;
+    }
+    FilmRecipe recipe;
+    recipe.videoCodec = content == kPlayable ? "libx264" : "mpeg4";
+    recipe.format = content == kPlayable ? "" : "avi";
+    MakeFilm(path, recipe);
   }
 
-  void SetRecord(const std::string& reply) {
-    daemon_->Answer("GET_MEDIA_FROM_PLUGIN_DB", DaemonReply::Line(reply));
-  }
-
-  void MakeMedia(const FilmRecipe& recipe) const {
-    MakeFilm(Media(), recipe);
+  void MakeMedia(Content content) const {
+    Make(Media(), content);
     SetFileTime(Media(), kMediaTime);
   }
 
@@ -59,19 +40,68 @@ class VideoWork : public MediaTest {
     SetFileTime(Derived(name), kMediaTime);
   }
 
-  void MakeAllThumbs() const {
-    for (const char* name : kThumbNames) {
-      MakeThumb(name);
+  void MakeThumbs(Thumbs thumbs) const {
+    for (int row = 0; row < 6; ++row) {
+      if (thumbs == kAll || (thumbs == kAllButSm && row != 5) ||
+          (thumbs == kMediumOnly && row == 1)) {
+        MakeThumb(kThumbNames[row]);
+      }
     }
   }
 
   int IsNeeded() const { return IsVideoWorkNeeded(Media().c_str()); }
-
- private:
-  std::optional<DaemonPeer> daemon_;  // not before the sandbox is reset
 };
 
-TEST_F(VideoWork, IsNotNeededForWhatIsNoVideo) {
+struct WorkCase : NamedCase {
+  Content video;
+  Thumbs thumbs;
+  std::vector<std::pair<std::string, size_t>> convertedVideos;  ///< with their bytes
+  const char* settings;
+  int isNeeded;
+};
+
+class WorkCases : public VideoWork, public ::testing::WithParamInterface<WorkCase> {};
+
+TEST_P(WorkCases, AreJudged) {
+  MakeMedia(GetParam().video);
+  MakeThumbs(GetParam().thumbs);
+  for (const auto& [name, bytes] : GetParam().convertedVideos) {
+    MakeDerived(name, bytes);
+  }
+  WriteFile(kSettings, GetParam().settings);
+  EXPECT_EQ(IsNeeded(), GetParam().isNeeded);
+}
+
+constexpr const char* kMediumSize = "photo_thumb_size_map=\"63\"\nvideo_thumb_size_map=\"2\"\n";
+constexpr const char* kNoSize = "video_thumb_size_map=\"0\"\n";
+constexpr const char* kMobileWanted = "enable_mobile_video=\"yes\"\n";
+
+const WorkCase kCases[] = {
+    {"TextWithoutThumbs", kText, kNone, {}, "", 1},
+    {"UnreadableVideoNeedsNoConversion", kText, kAll, {}, "", 0},
+    {"PlayableWithoutThumbs", kPlayable, kNone, {}, "", 1},
+    {"PlayableWithThumbs", kPlayable, kAll, {}, "", 0},
+    {"OneThumbMissing", kPlayable, kAllButSm, {}, "", 1},
+    {"WantedThumbMissing", kPlayable, kNone, {}, kMediumSize, 1},
+    {"WantedThumbPresent", kPlayable, kMediumOnly, {}, kMediumSize, 0},
+    {"NoThumbWanted", kPlayable, kNone, {}, kNoSize, 0},
+    {"NotPlayableAndNoThumbWanted", kUnplayable, kNone, {}, kNoSize, 1},
+    {"NotPlayable", kUnplayable, kAll, {}, "", 1},
+    {"ConvertedToOneByte", kUnplayable, kAll, {{kHigh.name, 1}}, "", 1},
+    {"ConvertedToTwoBytes", kUnplayable, kAll, {{kHigh.name, 2}}, "", 0},
+    {"ConvertedWithoutThumbs", kUnplayable, kNone, {{kHigh.name, 10}}, "", 1},
+    {"ConvertedForWeb", kUnplayable, kAll, {{kFlash.name, 10}}, "", 0},
+    {"ConvertedForWebOnly", kUnplayable, kAll, {{kFlash.name, 10}}, kMobileWanted, 1},
+    {"ConvertedForMobileToo",
+     kUnplayable,
+     kAll,
+     {{kFlash.name, 10}, {kMpeg4.name, 10}},
+     kMobileWanted,
+     0},
+};
+INSTANTIATE_TEST_SUITE_P(Video, WorkCases, ::testing::ValuesIn(kCases), CaseName());
+
+TEST_F(VideoWork, IsNotNeededForOtherFiles) {
   EXPECT_EQ(IsVideoWorkNeeded(nullptr), 0);
   EXPECT_EQ(IsVideoWorkNeeded(""), 0);
   EXPECT_EQ(IsVideoWorkNeeded("/tmp/media/none.mp4"), 0);
@@ -81,125 +111,69 @@ TEST_F(VideoWork, IsNotNeededForWhatIsNoVideo) {
     WriteFile(name, "no video");
     EXPECT_EQ(IsVideoWorkNeeded(name), 0) << name;
   }
-  EXPECT_THAT(ErrorLines(), IsEmpty());
 }
 
-TEST_F(VideoWork, IsNeededForAVideoWithoutThumbs) {
-  EXPECT_EQ(IsNeeded(), 1);
-  MakeMedia(PlayableFilm());
-  EXPECT_EQ(IsNeeded(), 1);
-  EXPECT_THAT(ErrorLines(), IsEmpty());
-}
-
-TEST_F(VideoWork, IsNeededForOneMissingThumb) {
-  MakeMedia(PlayableFilm());
-  MakeAllThumbs();
-  EXPECT_EQ(IsNeeded(), 0);
-  RemoveTree(Derived(kThumbNames[5]));
-  EXPECT_EQ(IsNeeded(), 1);
+TEST_F(VideoWork, AThumbOfTheOlderNameIsEnough) {
+  MakeMedia(kPlayable);
+  MakeThumbs(kAllButSm);
   MakeThumb(kOldThumbNames[5]);
   EXPECT_EQ(IsNeeded(), 0);
 }
 
-TEST_F(VideoWork, OnlyThumbsOfTheVideoSizesAreNeeded) {
-  MakeMedia(PlayableFilm());
-  WriteFile("/etc/velainfo.conf", "photo_thumb_size_map=\"63\"\nvideo_thumb_size_map=\"2\"\n");
-  EXPECT_EQ(IsNeeded(), 1);
-  MakeThumb(kThumbNames[1]);
-  EXPECT_EQ(IsNeeded(), 0);
-}
-
-TEST_F(VideoWork, ThumbsThatStandWronglyAreRemoved) {
-  MakeMedia(PlayableFilm());
-  MakeAllThumbs();
+TEST_F(VideoWork, ThumbsOfTheOtherOrientationAreRemoved) {
+  MakeMedia(kPlayable);
+  MakeThumbs(kAll);
   MakeThumb(kOldThumbNames[1]);
-  SetRecord(kPortrait);
+  SetRecord(kPortraitRecord);
   EXPECT_EQ(IsNeeded(), 1);
-  EXPECT_THAT(ListDirectory(EaDir()), IsEmpty());
+  EXPECT_THAT(Left(), IsEmpty());
 }
 
 TEST_F(VideoWork, OutdatedThumbsAreRemoved) {
-  MakeMedia(PlayableFilm());
-  MakeAllThumbs();
+  MakeMedia(kPlayable);
+  MakeThumbs(kAll);
   SetFileTime(Derived(kThumbNames[0]), kMediaTime - 1);
   EXPECT_EQ(IsNeeded(), 1);
   EXPECT_FALSE(Exists(Derived(kThumbNames[0])));
   EXPECT_TRUE(Exists(Derived(kThumbNames[1])));
 }
 
-TEST_F(VideoWork, WithoutWantedSizesThumbsAreNeitherNeededNorChecked) {
-  MakeMedia(PlayableFilm());
-  WriteFile("/etc/velainfo.conf", "video_thumb_size_map=\"0\"\n");
+TEST_F(VideoWork, UnwantedThumbsAreNotChecked) {
+  MakeMedia(kPlayable);
+  WriteFile(kSettings, kNoSize);
   WriteFile(Derived(kThumbNames[0]), "");
   EXPECT_EQ(IsNeeded(), 0);
   EXPECT_TRUE(Exists(Derived(kThumbNames[0])));
-  MakeMedia(ForeignFilm());
-  EXPECT_EQ(IsNeeded(), 1);
 }
 
-TEST_F(VideoWork, IsNeededForAForeignFilmWithoutConvertedOne) {
-  MakeMedia(ForeignFilm());
-  MakeAllThumbs();
-  EXPECT_EQ(IsNeeded(), 1);
-  MakeDerived("VELAPHOTO_FILM_H.mp4", 1);
-  EXPECT_EQ(IsNeeded(), 1);
-  MakeDerived("VELAPHOTO_FILM_H.mp4", 2);
-  EXPECT_EQ(IsNeeded(), 0);
-}
-
-TEST_F(VideoWork, MobileFilmsCountWhenTheSettingsAskForThem) {
-  MakeMedia(ForeignFilm());
-  MakeAllThumbs();
-  MakeDerived("VELAPHOTO_FILM.flv");
-  EXPECT_EQ(IsNeeded(), 0);
-  WriteFile("/etc/velainfo.conf", "enable_mobile_video=\"yes\"\n");
-  EXPECT_EQ(IsNeeded(), 1);
-  MakeDerived("VELAPHOTO_FILM_MPEG4.mp4");
-  EXPECT_EQ(IsNeeded(), 0);
-}
-
-TEST_F(VideoWork, AConvertedFilmDoesNotReplaceAThumb) {
-  MakeMedia(ForeignFilm());
-  MakeDerived("VELAPHOTO_FILM_H.mp4");
-  EXPECT_EQ(IsNeeded(), 1);
-}
-
-TEST_F(VideoWork, AFilmThatPlaysNeedsNoConvertedOne) {
-  MakeMedia(PlayableFilm());
-  MakeAllThumbs();
-  EXPECT_EQ(IsNeeded(), 0);
-}
-
-TEST_F(VideoWork, AnUnreadableFilmNeedsNoConvertedOne) {
-  MakeAllThumbs();
-  EXPECT_EQ(IsNeeded(), 0);
-}
-
-TEST_F(VideoWork, AFailedLookForConvertedFilmsCountsAsConverted) {
-  WriteFile("/etc/velainfo.conf", "video_thumb_size_map=\"0\"\n");
+TEST_F(VideoWork, AFailedCheckForConvertedVideosCountsAsConverted) {
+  WriteFile(kSettings, kNoSize);
   const std::string outside = "/tmp/media/b.avi";
   const std::string inside = Derived("b.avi");
-  MakeFilm(outside, ForeignFilm());
+  Make(outside, kUnplayable);
   CopyFile(outside, inside);
   EXPECT_EQ(IsVideoWorkNeeded(outside.c_str()), 1);
   EXPECT_EQ(IsVideoWorkNeeded(inside.c_str()), 0);
+  const std::string line = NoDirectoryLine(465, inside);
+  EXPECT_THAT(TakeErrorLines(), ElementsAre(line));
 }
 
 TEST_F(VideoWork, AVideoWithoutMetadataDirectoryLacksItsThumbs) {
   const std::string inside = Derived("b.mp4");
   WriteFile(inside, "video");
   EXPECT_EQ(IsVideoWorkNeeded(inside.c_str()), 1);
+  const std::string line = NoDirectoryLine(550, inside);
+  EXPECT_THAT(TakeErrorLines(), ElementsAre(line));
 }
 
-TEST_F(VideoWork, PathsAreTakenUpToTheLengthThatLeavesRoomForDerivedNames) {
+TEST_F(VideoWork, PathsMayBeLongAsLongAsDerivedNamesFit) {
   const std::string longest = PathOfLength(4066, "a.mp4");
   WriteFile(longest, "video");
   EXPECT_EQ(IsVideoWorkNeeded(longest.c_str()), 1);
-  EXPECT_THAT(ErrorLines(), IsEmpty());
   const std::string tooLong = PathOfLength(4067, "a.mp4");
   WriteFile(tooLong, "video");
   EXPECT_EQ(IsVideoWorkNeeded(tooLong.c_str()), 0);
-  EXPECT_THAT(ErrorLines(),
+  EXPECT_THAT(TakeErrorLines(),
               ElementsAre("velamk_thumb_status:295 [Error] path is too long and can't create "
                           "thumbnail: " +
                           tooLong));
@@ -210,7 +184,6 @@ TEST_F(VideoWork, OnlyVideosAreLoggedAsTooLong) {
   WriteFile(photo, "photo");
   EXPECT_EQ(IsVideoWorkNeeded(photo.c_str()), 0);
   EXPECT_EQ(IsVideoWorkNeeded(PathOfLength(4067, "none.mp4").c_str()), 0);
-  EXPECT_THAT(ErrorLines(), IsEmpty());
 }
 
 }  // namespace

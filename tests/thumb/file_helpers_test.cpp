@@ -1,6 +1,7 @@
 // Making directories and removing files by pattern.
 #include "storage/file_helpers.h"
 
+#include "posix/glob_matches.h"
 #include "thumb/thumb_test.h"
 
 namespace vela_test {

@@ -1,26 +1,23 @@
-// How the queues are searched, with a line search that is played here.
-#include <gmock/gmock.h>
+// How the queues are searched, with a faked line search.
 #include <sys/stat.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
 #include <cstdio>
 #include <functional>
-#include <string>
-#include <vector>
 
 #include "platform/vlibc.h"
+#include "quiet_test.h"
 #include "storage/creation_queue.h"
 #include "storage/velamk_thumb_status.h"
 #include "support/capabilities.h"
 #include "support/files.h"
-#include "support/sandbox.h"
 
 using namespace vela;
 
 namespace {
 
-/// A question, and the buffer for its answer.
+/// One call of the line search.
 struct Search {
   std::string file;
   std::string text;
@@ -54,11 +51,12 @@ namespace {
 using ::testing::ElementsAre;
 using ::testing::IsEmpty;
 
-class QueueSearch : public SandboxTest, public ::testing::WithParamInterface<CreationQueue> {
+class QueueSearch : public QuietTest, public ::testing::WithParamInterface<CreationQueue> {
  protected:
   void SetUp() override {
-    SandboxTest::SetUp();
+    QuietTest::SetUp();
     g_lineSearch = FakeLineSearch();
+    WriteFile(GetParam().file, "");
   }
 
   static std::vector<std::string> Files() {
@@ -72,14 +70,16 @@ class QueueSearch : public SandboxTest, public ::testing::WithParamInterface<Cre
   static bool IsFound() { return IsQueued(GetParam(), "/a/b"); }
 };
 
-TEST_P(QueueSearch, GoesThroughTheFileInWorkFirst) {
-  WriteFile(GetParam().file, "");
+TEST_P(QueueSearch, SearchesTheFileInProgressFirst) {
+  EXPECT_FALSE(IsFound());
+  EXPECT_THAT(Files(), ElementsAre(GetParam().tempFile, GetParam().file));
+  g_lineSearch = FakeLineSearch();
+  g_lineSearch.failure = -1;
   EXPECT_FALSE(IsFound());
   EXPECT_THAT(Files(), ElementsAre(GetParam().tempFile, GetParam().file));
 }
 
 TEST_P(QueueSearch, EndsWhereTheLineIsFound) {
-  WriteFile(GetParam().file, "");
   g_lineSearch.line = "/a/b";
   g_lineSearch.holder = GetParam().tempFile;
   EXPECT_TRUE(IsFound());
@@ -88,8 +88,7 @@ TEST_P(QueueSearch, EndsWhereTheLineIsFound) {
   EXPECT_TRUE(IsFound());
 }
 
-TEST_P(QueueSearch, AsksForTheWholePathWithTheUsualFlags) {
-  WriteFile(GetParam().file, "");
+TEST_P(QueueSearch, SearchesTheWholePathWithTheUsualFlags) {
   IsFound();
   for (const Search& search : g_lineSearch.searches) {
     EXPECT_EQ(search.text, "/a/b");
@@ -99,7 +98,6 @@ TEST_P(QueueSearch, AsksForTheWholePathWithTheUsualFlags) {
 }
 
 TEST_P(QueueSearch, ALongerLineThatBeginsWithThePathIsNoMatch) {
-  WriteFile(GetParam().file, "");
   for (const char* file : {GetParam().tempFile, GetParam().file}) {
     g_lineSearch.holder = file;
     for (const char* line : {"/a/bc", "/a/b/", "/a/", ""}) {
@@ -109,47 +107,39 @@ TEST_P(QueueSearch, ALongerLineThatBeginsWithThePathIsNoMatch) {
   }
 }
 
-TEST_P(QueueSearch, AMatchInTheMainFileCountsBehindAPartialOneInTheFileInWork) {
-  WriteFile(GetParam().file, "");
+TEST_P(QueueSearch, AMatchInTheMainFileCountsAfterAPartialOneInTheFileInProgress) {
   g_lineSearch.failure = static_cast<int>(std::string("/a/bc").size());
   g_lineSearch.holder = GetParam().file;
   g_lineSearch.line = "/a/b";
   EXPECT_TRUE(IsFound());
 }
 
-TEST_P(QueueSearch, AFailedSearchFindsNothing) {
-  WriteFile(GetParam().file, "");
-  g_lineSearch.failure = -1;
-  EXPECT_FALSE(IsFound());
-  EXPECT_THAT(Files(), ElementsAre(GetParam().tempFile, GetParam().file));
-}
-
-TEST_P(QueueSearch, LeavesOutAMainFileThatIsNotThere) {
+TEST_P(QueueSearch, SkipsAMissingMainFile) {
+  RemoveTree(GetParam().file);
   WriteFile(GetParam().tempFile, "");
   EXPECT_FALSE(IsFound());
   EXPECT_THAT(Files(), ElementsAre(GetParam().tempFile));
 }
 
-/// The result of `question`, asked by a process to which permission bits apply. What is asked with
-/// them is the real user, so that giving up capabilities for a while is not enough.
-bool AskAsOrdinaryUser(const std::function<bool()>& question) {
+/// The result of `check` in a process to which permission bits apply. The queues are tested with
+/// access(), which uses the real user, so dropping capabilities for a while is not enough.
+bool CheckAsOrdinaryUser(const std::function<bool()>& check) {
   const pid_t pid = fork();
   if (pid == 0) {
-    _exit(GiveUpCapabilities() == 0 && question() ? 0 : 1);
+    _exit(GiveUpCapabilities() == 0 && check() ? 0 : 1);
   }
   int status = -1;
   waitpid(pid, &status, 0);
   return WIFEXITED(status) && WEXITSTATUS(status) == 0;
 }
 
-TEST_P(QueueSearch, LeavesOutAMainFileThatMayNotBeRead) {
-  WriteFile(GetParam().file, "");
-  const auto isLeftOut = [] {
+TEST_P(QueueSearch, SkipsAnUnreadableMainFile) {
+  const auto isSkipped = [] {
     return !IsFound() && Files() == std::vector<std::string>{GetParam().tempFile};
   };
-  EXPECT_FALSE(AskAsOrdinaryUser(isLeftOut)) << "the file may be read";
+  EXPECT_FALSE(CheckAsOrdinaryUser(isSkipped)) << "the file may be read";
   ASSERT_EQ(chmod(GetParam().file, 0), 0);
-  EXPECT_TRUE(AskAsOrdinaryUser(isLeftOut));
+  EXPECT_TRUE(CheckAsOrdinaryUser(isSkipped));
 }
 
 INSTANTIATE_TEST_SUITE_P(Queues, QueueSearch, ::testing::Values(kPhotoQueue, kVideoQueue),
@@ -157,10 +147,10 @@ INSTANTIATE_TEST_SUITE_P(Queues, QueueSearch, ::testing::Values(kPhotoQueue, kVi
                            return queue.param.file == kPhotoQueue.file ? "Photos" : "Videos";
                          });
 
-class SearchesOfScans : public SandboxTest {
+class SearchesOfScans : public QuietTest {
  protected:
   void SetUp() override {
-    SandboxTest::SetUp();
+    QuietTest::SetUp();
     g_lineSearch = FakeLineSearch();
     WriteFile("/tmp/dir/a.mp4", "video");
     WriteFile("/tmp/dir/a.jpg", "photo");
@@ -176,7 +166,7 @@ class SearchesOfScans : public SandboxTest {
   }
 };
 
-TEST_F(SearchesOfScans, APhotoTreeAsksForDirectories) {
+TEST_F(SearchesOfScans, APhotoTreeSearchesDirectories) {
   WriteFile("/var/spool/thumb_create.queue", "");
   int photos = 0;
   int thumbs = 0;
@@ -185,14 +175,14 @@ TEST_F(SearchesOfScans, APhotoTreeAsksForDirectories) {
                                       "/var/spool/thumb_create.queue /tmp/dir"));
 }
 
-TEST_F(SearchesOfScans, AVideoTreeAsksForVideosThatNeedWork) {
+TEST_F(SearchesOfScans, AVideoTreeSearchesVideosThatNeedWork) {
   WriteFile("/var/spool/flv_create.queue", "");
   EXPECT_EQ(CountVideoWork("/tmp/dir"), 1);
   EXPECT_THAT(Searches(), ElementsAre("/var/spool/flv_create.queue.tmp /tmp/dir/a.mp4",
                                       "/var/spool/flv_create.queue /tmp/dir/a.mp4"));
 }
 
-TEST_F(SearchesOfScans, AnEntryInWorkIsNoLongerLookedAt) {
+TEST_F(SearchesOfScans, AnEntryInProgressIsSkipped) {
   WriteFile("/var/spool/flv_create.queue", "/tmp/dir/a.mp4\nR:/tmp/dir\n");
   g_lineSearch.holder = "/var/spool/flv_create.queue.tmp";
   g_lineSearch.line = "/tmp/dir/a.mp4";
@@ -202,7 +192,7 @@ TEST_F(SearchesOfScans, AnEntryInWorkIsNoLongerLookedAt) {
                                       "/var/spool/flv_create.queue.tmp /tmp/dir/a.mp4"));
 }
 
-TEST_F(SearchesOfScans, AnotherQueueFileIsNotComparedWithTheFileInWork) {
+TEST_F(SearchesOfScans, AnotherQueueFileIsNotComparedWithTheFileInProgress) {
   WriteFile("/var/spool/other.queue", "/tmp/dir/a.mp4\n");
   EXPECT_EQ(CountVideoQueueWork("/var/spool/other.queue"), 1);
   EXPECT_THAT(Searches(), IsEmpty());
