@@ -1,16 +1,11 @@
 // Colours other than plain red, green and blue: inks, transparency, profiles.
 
-#include <gtest/gtest.h>
-
 #include <array>
 #include <vector>
 
 #include "converter_fixture.h"
 #include "decoding/pixel_rows.h"
 #include "picture/colour_conversion.h"
-#include "support/files.h"
-#include "support/image_checks.h"
-#include "support/images.h"
 
 using namespace vela;
 
@@ -25,7 +20,7 @@ Picture OnePixel(std::vector<uint16_t> samples) {
   return picture;
 }
 
-TEST(ColourConversion, InksTakeTheirShareOfLight) {
+TEST(ColourConversion, InksAbsorbLight) {
   // Cyan ink leaves half of the red, black ink leaves half of everything.
   Picture picture = OnePixel({32768, kLight, kLight, 32768});
   ConvertToRgb(picture, ColourSpace::kCmyk);
@@ -45,7 +40,7 @@ TEST(ColourConversion, BrightnessAndDifferencesMakeColours) {
   EXPECT_LT(red.samples[2], 150);
 }
 
-TEST(ColourConversion, LeavesOtherSpacesAlone) {
+TEST(ColourConversion, KeepsOtherSpaces) {
   for (const ColourSpace space : {ColourSpace::kGrey, ColourSpace::kRgb}) {
     Picture picture = OnePixel({1, 2, 3});
     ConvertToRgb(picture, space);
@@ -53,7 +48,7 @@ TEST(ColourConversion, LeavesOtherSpacesAlone) {
   }
 }
 
-TEST(PixelRows, LayTransparencyOnItsBackground) {
+TEST(PixelRows, FlattenTransparencyOnItsBackground) {
   const std::array<uint8_t, 8> row = {255, 0, 0, 255, 255, 0, 0, 0};
   alignas(2) std::array<uint8_t, 12> out = {};
   const Background background = {0, 0, kBrightest};
@@ -63,7 +58,7 @@ TEST(PixelRows, LayTransparencyOnItsBackground) {
             (std::vector<uint16_t>{kLight, 0, 0, 0, 0, kLight}));
 }
 
-TEST(PixelRows, TellWhatAChangeMakes) {
+TEST(PixelRows, ReportTheResultOfAChange) {
   EXPECT_EQ(ChangedBands(RowChange::kOnBackground, 2), 1);
   EXPECT_EQ(ChangedBands(RowChange::kLumaChroma, 4), 3);
   EXPECT_EQ(ChangedBands(RowChange::kInvert, 4), 4);
@@ -149,7 +144,7 @@ TEST_F(Colours, TransparentPicturesThatAreNotFlattenedAreHandedOver) {
   ExpectHandedOver(MakePicture("png32:a.png", 300, 200, WithSoftOpacity({})), outputs);
 }
 
-TEST_F(Colours, NothingButTransparency) {
+TEST_F(Colours, FullyTransparentPicturesAreFlattened) {
   const std::string path = directory_ + "/none.png";
   ASSERT_EQ(RunProgram(kImageMagick, {"-size", "300x200", "xc:none", path}).exitCode, 0);
   ExpectOwnPictures(path, UsualOutputs());

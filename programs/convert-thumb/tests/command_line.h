@@ -1,4 +1,4 @@
-// Builds the command lines that velathumb gives to the converter.
+// Builds the command lines that velathumb passes to the converter.
 #pragma once
 
 #include <string>
@@ -30,7 +30,7 @@ struct CommandLine {
   std::string scratchDirectory;  ///< empty: none
   std::vector<ThumbOutput> outputs;
 
-  /// What stands behind argument zero.
+  /// The arguments after argument zero.
   std::vector<std::string> Arguments() const;
 };
 

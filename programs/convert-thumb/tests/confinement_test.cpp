@@ -1,8 +1,6 @@
-// What the converter cannot do any more once it looks at a photo.
+// What the converter can no longer do once it reads a photo.
 
 #include <fcntl.h>
-#include <gmock/gmock.h>
-#include <gtest/gtest.h>
 #include <linux/landlock.h>
 #include <linux/seccomp.h>
 #include <sched.h>
@@ -28,8 +26,6 @@
 
 #include "converter_fixture.h"
 #include "process/confinement.h"
-#include "support/files.h"
-#include "support/images.h"
 #include "support/seccomp_fail.h"
 
 using namespace vela;
@@ -45,7 +41,7 @@ int ErrorOf(long result) {
   return result < 0 ? errno : 0;
 }
 
-/// What `attempt` returns (0 to 255) in a process of its own.
+/// The result of `attempt` (0 to 255) in a separate process.
 int InChild(const std::function<int()>& attempt) {
   const pid_t child = fork();
   if (child == 0) {
@@ -69,7 +65,7 @@ int ErrorOfOpening(const std::string& path, int flags) {
   return ErrorOf(open(path.c_str(), flags | O_CLOEXEC, 0600));
 }
 
-/// What the kernel of this machine answers to changes outside.
+/// The error that this kernel reports for changes outside kInside.
 int ErrorOutside() {
   const long version =
       syscall(SYS_landlock_create_ruleset, nullptr, 0, LANDLOCK_CREATE_RULESET_VERSION);
@@ -146,7 +142,7 @@ TEST_F(Confinement, DoesNotOpenADirectoryThatAnOutputNames) {
             ErrorOutside());
 }
 
-/// A system call that an unconfined process is not refused, whoever runs it.
+/// A system call that no unconfined process is refused.
 struct Call {
   const char* name;
   std::function<long()> make;
@@ -185,14 +181,14 @@ std::vector<Call> RefusedCalls() {
   };
 }
 
-TEST_F(Confinement, RefusesSystemCallsThatNobodyNeeds) {
+TEST_F(Confinement, RefusesUnneededSystemCalls) {
   for (const Call& call : RefusedCalls()) {
     EXPECT_NE(InChild([&call] { return ErrorOf(call.make()); }), EPERM) << call.name;
     EXPECT_EQ(Confined([&call] { return ErrorOf(call.make()); }), EPERM) << call.name;
   }
 }
 
-/// What a process says that is asked for a child with these flags.
+/// The error of creating a child with these flags.
 int ErrorOfCloning(unsigned long flags) {
   const long child = syscall(SYS_clone, flags | SIGCHLD, 0, 0, 0, 0);
   if (child == 0) {
@@ -240,7 +236,7 @@ int StartThreadAndProgram() {
   return WEXITSTATUS(status);
 }
 
-TEST_F(Confinement, StartsThreadsAlwaysAndProgramsUntilNoneIsNeeded) {
+TEST_F(Confinement, StartsThreadsAlwaysAndProgramsOnlyAtFirst) {
   EXPECT_EQ(Confined(StartThreadAndProgram), 0);
   EXPECT_EQ(Confined([] {
               ConfineToThisProgram();
@@ -249,7 +245,7 @@ TEST_F(Confinement, StartsThreadsAlwaysAndProgramsUntilNoneIsNeeded) {
             EPERM);
 }
 
-TEST_F(Confinement, SignalsNobodyButItselfInTheEnd) {
+TEST_F(Confinement, SignalsOnlyItselfAtLast) {
   EXPECT_EQ(Confined([] {
               ConfineToThisProgram();
               return ErrorOf(kill(getppid(), 0));
@@ -267,7 +263,7 @@ int ErrorOfStartingNothing() {
   return ErrorOf(execl("/tmp/inside/none", "none", nullptr));
 }
 
-TEST_F(Confinement, HoldsInTheEndForThreadsThatExisted) {
+TEST_F(Confinement, AppliesAtLastToExistingThreads) {
   EXPECT_EQ(Confined([] {
               std::promise<void> confined;
               int error = 0;
@@ -283,11 +279,11 @@ TEST_F(Confinement, HoldsInTheEndForThreadsThatExisted) {
             EPERM);
 }
 
-TEST_F(Confinement, HoldsInTheEndWhereOtherThreadsCannotBeReached) {
+TEST_F(Confinement, AppliesAtLastWhenOtherThreadsCannotBeReached) {
   EXPECT_EQ(Confined([] {
               std::promise<void> done;
               std::promise<void> filtered;
-              // A filter of its own keeps a thread from being given the others'.
+              // A thread with its own filter cannot be synchronized with the others.
               std::thread thread([&done, &filtered] {
                 SeccompFail({SYS_kcmp}, ENOSYS)();
                 filtered.set_value();
@@ -311,12 +307,11 @@ TEST_F(Confinement, WorksInsideAnother) {
             0);
 }
 
-TEST_F(Confinement, IsLeftOutWhereTheKernelCannotDoIt) {
+TEST_F(Confinement, IsSkippedWithoutKernelSupport) {
   const std::string photo = MakePhoto("a.jpg", 300, 200);
   ProgramOptions options;
   options.beforeExec = {SeccompFail({SYS_landlock_create_ruleset, SYS_seccomp, SYS_prctl}, ENOSYS)};
-  const CommandLine line = Line(photo, UsualOutputs(), "ours");
-  const ProgramResult result = RunProgram(ConvertThumbPath(), line.Arguments(), options);
+  const ProgramResult result = Convert(photo, UsualOutputs(), options);
   EXPECT_EQ(result.exitCode, 0) << result.err;
   EXPECT_EQ(result.err, "");
 }
@@ -328,25 +323,24 @@ TEST_F(Confinement, LetsOutputsHaveRelativeNames) {
   options.workingDirectory = directory_;
   for (const char* name : {"bare.jpg", "./dot.jpg", "below/o.jpg", "../converter/up.jpg"}) {
     const CommandLine line{photo, "", {{{}, name}}};
-    EXPECT_EQ(RunProgram(ConvertThumbPath(), line.Arguments(), options).exitCode, 0) << name;
+    EXPECT_EQ(RunConverter(line.Arguments(), options).exitCode, 0) << name;
     EXPECT_TRUE(Exists(directory_ + "/" + name)) << name;
   }
 }
 
-TEST_F(Confinement, LeavesMissingDirectoriesTheirError) {
+TEST_F(Confinement, KeepsTheErrorForMissingDirectories) {
   const std::string photo = MakePhoto("a.jpg", 300, 200);
   const CommandLine line{photo, directory_ + "/gone", {{{}, directory_ + "/missing/o.jpg"}}};
-  const ProgramResult result = RunProgram(ConvertThumbPath(), line.Arguments());
+  const ProgramResult result = RunConverter(line.Arguments());
   EXPECT_EQ(result.exitCode, 1);
   EXPECT_EQ(result.err, "convert-thumb: cannot write " + directory_ + "/missing/o.jpg\n");
 }
 
-TEST_F(Confinement, HoldsForImageMagick) {
+TEST_F(Confinement, AppliesToImageMagick) {
   const std::string source = MakeImage(directory_ + "/a.bmp", 300, 200);
   ProgramOptions options;
   options.workingDirectory = directory_;
-  const ProgramResult result = RunProgram(
-      ConvertThumbPath(),
+  const ProgramResult result = RunConverter(
       {"-define", "registry:temporary-path=" + directory_, source, "-write", directory_ + "/o.png",
        "-set", "filename:a", "/tmp/outside/new", "%[filename:a].png"},
       options);

@@ -1,16 +1,12 @@
 #include "converter_fixture.h"
 
 #include <fcntl.h>
-#include <gtest/gtest.h>
 #include <unistd.h>
 
 #include <cerrno>
 #include <csignal>
 #include <cstdio>
 #include <cstdlib>
-
-#include "support/files.h"
-#include "support/image_checks.h"
 
 namespace vela_test {
 namespace {
@@ -19,10 +15,6 @@ constexpr char kHiddenImageMagick[] = "/usr/bin/away";
 
 std::string OutputPath(const std::string& prefix, size_t place) {
   return prefix + std::to_string(place) + ".jpg";
-}
-
-void ExpectSuccess(const ProgramResult& result) {
-  EXPECT_EQ(result.exitCode, 0) << result.err;
 }
 
 }  // namespace
@@ -71,6 +63,19 @@ BeforeExec BreakErrorPipe() {
   };
 }
 
+void SetMemoryLimit(const std::string& limit) {
+  WriteFile("/etc/velainfo.conf", "convert_memory_limit=\"" + limit + "\"\n");
+}
+
+ProgramResult RunConverter(const std::vector<std::string>& arguments,
+                           const ProgramOptions& options) {
+  return RunProgram(ConvertThumbPath(), arguments, options);
+}
+
+void ExpectSuccess(const ProgramResult& result) {
+  EXPECT_EQ(result.exitCode, 0) << result.err;
+}
+
 WithoutImageMagick::WithoutImageMagick() {
   EXPECT_EQ(std::rename(kImageMagick, kHiddenImageMagick), 0);
 }
@@ -103,6 +108,12 @@ std::string ConverterTest::MakePicture(const std::string& name, int width, int h
   return path;
 }
 
+ProgramResult ConverterTest::Convert(const std::string& source,
+                                     const std::vector<ThumbOptions>& outputs,
+                                     const ProgramOptions& options) const {
+  return RunConverter(Line(source, outputs, "ours").Arguments(), options);
+}
+
 CommandLine ConverterTest::Line(const std::string& source, const std::vector<ThumbOptions>& outputs,
                                 const std::string& prefix) const {
   CommandLine line;
@@ -117,7 +128,7 @@ CommandLine ConverterTest::Line(const std::string& source, const std::vector<Thu
 void ConverterTest::ExpectSamePictures(const std::string& source,
                                        const std::vector<ThumbOptions>& outputs, double leastMean,
                                        double least) const {
-  ExpectSuccess(RunProgram(ConvertThumbPath(), Line(source, outputs, "ours").Arguments()));
+  ExpectSuccess(Convert(source, outputs));
   ExpectSuccess(RunProgram(kImageMagick, Line(source, outputs, "theirs").Arguments()));
   CompareOutputs(source, outputs, leastMean, least);
 }
@@ -128,17 +139,16 @@ void ConverterTest::ExpectOwnPictures(const std::string& source,
   ExpectSuccess(RunProgram(kImageMagick, Line(source, outputs, "theirs").Arguments()));
   {
     const WithoutImageMagick without;
-    ExpectSuccess(RunProgram(ConvertThumbPath(), Line(source, outputs, "ours").Arguments()));
+    ExpectSuccess(Convert(source, outputs));
   }
   CompareOutputs(source, outputs, leastMean, least);
 }
 
 void ConverterTest::ExpectHandedOver(const std::string& source,
                                      const std::vector<ThumbOptions>& outputs) const {
-  const std::vector<std::string> arguments = Line(source, outputs, "ours").Arguments();
-  ExpectSuccess(RunProgram(ConvertThumbPath(), arguments));
+  ExpectSuccess(Convert(source, outputs));
   const WithoutImageMagick without;
-  EXPECT_EQ(RunProgram(ConvertThumbPath(), arguments).exitCode, 1) << source;
+  EXPECT_EQ(Convert(source, outputs).exitCode, 1) << source;
 }
 
 void ConverterTest::CompareOutputs(const std::string& source,
@@ -160,19 +170,23 @@ void ConverterTest::CompareOutputs(const std::string& source,
 
 void ConverterTest::ExpectSameVerdict(const std::string& source,
                                       const std::vector<ThumbOptions>& outputs) const {
-  const ProgramResult ours =
-      RunProgram(ConvertThumbPath(), Line(source, outputs, "ours").Arguments());
+  const ProgramResult ours = Convert(source, outputs);
   const ProgramResult theirs =
       RunProgram(kImageMagick, Line(source, outputs, "theirs").Arguments());
   EXPECT_EQ(ours.exitCode, theirs.exitCode) << source << ": " << ours.err << theirs.err;
 }
 
+ThumbOptions Square(int side) {
+  ThumbOptions options;
+  options.width = side;
+  options.height = side;
+  return options;
+}
+
 std::vector<ThumbOptions> UsualOutputs() {
   std::vector<ThumbOptions> outputs;
   for (const int side : {1280, 640, 320, 120}) {
-    ThumbOptions options;
-    options.width = side;
-    options.height = side;
+    ThumbOptions options = Square(side);
     options.flatten = true;
     options.unsharp = "0x0.6+0.7+0.01";
     outputs.push_back(options);

@@ -1,10 +1,15 @@
 // Runs the converter and ImageMagick with the same command lines and compares what they make.
 #pragma once
 
+#include <gmock/gmock.h>
+
 #include <string>
 #include <vector>
 
 #include "command_line.h"
+#include "support/files.h"
+#include "support/image_checks.h"
+#include "support/images.h"
 #include "support/program.h"
 #include "support/sandbox.h"
 
@@ -16,14 +21,14 @@ std::string ConvertThumbPath();
 /// ImageMagick's own program.
 constexpr const char* kImageMagick = "/usr/bin/convert-im6.q16";
 
-/// Starts a program with these signals at their default (SIG_DFL) or ignored (SIG_IGN), whatever
-/// the test itself was started with.
+/// Starts a program with these signals at their default (SIG_DFL) or ignored (SIG_IGN), regardless
+/// of the test's own.
 BeforeExec SetSignals(const std::vector<int>& signals, void (*action)(int));
 
-/// Makes standard error a pipe that nobody reads.
+/// Makes standard error a pipe without a reader.
 BeforeExec BreakErrorPipe();
 
-/// How alike two pictures are.
+/// How similar two pictures are.
 struct Likeness {
   bool sameSize = false;
   double decibels = 0;  ///< peak signal-to-noise ratio; 1000 for the same pixels
@@ -38,6 +43,16 @@ class WithoutImageMagick {
   WithoutImageMagick(const WithoutImageMagick&) = delete;
   WithoutImageMagick& operator=(const WithoutImageMagick&) = delete;
 };
+
+/// Sets the converter's memory limit, as the setting reads.
+void SetMemoryLimit(const std::string& limit);
+
+/// Runs the converter with these arguments.
+ProgramResult RunConverter(const std::vector<std::string>& arguments,
+                           const ProgramOptions& options = ProgramOptions());
+
+/// Fails the test unless the run ended with status 0.
+void ExpectSuccess(const ProgramResult& result);
 
 class ConverterTest : public SandboxTest {
  protected:
@@ -54,6 +69,11 @@ class ConverterTest : public SandboxTest {
   std::string MakePicture(const std::string& name, int width, int height,
                           const std::vector<std::string>& options = {}) const;
 
+  /// Runs the converter with the line whose outputs are directory_/ours0.jpg and so on.
+  ProgramResult Convert(const std::string& source,
+                        const std::vector<ThumbOptions>& outputs = {ThumbOptions()},
+                        const ProgramOptions& options = ProgramOptions()) const;
+
   /// The line with the outputs' paths in a directory of their own.
   CommandLine Line(const std::string& source, const std::vector<ThumbOptions>& outputs,
                    const std::string& prefix) const;
@@ -63,7 +83,7 @@ class ConverterTest : public SandboxTest {
   void ExpectSamePictures(const std::string& source, const std::vector<ThumbOptions>& outputs,
                           double leastMean = 40, double least = 36) const;
 
-  /// The same without ImageMagick in reach of the converter, which has to do all by itself.
+  /// The same while ImageMagick is unavailable to the converter, which has to do everything itself.
   void ExpectOwnPictures(const std::string& source, const std::vector<ThumbOptions>& outputs,
                          double leastMean = 40, double least = 36) const;
 
@@ -78,7 +98,20 @@ class ConverterTest : public SandboxTest {
                       double leastMean, double least) const;
 };
 
-/// The thumbnails of a photo as they usually are, from the largest.
+/// A thumbnail in a square box.
+ThumbOptions Square(int side);
+
+/// The usual thumbnails of a photo, from the largest.
 std::vector<ThumbOptions> UsualOutputs();
+
+/// The same after `change` to each.
+template <typename Change>
+std::vector<ThumbOptions> UsualOutputs(Change change) {
+  std::vector<ThumbOptions> outputs = UsualOutputs();
+  for (ThumbOptions& options : outputs) {
+    change(options);
+  }
+  return outputs;
+}
 
 }  // namespace vela_test

@@ -1,6 +1,5 @@
-// The converter's pictures beside ImageMagick's.
+// The converter's pictures compared with ImageMagick's.
 
-#include <gtest/gtest.h>
 #include <sys/resource.h>
 #include <sys/stat.h>
 
@@ -9,33 +8,35 @@
 
 #include "converter_fixture.h"
 #include "support/build_paths.h"
-#include "support/files.h"
-#include "support/image_checks.h"
-#include "support/images.h"
 
 namespace vela_test {
 namespace {
 
-class Converter : public ConverterTest {};
+using namespace ::testing;
+
+class Converter : public ConverterTest {
+ protected:
+  std::string MakeOrientedPhoto(int orientation) const {
+    JpegRecipe recipe;
+    recipe.width = 500;
+    recipe.height = 300;
+    recipe.orientation = orientation;
+    return MakeJpeg(directory_ + "/a.jpg", recipe);
+  }
+};
 
 TEST_F(Converter, MakesImageMagicksPicturesOfASmallPhoto) {
   // Decoded at its full size: what differs is rounding.
   ExpectSamePictures(MakePhoto("a.jpg", 1400, 1050), UsualOutputs(), 48, 45);
 }
 
-TEST_F(Converter, MakesImageMagicksPicturesOfALargePhoto) {
-  ExpectSamePictures(MakePhoto("a.jpg", 4000, 3000), UsualOutputs());
+TEST_F(Converter, MakesImageMagicksPicturesOfPhotosOfEverySize) {
+  ExpectSamePictures(MakePhoto("large.jpg", 4000, 3000), UsualOutputs());
+  ExpectSamePictures(MakePhoto("very_large.jpg", 8000, 6000), UsualOutputs());
+  ExpectSamePictures(MakePhoto("portrait.jpg", 1500, 2500), UsualOutputs());
 }
 
-TEST_F(Converter, MakesImageMagicksPicturesOfAVeryLargePhoto) {
-  ExpectSamePictures(MakePhoto("a.jpg", 8000, 6000), UsualOutputs());
-}
-
-TEST_F(Converter, MakesImageMagicksPicturesOfAnUprightPhoto) {
-  ExpectSamePictures(MakePhoto("a.jpg", 1500, 2500), UsualOutputs());
-}
-
-TEST_F(Converter, KeepsTheFinenessOfColour) {
+TEST_F(Converter, KeepsTheChromaSampling) {
   for (const char* sampling : {"1x1", "2x1", "2x2", "1x2"}) {
     ExpectSamePictures(MakePhoto("a.jpg", 2000, 1500, {"-sampling-factor", std::string(sampling)}),
                        UsualOutputs());
@@ -60,26 +61,18 @@ TEST_F(Converter, MakesGreyThumbnailsOfColourPhotosWithoutColour) {
 }
 
 TEST_F(Converter, FillsTheBox) {
-  std::vector<ThumbOptions> outputs = UsualOutputs();
-  for (ThumbOptions& options : outputs) {
-    options.fill = true;
-  }
+  const auto outputs = UsualOutputs([](ThumbOptions& options) { options.fill = true; });
   ExpectSamePictures(MakePhoto("a.jpg", 3000, 2000), outputs);
 }
 
 TEST_F(Converter, NeedsNoSharpening) {
-  std::vector<ThumbOptions> outputs = UsualOutputs();
-  for (ThumbOptions& options : outputs) {
-    options.unsharp.clear();
-  }
+  const auto outputs = UsualOutputs([](ThumbOptions& options) { options.unsharp.clear(); });
   ExpectSamePictures(MakePhoto("a.jpg", 3000, 2000), outputs);
 }
 
 TEST_F(Converter, SharpensWithAnyKernel) {
   for (const char* mask : {"0x2+1+0", "1x1+0.5+0.05", "3x1.5+1.2+0.02", "0.5x0.5", "2"}) {
-    ThumbOptions options;
-    options.width = 400;
-    options.height = 400;
+    ThumbOptions options = Square(400);
     options.unsharp = mask;
     ExpectSamePictures(MakePhoto("a.jpg", 900, 700), {options}, 45, 45);
   }
@@ -93,37 +86,26 @@ TEST_F(Converter, StoresWithAnyQuality) {
   }
 }
 
-TEST_F(Converter, TurnsEveryOutputAgain) {
+TEST_F(Converter, RotatesEveryOutput) {
   for (const int degrees : {90, 180, 270, 360}) {
-    std::vector<ThumbOptions> outputs = UsualOutputs();
-    for (ThumbOptions& options : outputs) {
-      options.rotate = degrees;
-    }
+    const auto outputs = UsualOutputs([&](ThumbOptions& options) { options.rotate = degrees; });
     ExpectSamePictures(MakePhoto("a.jpg", 1400, 900), outputs);
   }
 }
 
-TEST_F(Converter, TurnsUprightOnceForEveryOrientation) {
+TEST_F(Converter, AppliesEveryOrientationOnce) {
   for (int orientation = 0; orientation <= 8; ++orientation) {
-    JpegRecipe recipe;
-    recipe.width = 500;
-    recipe.height = 300;
-    recipe.orientation = orientation;
-    ExpectSamePictures(MakeJpeg(directory_ + "/a.jpg", recipe), UsualOutputs());
+    ExpectSamePictures(MakeOrientedPhoto(orientation), UsualOutputs());
     for (const char* name : {"/ours0.jpg", "/ours3.jpg"}) {
       EXPECT_EQ(QuadrantLetters(directory_ + name), LettersAfterOrientation(orientation));
     }
   }
 }
 
-TEST_F(Converter, LeavesTheOrientationAloneUntilItIsAskedFor) {
-  JpegRecipe recipe;
-  recipe.width = 500;
-  recipe.height = 300;
-  recipe.orientation = 6;
+TEST_F(Converter, IgnoresTheOrientationUnlessRequested) {
   std::vector<ThumbOptions> outputs = UsualOutputs();
   outputs.front().autoOrient = false;
-  ExpectSamePictures(MakeJpeg(directory_ + "/a.jpg", recipe), outputs);
+  ExpectSamePictures(MakeOrientedPhoto(6), outputs);
   EXPECT_EQ(QuadrantLetters(directory_ + "/ours0.jpg"), "RGBY");
   EXPECT_EQ(QuadrantLetters(directory_ + "/ours1.jpg"), LettersAfterOrientation(6));
 }
@@ -163,10 +145,7 @@ TEST_F(Converter, DropsAGreyPhotosProfileWhenItsColourChanges) {
 
 TEST_F(Converter, NeverEnlarges) {
   for (const bool fill : {false, true}) {
-    std::vector<ThumbOptions> outputs = UsualOutputs();
-    for (ThumbOptions& options : outputs) {
-      options.fill = fill;
-    }
+    const auto outputs = UsualOutputs([&](ThumbOptions& options) { options.fill = fill; });
     ExpectSamePictures(MakePhoto("a.jpg", 1, 1), outputs);
     ExpectSamePictures(MakePhoto("b.jpg", 7, 3), outputs);
     ExpectSamePictures(MakePhoto("c.jpg", 100, 2000), outputs);
@@ -188,15 +167,13 @@ TEST_F(Converter, MakesThumbnailsOfPanoramasThatImageMagickRefuses) {
   JpegRecipe recipe;
   recipe.width = 30000;
   recipe.height = 10;
-  const CommandLine line = Line(MakeJpeg(directory_ + "/a.jpg", recipe), UsualOutputs(), "ours");
-  const ProgramResult result = RunProgram(ConvertThumbPath(), line.Arguments());
-  EXPECT_EQ(result.exitCode, 0) << result.err;
+  ExpectSuccess(Convert(MakeJpeg(directory_ + "/a.jpg", recipe), UsualOutputs()));
   const ImageIdentity thumbnail = Identify(directory_ + "/ours0.jpg");
   EXPECT_EQ(thumbnail.width, 1280);
   EXPECT_EQ(thumbnail.height, 1);
 }
 
-TEST_F(Converter, ReadsPhotosWhateverTheirName) {
+TEST_F(Converter, ReadsPhotosOfAnyName) {
   const std::string photo = MakePhoto("plain.jpg", 300, 200);
   for (const char* name :
        {"a[1].jpg", "a*b?.jpg", "{a,b}.jpg", "a:b.jpg", "@a.jpg", "100%.jpg", "%d.jpg", " a .jpg",
@@ -205,7 +182,7 @@ TEST_F(Converter, ReadsPhotosWhateverTheirName) {
     CopyFile(photo, source);
     for (const char* page : {"", "[0]"}) {
       const ProgramResult result =
-          RunProgram(ConvertThumbPath(), Line(source + page, {ThumbOptions()}, "odd").Arguments());
+          RunConverter(Line(source + page, {ThumbOptions()}, "odd").Arguments());
       EXPECT_EQ(result.exitCode, 0) << name << result.err;
       EXPECT_TRUE(IsWholeJpeg(directory_ + "/odd0.jpg")) << name;
       RemoveTree(directory_ + "/odd0.jpg");
@@ -213,10 +190,10 @@ TEST_F(Converter, ReadsPhotosWhateverTheirName) {
   }
 }
 
-TEST_F(Converter, WritesToWhateverNameIsAskedFor) {
+TEST_F(Converter, WritesToAnyName) {
   const std::string photo = MakePhoto("a.jpg", 300, 200);
   const CommandLine line{photo, "", {{{}, directory_ + "/100%%[0]*.jpg"}}};
-  EXPECT_EQ(RunProgram(ConvertThumbPath(), line.Arguments()).exitCode, 0);
+  EXPECT_EQ(RunConverter(line.Arguments()).exitCode, 0);
   EXPECT_TRUE(IsWholeJpeg(directory_ + "/100%[0]*.jpg"));
 }
 
@@ -254,62 +231,55 @@ TEST_F(Converter, FailsWhenAnOutputCannotBeWritten) {
   const std::string photo = MakePhoto("a.jpg", 700, 500);
   CommandLine line = Line(photo, UsualOutputs(), "ours");
   line.outputs[2].path = directory_ + "/missing/a.jpg";
-  EXPECT_EQ(RunProgram(ConvertThumbPath(), line.Arguments()).exitCode, 1);
+  EXPECT_EQ(RunConverter(line.Arguments()).exitCode, 1);
 }
 
 TEST_F(Converter, LeavesNoPartOfAnOutput) {
   const std::string photo = MakePhoto("a.jpg", 700, 500);
   ProgramOptions options;
   options.beforeExec = {IgnoreSignal(SIGXFSZ), LimitResource(RLIMIT_FSIZE, 4096)};
-  const CommandLine line = Line(photo, {UsualOutputs().front()}, "ours");
-  EXPECT_EQ(RunProgram(ConvertThumbPath(), line.Arguments(), options).exitCode, 1);
+  EXPECT_EQ(Convert(photo, {UsualOutputs().front()}, options).exitCode, 1);
   EXPECT_FALSE(Exists(directory_ + "/ours0.jpg"));
 }
 
-TEST_F(Converter, LeavesPermissionsToTheMask) {
+TEST_F(Converter, LeavesPermissionsToTheUmask) {
   const std::string photo = MakePhoto("a.jpg", 300, 200);
   for (const mode_t mask : {mode_t{0}, mode_t{022}, mode_t{077}}) {
     ProgramOptions options;
     options.umask = mask;
     const std::string prefix = "mask" + std::to_string(mask);
-    RunProgram(ConvertThumbPath(), Line(photo, {ThumbOptions()}, prefix).Arguments(), options);
+    RunConverter(Line(photo, {ThumbOptions()}, prefix).Arguments(), options);
     EXPECT_EQ(ModeOf(directory_ + "/" + prefix + "0.jpg"), static_cast<int>(0666 & ~mask));
   }
 }
 
 TEST_F(Converter, KeepsToItsMemoryLimit) {
   const std::string photo = MakePhoto("a.jpg", 2000, 1500, {"-interlace", "Plane"});
-  const CommandLine line = Line(photo, UsualOutputs(), "ours");
-  WriteFile("/etc/velainfo.conf", "convert_memory_limit=\"1000000\"\n");
-  EXPECT_EQ(RunProgram(ConvertThumbPath(), line.Arguments()).exitCode, 1);
-  WriteFile("/etc/velainfo.conf", "convert_memory_limit=\"64000000\"\n");
-  EXPECT_EQ(RunProgram(ConvertThumbPath(), line.Arguments()).exitCode, 0);
+  SetMemoryLimit("1000000");
+  EXPECT_EQ(Convert(photo, UsualOutputs()).exitCode, 1);
+  SetMemoryLimit("64000000");
+  EXPECT_EQ(Convert(photo, UsualOutputs()).exitCode, 0);
 }
 
 TEST_F(Converter, RefusesThumbnailsThatTakeTooMuchMemory) {
   const std::string photo = MakePhoto("a.jpg", 2000, 1500);
-  ThumbOptions options;
-  options.width = 2000;
-  options.height = 2000;
-  const CommandLine line = Line(photo, {options}, "ours");
-  WriteFile("/etc/velainfo.conf", "convert_memory_limit=\"50000000\"\n");
-  const ProgramResult result = RunProgram(ConvertThumbPath(), line.Arguments());
+  const std::vector<ThumbOptions> outputs = {Square(2000)};
+  SetMemoryLimit("50000000");
+  const ProgramResult result = Convert(photo, outputs);
   EXPECT_EQ(result.exitCode, 1);
-  EXPECT_NE(result.err.find("too much memory"), std::string::npos) << result.err;
-  WriteFile("/etc/velainfo.conf", "convert_memory_limit=\"60000000\"\n");
-  EXPECT_EQ(RunProgram(ConvertThumbPath(), line.Arguments()).exitCode, 0);
+  EXPECT_THAT(result.err, HasSubstr("too much memory"));
+  SetMemoryLimit("60000000");
+  EXPECT_EQ(Convert(photo, outputs).exitCode, 0);
 }
 
 // The memory that a sanitizer keeps for itself is many times the limit.
 #ifndef __SANITIZE_ADDRESS__
 TEST_F(Converter, NeedsLittleMemoryForALargePhoto) {
   const std::string photo = MakePhoto("a.jpg", 8000, 6000);
-  const CommandLine line = Line(photo, UsualOutputs(), "ours");
   ProgramOptions options;
   // The libraries and two stacks take up addresses too.
   options.beforeExec = {LimitResource(RLIMIT_DATA, 56U << 20)};
-  const ProgramResult result = RunProgram(ConvertThumbPath(), line.Arguments(), options);
-  EXPECT_EQ(result.exitCode, 0) << result.err;
+  ExpectSuccess(Convert(photo, UsualOutputs(), options));
 }
 #endif
 

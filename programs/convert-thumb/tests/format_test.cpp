@@ -1,20 +1,14 @@
-// Photos of every format that the converter decodes itself.
+// All formats that the converter decodes itself.
 
-#include <gmock/gmock.h>
-#include <gtest/gtest.h>
 #include <sys/stat.h>
 
 #include "converter_fixture.h"
 #include "support/build_paths.h"
-#include "support/files.h"
-#include "support/image_checks.h"
-#include "support/images.h"
 
 namespace vela_test {
 namespace {
 
-using ::testing::HasSubstr;
-using ::testing::Not;
+using namespace ::testing;
 
 constexpr int kWidth = 900;
 constexpr int kHeight = 660;
@@ -28,13 +22,11 @@ class Formats : public ConverterTest {
     ExpectOwnPictures(MakePicture(name, kWidth, kHeight, options), UsualOutputs(), leastMean);
   }
 
-  /// What the loader says that it loads to convert the picture.
+  /// The dynamic linker's log of a conversion of the picture.
   std::string LoadedFor(const std::string& source) const {
     ProgramOptions options;
     options.addedEnvironment = {"LD_DEBUG=files"};
-    return RunProgram(ConvertThumbPath(), Line(source, {ThumbOptions()}, "ours").Arguments(),
-                      options)
-        .err;
+    return Convert(source, {ThumbOptions()}, options).err;
   }
 
   std::string DensityOf(const std::string& name) const {
@@ -102,7 +94,7 @@ TEST_F(Formats, TiffOfEveryLayout) {
   ExpectOwn("a.tif", {"-colors", "200", "-type", "Palette", "-depth", "8"}, 45);
 }
 
-TEST_F(Formats, TiffStandsUpright) {
+TEST_F(Formats, TiffOrientationIsApplied) {
   for (const char* orientation : {"TopRight", "BottomLeft", "RightTop", "LeftBottom"}) {
     ExpectOwn("a.tif", {"-depth", "8", "-orient", orientation});
   }
@@ -131,7 +123,7 @@ TEST_F(Formats, Webp) {
   ExpectOwn("a.webp", {"-define", "webp:lossless=true"});
 }
 
-TEST_F(Formats, WebpStandsUpright) {
+TEST_F(Formats, WebpOrientationIsApplied) {
   JpegRecipe recipe;
   recipe.width = 600;
   recipe.height = 400;
@@ -139,10 +131,8 @@ TEST_F(Formats, WebpStandsUpright) {
   const std::string jpeg = MakeJpeg(directory_ + "/a.jpg", recipe);
   const std::string webp = directory_ + "/a.webp";
   ASSERT_EQ(RunProgram(kImageMagick, {jpeg, webp}).exitCode, 0);
-  // ImageMagick leaves it lying.
-  const ProgramResult result =
-      RunProgram(ConvertThumbPath(), Line(webp, UsualOutputs(), "ours").Arguments());
-  EXPECT_EQ(result.exitCode, 0) << result.err;
+  // ImageMagick ignores it.
+  ExpectSuccess(Convert(webp, UsualOutputs()));
   EXPECT_EQ(QuadrantLetters(directory_ + "/ours0.jpg"), LettersAfterOrientation(6));
 }
 
@@ -160,9 +150,7 @@ TEST_F(Formats, HeifOfACameraKeepsItsProfile) {
   ASSERT_EQ(RunProgram(kImageMagick, Line(photo, UsualOutputs(), "theirs").Arguments()).exitCode,
             0);
   const WithoutImageMagick without;
-  const ProgramResult result =
-      RunProgram(ConvertThumbPath(), Line(photo, UsualOutputs(), "ours").Arguments());
-  EXPECT_EQ(result.exitCode, 0) << result.err;
+  ExpectSuccess(Convert(photo, UsualOutputs()));
   for (const char* place : {"0.jpg", "1.jpg", "2.jpg", "3.jpg"}) {
     const std::string ours = directory_ + "/ours" + place;
     const Likeness likeness = Compare(ours, directory_ + "/theirs" + place);
@@ -177,18 +165,18 @@ TEST_F(Formats, Jpeg2000) {
   ExpectOwn("a.jp2", {"-colorspace", "Gray"});
 }
 
-TEST_F(Formats, ReadOfSeveralPagesTheFirst) {
+TEST_F(Formats, ReadOnlyTheFirstOfSeveralPages) {
   const std::vector<std::string> second = {"-depth", "8", "(", "+clone", "-negate", ")"};
   for (const char* name : {"a.tif", "a.gif", "a.webp", "a.ppm"}) {
     const std::string source = MakePicture(name, 700, 500, second);
     ExpectOwnPictures(source + "[0]", UsualOutputs());
     const WithoutImageMagick without;
     const CommandLine all = Line(source, UsualOutputs(), "all");
-    EXPECT_EQ(RunProgram(ConvertThumbPath(), all.Arguments()).exitCode, 1) << name;
+    EXPECT_EQ(RunConverter(all.Arguments()).exitCode, 1) << name;
   }
 }
 
-TEST_F(Formats, HandsOverWhatIsReadDifferently) {
+TEST_F(Formats, HandsOverFilesThatItReadsDifferently) {
   const std::vector<ThumbOptions> outputs = {ThumbOptions()};
   ExpectHandedOver(MakePicture("a.bmp", 300, 200), outputs);
   ExpectHandedOver(MakePicture("lab.tif", 300, 200, {"-colorspace", "Lab"}), outputs);
@@ -225,9 +213,7 @@ TEST_F(Formats, AnAnimationsFirstFrameMayBeOpaqueAmongTransparentOnes) {
       MakePicture("a.webp", 300, 200,
                   {"-attenuate", "0.5", "+noise", "Gaussian", "-define", "webp:lossless=true", "(",
                    "+clone", "-fill", "red", "-draw", "rectangle 30,30 100,100", ")"});
-  ThumbOptions options;
-  options.width = 200;
-  options.height = 200;
+  ThumbOptions options = Square(200);
   options.flatten = true;
   ExpectOwnPictures(source + "[0]", {options}, 48);
 }
@@ -249,15 +235,14 @@ TEST_F(Formats, DensityOfTiffHasItsUnit) {
   }
 }
 
-TEST_F(Formats, DamagedTiffIsNotToldByItsLibrary) {
+TEST_F(Formats, DamagedTiffIsNotReportedByItsLibrary) {
   const std::string source = MakePicture("a.tif", 300, 200, {"-depth", "8"});
   const std::string bytes = ReadFile(source);
   const WithoutImageMagick without;
-  // The directory, which lies at the end of the file, is missing or cut.
+  // The directory, which is at the end of the file, is missing or truncated.
   for (const size_t length : {size_t{40}, bytes.size() - 250, bytes.size() - 60}) {
     WriteFile(source, bytes.substr(0, length));
-    const ProgramResult result =
-        RunProgram(ConvertThumbPath(), Line(source, {ThumbOptions()}, "ours").Arguments());
+    const ProgramResult result = Convert(source);
     EXPECT_THAT(result.err, Not(HasSubstr("TIFF")));
   }
 }
@@ -270,25 +255,23 @@ TEST_F(Formats, LibvipsLeavesTheEnvironmentToImageMagick) {
   const std::string source = MakePicture("linear.png", 300, 200, {"-set", "gamma", "1"});
   const std::vector<std::string> arguments = Line(source, {ThumbOptions()}, "ours").Arguments();
   ProgramOptions options;
-  EXPECT_EQ(RunProgram(ConvertThumbPath(), arguments, options).out, "VIPSHOME is unset\n");
+  EXPECT_EQ(RunConverter(arguments, options).out, "VIPSHOME is unset\n");
   options.addedEnvironment = {"VIPSHOME=/opt/vips"};
-  EXPECT_EQ(RunProgram(ConvertThumbPath(), arguments, options).out, "VIPSHOME is /opt/vips\n");
+  EXPECT_EQ(RunConverter(arguments, options).out, "VIPSHOME is /opt/vips\n");
 }
 
-TEST_F(Formats, HandsOverWhatIsNamedLikeARawPhoto) {
+TEST_F(Formats, HandsOverFilesNamedLikeARawPhoto) {
   const std::string raw = directory_ + "/a.nef";
   CopyFile(MakePicture("a.tif", 300, 200, {"-depth", "8"}), raw);
   ExpectSameVerdict(raw, {ThumbOptions()});
   EXPECT_FALSE(Exists(directory_ + "/ours0.jpg"));
 }
 
-TEST_F(Formats, DataCountsAndNotTheName) {
+TEST_F(Formats, TheDataDecidesNotTheName) {
   const std::string source = directory_ + "/[a]*%d.jpg";
   CopyFile(MakePicture("png24:a.png", 300, 200), source);
   const WithoutImageMagick without;
-  const ProgramResult result =
-      RunProgram(ConvertThumbPath(), Line(source, {ThumbOptions()}, "ours").Arguments());
-  EXPECT_EQ(result.exitCode, 0) << result.err;
+  ExpectSuccess(Convert(source));
   EXPECT_TRUE(IsWholeJpeg(directory_ + "/ours0.jpg"));
 }
 
@@ -297,23 +280,11 @@ TEST_F(Formats, VerdictOnDamagedPng) {
   ExpectVerdictsOnDamage("png24:a.png", {"-interlace", "PNG"});
 }
 
-TEST_F(Formats, VerdictOnDamagedTiff) {
+TEST_F(Formats, VerdictOnOtherDamagedFormats) {
   ExpectVerdictsOnDamage("a.tif", {"-depth", "8", "-compress", "LZW"});
-}
-
-TEST_F(Formats, VerdictOnDamagedPortableMap) {
   ExpectVerdictsOnDamage("a.ppm", {"-depth", "8"});
-}
-
-TEST_F(Formats, VerdictOnDamagedWebp) {
   ExpectVerdictsOnDamage("a.webp");
-}
-
-TEST_F(Formats, VerdictOnDamagedHeif) {
   ExpectVerdictsOnDamage("a.heic");
-}
-
-TEST_F(Formats, VerdictOnDamagedJpeg2000) {
   ExpectVerdictsOnDamage("a.jp2");
 }
 
@@ -321,8 +292,7 @@ TEST_F(Formats, LeavesNothingOfADamagedPhoto) {
   const std::string bytes = ReadFile(MakePicture("png24:a.png", 300, 220));
   const std::string cut = directory_ + "/cut.png";
   WriteFile(cut, bytes.substr(0, bytes.size() / 2));
-  const ProgramResult result =
-      RunProgram(ConvertThumbPath(), Line(cut, UsualOutputs(), "ours").Arguments());
+  const ProgramResult result = Convert(cut, UsualOutputs());
   EXPECT_EQ(result.exitCode, 1);
   EXPECT_THAT(result.err, HasSubstr("cannot decode the photo"));
   EXPECT_FALSE(Exists(directory_ + "/ours0.jpg"));
@@ -333,51 +303,44 @@ TEST_F(Formats, PicturesThatAreDecodedWholeKeepToTheMemoryLimit) {
   const std::vector<ThumbOptions> outputs = {ThumbOptions()};
   const std::string whole = MakePicture("a.webp", 4000, 3000);
   const std::string streamed = MakePicture("a.png", 4000, 3000, {"-depth", "8", "-quality", "10"});
-  WriteFile("/etc/velainfo.conf", "convert_memory_limit=\"30000000\"\n");
-  const ProgramResult refused =
-      RunProgram(ConvertThumbPath(), Line(whole, outputs, "ours").Arguments());
+  SetMemoryLimit("30000000");
+  const ProgramResult refused = Convert(whole, outputs);
   EXPECT_EQ(refused.exitCode, 1);
   EXPECT_THAT(refused.err, HasSubstr("too much memory"));
-  EXPECT_EQ(RunProgram(ConvertThumbPath(), Line(streamed, outputs, "ours").Arguments()).exitCode,
-            0);
+  EXPECT_EQ(Convert(streamed, outputs).exitCode, 0);
 }
 
 TEST_F(Formats, SharpeningKeepsToTheMemoryLimit) {
   // 101 rows as they come and as many blurred ones, of 60,000 floats, take 48 megabytes.
-  ThumbOptions options;
-  options.width = 60000;
-  options.height = 60000;
+  ThumbOptions options = Square(60000);
   options.unsharp = "50x10+1+0";
   const std::string map = directory_ + "/wide.pgm";
   WriteFile(map, "P5 60000 8 255\n" + std::string(60000 * 8, 'x'));
   const std::vector<std::string> arguments = Line(map, {options}, "ours").Arguments();
-  WriteFile("/etc/velainfo.conf", "convert_memory_limit=\"40000000\"\n");
-  const ProgramResult refused = RunProgram(ConvertThumbPath(), arguments);
+  SetMemoryLimit("40000000");
+  const ProgramResult refused = RunConverter(arguments);
   EXPECT_EQ(refused.exitCode, 1);
   EXPECT_THAT(refused.err, HasSubstr("too much memory"));
-  WriteFile("/etc/velainfo.conf", "convert_memory_limit=\"100000000\"\n");
-  EXPECT_EQ(RunProgram(ConvertThumbPath(), arguments).exitCode, 0);
+  SetMemoryLimit("100000000");
+  EXPECT_EQ(RunConverter(arguments).exitCode, 0);
 }
 
-TEST_F(Formats, TellsWhyAThumbnailCannotBeEncoded) {
-  ThumbOptions wide;
-  wide.width = 65535;
-  wide.height = 65535;
+TEST_F(Formats, ReportsWhyAThumbnailCannotBeEncoded) {
+  const ThumbOptions wide = Square(65535);
   const std::string map = directory_ + "/wide.ppm";
   std::string samples(65535 * 3, 'x');
   samples.front() = 'a';
   WriteFile(map, "P6 65535 1 255\n" + samples);
   for (const std::vector<ThumbOptions>& outputs :
        {std::vector<ThumbOptions>{wide}, {wide, ThumbOptions()}}) {
-    const ProgramResult result =
-        RunProgram(ConvertThumbPath(), Line(map, outputs, "ours").Arguments());
+    const ProgramResult result = Convert(map, outputs);
     EXPECT_EQ(result.exitCode, 1);
     EXPECT_THAT(result.err, HasSubstr("65500"));
     EXPECT_EQ(result.err.find('\n'), result.err.size() - 1) << result.err;
   }
 }
 
-TEST_F(Formats, JpegAndPortableMapDoWithoutLibvips) {
+TEST_F(Formats, JpegAndPortableMapNeedNoLibvips) {
   EXPECT_THAT(LoadedFor(MakePicture("a.jpg", 300, 200)), Not(HasSubstr("libvips")));
   EXPECT_THAT(LoadedFor(MakePicture("a.ppm", 300, 200)), Not(HasSubstr("libvips")));
   EXPECT_THAT(LoadedFor(MakePicture("a.png", 300, 200)), HasSubstr("libvips"));
@@ -395,11 +358,11 @@ TEST_F(Formats, HandsOverWithoutLibvips) {
   ProgramOptions options;
   options.addedEnvironment = {"LD_LIBRARY_PATH=/tmp/broken"};
   const std::vector<std::string> arguments = Line(source, {ThumbOptions()}, "ours").Arguments();
-  const ProgramResult result = RunProgram(ConvertThumbPath(), arguments, options);
+  const ProgramResult result = RunConverter(arguments, options);
   EXPECT_EQ(result.exitCode, 0);
   EXPECT_EQ(result.err, "");
   const WithoutImageMagick without;
-  EXPECT_EQ(RunProgram(ConvertThumbPath(), arguments, options).exitCode, 1);
+  EXPECT_EQ(RunConverter(arguments, options).exitCode, 1);
 }
 
 }  // namespace

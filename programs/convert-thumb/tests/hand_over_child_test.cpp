@@ -1,19 +1,15 @@
 // ImageMagick in a child, where it is not installed under the converter's name.
 
-#include <gmock/gmock.h>
-#include <gtest/gtest.h>
-
 #include <csignal>
 
 #include "converter_fixture.h"
-#include "support/files.h"
 #include "support/stub_files.h"
 #include "support/stub_tool.h"
 
 namespace vela_test {
 namespace {
 
-using ::testing::SizeIs;
+using namespace ::testing;
 
 constexpr int kLongMilliseconds = 100000;
 
@@ -53,23 +49,23 @@ TEST_F(HandOverToChild, EndsWithItsStatus) {
   const StubTool stub(kImageMagick);
   for (const int status : {0, 1, 7}) {
     stub.Plan(StubPlan().Exit(status));
-    EXPECT_EQ(RunProgram(ConvertThumbPath(), arguments_, Recorded()).exitCode, status);
+    EXPECT_EQ(RunConverter(arguments_, Recorded()).exitCode, status);
   }
 }
 
-TEST_F(HandOverToChild, EndsWithItsStatusWhereChildrenAreIgnored) {
+TEST_F(HandOverToChild, EndsWithItsStatusEvenWhenSigchldIsIgnored) {
   const StubTool stub(kImageMagick);
   stub.Plan(StubPlan().Exit(7));
   ProgramOptions options = Recorded();
   options.beforeExec = {IgnoreSignal(SIGCHLD)};
-  EXPECT_EQ(RunProgram(ConvertThumbPath(), arguments_, options).exitCode, 7);
+  EXPECT_EQ(RunConverter(arguments_, options).exitCode, 7);
 }
 
 TEST_F(HandOverToChild, EndsByItsSignal) {
   const StubTool stub(kImageMagick);
   for (const int signal : {SIGKILL, SIGSEGV, SIGTERM, SIGXCPU, SIGABRT}) {
     stub.Plan(StubPlan().DieBySignal(signal));
-    EXPECT_EQ(RunProgram(ConvertThumbPath(), arguments_, Recorded()).signal, signal);
+    EXPECT_EQ(RunConverter(arguments_, Recorded()).signal, signal);
   }
 }
 
@@ -92,10 +88,10 @@ TEST_F(HandOverToChild, LeavesIgnoredSignalsIgnored) {
   const StubTool stub(kImageMagick);
   ProgramOptions options = Recorded();
   options.beforeExec = {IgnoreSignal(SIGHUP)};
-  RunProgram(ConvertThumbPath(), arguments_, options);
+  RunConverter(arguments_, options);
   ASSERT_THAT(stub.Calls(), SizeIs(1));
-  EXPECT_THAT(stub.Calls().front().ignoredSignals, ::testing::Contains(SIGHUP));
-  EXPECT_THAT(stub.Calls().front().ignoredSignals, ::testing::Not(::testing::Contains(SIGTERM)));
+  EXPECT_THAT(stub.Calls().front().ignoredSignals, Contains(SIGHUP));
+  EXPECT_THAT(stub.Calls().front().ignoredSignals, Not(Contains(SIGTERM)));
   EXPECT_THAT(stub.Calls().front().blockedSignals, SizeIs(0));
 }
 
@@ -104,14 +100,14 @@ TEST_F(HandOverToChild, IgnoresNoMoreSignalsThanIt) {
   for (const auto& action : {SIG_DFL, SIG_IGN}) {
     ProgramOptions options = Recorded();
     options.beforeExec = {SetSignals({SIGPIPE, SIGXFSZ}, action)};
-    RunProgram(ConvertThumbPath(), arguments_, options);
+    RunConverter(arguments_, options);
     const std::vector<int> ignored = stub.Calls().back().ignoredSignals;
-    EXPECT_EQ(::testing::Value(ignored, ::testing::Contains(SIGPIPE)), action == SIG_IGN);
-    EXPECT_EQ(::testing::Value(ignored, ::testing::Contains(SIGXFSZ)), action == SIG_IGN);
+    EXPECT_EQ(Value(ignored, Contains(SIGPIPE)), action == SIG_IGN);
+    EXPECT_EQ(Value(ignored, Contains(SIGXFSZ)), action == SIG_IGN);
   }
 }
 
-TEST_F(HandOverToChild, LetsNothingOutliveIt) {
+TEST_F(HandOverToChild, KillsTheChildWhenItIsKilled) {
   const StubTool stub(kImageMagick);
   stub.Plan(EndlessWork());
   const Program program = Start();
@@ -121,16 +117,16 @@ TEST_F(HandOverToChild, LetsNothingOutliveIt) {
 
 TEST_F(HandOverToChild, FailsWhenTheProgramCannotRun) {
   RemoveTool(kImageMagick);
-  const ProgramResult result = RunProgram(ConvertThumbPath(), arguments_);
+  const ProgramResult result = RunConverter(arguments_);
   EXPECT_EQ(result.exitCode, 1);
   EXPECT_EQ(result.err, "convert-thumb: /usr/bin/convert-im6.q16: No such file or directory\n");
 }
 
-TEST_F(HandOverToChild, FailsWithAStatusWhenNobodyReadsTheReason) {
+TEST_F(HandOverToChild, FailsWithAStatusWhenStandardErrorIsBroken) {
   RemoveTool(kImageMagick);
   ProgramOptions options;
   options.beforeExec = {SetSignals({SIGPIPE}, SIG_DFL), BreakErrorPipe()};
-  EXPECT_EQ(RunProgram(ConvertThumbPath(), arguments_, options).exitCode, 1);
+  EXPECT_EQ(RunConverter(arguments_, options).exitCode, 1);
 }
 
 }  // namespace

@@ -1,25 +1,20 @@
-// Outputs of command lines that ImageMagick gets: they arrive in the file that was named.
+// Outputs of command lines for ImageMagick: they are written to the named file.
 
-#include <gmock/gmock.h>
-#include <gtest/gtest.h>
 #include <sys/stat.h>
 
 #include "converter_fixture.h"
-#include "support/files.h"
-#include "support/image_checks.h"
-#include "support/images.h"
 
 namespace vela_test {
 namespace {
 
-/// Names that ImageMagick can take for more than names.
+/// Names with a special meaning to ImageMagick.
 constexpr const char* kOddNames[] = {"@a.jpg",   "png:a.jpg", "-a.jpg",   "a:b.jpg",  "|a.jpg",
                                      "a[0].jpg", "a[1].jpg",  "a*.jpg",   "a?.jpg",   "{a,b}.jpg",
                                      "a\nb.jpg", "~a.jpg",    "a\\n.jpg", "&lt;.jpg", " a.jpg"};
 
 class HandOverOutputs : public ConverterTest {
  protected:
-  /// Of a kind that only ImageMagick reads.
+  /// A source in a format that only ImageMagick reads.
   std::string MakeSource() const { return MakeImage(directory_ + "/source.bmp", 300, 200); }
 
   /// Files that patterns among the names above would match.
@@ -39,7 +34,7 @@ class HandOverOutputs : public ConverterTest {
   void ExpectWritten(const CommandLine& line, const std::string& name) const {
     ProgramOptions options;
     options.workingDirectory = directory_;
-    const ProgramResult result = RunProgram(ConvertThumbPath(), line.Arguments(), options);
+    const ProgramResult result = RunConverter(line.Arguments(), options);
     EXPECT_EQ(result.exitCode, 0) << name << ": " << result.err;
     const std::string path = directory_ + "/" + name;
     EXPECT_TRUE(Exists(path)) << name;
@@ -50,7 +45,7 @@ class HandOverOutputs : public ConverterTest {
   }
 };
 
-TEST_F(HandOverOutputs, ArriveUnderTheirNamesInTheDirectoryAtHand) {
+TEST_F(HandOverOutputs, HaveTheirNamesInTheWorkingDirectory) {
   const std::string source = MakeSource();
   MakeNeighbours();
   for (const std::string name : kOddNames) {
@@ -59,7 +54,7 @@ TEST_F(HandOverOutputs, ArriveUnderTheirNamesInTheDirectoryAtHand) {
   ExpectNeighboursUntouched();
 }
 
-TEST_F(HandOverOutputs, ArriveUnderTheirNamesElsewhere) {
+TEST_F(HandOverOutputs, HaveTheirNamesInOtherDirectories) {
   const std::string source = MakeSource();
   MakeNeighbours();
   for (const std::string name : kOddNames) {
@@ -70,7 +65,7 @@ TEST_F(HandOverOutputs, ArriveUnderTheirNamesElsewhere) {
   ExpectNeighboursUntouched();
 }
 
-TEST_F(HandOverOutputs, ArriveUnderTheirNamesWhenThereAreSeveral) {
+TEST_F(HandOverOutputs, HaveTheirNamesWhenThereAreSeveral) {
   const std::string source = MakeSource();
   MakeNeighbours();
   for (const std::string name : kOddNames) {
@@ -80,7 +75,7 @@ TEST_F(HandOverOutputs, ArriveUnderTheirNamesWhenThereAreSeveral) {
   ExpectNeighboursUntouched();
 }
 
-TEST_F(HandOverOutputs, ArriveInDirectoriesWithOddNames) {
+TEST_F(HandOverOutputs, CanBeInDirectoriesWithOddNames) {
   const std::string source = MakeSource();
   for (const std::string name : kOddNames) {
     MakeDirectories(directory_ + "/" + name);
@@ -94,7 +89,7 @@ TEST_F(HandOverOutputs, FailWithOneLineWhenTheNameIsTooLong) {
     name += "%%";
   }
   const CommandLine line = {MakeSource(), directory_, {{{}, name + ".jpg"}}};
-  const ProgramResult result = RunProgram(ConvertThumbPath(), line.Arguments());
+  const ProgramResult result = RunConverter(line.Arguments());
   EXPECT_EQ(result.exitCode, 1);
   EXPECT_EQ(result.err, "convert-thumb: name of an output too long for ImageMagick\n");
   EXPECT_EQ(ListDirectory(directory_), std::vector<std::string>{"source.bmp"});
@@ -106,7 +101,7 @@ TEST_F(HandOverOutputs, FailWithOneLineWhenTheyArePipes) {
   ProgramOptions options;
   options.timeLimit = std::chrono::seconds(20);
   const CommandLine line = {MakeSource(), directory_, {{{}, directory_ + "/pipe%%.jpg"}}};
-  const ProgramResult result = RunProgram(ConvertThumbPath(), line.Arguments(), options);
+  const ProgramResult result = RunConverter(line.Arguments(), options);
   EXPECT_EQ(result.exitCode, 1);
   EXPECT_EQ(result.err, "convert-thumb: " + pipe + ": not a regular file\n");
   EXPECT_TRUE(Exists(pipe));
@@ -116,9 +111,7 @@ TEST_F(HandOverOutputs, KeepTheirMeaningWhereOnlyImageMagickUnderstandsTheLine) 
   const std::string source = MakeSource();
   ProgramOptions options;
   options.workingDirectory = directory_;
-  const ProgramResult result =
-      RunProgram(ConvertThumbPath(), {source + "[0]", "-negate", "png:o.jpg"}, options);
-  EXPECT_EQ(result.exitCode, 0) << result.err;
+  ExpectSuccess(RunConverter({source + "[0]", "-negate", "png:o.jpg"}, options));
   EXPECT_EQ(ReadFile(directory_ + "/o.jpg").substr(1, 3), "PNG");
 }
 

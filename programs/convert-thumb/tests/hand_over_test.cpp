@@ -1,7 +1,5 @@
-// What the converter leaves to ImageMagick, and how.
+// Command lines that the converter leaves to ImageMagick.
 
-#include <gmock/gmock.h>
-#include <gtest/gtest.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
@@ -9,18 +7,13 @@
 #include <memory>
 
 #include "converter_fixture.h"
-#include "support/files.h"
-#include "support/image_checks.h"
-#include "support/images.h"
 #include "support/stub_files.h"
 #include "support/stub_tool.h"
 
 namespace vela_test {
 namespace {
 
-using ::testing::ElementsAreArray;
-using ::testing::SizeIs;
-using ::testing::StartsWith;
+using namespace ::testing;
 
 constexpr char kLinkedImageMagick[] = "/usr/vela/lib/convert-thumb";
 
@@ -50,14 +43,17 @@ class HandOver : public ConverterTest {
     return calls.empty() ? std::vector<std::string>() : calls.front().Parameters();
   }
 
+  void ExpectHandedUnchanged(const std::vector<std::string>& arguments) const {
+    RunConverter(arguments, Recorded());
+    EXPECT_EQ(HandedParameters(), arguments);
+  }
+
   std::unique_ptr<StubTool> stub_;
 };
 
-TEST_F(HandOver, PassesUnknownArgumentsOnAsTheyAre) {
+TEST_F(HandOver, PassesUnknownArgumentsUnchanged) {
   InstallStub();
-  const std::vector<std::string> arguments = {"/a.jpg", "-blur", "0x1", "/b%d.png"};
-  RunProgram(ConvertThumbPath(), arguments, Recorded());
-  EXPECT_THAT(HandedParameters(), ElementsAreArray(arguments));
+  ExpectHandedUnchanged({"/a.jpg", "-blur", "0x1", "/b%d.png"});
 }
 
 TEST_F(HandOver, StaysTheSameProcessUnderTheSameName) {
@@ -78,37 +74,34 @@ TEST_F(HandOver, LeavesImageMagickItsSignals) {
   for (const auto& action : {SIG_DFL, SIG_IGN}) {
     ProgramOptions options = Recorded();
     options.beforeExec = {SetSignals({SIGPIPE, SIGXFSZ}, action)};
-    RunProgram(ConvertThumbPath(), {"/a.jpg", "-blur", "0x1", "/b.png"}, options);
+    RunConverter({"/a.jpg", "-blur", "0x1", "/b.png"}, options);
     const std::vector<int> ignored = stub_->Calls().back().ignoredSignals;
-    EXPECT_EQ(::testing::Value(ignored, ::testing::Contains(SIGPIPE)), action == SIG_IGN);
-    EXPECT_EQ(::testing::Value(ignored, ::testing::Contains(SIGXFSZ)), action == SIG_IGN);
+    EXPECT_EQ(Value(ignored, Contains(SIGPIPE)), action == SIG_IGN);
+    EXPECT_EQ(Value(ignored, Contains(SIGXFSZ)), action == SIG_IGN);
   }
 }
 
-TEST_F(HandOver, PassesWhatNamesNoFileOnAsItIs) {
+TEST_F(HandOver, PassesSourcesThatAreNotFilesUnchanged) {
   InstallStub();
-  const std::vector<std::string> arguments = {"-size", "10x10", "gradient:red-blue", "/tmp/b.png"};
-  RunProgram(ConvertThumbPath(), arguments, Recorded());
-  EXPECT_THAT(HandedParameters(), ElementsAreArray(arguments));
+  ExpectHandedUnchanged({"-size", "10x10", "gradient:red-blue", "/tmp/b.png"});
 }
 
-TEST_F(HandOver, RefusesAPhotoOfAnOddNameThatIsGone) {
+TEST_F(HandOver, RefusesAMissingPhotoWithAnOddName) {
   InstallStub();
-  const ProgramResult result = RunProgram(ConvertThumbPath(), {"/tmp/*.png", "/tmp/o.png"});
+  const ProgramResult result = RunConverter({"/tmp/*.png", "/tmp/o.png"});
   EXPECT_EQ(result.exitCode, 1);
   EXPECT_THAT(result.err, StartsWith("convert-thumb: /tmp/*.png: "));
   EXPECT_THAT(stub_->Calls(), SizeIs(0));
 }
 
-TEST_F(HandOver, PassesOtherFormatsOn) {
+TEST_F(HandOver, PassesOtherFormats) {
   InstallStub();
   const std::string image = MakeImage(directory_ + "/a.bmp");
   const CommandLine line{image + "[0]", kStubDirectory, {{{}, directory_ + "/o.jpg"}}};
-  RunProgram(ConvertThumbPath(), line.Arguments(), Recorded());
-  EXPECT_THAT(HandedParameters(), ElementsAreArray(line.Arguments()));
+  ExpectHandedUnchanged(line.Arguments());
 }
 
-TEST_F(HandOver, PassesFourColourPhotosOnThatStaySo) {
+TEST_F(HandOver, PassesCmykPhotosThatAreNotConverted) {
   InstallStub();
   JpegRecipe recipe;
   recipe.colour = JpegColour::kCmyk;
@@ -116,20 +109,19 @@ TEST_F(HandOver, PassesFourColourPhotosOnThatStaySo) {
   ThumbOptions options;
   options.convertToSrgb = false;
   const CommandLine line{photo, "", {{options, directory_ + "/o.jpg"}}};
-  RunProgram(ConvertThumbPath(), line.Arguments(), Recorded());
-  EXPECT_THAT(HandedParameters(), ElementsAreArray(line.Arguments()));
+  ExpectHandedUnchanged(line.Arguments());
 }
 
-TEST_F(HandOver, PassesTheSourceOnOpenWhenItsNameWouldBeMisread) {
+TEST_F(HandOver, PassesADescriptorWhenTheSourcesNameWouldBeMisread) {
   InstallStub();
   const std::string source = directory_ + "/a[*]%d:.bmp";
   CopyFile(MakeImage(directory_ + "/a.bmp"), source);
   const CommandLine line{source + "[0]", kStubDirectory, {{{}, directory_ + "/o.jpg"}}};
-  RunProgram(ConvertThumbPath(), line.Arguments(), Recorded());
+  RunConverter(line.Arguments(), Recorded());
   const std::vector<std::string> handed = HandedParameters();
   ASSERT_THAT(handed, SizeIs(line.Arguments().size()));
   EXPECT_THAT(handed[2], StartsWith("/proc/self/fd/"));
-  EXPECT_THAT(handed[2], ::testing::EndsWith("[0]"));
+  EXPECT_THAT(handed[2], EndsWith("[0]"));
   bool isOpen = false;
   const StubCall call = stub_->Calls().front();
   for (const OpenDescriptor& descriptor : call.descriptors) {
@@ -138,11 +130,11 @@ TEST_F(HandOver, PassesTheSourceOnOpenWhenItsNameWouldBeMisread) {
   EXPECT_TRUE(isOpen);
 }
 
-TEST_F(HandOver, PassesNoOtherDescriptorOn) {
+TEST_F(HandOver, PassesNoOtherDescriptor) {
   InstallStub();
   const std::string image = MakeImage(directory_ + "/a.bmp");
   const CommandLine line{image, "", {{{}, directory_ + "/o.jpg"}}};
-  RunProgram(ConvertThumbPath(), line.Arguments(), Recorded());
+  RunConverter(line.Arguments(), Recorded());
   ASSERT_THAT(stub_->Calls(), SizeIs(1));
   const StubCall call = stub_->Calls().front();
   for (const OpenDescriptor& descriptor : call.descriptors) {
@@ -150,9 +142,9 @@ TEST_F(HandOver, PassesNoOtherDescriptorOn) {
   }
 }
 
-TEST_F(HandOver, FailsWhenThereIsNoImageMagick) {
+TEST_F(HandOver, FailsWithoutImageMagick) {
   RemoveTool(kImageMagick);
-  const ProgramResult result = RunProgram(ConvertThumbPath(), {"-version"});
+  const ProgramResult result = RunConverter({"-version"});
   EXPECT_EQ(result.exitCode, 1);
   EXPECT_THAT(result.err, StartsWith("convert-thumb: "));
 }
@@ -163,7 +155,7 @@ TEST_F(HandOver, ImageMagickReadsSourcesWithOddNames) {
     const std::string source = directory_ + "/" + name;
     CopyFile(MakeImage(directory_ + "/plain.png", 300, 200), source);
     const CommandLine line{source + "[0]", directory_, {{{}, directory_ + "/o.jpg"}}};
-    const ProgramResult result = RunProgram(ConvertThumbPath(), line.Arguments());
+    const ProgramResult result = RunConverter(line.Arguments());
     EXPECT_EQ(result.exitCode, 0) << name << result.err;
     EXPECT_EQ(QuadrantLetters(directory_ + "/o.jpg"), "RGBY") << name;
     RemoveTree(directory_ + "/o.jpg");
@@ -173,7 +165,7 @@ TEST_F(HandOver, ImageMagickReadsSourcesWithOddNames) {
 TEST_F(HandOver, ImageMagickIsFoundWithoutItsLink) {
   const std::string image = MakeImage(directory_ + "/a.png", 300, 200);
   const CommandLine line{image, "", {{{}, directory_ + "/o.jpg"}}};
-  EXPECT_EQ(RunProgram(ConvertThumbPath(), line.Arguments()).exitCode, 0);
+  EXPECT_EQ(RunConverter(line.Arguments()).exitCode, 0);
   EXPECT_EQ(QuadrantLetters(directory_ + "/o.jpg"), "RGBY");
 }
 
@@ -182,7 +174,7 @@ TEST_F(HandOver, TurnsAPhotoInPlace) {
   for (const char* name : {"plain.jpg", "odd[1]*.jpg"}) {
     const std::string photo = directory_ + "/" + name;
     MakeJpeg(photo);
-    const ProgramResult result = RunProgram(ConvertThumbPath(), {"-rotate", "90", photo, photo});
+    const ProgramResult result = RunConverter({"-rotate", "90", photo, photo});
     EXPECT_EQ(result.exitCode, 0) << name << result.err;
     EXPECT_EQ(QuadrantLetters(photo), LettersAfterTurn(90)) << name;
   }

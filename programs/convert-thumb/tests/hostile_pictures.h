@@ -7,7 +7,7 @@
 
 namespace vela_test {
 
-/// Files of these formats whose header claims a size, in pixels, with next to no data behind it.
+/// Files of these formats whose header claims a size, in pixels, followed by almost no data.
 /// JPEG and GIF hold sides of up to 65,535 pixels.
 std::string ClaimingJpeg(uint32_t width, uint32_t height);
 std::string ClaimingPng(uint32_t width, uint32_t height);

@@ -1,4 +1,4 @@
-// Encoded pictures, read back.
+// Encoded pictures, decoded again.
 
 #include "encoding/jpeg_writer.h"
 
@@ -96,7 +96,7 @@ TEST(JpegEncoding, KeepsThePhotosSampling) {
   EXPECT_EQ(encoded.Traits().sampling[1].horizontal, 1);
 }
 
-TEST(JpegEncoding, LeavesSamplingAloneThatItCannotHave) {
+TEST(JpegEncoding, IgnoresUnsupportedSampling) {
   // 16 and 4 and 4 blocks are more than one unit may have.
   const Picture picture = TwoHalves({60, 80, 60}, {200, 20, 200});
   Encoded fine(picture, ColourSampled(4, 2), 90);
@@ -106,13 +106,13 @@ TEST(JpegEncoding, LeavesSamplingAloneThatItCannotHave) {
   EXPECT_EQ(coarse.Traits().sampling[1].horizontal, 1);
 }
 
-TEST(JpegEncoding, TellsWhyItFails) {
+TEST(JpegEncoding, ReportsWhyItFails) {
   const EncodedJpeg jpeg = EncodeJpeg(Picture(65501, 1, 3), PhotoTraits(), 80, false);
   EXPECT_FALSE(jpeg.IsComplete());
   EXPECT_NE(jpeg.error.find("65500"), std::string::npos) << jpeg.error;
 }
 
-TEST(JpegEncoding, SeesTheFaintestColour) {
+TEST(JpegEncoding, DetectsTheFaintestColour) {
   Picture picture = TwoHalves({60, 60, 60}, {60, 60, 60});
   picture.Row(kHeight - 1)[0] += 1;
   EXPECT_EQ(Encoded(picture).Channels(), 3);

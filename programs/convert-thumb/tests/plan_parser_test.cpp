@@ -73,7 +73,7 @@ TEST(PlanParser, KeepsTheOrderOfTheOptions) {
   EXPECT_EQ(output.steps[4].kind, Step::Kind::kConvertToSrgb);
 }
 
-TEST(PlanParser, TakesThePageSelectionOffTheSource) {
+TEST(PlanParser, RemovesThePageSelectionFromTheSource) {
   const auto plan =
       ParseConversion(CommandLine{"/a/x[1]*?.tif[0]", "", {{{}, "/o.jpg"}}}.Arguments());
   ASSERT_TRUE(plan);
@@ -89,13 +89,13 @@ TEST(PlanParser, RefusesALineWithAnythingMissing) {
   for (size_t i = 0; i < whole.size(); ++i) {
     std::vector<std::string> less = whole;
     less.erase(less.begin() + static_cast<std::ptrdiff_t>(i));
-    // Turning upright is the only argument of this line that stands for itself alone.
+    // Only this argument of the line is optional by itself.
     EXPECT_EQ(ParseConversion(less).has_value(), whole[i] == "-auto-orient")
         << i << " " << whole[i];
   }
 }
 
-TEST(PlanParser, RefusesALineThatIsCut) {
+TEST(PlanParser, RefusesATruncatedLine) {
   const CommandLine line{"/p.jpg", "/scratch", {{{}, "/1.jpg"}, {{}, "/2.jpg"}, {{}, "/3.jpg"}}};
   std::vector<std::string> cut = line.Arguments();
   while (!cut.empty()) {
@@ -104,7 +104,7 @@ TEST(PlanParser, RefusesALineThatIsCut) {
   }
 }
 
-TEST(PlanParser, RefusesWhatItDoesNotKnow) {
+TEST(PlanParser, RefusesUnknownOptions) {
   const std::vector<std::string> begin = {"/p.jpg", "-thumbnail", "10x10>", "-quality", "80"};
   const std::vector<std::vector<std::string>> unknown = {{"-blur", "0x1"},
                                                          {"-colorspace", "Gray"},

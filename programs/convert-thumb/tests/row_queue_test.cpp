@@ -1,4 +1,4 @@
-// Rows that are passed on by a thread of their own.
+// Rows that a second thread passes on.
 
 #include "picture/row_queue.h"
 
@@ -56,14 +56,14 @@ TEST(RowQueues, PassEveryRowOnInOrder) {
   }
 }
 
-TEST(RowQueues, TellOfARefusedRow) {
+TEST(RowQueues, ReportARefusedRow) {
   FirstSamples sink(20);
   RowQueue queue(5, sink);
   EXPECT_FALSE(PutRows(queue, 500) && queue.Finish());
   EXPECT_EQ(sink.samples.size(), 20U);
 }
 
-TEST(RowQueues, TellOfARefusedLastRow) {
+TEST(RowQueues, ReportARefusedLastRow) {
   FirstSamples sink(20);
   RowQueue queue(5, sink);
   EXPECT_FALSE(PutRows(queue, 21) && queue.Finish());
@@ -74,7 +74,7 @@ class NoMemory final : public RowSink {
   bool Put(const float*) override { throw std::bad_alloc(); }
 };
 
-TEST(RowQueues, TellOfExceptions) {
+TEST(RowQueues, ReportExceptions) {
   NoMemory sink;
   RowQueue queue(5, sink);
   // With one processor the exception comes out of Put.

@@ -1,4 +1,4 @@
-// Rows that are decoded by a thread of their own.
+// Rows that a second thread decodes.
 
 #include "decoding/rows_ahead.h"
 

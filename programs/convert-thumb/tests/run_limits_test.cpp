@@ -1,7 +1,6 @@
-// The limits of a run, and how it ends when it meets them.
+// The limits of a run, and how it ends when it reaches them.
 
 #include <fcntl.h>
-#include <gtest/gtest.h>
 #include <sys/resource.h>
 #include <sys/stat.h>
 #include <sys/wait.h>
@@ -19,8 +18,6 @@
 #include "process/output_file.h"
 #include "process/resource_limits.h"
 #include "process/unfinished_outputs.h"
-#include "support/files.h"
-#include "support/images.h"
 #include "support/stub_files.h"
 #include "support/stub_tool.h"
 
@@ -28,6 +25,8 @@ using namespace vela;
 
 namespace vela_test {
 namespace {
+
+using namespace ::testing;
 
 constexpr size_t kMebibyte = size_t{1} << 20;
 
@@ -50,10 +49,6 @@ rlimit LimitOf(int resource) {
 
 class RunLimits : public ConverterTest {};
 
-void SetMemoryLimit(const std::string& text) {
-  WriteFile("/etc/velainfo.conf", "convert_memory_limit=\"" + text + "\"\n");
-}
-
 TEST_F(RunLimits, AreReadFromTheSystemSettings) {
   SetMemoryLimit("100000000");
   EXPECT_EQ(ConversionMemoryLimit(), 100000000U);
@@ -73,7 +68,7 @@ TEST_F(RunLimits, HaveADefault) {
   EXPECT_EQ(::testing::internal::GetCapturedStderr(), "");
 }
 
-TEST_F(RunLimits, AreToldOfWhenTheyMakeNoSense) {
+TEST_F(RunLimits, AreReportedWhenInvalid) {
   for (const char* text : {"0", "0M", "-1", "many", "M", "1e9", "512MiB", "512 M", "1.5G", "10T",
                            "99999999999999999999", "99999999999G"}) {
     SetMemoryLimit(text);
@@ -164,21 +159,14 @@ TEST_F(RunLimits, EndCleanly) {
 }
 
 TEST_F(RunLimits, LeaveNoOutputsOfAFailedRun) {
-  const std::string photo = MakePhoto("a.jpg", 700, 500);
-  CommandLine line = Line(photo, UsualOutputs(), "ours");
+  ProgramOptions withoutReader;
+  withoutReader.beforeExec = {SetSignals({SIGPIPE}, SIG_DFL), BreakErrorPipe()};
+  CommandLine line = Line(MakePhoto("a.jpg", 700, 500), UsualOutputs(), "ours");
   line.outputs.back().path = directory_ + "/missing/a.jpg";
-  EXPECT_EQ(RunProgram(ConvertThumbPath(), line.Arguments()).exitCode, 1);
-  EXPECT_EQ(ListDirectory(directory_), std::vector<std::string>{"a.jpg"});
-}
-
-TEST_F(RunLimits, LeaveNoOutputsWhenNobodyReadsTheReason) {
-  const std::string photo = MakePhoto("a.jpg", 700, 500);
-  CommandLine line = Line(photo, UsualOutputs(), "ours");
-  line.outputs.back().path = directory_ + "/missing/a.jpg";
-  ProgramOptions options;
-  options.beforeExec = {SetSignals({SIGPIPE}, SIG_DFL), BreakErrorPipe()};
-  EXPECT_EQ(RunProgram(ConvertThumbPath(), line.Arguments(), options).exitCode, 1);
-  EXPECT_EQ(ListDirectory(directory_), std::vector<std::string>{"a.jpg"});
+  for (const ProgramOptions& options : {ProgramOptions(), withoutReader}) {
+    EXPECT_EQ(RunConverter(line.Arguments(), options).exitCode, 1);
+    EXPECT_EQ(ListDirectory(directory_), std::vector<std::string>{"a.jpg"});
+  }
 }
 
 TEST_F(RunLimits, LeaveNoOutputsBeyondTheLargestFile) {
@@ -186,13 +174,12 @@ TEST_F(RunLimits, LeaveNoOutputsBeyondTheLargestFile) {
   ProgramOptions options;
   // The smallest thumbnail fits.
   options.beforeExec = {SetSignals({SIGXFSZ}, SIG_DFL), LimitResource(RLIMIT_FSIZE, 20000)};
-  const CommandLine line = Line(photo, UsualOutputs(), "ours");
-  const ProgramResult result = RunProgram(ConvertThumbPath(), line.Arguments(), options);
+  const ProgramResult result = Convert(photo, UsualOutputs(), options);
   EXPECT_EQ(result.exitCode, 1);
   EXPECT_EQ(ListDirectory(directory_), std::vector<std::string>{"a.jpg"});
 }
 
-TEST_F(RunLimits, LetNoOutputBeginOnceTheRunIsEnding) {
+TEST_F(RunLimits, LetNoOutputStartOnceTheRunIsEnding) {
   const std::string path = directory_ + "/late.jpg";
   const unsigned char byte = 0;
   EXPECT_EQ(StatusOf([&] {
@@ -203,7 +190,7 @@ TEST_F(RunLimits, LetNoOutputBeginOnceTheRunIsEnding) {
   EXPECT_FALSE(Exists(path));
 }
 
-TEST_F(RunLimits, RemoveNothingThatIsNotTheRuns) {
+TEST_F(RunLimits, RemoveOnlyFilesOfTheRun) {
   const std::string forgotten = directory_ + "/forgotten.jpg";
   WriteFile(forgotten, "content");
   const std::string pipe = directory_ + "/pipe.jpg";
@@ -223,17 +210,17 @@ TEST_F(RunLimits, RemoveNothingThatIsNotTheRuns) {
             (std::vector<std::string>{"device.jpg", "forgotten.jpg", "pipe.jpg"}));
 }
 
-TEST_F(RunLimits, DoNotLetAPipeHoldTheRun) {
+TEST_F(RunLimits, DoNotLetAPipeBlockTheRun) {
   const std::string photo = MakePhoto("a.jpg", 300, 200);
   const CommandLine line = Line(photo, {ThumbOptions()}, "pipe");
   const std::string pipe = line.outputs.front().path;
   ASSERT_EQ(mkfifo(pipe.c_str(), 0600), 0);
   ProgramOptions options;
   options.timeLimit = std::chrono::seconds(20);
-  EXPECT_EQ(RunProgram(ConvertThumbPath(), line.Arguments(), options).exitCode, 1);
+  EXPECT_EQ(RunConverter(line.Arguments(), options).exitCode, 1);
   const FileDescriptor reader(open(pipe.c_str(), O_RDONLY | O_NONBLOCK | O_CLOEXEC));
   ASSERT_TRUE(reader.IsOpen());
-  const ProgramResult result = RunProgram(ConvertThumbPath(), line.Arguments(), options);
+  const ProgramResult result = RunConverter(line.Arguments(), options);
   EXPECT_EQ(result.exitCode, 1);
   EXPECT_EQ(result.err, "convert-thumb: cannot write " + pipe + "\n");
   EXPECT_TRUE(Exists(pipe));
@@ -244,44 +231,43 @@ TEST_F(RunLimits, LetOutputsGoToADevice) {
   const CommandLine line = Line(photo, {ThumbOptions()}, "device");
   const std::string device = line.outputs.front().path;
   ASSERT_EQ(symlink("/dev/null", device.c_str()), 0);
-  const ProgramResult result = RunProgram(ConvertThumbPath(), line.Arguments());
-  EXPECT_EQ(result.exitCode, 0) << result.err;
+  ExpectSuccess(RunConverter(line.Arguments()));
   EXPECT_TRUE(Exists(device));
 }
 
 class ImageMagickLimits : public ConverterTest {
  protected:
-  /// What ImageMagick's environment says when the converter's says `given`.
+  /// ImageMagick's environment when the converter's has `given`.
   static std::string Environment(const std::vector<std::string>& given) {
     const StubTool stub(kImageMagick);
     stub.Plan(StubPlan().Run("/usr/bin/env", {}));
     ProgramOptions options;
     options.addedEnvironment = given;
     options.addedEnvironment.push_back(std::string("TMPDIR=") + kStubDirectory);
-    return RunProgram(ConvertThumbPath(), {"/a.jpg", "-negate", "/tmp/b.png"}, options).out;
+    return RunConverter({"/a.jpg", "-negate", "/tmp/b.png"}, options).out;
   }
 
-  static bool Says(const std::string& environment, const std::string& line) {
+  static bool HasLine(const std::string& environment, const std::string& line) {
     return ("\n" + environment).find("\n" + line + "\n") != std::string::npos;
   }
 };
 
 TEST_F(ImageMagickLimits, FollowTheMemoryLimit) {
   const std::string usual = Environment({});
-  EXPECT_TRUE(Says(usual, "MAGICK_MEMORY_LIMIT=268435456")) << usual;
-  EXPECT_TRUE(Says(usual, "MAGICK_MAP_LIMIT=536870912")) << usual;
-  WriteFile("/etc/velainfo.conf", "convert_memory_limit=\"100000000\"\n");
-  EXPECT_TRUE(Says(Environment({}), "MAGICK_MEMORY_LIMIT=50000000"));
+  EXPECT_TRUE(HasLine(usual, "MAGICK_MEMORY_LIMIT=268435456")) << usual;
+  EXPECT_TRUE(HasLine(usual, "MAGICK_MAP_LIMIT=536870912")) << usual;
+  SetMemoryLimit("100000000");
+  EXPECT_TRUE(HasLine(Environment({}), "MAGICK_MEMORY_LIMIT=50000000"));
 }
 
 TEST_F(ImageMagickLimits, StayWhenTheyAreLower) {
   for (const char* low : {"64MiB", "64MB", "1000", "200m", "0.1GiB", "0"}) {
     const std::string line = std::string("MAGICK_MEMORY_LIMIT=") + low;
-    EXPECT_TRUE(Says(Environment({line}), line)) << low;
+    EXPECT_TRUE(HasLine(Environment({line}), line)) << low;
   }
   for (const char* high : {"1GiB", "1TB", "unlimited", "", "-1", "268435457", "300MB"}) {
     const std::string line = std::string("MAGICK_MEMORY_LIMIT=") + high;
-    EXPECT_TRUE(Says(Environment({line}), "MAGICK_MEMORY_LIMIT=268435456")) << high;
+    EXPECT_TRUE(HasLine(Environment({line}), "MAGICK_MEMORY_LIMIT=268435456")) << high;
   }
 }
 

@@ -1,7 +1,5 @@
-// Turning a JPEG where it is, without decoding it.
+// Turning a JPEG in place, without decoding it.
 
-#include <gmock/gmock.h>
-#include <gtest/gtest.h>
 #include <sys/stat.h>
 #include <sys/xattr.h>
 #include <unistd.h>
@@ -10,9 +8,6 @@
 #include <cstdint>
 
 #include "converter_fixture.h"
-#include "support/files.h"
-#include "support/image_checks.h"
-#include "support/images.h"
 #include "support/missing_library.h"
 #include "support/mounts.h"
 #include "support/stub_files.h"
@@ -21,9 +16,7 @@
 namespace vela_test {
 namespace {
 
-using ::testing::ElementsAre;
-using ::testing::SizeIs;
-using ::testing::StartsWith;
+using namespace ::testing;
 
 struct stat StatusOf(const std::string& path) {
   struct stat status {};
@@ -58,16 +51,22 @@ class TurnInPlace : public ConverterTest {
  protected:
   const std::string photo_ = directory_ + "/photo.jpg";
 
-  static ProgramResult Turn(const std::string& degrees, const std::string& path) {
-    return RunProgram(ConvertThumbPath(), {"-rotate", degrees, path, path});
+  /// Turns photo_ by 90 degrees; the picture in `path`, the photo or its link target, is turned.
+  void ExpectTurned(const std::string& path) const {
+    ExpectSuccess(Turn("90", photo_));
+    EXPECT_EQ(QuadrantLetters(path), LettersAfterTurn(90));
   }
 
-  /// Any turn that is not done here fails.
-  static void TakeImageMagickAway() { RemoveTool(kImageMagick); }
+  static ProgramResult Turn(const std::string& degrees, const std::string& path) {
+    return RunConverter({"-rotate", degrees, path, path});
+  }
+
+  /// Makes every turn fail that the converter does not do itself.
+  static void RemoveImageMagick() { RemoveTool(kImageMagick); }
 };
 
-TEST_F(TurnInPlace, IsDoneHere) {
-  TakeImageMagickAway();
+TEST_F(TurnInPlace, IsDoneByTheConverter) {
+  RemoveImageMagick();
   for (const int degrees : {90, 180, 270}) {
     MakeJpeg(photo_);
     const ProgramResult result = Turn(std::to_string(degrees), photo_);
@@ -79,7 +78,7 @@ TEST_F(TurnInPlace, IsDoneHere) {
 
 TEST_F(TurnInPlace, LosesNothing) {
   MakePhoto("photo.jpg", 320, 240);
-  TakeImageMagickAway();
+  RemoveImageMagick();
   const std::string original = directory_ + "/original.jpg";
   CopyFile(photo_, original);
   for (int turn = 0; turn < 4; ++turn) {
@@ -90,7 +89,7 @@ TEST_F(TurnInPlace, LosesNothing) {
 }
 
 TEST_F(TurnInPlace, KeepsMetadata) {
-  TakeImageMagickAway();
+  RemoveImageMagick();
   JpegRecipe recipe;
   recipe.orientation = 6;
   recipe.xmp = true;
@@ -110,21 +109,17 @@ TEST_F(TurnInPlace, KeepsThePermissions) {
   MakeJpeg(photo_);
   ASSERT_EQ(chmod(photo_.c_str(), 0640), 0);
   ASSERT_EQ(Turn("90", photo_).exitCode, 0);
-  struct stat status {};
-  ASSERT_EQ(stat(photo_.c_str(), &status), 0);
-  EXPECT_EQ(status.st_mode & 07777U, 0640U);
+  EXPECT_EQ(ModeOf(photo_), 0640);
 }
 
-TEST_F(TurnInPlace, KeepsPermissionsThatTheMaskWouldTake) {
-  TakeImageMagickAway();
+TEST_F(TurnInPlace, KeepsPermissionsThatTheUmaskWouldRemove) {
+  RemoveImageMagick();
   MakeJpeg(photo_);
   ASSERT_EQ(chmod(photo_.c_str(), 0666), 0);
   ProgramOptions options;
   options.umask = 077;
-  const ProgramResult result =
-      RunProgram(ConvertThumbPath(), {"-rotate", "90", photo_, photo_}, options);
-  EXPECT_EQ(result.exitCode, 0) << result.err;
-  EXPECT_EQ(StatusOf(photo_).st_mode & 07777U, 0666U);
+  ExpectSuccess(RunConverter({"-rotate", "90", photo_, photo_}, options));
+  EXPECT_EQ(ModeOf(photo_), 0666);
 }
 
 TEST_F(TurnInPlace, LeavesLinksToImageMagick) {
@@ -132,8 +127,7 @@ TEST_F(TurnInPlace, LeavesLinksToImageMagick) {
   MakeJpeg(elsewhere);
   ASSERT_EQ(symlink(elsewhere.c_str(), photo_.c_str()), 0);
   const ino_t inode = StatusOf(elsewhere).st_ino;
-  const ProgramResult result = Turn("90", photo_);
-  EXPECT_EQ(result.exitCode, 0) << result.err;
+  ExpectSuccess(Turn("90", photo_));
   struct stat status {};
   ASSERT_EQ(lstat(photo_.c_str(), &status), 0);
   EXPECT_TRUE(S_ISLNK(status.st_mode));
@@ -145,46 +139,38 @@ TEST_F(TurnInPlace, LeavesFilesOfSeveralNamesToImageMagick) {
   const std::string other = directory_ + "/other.jpg";
   MakeJpeg(photo_);
   ASSERT_EQ(link(photo_.c_str(), other.c_str()), 0);
-  const ProgramResult result = Turn("90", photo_);
-  EXPECT_EQ(result.exitCode, 0) << result.err;
+  ExpectTurned(other);
   EXPECT_EQ(StatusOf(photo_).st_ino, StatusOf(other).st_ino);
-  EXPECT_EQ(QuadrantLetters(other), LettersAfterTurn(90));
 }
 
 TEST_F(TurnInPlace, LeavesFilesWithAccessListsToImageMagick) {
   MakeJpeg(photo_);
   SetAccessList(photo_, "access");
-  const ProgramResult result = Turn("90", photo_);
-  EXPECT_EQ(result.exitCode, 0) << result.err;
+  ExpectTurned(photo_);
   EXPECT_GT(getxattr(photo_.c_str(), "system.posix_acl_access", nullptr, 0), 0);
-  EXPECT_EQ(QuadrantLetters(photo_), LettersAfterTurn(90));
 }
 
-TEST_F(TurnInPlace, LeavesFilesThatNewOnesWouldNotBeLikeToImageMagick) {
+TEST_F(TurnInPlace, LeavesFilesInDirectoriesWithDefaultAccessListsToImageMagick) {
   MakeJpeg(photo_);
   SetAccessList(directory_, "default");
-  const ProgramResult result = Turn("90", photo_);
-  EXPECT_EQ(result.exitCode, 0) << result.err;
+  ExpectTurned(photo_);
   EXPECT_LE(getxattr(photo_.c_str(), "system.posix_acl_access", nullptr, 0), 0);
-  EXPECT_EQ(QuadrantLetters(photo_), LettersAfterTurn(90));
   EXPECT_THAT(ListDirectory(directory_), ElementsAre("photo.jpg"));
 }
 
-TEST_F(TurnInPlace, LeavesFilesOfOthersToImageMagick) {
+TEST_F(TurnInPlace, LeavesFilesOfOtherUsersToImageMagick) {
   MakeJpeg(photo_);
-  // An ordinary user's sandbox has no others.
+  // The sandbox of an ordinary user has no other users.
   const bool isOthers = chown(photo_.c_str(), 1, 1) == 0;
   const ino_t inode = StatusOf(photo_).st_ino;
-  const ProgramResult result = Turn("90", photo_);
-  EXPECT_EQ(result.exitCode, 0) << result.err;
+  ExpectTurned(photo_);
   EXPECT_EQ(StatusOf(photo_).st_ino == inode, isOthers);
   EXPECT_EQ(StatusOf(photo_).st_uid, isOthers ? 1U : geteuid());
   EXPECT_EQ(StatusOf(photo_).st_gid, isOthers ? 1U : getegid());
-  EXPECT_EQ(QuadrantLetters(photo_), LettersAfterTurn(90));
 }
 
-TEST_F(TurnInPlace, TakesAnyName) {
-  TakeImageMagickAway();
+TEST_F(TurnInPlace, AcceptsAnyName) {
+  RemoveImageMagick();
   for (const char* name : {"a b.jpg", "%d.jpg", "100%.jpg", "odd[1]*.jpg", "new\nline.jpg",
                            "\xFF.jpg", "png:x.jpg", "-x.jpg", "picture"}) {
     const std::string path = directory_ + "/" + name;
@@ -199,9 +185,7 @@ TEST_F(TurnInPlace, LeavesPicturesThatEndWithinABlockToImageMagick) {
   recipe.width = 70;
   recipe.height = 50;
   MakeJpeg(photo_, recipe);
-  const ProgramResult result = Turn("90", photo_);
-  EXPECT_EQ(result.exitCode, 0) << result.err;
-  EXPECT_EQ(QuadrantLetters(photo_), LettersAfterTurn(90));
+  ExpectTurned(photo_);
   EXPECT_EQ(DecodeJpeg(photo_)->Width(), 50);
   EXPECT_EQ(DecodeJpeg(photo_)->Height(), 70);
 }
@@ -211,7 +195,7 @@ TEST_F(TurnInPlace, LeavesOtherRequestsToImageMagick) {
   const StubTool imageMagick("/usr/vela/lib/convert-thumb");
   MakeJpeg(photo_);
   const std::string png = MakeImage(directory_ + "/a.png");
-  // Where the stub records its calls, it has to be able to write.
+  // The stub has to be able to write its records.
   ProgramOptions options;
   options.addedEnvironment = {std::string("TMPDIR=") + kStubDirectory};
   const std::vector<std::vector<std::string>> requests = {{"-rotate", "0", photo_, photo_},
@@ -219,13 +203,13 @@ TEST_F(TurnInPlace, LeavesOtherRequestsToImageMagick) {
                                                           {"-rotate", "90", png, png},
                                                           {"-rotate", "90", photo_, png}};
   for (const std::vector<std::string>& request : requests) {
-    RunProgram(ConvertThumbPath(), request, options);
+    RunConverter(request, options);
   }
   EXPECT_THAT(imageMagick.Calls(), SizeIs(4));
 }
 
 TEST_F(TurnInPlace, LeavesDamagedFilesToImageMagick) {
-  TakeImageMagickAway();
+  RemoveImageMagick();
   MakeTruncatedJpeg(photo_);
   const std::string before = ReadFile(photo_);
   EXPECT_EQ(Turn("90", photo_).exitCode, 1);
@@ -235,15 +219,13 @@ TEST_F(TurnInPlace, LeavesDamagedFilesToImageMagick) {
 TEST_F(TurnInPlace, IsImageMagicksWithoutTheLibrary) {
   const MissingLibrary missing("libturbojpeg");
   MakeJpeg(photo_);
-  const ProgramResult result = Turn("90", photo_);
-  EXPECT_EQ(result.exitCode, 0) << result.err;
-  EXPECT_EQ(QuadrantLetters(photo_), LettersAfterTurn(90));
+  ExpectTurned(photo_);
 }
 
 TEST_F(TurnInPlace, LeavesLargePicturesToImageMagick) {
-  WriteFile("/etc/velainfo.conf", "convert_memory_limit=\"1000000\"\n");
+  SetMemoryLimit("1000000");
   MakePhoto("photo.jpg", 640, 480);
-  TakeImageMagickAway();
+  RemoveImageMagick();
   EXPECT_EQ(Turn("90", photo_).exitCode, 1);
 }
 
@@ -257,10 +239,10 @@ TEST_F(TurnInPlace, OnAFullVolumeNothingIsLost) {
   EXPECT_EQ(result.exitCode, 1);
   EXPECT_THAT(result.err, StartsWith("convert-thumb: cannot replace " + photo_ + ": "));
   EXPECT_EQ(ReadFile(photo_), before);
-  EXPECT_THAT(ListDirectory(directory_), ::testing::Not(::testing::Contains(StartsWith("VELA"))));
+  EXPECT_THAT(ListDirectory(directory_), Not(Contains(StartsWith("VELA"))));
 }
 
-TEST_F(TurnInPlace, IsNotStoppedByWhatAKilledOneLeft) {
+TEST_F(TurnInPlace, IgnoresTheFileOfAKilledRun) {
   MakeJpeg(photo_);
   Program program = StartProgram(
       "/bin/sh", {"-c", "touch \"$1/VELAPHOTO.tmp.$$\"; exec \"$0\" -rotate 90 \"$2\" \"$2\"",

@@ -1,12 +1,4 @@
-// Requests that are wrong.
-#include <gmock/gmock.h>
-#include <sys/socket.h>
-
-#include <csignal>
-#include <string>
-#include <utility>
-#include <vector>
-
+// Invalid requests.
 #include "index_daemon.h"
 #include "request.h"
 
@@ -15,11 +7,20 @@ using namespace vela;
 namespace vela_test {
 namespace {
 
-class BadRequestTest : public IndexDaemonTest {};
+using namespace ::testing;
 
-/// Requests that are wrong, each with what is to be told about it.
+using BadRequestTest = IndexDaemonTest;
+
+/// Invalid requests, each with the error it gets.
 std::vector<std::pair<std::string, std::string>> BadRequests() {
   const std::string notJson = "the request is not one JSON object";
+  const std::string noVersion = "version is neither an integer from 0 to 2147483647 nor null";
+  const auto version = [](const std::string& value) {
+    return R"({"command":"SET_INDEX_VERSION","path":"/a","version":)" + value + "}";
+  };
+  const auto mediaType = [](const std::string& value) {
+    return R"({"command":"GET_MEDIA_FROM_PLUGIN_DB","path":"/a.jpg","type":)" + value + "}";
+  };
   std::string deep(60000, '[');
   return {
       {"", notJson},
@@ -37,13 +38,13 @@ std::vector<std::pair<std::string, std::string>> BadRequests() {
       {R"({"command":"GET_INDEX_VERSION","path":"/a"} // x)", notJson},
       {R"({"command":"GET_INDEX_VERSION","path":"/a",})", notJson},
       {R"({"command":"GET_INDEX_VERSION","path":"/a","path":"/b"})", notJson},
-      {R"({"command":"SET_INDEX_VERSION","path":"/a","version":-})", notJson},
-      {R"({"command":"SET_INDEX_VERSION","path":"/a","version":01})", notJson},
-      {R"({"command":"SET_INDEX_VERSION","path":"/a","version":+1})", notJson},
-      {R"({"command":"SET_INDEX_VERSION","path":"/a","version":1.})", notJson},
-      {R"({"command":"SET_INDEX_VERSION","path":"/a","version":1e})", notJson},
-      {R"({"command":"SET_INDEX_VERSION","path":"/a","version":0x1})", notJson},
-      {R"({"command":"SET_INDEX_VERSION","path":"/a","version":NaN})", notJson},
+      {version("-"), notJson},
+      {version("01"), notJson},
+      {version("+1"), notJson},
+      {version("1."), notJson},
+      {version("1e"), notJson},
+      {version("0x1"), notJson},
+      {version("NaN"), notJson},
       {"\xef\xbb\xbf{\"command\":\"GET_INDEX_VERSION\",\"path\":\"/a\"}", notJson},
       {deep, notJson},
       {"{\"command\":" + deep, notJson},
@@ -69,28 +70,20 @@ std::vector<std::pair<std::string, std::string>> BadRequests() {
        "path is longer than 4095 bytes"},
       {R"({"command":"GET_MEDIA_FROM_PLUGIN_DB","type":1})", "the member path is missing"},
       {R"({"command":"GET_MEDIA_FROM_PLUGIN_DB","path":"/a.jpg"})", "the member type is missing"},
-      {R"({"command":"GET_MEDIA_FROM_PLUGIN_DB","path":"/a.jpg","type":"1"})",
-       "type is not an integer"},
-      {R"({"command":"GET_MEDIA_FROM_PLUGIN_DB","path":"/a.jpg","type":1.0})",
-       "type is not an integer"},
-      {R"({"command":"GET_MEDIA_FROM_PLUGIN_DB","path":"/a.jpg","type":true})",
-       "type is not an integer"},
-      {R"({"command":"GET_MEDIA_FROM_PLUGIN_DB","path":"/a.jpg","type":99999999999})",
-       "type is not an integer"},
+      {mediaType(R"("1")"), "type is no integer"},
+      {mediaType("1.0"), "type is no integer"},
+      {mediaType("true"), "type is no integer"},
+      {mediaType("99999999999"), "type is no integer"},
       {R"({"command":"SET_INDEX_VERSION","path":"/a"})", "the member version is missing"},
-      {R"({"command":"SET_INDEX_VERSION","path":"/a","version":"1"})",
-       "version is neither an integer from 0 to 2147483647 nor null"},
-      {R"({"command":"SET_INDEX_VERSION","path":"/a","version":-1})",
-       "version is neither an integer from 0 to 2147483647 nor null"},
-      {R"({"command":"SET_INDEX_VERSION","path":"/a","version":2147483648})",
-       "version is neither an integer from 0 to 2147483647 nor null"},
-      {R"({"command":"SET_INDEX_VERSION","path":"/a","version":false})",
-       "version is neither an integer from 0 to 2147483647 nor null"},
+      {version(R"("1")"), noVersion},
+      {version("-1"), noVersion},
+      {version("2147483648"), noVersion},
+      {version("false"), noVersion},
       {R"({"command":"SET_INDEX_VERSION","version":1})", "the member path is missing"},
   };
 }
 
-TEST_F(BadRequestTest, IsToldWhatIsWrongAndLeavesTheDaemonWell) {
+TEST_F(BadRequestTest, GetsAnErrorAndDoesNoHarm) {
   IndexDaemon daemon;
   for (const auto& [line, error] : BadRequests()) {
     const Json::Value reply = ParseReply(AskWithBytes(line));
@@ -98,14 +91,14 @@ TEST_F(BadRequestTest, IsToldWhatIsWrongAndLeavesTheDaemonWell) {
     EXPECT_EQ(reply["error"], error) << line.substr(0, 200);
   }
   EXPECT_EQ(AskForVersion("/a"), 0);
-  EXPECT_EQ(Query("SELECT count(*) FROM posted"), std::vector<std::string>{"0"});
-  EXPECT_EQ(Query("SELECT count(*) FROM directory_index_version"), std::vector<std::string>{"0"});
+  EXPECT_EQ(Query("SELECT count(*) FROM posted"), Rows{"0"});
+  EXPECT_EQ(Query("SELECT count(*) FROM directory_index_version"), Rows{"0"});
   EXPECT_EQ(daemon.End(SIGTERM).exitCode, 0);
 }
 
-TEST_F(BadRequestTest, LineMayHaveSixtyFourKibibytesAndNotOneMore) {
+TEST_F(BadRequestTest, LineMayHave64KibibytesAndNotOneMore) {
   const IndexDaemon daemon;
-  std::string line = R"({"command":"GET_INDEX_VERSION","path":"/a"})";
+  std::string line = kVersionRequest;
   line.resize(kRequestMax, ' ');
   EXPECT_EQ(ParseReply(AskWithBytes(line))["success"], Json::Value(true));
   line += ' ';
@@ -125,7 +118,7 @@ TEST_F(BadRequestTest, EndlessLineIsAnsweredAndClosed) {
   EXPECT_EQ(reply["error"], "the request is longer than 65536 bytes");
 }
 
-TEST_F(BadRequestTest, LongestPathIsTaken) {
+TEST_F(BadRequestTest, LongestPathIsAccepted) {
   const IndexDaemon daemon;
   const std::string path = "/" + std::string(4094, '"');
   EXPECT_EQ(AskForVersion(path), 0);
@@ -135,7 +128,7 @@ TEST_F(BadRequestTest, LongestPathIsTaken) {
   EXPECT_EQ(AskForVersion(deep), 3);
 }
 
-TEST_F(BadRequestTest, MembersThatNobodyKnowsDoNoHarm) {
+TEST_F(BadRequestTest, UnknownMembersAreIgnored) {
   const IndexDaemon daemon;
   const Json::Value reply = ParseReply(
       AskWithBytes(R"({"x":{"command":1},"path":"/a","command":"GET_INDEX_VERSION","type":"?"})"));
@@ -154,11 +147,11 @@ TEST_F(BadRequestTest, NumbersOfAllFormsAndSlashesInStringsAreJson) {
 
 TEST_F(BadRequestTest, OnlyTheFirstLineCounts) {
   const IndexDaemon daemon;
-  const std::string one = R"({"command":"GET_INDEX_VERSION","path":"/a"})";
-  EXPECT_EQ(ParseReply(AskWithBytes(one + "\n" + one))["version"], 0);
+  const std::string request = kVersionRequest;
+  EXPECT_EQ(ParseReply(AskWithBytes(request + "\n" + request))["version"], 0);
 }
 
-TEST_F(BadRequestTest, IsLoggedWithItsReasonButNotWithoutEnd) {
+TEST_F(BadRequestTest, IsLoggedWithItsReasonAtALimitedRate) {
   IndexDaemon daemon;
   constexpr int kRequests = 300;
   for (int i = 0; i < kRequests; ++i) AskWithBytes("x");
@@ -170,8 +163,8 @@ TEST_F(BadRequestTest, IsLoggedWithItsReasonButNotWithoutEnd) {
   }
   EXPECT_GE(lines, 1U);
   EXPECT_LT(lines, kRequests / 2U);
-  EXPECT_THAT(log, ::testing::HasSubstr("level=warning event=request outcome=refused "
-                                        "error=\"the request is not one JSON object\" pid="));
+  EXPECT_THAT(log, HasSubstr("level=warning event=request outcome=refused "
+                             "error=\"the request is not one JSON object\" pid="));
 }
 
 }  // namespace

@@ -3,20 +3,15 @@
 #include <json/reader.h>
 #include <json/writer.h>
 #include <poll.h>
-#include <sqlite3.h>
-#include <sys/socket.h>
 #include <sys/un.h>
 
 #include <array>
 #include <chrono>
-#include <csignal>
 #include <cstring>
 #include <functional>
+#include <memory>
 #include <thread>
 #include <utility>
-
-#include "ipc/velamk_ipc.h"
-#include "support/files.h"
 
 namespace vela_test {
 
@@ -24,7 +19,7 @@ namespace {
 
 constexpr int kReceiveMilliseconds = 60000;
 
-/// Waits, as long as it may take on a busy machine.
+/// Waits up to a minute, which is enough on a busy machine.
 bool WaitUntil(const std::function<bool()>& condition) {
   const auto end = std::chrono::steady_clock::now() + std::chrono::seconds(60);
   while (!condition()) {
@@ -40,9 +35,20 @@ std::string IndexDaemonPath() {
   return HostPath(VELAINDEXPLUGIND_FILE);
 }
 
+ProgramResult RunDaemon(const std::vector<std::string>& arguments) {
+  return RunProgram(IndexDaemonPath(), arguments);
+}
+
+std::string ExpectRefusal(const std::vector<std::string>& arguments, const std::string& text) {
+  const ProgramResult result = RunDaemon(arguments);
+  EXPECT_EQ(result.exitCode, 1);
+  EXPECT_THAT(result.err, testing::HasSubstr(text));
+  return result.err;
+}
+
 IndexDaemon::IndexDaemon(std::vector<std::string> arguments, const ProgramOptions& options)
     : program_(StartProgram(IndexDaemonPath(), arguments, options)) {
-  // A connection would take part in what the test counts.
+  // A connection would be among those that the test counts.
   EXPECT_TRUE(WaitForLog("event=settings")) << program_.Error();
 }
 
@@ -59,17 +65,36 @@ bool IndexDaemon::WaitForDescriptors(size_t count) const {
   return WaitUntil([&] { return Descriptors() == count; });
 }
 
+bool IndexDaemon::WaitForAtMostDescriptors(size_t count) const {
+  return WaitUntil([&] { return Descriptors() <= count; });
+}
+
 bool IndexDaemon::WaitForLog(const std::string& text) const {
   return WaitUntil([&] { return program_.Error().find(text) != std::string::npos; });
 }
 
-Descriptor ConnectToDaemon() {
+Descriptor SocketAt(const char* path, int type, int (*use)(int, const sockaddr*, socklen_t)) {
   sockaddr_un address{};
   address.sun_family = AF_UNIX;
-  std::strncpy(address.sun_path, PluginDaemonSocketPath, sizeof address.sun_path - 1);
-  Descriptor connection(socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0));
+  std::strncpy(address.sun_path, path, sizeof address.sun_path - 1);
+  Descriptor made(socket(AF_UNIX, type | SOCK_CLOEXEC, 0));
   const auto* generic = reinterpret_cast<const sockaddr*>(&address);
-  if (connect(connection.Get(), generic, sizeof address) != 0) return Descriptor();
+  if (use(made.Get(), generic, sizeof address) != 0) return Descriptor();
+  return made;
+}
+
+Descriptor ConnectToDaemon() {
+  return SocketAt(PluginDaemonSocketPath, SOCK_STREAM, connect);
+}
+
+void WaitForDaemon() {
+  EXPECT_TRUE(WaitUntil([] { return ConnectToDaemon().IsOpen(); }));
+}
+
+Descriptor SendLine(const std::string& line) {
+  Descriptor connection = ConnectToDaemon();
+  EXPECT_TRUE(connection.IsOpen());
+  SendBytes(connection, line + "\n");
   return connection;
 }
 
@@ -98,9 +123,7 @@ std::string ReceiveAll(const Descriptor& connection, bool* isEnded) {
 }
 
 std::string AskWithBytes(const std::string& line) {
-  const Descriptor connection = ConnectToDaemon();
-  EXPECT_TRUE(connection.IsOpen());
-  SendBytes(connection, line + "\n");
+  const Descriptor connection = SendLine(line);
   bool isEnded = false;
   const std::string reply = ReceiveAll(connection, &isEnded);
   EXPECT_TRUE(isEnded) << "the daemon does not close the connection";
@@ -120,6 +143,14 @@ Json::Value ParseReply(const std::string& bytes) {
     reply = Json::Value(Json::objectValue);
   }
   return reply;
+}
+
+Json::Value ReceiveReply(const Descriptor& connection) {
+  return ParseReply(ReceiveAll(connection));
+}
+
+void ExpectSuccess(const Descriptor& connection) {
+  EXPECT_EQ(ReceiveReply(connection)["success"], Json::Value(true));
 }
 
 Json::Value Ask(const Json::Value& request) {
@@ -153,24 +184,34 @@ bool SetVersion(const std::string& path, const Json::Value& version) {
   return Ask(request)["success"] == Json::Value(true);
 }
 
-std::vector<std::string> Query(const std::string& sql, const std::string& database) {
+Rows Query(const std::string& sql, const std::string& database) {
   sqlite3* opened = nullptr;
   EXPECT_EQ(sqlite3_open_v2(database.c_str(), &opened, SQLITE_OPEN_READWRITE, nullptr), SQLITE_OK);
   const std::unique_ptr<sqlite3, int (*)(sqlite3*)> owner(opened, sqlite3_close);
   sqlite3_busy_timeout(opened, 10000);
-  std::vector<std::string> rows;
+  Rows rows;
   const auto takeRow = [](void* result, int count, char** values, char** /*names*/) {
     std::string row;
     for (int i = 0; i < count; ++i) {
       if (i > 0) row += '|';
       row += values[i] == nullptr ? "NULL" : values[i];
     }
-    static_cast<std::vector<std::string>*>(result)->push_back(row);
+    static_cast<Rows*>(result)->push_back(row);
     return 0;
   };
   EXPECT_EQ(sqlite3_exec(opened, sql.c_str(), takeRow, &rows, nullptr), SQLITE_OK)
       << sqlite3_errmsg(opened) << ": " << sql;
   return rows;
+}
+
+IndexHolder::IndexHolder() {
+  EXPECT_EQ(sqlite3_open(kIndexDatabase, &database_), SQLITE_OK);
+  EXPECT_EQ(sqlite3_exec(database_, "BEGIN IMMEDIATE", nullptr, nullptr, nullptr), SQLITE_OK);
+}
+
+void IndexHolder::Release() {
+  EXPECT_EQ(sqlite3_close(database_), SQLITE_OK);
+  database_ = nullptr;
 }
 
 }  // namespace vela_test

@@ -1,29 +1,47 @@
-// The daemon as its users start it, and clients of all manners.
+// The daemon as its users start it, its clients, and its index.
 #pragma once
 
-#include <gtest/gtest.h>
+#include <gmock/gmock.h>
 #include <json/value.h>
+#include <sqlite3.h>
+#include <sys/socket.h>
 
+#include <csignal>
 #include <cstdint>
-#include <memory>
 #include <string>
 #include <vector>
 
+#include "ipc/velamk_ipc.h"
+#include "platform/velaindex.h"
 #include "support/descriptor.h"
+#include "support/files.h"
 #include "support/program.h"
 #include "support/sandbox.h"
 
 namespace vela_test {
 
+using Rows = std::vector<std::string>;
+
 constexpr const char* kIndexDatabase = "/var/lib/velaindex/index.db";
+
+/// Requests without their newline.
+constexpr const char* kVersionRequest = R"({"command":"GET_INDEX_VERSION","path":"/a"})";
+constexpr const char* kPostRequest = R"({"command":"POST_PHOTO_CONVERT","path":"/a.jpg"})";
 
 /// Where the sandbox shows the program.
 std::string IndexDaemonPath();
 
+/// Runs the program to its end.
+ProgramResult RunDaemon(const std::vector<std::string>& arguments);
+
+/// Fails the test unless the daemon refuses to start with these arguments, with status 1 and a log
+/// that has the text. Returns the log.
+std::string ExpectRefusal(const std::vector<std::string>& arguments, const std::string& text);
+
 /// A running daemon.
 class IndexDaemon {
  public:
-  /// Starts it and waits until it takes connections; the test at hand fails when it does not.
+  /// Starts it and waits until it accepts connections; fails the test when it does not.
   explicit IndexDaemon(std::vector<std::string> arguments = {},
                        const ProgramOptions& options = ProgramOptions());
 
@@ -32,35 +50,54 @@ class IndexDaemon {
   /// Sends the signal and waits for the end.
   ProgramResult End(int signal);
 
-  /// How many descriptors it has open.
+  /// The number of its open descriptors.
   size_t Descriptors() const;
 
-  /// Waits until it has so many descriptors open; whether it came to that.
+  /// Waits until it has `count` open descriptors; returns whether it has.
   bool WaitForDescriptors(size_t count) const;
 
-  /// Waits until its log has this text; whether it came.
+  /// Waits until it has at most `count` open descriptors; returns whether it has.
+  bool WaitForAtMostDescriptors(size_t count) const;
+
+  /// Waits until its log has this text; returns whether it has.
   bool WaitForLog(const std::string& text) const;
 
  private:
   Program program_;
 };
 
-/// Connects to the daemon's socket; not open when nobody listens there.
+/// A Unix socket of this type (SOCK_STREAM, SOCK_DGRAM) that is bound or connected to the path;
+/// `use` is bind or connect. Not open when that fails, with errno set.
+Descriptor SocketAt(const char* path, int type, int (*use)(int, const sockaddr*, socklen_t));
+
+/// Connects to the daemon's socket; not open when nothing listens there.
 Descriptor ConnectToDaemon();
 
-/// Sends all bytes, as far as the daemon takes them.
+/// Waits until the daemon, started otherwise than as an IndexDaemon, accepts connections.
+void WaitForDaemon();
+
+/// Connects and sends the line with a newline.
+Descriptor SendLine(const std::string& line);
+
+/// Sends all bytes, as far as the daemon accepts them.
 void SendBytes(const Descriptor& connection, const std::string& bytes);
 
-/// Receives up to the end of the connection. `isEnded`, when given, tells whether it came within a
-/// minute.
+/// Receives up to the end of the connection. Sets `isEnded`, when given, to whether the end came
+/// within a minute.
 std::string ReceiveAll(const Descriptor& connection, bool* isEnded = nullptr);
 
 /// Sends the line with a newline and receives up to the end of the connection.
 std::string AskWithBytes(const std::string& line);
 
-/// Reads a reply, which must be one line with a JSON object, newline included; the test at hand
-/// fails when it is not that.
+/// Reads a reply, which must be one line with a JSON object, newline included; fails the test
+/// otherwise.
 Json::Value ParseReply(const std::string& bytes);
+
+/// Receives and reads the reply.
+Json::Value ReceiveReply(const Descriptor& connection);
+
+/// Fails the test unless the reply reports success.
+void ExpectSuccess(const Descriptor& connection);
 
 /// Sends the request and reads the reply.
 Json::Value Ask(const Json::Value& request);
@@ -68,21 +105,33 @@ Json::Value Ask(const Json::Value& request);
 /// A request with a path.
 Json::Value PathRequest(const std::string& command, const std::string& path);
 
-/// The media record of a path, null when the daemon has none to give.
+/// The media record of a path, null when the daemon has none.
 Json::Value AskForMedia(const std::string& path, int type = 1);
 
 /// The index version of a path, as the reply has it.
 Json::Value AskForVersion(const std::string& path);
 
-/// Sets, or with null removes, the version of a directory; whether the daemon did.
+/// Sets, or with null removes, the version of a directory; returns whether the daemon did.
 bool SetVersion(const std::string& path, const Json::Value& version);
 
-/// The rows of a query on an index database, columns joined by "|"; the test at hand fails when
-/// there is an error.
-std::vector<std::string> Query(const std::string& sql,
-                               const std::string& database = kIndexDatabase);
+/// The rows of a query on an index database, columns joined by "|"; fails the test on an error.
+Rows Query(const std::string& sql, const std::string& database = kIndexDatabase);
 
-/// Fixture: every test has the sandbox in its first state.
+/// Locks the index as another program that writes to it.
+class IndexHolder {
+ public:
+  IndexHolder();
+  ~IndexHolder() { Release(); }
+  IndexHolder(const IndexHolder&) = delete;
+  IndexHolder& operator=(const IndexHolder&) = delete;
+
+  void Release();
+
+ private:
+  sqlite3* database_ = nullptr;
+};
+
+/// Every test has the sandbox in its first state.
 class IndexDaemonTest : public SandboxTest {};
 
 }  // namespace vela_test

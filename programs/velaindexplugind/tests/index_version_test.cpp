@@ -1,17 +1,12 @@
 // Index versions, switches and posts.
-#include <csignal>
 #include <ctime>
-#include <string>
-#include <vector>
 
 #include "index_daemon.h"
-#include "ipc/velamk_ipc.h"
-#include "support/files.h"
 
 namespace vela_test {
 namespace {
 
-using Rows = std::vector<std::string>;
+using namespace ::testing;
 
 constexpr const char* kSettings = "/etc/velainfo.conf";
 
@@ -19,23 +14,21 @@ class IndexVersionTest : public IndexDaemonTest {};
 class SwitchTest : public IndexDaemonTest {};
 class PostTest : public IndexDaemonTest {};
 
-ProgramResult RunDaemonCommand(const std::vector<std::string>& arguments) {
-  return RunProgram(IndexDaemonPath(), arguments);
-}
-
-TEST_F(IndexVersionTest, IsNoughtWithoutSettings) {
+TEST_F(IndexVersionTest, IsThatOfTheSettings) {
+  const std::pair<const char*, int> cases[] = {
+      {"", 0}, {"index_version=\"7\"\n", 7}, {"index_version=\"2147483647\"\n", 2147483647}};
+  for (const auto& [settings, version] : cases) {
+    WriteFile(kSettings, settings);
+    IndexDaemon daemon;
+    EXPECT_EQ(GetIndexVersion("/photos/a.jpg"), version) << settings;
+    daemon.End(SIGTERM);
+  }
   RemoveTree(kSettings);
   const IndexDaemon daemon;
   EXPECT_EQ(GetIndexVersion("/photos/a.jpg"), 0);
 }
 
-TEST_F(IndexVersionTest, IsThatOfTheSettings) {
-  WriteFile(kSettings, "index_version=\"7\"\n");
-  const IndexDaemon daemon;
-  EXPECT_EQ(GetIndexVersion("/photos/a.jpg"), 7);
-}
-
-TEST_F(IndexVersionTest, IsNoughtWhenTheSettingIsNoWholeNumber) {
+TEST_F(IndexVersionTest, IsZeroWhenTheSettingIsNotAWholeNumber) {
   for (const char* value : {"2147483648", "-1", "1.5", "3x", "x", "", " "}) {
     WriteFile(kSettings, std::string("index_version=\"") + value + "\"\n");
     IndexDaemon daemon;
@@ -44,41 +37,40 @@ TEST_F(IndexVersionTest, IsNoughtWhenTheSettingIsNoWholeNumber) {
   }
 }
 
-TEST_F(IndexVersionTest, MayBeTheLargestNumber) {
-  WriteFile(kSettings, "index_version=\"2147483647\"\n");
-  const IndexDaemon daemon;
-  EXPECT_EQ(GetIndexVersion("/photos/a.jpg"), 2147483647);
-}
-
-TEST_F(IndexVersionTest, OfTheNearestDirectoryHolds) {
+TEST_F(IndexVersionTest, OfTheNearestDirectoryApplies) {
   WriteFile(kSettings, "index_version=\"7\"\n");
   const IndexDaemon daemon;
   ASSERT_TRUE(SetVersion("/photos", 1));
   ASSERT_TRUE(SetVersion("/photos/2024/raw", 3));
-  EXPECT_EQ(GetIndexVersion("/photos"), 1);
-  EXPECT_EQ(GetIndexVersion("/photos/a.jpg"), 1);
-  EXPECT_EQ(GetIndexVersion("/photos/2024/a.jpg"), 1);
-  EXPECT_EQ(GetIndexVersion("/photos/2024/raw/b/c/a.jpg"), 3);
-  EXPECT_EQ(GetIndexVersion("/photos/2024/rawer/a.jpg"), 1);
-  EXPECT_EQ(GetIndexVersion("/photos2/a.jpg"), 7);
-  EXPECT_EQ(GetIndexVersion("/"), 7);
+  const std::pair<const char*, int> versions[] = {
+      {"/photos", 1},
+      {"/photos/a.jpg", 1},
+      {"/photos/2024/a.jpg", 1},
+      {"/photos/2024/raw/b/c/a.jpg", 3},
+      {"/photos/2024/rawer/a.jpg", 1},
+      {"/photos2/a.jpg", 7},
+      {"/", 7},
+  };
+  for (const auto& [path, version] : versions) {
+    EXPECT_EQ(GetIndexVersion(path), version) << path;
+  }
 }
 
-TEST_F(IndexVersionTest, OfADirectoryMayBeNought) {
+TEST_F(IndexVersionTest, OfADirectoryMayBeZero) {
   WriteFile(kSettings, "index_version=\"7\"\n");
   const IndexDaemon daemon;
   ASSERT_TRUE(SetVersion("/photos", 0));
   EXPECT_EQ(GetIndexVersion("/photos/a.jpg"), 0);
 }
 
-TEST_F(IndexVersionTest, OfTheRootIsForAll) {
+TEST_F(IndexVersionTest, OfTheRootAppliesToAll) {
   const IndexDaemon daemon;
   ASSERT_TRUE(SetVersion("/", 4));
   EXPECT_EQ(GetIndexVersion("/photos/a.jpg"), 4);
   EXPECT_EQ(GetIndexVersion("/"), 4);
 }
 
-TEST_F(IndexVersionTest, PathsMayBeWrittenInSeveralWays) {
+TEST_F(IndexVersionTest, PathsMayHaveSeveralSpellings) {
   const IndexDaemon daemon;
   ASSERT_TRUE(SetVersion("//photos/./new/", 4));
   EXPECT_EQ(GetIndexVersion("/photos/new/a.jpg"), 4);
@@ -88,7 +80,7 @@ TEST_F(IndexVersionTest, PathsMayBeWrittenInSeveralWays) {
   EXPECT_EQ(GetIndexVersion("/photos/new/a.jpg"), 0);
 }
 
-TEST_F(IndexVersionTest, ThatIsRemovedGivesWayToTheNextAbove) {
+TEST_F(IndexVersionTest, OfTheParentAppliesAfterRemoval) {
   const IndexDaemon daemon;
   ASSERT_TRUE(SetVersion("/photos", 1));
   ASSERT_TRUE(SetVersion("/photos/new", 2));
@@ -109,22 +101,21 @@ TEST_F(IndexVersionTest, OfADirectorySurvivesARestart) {
 
 TEST_F(IndexVersionTest, IsSetFromTheCommandLine) {
   const IndexDaemon daemon;
-  EXPECT_EQ(RunDaemonCommand({"--set-index-version", "/photos/a=b=12"}).exitCode, 0);
+  EXPECT_EQ(RunDaemon({"--set-index-version", "/photos/a=b=12"}).exitCode, 0);
   EXPECT_EQ(GetIndexVersion("/photos/a=b/x.jpg"), 12);
-  EXPECT_EQ(RunDaemonCommand({"--unset-index-version", "/photos/a=b"}).exitCode, 0);
+  EXPECT_EQ(RunDaemon({"--unset-index-version", "/photos/a=b"}).exitCode, 0);
   EXPECT_EQ(GetIndexVersion("/photos/a=b/x.jpg"), 0);
 }
 
-TEST_F(IndexVersionTest, CommandLineTellsThatNobodyAnswers) {
-  const ProgramResult result = RunDaemonCommand({"--set-index-version", "/photos=1"});
+TEST_F(IndexVersionTest, CommandLineReportsAMissingDaemon) {
+  const ProgramResult result = RunDaemon({"--set-index-version", "/photos=1"});
   EXPECT_EQ(result.exitCode, 1);
   EXPECT_EQ(result.err, "velaindexplugind: no daemon answers at /tmp/velaindexplugind_sock\n");
 }
 
-TEST_F(IndexVersionTest, CommandLineTellsWhyTheDaemonRefuses) {
+TEST_F(IndexVersionTest, CommandLineReportsTheDaemonsRefusal) {
   const IndexDaemon daemon;
-  const ProgramResult result =
-      RunDaemonCommand({"--unset-index-version", "/" + std::string(5000, 'x')});
+  const ProgramResult result = RunDaemon({"--unset-index-version", "/" + std::string(5000, 'x')});
   EXPECT_EQ(result.exitCode, 1);
   EXPECT_EQ(result.err, "velaindexplugind: path is longer than 4095 bytes\n");
 }
@@ -146,7 +137,7 @@ TEST_F(IndexVersionTest, CommandLineRefusesWrongUse) {
       {"--no-such-option"},
       {"word"}};
   for (const auto& arguments : wrong) {
-    const ProgramResult result = RunDaemonCommand(arguments);
+    const ProgramResult result = RunDaemon(arguments);
     EXPECT_EQ(result.exitCode, 2) << arguments.back();
     EXPECT_NE(result.err, "") << arguments.back();
   }
@@ -163,21 +154,18 @@ TEST_F(SwitchTest, IsOffUnlessTheSettingIsYes) {
   }
 }
 
-TEST_F(SwitchTest, EachKindHasItsOwn) {
-  WriteFile(kSettings, "disable_convert_photo=\"yes\"\n");
-  {
+TEST_F(SwitchTest, EachKindHasItsOwnSetting) {
+  for (const bool isPhoto : {true, false}) {
+    WriteFile(kSettings,
+              isPhoto ? "disable_convert_photo=\"yes\"\n" : "disable_convert_video=\"yes\"\n");
     IndexDaemon daemon;
-    EXPECT_TRUE(IsDisableConvertPhoto());
-    EXPECT_FALSE(IsDisableConvertVideo());
+    EXPECT_EQ(IsDisableConvertPhoto(), isPhoto);
+    EXPECT_EQ(IsDisableConvertVideo(), !isPhoto);
     EXPECT_EQ(daemon.End(SIGTERM).exitCode, 0);
   }
-  WriteFile(kSettings, "disable_convert_video=\"yes\"\n");
-  const IndexDaemon daemon;
-  EXPECT_FALSE(IsDisableConvertPhoto());
-  EXPECT_TRUE(IsDisableConvertVideo());
 }
 
-TEST_F(SwitchTest, SettingsAreReadAnewAtHangUpOnly) {
+TEST_F(SwitchTest, SettingsAreReloadedOnHangUpOnly) {
   WriteFile(kSettings, "");
   IndexDaemon daemon;
   WriteFile(kSettings,
@@ -204,7 +192,7 @@ TEST_F(PostTest, IsStoredWithItsKindAndTime) {
             Rows{"2"});
 }
 
-TEST_F(PostTest, LatestTakesThePlaceOfTheEarlier) {
+TEST_F(PostTest, LatestReplacesTheEarlierOne) {
   const IndexDaemon daemon;
   PostPhotoConvert("/photos/a.jpg");
   Query("UPDATE posted SET posted_at = 5");

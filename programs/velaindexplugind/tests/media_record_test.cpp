@@ -1,19 +1,14 @@
 // The media records that clients get.
-#include <sqlite3.h>
 #include <sys/stat.h>
 
-#include <csignal>
-#include <string>
-
 #include "index_daemon.h"
-#include "ipc/velamk_ipc.h"
-#include "platform/velaindex.h"
-#include "support/files.h"
 #include "support/films.h"
 #include "support/images.h"
 
 namespace vela_test {
 namespace {
+
+using namespace ::testing;
 
 class MediaRecordTest : public IndexDaemonTest {
  protected:
@@ -30,6 +25,15 @@ class MediaRecordTest : public IndexDaemonTest {
     SetFileTime(path, kLongAgo, 5);
   }
 
+  /// Has a photo 80 pixels wide indexed, then replaces it by one 30 wide of the same size in bytes
+  /// and time.
+  static void ReplaceIndexedPhoto() {
+    MakePaddedPhoto(kPhoto, 80, 20);
+    ASSERT_EQ(AskForMedia(kPhoto)["width"], 80);
+    MakePaddedPhoto(kPhoto, 30, 60);
+  }
+
+  static constexpr const char* kPhoto = "/tmp/a.jpg";
   static constexpr size_t kPhotoBytes = 20000;
   static constexpr int64_t kLongAgo = 1500000000;
 };
@@ -40,22 +44,22 @@ TEST_F(MediaRecordTest, PhotoHasItsStoredSizeAndTheFilesState) {
   recipe.width = 96;
   recipe.height = 40;
   recipe.orientation = 6;
-  MakeJpeg("/tmp/a.jpg", recipe);
-  SetFileTime("/tmp/a.jpg", 1600000000, 250);
+  MakeJpeg(kPhoto, recipe);
+  SetFileTime(kPhoto, 1600000000, 250);
   VELA_MEDIA_INFO media = {};
-  ASSERT_EQ(GetMediaFromPluginDB(THUMB_TYPE_PHOTO, "/tmp/a.jpg", media), 0);
-  EXPECT_STREQ(media.path, "/tmp/a.jpg");
+  ASSERT_EQ(GetMediaFromPluginDB(THUMB_TYPE_PHOTO, kPhoto, media), 0);
+  EXPECT_STREQ(media.path, kPhoto);
   EXPECT_EQ(media.type, THUMB_TYPE_PHOTO);
   EXPECT_EQ(media.width, 96U);
   EXPECT_EQ(media.height, 40U);
   EXPECT_EQ(media.rotation, 0);
   EXPECT_EQ(media.duration, 0);
   EXPECT_EQ(media.bitrate, 0U);
-  EXPECT_EQ(media.size, FileSize("/tmp/a.jpg"));
+  EXPECT_EQ(media.size, FileSize(kPhoto));
   EXPECT_EQ(media.mtime, 1600000000);
 }
 
-TEST_F(MediaRecordTest, VideoIsOneWhateverWasAskedFor) {
+TEST_F(MediaRecordTest, VideoIsRecognizedWhateverTypeIsRequested) {
   const IndexDaemon daemon;
   FilmRecipe recipe;
   recipe.seconds = 2;
@@ -71,7 +75,7 @@ TEST_F(MediaRecordTest, VideoIsOneWhateverWasAskedFor) {
   EXPECT_NEAR(media.bitrate, bits / 2, bits / 2 * 0.1);
 }
 
-TEST_F(MediaRecordTest, TurnedVideoHasTheSizeItIsShownWith) {
+TEST_F(MediaRecordTest, RotatedVideoHasItsDisplaySize) {
   const IndexDaemon daemon;
   for (const int rotation : {90, 180, 270}) {
     FilmRecipe recipe;
@@ -84,73 +88,65 @@ TEST_F(MediaRecordTest, TurnedVideoHasTheSizeItIsShownWith) {
   }
 }
 
-TEST_F(MediaRecordTest, IsTakenFromTheIndexWhileSizeAndTimeFit) {
+TEST_F(MediaRecordTest, ComesFromTheIndexWhileSizeAndTimeMatch) {
   const IndexDaemon daemon;
-  MakePaddedPhoto("/tmp/a.jpg", 80, 20);
-  ASSERT_EQ(AskForMedia("/tmp/a.jpg")["width"], 80);
-  MakePaddedPhoto("/tmp/a.jpg", 30, 60);
-  EXPECT_EQ(AskForMedia("/tmp/a.jpg")["width"], 80);
+  ReplaceIndexedPhoto();
+  EXPECT_EQ(AskForMedia(kPhoto)["width"], 80);
 }
 
-TEST_F(MediaRecordTest, IsReadAnewWhenTheTimeChanges) {
+TEST_F(MediaRecordTest, IsReadAgainWhenTheTimeChanges) {
   const IndexDaemon daemon;
-  MakePaddedPhoto("/tmp/a.jpg", 80, 20);
-  ASSERT_EQ(AskForMedia("/tmp/a.jpg")["width"], 80);
-  MakePaddedPhoto("/tmp/a.jpg", 30, 60);
-  SetFileTime("/tmp/a.jpg", kLongAgo, 6);
-  EXPECT_EQ(AskForMedia("/tmp/a.jpg")["width"], 30);
-  EXPECT_EQ(Query("SELECT count(*), max(width) FROM media"), std::vector<std::string>{"1|30"});
+  ReplaceIndexedPhoto();
+  SetFileTime(kPhoto, kLongAgo, 6);
+  EXPECT_EQ(AskForMedia(kPhoto)["width"], 30);
+  EXPECT_EQ(Query("SELECT count(*), max(width) FROM media"), Rows{"1|30"});
 }
 
-TEST_F(MediaRecordTest, IsReadAnewWhenTheSizeChanges) {
+TEST_F(MediaRecordTest, IsReadAgainWhenTheSizeChanges) {
   const IndexDaemon daemon;
-  MakePaddedPhoto("/tmp/a.jpg", 80, 20);
-  ASSERT_EQ(AskForMedia("/tmp/a.jpg")["width"], 80);
-  MakePaddedPhoto("/tmp/a.jpg", 30, 60);
-  AppendToFile("/tmp/a.jpg", "x");
-  SetFileTime("/tmp/a.jpg", kLongAgo, 5);
-  const Json::Value media = AskForMedia("/tmp/a.jpg");
+  ReplaceIndexedPhoto();
+  AppendToFile(kPhoto, "x");
+  SetFileTime(kPhoto, kLongAgo, 5);
+  const Json::Value media = AskForMedia(kPhoto);
   EXPECT_EQ(media["width"], 30);
   EXPECT_EQ(media["size"], Json::Int64(kPhotoBytes + 1));
 }
 
-TEST_F(MediaRecordTest, OfAFileJustChangedIsNotReliedOn) {
+TEST_F(MediaRecordTest, OfARecentlyChangedFileIsNotTrusted) {
   const IndexDaemon daemon;
-  MakePaddedPhoto("/tmp/a.jpg", 80, 20);
-  SetFileTimeFromNow("/tmp/a.jpg", 0);
-  const FileTime time = ModificationTime("/tmp/a.jpg");
-  ASSERT_EQ(AskForMedia("/tmp/a.jpg")["width"], 80);
-  MakePaddedPhoto("/tmp/a.jpg", 30, 60);
-  SetFileTime("/tmp/a.jpg", time.seconds, time.nanoseconds);
-  EXPECT_EQ(AskForMedia("/tmp/a.jpg")["width"], 30);
+  MakePaddedPhoto(kPhoto, 80, 20);
+  SetFileTimeFromNow(kPhoto, 0);
+  const FileTime time = ModificationTime(kPhoto);
+  ASSERT_EQ(AskForMedia(kPhoto)["width"], 80);
+  MakePaddedPhoto(kPhoto, 30, 60);
+  SetFileTime(kPhoto, time.seconds, time.nanoseconds);
+  EXPECT_EQ(AskForMedia(kPhoto)["width"], 30);
 }
 
 TEST_F(MediaRecordTest, SurvivesARestart) {
-  MakePaddedPhoto("/tmp/a.jpg", 80, 20);
   {
     IndexDaemon daemon;
-    ASSERT_EQ(AskForMedia("/tmp/a.jpg")["width"], 80);
+    ReplaceIndexedPhoto();
     EXPECT_EQ(daemon.End(SIGTERM).exitCode, 0);
   }
-  MakePaddedPhoto("/tmp/a.jpg", 30, 60);
   const IndexDaemon daemon;
-  EXPECT_EQ(AskForMedia("/tmp/a.jpg")["width"], 80);
+  EXPECT_EQ(AskForMedia(kPhoto)["width"], 80);
 }
 
-TEST_F(MediaRecordTest, OfAMissingFileIsForgotten) {
+TEST_F(MediaRecordTest, OfAMissingFileIsRemoved) {
   const IndexDaemon daemon;
-  MakePaddedPhoto("/tmp/a.jpg", 80, 20);
-  ASSERT_EQ(AskForMedia("/tmp/a.jpg")["width"], 80);
-  RemoveTree("/tmp/a.jpg");
-  Json::Value request = PathRequest("GET_MEDIA_FROM_PLUGIN_DB", "/tmp/a.jpg");
+  MakePaddedPhoto(kPhoto, 80, 20);
+  ASSERT_EQ(AskForMedia(kPhoto)["width"], 80);
+  RemoveTree(kPhoto);
+  Json::Value request = PathRequest("GET_MEDIA_FROM_PLUGIN_DB", kPhoto);
   request["type"] = 1;
   const Json::Value reply = Ask(request);
   EXPECT_EQ(reply["success"], Json::Value(false));
   EXPECT_EQ(reply["error"], "there is no such file");
-  EXPECT_EQ(Query("SELECT count(*) FROM media"), std::vector<std::string>{"0"});
+  EXPECT_EQ(Query("SELECT count(*) FROM media"), Rows{"0"});
 }
 
-TEST_F(MediaRecordTest, ThereIsNoneOfWhatCannotBeRead) {
+TEST_F(MediaRecordTest, DoesNotExistForAnUnreadableFile) {
   const IndexDaemon daemon;
   WriteFile("/tmp/damaged.jpg", "no photo");
   WriteFile("/tmp/damaged.mp4", "no film");
@@ -176,24 +172,21 @@ TEST_F(MediaRecordTest, NamesMayHaveAnyBytes) {
     VELA_MEDIA_INFO media = {};
     ASSERT_EQ(GetMediaFromPluginDB(1, path.c_str(), media), 0) << name;
     EXPECT_EQ(media.path, path);
-    // A second time from the index.
+    // The second time from the index.
     MakePaddedPhoto(path, 30, 60);
     ASSERT_EQ(GetMediaFromPluginDB(1, path.c_str(), media), 0) << name;
     EXPECT_EQ(media.path, path);
     EXPECT_EQ(media.width, 80U);
   }
-  EXPECT_EQ(Query("SELECT DISTINCT typeof(path) FROM media"), std::vector<std::string>{"blob"});
+  EXPECT_EQ(Query("SELECT DISTINCT typeof(path) FROM media"), Rows{"blob"});
 }
 
-TEST_F(MediaRecordTest, IsThereAlsoWhenTheIndexIsHeldByAnotherProgram) {
+TEST_F(MediaRecordTest, IsReturnedEvenWhenTheIndexIsLocked) {
   const IndexDaemon daemon;
-  MakePaddedPhoto("/tmp/a.jpg", 80, 20);
-  sqlite3* other = nullptr;
-  ASSERT_EQ(sqlite3_open(kIndexDatabase, &other), SQLITE_OK);
-  ASSERT_EQ(sqlite3_exec(other, "BEGIN IMMEDIATE", nullptr, nullptr, nullptr), SQLITE_OK);
-  EXPECT_EQ(AskForMedia("/tmp/a.jpg")["width"], 80);
-  EXPECT_EQ(sqlite3_exec(other, "ROLLBACK", nullptr, nullptr, nullptr), SQLITE_OK);
-  EXPECT_EQ(sqlite3_close(other), SQLITE_OK);
+  MakePaddedPhoto(kPhoto, 80, 20);
+  IndexHolder holder;
+  EXPECT_EQ(AskForMedia(kPhoto)["width"], 80);
+  holder.Release();
   EXPECT_TRUE(daemon.WaitForLog("index database"));
 }
 

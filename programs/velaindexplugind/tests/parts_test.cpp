@@ -1,4 +1,4 @@
-// The small parts by themselves.
+// Small units of the daemon.
 #include <gtest/gtest.h>
 #include <unistd.h>
 
@@ -37,7 +37,7 @@ TEST(ParentOfTest, GoesUpToTheRootAndEnds) {
   EXPECT_EQ(ParentOf("/"), "");
 }
 
-TEST(ParseWholeNumberTest, TakesDigitsOnly) {
+TEST(ParseWholeNumberTest, AcceptsDigitsOnly) {
   EXPECT_EQ(ParseWholeNumber("0"), 0);
   EXPECT_EQ(ParseWholeNumber("2147483647"), 2147483647);
   EXPECT_EQ(ParseWholeNumber("007"), 7);
@@ -46,7 +46,7 @@ TEST(ParseWholeNumberTest, TakesDigitsOnly) {
   }
 }
 
-TEST(ObjectionToTest, KeepsVersionsFromOtherUsers) {
+TEST(ObjectionToTest, DeniesOtherUsersToSetVersions) {
   const uid_t own = geteuid();
   EXPECT_EQ(ObjectionTo(Command::kSetIndexVersion, ucred{1, 0, 5}), "");
   EXPECT_EQ(ObjectionTo(Command::kSetIndexVersion, ucred{1, own, 5}), "");
@@ -54,7 +54,7 @@ TEST(ObjectionToTest, KeepsVersionsFromOtherUsers) {
   EXPECT_NE(ObjectionTo(Command::kSetIndexVersion, std::nullopt), "");
 }
 
-TEST(ObjectionToTest, LeavesAllElseToEverybody) {
+TEST(ObjectionToTest, AllowsEverythingElse) {
   for (const Command command :
        {Command::kGetMedia, Command::kGetIndexVersion, Command::kIsPhotoConvertDisabled,
         Command::kIsVideoConvertDisabled, Command::kPostPhotoConvert, Command::kPostVideoConvert}) {
@@ -62,7 +62,7 @@ TEST(ObjectionToTest, LeavesAllElseToEverybody) {
   }
 }
 
-TEST(RateLimitTest, LetsABurstPassInEachStretch) {
+TEST(RateLimitTest, LetsABurstPassInEachPeriod) {
   const RateLimit::Clock::time_point begin = RateLimit::Clock::now();
   RateLimit limit(2, std::chrono::seconds(10));
   int heldBack = 0;

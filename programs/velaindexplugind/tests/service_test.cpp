@@ -1,74 +1,43 @@
-// The daemon as a service: beginning, end, sockets and who may use them.
+// The daemon as a service: start, end, sockets and who may use them.
 #include <fcntl.h>
-#include <gmock/gmock.h>
 #include <grp.h>
-#include <sqlite3.h>
 #include <sys/file.h>
-#include <sys/socket.h>
 #include <sys/stat.h>
-#include <sys/un.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
 #include <algorithm>
 #include <cerrno>
-#include <csignal>
-#include <cstring>
 #include <fstream>
 #include <functional>
-#include <string>
-#include <vector>
 
 #include "index_daemon.h"
-#include "ipc/velamk_ipc.h"
-#include "support/files.h"
 
 namespace vela_test {
 namespace {
 
-using ::testing::HasSubstr;
-using ::testing::Not;
+using namespace ::testing;
 
-class ServiceTest : public IndexDaemonTest {};
-
-ProgramResult RunDaemon(const std::vector<std::string>& arguments = {}) {
-  return RunProgram(IndexDaemonPath(), arguments);
-}
-
-size_t LineCount(const std::string& text) {
-  return static_cast<size_t>(std::count(text.begin(), text.end(), '\n'));
-}
-
-sockaddr_un AddressOf(const char* path) {
-  sockaddr_un address{};
-  address.sun_family = AF_UNIX;
-  std::strncpy(address.sun_path, path, sizeof address.sun_path - 1);
-  return address;
-}
+using ServiceTest = IndexDaemonTest;
 
 Descriptor ListenAt(const char* path) {
-  const sockaddr_un address = AddressOf(path);
-  Descriptor made(socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0));
-  const auto* generic = reinterpret_cast<const sockaddr*>(&address);
-  EXPECT_EQ(bind(made.Get(), generic, sizeof address), 0);
+  Descriptor made = SocketAt(path, SOCK_STREAM, bind);
   EXPECT_EQ(listen(made.Get(), 100), 0);
   return made;
 }
 
-/// A socket that listens at the daemon's path.
-Descriptor ListenAtSocket() {
-  return ListenAt(PluginDaemonSocketPath);
+struct stat StatusOf(const char* path) {
+  struct stat status = {};
+  EXPECT_EQ(lstat(path, &status), 0) << path;
+  return status;
 }
 
-Descriptor ConnectTo(const char* path) {
-  const sockaddr_un address = AddressOf(path);
-  Descriptor made(socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0));
-  const auto* generic = reinterpret_cast<const sockaddr*>(&address);
-  EXPECT_EQ(connect(made.Get(), generic, sizeof address), 0);
-  return made;
+void ExpectCleanEnd(Program& program) {
+  program.Kill(SIGTERM);
+  EXPECT_EQ(program.Wait()->exitCode, 0);
 }
 
-/// Starts the daemon as a service manager does that listens for it.
+/// Starts the daemon as a service manager with socket activation does.
 Program StartGiven(const Descriptor& given) {
   const std::string number = std::to_string(given.Get());
   ProgramOptions options;
@@ -78,7 +47,7 @@ Program StartGiven(const Descriptor& given) {
   return StartProgram("/bin/bash", {"-c", script, IndexDaemonPath()}, options);
 }
 
-/// Whether the sandbox has other users and groups than user 0: it has when it was made by root.
+/// Whether the sandbox has other users and groups than user 0, as it does when root made it.
 bool HasOtherUsers() {
   std::ifstream map("/proc/self/uid_map");
   unsigned long inside = 0;
@@ -92,7 +61,7 @@ bool BecomeOther(uid_t user, gid_t group) {
   return setgroups(0, nullptr) == 0 && setgid(group) == 0 && setuid(user) == 0;
 }
 
-/// What `action` returns when another user carries it out, 0 to 254.
+/// The result of `action`, 0 to 254, run by another user.
 int RunAs(uid_t user, gid_t group, const std::function<int()>& action) {
   const pid_t child = fork();
   if (child == 0) _exit(BecomeOther(user, group) ? action() : 255);
@@ -119,70 +88,57 @@ TEST_F(ServiceTest, EndsCleanlyAtSignals) {
   }
 }
 
-TEST_F(ServiceTest, AnswersWhatIsInHandBeforeItEnds) {
+TEST_F(ServiceTest, AnswersRequestsInProgressBeforeItEnds) {
   IndexDaemon daemon;
-  sqlite3* other = nullptr;
-  ASSERT_EQ(sqlite3_open(kIndexDatabase, &other), SQLITE_OK);
-  ASSERT_EQ(sqlite3_exec(other, "BEGIN IMMEDIATE", nullptr, nullptr, nullptr), SQLITE_OK);
-  const Descriptor posting = ConnectToDaemon();
-  SendBytes(posting, "{\"command\":\"POST_PHOTO_CONVERT\",\"path\":\"/a.jpg\"}\n");
+  IndexHolder holder;
+  const Descriptor posting = SendLine(kPostRequest);
   const Descriptor halfWay = ConnectToDaemon();
   SendBytes(halfWay, "{\"command\":");
   daemon.Process().Kill(SIGTERM);
   EXPECT_EQ(ReceiveAll(halfWay), "");
   EXPECT_FALSE(ConnectToDaemon().IsOpen());
-  ASSERT_EQ(sqlite3_close(other), SQLITE_OK);
-  EXPECT_EQ(ParseReply(ReceiveAll(posting))["success"], Json::Value(true));
+  holder.Release();
+  ExpectSuccess(posting);
   EXPECT_EQ(daemon.Process().Wait()->exitCode, 0);
 }
 
-TEST_F(ServiceTest, AnswersWhoCameBeforeTheSignal) {
+TEST_F(ServiceTest, AnswersClientsThatConnectedBeforeTheSignal) {
   IndexDaemon daemon;
   daemon.Process().Kill(SIGSTOP);
   std::vector<Descriptor> early;
   for (int i = 0; i < 40; ++i) {
-    early.push_back(ConnectToDaemon());
-    SendBytes(early.back(), "{\"command\":\"GET_INDEX_VERSION\",\"path\":\"/a\"}\n");
+    early.push_back(SendLine(kVersionRequest));
   }
   daemon.Process().Kill(SIGTERM);
   daemon.Process().Kill(SIGCONT);
   for (const Descriptor& connection : early) {
-    EXPECT_EQ(ParseReply(ReceiveAll(connection))["version"], 0);
+    EXPECT_EQ(ReceiveReply(connection)["version"], 0);
   }
   EXPECT_EQ(daemon.Process().Wait()->exitCode, 0);
 }
 
 TEST_F(ServiceTest, SecondSignalEndsItAtOnce) {
   IndexDaemon daemon;
-  sqlite3* other = nullptr;
-  ASSERT_EQ(sqlite3_open(kIndexDatabase, &other), SQLITE_OK);
-  ASSERT_EQ(sqlite3_exec(other, "BEGIN IMMEDIATE", nullptr, nullptr, nullptr), SQLITE_OK);
-  const Descriptor posting = ConnectToDaemon();
-  SendBytes(posting, "{\"command\":\"POST_PHOTO_CONVERT\",\"path\":\"/a.jpg\"}\n");
+  IndexHolder holder;
+  const Descriptor posting = SendLine(kPostRequest);
   daemon.Process().Kill(SIGTERM);
   ASSERT_TRUE(daemon.WaitForLog("event=stop"));
   const ProgramResult result = daemon.End(SIGTERM);
   EXPECT_EQ(result.exitCode, 0);
   EXPECT_THAT(result.err, HasSubstr("requests_left=1"));
-  EXPECT_EQ(sqlite3_close(other), SQLITE_OK);
 }
 
 TEST_F(ServiceTest, SecondInstanceRefusesToStart) {
   const IndexDaemon daemon;
-  const ProgramResult result = RunDaemon();
-  EXPECT_EQ(result.exitCode, 1);
-  EXPECT_EQ(LineCount(result.err), 1U);
-  EXPECT_THAT(result.err, HasSubstr("another instance uses /var/lib/velaindex/index.db"));
-  EXPECT_EQ(GetIndexVersion("/a"), 0);
-}
-
-TEST_F(ServiceTest, SecondInstanceWithAnotherDatabaseRefusesToStart) {
-  const IndexDaemon daemon;
-  const ProgramResult result = RunDaemon({"--database", "/tmp/other/index.db"});
-  EXPECT_EQ(result.exitCode, 1);
-  EXPECT_EQ(LineCount(result.err), 1U);
-  EXPECT_THAT(result.err, HasSubstr("another instance listens at /tmp/velaindexplugind_sock"));
-  EXPECT_EQ(GetIndexVersion("/a"), 0);
+  const std::pair<std::vector<std::string>, const char*> cases[] = {
+      {{}, "another instance uses /var/lib/velaindex/index.db"},
+      {{"--database", "/tmp/other/index.db"},
+       "another instance listens at /tmp/velaindexplugind_sock"}};
+  for (const auto& [arguments, message] : cases) {
+    const std::string log = ExpectRefusal(arguments, message);
+    EXPECT_EQ(std::count(log.begin(), log.end(), '\n'), 1);
+    EXPECT_EQ(GetIndexVersion("/a"), 0);
+  }
 }
 
 TEST_F(ServiceTest, SocketLeftByADeadInstanceIsReplaced) {
@@ -195,32 +151,28 @@ TEST_F(ServiceTest, SocketLeftByADeadInstanceIsReplaced) {
   EXPECT_EQ(GetIndexVersion("/a"), 0);
 }
 
-TEST_F(ServiceTest, SomethingElseThanASocketIsLeftAlone) {
+TEST_F(ServiceTest, AnythingButASocketIsKept) {
   WriteFile(PluginDaemonSocketPath, "precious");
-  ProgramResult result = RunDaemon();
-  EXPECT_EQ(result.exitCode, 1);
-  EXPECT_THAT(result.err, HasSubstr("is not a socket"));
+  ExpectRefusal({}, "something else than a socket");
   EXPECT_EQ(ReadFile(PluginDaemonSocketPath), "precious");
   RemoveTree(PluginDaemonSocketPath);
 
-  // Nor is a link followed to where it leads.
+  // A link is not followed either.
   ASSERT_EQ(symlink("/tmp/elsewhere", PluginDaemonSocketPath), 0);
-  result = RunDaemon();
-  EXPECT_EQ(result.exitCode, 1);
-  EXPECT_THAT(result.err, HasSubstr("is not a socket"));
+  ExpectRefusal({}, "something else than a socket");
   EXPECT_TRUE(Exists(PluginDaemonSocketPath));
 }
 
-TEST_F(ServiceTest, RootReplacesWhateverAnotherUserHasPutThere) {
+TEST_F(ServiceTest, RootReplacesAnythingOfAnotherUser) {
   if (!HasOtherUsers()) {
-    // In a sandbox of one user everything is root's own, and stays.
-    const Descriptor own = ListenAtSocket();
-    EXPECT_EQ(RunDaemon().exitCode, 1);
+    // In a sandbox with one user everything belongs to root and is kept.
+    const Descriptor own = ListenAt(PluginDaemonSocketPath);
+    EXPECT_EQ(RunDaemon({}).exitCode, 1);
     EXPECT_TRUE(ConnectToDaemon().IsOpen());
     return;
   }
   const std::vector<std::function<Descriptor()>> puts = {
-      [] { return ListenAtSocket(); },
+      [] { return ListenAt(PluginDaemonSocketPath); },
       [] {
         WriteFile(PluginDaemonSocketPath, "x");
         return Descriptor();
@@ -244,21 +196,16 @@ TEST_F(ServiceTest, RootReplacesWhateverAnotherUserHasPutThere) {
   }
 }
 
-TEST_F(ServiceTest, SocketThatAnotherListensAtIsLeftAlone) {
-  const Descriptor other = ListenAtSocket();
-  const ProgramResult result = RunDaemon();
-  EXPECT_EQ(result.exitCode, 1);
-  EXPECT_THAT(result.err, HasSubstr("another instance listens at /tmp/velaindexplugind_sock"));
+TEST_F(ServiceTest, SocketOfAnotherListenerIsKept) {
+  const Descriptor other = ListenAt(PluginDaemonSocketPath);
+  ExpectRefusal({}, "another instance listens at /tmp/velaindexplugind_sock");
   EXPECT_TRUE(ConnectToDaemon().IsOpen());
 }
 
 TEST_F(ServiceTest, RefusesToStartWhileAnotherPreparesItsSocket) {
-  const char* const file = "/run/velaindexplugind.lock";
-  const Descriptor lock(open(file, O_RDWR | O_CREAT | O_CLOEXEC, 0600));
+  const Descriptor lock(open("/run/velaindexplugind.lock", O_RDWR | O_CREAT | O_CLOEXEC, 0600));
   ASSERT_EQ(flock(lock.Get(), LOCK_EX | LOCK_NB), 0);
-  const ProgramResult result = RunDaemon();
-  EXPECT_EQ(result.exitCode, 1);
-  EXPECT_THAT(result.err, HasSubstr("another instance listens at /tmp/velaindexplugind_sock"));
+  ExpectRefusal({}, "another instance listens at /tmp/velaindexplugind_sock");
   EXPECT_FALSE(Exists(PluginDaemonSocketPath));
 }
 
@@ -281,15 +228,14 @@ TEST_F(ServiceTest, OneOfTwoThatStartTogetherGetsTheSocket) {
     Program& loser = isFirst ? second : first;
     EXPECT_EQ(GetIndexVersion("/a"), 0);
     EXPECT_EQ(loser.Wait()->exitCode, 1);
-    winner.Kill(SIGTERM);
-    EXPECT_EQ(winner.Wait()->exitCode, 0);
+    ExpectCleanEnd(winner);
   }
 }
 
-TEST_F(ServiceTest, OrdinaryUserMayRunItForHimself) {
+TEST_F(ServiceTest, OrdinaryUserMayRunIt) {
   ProgramOptions options;
   if (!HasOtherUsers()) {
-    // The only user of the sandbox, with no more rights than any other.
+    // The only user of the sandbox, without any capability.
     options.beforeExec = {DropCapabilities()};
     MakeDirectories("/tmp/own");
     const IndexDaemon daemon({"--database", "/tmp/own/index.db"}, options);
@@ -343,7 +289,7 @@ TEST_F(ServiceTest, OnlyTheDaemonsUserSetsIndexVersions) {
 TEST_F(ServiceTest, SocketOfAnotherIsNotRemovedAtTheEnd) {
   IndexDaemon daemon;
   RemoveTree(PluginDaemonSocketPath);
-  const Descriptor other = ListenAtSocket();
+  const Descriptor other = ListenAt(PluginDaemonSocketPath);
   EXPECT_EQ(daemon.End(SIGTERM).exitCode, 0);
   EXPECT_TRUE(Exists(PluginDaemonSocketPath));
 }
@@ -352,8 +298,7 @@ TEST_F(ServiceTest, SocketIsForRootAndItsGroupOnly) {
   ProgramOptions options;
   options.umask = 0;
   const IndexDaemon daemon({}, options);
-  struct stat status;
-  ASSERT_EQ(lstat(PluginDaemonSocketPath, &status), 0);
+  const struct stat status = StatusOf(PluginDaemonSocketPath);
   EXPECT_TRUE(S_ISSOCK(status.st_mode));
   EXPECT_EQ(status.st_mode & 07777, 0660U);
   EXPECT_EQ(status.st_uid, 0U);
@@ -364,44 +309,36 @@ TEST_F(ServiceTest, SocketIsForRootAndItsGroupOnly) {
   }
 }
 
-TEST_F(ServiceTest, GroupIsTheOneThatIsNamed) {
+TEST_F(ServiceTest, GroupCanBeChosen) {
   if (HasOtherUsers()) {
     const IndexDaemon daemon({"--group", "daemon"});
-    struct stat status;
-    ASSERT_EQ(lstat(PluginDaemonSocketPath, &status), 0);
-    EXPECT_EQ(status.st_mode & 07777, 0660U);
-    EXPECT_EQ(status.st_gid, 1U);
-    for (const char* made : {"/var/lib/velaindex", kIndexDatabase}) {
-      ASSERT_EQ(stat(made, &status), 0);
-      EXPECT_EQ(status.st_gid, 1U) << made;
+    EXPECT_EQ(ModeOf(PluginDaemonSocketPath), 0660);
+    for (const char* made : {PluginDaemonSocketPath, "/var/lib/velaindex", kIndexDatabase}) {
+      EXPECT_EQ(StatusOf(made).st_gid, 1U) << made;
     }
     EXPECT_EQ(ConnectAs(65534, 1), 0);
     EXPECT_EQ(ConnectAs(65534, 65534), EACCES);
   } else {
-    const ProgramResult result = RunDaemon({"--group", "daemon"});
-    EXPECT_EQ(result.exitCode, 1) << "a group that does not exist here cannot be given";
+    EXPECT_EQ(RunDaemon({"--group", "daemon"}).exitCode, 1)
+        << "a group that does not exist here cannot be given";
   }
 }
 
-TEST_F(ServiceTest, GroupThatNobodyKnowsIsAnError) {
-  const ProgramResult result = RunDaemon({"--group", "no-such-group"});
-  EXPECT_EQ(result.exitCode, 1);
-  EXPECT_THAT(result.err, HasSubstr("there is no group no-such-group"));
+TEST_F(ServiceTest, UnknownGroupIsAnError) {
+  ExpectRefusal({"--group", "no-such-group"}, "there is no group no-such-group");
   EXPECT_FALSE(Exists(PluginDaemonSocketPath));
 }
 
-TEST_F(ServiceTest, TakesTheSocketThatItIsGiven) {
-  const Descriptor given = ListenAtSocket();
-  // Who comes before it has started is answered, too.
-  const Descriptor early = ConnectToDaemon();
-  SendBytes(early, "{\"command\":\"GET_INDEX_VERSION\",\"path\":\"/a\"}\n");
+TEST_F(ServiceTest, UsesAnInheritedSocket) {
+  const Descriptor given = ListenAt(PluginDaemonSocketPath);
+  // A client that connects before the start gets an answer, too.
+  const Descriptor early = SendLine(kVersionRequest);
   Program program = StartGiven(given);
-  EXPECT_EQ(ParseReply(ReceiveAll(early))["version"], 0);
+  EXPECT_EQ(ReceiveReply(early)["version"], 0);
   EXPECT_EQ(GetIndexVersion("/a"), 0);
-  program.Kill(SIGTERM);
-  EXPECT_EQ(program.Wait()->exitCode, 0);
-  EXPECT_TRUE(Exists(PluginDaemonSocketPath)) << "it is not its own to remove";
-  EXPECT_TRUE(ConnectToDaemon().IsOpen()) << "the next one finds who waits here";
+  ExpectCleanEnd(program);
+  EXPECT_TRUE(Exists(PluginDaemonSocketPath)) << "it belongs to the service manager";
+  EXPECT_TRUE(ConnectToDaemon().IsOpen()) << "the next instance finds waiting clients";
 }
 
 TEST_F(ServiceTest, HasADefiniteLogFormat) {
@@ -413,11 +350,10 @@ TEST_F(ServiceTest, HasADefiniteLogFormat) {
                              "path=\"/a \\\"b\\\"\\n\\xff=\" outcome=done pid="));
 }
 
-TEST_F(ServiceTest, MarksLinesForTheJournal) {
+TEST_F(ServiceTest, LinesForTheJournalHaveTheirLevel) {
   const std::string script = "JOURNAL_STREAM=$(stat -L -c %d:%i /proc/self/fd/2) exec \"$0\"";
   Program daemon = StartProgram("/bin/bash", {"-c", script, IndexDaemonPath()});
-  ASSERT_TRUE(WaitUntilExists(PluginDaemonSocketPath));
-  while (!ConnectToDaemon().IsOpen()) usleep(1000);
+  WaitForDaemon();
   AskWithBytes("x");
   daemon.Kill(SIGTERM);
   const std::string log = daemon.Wait()->err;
@@ -426,7 +362,7 @@ TEST_F(ServiceTest, MarksLinesForTheJournal) {
   EXPECT_THAT(log, Not(HasSubstr("time=")));
 }
 
-TEST_F(ServiceTest, MarksNoLinesWhenItsErrorStreamIsNotTheJournals) {
+TEST_F(ServiceTest, LinesHaveNoLevelWhenTheErrorStreamIsNotTheJournals) {
   ProgramOptions options;
   options.addedEnvironment = {"JOURNAL_STREAM=1:2"};
   IndexDaemon daemon({}, options);
@@ -435,29 +371,25 @@ TEST_F(ServiceTest, MarksNoLinesWhenItsErrorStreamIsNotTheJournals) {
   EXPECT_THAT(log, Not(HasSubstr("<6>")));
 }
 
-TEST_F(ServiceTest, TellsTheSocketThatItWasGiven) {
+TEST_F(ServiceTest, LogsTheInheritedSocket) {
   const Descriptor given = ListenAt("/tmp/another_sock");
   Program program = StartGiven(given);
-  const Descriptor early = ConnectTo("/tmp/another_sock");
-  SendBytes(early, "{\"command\":\"GET_INDEX_VERSION\",\"path\":\"/a\"}\n");
-  EXPECT_EQ(ParseReply(ReceiveAll(early))["version"], 0);
+  const Descriptor early = SocketAt("/tmp/another_sock", SOCK_STREAM, connect);
+  SendBytes(early, std::string(kVersionRequest) + "\n");
+  EXPECT_EQ(ReceiveReply(early)["version"], 0);
   program.Kill(SIGTERM);
   EXPECT_THAT(program.Wait()->err, HasSubstr(" socket=/tmp/another_sock "));
 }
 
-TEST_F(ServiceTest, SaysNothingOfOrdinaryRequestsUnlessAsked) {
+TEST_F(ServiceTest, LogsOrdinaryRequestsOnlyOnRequest) {
   IndexDaemon daemon;
   AskForVersion("/a");
   EXPECT_THAT(daemon.End(SIGTERM).err, Not(HasSubstr("event=request")));
 }
 
-TEST_F(ServiceTest, TellsTheServiceManagerWhenItIsReady) {
-  sockaddr_un address{};
-  address.sun_family = AF_UNIX;
-  std::strncpy(address.sun_path, "/tmp/notify", sizeof address.sun_path - 1);
-  const Descriptor manager(socket(AF_UNIX, SOCK_DGRAM | SOCK_CLOEXEC, 0));
-  const auto* generic = reinterpret_cast<const sockaddr*>(&address);
-  ASSERT_EQ(bind(manager.Get(), generic, sizeof address), 0);
+TEST_F(ServiceTest, NotifiesTheServiceManager) {
+  const Descriptor manager = SocketAt("/tmp/notify", SOCK_DGRAM, bind);
+  ASSERT_TRUE(manager.IsOpen());
   ProgramOptions options;
   options.addedEnvironment = {"NOTIFY_SOCKET=/tmp/notify"};
   IndexDaemon daemon({}, options);
@@ -486,15 +418,13 @@ TEST_F(ServiceTest, BrokenErrorStreamDoesNotEndIt) {
       options);
   close(ends[1]);
   close(ends[0]);
-  ASSERT_TRUE(WaitUntilExists(PluginDaemonSocketPath));
-  while (!ConnectToDaemon().IsOpen()) usleep(1000);
+  WaitForDaemon();
   AskWithBytes("x");
   EXPECT_EQ(GetIndexVersion("/a"), 0);
-  program.Kill(SIGTERM);
-  EXPECT_EQ(program.Wait()->exitCode, 0);
+  ExpectCleanEnd(program);
 }
 
-TEST_F(ServiceTest, TellsItsVersionAndOptions) {
+TEST_F(ServiceTest, PrintsItsVersionAndOptions) {
   EXPECT_THAT(RunDaemon({"--version"}).out, HasSubstr("velaindexplugind "));
   const ProgramResult help = RunDaemon({"--help"});
   EXPECT_EQ(help.exitCode, 0);

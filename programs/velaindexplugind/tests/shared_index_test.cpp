@@ -1,27 +1,21 @@
-// The index database: shared with other programs, and never damaged.
-#include <gmock/gmock.h>
+// The index database: shared with other programs, among them velathumb, and never damaged.
 #include <sys/stat.h>
 
-#include <chrono>
-#include <csignal>
 #include <cstdio>
-#include <ctime>
-#include <string>
 #include <thread>
-#include <vector>
 
 #include "index_daemon.h"
-#include "ipc/velamk_ipc.h"
-#include "platform/velaindex.h"
-#include "support/files.h"
+#include "support/build_paths.h"
 #include "support/images.h"
+#include "support/profile_file.h"
 #include "support/quiet_thread.h"
+#include "support/stub_tool.h"
+#include "support/system_log.h"
 
 namespace vela_test {
 namespace {
 
-using ::testing::HasSubstr;
-using Rows = std::vector<std::string>;
+using namespace ::testing;
 
 class SharedIndexTest : public IndexDaemonTest {
  protected:
@@ -33,13 +27,13 @@ class SharedIndexTest : public IndexDaemonTest {
     return media;
   }
 
-  /// What velathumb does when it has made a thumbnail. Returns 0 when all went well.
+  /// Registers a thumbnail as velathumb does. Returns 0 on success.
   static int RegisterConversion(const std::string& path) {
     return VELAIDX_IndexConvertAdd(Media(path), Media(path + ".thumb"), Json::Value());
   }
 };
 
-TEST_F(SharedIndexTest, IsMadeWithItsDirectory) {
+TEST_F(SharedIndexTest, IsCreatedWithItsDirectory) {
   ProgramOptions options;
   options.umask = 077;
   const IndexDaemon daemon({}, options);
@@ -48,7 +42,7 @@ TEST_F(SharedIndexTest, IsMadeWithItsDirectory) {
   EXPECT_EQ(Query("PRAGMA user_version"), Rows{"0"}) << "that is for others to set";
 }
 
-TEST_F(SharedIndexTest, IsForItsOwnerAndGroupWhateverTheMask) {
+TEST_F(SharedIndexTest, IsForItsOwnerAndGroupWhateverTheUmask) {
   for (const mode_t mask : {0U, 077U}) {
     RemoveTree("/var/lib/velaindex");
     ProgramOptions options;
@@ -63,7 +57,7 @@ TEST_F(SharedIndexTest, IsForItsOwnerAndGroupWhateverTheMask) {
   }
 }
 
-TEST_F(SharedIndexTest, ThatIsThereKeepsItsModes) {
+TEST_F(SharedIndexTest, ThatExistsKeepsItsModes) {
   ASSERT_EQ(RegisterConversion("/before.jpg"), 0);
   ASSERT_EQ(chmod("/var/lib/velaindex", 0711), 0);
   ASSERT_EQ(chmod(kIndexDatabase, 0604), 0);
@@ -73,14 +67,14 @@ TEST_F(SharedIndexTest, ThatIsThereKeepsItsModes) {
   EXPECT_EQ(ModeOf(kIndexDatabase), 0604);
 }
 
-TEST_F(SharedIndexTest, MayLieElsewhere) {
+TEST_F(SharedIndexTest, MayBeInAnotherPlace) {
   const IndexDaemon daemon({"--database", "/tmp/some/where/index.db"});
   PostPhotoConvert("/a.jpg");
   EXPECT_EQ(Query("SELECT count(*) FROM posted", "/tmp/some/where/index.db"), Rows{"1"});
   EXPECT_FALSE(Exists("/var/lib/velaindex"));
 }
 
-TEST_F(SharedIndexTest, IsUsedTogetherWithWhoRegistersConversions) {
+TEST_F(SharedIndexTest, IsSharedWithProgramsThatRegisterConversions) {
   ASSERT_EQ(RegisterConversion("/before.jpg"), 0);
   ASSERT_EQ(Query("PRAGMA user_version"), Rows{"1"});
   const IndexDaemon daemon;
@@ -91,7 +85,7 @@ TEST_F(SharedIndexTest, IsUsedTogetherWithWhoRegistersConversions) {
   EXPECT_EQ(Query("SELECT count(*) FROM posted"), Rows{"1"});
 }
 
-TEST_F(SharedIndexTest, LeavesOtherProgramsTheirMakingOfTables) {
+TEST_F(SharedIndexTest, LetsOtherProgramsCreateTheirTables) {
   const IndexDaemon daemon;
   PostPhotoConvert("/a.jpg");
   ASSERT_EQ(RegisterConversion("/a.jpg"), 0);
@@ -116,34 +110,28 @@ TEST_F(SharedIndexTest, AllWritersGetTheirTurn) {
             Rows{"100|100"});
 }
 
-TEST_F(SharedIndexTest, OfANewerVersionIsLeftAlone) {
+TEST_F(SharedIndexTest, OfANewerVersionIsNotUsed) {
   {
     IndexDaemon daemon;
     EXPECT_EQ(daemon.End(SIGTERM).exitCode, 0);
   }
   Query("UPDATE velaindexplugind_schema SET version = 2");
-  const ProgramResult result = RunProgram(IndexDaemonPath(), {});
-  EXPECT_EQ(result.exitCode, 1);
-  EXPECT_THAT(result.err, HasSubstr("those of a newer velaindexplugind"));
+  ExpectRefusal({}, "those of a newer velaindexplugind");
   EXPECT_FALSE(Exists(PluginDaemonSocketPath));
   EXPECT_EQ(Query("SELECT version FROM velaindexplugind_schema"), Rows{"2"});
 }
 
-TEST_F(SharedIndexTest, ThatIsNoDatabaseKeepsTheDaemonFromStarting) {
+TEST_F(SharedIndexTest, ThatIsNotADatabaseKeepsTheDaemonFromStarting) {
   WriteFile(kIndexDatabase, std::string(8192, 'x'));
-  const ProgramResult result = RunProgram(IndexDaemonPath(), {});
-  EXPECT_EQ(result.exitCode, 1);
-  EXPECT_THAT(result.err, HasSubstr("not a database"));
+  ExpectRefusal({}, "not a database");
   EXPECT_EQ(ReadFile(kIndexDatabase), std::string(8192, 'x'));
 }
 
-TEST_F(SharedIndexTest, ThatCannotBeMadeKeepsTheDaemonFromStarting) {
-  const ProgramResult result = RunProgram(IndexDaemonPath(), {"--database", "/proc/none/index.db"});
-  EXPECT_EQ(result.exitCode, 1);
-  EXPECT_THAT(result.err, HasSubstr("/proc/none/index.db"));
+TEST_F(SharedIndexTest, ThatCannotBeCreatedKeepsTheDaemonFromStarting) {
+  ExpectRefusal({"--database", "/proc/none/index.db"}, "/proc/none/index.db");
 }
 
-TEST_F(SharedIndexTest, ThatIsRemovedIsMadeAnew) {
+TEST_F(SharedIndexTest, ThatIsRemovedIsCreatedAgain) {
   const IndexDaemon daemon;
   PostPhotoConvert("/a.jpg");
   EXPECT_EQ(GetIndexVersion("/a"), 0);
@@ -167,7 +155,7 @@ TEST_F(SharedIndexTest, ThatIsReplacedIsUsed) {
   EXPECT_EQ(GetIndexVersion("/photos/a.jpg"), 8);
 }
 
-TEST_F(SharedIndexTest, IsWholeAfterTheDaemonIsKilled) {
+TEST_F(SharedIndexTest, IsIntactAfterTheDaemonIsKilled) {
   for (int round = 0; round < 10; ++round) {
     IndexDaemon daemon;
     std::vector<std::string> answered;
@@ -187,6 +175,31 @@ TEST_F(SharedIndexTest, IsWholeAfterTheDaemonIsKilled) {
                               std::to_string(round) + "/%'";
     EXPECT_GE(std::stoul(Query(count).at(0)), answered.size()) << "an answered post is lost";
   }
+}
+
+// Also registered with ImageMagick as the converter, see CMakeLists.txt.
+class VelathumbTest : public IndexDaemonTest {
+ protected:
+  static ProgramResult RunVelathumb() {
+    const std::string profiles = WriteProfileFile("/tmp/profiles.conf", UsualProfiles());
+    return RunProgram(VelathumbPath(), {profiles, "/tmp/photos"});
+  }
+};
+
+TEST_F(VelathumbTest, PostsItsPhotosAndRegistersTheirThumbnailsInOneIndex) {
+  InstallRealConverter();
+  MakeDirectories("/tmp/photos");
+  MakeJpeg("/tmp/photos/a.jpg");
+  MakeJpeg("/tmp/photos/b \xff.jpg");
+  IndexDaemon daemon({"--log-requests"});
+  EXPECT_EQ(RunVelathumb().exitCode, 0);
+  EXPECT_EQ(ErrorLines(), Rows{});
+  const Rows both = {"2F746D702F70686F746F732F612E6A7067",
+                     "2F746D702F70686F746F732F6220FF2E6A7067"};
+  EXPECT_EQ(Query("SELECT hex(path) FROM posted ORDER BY path"), both);
+  EXPECT_EQ(Query("SELECT hex(photo_path) FROM conversion ORDER BY photo_path"), both);
+  const std::string log = daemon.End(SIGTERM).err;
+  EXPECT_THAT(log, HasSubstr("command=GET_INDEX_VERSION path=/tmp/photos/a.jpg outcome=done"));
 }
 
 }  // namespace

@@ -1,4 +1,4 @@
-// Threads for work that may have to wait.
+// The worker threads and their queue.
 #include "worker_pool.h"
 
 #include <gtest/gtest.h>
@@ -16,7 +16,7 @@ namespace {
 
 using Sizes = std::vector<size_t>;
 
-/// A pool of one thread whose first piece of work lasts until it is let go on.
+/// A pool of one thread whose first batch lasts until GoOn.
 class HeldPool {
  public:
   explicit HeldPool(size_t batch)
@@ -41,7 +41,7 @@ class HeldPool {
 
   bool Remove(uint64_t client) { return pool_.Remove(client); }
 
-  /// Lets the work go on. Returns whose jobs are done as soon as there are so many.
+  /// Lets the work continue. Returns the clients of the finished jobs as soon as there are `count`.
   std::vector<uint64_t> GoOn(size_t count) {
     goOn_.set_value();
     std::vector<uint64_t> clients;
@@ -52,7 +52,7 @@ class HeldPool {
     return clients;
   }
 
-  /// How many jobs each piece of work had; after GoOn.
+  /// The number of jobs in each batch; after GoOn.
   const Sizes& WorkSizes() const { return sizes_; }
 
  private:
@@ -68,16 +68,16 @@ class HeldPool {
   WorkerPool pool_;
 };
 
-TEST(WorkerPoolTest, RemovesWhatWaitsAndNothingElse) {
+TEST(WorkerPoolTest, RemovesOnlyPendingJobs) {
   HeldPool pool(1);
   for (const uint64_t client : {1U, 2U, 3U}) pool.Add(client);
-  EXPECT_FALSE(pool.Remove(0)) << "it is in hand";
+  EXPECT_FALSE(pool.Remove(0)) << "it is in progress";
   EXPECT_TRUE(pool.Remove(2));
   EXPECT_FALSE(pool.Remove(2));
   EXPECT_EQ(pool.GoOn(3), (std::vector<uint64_t>{0, 1, 3}));
 }
 
-TEST(WorkerPoolTest, GivesWhatWaitsTogether) {
+TEST(WorkerPoolTest, HandsOutPendingJobsInBatches) {
   HeldPool pool(4);
   for (const uint64_t client : {1U, 2U, 3U, 4U, 5U, 6U}) pool.Add(client);
   EXPECT_EQ(pool.GoOn(7), (std::vector<uint64_t>{0, 1, 2, 3, 4, 5, 6}));

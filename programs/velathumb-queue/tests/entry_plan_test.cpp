@@ -1,4 +1,4 @@
-// Which entry comes next, and what an entry stands for.
+// The order of entries, and the directories they cover.
 #include "entry_plan.h"
 
 #include <gmock/gmock.h>
@@ -17,42 +17,40 @@ namespace vela_test {
 namespace {
 
 using std::chrono::seconds;
-using ::testing::Optional;
+using namespace ::testing;
 
 class EntryTargetTest : public SandboxTest {};
 
-TEST_F(EntryTargetTest, OfAPlainEntryIsTheDirectory) {
-  const EntryTarget target = TargetOf("/tmp");
-  EXPECT_EQ(target.directory, "/tmp");
-  EXPECT_FALSE(target.isTree);
+TEST_F(EntryTargetTest, IsADirectoryOrATree) {
+  const struct {
+    const char* entry;
+    const char* directory;
+    bool isTree;
+  } cases[] = {
+      {"/tmp", "/tmp", false},
+      {"R:/tmp", "/tmp", true},
+      {"/no:where", "/no:where", false},
+      {"R:/no:where", "/no", true},
+      {"R::/no:where", "/no", true},
+      {"R:", "", true},
+      {"r:/no", "r:/no", false},
+      {"/no/where//", "/no/where", false},
+      {"/", "/", false},
+  };
+  for (const auto& [entry, directory, isTree] : cases) {
+    const EntryTarget target = TargetOf(entry);
+    EXPECT_EQ(target.directory, directory) << entry;
+    EXPECT_EQ(target.isTree, isTree) << entry;
+  }
 }
 
-TEST_F(EntryTargetTest, OfATreeEntryIsTheTree) {
-  const EntryTarget target = TargetOf("R:/tmp");
-  EXPECT_EQ(target.directory, "/tmp");
-  EXPECT_TRUE(target.isTree);
-}
-
-TEST_F(EntryTargetTest, AColonBelongsToAPlainEntryAndEndsATree) {
-  EXPECT_EQ(TargetOf("/no:where").directory, "/no:where");
-  EXPECT_EQ(TargetOf("R:/no:where").directory, "/no");
-  EXPECT_EQ(TargetOf("R::/no:where").directory, "/no");
-  EXPECT_EQ(TargetOf("R:").directory, "");
-  EXPECT_FALSE(TargetOf("r:/no").isTree);
-}
-
-TEST_F(EntryTargetTest, IsTheSameByWhateverName) {
+TEST_F(EntryTargetTest, IsTheSameForEveryName) {
   MakeDirectories("/tmp/photos/here");
   ASSERT_EQ(symlink("photos", "/tmp/alias"), 0);
   for (const char* entry : {"/tmp/photos/here", "/tmp/alias/here", "/tmp//photos/./here/",
                             "R:/tmp/alias/here", "/tmp/photos/here/../here"}) {
     EXPECT_EQ(TargetOf(entry).directory, "/tmp/photos/here") << entry;
   }
-}
-
-TEST_F(EntryTargetTest, WithoutADirectoryIsTheNameWithoutSlashesAtItsEnd) {
-  EXPECT_EQ(TargetOf("/no/where//").directory, "/no/where");
-  EXPECT_EQ(TargetOf("/").directory, "/");
 }
 
 TEST(Overlap, IsHavingADirectoryInCommon) {
@@ -100,7 +98,7 @@ TEST_F(EntryPlanTest, HandsEntriesOutInTheirOrder) {
   EXPECT_TRUE(plan.IsFinished());
 }
 
-TEST_F(EntryPlanTest, LeavesOutWhatOverlapsWithWorkUntilThatIsDone) {
+TEST_F(EntryPlanTest, SkipsEntriesThatOverlapWithOnesInProgress) {
   EntryPlan plan({"R:/a", "/a/b", "/b", "R:/a/b/c"});
   EXPECT_THAT(plan.Start(now_), Optional(0U));
   EXPECT_THAT(plan.Start(now_), Optional(2U));
@@ -110,7 +108,7 @@ TEST_F(EntryPlanTest, LeavesOutWhatOverlapsWithWorkUntilThatIsDone) {
   EXPECT_THAT(plan.Start(now_), Optional(3U));
 }
 
-TEST_F(EntryPlanTest, WhatIsPutOffWaitsForItsTimeAndHoldsNobodyBack) {
+TEST_F(EntryPlanTest, APostponedEntryWaitsForItsTimeAndHoldsNothingBack) {
   EntryPlan plan({"/a", "R:/a"});
   EXPECT_THAT(plan.Start(now_), Optional(0U));
   plan.Postpone(0, now_ + seconds(5));

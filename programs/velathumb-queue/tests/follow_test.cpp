@@ -1,37 +1,19 @@
-// A runner that stays, and appends that race with it.
-#include <gmock/gmock.h>
+// A runner with --follow, and appends that race with it.
 #include <sys/wait.h>
 
-#include <chrono>
 #include <set>
-#include <string>
 #include <thread>
-#include <vector>
 
-#include "platform/velaindex.h"
 #include "queue_fixture.h"
-#include "support/files.h"
 
 namespace vela_test {
 namespace {
 
+using namespace ::testing;
 using std::chrono::milliseconds;
 using std::chrono::seconds;
-using ::testing::ElementsAre;
-using ::testing::HasSubstr;
-using ::testing::Not;
 
-class FollowTest : public QueueTest {
- protected:
-  static void Stop(Program& runner) {
-    runner.Kill(SIGTERM);
-    const auto result = runner.Wait(seconds(5));
-    ASSERT_TRUE(result);
-    EXPECT_EQ(result->exitCode, 1);
-  }
-
-  RecordingVelathumb velathumb_;
-};
+using FollowTest = QueueTest;
 
 TEST_F(FollowTest, ReactsToANewQueue) {
   Program runner = velathumb_.Start({"--follow"});
@@ -46,10 +28,10 @@ TEST_F(FollowTest, ReactsToANewQueue) {
   }
   EXPECT_THAT(velathumb_.Entries(), ElementsAre("/tmp/a", "/tmp/b", "/tmp/c"));
   Stop(runner);
-  ExpectNothingWaits();
+  ExpectQueueDone();
 }
 
-TEST_F(FollowTest, TakesNoQueueFromUnderTheHandsOfWhoeverMakesIt) {
+TEST_F(FollowTest, DoesNotTakeAQueueBeforeItsFirstEntryIsWritten) {
   Program runner = velathumb_.Start({"--follow"});
   for (int i = 0; i < 100; ++i) {
     Enqueue({"/tmp/" + std::to_string(i)});
@@ -59,7 +41,7 @@ TEST_F(FollowTest, TakesNoQueueFromUnderTheHandsOfWhoeverMakesIt) {
   Stop(runner);
 }
 
-TEST_F(FollowTest, ReactsToAQueueThatIsPutInPlaceByRenaming) {
+TEST_F(FollowTest, ReactsToARenamedQueue) {
   Program runner = velathumb_.Start({"-f"});
   EXPECT_FALSE(runner.Wait(milliseconds(200)));
   MakeEntryDirectories({"/tmp/a"});
@@ -69,7 +51,7 @@ TEST_F(FollowTest, ReactsToAQueueThatIsPutInPlaceByRenaming) {
   Stop(runner);
 }
 
-TEST_F(FollowTest, BeginsWithWhatWaits) {
+TEST_F(FollowTest, BeginsWithPendingEntries) {
   MakeEntryDirectories({"/tmp/old"});
   WriteFile(kTakenFile, "/tmp/old\n");
   Enqueue({"/tmp/new"});
@@ -80,33 +62,18 @@ TEST_F(FollowTest, BeginsWithWhatWaits) {
   Stop(runner);
 }
 
-/// Starts a process that appends `count` entries, with pauses in which the queue is taken.
-pid_t StartAppender(int number, int count) {
-  const pid_t child = fork();
-  if (child != 0) {
-    return child;
-  }
-  for (int i = 0; i < count; ++i) {
-    const std::string entry = "/tmp/" + std::to_string(number) + '/' + std::to_string(i);
-    if (WriteIndexQueue(entry.c_str(), kQueueFile) != 0) {
-      _exit(1);
-    }
-    usleep(static_cast<useconds_t>((number * 7 + i * 13) % 10) * 1000);
-  }
-  _exit(0);
-}
-
 TEST_F(FollowTest, EveryEntryOfManyAppendersReachesVelathumb) {
   constexpr int kAppenders = 4;
   constexpr int kEntries = 60;
+  for (int i = 0; i < kAppenders * kEntries; ++i) {
+    MakeDirectories("/tmp/" + std::to_string(i % kAppenders) + '/' +
+                    std::to_string(i / kAppenders));
+  }
   std::vector<pid_t> appenders;
   for (int i = 0; i < kAppenders; ++i) {
-    for (int j = 0; j < kEntries; ++j) {
-      MakeDirectories("/tmp/" + std::to_string(i) + '/' + std::to_string(j));
-    }
-  }
-  for (int i = 0; i < kAppenders; ++i) {
-    appenders.push_back(StartAppender(i, kEntries));
+    // The pauses give the runner time to take the queue.
+    appenders.push_back(StartAppender("/tmp/" + std::to_string(i), kEntries,
+                                      [i](int j) { return (i * 7 + j * 13) % 10 * 1000; }));
   }
   size_t takes = 0;
   bool isLast = false;
@@ -127,7 +94,7 @@ TEST_F(FollowTest, EveryEntryOfManyAppendersReachesVelathumb) {
   const std::vector<std::string> entries = velathumb_.Entries();
   EXPECT_EQ(entries.size(), static_cast<size_t>(kAppenders * kEntries));
   EXPECT_EQ(std::set<std::string>(entries.begin(), entries.end()).size(), entries.size());
-  ExpectNothingWaits();
+  ExpectQueueDone();
 }
 
 }  // namespace

@@ -1,31 +1,21 @@
-// Several velathumbs at a time.
+// Several instances of velathumb at the same time.
 #include <fcntl.h>
-#include <gmock/gmock.h>
-#include <sys/file.h>
 #include <unistd.h>
 
 #include <algorithm>
-#include <chrono>
 #include <map>
-#include <string>
 #include <thread>
-#include <vector>
 
 #include "queue_fixture.h"
-#include "support/descriptor.h"
-#include "support/files.h"
-#include "support/stub_tool.h"
 
 namespace vela_test {
 namespace {
 
+using namespace ::testing;
 using std::chrono::milliseconds;
 using std::chrono::seconds;
-using ::testing::ElementsAre;
-using ::testing::SizeIs;
-using ::testing::UnorderedElementsAre;
 
-/// How many calls there were at once, at most; 0 when one did not come to its end.
+/// The largest number of calls at the same time; 0 when one did not end.
 int MostAtOnce(const std::vector<StubCall>& calls) {
   int most = 0;
   for (const StubCall& call : calls) {
@@ -40,11 +30,11 @@ int MostAtOnce(const std::vector<StubCall>& calls) {
   return most;
 }
 
-bool WereAtWorkTogether(const StubCall& a, const StubCall& b) {
+bool DidOverlap(const StubCall& a, const StubCall& b) {
   return a.startSequence < b.endSequence && b.startSequence < a.endSequence;
 }
 
-/// Whether a digit is in both.
+/// Whether both contain the same digit.
 bool HaveCommon(const std::string& a, const std::string& b) {
   return std::any_of(a.begin(), a.end(),
                      [&](char c) { return c != ' ' && b.find(c) != std::string::npos; });
@@ -52,17 +42,13 @@ bool HaveCommon(const std::string& a, const std::string& b) {
 
 class JobsTest : public QueueTest {
  protected:
-  static void ExpectEnd(Program& runner) {
-    const auto result = runner.Wait(seconds(20));
-    ASSERT_TRUE(result);
-    EXPECT_EQ(result->exitCode, 0);
-    ExpectNothingWaits();
+  static void ExpectSuccess(Program& runner) {
+    ExpectEnd(runner, 0);
+    ExpectQueueDone();
   }
-
-  RecordingVelathumb velathumb_;
 };
 
-TEST_F(JobsTest, OneAtATimeUnlessToldOtherwise) {
+TEST_F(JobsTest, OneAtATimeByDefault) {
   velathumb_.Stub().Plan(StubPlan().Sleep(20));
   Enqueue({"/tmp/a", "/tmp/b", "/tmp/c"});
   EXPECT_EQ(velathumb_.Run().exitCode, 0);
@@ -70,25 +56,25 @@ TEST_F(JobsTest, OneAtATimeUnlessToldOtherwise) {
   EXPECT_THAT(velathumb_.Entries(), ElementsAre("/tmp/a", "/tmp/b", "/tmp/c"));
 }
 
-TEST_F(JobsTest, AsManyAsToldAtATime) {
+TEST_F(JobsTest, AsManyAtATimeAsRequested) {
   velathumb_.Stub().Plan(StubPlan().WaitForFile("/tmp/go"));
   Enqueue({"/tmp/a", "/tmp/b", "/tmp/c", "/tmp/d", "/tmp/e", "/tmp/f"});
   Program runner = velathumb_.Start({"--jobs", "3"});
   ASSERT_TRUE(velathumb_.WaitForStarts(3));
   std::this_thread::sleep_for(milliseconds(300));
   EXPECT_THAT(velathumb_.Entries(), UnorderedElementsAre("/tmp/a", "/tmp/b", "/tmp/c"));
-  WriteFile("/tmp/go", "");
-  ExpectEnd(runner);
+  Release();
+  ExpectSuccess(runner);
   EXPECT_THAT(velathumb_.Entries(), SizeIs(6));
   EXPECT_EQ(MostAtOnce(velathumb_.Stub().Calls()), 3);
 }
 
-TEST_F(JobsTest, NeverTwoThatStandForACommonDirectory) {
+TEST_F(JobsTest, NeverTwoForTheSameDirectory) {
   MakeDirectories("/tmp/a/b/c");
   MakeDirectories("/tmp/ab");
   ASSERT_EQ(symlink("a/b", "/tmp/alias"), 0);
   velathumb_.Stub().Plan(StubPlan().Sleep(60));
-  // Which of the four directories each entry stands for.
+  // Which of the four directories each entry covers.
   const std::map<std::string, std::string> directories = {
       {"R:/tmp/a", "1 2 3"}, {"/tmp/a/b", "2"},     {"/tmp/alias", "2"},    {"R:/tmp/alias", "2 3"},
       {"/tmp/ab", "4"},      {"/tmp/a", "1"},       {"R::/tmp/a", "1 2 3"}, {"/tmp/alias/c", "3"},
@@ -106,23 +92,21 @@ TEST_F(JobsTest, NeverTwoThatStandForACommonDirectory) {
       const std::string first = a.Parameters().back();
       const std::string second = b.Parameters().back();
       if (a.number < b.number && HaveCommon(directories.at(first), directories.at(second))) {
-        EXPECT_FALSE(WereAtWorkTogether(a, b)) << first << ' ' << second;
+        EXPECT_FALSE(DidOverlap(a, b)) << first << ' ' << second;
       }
     }
   }
 }
 
-TEST_F(JobsTest, ADirectoryThatSomebodyWorksOnWaitsAndIsDoneAfterwards) {
+TEST_F(JobsTest, ALockedDirectoryIsConvertedLater) {
   const StubTool converter(kConverterPath);
   const std::string locked = MakePhoto("/tmp/p/locked/a.jpg");
   const std::string inTree = MakePhoto("/tmp/p/tree/below/b.jpg");
   const std::string free = MakePhoto("/tmp/p/free/c.jpg");
   MakeDirectories("/tmp/p/locked/@eaDir");
   MakeDirectories("/tmp/p/tree/below/@eaDir");
-  Descriptor first(open("/tmp/p/locked/@eaDir", O_RDONLY | O_CLOEXEC));
-  Descriptor second(open("/tmp/p/tree/below/@eaDir", O_RDONLY | O_CLOEXEC));
-  ASSERT_EQ(flock(first.Get(), LOCK_EX), 0);
-  ASSERT_EQ(flock(second.Get(), LOCK_EX), 0);
+  Descriptor first = HoldLock("/tmp/p/locked/@eaDir", O_RDONLY);
+  Descriptor second = HoldLock("/tmp/p/tree/below/@eaDir", O_RDONLY);
   Enqueue({"/tmp/p/locked", "R:/tmp/p/tree", "/tmp/p/free"});
   Program runner = StartRunner();
   EXPECT_TRUE(WaitUntilExists("/tmp/p/free/@eaDir/c.jpg/VELAPHOTO_THUMB_S.jpg"));
@@ -132,7 +116,7 @@ TEST_F(JobsTest, ADirectoryThatSomebodyWorksOnWaitsAndIsDoneAfterwards) {
   EXPECT_FALSE(runner.Wait(milliseconds(0)));
   first.Close();
   second.Close();
-  ExpectEnd(runner);
+  ExpectSuccess(runner);
   EXPECT_TRUE(HasThumb(locked));
   EXPECT_TRUE(HasThumb(inTree));
   EXPECT_TRUE(HasThumb(free));
@@ -148,46 +132,35 @@ TEST_F(JobsTest, ASecondRunnerIsRefused) {
   EXPECT_EQ(second.exitCode, 1);
   EXPECT_EQ(second.err, "velathumb-queue: another velathumb-queue is already running\n");
   EXPECT_EQ(ReadFile(kQueueFile), "/tmp/b\n");
-  WriteFile("/tmp/go", "");
-  ExpectEnd(runner);
+  Release();
+  ExpectSuccess(runner);
   EXPECT_THAT(velathumb_.Entries(), ElementsAre("/tmp/a", "/tmp/b"));
 }
 
-TEST_F(JobsTest, ADirectoryThatSomebodyHasTakenMeanwhileIsDoneAgainAfterwards) {
-  velathumb_.Stub().PlanCall(1, StubPlan().WaitForFile("/tmp/go"));
+TEST_F(JobsTest, ADirectoryThatWasLockedMeanwhileIsRepeated) {
   MakeDirectories("/tmp/a/@eaDir");
-  Enqueue({"/tmp/a"});
-  Program runner = velathumb_.Start();
-  ASSERT_TRUE(velathumb_.WaitForStarts(1));
-  Descriptor metadata(open("/tmp/a/@eaDir", O_RDONLY | O_CLOEXEC));
-  ASSERT_EQ(flock(metadata.Get(), LOCK_EX), 0);
-  WriteFile("/tmp/go", "");
+  Program runner = StartAndHold({"/tmp/a"});
+  Descriptor metadata = HoldLock("/tmp/a/@eaDir", O_RDONLY);
+  Release();
   EXPECT_FALSE(runner.Wait(milliseconds(500)));
   EXPECT_FALSE(Exists(kJournalFile));
   metadata.Close();
-  ExpectEnd(runner);
+  ExpectSuccess(runner);
   EXPECT_THAT(velathumb_.Entries(), ElementsAre("/tmp/a", "/tmp/a"));
 }
 
-TEST_F(JobsTest, ASecondRunnerThatWaitsGoesOnAfterTheFirst) {
-  velathumb_.Stub().PlanCall(1, StubPlan().WaitForFile("/tmp/never"));
-  Enqueue({"/tmp/a"});
-  Program first = velathumb_.Start();
-  ASSERT_TRUE(velathumb_.WaitForStarts(1));
+TEST_F(JobsTest, ASecondRunnerThatWaitsContinuesAfterTheFirst) {
+  Program first = StartAndHold({"/tmp/a"});
   Program second = velathumb_.Start({"--wait"});
   EXPECT_FALSE(second.Wait(milliseconds(300)));
   EXPECT_THAT(velathumb_.Entries(), SizeIs(1));
-  first.Kill(SIGTERM);
-  EXPECT_TRUE(first.Wait(seconds(5)));
-  ExpectEnd(second);
+  Stop(first);
+  ExpectSuccess(second);
   EXPECT_THAT(velathumb_.Entries(), ElementsAre("/tmp/a", "/tmp/a"));
 }
 
-TEST_F(JobsTest, ARunnerThatWaitedForALockFileThatIsGoneWaitsForTheNewOne) {
-  velathumb_.Stub().PlanCall(1, StubPlan().WaitForFile("/tmp/never"));
-  Enqueue({"/tmp/a"});
-  Program first = velathumb_.Start();
-  ASSERT_TRUE(velathumb_.WaitForStarts(1));
+TEST_F(JobsTest, ARunnerThatWaitsForARemovedLockFileWaitsForTheNewOne) {
+  Program first = StartAndHold({"/tmp/a"});
   Program second = velathumb_.Start({"--wait"});
   EXPECT_FALSE(second.Wait(milliseconds(300)));
   RemoveTree("/run/velathumb-queue.lock");
@@ -196,13 +169,12 @@ TEST_F(JobsTest, ARunnerThatWaitedForALockFileThatIsGoneWaitsForTheNewOne) {
   whole.l_type = F_WRLCK;
   whole.l_whence = SEEK_SET;
   ASSERT_EQ(fcntl(made.Get(), F_SETLK, &whole), 0);
-  first.Kill(SIGTERM);
-  EXPECT_TRUE(first.Wait(seconds(5)));
+  Stop(first);
   EXPECT_FALSE(second.Wait(milliseconds(300)));
   EXPECT_THAT(velathumb_.Entries(), SizeIs(1));
   whole.l_type = F_UNLCK;
   ASSERT_EQ(fcntl(made.Get(), F_SETLK, &whole), 0);
-  ExpectEnd(second);
+  ExpectSuccess(second);
   EXPECT_THAT(velathumb_.Entries(), SizeIs(2));
 }
 

@@ -1,135 +1,102 @@
-// Entries that cannot be worked on now, and files of the queue that somebody holds.
+// Entries that cannot be processed now, and files of the queue that are locked.
 #include <fcntl.h>
-#include <gmock/gmock.h>
-#include <sys/file.h>
 
 #include <algorithm>
-#include <chrono>
-#include <string>
-#include <vector>
 
 #include "queue_fixture.h"
-#include "support/descriptor.h"
-#include "support/files.h"
 #include "support/mounts.h"
 
 namespace vela_test {
 namespace {
 
+using namespace ::testing;
 using std::chrono::milliseconds;
 using std::chrono::seconds;
-using ::testing::ElementsAre;
-using ::testing::HasSubstr;
-using ::testing::IsEmpty;
 
 constexpr uint64_t kGibibyte = uint64_t{1} << 30;
 
-Descriptor HoldLock(const char* file) {
-  Descriptor held(open(file, O_RDWR | O_CREAT | O_CLOEXEC, 0644));
-  EXPECT_EQ(flock(held.Get(), LOCK_EX), 0);
-  return held;
-}
-
 class LaterTest : public QueueTest {
  protected:
-  static void ExpectEnd(Program& runner, int exitCode) {
-    const auto result = runner.Wait(seconds(10));
-    ASSERT_TRUE(result);
-    EXPECT_EQ(result->exitCode, exitCode) << result->err;
+  /// Fails the test unless the run ends with status 1 and exactly these entries are kept for a
+  /// later one. Returns what the runner printed to standard error.
+  std::string ExpectRunKeeps(const std::vector<std::string>& entries) const {
+    const ProgramResult result = velathumb_.Run();
+    EXPECT_EQ(result.exitCode, 1);
+    ExpectKept(entries);
+    return result.err;
   }
 
-  /// Nothing waits but these entries, which are kept.
+  /// Fails the test unless exactly these entries are kept for a later run.
   static void ExpectKept(const std::vector<std::string>& entries) {
     EXPECT_EQ(ReadFile(kLaterFile), Lines(entries));
     for (const char* file : {kQueueFile, kTakenFile, kJournalFile}) {
       EXPECT_FALSE(Exists(file)) << file;
     }
   }
-
-  RecordingVelathumb velathumb_;
 };
 
-TEST_F(LaterTest, ADirectoryThatIsNotThereIsKeptUntilItIs) {
+TEST_F(LaterTest, AMissingDirectoryIsKeptUntilItExists) {
   AppendToQueue({"/tmp/none", "R:/tmp/gone"});
   Enqueue({"/tmp/a"});
-  const ProgramResult first = velathumb_.Run();
-  EXPECT_EQ(first.exitCode, 1);
-  EXPECT_THAT(first.err,
-              HasSubstr("deferred to a later run, there is no such directory: R:/tmp/gone\n"));
-  ExpectKept({"/tmp/none", "R:/tmp/gone"});
+  EXPECT_THAT(ExpectRunKeeps({"/tmp/none", "R:/tmp/gone"}),
+              HasSubstr("left for a later run, there is no such directory: R:/tmp/gone\n"));
   MakeDirectories("/tmp/gone");
-  EXPECT_EQ(velathumb_.Run().exitCode, 1);
-  ExpectKept({"/tmp/none"});
+  ExpectRunKeeps({"/tmp/none"});
   MakeDirectories("/tmp/none");
-  EXPECT_EQ(velathumb_.Run().exitCode, 0);
-  EXPECT_THAT(velathumb_.Entries(), ElementsAre("/tmp/a", "R:/tmp/gone", "/tmp/none"));
-  ExpectNothingWaits();
+  ExpectRun({"/tmp/a", "R:/tmp/gone", "/tmp/none"});
 }
 
-TEST_F(LaterTest, ADirectoryThatGoesWhileItIsWorkedOnIsKept) {
+TEST_F(LaterTest, ADirectoryThatIsRemovedMeanwhileIsKept) {
   velathumb_.Stub().PlanCall(1, StubPlan().Remove("/tmp/a"));
   Enqueue({"/tmp/a"});
-  EXPECT_EQ(velathumb_.Run().exitCode, 1);
-  ExpectKept({"/tmp/a"});
+  ExpectRunKeeps({"/tmp/a"});
 }
 
-TEST_F(LaterTest, ANearlyFullVolumeIsLeftAloneUntilItHasRoom) {
+TEST_F(LaterTest, ANearlyFullVolumeIsSkippedUntilItHasRoom) {
   SmallVolume volume("/tmp/small", 2 * kGibibyte);
   WriteFile("/tmp/small/file", "");
   volume.SetAvailable(kGibibyte - SmallVolume::PageSize());
   Enqueue({"/tmp/small", "/tmp/a"});
-  const ProgramResult first = velathumb_.Run();
-  EXPECT_EQ(first.exitCode, 1);
-  EXPECT_THAT(first.err,
-              HasSubstr("deferred to a later run, its volume is nearly full: /tmp/small\n"));
+  EXPECT_THAT(ExpectRunKeeps({"/tmp/small"}),
+              HasSubstr("left for a later run, its volume is nearly full: /tmp/small\n"));
   EXPECT_THAT(velathumb_.Entries(), ElementsAre("/tmp/a"));
-  ExpectKept({"/tmp/small"});
   volume.SetAvailable(kGibibyte);
-  EXPECT_EQ(velathumb_.Run().exitCode, 0);
-  EXPECT_THAT(velathumb_.Entries(), ElementsAre("/tmp/a", "/tmp/small"));
-  ExpectNothingWaits();
+  ExpectRun({"/tmp/a", "/tmp/small"});
 }
 
-TEST_F(LaterTest, AVolumeThatBecomesNearlyFullIsDoneAgain) {
+TEST_F(LaterTest, AVolumeThatBecomesNearlyFullIsRepeated) {
   SmallVolume volume("/tmp/small", 2 * kGibibyte);
   WriteFile("/tmp/small/file", "x");
   velathumb_.Stub().PlanCall(1, StubPlan().FillVolume("/tmp/small"));
   Enqueue({"/tmp/small"});
-  EXPECT_EQ(velathumb_.Run().exitCode, 1);
-  ExpectKept({"/tmp/small"});
+  ExpectRunKeeps({"/tmp/small"});
   volume.SetAvailable(2 * kGibibyte);
-  EXPECT_EQ(velathumb_.Run().exitCode, 0);
-  EXPECT_THAT(velathumb_.Entries(), ElementsAre("/tmp/small", "/tmp/small"));
-  ExpectNothingWaits();
+  ExpectRun({"/tmp/small", "/tmp/small"});
 }
 
 /// Takes a minute: the pauses between the tries become longer and longer.
 TEST_F(LaterTest, AnEntryWhoseVelathumbIsKilledEachTimeIsKept) {
   velathumb_.Stub().PlanWhen("/tmp/a", StubPlan().DieBySignal(SIGKILL));
   Enqueue({"/tmp/a", "/tmp/b"});
-  const ProgramResult result = velathumb_.Run();
-  EXPECT_EQ(result.exitCode, 1);
-  EXPECT_THAT(result.err,
-              HasSubstr("deferred to a later run, velathumb did not complete in any try: /tmp/a\n"));
+  EXPECT_THAT(ExpectRunKeeps({"/tmp/a"}),
+              HasSubstr("left for a later run, velathumb was ended each time: /tmp/a\n"));
   const std::vector<std::string> entries = velathumb_.Entries();
   EXPECT_EQ(std::count(entries.begin(), entries.end(), "/tmp/a"), 25);
   EXPECT_EQ(std::count(entries.begin(), entries.end(), "/tmp/b"), 1);
-  ExpectKept({"/tmp/a"});
 }
 
-TEST_F(LaterTest, WhatIsKeptHoldsNothingBackForARunnerThatStays) {
+TEST_F(LaterTest, KeptEntriesDoNotHoldBackAFollowingRunner) {
   AppendToQueue({"/tmp/none"});
   Program runner = velathumb_.Start({"--follow"});
   ASSERT_TRUE(WaitUntilExists(kLaterFile));
   Enqueue({"/tmp/a"});
   EXPECT_TRUE(velathumb_.WaitForStarts(1));
   EXPECT_TRUE(WaitUntilGone(kTakenFile));
-  runner.Kill(SIGTERM);
-  ExpectEnd(runner, 1);
+  Stop(runner);
   ExpectKept({"/tmp/none"});
 }
 
-TEST_F(LaterTest, WhatCannotBeKeptStaysInHand) {
+TEST_F(LaterTest, AnEntryThatCannotBeKeptStaysTaken) {
   velathumb_.Stub().PlanCall(1, StubPlan().CreateFile(kLaterFile).ReplaceByDirectory(kLaterFile));
   Enqueue({"/tmp/a"});
   AppendToQueue({"/tmp/none"});
@@ -138,7 +105,7 @@ TEST_F(LaterTest, WhatCannotBeKeptStaysInHand) {
   EXPECT_EQ(ReadFile(kJournalFile), "/tmp/a\n");
 }
 
-TEST_F(LaterTest, AProfileThatBecomesUnusableEndsARunnerThatStaysBeforeItTakes) {
+TEST_F(LaterTest, AProfileThatBecomesUnusableEndsAFollowingRunnerBeforeItTakes) {
   Program runner = velathumb_.Start({"--follow"});
   EXPECT_FALSE(runner.Wait(milliseconds(200)));
   WriteFile(kProfiles, "[thumb_s\n");
@@ -148,60 +115,53 @@ TEST_F(LaterTest, AProfileThatBecomesUnusableEndsARunnerThatStaysBeforeItTakes) 
   EXPECT_THAT(velathumb_.Entries(), IsEmpty());
 }
 
-TEST_F(LaterTest, ALineThatIsWrittenIntoWhatWasTakenIsDoneInTheSameRun) {
+TEST_F(LaterTest, ALineAddedToTheTakenFileIsProcessedInTheSameRun) {
   velathumb_.Stub().PlanCall(1, StubPlan().WriteFile(kTakenFile, "/tmp/a\n/tmp/late\n"));
   MakeEntryDirectories({"/tmp/late"});
   Enqueue({"/tmp/a"});
-  EXPECT_EQ(velathumb_.Run().exitCode, 0);
-  EXPECT_THAT(velathumb_.Entries(), ElementsAre("/tmp/a", "/tmp/late"));
-  ExpectNothingWaits();
+  ExpectRun({"/tmp/a", "/tmp/late"});
 }
 
-TEST_F(LaterTest, ASignalIsHeardWhileSomebodyHoldsTheQueue) {
+TEST_F(LaterTest, ASignalEndsTheWaitForALockedQueue) {
   Enqueue({"/tmp/a"});
-  const Descriptor held = HoldLock(kQueueFile);
+  const Descriptor held = HoldLock(kQueueFile, O_RDWR | O_CREAT);
   Program runner = velathumb_.Start();
   EXPECT_FALSE(runner.Wait(milliseconds(500)));
-  runner.Kill(SIGTERM);
-  ExpectEnd(runner, 1);
+  Stop(runner);
   EXPECT_EQ(ReadFile(kQueueFile), "/tmp/a\n");
 }
 
-TEST_F(LaterTest, AQueueThatSomebodyHoldsIsTakenAfterwards) {
+TEST_F(LaterTest, ALockedQueueIsTakenAfterwards) {
   Enqueue({"/tmp/a"});
-  Descriptor held = HoldLock(kQueueFile);
+  Descriptor held = HoldLock(kQueueFile, O_RDWR | O_CREAT);
   Program runner = velathumb_.Start();
   EXPECT_FALSE(runner.Wait(milliseconds(500)));
   held.Close();
   ExpectEnd(runner, 0);
   EXPECT_THAT(velathumb_.Entries(), ElementsAre("/tmp/a"));
-  ExpectNothingWaits();
+  ExpectQueueDone();
 }
 
-TEST_F(LaterTest, ASignalIsHeardWhileWhatWasKeptCannotBePutBack) {
+TEST_F(LaterTest, ASignalEndsTheWaitToPutKeptEntriesBack) {
   WriteFile(kLaterFile, "/tmp/a\n");
-  const Descriptor held = HoldLock(kQueueFile);
+  const Descriptor held = HoldLock(kQueueFile, O_RDWR | O_CREAT);
   Program runner = velathumb_.Start();
   EXPECT_FALSE(runner.Wait(milliseconds(500)));
-  runner.Kill(SIGTERM);
-  EXPECT_TRUE(runner.Wait(seconds(5)));
+  Stop(runner);
   EXPECT_EQ(ReadFile(kLaterFile), "/tmp/a\n");
 }
 
-TEST_F(LaterTest, WhileSomebodyHoldsWhatIsDoneItWaitsQuietly) {
-  velathumb_.Stub().PlanCall(1, StubPlan().WaitForFile("/tmp/go"));
-  Enqueue({"/tmp/a"});
-  Program runner = velathumb_.Start();
-  ASSERT_TRUE(velathumb_.WaitForStarts(1));
-  Descriptor held = HoldLock(kTakenFile);
-  WriteFile("/tmp/go", "");
+TEST_F(LaterTest, WaitsQuietlyForALockedTakenFile) {
+  Program runner = StartAndHold({"/tmp/a"});
+  Descriptor held = HoldLock(kTakenFile, O_RDWR | O_CREAT);
+  Release();
   EXPECT_FALSE(runner.Wait(milliseconds(1000)));
   held.Close();
   ExpectEnd(runner, 0);
-  const std::string told = runner.Error();
-  EXPECT_LT(std::count(told.begin(), told.end(), '\n'), 10) << told.substr(0, 2000);
+  const std::string log = runner.Error();
+  EXPECT_LT(std::count(log.begin(), log.end(), '\n'), 10) << log.substr(0, 2000);
   EXPECT_THAT(velathumb_.Entries(), ElementsAre("/tmp/a"));
-  ExpectNothingWaits();
+  ExpectQueueDone();
 }
 
 }  // namespace

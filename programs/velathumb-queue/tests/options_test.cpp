@@ -1,32 +1,22 @@
-// The command line and what is told.
+// The command line and the messages.
 #include <fcntl.h>
-#include <gmock/gmock.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
 #include <cerrno>
-#include <chrono>
-#include <string>
-#include <vector>
 
 #include "queue_fixture.h"
-#include "queue_program.h"
 #include "support/descriptor.h"
-#include "support/files.h"
 
 namespace vela_test {
 namespace {
 
-using ::testing::AllOf;
-using ::testing::ElementsAre;
-using ::testing::HasSubstr;
-using ::testing::IsEmpty;
-using ::testing::MatchesRegex;
-using ::testing::StartsWith;
+using namespace ::testing;
 
 class OptionsTest : public QueueTest {
  protected:
-  /// The runner must refuse the arguments and leave the queue.
+  /// Fails the test unless the runner refuses the arguments and keeps the queue. Returns the
+  /// message.
   static std::string Refusal(const std::vector<std::string>& arguments) {
     Enqueue({"/tmp/a"});
     const ProgramResult result = RunProgram(QueueProgramPath(), arguments);
@@ -38,7 +28,7 @@ class OptionsTest : public QueueTest {
   }
 };
 
-TEST_F(OptionsTest, HelpTellsEveryOption) {
+TEST_F(OptionsTest, HelpListsEveryOption) {
   for (const char* word : {"-h", "--help"}) {
     const ProgramResult result = RunProgram(QueueProgramPath(), {word});
     EXPECT_EQ(result.exitCode, 0);
@@ -50,34 +40,31 @@ TEST_F(OptionsTest, HelpTellsEveryOption) {
   }
 }
 
-TEST_F(OptionsTest, VersionTellsTheVersion) {
+TEST_F(OptionsTest, PrintsItsVersion) {
   const ProgramResult result = RunProgram(QueueProgramPath(), {"--version"});
   EXPECT_EQ(result.exitCode, 0);
   EXPECT_THAT(result.out, MatchesRegex("velathumb-queue [0-9]+\\.[0-9]+\\.[0-9]+\n"));
 }
 
-TEST_F(OptionsTest, AnUnknownOptionIsRefused) {
-  EXPECT_THAT(Refusal({"--nonsense"}), HasSubstr("--nonsense"));
+TEST_F(OptionsTest, InvalidArgumentsAreRefused) {
+  const std::pair<std::vector<std::string>, const char*> cases[] = {
+      {{"--nonsense"}, "--nonsense"},
+      {QueueArguments(kProfiles, {"/tmp/a"}), "/tmp/a"},
+      {QueueArguments(kProfiles, {"--jobs", "0"}), "--jobs"},
+      {QueueArguments(kProfiles, {"--jobs", "many"}), "--jobs"},
+      {QueueArguments("/tmp/none.conf"),
+       "velathumb-queue: /tmp/none.conf: No such file or directory\n"},
+      {QueueArguments(kProfiles, {"--add", "/tmp/a\n/tmp/b"}),
+       "cannot add /tmp/a\\x0a/tmp/b: an entry cannot hold a newline\n"},
+  };
+  for (const auto& [arguments, message] : cases) {
+    ResetQueueSandbox();
+    SCOPED_TRACE(message);
+    EXPECT_THAT(Refusal(arguments), HasSubstr(message));
+  }
 }
 
-TEST_F(OptionsTest, AWordThatIsNoOptionIsRefused) {
-  EXPECT_THAT(Refusal(QueueArguments(kProfiles, {"/tmp/a"})), HasSubstr("/tmp/a"));
-}
-
-TEST_F(OptionsTest, ANumberOfJobsOutOfRangeIsRefused) {
-  EXPECT_THAT(Refusal(QueueArguments(kProfiles, {"--jobs", "0"})), HasSubstr("--jobs"));
-}
-
-TEST_F(OptionsTest, JobsThatAreNoNumberAreRefused) {
-  EXPECT_THAT(Refusal(QueueArguments(kProfiles, {"--jobs", "many"})), HasSubstr("--jobs"));
-}
-
-TEST_F(OptionsTest, AProfileThatIsNotThereIsRefused) {
-  EXPECT_EQ(Refusal(QueueArguments("/tmp/none.conf")),
-            "velathumb-queue: /tmp/none.conf: No such file or directory\n");
-}
-
-TEST_F(OptionsTest, AVelathumbThatIsNoProgramIsRefused) {
+TEST_F(OptionsTest, AVelathumbThatIsNotExecutableIsRefused) {
   WriteFile("/tmp/text", "");
   ASSERT_EQ(chmod("/tmp/text", 0644), 0);
   EXPECT_EQ(Refusal({"--velathumb", "/tmp/text", "--profile", kProfiles}),
@@ -85,43 +72,34 @@ TEST_F(OptionsTest, AVelathumbThatIsNoProgramIsRefused) {
 }
 
 TEST_F(OptionsTest, EntriesCanBeAddedToTheQueue) {
-  const RecordingVelathumb velathumb;
   Enqueue({"/tmp/a"});
   MakeEntryDirectories({"/tmp/b", "/tmp/-c d"});
-  EXPECT_EQ(velathumb.Run({"--add", "R:/tmp/b", "-a", "/tmp/a", "--add", "/tmp/-c d"}).exitCode, 0);
-  EXPECT_THAT(velathumb.Entries(), ElementsAre("/tmp/a", "R:/tmp/b", "/tmp/-c d"));
-  ExpectNothingWaits();
+  EXPECT_EQ(velathumb_.Run({"--add", "R:/tmp/b", "-a", "/tmp/a", "--add", "/tmp/-c d"}).exitCode,
+            0);
+  EXPECT_THAT(velathumb_.Entries(), ElementsAre("/tmp/a", "R:/tmp/b", "/tmp/-c d"));
+  ExpectQueueDone();
 }
 
-TEST_F(OptionsTest, EntriesAreAddedForTheRunnerThatRuns) {
-  RecordingVelathumb velathumb;
-  velathumb.Stub().PlanCall(1, StubPlan().WaitForFile("/tmp/go"));
-  Enqueue({"/tmp/a"});
-  Program runner = velathumb.Start();
-  ASSERT_TRUE(velathumb.WaitForStarts(1));
+TEST_F(OptionsTest, EntriesAreAddedForARunningRunner) {
+  Program runner = StartAndHold({"/tmp/a"});
   MakeEntryDirectories({"/tmp/b"});
-  EXPECT_EQ(velathumb.Run({"--add", "/tmp/b"}).exitCode, 1);
-  WriteFile("/tmp/go", "");
+  EXPECT_EQ(velathumb_.Run({"--add", "/tmp/b"}).exitCode, 1);
+  Release();
   EXPECT_TRUE(runner.Wait());
-  EXPECT_THAT(velathumb.Entries(), ElementsAre("/tmp/a", "/tmp/b"));
-}
-
-TEST_F(OptionsTest, AnEntryWithANewlineIsRefused) {
-  EXPECT_THAT(Refusal(QueueArguments(kProfiles, {"--add", "/tmp/a\n/tmp/b"})),
-              HasSubstr("cannot add /tmp/a\\n/tmp/b: an entry cannot contain a newline\n"));
+  EXPECT_THAT(velathumb_.Entries(), ElementsAre("/tmp/a", "/tmp/b"));
 }
 
 TEST_F(OptionsTest, AnEntryIsAddedWithItsWholePath) {
-  const RecordingVelathumb velathumb;
   MakeEntryDirectories({"/tmp/p/a b", "/tmp/p/tree", "/tmp/q"});
   ProgramOptions options;
   options.workingDirectory = "/tmp/p";
-  const ProgramResult result = RunProgram(
-      QueueProgramPath(),
-      velathumb.Arguments({"-a", "a b", "-a", "R:tree/", "-a", ".", "-a", "../q", "-a", "/tmp/q/"}),
-      options);
+  const ProgramResult result =
+      RunProgram(QueueProgramPath(),
+                 velathumb_.Arguments(
+                     {"-a", "a b", "-a", "R:tree/", "-a", ".", "-a", "../q", "-a", "/tmp/q/"}),
+                 options);
   EXPECT_EQ(result.exitCode, 0) << result.err;
-  EXPECT_THAT(velathumb.Entries(), ElementsAre("/tmp/p/a b", "R:/tmp/p/tree", "/tmp/p", "/tmp/q"));
+  EXPECT_THAT(velathumb_.Entries(), ElementsAre("/tmp/p/a b", "R:/tmp/p/tree", "/tmp/p", "/tmp/q"));
 }
 
 TEST_F(OptionsTest, AnEntryWithoutADirectoryIsRefused) {
@@ -132,67 +110,58 @@ TEST_F(OptionsTest, AnEntryWithoutADirectoryIsRefused) {
   }
 }
 
-TEST_F(OptionsTest, ATreeThatVelathumbWouldLeaveOutIsRefused) {
-  const RecordingVelathumb velathumb;
+TEST_F(OptionsTest, ATreeThatVelathumbWouldSkipIsRefused) {
   MakeDirectories("/tmp/a:b");
   MakeDirectories("/tmp/@eaDir");
-  EXPECT_THAT(Refusal(velathumb.Arguments({"--add", "R:/tmp/a:b"})), HasSubstr("colon"));
+  EXPECT_THAT(Refusal(velathumb_.Arguments({"--add", "R:/tmp/a:b"})), HasSubstr("colon"));
   RemoveTree(kQueueFile);
-  EXPECT_THAT(Refusal(velathumb.Arguments({"--add", "R:/tmp/@eaDir/"})),
-              HasSubstr("velathumb skips a tree of this name\n"));
-  EXPECT_EQ(velathumb.Run({"--add", "/tmp/a:b"}).exitCode, 0);
-  EXPECT_THAT(velathumb.Entries(), ElementsAre("/tmp/a", "/tmp/a:b"));
+  EXPECT_THAT(Refusal(velathumb_.Arguments({"--add", "R:/tmp/@eaDir/"})),
+              HasSubstr("velathumb leaves out a tree of this name\n"));
+  EXPECT_EQ(velathumb_.Run({"--add", "/tmp/a:b"}).exitCode, 0);
+  EXPECT_THAT(velathumb_.Entries(), ElementsAre("/tmp/a", "/tmp/a:b"));
 }
 
-TEST_F(OptionsTest, WithAnEntryThatIsRefusedNoneIsAdded) {
+TEST_F(OptionsTest, ARefusedEntryKeepsOthersFromBeingAdded) {
   MakeDirectories("/tmp/b");
   Refusal(QueueArguments(kProfiles, {"--add", "/tmp/b", "--add", "/tmp/none"}));
 }
 
-TEST_F(OptionsTest, AProfileThatCannotBeReadAsOneLeavesTheQueue) {
-  WriteFile(kProfiles, "[thumb_s\nsize=120\n");
-  EXPECT_EQ(Refusal(QueueArguments(kProfiles)),
-            "velathumb-queue: no profile file, or no thumbnail in it: /tmp/profiles.conf\n");
-}
-
-TEST_F(OptionsTest, AProfileWithoutAnyThumbnailLeavesTheQueue) {
-  WriteFile(kProfiles, "; nothing\n");
-  EXPECT_EQ(Refusal(QueueArguments(kProfiles)),
-            "velathumb-queue: no profile file, or no thumbnail in it: /tmp/profiles.conf\n");
-}
-
-TEST_F(OptionsTest, ADirectoryForAProfileLeavesTheQueue) {
+TEST_F(OptionsTest, AProfileWithoutAThumbnailKeepsTheQueue) {
+  WriteFile("/tmp/invalid.conf", "[thumb_s\nsize=120\n");
+  WriteFile("/tmp/empty.conf", "; nothing\n");
   MakeDirectories("/tmp/directory");
-  EXPECT_EQ(Refusal(QueueArguments("/tmp/directory")),
-            "velathumb-queue: no profile file, or no thumbnail in it: /tmp/directory\n");
+  for (const std::string profile : {"/tmp/invalid.conf", "/tmp/empty.conf", "/tmp/directory"}) {
+    EXPECT_EQ(Refusal(QueueArguments(profile)),
+              "velathumb-queue: no profile, or none with a thumbnail to make: " + profile + "\n");
+    RemoveTree(kQueueFile);
+  }
 }
 
-TEST_F(OptionsTest, AFifoInTheQueuesPlaceIsAnError) {
-  const RecordingVelathumb velathumb;
+TEST_F(OptionsTest, AFifoInPlaceOfTheQueueIsAnError) {
   ASSERT_EQ(mkfifo(kQueueFile, 0644), 0);
-  Program runner = velathumb.Start();
+  Program runner = velathumb_.Start();
   const auto result = runner.Wait(std::chrono::seconds(10));
   ASSERT_TRUE(result);
   EXPECT_EQ(result->exitCode, 2);
 }
 
-TEST_F(OptionsTest, ALockFileThatCannotBeMadeIsAnError) {
+TEST_F(OptionsTest, ALockFileThatCannotBeCreatedIsAnError) {
   MakeDirectories("/run/velathumb-queue.lock");
   EXPECT_THAT(Refusal(QueueArguments(kProfiles)),
               StartsWith("velathumb-queue: cannot lock /var/run/velathumb-queue.lock: "));
 }
 
-TEST_F(OptionsTest, ASpoolThatIsNotThereIsAnError) {
-  RecordingVelathumb velathumb;
+TEST_F(OptionsTest, ATakenFileThatIsADirectoryIsAnError) {
   MakeDirectories(kTakenFile);
   WriteFile(std::string(kTakenFile) + "/file", "");
-  EXPECT_EQ(velathumb.Run().exitCode, 2);
-  EXPECT_THAT(velathumb.Entries(), IsEmpty());
+  EXPECT_EQ(velathumb_.Run().exitCode, 2);
+  EXPECT_THAT(velathumb_.Entries(), IsEmpty());
 }
 
-/// Runs the runner for one entry with its standard error in a file of which JOURNAL_STREAM tells
-/// this inode number plus `offset`. Returns what it wrote.
-std::string ErrorWithJournalStream(const RecordingVelathumb& velathumb, ino_t offset) {
+/// Runs the runner for one entry with its standard error in a file. JOURNAL_STREAM names the inode
+/// number of that file plus `offset`. Returns the content of the file.
+std::string ErrorWithJournalStream(ino_t offset) {
+  const RecordingVelathumb velathumb;
   Enqueue({"/tmp/a"});
   const Descriptor error(open("/tmp/err", O_RDWR | O_CREAT | O_TRUNC | O_CLOEXEC, 0644));
   struct stat status = {};
@@ -205,19 +174,18 @@ std::string ErrorWithJournalStream(const RecordingVelathumb& velathumb, ino_t of
   return ReadFile("/tmp/err");
 }
 
-TEST_F(OptionsTest, LinesForTheJournalCarryTheirLevel) {
-  EXPECT_EQ(ErrorWithJournalStream(RecordingVelathumb(), 0), "<6>took 1 entry\n");
+TEST_F(OptionsTest, LinesForTheJournalHaveTheirLevel) {
+  EXPECT_EQ(ErrorWithJournalStream(0), "<6>took 1 entry\n");
 }
 
-TEST_F(OptionsTest, LinesForAFileCarryNoLevelWhenTheJournalIsThatOfAProgramAbove) {
-  EXPECT_EQ(ErrorWithJournalStream(RecordingVelathumb(), 1), "velathumb-queue: took 1 entry\n");
+TEST_F(OptionsTest, LinesForAFileHaveNoLevelWhenTheJournalIsThatOfAParent) {
+  EXPECT_EQ(ErrorWithJournalStream(1), "velathumb-queue: took 1 entry\n");
 }
 
-TEST_F(OptionsTest, ControlCharactersOfAnEntryAreWrittenOut) {
-  RecordingVelathumb velathumb;
-  velathumb.Stub().PlanCall(1, StubPlan().Exit(1));
+TEST_F(OptionsTest, ControlCharactersOfAnEntryAreEscaped) {
+  velathumb_.Stub().PlanCall(1, StubPlan().Exit(1));
   Enqueue({"/tmp/\x1b[2J\r"});
-  EXPECT_EQ(velathumb.Run().err,
+  EXPECT_EQ(velathumb_.Run().err,
             "velathumb-queue: took 1 entry\n"
             "velathumb-queue: velathumb did not complete, trying again: /tmp/\\x1b[2J\\x0d\n");
 }

@@ -1,31 +1,24 @@
 // Conversion that is held back.
 #include "conversion_pause.h"
 
-#include <gmock/gmock.h>
 #include <signal.h>
 
-#include <chrono>
 #include <ctime>
 #include <mutex>
-#include <string>
 #include <thread>
 
 #include "platform/velaindex.h"
 #include "progress/velamk_progress.h"
 #include "queue_fixture.h"
 #include "support/daemon_peer.h"
-#include "support/files.h"
 
 using namespace vela;
 
 namespace vela_test {
 namespace {
 
+using namespace ::testing;
 using std::chrono::seconds;
-using ::testing::ElementsAre;
-using ::testing::HasSubstr;
-using ::testing::IsEmpty;
-using ::testing::Not;
 
 constexpr const char* kSettings = "/etc/velainfo.conf";
 constexpr const char* kSwitch = "IS_DISABLE_CONVERT_PHOTO";
@@ -41,19 +34,11 @@ DaemonReply SwitchedOff(bool isOff) {
 
 class PauseTest : public QueueTest {
  protected:
-  /// Lets half a second go by, in which nothing may be started.
+  /// Fails the test when velathumb is started within half a second.
   void ExpectNoStart() const {
     std::this_thread::sleep_for(std::chrono::milliseconds(500));
     EXPECT_THAT(velathumb_.Entries(), IsEmpty());
   }
-
-  static void ExpectEnd(Program& runner, int exitCode) {
-    const auto result = runner.Wait(seconds(10));
-    ASSERT_TRUE(result);
-    EXPECT_EQ(result->exitCode, exitCode);
-  }
-
-  RecordingVelathumb velathumb_;
 };
 
 TEST_F(PauseTest, NothingIsStartedBeforeTheResumeTime) {
@@ -66,10 +51,10 @@ TEST_F(PauseTest, NothingIsStartedBeforeTheResumeTime) {
   ASSERT_TRUE(velathumb_.WaitForStarts(1));
   EXPECT_GE(time(nullptr), resume);
   ExpectEnd(runner, 0);
-  ExpectNothingWaits();
+  ExpectQueueDone();
 }
 
-TEST_F(PauseTest, AResumeTimeThatIsBroughtForwardIsNoticed) {
+TEST_F(PauseTest, AnEarlierResumeTimeIsNoticed) {
   SetResumeTime(std::to_string(time(nullptr) + 3600));
   Enqueue({"/tmp/a"});
   Program runner = velathumb_.Start();
@@ -84,12 +69,11 @@ TEST_F(PauseTest, ANegativeResumeTimeIsNeverReached) {
   Enqueue({"/tmp/a"});
   Program runner = velathumb_.Start();
   ExpectNoStart();
-  runner.Kill(SIGTERM);
-  ExpectEnd(runner, 1);
+  Stop(runner);
   EXPECT_EQ(ReadFile(kTakenFile), "/tmp/a\n");
 }
 
-TEST_F(PauseTest, NothingIsStartedWhileTheServiceHasItSwitchedOff) {
+TEST_F(PauseTest, NothingIsStartedWhileTheServiceHasDisabledConversion) {
   DaemonPeer daemon;
   daemon.Answer(kSwitch, SwitchedOff(true));
   Enqueue({"/tmp/a"});
@@ -102,25 +86,24 @@ TEST_F(PauseTest, NothingIsStartedWhileTheServiceHasItSwitchedOff) {
   EXPECT_THAT(velathumb_.Entries(), ElementsAre("/tmp/a"));
 }
 
-TEST_F(PauseTest, WhatRunsGoesOn) {
+TEST_F(PauseTest, ARunningVelathumbContinues) {
   DaemonPeer daemon;
   velathumb_.Stub().PlanCall(1, StubPlan().WaitForFile("/tmp/go").CreateFile("/tmp/came"));
   Enqueue({"/tmp/a", "/tmp/b"});
   Program runner = velathumb_.Start();
   ASSERT_TRUE(velathumb_.WaitForStarts(1));
   daemon.Answer(kSwitch, SwitchedOff(true));
-  // The answer that it may run is good for a second.
+  // The answer that conversion is enabled is valid for a second.
   std::this_thread::sleep_for(std::chrono::milliseconds(1100));
-  WriteFile("/tmp/go", "");
+  Release();
   EXPECT_TRUE(WaitUntilExists("/tmp/came"));
   std::this_thread::sleep_for(std::chrono::milliseconds(500));
   EXPECT_THAT(velathumb_.Entries(), ElementsAre("/tmp/a"));
   EXPECT_EQ(ReadFile(kJournalFile), "/tmp/a\n");
-  runner.Kill(SIGTERM);
-  ExpectEnd(runner, 1);
+  Stop(runner);
 }
 
-TEST_F(PauseTest, ADaemonThatAnswersNonsenseHoldsNothingBack) {
+TEST_F(PauseTest, InvalidAnswersOfTheDaemonHoldNothingBack) {
   for (const char* answer :
        {"[]", R"({"success":[],"result":true})", R"({"success":true,"result":{"a":1}})",
         R"({"success":false,"result":true})", R"({"result":true})", R"({"success":true})"}) {
@@ -136,18 +119,17 @@ TEST_F(PauseTest, ADaemonThatAnswersNonsenseHoldsNothingBack) {
   }
 }
 
-TEST_F(PauseTest, ADaemonThatKeepsStillDoesNotKeepTheRunnerFromEnding) {
+TEST_F(PauseTest, ASilentDaemonDoesNotKeepTheRunnerFromEnding) {
   DaemonPeer daemon;
   daemon.Answer(kSwitch, DaemonReply::Silence());
   velathumb_.Stub().Plan(StubPlan().WaitForFile("/tmp/never"));
   Enqueue({"/tmp/a"});
   Program runner = velathumb_.Start();
   ASSERT_TRUE(daemon.WaitForRequests(1));
-  runner.Kill(SIGTERM);
-  ExpectEnd(runner, 1);
+  Stop(runner);
 }
 
-TEST_F(PauseTest, AnAnswerThatCameAtOnceIsGoodForASecond) {
+TEST_F(PauseTest, AnImmediateAnswerIsValidForASecond) {
   DaemonPeer daemon;
   daemon.Answer(kSwitch, SwitchedOff(false));
   PauseGate gate;
@@ -159,7 +141,7 @@ TEST_F(PauseTest, AnAnswerThatCameAtOnceIsGoodForASecond) {
   EXPECT_EQ(daemon.Requests().size(), 2U);
 }
 
-TEST_F(PauseTest, AnAnswerThatTookLongIsGoodForLonger) {
+TEST_F(PauseTest, ASlowAnswerIsValidForLonger) {
   DaemonPeer daemon;
   daemon.Answer(kSwitch, SwitchedOff(false).After(300));
   PauseGate gate;
@@ -169,7 +151,7 @@ TEST_F(PauseTest, AnAnswerThatTookLongIsGoodForLonger) {
   EXPECT_EQ(daemon.Requests().size(), 1U);
 }
 
-TEST_F(PauseTest, ARunnerThatIsStoppedBeforeItCountsLeavesTheTotals) {
+TEST_F(PauseTest, ARunnerThatIsStoppedBeforeItCountsKeepsTheTotals) {
   AddConvProgress(THUMB_TYPE_PHOTO, "total", 1000);
   Enqueue({"/tmp/a"});
   pid_t runnerProcess = 0;

@@ -1,27 +1,21 @@
-// The totals that the counters of progress count towards.
+// The totals of the progress counters.
 #include "progress_totals.h"
 
-#include <gmock/gmock.h>
 #include <sys/mount.h>
 #include <unistd.h>
-
-#include <string>
-#include <vector>
 
 #include "platform/velaindex.h"
 #include "progress/velamk_progress.h"
 #include "queue_fixture.h"
-#include "support/files.h"
 #include "support/films.h"
 #include "support/profile_file.h"
-#include "support/stub_tool.h"
 
 using namespace vela;
 
 namespace vela_test {
 namespace {
 
-using ::testing::HasSubstr;
+using namespace ::testing;
 
 int Photo(const char* key) {
   return GetConvProgress(THUMB_TYPE_PHOTO, key);
@@ -36,6 +30,12 @@ class TotalsTest : public QueueTest {
     AddConvProgress(THUMB_TYPE_PHOTO, "total_thumb", 1000);
   }
 
+  static void MakePhotos(const std::vector<std::string>& photos) {
+    for (const std::string& photo : photos) {
+      MakePhoto(photo);
+    }
+  }
+
   static void ExpectCounters(int completed, int total, int completedThumb, int totalThumb) {
     EXPECT_EQ(Photo("completed"), completed);
     EXPECT_EQ(Photo("total"), total);
@@ -43,65 +43,51 @@ class TotalsTest : public QueueTest {
     EXPECT_EQ(Photo("total_thumb"), totalThumb);
   }
 
-  /// One thumbnail of two classes each.
+  void ExpectCountersAfterRun(int completed, int total, int completedThumb, int totalThumb) const {
+    EXPECT_EQ(velathumb_.Run().exitCode, 0);
+    ExpectCounters(completed, total, completedThumb, totalThumb);
+  }
+
+  /// Asks for two thumbnails of each photo.
   static void AskForTwoClasses() {
     WriteFile("/etc/velainfo.conf", "photo_thumb_size_map=\"3\"\n");
   }
 };
 
-TEST_F(TotalsTest, AFreshRunBeginsAtZero) {
-  const RecordingVelathumb velathumb;
+TEST_F(TotalsTest, AFreshRunStartsAtZero) {
   AskForTwoClasses();
-  MakePhoto("/tmp/p/a.jpg");
-  MakePhoto("/tmp/p/b.jpg");
-  MakePhoto("/tmp/q/c.jpg");
-  MakePhoto("/tmp/q/below/d.jpg");
+  MakePhotos({"/tmp/p/a.jpg", "/tmp/p/b.jpg", "/tmp/q/c.jpg", "/tmp/q/below/d.jpg"});
   SetUpCounters(50, 70);
   Enqueue({"/tmp/p", "/tmp/q"});
-  EXPECT_EQ(velathumb.Run().exitCode, 0);
-  ExpectCounters(0, 3, 0, 6);
+  ExpectCountersAfterRun(0, 3, 0, 6);
 }
 
-TEST_F(TotalsTest, ARunThatGoesOnKeepsTheCounters) {
-  const RecordingVelathumb velathumb;
+TEST_F(TotalsTest, AResumedRunKeepsTheCounters) {
   AskForTwoClasses();
-  MakePhoto("/tmp/p/a.jpg");
-  MakePhoto("/tmp/q/b.jpg");
+  MakePhotos({"/tmp/p/a.jpg", "/tmp/q/b.jpg"});
   SetUpCounters(50, 70);
   MakeEntryDirectories({"/tmp/p", "/tmp/q"});
   WriteFile(kTakenFile, "/tmp/p\n/tmp/q\n");
   WriteFile(kJournalFile, "/tmp/p\n");
-  EXPECT_EQ(velathumb.Run().exitCode, 0);
-  ExpectCounters(50, 51, 70, 72);
+  ExpectCountersAfterRun(50, 51, 70, 72);
 }
 
-TEST_F(TotalsTest, TheTotalsAreThereBeforeTheFirstStart) {
-  RecordingVelathumb velathumb;
-  velathumb.Stub().Plan(StubPlan().WaitForFile("/tmp/go"));
+TEST_F(TotalsTest, TheTotalsAreSetBeforeTheFirstStart) {
   MakePhoto("/tmp/p/a.jpg");
-  Enqueue({"/tmp/p"});
-  Program runner = velathumb.Start();
-  ASSERT_TRUE(velathumb.WaitForStarts(1));
+  Program runner = StartAndHold({"/tmp/p"});
   ExpectCounters(0, 1, 0, 1);
-  WriteFile("/tmp/go", "");
+  Release();
   EXPECT_TRUE(runner.Wait());
 }
 
 TEST_F(TotalsTest, ATreeCountsAllBelow) {
-  const RecordingVelathumb velathumb;
-  MakePhoto("/tmp/p/a.jpg");
-  MakePhoto("/tmp/p/d/b.jpg");
-  MakePhoto("/tmp/p/d/e/c.jpg");
+  MakePhotos({"/tmp/p/a.jpg", "/tmp/p/d/b.jpg", "/tmp/p/d/e/c.jpg"});
   Enqueue({"R:/tmp/p"});
-  EXPECT_EQ(velathumb.Run().exitCode, 0);
-  ExpectCounters(0, 3, 0, 3);
+  ExpectCountersAfterRun(0, 3, 0, 3);
 }
 
-TEST_F(TotalsTest, EachDirectoryCountsOnceByWhateverNames) {
-  const RecordingVelathumb velathumb;
-  MakePhoto("/tmp/p/a.jpg");
-  MakePhoto("/tmp/p/d/b.jpg");
-  MakePhoto("/tmp/p/d/e/c.jpg");
+TEST_F(TotalsTest, EachDirectoryCountsOnceWhateverItsNames) {
+  MakePhotos({"/tmp/p/a.jpg", "/tmp/p/d/b.jpg", "/tmp/p/d/e/c.jpg"});
   ASSERT_EQ(symlink("p", "/tmp/alias"), 0);
   const std::vector<std::vector<std::string>> queues = {
       {"R:/tmp/p", "/tmp/p/d"},
@@ -113,53 +99,45 @@ TEST_F(TotalsTest, EachDirectoryCountsOnceByWhateverNames) {
       {"R:/tmp/alias", "/tmp/p/d", "/tmp/p/d/e", "/tmp/alias/d"},
   };
   for (const std::vector<std::string>& queue : queues) {
-    Enqueue(queue);
-    EXPECT_EQ(velathumb.Run().exitCode, 0);
     SCOPED_TRACE(Lines(queue));
-    ExpectCounters(0, 3, 0, 3);
+    Enqueue(queue);
+    ExpectCountersAfterRun(0, 3, 0, 3);
   }
 }
 
 TEST_F(TotalsTest, ADirectoryThatIsMountedTwiceCountsOnce) {
-  const RecordingVelathumb velathumb;
   MakePhoto("/tmp/p/a.jpg");
   MakeDirectories("/tmp/again");
   ASSERT_EQ(mount("/tmp/p", "/tmp/again", nullptr, MS_BIND, nullptr), 0);
   Enqueue({"/tmp/p", "/tmp/again"});
-  EXPECT_EQ(velathumb.Run().exitCode, 0);
-  ExpectCounters(0, 1, 0, 1);
-  EXPECT_EQ(velathumb.Entries().size(), 2U);
+  ExpectCountersAfterRun(0, 1, 0, 1);
+  EXPECT_EQ(velathumb_.Entries().size(), 2U);
 }
 
-TEST_F(TotalsTest, ADirectoryOfATreeCountsAlsoWhenItWaitsInTheQueueItself) {
-  RecordingVelathumb velathumb;
-  velathumb.Stub().PlanCall(1, StubPlan().WaitForFile("/tmp/go"));
-  MakePhoto("/tmp/p/a.jpg");
-  MakePhoto("/tmp/p/d/b.jpg");
+TEST_F(TotalsTest, ADirectoryOfATreeCountsEvenWhenItIsQueuedItself) {
+  MakePhotos({"/tmp/p/a.jpg", "/tmp/p/d/b.jpg"});
   WriteFile(kTakenFile, "R:/tmp/p\n");
-  Enqueue({"/tmp/p/d"});
-  Program runner = velathumb.Start();
-  ASSERT_TRUE(velathumb.WaitForStarts(1));
+  Program runner = StartAndHold({"/tmp/p/d"});
   ExpectCounters(0, 2, 0, 2);
-  WriteFile("/tmp/go", "");
+  Release();
   EXPECT_TRUE(runner.Wait());
 }
 
-TEST_F(TotalsTest, AScanThatIsGivenUpSetsNothing) {
+TEST_F(TotalsTest, AnAbortedScanSetsNothing) {
   for (int i = 0; i < 20; ++i) {
     MakePhoto("/tmp/p/" + std::to_string(i) + "/a.jpg");
   }
   SetUpCounters(50, 70);
-  int questions = 0;
+  int queries = 0;
   ProgressTotals totals(false);
-  totals.Set({"R:/tmp/p", "/tmp/p/3"}, [&] { return ++questions >= 10; });
+  totals.Set({"R:/tmp/p", "/tmp/p/3"}, [&] { return ++queries >= 10; });
   ExpectCounters(50, 1000, 70, 1000);
-  EXPECT_GE(questions, 10) << "asked for each entry only, not for each directory of a tree";
+  EXPECT_GE(queries, 10) << "asked for each entry only, not for each directory of a tree";
   totals.Set({"R:/tmp/p", "/tmp/p/3"}, [] { return false; });
   ExpectCounters(50, 70, 70, 90);
 }
 
-/// All six classes, in three phases.
+/// All six size classes, in three phases.
 class AllPhasesTest : public TotalsTest {
  protected:
   AllPhasesTest() {
@@ -172,63 +150,49 @@ class AllPhasesTest : public TotalsTest {
                                  {"thumb_s", 120, 80, std::nullopt, "VELAPHOTO_THUMB_S.jpg", 2}});
   }
 
+  /// Makes the photos, of which kBad fails, and processes the queue. Fails the test unless the
+  /// counters have reached their totals.
+  void ExpectAllCounted(const std::vector<std::string>& photos,
+                        const std::vector<std::string>& entries) {
+    MakePhotos(photos);
+    converter_.PlanWhen(kBad, StubPlan().Exit(1));
+    Enqueue(entries);
+    ConvertQueue();
+    const int count = static_cast<int>(photos.size());
+    ExpectCounters(count, count, count * 6, count * 6);
+  }
+
+  static constexpr const char* kBad = "/tmp/q/bad.jpg";
   StubTool converter_{kConverterPath};
 };
 
-TEST_F(AllPhasesTest, InTheEndWhatIsDoneIsTheTotal) {
-  for (const char* photo : {"/tmp/p/a.jpg", "/tmp/p/b.jpg", "/tmp/q/c.jpg", "/tmp/q/d/e.jpg"}) {
-    MakePhoto(photo);
-  }
+TEST_F(AllPhasesTest, InTheEndTheTotalsAreReached) {
   SetUpCounters(7, 9);
-  Enqueue({"/tmp/p", "R:/tmp/q"});
-  EXPECT_EQ(RunRunner().exitCode, 0);
-  ExpectCounters(4, 4, 24, 24);
-  ExpectNothingWaits();
+  ExpectAllCounted({"/tmp/p/a.jpg", "/tmp/p/b.jpg", "/tmp/q/c.jpg", "/tmp/q/d/e.jpg"},
+                   {"/tmp/p", "R:/tmp/q"});
 }
 
-TEST_F(AllPhasesTest, APhotoThatFailsCountsAsDone) {
-  MakePhoto("/tmp/p/a.jpg");
-  MakePhoto("/tmp/q/bad.jpg");
-  converter_.PlanWhen("/tmp/q/bad.jpg", StubPlan().Exit(1));
-  Enqueue({"/tmp/p", "/tmp/q"});
-  EXPECT_EQ(RunRunner().exitCode, 0);
-  ExpectCounters(2, 2, 12, 12);
+TEST_F(AllPhasesTest, APhotoThatFailsCountsAsCompleted) {
+  ExpectAllCounted({"/tmp/p/a.jpg", kBad}, {"/tmp/p", "/tmp/q"});
   EXPECT_EQ(ListDirectory("/tmp/q/@eaDir/bad.jpg").size(), 6U);
 }
 
-TEST_F(AllPhasesTest, APhotoThatFailsAgainWhenItsDirectoryComesBackCountsOnce) {
-  MakePhoto("/tmp/p/a.jpg");
-  MakePhoto("/tmp/p/bad.jpg");
-  converter_.PlanWhen("/tmp/p/bad.jpg", StubPlan().Exit(1));
-  Enqueue({"/tmp/p"});
-  EXPECT_EQ(RunRunner().exitCode, 0);
-  // One that failed in the round before is not one more.
-  ExpectCounters(2, 2, 12, 12);
+TEST_F(AllPhasesTest, APhotoThatFailsInEveryPhaseCountsOnce) {
+  ExpectAllCounted({"/tmp/q/a.jpg", kBad}, {"/tmp/q"});
 }
 
-TEST_F(AllPhasesTest, OneDamagedPhotoOfThreeIsOneOfThreeInTheEnd) {
-  for (const char* photo : {"/tmp/p/a.jpg", "/tmp/p/bad.jpg", "/tmp/p/c.jpg"}) {
-    MakePhoto(photo);
-  }
-  converter_.PlanWhen("/tmp/p/bad.jpg", StubPlan().Exit(1));
-  Enqueue({"/tmp/p"});
-  EXPECT_EQ(RunRunner().exitCode, 0);
-  ExpectCounters(3, 3, 18, 18);
+TEST_F(AllPhasesTest, OneDamagedPhotoOfThreeCountsAsOneOfThree) {
+  ExpectAllCounted({"/tmp/q/a.jpg", kBad, "/tmp/q/c.jpg"}, {"/tmp/q"});
 }
 
-TEST_F(AllPhasesTest, APhotoThatFailedInAnEarlierRunIsOneToDo) {
-  MakePhoto("/tmp/p/bad.jpg");
-  converter_.PlanWhen("/tmp/p/bad.jpg", StubPlan().Exit(1));
+TEST_F(AllPhasesTest, APhotoThatFailedInAnEarlierRunCountsAgain) {
   for (int run = 0; run < 2; ++run) {
-    Enqueue({"/tmp/p"});
-    EXPECT_EQ(RunRunner().exitCode, 0);
-    ExpectCounters(1, 1, 6, 6);
+    ExpectAllCounted({kBad}, {"/tmp/q"});
   }
 }
 
-TEST_F(AllPhasesTest, AfterAKilledVelathumbTheNextTakeSetsTheTotalsRight) {
-  MakePhoto("/tmp/p/a.jpg");
-  MakePhoto("/tmp/p/b.jpg");
+TEST_F(AllPhasesTest, AfterAKilledVelathumbTheTotalsAreCorrected) {
+  MakePhotos({"/tmp/p/a.jpg", "/tmp/p/b.jpg"});
   converter_.PlanCall(2, StubPlan().SignalParent(SIGKILL).WriteOutputs());
   Enqueue({"/tmp/p"});
   EXPECT_EQ(RunRunner().exitCode, 0);
@@ -237,7 +201,6 @@ TEST_F(AllPhasesTest, AfterAKilledVelathumbTheNextTakeSetsTheTotalsRight) {
 }
 
 TEST_F(TotalsTest, VideosAreCountedWhenAskedFor) {
-  const RecordingVelathumb velathumb;
   MakeDirectories("/tmp/v/d");
   MakeFilm("/tmp/v/a.mp4");
   MakeFilm("/tmp/v/d/b.mp4");
@@ -246,22 +209,21 @@ TEST_F(TotalsTest, VideosAreCountedWhenAskedFor) {
   AddConvProgress(THUMB_TYPE_VIDEO, "completed", 3);
   AddConvProgress(THUMB_TYPE_VIDEO, "total", 1);
   Enqueue({"/tmp/p"});
-  EXPECT_EQ(velathumb.Run().exitCode, 0);
+  EXPECT_EQ(velathumb_.Run().exitCode, 0);
   EXPECT_EQ(GetConvProgress(THUMB_TYPE_VIDEO, "total"), 1);
   Enqueue({"/tmp/p"});
-  EXPECT_EQ(velathumb.Run({"--check-videos"}).exitCode, 0);
+  EXPECT_EQ(velathumb_.Run({"--check-videos"}).exitCode, 0);
   EXPECT_EQ(GetConvProgress(THUMB_TYPE_VIDEO, "total"), 5);
   EXPECT_EQ(GetConvProgress(THUMB_TYPE_VIDEO, "completed"), 3);
 }
 
-TEST_F(TotalsTest, AProgressFileThatCannotBeWrittenHoldsNothingBack) {
-  const RecordingVelathumb velathumb;
+TEST_F(TotalsTest, AProgressFileThatCannotBeWrittenIsNotFatal) {
   MakeDirectories("/var/spool/conv_progress_photo");
   Enqueue({"/tmp/p"});
-  const ProgramResult result = velathumb.Run();
+  const ProgramResult result = velathumb_.Run();
   EXPECT_EQ(result.exitCode, 0);
   EXPECT_THAT(result.err, HasSubstr("cannot write total in /var/spool/conv_progress_photo\n"));
-  EXPECT_EQ(velathumb.Entries().size(), 1U);
+  EXPECT_EQ(velathumb_.Entries().size(), 1U);
 }
 
 }  // namespace

@@ -1,16 +1,17 @@
 #include "queue_fixture.h"
 
+#include <fcntl.h>
 #include <signal.h>
+#include <sys/file.h>
+#include <unistd.h>
 
 #include <cerrno>
 #include <chrono>
-#include <functional>
 #include <thread>
 
 #include "entry_plan.h"
 #include "platform/velaindex.h"
-#include "queue_program.h"
-#include "support/files.h"
+#include "support/build_paths.h"
 #include "support/images.h"
 #include "support/profile_file.h"
 
@@ -35,10 +36,6 @@ bool WaitUntil(const std::function<bool()>& isTrue, int milliseconds) {
 
 }  // namespace
 
-QueueTest::QueueTest() {
-  ResetQueueSandbox();
-}
-
 void ResetQueueSandbox() {
   ResetSandbox();
   WriteProfileFile(kProfiles, {{"thumb_s", 120, 70, std::nullopt, "VELAPHOTO_THUMB_S.jpg", 0}});
@@ -57,6 +54,21 @@ void AppendToQueue(const std::vector<std::string>& entries) {
   }
 }
 
+pid_t StartAppender(const std::string& directory, int count, const std::function<int(int)>& pause) {
+  const pid_t child = fork();
+  if (child != 0) {
+    return child;
+  }
+  for (int i = 0; i < count; ++i) {
+    const std::string entry = directory + '/' + std::to_string(i);
+    if (WriteIndexQueue(entry.c_str(), kQueueFile) != 0) {
+      _exit(1);
+    }
+    usleep(static_cast<useconds_t>(pause(i)));
+  }
+  _exit(0);
+}
+
 void Enqueue(const std::vector<std::string>& entries) {
   MakeEntryDirectories(entries);
   AppendToQueue(entries);
@@ -70,10 +82,21 @@ std::string Lines(const std::vector<std::string>& entries) {
   return text;
 }
 
-void ExpectNothingWaits() {
+void ExpectQueueDone() {
   for (const char* file : {kQueueFile, kTakenFile, kJournalFile, kLaterFile}) {
     EXPECT_FALSE(Exists(file)) << file;
   }
+}
+
+std::string QueueProgramPath() {
+  return HostPath(VELATHUMB_QUEUE_FILE);
+}
+
+std::vector<std::string> QueueArguments(const std::string& profileFile,
+                                        const std::vector<std::string>& more) {
+  std::vector<std::string> arguments = {"--velathumb", VelathumbPath(), "--profile", profileFile};
+  arguments.insert(arguments.end(), more.begin(), more.end());
+  return arguments;
 }
 
 ProgramResult RunRunner(const std::vector<std::string>& more) {
@@ -95,6 +118,12 @@ bool HasThumb(const std::string& photo) {
   const size_t slash = photo.rfind('/');
   return IsRegularFile(photo.substr(0, slash) + "/@eaDir" + photo.substr(slash) +
                        "/VELAPHOTO_THUMB_S.jpg");
+}
+
+Descriptor HoldLock(const char* path, int flags) {
+  Descriptor held(open(path, flags | O_CLOEXEC, 0644));
+  EXPECT_EQ(flock(held.Get(), LOCK_EX), 0) << path;
+  return held;
 }
 
 bool WaitUntilEnded(pid_t process, int milliseconds) {
@@ -132,6 +161,42 @@ ProgramResult RecordingVelathumb::Run(const std::vector<std::string>& more) cons
 
 Program RecordingVelathumb::Start(const std::vector<std::string>& more) const {
   return StartProgram(QueueProgramPath(), Arguments(more));
+}
+
+std::string QueueTest::ExpectRun(const std::vector<std::string>& entries) const {
+  const ProgramResult result = velathumb_.Run();
+  EXPECT_EQ(result.exitCode, 0) << result.err;
+  EXPECT_EQ(velathumb_.Entries(), entries);
+  ExpectQueueDone();
+  return result.err;
+}
+
+void QueueTest::ConvertQueue() {
+  EXPECT_EQ(RunRunner().exitCode, 0);
+  ExpectQueueDone();
+}
+
+Program QueueTest::StartAndHold(const std::vector<std::string>& entries) {
+  velathumb_.Stub().PlanCall(1, StubPlan().WaitForFile("/tmp/go"));
+  Enqueue(entries);
+  Program runner = velathumb_.Start();
+  EXPECT_TRUE(velathumb_.WaitForStarts(1));
+  return runner;
+}
+
+void QueueTest::Release() {
+  WriteFile("/tmp/go", "");
+}
+
+void QueueTest::ExpectEnd(Program& runner, int exitCode, std::chrono::seconds limit) {
+  const auto result = runner.Wait(limit);
+  ASSERT_TRUE(result);
+  EXPECT_EQ(result->exitCode, exitCode) << result->err;
+}
+
+void QueueTest::Stop(Program& runner) {
+  runner.Kill(SIGTERM);
+  ExpectEnd(runner, 1, std::chrono::seconds(5));
 }
 
 }  // namespace vela_test

@@ -1,70 +1,46 @@
-// What velathumb is started for, and in which order.
-#include <gmock/gmock.h>
-
-#include <string>
-#include <vector>
-
+// The entries velathumb is started for, and their order.
 #include "queue_fixture.h"
-#include "support/files.h"
 #include "support/profile_file.h"
-#include "support/stub_tool.h"
 
 namespace vela_test {
 namespace {
 
-using ::testing::AllOf;
-using ::testing::Each;
-using ::testing::ElementsAre;
-using ::testing::ElementsAreArray;
-using ::testing::HasSubstr;
-using ::testing::IsEmpty;
-using ::testing::Lt;
-using ::testing::Not;
-using ::testing::SizeIs;
+using namespace ::testing;
 
-class QueueRunTest : public QueueTest {};
+using QueueRunTest = QueueTest;
 
 TEST_F(QueueRunTest, WithoutAQueueDoesNothing) {
-  const RecordingVelathumb velathumb;
-  const ProgramResult result = velathumb.Run();
+  const ProgramResult result = velathumb_.Run();
   EXPECT_EQ(result.exitCode, 0);
   EXPECT_EQ(result.out + result.err, "");
-  EXPECT_THAT(velathumb.Entries(), IsEmpty());
+  EXPECT_THAT(velathumb_.Entries(), IsEmpty());
   EXPECT_THAT(ListDirectory("/var/spool"), IsEmpty());
 }
 
 TEST_F(QueueRunTest, TakesEachEntryOnceInTheOrderOfFirstAppearance) {
-  const RecordingVelathumb velathumb;
   Enqueue({"/tmp/c", "/tmp/a", "/tmp/c", "R:/tmp/a", "/tmp/b", "/tmp/a"});
-  EXPECT_EQ(velathumb.Run().exitCode, 0);
-  EXPECT_THAT(velathumb.Entries(), ElementsAre("/tmp/c", "/tmp/a", "R:/tmp/a", "/tmp/b"));
-  ExpectNothingWaits();
+  ExpectRun({"/tmp/c", "/tmp/a", "R:/tmp/a", "/tmp/b"});
 }
 
-TEST_F(QueueRunTest, PassesOverLinesThatAreTooLong) {
-  const RecordingVelathumb velathumb;
+TEST_F(QueueRunTest, SkipsLinesThatAreTooLong) {
   MakeEntryDirectories({"/tmp/a"});
   WriteFile(kQueueFile, '/' + std::string(4095, 'x') + "\n/tmp/a\n");
-  EXPECT_EQ(velathumb.Run().exitCode, 0);
-  EXPECT_THAT(velathumb.Entries(), ElementsAre("/tmp/a"));
+  ExpectRun({"/tmp/a"});
 }
 
-TEST_F(QueueRunTest, HandsNamesOverByteForByte) {
-  const RecordingVelathumb velathumb;
+TEST_F(QueueRunTest, PassesNamesByteForByte) {
   const std::vector<std::string> entries = {
       "/tmp/a b ",         "/tmp/100% %s %n", "/tmp/\"x\" 'y' `z` $HOME",
       "/tmp/\xff\xfe\x80", "/tmp/-x/--all",   "/tmp/c:d",
       "R:/tmp/ e\t",       "/tmp/\\n\r",      "/tmp/*?[a]"};
   Enqueue(entries);
-  EXPECT_EQ(velathumb.Run().exitCode, 0);
-  EXPECT_THAT(velathumb.Entries(), ElementsAreArray(entries));
+  ExpectRun(entries);
 }
 
-TEST_F(QueueRunTest, VelathumbStartsWithNothingOfTheRunners) {
-  RecordingVelathumb velathumb;
+TEST_F(QueueRunTest, VelathumbInheritsNothingFromTheRunner) {
   Enqueue({"/tmp/a"});
-  EXPECT_EQ(velathumb.Run().exitCode, 0);
-  const std::vector<StubCall> calls = velathumb.Stub().Calls();
+  EXPECT_EQ(velathumb_.Run().exitCode, 0);
+  const std::vector<StubCall> calls = velathumb_.Stub().Calls();
   ASSERT_THAT(calls, SizeIs(1));
   EXPECT_THAT(calls[0].blockedSignals, IsEmpty());
   EXPECT_THAT(calls[0].ignoredSignals, IsEmpty());
@@ -80,74 +56,60 @@ TEST_F(QueueRunTest, MakesTheThumbnailsOfDirectoriesAndTrees) {
       MakePhoto("/tmp/p/tree/d/e/c.jpg"), MakePhoto("/tmp/p/\xff%s: \"'/d.jpg")};
   const std::string other = MakePhoto("/tmp/p/one/below/e.jpg");
   Enqueue({"/tmp/p/one", "R:/tmp/p/tree", "/tmp/p/\xff%s: \"'"});
-  EXPECT_EQ(RunRunner().exitCode, 0);
+  ConvertQueue();
   for (const std::string& photo : wanted) {
     EXPECT_TRUE(HasThumb(photo)) << photo;
   }
   EXPECT_FALSE(HasThumb(other));
-  ExpectNothingWaits();
 }
 
-TEST_F(QueueRunTest, WhatIsQueuedMeanwhileIsDoneInTheSameRun) {
-  RecordingVelathumb velathumb;
-  velathumb.Stub().PlanCall(1, StubPlan().WaitForFile("/tmp/go"));
-  Enqueue({"/tmp/a", "/tmp/b"});
-  Program runner = velathumb.Start();
-  ASSERT_TRUE(velathumb.WaitForStarts(1));
+TEST_F(QueueRunTest, EntriesQueuedMeanwhileAreProcessedInTheSameRun) {
+  Program runner = StartAndHold({"/tmp/a", "/tmp/b"});
   Enqueue({"/tmp/c", "/tmp/a"});
-  WriteFile("/tmp/go", "");
-  const auto result = runner.Wait();
-  ASSERT_TRUE(result);
-  EXPECT_EQ(result->exitCode, 0);
-  EXPECT_THAT(velathumb.Entries(), ElementsAre("/tmp/a", "/tmp/b", "/tmp/c", "/tmp/a"));
-  ExpectNothingWaits();
+  Release();
+  ExpectEnd(runner, 0);
+  EXPECT_THAT(velathumb_.Entries(), ElementsAre("/tmp/a", "/tmp/b", "/tmp/c", "/tmp/a"));
+  ExpectQueueDone();
 }
 
 TEST_F(QueueRunTest, AllPhasesAreMadeInOneRun) {
   const StubTool converter(kConverterPath);
   WriteProfileFile(kProfiles, UsualProfiles());
   WriteFile("/etc/velainfo.conf", "");
-  const std::string photo = MakePhoto("/tmp/p/a.jpg");
+  MakePhoto("/tmp/p/a.jpg");
   Enqueue({"/tmp/p"});
-  EXPECT_EQ(RunRunner().exitCode, 0);
+  ConvertQueue();
   EXPECT_THAT(ListDirectory("/tmp/p/@eaDir/a.jpg"),
               ElementsAre("VELAPHOTO_THUMB_B.jpg", "VELAPHOTO_THUMB_M.jpg", "VELAPHOTO_THUMB_S.jpg",
                           "VELAPHOTO_THUMB_XL.jpg"));
-  ExpectNothingWaits();
 }
 
-TEST_F(QueueRunTest, NewEntriesDoNotPassForOnesThatComeBack) {
-  RecordingVelathumb velathumb;
+TEST_F(QueueRunTest, NewEntriesAreNotTakenForReturningOnes) {
   std::vector<std::string> entries;
   for (int i = 0; i < 30; ++i) {
     entries.push_back("/tmp/" + std::to_string(i));
     const std::string next = "/tmp/" + std::to_string(i + 1) + '\n';
-    velathumb.Stub().PlanWhen(entries.back(), StubPlan().WriteFile(kQueueFile, next));
+    velathumb_.Stub().PlanWhen(entries.back(), StubPlan().WriteFile(kQueueFile, next));
   }
   entries.push_back("/tmp/30");
   MakeEntryDirectories(entries);
   Enqueue({"/tmp/0"});
-  const ProgramResult result = velathumb.Run();
-  EXPECT_EQ(result.exitCode, 0);
-  EXPECT_THAT(velathumb.Entries(), ElementsAreArray(entries));
-  EXPECT_THAT(result.err, Not(HasSubstr("again and again")));
-  ExpectNothingWaits();
+  EXPECT_THAT(ExpectRun(entries), Not(HasSubstr("again and again")));
 }
 
-TEST_F(QueueRunTest, EntriesThatComeBackWithoutEndAreKeptForALaterRun) {
-  RecordingVelathumb velathumb;
-  velathumb.Stub().Plan(StubPlan().WriteFile(kQueueFile, "/tmp/a\n"));
+TEST_F(QueueRunTest, EntriesThatKeepReturningAreLeftForALaterRun) {
+  velathumb_.Stub().Plan(StubPlan().WriteFile(kQueueFile, "/tmp/a\n"));
   Enqueue({"/tmp/a"});
-  const ProgramResult result = velathumb.Run();
+  const ProgramResult result = velathumb_.Run();
   EXPECT_EQ(result.exitCode, 1);
   EXPECT_THAT(result.err, HasSubstr("again and again"));
-  EXPECT_THAT(velathumb.Entries(), AllOf(SizeIs(Lt(30)), Each("/tmp/a")));
+  EXPECT_THAT(velathumb_.Entries(), AllOf(SizeIs(Lt(30)), Each("/tmp/a")));
   EXPECT_EQ(ReadFile(kLaterFile), "/tmp/a\n");
   EXPECT_FALSE(Exists(kQueueFile));
   EXPECT_FALSE(Exists(kTakenFile));
-  velathumb.Stub().Plan(StubPlan());
-  EXPECT_EQ(velathumb.Run().exitCode, 0);
-  ExpectNothingWaits();
+  velathumb_.Stub().Plan(StubPlan());
+  EXPECT_EQ(velathumb_.Run().exitCode, 0);
+  ExpectQueueDone();
 }
 
 }  // namespace

@@ -1,25 +1,17 @@
-// The entries in hand and the journal of those that are done.
+// The entries in progress and the journal of processed ones.
 #include "taken_queue.h"
 
 #include <fcntl.h>
-#include <gmock/gmock.h>
-#include <sys/file.h>
 #include <sys/stat.h>
 #include <sys/wait.h>
 
 #include <atomic>
 #include <cerrno>
-#include <chrono>
 #include <cstdio>
 #include <set>
-#include <string>
 #include <thread>
-#include <vector>
 
-#include "platform/velaindex.h"
 #include "queue_fixture.h"
-#include "support/descriptor.h"
-#include "support/files.h"
 #include "support/mounts.h"
 #include "support/privileges.h"
 
@@ -28,74 +20,80 @@ using namespace vela;
 namespace vela_test {
 namespace {
 
-using ::testing::AnyOf;
-using ::testing::ElementsAre;
-using ::testing::IsEmpty;
+using namespace ::testing;
 using Outcome = TakenQueue::Outcome;
 
 class TakenQueueTest : public SandboxTest {
  protected:
+  static void ExpectTake(TakenQueue& queue, Outcome outcome,
+                         const std::vector<std::string>& entries) {
+    EXPECT_EQ(queue.Take(), outcome);
+    EXPECT_EQ(queue.Entries(), entries);
+  }
+
+  void ExpectTake(Outcome outcome, const std::vector<std::string>& entries) {
+    ExpectTake(taken_, outcome, entries);
+  }
+
+  void TakeNewEntry() {
+    AppendToQueue({"/a"});
+    ASSERT_EQ(taken_.Take(), Outcome::kTaken);
+  }
+
   TakenQueue taken_{PhotoQueuePaths()};
 };
 
-TEST_F(TakenQueueTest, WithoutAQueueNothingWaits) {
+TEST_F(TakenQueueTest, WithoutAQueueThereIsNothing) {
   EXPECT_EQ(taken_.Take(), Outcome::kNothing);
   EXPECT_THAT(ListDirectory("/var/spool"), IsEmpty());
 }
 
 TEST_F(TakenQueueTest, TakesEachEntryOnceInTheOrderOfFirstAppearance) {
   WriteFile(kQueueFile, "/c\n/a\nR:/a\n/c\n/b\n/a\n");
-  EXPECT_EQ(taken_.Take(), Outcome::kTaken);
-  EXPECT_THAT(taken_.Entries(), ElementsAre("/c", "/a", "R:/a", "/b"));
+  ExpectTake(Outcome::kTaken, {"/c", "/a", "R:/a", "/b"});
   EXPECT_FALSE(Exists(kQueueFile));
   EXPECT_TRUE(Exists(kTakenFile));
 }
 
-TEST_F(TakenQueueTest, PassesOverLinesThatAreEmptyOrTooLong) {
+TEST_F(TakenQueueTest, SkipsLinesThatAreEmptyOrTooLong) {
   const std::string longest = '/' + std::string(4093, 'x');
   WriteFile(kQueueFile, "\n" + longest + "\n" + longest + "y\n/last without newline");
-  EXPECT_EQ(taken_.Take(), Outcome::kTaken);
-  EXPECT_THAT(taken_.Entries(), ElementsAre(longest, "/last without newline"));
+  ExpectTake(Outcome::kTaken, {longest, "/last without newline"});
 }
 
-TEST_F(TakenQueueTest, WhatAnEarlierRunHasLeftComesFirst) {
+TEST_F(TakenQueueTest, EntriesOfAnEarlierRunComeFirst) {
   WriteFile(kTakenFile, "/old\n");
   WriteFile(kQueueFile, "/new\n");
-  EXPECT_EQ(taken_.Take(), Outcome::kResumed);
-  EXPECT_THAT(taken_.Entries(), ElementsAre("/old"));
+  ExpectTake(Outcome::kResumed, {"/old"});
   EXPECT_EQ(ReadFile(kQueueFile), "/new\n");
   EXPECT_EQ(taken_.Finish(), 0);
-  EXPECT_EQ(taken_.Take(), Outcome::kTaken);
-  EXPECT_THAT(taken_.Entries(), ElementsAre("/new"));
+  ExpectTake(Outcome::kTaken, {"/new"});
 }
 
-TEST_F(TakenQueueTest, WhatIsNotedAsDoneIsNotRepeated) {
+TEST_F(TakenQueueTest, ProcessedEntriesAreNotRepeated) {
   WriteFile(kQueueFile, "/a\n/b\n/c\n/b\n");
   ASSERT_EQ(taken_.Take(), Outcome::kTaken);
   EXPECT_EQ(taken_.MarkDone("/b"), 0);
-  TakenQueue later(PhotoQueuePaths());
-  EXPECT_EQ(later.Take(), Outcome::kResumed);
-  EXPECT_THAT(later.Entries(), ElementsAre("/a", "/c"));
+  TakenQueue next(PhotoQueuePaths());
+  ExpectTake(next, Outcome::kResumed, {"/a", "/c"});
 }
 
-TEST_F(TakenQueueTest, AJournalLineThatWasCutOffCountsForNothing) {
+TEST_F(TakenQueueTest, ATruncatedJournalLineIsIgnored) {
   WriteFile(kTakenFile, "/a\n/b\n/b/long\n");
   WriteFile(kJournalFile, "/a\n/b");
-  EXPECT_EQ(taken_.Take(), Outcome::kResumed);
-  EXPECT_THAT(taken_.Entries(), ElementsAre("/b", "/b/long"));
+  ExpectTake(Outcome::kResumed, {"/b", "/b/long"});
 }
 
-TEST_F(TakenQueueTest, AJournalLineThatWasCutOffDoesNotJoinTheNext) {
+TEST_F(TakenQueueTest, ATruncatedJournalLineIsNotJoinedWithTheNext) {
   WriteFile(kTakenFile, "/a/long\n/b\n/a/b\n");
   WriteFile(kJournalFile, "/a");
   ASSERT_EQ(taken_.Take(), Outcome::kResumed);
   EXPECT_EQ(taken_.MarkDone("/b"), 0);
-  TakenQueue later(PhotoQueuePaths());
-  EXPECT_EQ(later.Take(), Outcome::kResumed);
-  EXPECT_THAT(later.Entries(), ElementsAre("/a/long", "/a/b"));
+  TakenQueue next(PhotoQueuePaths());
+  ExpectTake(next, Outcome::kResumed, {"/a/long", "/a/b"});
 }
 
-TEST_F(TakenQueueTest, AJournalOnAFullVolumeKeepsNoPartOfALine) {
+TEST_F(TakenQueueTest, AJournalOnAFullVolumeGetsNoPartOfALine) {
   SmallVolume volume("/tmp/spool", 1 << 20);
   const QueuePaths paths = {"/tmp/spool/queue", "/tmp/spool/taken", "/tmp/spool/journal",
                             "/tmp/spool/later"};
@@ -109,29 +107,27 @@ TEST_F(TakenQueueTest, AJournalOnAFullVolumeKeepsNoPartOfALine) {
   EXPECT_EQ(ReadFile(paths.journal), filler + '\n');
 }
 
-TEST_F(TakenQueueTest, AJournalWithoutItsEntriesIsForgotten) {
+TEST_F(TakenQueueTest, AJournalWithoutItsEntriesIsRemoved) {
   WriteFile(kJournalFile, "/a\n");
   WriteFile(kQueueFile, "/a\n");
-  EXPECT_EQ(taken_.Take(), Outcome::kTaken);
-  EXPECT_THAT(taken_.Entries(), ElementsAre("/a"));
+  ExpectTake(Outcome::kTaken, {"/a"});
   EXPECT_FALSE(Exists(kJournalFile));
 }
 
 TEST_F(TakenQueueTest, FinishLeavesNothing) {
-  AppendToQueue({"/a"});
-  ASSERT_EQ(taken_.Take(), Outcome::kTaken);
+  TakeNewEntry();
   EXPECT_EQ(taken_.MarkDone("/a"), 0);
   EXPECT_EQ(taken_.Finish(), 0);
   EXPECT_THAT(taken_.Entries(), IsEmpty());
   EXPECT_THAT(ListDirectory("/var/spool"), IsEmpty());
 }
 
-TEST_F(TakenQueueTest, TellsThatAnEntryCannotBeNoted) {
+TEST_F(TakenQueueTest, ReportsThatAnEntryCannotBeRecorded) {
   MakeDirectories(kJournalFile);
   EXPECT_EQ(taken_.MarkDone("/a"), EISDIR);
 }
 
-TEST_F(TakenQueueTest, AQueueThatCannotBeReadStaysWhereItIs) {
+TEST_F(TakenQueueTest, AnUnreadableQueueIsKept) {
   WriteFile(kQueueFile, "/a\n");
   ASSERT_EQ(chmod(kQueueFile, 0), 0);
   {
@@ -141,32 +137,24 @@ TEST_F(TakenQueueTest, AQueueThatCannotBeReadStaysWhereItIs) {
   EXPECT_EQ(ReadFile(kQueueFile), "/a\n");
 }
 
-TEST_F(TakenQueueTest, AQueueThatCannotBeRenamedStaysWhereItIs) {
+TEST_F(TakenQueueTest, AQueueThatCannotBeRenamedIsKept) {
   WriteFile(kQueueFile, "/a\n");
   const ReadOnlyMount spool("/var/spool");
   EXPECT_EQ(taken_.Take(), Outcome::kFailed);
   EXPECT_EQ(ReadFile(kQueueFile), "/a\n");
 }
 
-/// The queue, locked as by somebody who appends.
-Descriptor LockedQueue() {
-  Descriptor queue(open(kQueueFile, O_WRONLY | O_CREAT | O_APPEND | O_CLOEXEC, 0644));
-  EXPECT_EQ(flock(queue.Get(), LOCK_EX), 0);
-  return queue;
-}
-
-TEST_F(TakenQueueTest, TakesNoQueueWhileAnAppendIsUnderWay) {
-  Descriptor queue = LockedQueue();
+TEST_F(TakenQueueTest, TakesNoQueueDuringAnAppend) {
+  Descriptor queue = HoldLock(kQueueFile, O_WRONLY | O_CREAT | O_APPEND);
   EXPECT_EQ(taken_.Take(), Outcome::kBusy);
   EXPECT_FALSE(Exists(kTakenFile));
   EXPECT_EQ(write(queue.Get(), "/late\n", 6), 6);
   EXPECT_EQ(taken_.Take(), Outcome::kBusy);
   queue.Close();
-  EXPECT_EQ(taken_.Take(), Outcome::kTaken);
-  EXPECT_THAT(taken_.Entries(), ElementsAre("/late"));
+  ExpectTake(Outcome::kTaken, {"/late"});
 }
 
-TEST_F(TakenQueueTest, AFifoInTheQueuesPlaceIsRefused) {
+TEST_F(TakenQueueTest, AFifoInPlaceOfTheQueueIsRefused) {
   ASSERT_EQ(mkfifo(kQueueFile, 0644), 0);
   EXPECT_EQ(taken_.Take(), Outcome::kFailed);
   EXPECT_TRUE(Exists(kQueueFile));
@@ -175,43 +163,36 @@ TEST_F(TakenQueueTest, AFifoInTheQueuesPlaceIsRefused) {
 
 TEST_F(TakenQueueTest, SpellingsOfOnePathAreOneEntry) {
   WriteFile(kQueueFile, "/a/\n/a\n//a\n/./a/.\nR:/a/\nR:/a\n/\n//\n/a b\n/a/b\n");
-  EXPECT_EQ(taken_.Take(), Outcome::kTaken);
-  EXPECT_THAT(taken_.Entries(), ElementsAre("/a/", "R:/a/", "/", "/a b", "/a/b"));
+  ExpectTake(Outcome::kTaken, {"/a/", "R:/a/", "/", "/a b", "/a/b"});
 }
 
-TEST_F(TakenQueueTest, WhatIsDoneIsKnownByWhateverSpelling) {
+TEST_F(TakenQueueTest, ProcessedEntriesAreRecognizedInAnySpelling) {
   WriteFile(kTakenFile, "/a/\n//b\n/c\n");
   WriteFile(kJournalFile, "/a\n/b/\n");
-  EXPECT_EQ(taken_.Take(), Outcome::kResumed);
-  EXPECT_THAT(taken_.Entries(), ElementsAre("/c"));
+  ExpectTake(Outcome::kResumed, {"/c"});
 }
 
 TEST_F(TakenQueueTest, APathThroughALinkAndBackIsAnEntryOfItsOwn) {
   // With /link -> /elsewhere/deep the second one is /elsewhere/a.
   WriteFile(kQueueFile, "/a\n/link/../a\n");
-  EXPECT_EQ(taken_.Take(), Outcome::kTaken);
-  EXPECT_THAT(taken_.Entries(), ElementsAre("/a", "/link/../a"));
+  ExpectTake(Outcome::kTaken, {"/a", "/link/../a"});
 }
 
-TEST_F(TakenQueueTest, ALineThatIsAppendedToWhatWasTakenIsNotLost) {
-  AppendToQueue({"/a"});
-  ASSERT_EQ(taken_.Take(), Outcome::kTaken);
+TEST_F(TakenQueueTest, ALineAppendedToTheTakenFileIsNotLost) {
+  TakeNewEntry();
   AppendToFile(kTakenFile, "/late\n");
   EXPECT_EQ(taken_.MarkDone("/a"), 0);
   EXPECT_EQ(taken_.Finish(), 0);
-  EXPECT_EQ(taken_.Take(), Outcome::kResumed);
-  EXPECT_THAT(taken_.Entries(), ElementsAre("/late"));
+  ExpectTake(Outcome::kResumed, {"/late"});
   EXPECT_EQ(taken_.MarkDone("/late"), 0);
   EXPECT_EQ(taken_.Finish(), 0);
   EXPECT_THAT(ListDirectory("/var/spool"), IsEmpty());
 }
 
-TEST_F(TakenQueueTest, WhatIsDoneStaysWhileSomebodyHoldsIt) {
-  AppendToQueue({"/a"});
-  ASSERT_EQ(taken_.Take(), Outcome::kTaken);
+TEST_F(TakenQueueTest, ALockedTakenFileIsKept) {
+  TakeNewEntry();
   EXPECT_EQ(taken_.MarkDone("/a"), 0);
-  Descriptor held(open(kTakenFile, O_RDONLY | O_CLOEXEC));
-  ASSERT_EQ(flock(held.Get(), LOCK_EX), 0);
+  Descriptor held = HoldLock(kTakenFile, O_RDONLY);
   EXPECT_EQ(taken_.Finish(), EWOULDBLOCK);
   EXPECT_TRUE(Exists(kTakenFile));
   held.Close();
@@ -219,74 +200,52 @@ TEST_F(TakenQueueTest, WhatIsDoneStaysWhileSomebodyHoldsIt) {
   EXPECT_THAT(ListDirectory("/var/spool"), IsEmpty());
 }
 
-TEST_F(TakenQueueTest, WhatIsLeftForLaterIsDoneForNowAndComesBack) {
+TEST_F(TakenQueueTest, AnEntryLeftForLaterIsPutBack) {
   AppendToQueue({"/a", "/b", "/c"});
   ASSERT_EQ(taken_.Take(), Outcome::kTaken);
   EXPECT_EQ(taken_.Defer("/c"), 0);
   EXPECT_EQ(taken_.Defer("/a"), 0);
   EXPECT_EQ(ReadFile(kLaterFile), "/c\n/a\n");
-  EXPECT_EQ(taken_.Take(), Outcome::kResumed);
-  EXPECT_THAT(taken_.Entries(), ElementsAre("/b"));
+  ExpectTake(Outcome::kResumed, {"/b"});
   EXPECT_EQ(taken_.Finish(), 0);
   EXPECT_EQ(taken_.RequeueDeferred(), 0);
   EXPECT_FALSE(Exists(kLaterFile));
-  EXPECT_EQ(taken_.Take(), Outcome::kTaken);
-  EXPECT_THAT(taken_.Entries(), ElementsAre("/c", "/a"));
+  ExpectTake(Outcome::kTaken, {"/c", "/a"});
 }
 
-TEST_F(TakenQueueTest, WithNothingLeftForLaterNothingIsPutBack) {
+TEST_F(TakenQueueTest, WithoutEntriesLeftForLaterNothingIsPutBack) {
   EXPECT_EQ(taken_.RequeueDeferred(), 0);
   EXPECT_THAT(ListDirectory("/var/spool"), IsEmpty());
 }
 
-TEST_F(TakenQueueTest, AnEntryThatCannotBeKeptIsNotDone) {
-  AppendToQueue({"/a"});
-  ASSERT_EQ(taken_.Take(), Outcome::kTaken);
+TEST_F(TakenQueueTest, AnEntryThatCannotBeLeftIsNotMarkedAsDone) {
+  TakeNewEntry();
   MakeDirectories(kLaterFile);
   EXPECT_EQ(taken_.Defer("/a"), EISDIR);
   EXPECT_FALSE(Exists(kJournalFile));
 }
 
-TEST_F(TakenQueueTest, WhatCannotBePutBackIsKept) {
+TEST_F(TakenQueueTest, EntriesThatCannotBePutBackAreKept) {
   WriteFile(kLaterFile, "/a\n");
   MakeDirectories(kQueueFile);
   EXPECT_NE(taken_.RequeueDeferred(), 0);
   EXPECT_EQ(ReadFile(kLaterFile), "/a\n");
 }
 
-TEST_F(TakenQueueTest, AnEmptyQueueIsLeftToWhoeverIsAboutToWriteIt) {
+TEST_F(TakenQueueTest, ANewEmptyQueueIsLeftToItsWriter) {
   WriteFile(kQueueFile, "");
   EXPECT_EQ(taken_.Take(), Outcome::kNothing);
   EXPECT_TRUE(Exists(kQueueFile));
   EXPECT_FALSE(Exists(kTakenFile));
   AppendToQueue({"/a"});
-  EXPECT_EQ(taken_.Take(), Outcome::kTaken);
-  EXPECT_THAT(taken_.Entries(), ElementsAre("/a"));
+  ExpectTake(Outcome::kTaken, {"/a"});
 }
 
-TEST_F(TakenQueueTest, AnEmptyQueueThatNobodyWritesIsRemoved) {
+TEST_F(TakenQueueTest, AnOldEmptyQueueIsRemoved) {
   WriteFile(kQueueFile, "");
   SetFileTimeFromNow(kQueueFile, -60);
   EXPECT_EQ(taken_.Take(), Outcome::kNothing);
   EXPECT_THAT(ListDirectory("/var/spool"), IsEmpty());
-}
-
-/// Starts a process that appends `count` entries of its own, one after the other.
-pid_t StartAppender(int number, int count) {
-  const pid_t child = fork();
-  if (child != 0) {
-    return child;
-  }
-  for (int i = 0; i < count; ++i) {
-    const std::string entry = '/' + std::to_string(number) + '/' + std::to_string(i);
-    if (WriteIndexQueue(entry.c_str(), kQueueFile) != 0) {
-      _exit(1);
-    }
-    if (i % 5 == 4) {
-      usleep(1000);  // who takes comes to his turn
-    }
-  }
-  _exit(0);
 }
 
 TEST_F(TakenQueueTest, NoEntryIsLostWhileOthersAppend) {
@@ -294,7 +253,9 @@ TEST_F(TakenQueueTest, NoEntryIsLostWhileOthersAppend) {
   constexpr int kEntries = 500;
   std::vector<pid_t> appenders;
   for (int i = 0; i < kAppenders; ++i) {
-    appenders.push_back(StartAppender(i, kEntries));
+    // The pauses give the test time to take the queue.
+    appenders.push_back(StartAppender('/' + std::to_string(i), kEntries,
+                                      [](int j) { return j % 5 == 4 ? 1000 : 0; }));
   }
   std::atomic<bool> isOver = false;
   std::thread waiting([&] {
@@ -317,7 +278,7 @@ TEST_F(TakenQueueTest, NoEntryIsLostWhileOthersAppend) {
         seen.insert(entry);
         EXPECT_EQ(taken_.MarkDone(entry), 0);
       }
-      // Whoever waited for the lock before the renaming has it for a moment.
+      // An appender that waited for the lock before the renaming holds it for a moment.
       EXPECT_THAT(taken_.Finish(), AnyOf(0, EWOULDBLOCK));
     }
   }

@@ -1,41 +1,28 @@
 // Videos that need work, and what their check removes.
-#include <gmock/gmock.h>
-#include <json/value.h>
 #include <sys/stat.h>
 
 #include <optional>
-#include <string>
-#include <vector>
 
-#include "status_program.h"
-#include "status_text.h"
-#include "storage/media_fixture.h"
+#include "status_fixture.h"
 #include "storage/velamk_thumb_status.h"
 #include "support/daemon_peer.h"
-#include "support/files.h"
 #include "support/films.h"
 #include "support/images.h"
-#include "support/sandbox.h"
 
 namespace vela_test {
 namespace {
 
-using ::testing::ElementsAre;
-using ::testing::HasSubstr;
-using ::testing::IsEmpty;
-using ::testing::Not;
+using namespace ::testing;
 
-constexpr const char* kTop = "/tmp/films";
 constexpr const char* kQuestion = "GET_MEDIA_FROM_PLUGIN_DB";
 constexpr const char* kLandscape = R"({"success":true,"media":{"width":640,"height":480}})";
 constexpr const char* kPortrait = R"({"success":true,"media":{"width":480,"height":640}})";
 
-/// A directory of films and the index service, which takes every video for a landscape one.
-class VideoCheck : public SandboxTest {
+/// A directory of videos and the index service, which reports every video as landscape.
+class VideoCheck : public StatusTest {
  protected:
   void SetUp() override {
-    SandboxTest::SetUp();
-    MakeDirectories(kTop);
+    StatusTest::SetUp();
     daemon_.emplace();
     SetRecord(kLandscape);
   }
@@ -43,11 +30,7 @@ class VideoCheck : public SandboxTest {
   DaemonPeer& Daemon() { return *daemon_; }
   void SetRecord(const char* record) { daemon_->Answer(kQuestion, DaemonReply::Line(record)); }
 
-  static std::string In(const std::string& name) { return std::string(kTop) + "/" + name; }
   static std::string EaDir(const std::string& file) { return In("@eaDir/") + file; }
-  static std::string Derived(const std::string& file, const std::string& name) {
-    return EaDir(file) + "/" + name;
-  }
 
   static void MakeVideo(const std::string& name, int rotation = 0,
                         const std::string& codec = "libx264") {
@@ -59,7 +42,7 @@ class VideoCheck : public SandboxTest {
     SetFileTime(In(name), kMediaTime);
   }
 
-  /// Landscape thumbnails of all sizes.
+  /// Makes landscape thumbnails of all sizes.
   static void MakeVideoThumbs(const std::string& video) {
     MakeDirectories(EaDir(video));
     for (const char* name : kThumbNames) {
@@ -78,7 +61,7 @@ class VideoCheck : public SandboxTest {
   std::optional<DaemonPeer> daemon_;  // not before the sandbox is reset
 };
 
-TEST_F(VideoCheck, ACompleteVideoIsLeftAlone) {
+TEST_F(VideoCheck, ACompleteVideoIsKept) {
   MakeVideo("a.mp4");
   MakeVideoThumbs("a.mp4");
   const std::vector<std::string> before = ListTree(kTop);
@@ -99,8 +82,9 @@ TEST_F(VideoCheck, VideosThatLackThumbsAreWork) {
   WriteFile(In("c.txt"), "no video");
   const ProgramResult result = RunStatus({"--check-videos", kTop});
   EXPECT_EQ(result.exitCode, 1);
-  EXPECT_EQ(ReadStatusText(result.out).totals.videos, "2");
-  EXPECT_EQ(ReadStatusText(result.out).totals.numbers, (StatusNumbers{0, 0, 0, 0, 0}));
+  const StatusLine totals = ReadStatusText(result.out).totals;
+  EXPECT_EQ(totals.videos, "2");
+  EXPECT_EQ(totals.numbers, (StatusNumbers{0, 0, 0, 0, 0}));
 }
 
 TEST_F(VideoCheck, ThumbsOfTheWrongOrientationAreRemovedButNothingElse) {
@@ -127,7 +111,7 @@ TEST_F(VideoCheck, OutdatedThumbsAreRemoved) {
   EXPECT_EQ(ListDirectory(EaDir("a.mp4")).size(), 5U);
 }
 
-TEST_F(VideoCheck, FilmsOfRotatedVideosOfTheWrongOrientationAreRemoved) {
+TEST_F(VideoCheck, ConvertedVideosOfTheWrongOrientationAreRemoved) {
   WriteFile("/etc/velainfo.conf", "video_thumb_size_map=\"0\"\n");
   SetRecord(kPortrait);
   MakeVideo("a.mp4", 90, "mpeg4");
@@ -141,12 +125,12 @@ TEST_F(VideoCheck, FilmsOfRotatedVideosOfTheWrongOrientationAreRemoved) {
   EXPECT_FALSE(Exists(film));
 }
 
-TEST_F(VideoCheck, WithoutItNothingIsRemovedNorTheServiceAsked) {
+TEST_F(VideoCheck, WithoutTheOptionNothingIsRemovedAndTheServiceIsNotAsked) {
   SetRecord(kPortrait);
   MakeVideo("a.mp4");
   MakeVideoThumbs("a.mp4");
   SetFileTime(Derived("a.mp4", kThumbNames[1]), kMediaTime - 1);
-  WriteFile("/var/spool/flv_create.queue", In("a.mp4") + "\n");
+  WriteFile(kVideoQueue, In("a.mp4") + "\n");
   const std::vector<std::string> before = ListTree(kTop);
   RunStatus({"--recursive", "--photos", "--queue", "--progress", "--resume-time", kTop});
   RunStatus({"--recursive", "--photos", "--json", "--queue", "--progress", kTop});
@@ -155,20 +139,20 @@ TEST_F(VideoCheck, WithoutItNothingIsRemovedNorTheServiceAsked) {
   EXPECT_EQ(Daemon().Connections(), 0U);
 }
 
-TEST_F(VideoCheck, WaitingVideosAreNotCounted) {
+TEST_F(VideoCheck, QueuedVideosAreNotCounted) {
   MakeVideo("a.mp4");
-  WriteFile("/var/spool/flv_create.queue", In("a.mp4") + "\n");
+  WriteFile(kVideoQueue, In("a.mp4") + "\n");
   const ProgramResult result = RunStatus({"--check-videos", kTop});
   EXPECT_EQ(result.exitCode, 0);
   EXPECT_EQ(ReadStatusText(result.out).totals.videos, "0");
 }
 
-TEST_F(VideoCheck, CountsOfATreeAreTheLibrarys) {
+TEST_F(VideoCheck, CountsOfATreeAgreeWithTheLibrary) {
   MakeDirectories(In("below"));
   MakeVideo("a.mp4");
   MakeVideo("below/b.mp4");
   MakeVideo("below/c.mp4");
-  const StatusText answer = ReadStatusText(RunStatus({"--check-videos", "--recursive", kTop}).out);
+  const StatusText answer = AskForText({"--check-videos", "--recursive", kTop});
   ASSERT_THAT(answer.Names(), ElementsAre(kTop, In("below")));
   EXPECT_EQ(answer.directories[0].videos, "1");
   EXPECT_EQ(answer.directories[1].videos, "2");
@@ -184,7 +168,7 @@ TEST_F(VideoCheck, JsonHasTheCounts) {
   EXPECT_EQ(answer["totals"]["videos_needing_work"], Json::Value(1));
 }
 
-TEST_F(VideoCheck, JsonHasTheCountsAsNumbersWheneverAskedFor) {
+TEST_F(VideoCheck, JsonHasTheCountsEvenWithoutAnyVideo) {
   const Json::Value nothing = AskForJson({"--check-videos", "/tmp/none"})["totals"];
   EXPECT_EQ(nothing["videos_needing_work"], Json::Value(0));
   EXPECT_EQ(nothing["queued"]["videos_needing_work"], Json::Value(0));
@@ -197,39 +181,38 @@ TEST_F(VideoCheck, JsonHasTheCountsAsNumbersWheneverAskedFor) {
   EXPECT_EQ(answer["totals"]["videos_needing_work"], Json::Value(0));
 }
 
-TEST_F(VideoCheck, TellsTheVideosOfWaitingDirectoriesApart) {
+TEST_F(VideoCheck, CountsTheVideosOfQueuedDirectoriesSeparately) {
   MakeDirectories(In("below"));
   MakeVideo("a.mp4");
   MakeVideo("below/b.mp4");
-  WriteFile("/var/spool/thumb_create.queue", In("below") + "\n");
+  WriteFile(kPhotoQueue, In("below") + "\n");
   const Json::Value totals = AskForJson({"--check-videos", "--recursive", kTop})["totals"];
   EXPECT_EQ(totals["videos_needing_work"], Json::Value(2));
   EXPECT_EQ(totals["queued"]["videos_needing_work"], Json::Value(1));
 }
 
-TEST_F(VideoCheck, VideosOfTheQueueAreLookedAt) {
+TEST_F(VideoCheck, VideosOfTheQueueAreChecked) {
   MakeDirectories(In("below"));
   MakeVideo("a.mp4");
   MakeVideo("below/b.mp4");
   MakeVideo("complete.mp4");
   MakeVideoThumbs("complete.mp4");
-  WriteFile("/var/spool/flv_create.queue",
-            In("a.mp4") + "\n" + In("complete.mp4") + "\nR:" + In("below") + "\n");
-  WriteFile("/var/spool/flv_create.queue.tmp", In("complete.mp4") + "\n");
-  WriteFile("/var/spool/thumb_create.queue", "/tmp/photos\n");
+  WriteFile(kVideoQueue, In("a.mp4") + "\n" + In("complete.mp4") + "\nR:" + In("below") + "\n");
+  WriteFile(kVideosInProgress, In("complete.mp4") + "\n");
+  WriteFile(kPhotoQueue, "/tmp/photos\n");
   const ProgramResult result = RunStatus({"--queue", "--check-videos"});
   EXPECT_EQ(result.exitCode, 1);
-  EXPECT_THAT(result.out, HasSubstr("    3 entries, videos that need work: 2\n"));
-  EXPECT_THAT(result.out, HasSubstr("    1 entry, videos that need work: 0\n"));
-  EXPECT_THAT(result.out, HasSubstr("    1 entry\n"));
+  EXPECT_THAT(result.out, AllOf(HasSubstr("    3 entries, videos that need work: 2\n"),
+                                HasSubstr("    1 entry, videos that need work: 0\n"),
+                                HasSubstr("    1 entry\n")));
   const Json::Value queues = AskForJson({"--queue", "--check-videos"})["queues"];
-  EXPECT_EQ(queues[0]["videos_needing_work"], Json::Value());
-  EXPECT_EQ(queues[1]["videos_needing_work"], Json::Value());
-  EXPECT_EQ(queues[2]["videos_needing_work"], Json::Value(0));
-  EXPECT_EQ(queues[3]["videos_needing_work"], Json::Value(2));
+  const Json::Value expected[] = {Json::Value(), Json::Value(), Json::Value(0), Json::Value(2)};
+  for (Json::ArrayIndex i = 0; i < 4; ++i) {
+    EXPECT_EQ(queues[i]["videos_needing_work"], expected[i]) << i;
+  }
 }
 
-TEST_F(VideoCheck, OnlyItLoadsWhatReadsVideos) {
+TEST_F(VideoCheck, OnlyTheOptionLoadsTheVideoLibrary) {
   MakeVideo("a.mp4");
   MakeVideoThumbs("a.mp4");
   ProgramOptions options;

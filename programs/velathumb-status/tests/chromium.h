@@ -1,4 +1,4 @@
-// A browser that opens pages and tells what it sees.
+// A browser that opens pages and reports what they look like.
 #pragma once
 
 #include <cstdint>

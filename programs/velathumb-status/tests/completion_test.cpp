@@ -1,27 +1,16 @@
-// The completion of the command line in bash.
-#include <gmock/gmock.h>
-
+// Command-line completion in bash.
 #include <sstream>
-#include <string>
-#include <vector>
 
-#include "status_program.h"
+#include "status_fixture.h"
 #include "support/build_paths.h"
-#include "support/files.h"
-#include "support/program.h"
-#include "support/sandbox.h"
 
 namespace vela_test {
 namespace {
 
-using ::testing::ElementsAre;
-using ::testing::IsEmpty;
-using ::testing::IsSupersetOf;
-using ::testing::UnorderedElementsAre;
-using ::testing::UnorderedElementsAreArray;
+using namespace ::testing;
 
-/// Calls what the file has registered, as bash does, with the words behind the program's name as
-/// $2 and so on; each proposal is printed with a zero byte behind it.
+/// Calls the registered completion function as bash does, with the words after the program's name
+/// as $2 and so on; each proposal is printed with a trailing zero byte.
 constexpr const char* kScript = R"(
   source "$1" && shift
   registered=$(complete -p velathumb-status) || exit 9
@@ -61,7 +50,7 @@ class Completion : public SandboxTest {
   }
 };
 
-TEST_F(Completion, ProposesTheOptionThatBeginsSo) {
+TEST_F(Completion, ProposesOptionsWithThePrefix) {
   EXPECT_THAT(Complete({"--pr"}), ElementsAre("--progress"));
   EXPECT_THAT(Complete({"--re"}), UnorderedElementsAre("--recursive", "--resume-time"));
   EXPECT_THAT(Complete({"/tmp", "--ch"}), ElementsAre("--check-videos"));
@@ -73,14 +62,11 @@ std::vector<std::string> OptionsOfTheHelp() {
   std::vector<std::string> options;
   std::istringstream help(RunStatus({"--help"}).out);
   for (std::string line; std::getline(help, line);) {
-    std::istringstream words(line);
-    std::string forms;
-    words >> forms;
     if (line.compare(0, 3, "  -") != 0) {
       continue;
     }
-    std::istringstream list(forms);
-    for (std::string form; std::getline(list, form, ',');) {
+    std::istringstream forms(line.substr(2, line.find(' ', 2) - 2));
+    for (std::string form; std::getline(forms, form, ',');) {
       options.push_back(form);
     }
   }

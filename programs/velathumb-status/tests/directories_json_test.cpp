@@ -1,24 +1,10 @@
 // The answer about directories in JSON.
-#include <gmock/gmock.h>
-#include <json/value.h>
-
-#include <string>
-#include <vector>
-
-#include "status_program.h"
-#include "storage/photo_tree.h"
-#include "support/files.h"
-#include "support/sandbox.h"
+#include "status_fixture.h"
 
 namespace vela_test {
 namespace {
 
-using ::testing::ElementsAre;
-using ::testing::UnorderedElementsAre;
-using ::testing::UnorderedElementsAreArray;
-
-constexpr const char* kTop = "/tmp/photos";
-constexpr int kAllSizes = 63;
+using namespace ::testing;
 
 const std::vector<std::string> kCountKeys = {"failure_markers", "incomplete_photos",
                                              "missing_thumbs",  "photos",
@@ -27,14 +13,6 @@ const std::vector<std::string> kCountKeys = {"failure_markers", "incomplete_phot
 std::vector<std::string> With(std::vector<std::string> keys, const std::vector<std::string>& more) {
   keys.insert(keys.end(), more.begin(), more.end());
   return keys;
-}
-
-std::vector<std::string> Texts(const Json::Value& list) {
-  std::vector<std::string> texts;
-  for (const Json::Value& text : list) {
-    texts.push_back(text.asString());
-  }
-  return texts;
 }
 
 std::string Decoded(const Json::Value& base64) {
@@ -57,22 +35,7 @@ std::string Decoded(const Json::Value& base64) {
   return bytes;
 }
 
-class JsonDirectories : public SandboxTest {
- protected:
-  void SetUp() override {
-    SandboxTest::SetUp();
-    MakeDirectories(kTop);
-  }
-
-  static void MakePhotoWith(const std::string& name, int sizes) {
-    MakePhoto(std::string(kTop) + "/" + name);
-    MakeThumbs(kTop, name, sizes);
-  }
-
-  static std::string Derived(const std::string& photo, const std::string& name) {
-    return std::string(kTop) + "/@eaDir/" + photo + "/" + name;
-  }
-};
+using JsonDirectories = StatusTest;
 
 TEST_F(JsonDirectories, HaveTheDocumentedMembers) {
   MakePhotoWith("a.jpg", 0);
@@ -96,40 +59,28 @@ TEST_F(JsonDirectories, HaveTheCountsAsNumbers) {
   MakePhotoWith("lacking.jpg", kBitS | kBitM);
   SetFileTime(Derived("lacking.jpg", "VELAPHOTO_THUMB_M.jpg"), kMediaTime - 1);
   WriteFile(Derived("lacking.jpg", "VELAPHOTO_THUMB_B.fail"), "");
-  const Json::Value directory = AskForJson({kTop})["directories"][0];
-  EXPECT_EQ(directory["path"], Json::Value(kTop));
-  EXPECT_EQ(directory["queued"], Json::Value(false));
-  EXPECT_EQ(directory["photos"], Json::Value(2));
-  EXPECT_EQ(directory["incomplete_photos"], Json::Value(1));
-  EXPECT_EQ(directory["present_thumbs"], Json::Value(7));
-  EXPECT_EQ(directory["missing_thumbs"], Json::Value(5));
-  EXPECT_EQ(directory["failure_markers"], Json::Value(1));
-  EXPECT_EQ(directory["videos_needing_work"], Json::Value());
+  EXPECT_EQ(AskForJson({kTop})["directories"][0],
+            ReadJson(R"({"path": "/tmp/photos", "queued": false, "photos": 2,
+                         "incomplete_photos": 1, "present_thumbs": 7, "missing_thumbs": 5,
+                         "failure_markers": 1, "videos_needing_work": null})"));
 }
 
-TEST_F(JsonDirectories, TotalsTellTheQueuedOnesApart) {
+TEST_F(JsonDirectories, TotalsCountTheQueuedOnesSeparately) {
   MakePhoto("/tmp/free/a.jpg");
   MakePhoto("/tmp/waiting/a.jpg");
   MakePhoto("/tmp/waiting/b.jpg");
   MakeThumbs("/tmp/waiting", "b.jpg", kAllSizes);
   WriteFile("/tmp/waiting/@eaDir/a.jpg/VELAPHOTO_THUMB_S.fail", "");
-  WriteFile("/var/spool/thumb_create.queue", "/tmp/waiting\n");
+  WriteFile(kPhotoQueue, "/tmp/waiting\n");
   const Json::Value answer = AskForJson({"/tmp/free", "/tmp/waiting"});
   EXPECT_EQ(answer["directories"][0]["queued"], Json::Value(false));
   EXPECT_EQ(answer["directories"][1]["queued"], Json::Value(true));
-  const Json::Value totals = answer["totals"];
-  EXPECT_EQ(totals["directories"], Json::Value(2));
-  EXPECT_EQ(totals["queued_directories"], Json::Value(1));
-  EXPECT_EQ(totals["photos"], Json::Value(3));
-  EXPECT_EQ(totals["incomplete_photos"], Json::Value(2));
-  EXPECT_EQ(totals["present_thumbs"], Json::Value(6));
-  EXPECT_EQ(totals["missing_thumbs"], Json::Value(12));
-  EXPECT_EQ(totals["failure_markers"], Json::Value(1));
-  EXPECT_EQ(totals["queued"]["photos"], Json::Value(2));
-  EXPECT_EQ(totals["queued"]["incomplete_photos"], Json::Value(1));
-  EXPECT_EQ(totals["queued"]["present_thumbs"], Json::Value(6));
-  EXPECT_EQ(totals["queued"]["missing_thumbs"], Json::Value(6));
-  EXPECT_EQ(totals["queued"]["failure_markers"], Json::Value(1));
+  ExpectMembers(answer["totals"], R"({"directories": 2, "queued_directories": 1, "photos": 3,
+                                      "incomplete_photos": 2, "present_thumbs": 6,
+                                      "missing_thumbs": 12, "failure_markers": 1})");
+  ExpectMembers(answer["totals"]["queued"], R"({"photos": 2, "incomplete_photos": 1,
+                                                "present_thumbs": 6, "missing_thumbs": 6,
+                                                "failure_markers": 1})");
 }
 
 TEST_F(JsonDirectories, PhotosAreListedWithTheStateOfEachSize) {
@@ -140,16 +91,12 @@ TEST_F(JsonDirectories, PhotosAreListedWithTheStateOfEachSize) {
   const Json::Value list = AskForJson({"--photos", kTop})["directories"][0]["photo_list"];
   ASSERT_TRUE(list.isArray());
   ASSERT_EQ(list.size(), 1U);
-  EXPECT_THAT(list[0].getMemberNames(),
-              UnorderedElementsAre("name", "present", "missing", "outdated", "failed"));
-  EXPECT_EQ(list[0]["name"], Json::Value("a.jpg"));
-  EXPECT_THAT(Texts(list[0]["present"]), ElementsAre("SM", "XL"));
-  EXPECT_THAT(Texts(list[0]["missing"]), ElementsAre("S", "M", "L"));
-  EXPECT_THAT(Texts(list[0]["outdated"]), ElementsAre("B"));
-  EXPECT_THAT(Texts(list[0]["failed"]), ElementsAre("L"));
+  EXPECT_EQ(list[0], ReadJson(R"({"name": "a.jpg", "present": ["SM", "XL"],
+                                  "missing": ["S", "M", "L"], "outdated": ["B"],
+                                  "failed": ["L"]})"));
 }
 
-TEST_F(JsonDirectories, ThePhotoListIsThereButEmptyWithoutIncompletePhotos) {
+TEST_F(JsonDirectories, ThePhotoListIsEmptyWithoutIncompletePhotos) {
   MakePhotoWith("complete.jpg", kAllSizes);
   MakePhoto("/tmp/first/a.jpg");
   const Json::Value directories = AskForJson({"--photos", "/tmp/first", kTop})["directories"];
@@ -157,27 +104,23 @@ TEST_F(JsonDirectories, ThePhotoListIsThereButEmptyWithoutIncompletePhotos) {
   EXPECT_EQ(directories[1]["photo_list"], Json::Value(Json::arrayValue));
 }
 
-TEST_F(JsonDirectories, NamesWithAMeaningInJsonStayThemselves) {
-  const std::string name = "quote\" back\\ new\nline tab\t bell\x07 \x7f <b>&.jpg";
-  MakePhotoWith(name, 0);
+TEST_F(JsonDirectories, ValidUtf8IsKeptWhateverItMeansInJson) {
+  const std::string names[] = {"quote\" back\\ new\nline tab\t bell\x07 \x7f <b>&.jpg",
+                               "gr\xc3\xbc\xc3\x9f \xe2\x82\xac \xf0\x9f\x93\xb7.jpg"};
   const std::string dir = "/tmp/odd \"\\\n\x01";
-  MakeDirectories(dir);
-  const Json::Value answer = AskForJson({"-p", kTop, dir});
-  EXPECT_EQ(answer["directories"][0]["photo_list"][0]["name"].asString(), name);
-  EXPECT_FALSE(answer["directories"][0]["photo_list"][0].isMember("name_base64"));
-  EXPECT_EQ(answer["directories"][1]["path"].asString(), dir);
-  EXPECT_FALSE(answer["directories"][1].isMember("path_base64"));
+  MakePhotoWith(names[0], 0);
+  MakePhoto(dir + "/" + names[1]);
+  const Json::Value directories = AskForJson({"-p", kTop, dir})["directories"];
+  EXPECT_EQ(directories[1]["path"].asString(), dir);
+  EXPECT_FALSE(directories[1].isMember("path_base64"));
+  for (const Json::ArrayIndex i : {0U, 1U}) {
+    const Json::Value photo = directories[i]["photo_list"][0];
+    EXPECT_EQ(photo["name"].asString(), names[i]);
+    EXPECT_FALSE(photo.isMember("name_base64"));
+  }
 }
 
-TEST_F(JsonDirectories, ValidUtf8StaysItself) {
-  const std::string name = "gr\xc3\xbc\xc3\x9f \xe2\x82\xac \xf0\x9f\x93\xb7.jpg";
-  MakePhotoWith(name, 0);
-  const Json::Value photo = AskForJson({"-p", kTop})["directories"][0]["photo_list"][0];
-  EXPECT_EQ(photo["name"].asString(), name);
-  EXPECT_FALSE(photo.isMember("name_base64"));
-}
-
-TEST_F(JsonDirectories, NamesThatAreNoUtf8StandThereExactlyInBase64) {
+TEST_F(JsonDirectories, NamesThatAreNotUtf8AreAddedExactlyInBase64) {
   const std::string dir = "/tmp/\xff\xfe dir";
   const std::string names[] = {"cut \xc3.jpg", "surrogate \xed\xa0\x80.jpg",
                                "overlong \xc0\xaf.jpg", "latin \xe4\xf6\"\n.jpg"};
@@ -190,7 +133,7 @@ TEST_F(JsonDirectories, NamesThatAreNoUtf8StandThereExactlyInBase64) {
   std::vector<std::string> decoded;
   for (const Json::Value& photo : directory["photo_list"]) {
     decoded.push_back(Decoded(photo["name_base64"]));
-    EXPECT_NE(photo["name"].asString().find("\xef\xbf\xbd"), std::string::npos);
+    EXPECT_THAT(photo["name"].asString(), HasSubstr("\xef\xbf\xbd"));
   }
   EXPECT_THAT(decoded, UnorderedElementsAreArray(names));
 }
@@ -209,14 +152,13 @@ TEST_F(JsonDirectories, AreOneWholeObjectWithTheErrorWhenADirectoryIsMissing) {
   EXPECT_EQ(answer["directories"][0]["path"], Json::Value(kTop));
 }
 
-TEST_F(JsonDirectories, AreEmptyWhenNoDirectoryCouldBeLookedAt) {
+TEST_F(JsonDirectories, AreEmptyWhenNoDirectoryCouldBeScanned) {
   const Json::Value answer = AskForJson({"/tmp/none"});
   EXPECT_EQ(answer["directories"], Json::Value(Json::arrayValue));
-  EXPECT_EQ(answer["totals"]["directories"], Json::Value(0));
-  EXPECT_EQ(answer["totals"]["photos"], Json::Value(0));
+  ExpectMembers(answer["totals"], R"({"directories": 0, "photos": 0})");
 }
 
-TEST_F(JsonDirectories, StandBesideTheOtherAnswersInOneObject) {
+TEST_F(JsonDirectories, ShareOneObjectWithTheOtherAnswers) {
   const Json::Value answer = AskForJson({"--queue", "--progress", "--resume-time", kTop});
   EXPECT_THAT(answer.getMemberNames(),
               UnorderedElementsAre("format", "directories", "totals", "queues", "progress",

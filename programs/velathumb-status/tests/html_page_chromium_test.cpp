@@ -16,8 +16,7 @@ using namespace vela;
 namespace vela_test {
 namespace {
 
-using ::testing::ElementsAre;
-using ::testing::HasSubstr;
+using namespace ::testing;
 
 using HtmlPageInBrowser = SandboxTest;
 
@@ -30,7 +29,7 @@ constexpr uint32_t kMissingColour = 0xc98a00;
 
 /// A photo whose smallest thumbnail shows the quadrants.
 PhotoReport WithPicture(const PhotoReport& photo, int width = 120, int height = 90) {
-  const std::string thumb = ThumbOf(photo, EA_THUMB_SIZE_S);
+  const std::string thumb = ThumbOf(photo, kS);
   WriteFile(thumb, "");  // makes the directories
   JpegRecipe recipe;
   recipe.width = width;
@@ -39,25 +38,22 @@ PhotoReport WithPicture(const PhotoReport& photo, int width = 120, int height = 
   return photo;
 }
 
-PhotoReport FailedPhoto(const std::string& name) {
-  PhotoReport photo = PhotoInState(name, ThumbState::kMissing, {EA_THUMB_SIZE_XL});
-  MarkFailed(photo, {EA_THUMB_SIZE_XL}, 1700000000);
-  return photo;
+PhotoReport FailedPhoto() {
+  return WithFailures(Missing({kXL}, "b.jpg"), {kXL}, 1700000000);
 }
 
-/// Lays out what lies below the window as well, which the browser puts off.
+/// Lays out the part below the window as well, which the browser otherwise postpones.
 constexpr const char* kLayOutAll =
     "doc.head.insertAdjacentHTML('beforeend','<style>.tile{content-visibility:visible}</style>')";
 
-/// A page with everything there is, long names above all.
+/// A page with every kind of content, including long names.
 void WriteFullPage() {
-  PhotoReport lost = PhotoInState(std::string(250, 'w'), ThumbState::kMissing, AllSizes());
-  MarkFailed(lost, AllSizes(), 1700000000);
+  const PhotoReport lost =
+      WithFailures(Missing(AllSizes(), std::string(250, 'w')), AllSizes(), 1700000000);
   WritePage({{"/photos/" + std::string(250, 'm') + '/' + std::string(250, 'n'),
               true,
-              {WithPicture(CompletePhoto("a.jpg")), WithPicture(FailedPhoto("b.jpg")), lost,
-               PhotoInState("c d.jpg", ThumbState::kMissing, AllSizes()),
-               PhotoInState("e.jpg", ThumbState::kOutdated, AllSizes())},
+              {WithPicture(CompletePhoto("a.jpg")), WithPicture(FailedPhoto()), lost,
+               Missing(AllSizes(), "c d.jpg"), Outdated(AllSizes(), "e.jpg")},
               1234567}});
 }
 
@@ -77,7 +73,7 @@ int QuadrantPixelsIn(const Screenshot& picture, char letter) {
   return picture.CountOf(ColourOf(letter), 12);
 }
 
-TEST_F(HtmlPageInBrowser, ThePicturesOfThePhotosAreSeen) {
+TEST_F(HtmlPageInBrowser, TheThumbnailsAreVisible) {
   WritePage({{"/photos", false, {WithPicture(CompletePhoto("a.jpg"))}}});
   for (const BrowserView& view : {kPhone, kDesktop}) {
     const Screenshot picture = TakeScreenshot(kPage, view);
@@ -97,7 +93,7 @@ TEST_F(HtmlPageInBrowser, WithoutAThumbThereAreNoPictures) {
   }
 }
 
-TEST_F(HtmlPageInBrowser, AHighPictureStaysInItsBox) {
+TEST_F(HtmlPageInBrowser, APortraitPictureStaysInItsBox) {
   WritePage({{"/photos", false, {WithPicture(CompletePhoto("a.jpg"), 60, 120)}}});
   EXPECT_THAT(AskPage(kPage, {"all('.pic img')[0].getBoundingClientRect().height<="
                               "all('.pic')[0].getBoundingClientRect().height",
@@ -106,16 +102,14 @@ TEST_F(HtmlPageInBrowser, AHighPictureStaysInItsBox) {
               ElementsAre("true", "true"));
 }
 
-TEST_F(HtmlPageInBrowser, StatesAreSeenByTheirMarks) {
+TEST_F(HtmlPageInBrowser, StatesHaveTheirColours) {
   const PhotoReport complete = CompletePhoto("a.jpg");
   WritePage({{"/photos", false, {complete}}});
   const Screenshot plain = TakeScreenshot(kPage, kDesktop);  // the legend shows the colours as well
-  WritePage({{"/photos", false, {complete, FailedPhoto("b.jpg")}}});
+  WritePage({{"/photos", false, {complete, FailedPhoto()}}});
   EXPECT_GT(TakeScreenshot(kPage, kDesktop).CountOf(kFailedColour),
             plain.CountOf(kFailedColour) + 1000);
-  WritePage({{"/photos",
-              false,
-              {complete, PhotoInState("c.jpg", ThumbState::kMissing, {EA_THUMB_SIZE_L})}}});
+  WritePage({{"/photos", false, {complete, Missing({kL}, "c.jpg")}}});
   EXPECT_GT(TakeScreenshot(kPage, kDesktop).CountOf(kMissingColour),
             plain.CountOf(kMissingColour) + 500);
 }
@@ -132,10 +126,8 @@ TEST_F(HtmlPageInBrowser, TheReasonOfAFailureIsReadable) {
 }
 
 TEST_F(HtmlPageInBrowser, ThePartsOfTheBarAreAsWideAsTheirShares) {
-  PhotoReport photo =
-      PhotoInState("a.jpg", ThumbState::kMissing, {EA_THUMB_SIZE_S, EA_THUMB_SIZE_M});
-  MarkFailed(photo, {EA_THUMB_SIZE_S}, 1700000000);
-  PhotoReport other = PhotoInState("b.jpg", ThumbState::kNotWanted, AllSizes());
+  const PhotoReport photo = WithFailures(Missing({kS, kM}), {kS}, 1700000000);
+  PhotoReport other = WithState(CompletePhoto("b.jpg"), ThumbState::kNotWanted, AllSizes());
   WritePage({{"/photos", false, {photo, other}}});
   const std::string width = "getBoundingClientRect().width";
   EXPECT_THAT(AskPage(kPage, {"Math.abs(all('.bar .present')[0]." + width +
@@ -166,7 +158,7 @@ TEST_F(HtmlPageInBrowser, APhoneShowsPhotosSideBySide) {
               ElementsAre("2"));
 }
 
-TEST_F(HtmlPageInBrowser, TheColoursFollowTheReader) {
+TEST_F(HtmlPageInBrowser, TheColoursFollowThePreferredScheme) {
   WriteFullPage();
   const Screenshot light = TakeScreenshot(kPage, kDesktop);
   const Screenshot dark = TakeScreenshot(kPage, kDarkDesktop);
@@ -174,7 +166,7 @@ TEST_F(HtmlPageInBrowser, TheColoursFollowTheReader) {
   EXPECT_EQ(dark.At(2, 2), 0x10141au);
 }
 
-/// The contrast of the texts against what is behind them, by the usual formula.
+/// Whether all texts have the contrast of 4.5 to their background that WCAG asks for.
 constexpr const char* kLeastContrast =
     "(()=>{const parts=c=>c.match(/[\\d.]+/g).map(Number);"
     "const light=c=>parts(c).slice(0,3).map(v=>v/255).map(v=>v<=0.03928?v/12.92:"
@@ -186,13 +178,13 @@ constexpr const char* kLeastContrast =
     "const a=light(view.getComputedStyle(e).color),b=light(behind(e));"
     "return (Math.max(a,b)+0.05)/(Math.min(a,b)+0.05)}))>=4.5})()";
 
-TEST_F(HtmlPageInBrowser, TextsStandOutFromTheirGround) {
+TEST_F(HtmlPageInBrowser, TextsHaveEnoughContrast) {
   WriteFullPage();
   EXPECT_THAT(AskPage(kPage, {kLeastContrast}, kDesktop), ElementsAre("true"));
   EXPECT_THAT(AskPage(kPage, {kLeastContrast}, kDarkDesktop), ElementsAre("true"));
 }
 
-TEST_F(HtmlPageInBrowser, TheReaderChoosesWhichPhotosAreShown) {
+TEST_F(HtmlPageInBrowser, PhotosCanBeFiltered) {
   WriteFullPage();
   const std::string shown =
       "all('.tile').filter(t=>view.getComputedStyle(t).display!=='none').length";
@@ -243,13 +235,12 @@ TEST_F(HtmlPageInBrowser, HostileNamesAreShownAndRunNothing) {
 }
 
 TEST_F(HtmlPageInBrowser, APageWithTwoThousandPhotosIsShown) {
-  const std::string picture = ReadFile(ThumbOf(WithPicture(CompletePhoto("0")), EA_THUMB_SIZE_S));
+  const std::string picture = ReadFile(ThumbOf(WithPicture(CompletePhoto("0")), kS));
   std::vector<PhotoReport> photos;
   for (int i = 0; i < 2000; ++i) {
     photos.push_back(CompletePhoto(std::to_string(i)));
     // Bytes behind a picture do not change it, but make it another one for the browser.
-    WriteFile(ThumbOf(photos.back(), EA_THUMB_SIZE_S),
-              picture + std::string(3000, 'x') + std::to_string(i));
+    WriteFile(ThumbOf(photos.back(), kS), picture + std::string(3000, 'x') + std::to_string(i));
   }
   WritePage({{"/photos", false, photos}});
   EXPECT_THAT(AskPage(kPage,
@@ -263,7 +254,7 @@ TEST_F(HtmlPageInBrowser, APageWithTwoThousandPhotosIsShown) {
 
 TEST_F(HtmlPageInBrowser, AThumbThatIsNoPictureIsToldByItsName) {
   const PhotoReport photo = CompletePhoto("broken.jpg");
-  WriteFile(ThumbOf(photo, EA_THUMB_SIZE_S), ThumbBytes("no picture"));
+  WriteFile(ThumbOf(photo, kS), ThumbBytes("no picture"));
   WritePage({{"/photos", false, {photo}}});
   EXPECT_THAT(AskPage(kPage, {"all('img')[0].naturalWidth", "all('img')[0].alt"}),
               ElementsAre("0", PercentEncoded("Thumbnail of broken.jpg")));

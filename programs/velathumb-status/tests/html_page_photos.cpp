@@ -40,24 +40,30 @@ PhotoReport CompletePhoto(const std::string& name) {
   return photo;
 }
 
-PhotoReport PhotoInState(const std::string& name, ThumbState state,
-                         const std::vector<EA_THUMB_SIZE>& sizes) {
-  PhotoReport photo = CompletePhoto(name);
+PhotoReport WithState(PhotoReport photo, ThumbState state, const Sizes& sizes) {
   for (const EA_THUMB_SIZE size : sizes) {
     photo.thumbs.states[static_cast<size_t>(size)] = state;
   }
   return photo;
 }
 
-void MarkFailed(PhotoReport& photo, const std::vector<EA_THUMB_SIZE>& sizes, time_t time) {
+PhotoReport Missing(const Sizes& sizes, const std::string& name) {
+  return WithState(CompletePhoto(name), ThumbState::kMissing, sizes);
+}
+
+PhotoReport Outdated(const Sizes& sizes, const std::string& name) {
+  return WithState(CompletePhoto(name), ThumbState::kOutdated, sizes);
+}
+
+PhotoReport WithFailures(PhotoReport photo, const Sizes& sizes, time_t time) {
   for (const EA_THUMB_SIZE size : sizes) {
     photo.failures[static_cast<size_t>(size)] = time;
   }
+  return photo;
 }
 
-std::vector<EA_THUMB_SIZE> AllSizes() {
-  return {EA_THUMB_SIZE_S, EA_THUMB_SIZE_SM, EA_THUMB_SIZE_M,
-          EA_THUMB_SIZE_B, EA_THUMB_SIZE_L,  EA_THUMB_SIZE_XL};
+Sizes AllSizes() {
+  return {kS, kSM, kM, kB, kL, kXL};
 }
 
 std::string ThumbOf(const PhotoReport& photo, EA_THUMB_SIZE size) {

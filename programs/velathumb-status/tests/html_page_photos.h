@@ -11,22 +11,33 @@
 
 namespace vela_test {
 
-/// Where the page of these tests stands.
+/// The page of these tests.
 constexpr const char* kPageDirectory = "/tmp/page";
 constexpr const char* kPage = "/tmp/page/status.html";
+
+using Sizes = std::vector<EA_THUMB_SIZE>;
+constexpr EA_THUMB_SIZE kS = EA_THUMB_SIZE_S;
+constexpr EA_THUMB_SIZE kSM = EA_THUMB_SIZE_SM;
+constexpr EA_THUMB_SIZE kM = EA_THUMB_SIZE_M;
+constexpr EA_THUMB_SIZE kB = EA_THUMB_SIZE_B;
+constexpr EA_THUMB_SIZE kL = EA_THUMB_SIZE_L;
+constexpr EA_THUMB_SIZE kXL = EA_THUMB_SIZE_XL;
 
 /// A photo in /tmp/photos all of whose thumbnails are present.
 vela::PhotoReport CompletePhoto(const std::string& name);
 
-/// The same with the given sizes in another state.
-vela::PhotoReport PhotoInState(const std::string& name, vela::ThumbState state,
-                               const std::vector<EA_THUMB_SIZE>& sizes);
+/// The photo with the given sizes in another state.
+vela::PhotoReport WithState(vela::PhotoReport photo, vela::ThumbState state, const Sizes& sizes);
 
-/// Marks sizes of the photo as failed at that time.
-void MarkFailed(vela::PhotoReport& photo, const std::vector<EA_THUMB_SIZE>& sizes, time_t time);
+/// A photo that is complete but for the given sizes.
+vela::PhotoReport Missing(const Sizes& sizes, const std::string& name = "a.jpg");
+vela::PhotoReport Outdated(const Sizes& sizes, const std::string& name = "a.jpg");
 
-/// Every size there is.
-std::vector<EA_THUMB_SIZE> AllSizes();
+/// The photo with failures of the given sizes at that time.
+vela::PhotoReport WithFailures(vela::PhotoReport photo, const Sizes& sizes, time_t time);
+
+/// All sizes.
+Sizes AllSizes();
 
 /// The path of the photo's thumbnail, under its current name.
 std::string ThumbOf(const vela::PhotoReport& photo, EA_THUMB_SIZE size);
@@ -34,7 +45,7 @@ std::string ThumbOf(const vela::PhotoReport& photo, EA_THUMB_SIZE size);
 /// The same under its older name.
 std::string OldThumbOf(const vela::PhotoReport& photo, EA_THUMB_SIZE size);
 
-/// What a thumbnail may hold: the beginning of every JPEG and the text behind it.
+/// A thumbnail's content: the first bytes of every JPEG, followed by the text.
 std::string ThumbBytes(const std::string& text);
 
 /// One directory and its photos.

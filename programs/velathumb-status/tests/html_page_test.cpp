@@ -1,4 +1,4 @@
-// What the page of the status says, and how its file comes to be.
+// The content of the status page, and how its file is written.
 #include "html_page.h"
 
 #include <fcntl.h>
@@ -15,8 +15,6 @@
 #include <cerrno>
 #include <ostream>
 #include <set>
-#include <string>
-#include <vector>
 
 #include "html_counts.h"
 #include "html_page_photos.h"
@@ -33,13 +31,7 @@ using namespace vela;
 namespace vela_test {
 namespace {
 
-using ::testing::AllOf;
-using ::testing::ElementsAre;
-using ::testing::EndsWith;
-using ::testing::HasSubstr;
-using ::testing::IsEmpty;
-using ::testing::Not;
-using ::testing::StartsWith;
+using namespace ::testing;
 
 using HtmlPageTest = SandboxTest;
 
@@ -51,7 +43,7 @@ size_t CountOf(const std::string& part, const std::string& text) {
   return count;
 }
 
-/// What stands between the first `begin` and the next `end`.
+/// The text from the first `begin` up to the next `end`.
 std::string Between(const std::string& text, const std::string& begin, const std::string& end) {
   const size_t from = text.find(begin);
   EXPECT_NE(from, std::string::npos) << begin;
@@ -67,7 +59,7 @@ std::string TileOf(const PhotoReport& photo) {
   return Between(page, "<li class=\"tile", "</li>");
 }
 
-/// How a page embeds this file, in the words of a tool that encodes it.
+/// The attribute with which a page embeds this content, encoded by an independent tool.
 std::string EmbeddedForm(const std::string& content) {
   WriteFile("/tmp/content", content);
   const ProgramResult result = RunProgram("/usr/bin/base64", {"-w0", "/tmp/content"});
@@ -75,7 +67,7 @@ std::string EmbeddedForm(const std::string& content) {
   return "src=\"data:image/jpeg;base64," + result.out + '"';
 }
 
-/// Points in time are told for a place five hours east.
+/// Sets the time zone to five hours east of Greenwich.
 class TimeZone {
  public:
   TimeZone() {
@@ -96,9 +88,9 @@ constexpr const char* kTimeText =
 
 // The document
 
-TEST_F(HtmlPageTest, IsOneWholeDocumentThatLetsNothingRunOrLoad) {
+TEST_F(HtmlPageTest, IsACompleteDocumentThatRunsAndLoadsNothing) {
   const PhotoReport photo = CompletePhoto("a.jpg");
-  WriteFile(ThumbOf(photo, EA_THUMB_SIZE_S), ThumbBytes("thumb"));
+  WriteFile(ThumbOf(photo, kS), ThumbBytes("thumb"));
   const std::string page = PageOfPhotos({photo, CompletePhoto("b.jpg")});
   EXPECT_THAT(page, StartsWith("<!DOCTYPE html>\n<html lang=\"en\">\n<head>\n<meta "
                                "charset=\"utf-8\">\n<meta http-equiv=\"Content-Security-Policy\" "
@@ -117,8 +109,7 @@ TEST_F(HtmlPageTest, IsOneWholeDocumentThatLetsNothingRunOrLoad) {
 }
 
 TEST_F(HtmlPageTest, ElementsAreClosedInTheirOrder) {
-  PhotoReport failed = PhotoInState("b.jpg", ThumbState::kMissing, AllSizes());
-  MarkFailed(failed, AllSizes(), kTime);
+  const PhotoReport failed = WithFailures(Missing(AllSizes(), "b.jpg"), AllSizes(), kTime);
   WritePage(
       {{"/tmp/photos", true, {CompletePhoto("a.jpg"), failed}, 2}, {"/tmp/empty", false, {}}});
   const std::string page = ReadFile(kPage);
@@ -139,32 +130,23 @@ TEST_F(HtmlPageTest, ElementsAreClosedInTheirOrder) {
   EXPECT_THAT(open, IsEmpty());
 }
 
-TEST_F(HtmlPageTest, TheSummaryTellsTheTotals) {
-  PhotoReport missing = PhotoInState("b.jpg", ThumbState::kMissing,
-                                     {EA_THUMB_SIZE_M, EA_THUMB_SIZE_L, EA_THUMB_SIZE_XL});
-  MarkFailed(missing, {EA_THUMB_SIZE_XL}, kTime);
-  const PhotoReport outdated =
-      PhotoInState("c.jpg", ThumbState::kOutdated, {EA_THUMB_SIZE_S, EA_THUMB_SIZE_B});
+TEST_F(HtmlPageTest, TheSummaryShowsTheTotals) {
+  const PhotoReport missing = WithFailures(Missing({kM, kL, kXL}, "b.jpg"), {kXL}, kTime);
   const std::string page = PageOf({{"/tmp/photos", true, {CompletePhoto("a.jpg"), missing}, 3},
-                                   {"/tmp/more", false, {outdated}, 4}});
+                                   {"/tmp/more", false, {Outdated({kS, kB}, "c.jpg")}, 4}});
   const std::string header = Between(page, "<header>", "</header>");
-  EXPECT_THAT(header, HasSubstr("<p class=\"lead\">2 directories, <time "));
-  EXPECT_THAT(header, HasSubstr("<b>72%</b> of 18 thumbnails present"));
-  EXPECT_THAT(header, HasSubstr("</i>Present 13 (72%)"));
-  EXPECT_THAT(header, HasSubstr("</i>Missing or outdated 4 (22%)"));
-  EXPECT_THAT(header, HasSubstr("</i>Failed 1 (6%)"));
-  EXPECT_THAT(header, HasSubstr("<dt>Photos</dt><dd>3</dd>"));
-  EXPECT_THAT(header, HasSubstr("<dt>Photos that need work</dt><dd>2</dd>"));
-  EXPECT_THAT(header, HasSubstr("<dt>Directories</dt><dd>2</dd>"));
-  EXPECT_THAT(header, HasSubstr("<dt>Queued directories</dt><dd>1</dd>"));
-  EXPECT_THAT(header, HasSubstr("<dt>Videos that need work</dt><dd>7</dd>"));
+  for (const char* part :
+       {"<p class=\"lead\">2 directories, <time ", "<b>72%</b> of 18 thumbnails present",
+        "</i>Present 13 (72%)", "</i>Missing or outdated 4 (22%)", "</i>Failed 1 (6%)",
+        "<dt>Photos</dt><dd>3</dd>", "<dt>Photos that need work</dt><dd>2</dd>",
+        "<dt>Directories</dt><dd>2</dd>", "<dt>Queued directories</dt><dd>1</dd>",
+        "<dt>Videos that need work</dt><dd>7</dd>"}) {
+    EXPECT_THAT(header, HasSubstr(part));
+  }
 }
 
-TEST_F(HtmlPageTest, TheBarHasAPartForEachShareAndSaysSo) {
-  PhotoReport photo = PhotoInState("a.jpg", ThumbState::kMissing,
-                                   {EA_THUMB_SIZE_S, EA_THUMB_SIZE_M, EA_THUMB_SIZE_L});
-  MarkFailed(photo, {EA_THUMB_SIZE_M}, kTime);
-  const std::string page = PageOfPhotos({photo});
+TEST_F(HtmlPageTest, TheBarHasAPartForEachShareAndALabel) {
+  const std::string page = PageOfPhotos({WithFailures(Missing({kS, kM, kL}), {kM}, kTime)});
   const std::string parts =
       " role=\"img\" aria-label=\"Thumbnails: 3 present, 2 missing, 1 failed\">"
       "<span class=\"present\" style=\"flex-grow:3\"></span>"
@@ -174,20 +156,18 @@ TEST_F(HtmlPageTest, TheBarHasAPartForEachShareAndSaysSo) {
   EXPECT_THAT(page, HasSubstr("<div class=\"bar thin\"" + parts));
 }
 
-TEST_F(HtmlPageTest, AShareOfNothingHasNoPart) {
+TEST_F(HtmlPageTest, AnEmptyShareHasNoPart) {
   const std::string page = PageOfPhotos({CompletePhoto("a.jpg")});
   EXPECT_THAT(page, HasSubstr("aria-label=\"Thumbnails: 6 present, 0 missing, 0 failed\">"
                               "<span class=\"present\" style=\"flex-grow:6\"></span></div>"));
 }
 
-TEST_F(HtmlPageTest, VideosThatWereNotAskedForAreNotTold) {
+TEST_F(HtmlPageTest, VideosThatWereNotAskedForAreNotShown) {
   EXPECT_THAT(PageOfPhotos({CompletePhoto("a.jpg")}), Not(HasSubstr("ideos")));
 }
 
 TEST_F(HtmlPageTest, EveryDirectoryHasASectionInTheOrderOfTheScan) {
-  PhotoReport photo =
-      PhotoInState("c.jpg", ThumbState::kMissing, {EA_THUMB_SIZE_S, EA_THUMB_SIZE_M});
-  MarkFailed(photo, {EA_THUMB_SIZE_M}, kTime);
+  const PhotoReport photo = WithFailures(Missing({kS, kM}, "c.jpg"), {kM}, kTime);
   const std::string page =
       PageOf({{"/photos/b", true, {CompletePhoto("a.jpg"), CompletePhoto("b.jpg"), photo}, 1},
               {"/photos/a", false, {CompletePhoto("d.jpg")}, 0}});
@@ -207,14 +187,14 @@ TEST_F(HtmlPageTest, EveryDirectoryHasASectionInTheOrderOfTheScan) {
   EXPECT_EQ(CountOf("<li class=\"tile", last), 1u);
 }
 
-TEST_F(HtmlPageTest, PhotosStayInTheirOrder) {
+TEST_F(HtmlPageTest, PhotosKeepTheirOrder) {
   const std::string page =
       PageOfPhotos({CompletePhoto("b"), CompletePhoto("a"), CompletePhoto("c")});
   EXPECT_LT(page.find("<bdi>b</bdi>"), page.find("<bdi>a</bdi>"));
   EXPECT_LT(page.find("<bdi>a</bdi>"), page.find("<bdi>c</bdi>"));
 }
 
-TEST_F(HtmlPageTest, ADirectoryWithoutPhotosSaysSo) {
+TEST_F(HtmlPageTest, ADirectoryWithoutPhotosIsLabelledAsEmpty) {
   const std::string page = PageOf({{"/photos/a", false, {}}});
   EXPECT_THAT(page, HasSubstr("There are no thumbnails to make."));
   const std::string section = Between(page, "<section", "</section>");
@@ -223,7 +203,7 @@ TEST_F(HtmlPageTest, ADirectoryWithoutPhotosSaysSo) {
   EXPECT_THAT(page, Not(HasSubstr("class=\"bar")));
 }
 
-TEST_F(HtmlPageTest, WithoutADirectoryThereIsAPage) {
+TEST_F(HtmlPageTest, APageCanBeEmpty) {
   const std::string page = PageOf({});
   EXPECT_THAT(page, HasSubstr("0 directories"));
   EXPECT_THAT(page, Not(HasSubstr("<section")));
@@ -233,7 +213,7 @@ TEST_F(HtmlPageTest, WithoutADirectoryThereIsAPage) {
 
 TEST_F(HtmlPageTest, ACompletePhotoHasNoMark) {
   const PhotoReport photo = CompletePhoto("a.jpg");
-  WriteFile(ThumbOf(photo, EA_THUMB_SIZE_S), ThumbBytes("thumb"));
+  WriteFile(ThumbOf(photo, kS), ThumbBytes("thumb"));
   EXPECT_EQ(TileOf(photo),
             "<li class=\"tile done\">\n<div class=\"pic\"><img " +
                 EmbeddedForm(ThumbBytes("thumb")) +
@@ -242,109 +222,99 @@ TEST_F(HtmlPageTest, ACompletePhotoHasNoMark) {
                 "</p>\n");
 }
 
-TEST_F(HtmlPageTest, SizesThatAreNotWantedAreNotMissed) {
-  EXPECT_THAT(TileOf(PhotoInState("a.jpg", ThumbState::kNotWanted, AllSizes())),
-              AllOf(StartsWith("<li class=\"tile done\">"), Not(HasSubstr("note"))));
+std::string Mark(const std::string& text) {
+  return "<strong class=\"mark\">" + text + "</strong>";
+}
+
+std::string Note(const std::string& text) {
+  return "<p class=\"note\">" + text + "</p>";
+}
+
+/// Fails the test unless the photo's tile is of the class, has all the parts and none of `absent`.
+void ExpectTile(const PhotoReport& photo, const std::string& tileClass,
+                const std::vector<std::string>& parts, const std::vector<std::string>& absent) {
+  const TimeZone zone;
+  const std::string tile = TileOf(photo);
+  EXPECT_THAT(tile, StartsWith("<li class=\"tile " + tileClass + "\">"));
+  for (const std::string& part : parts) {
+    EXPECT_THAT(tile, HasSubstr(part));
+  }
+  for (const std::string& part : absent) {
+    EXPECT_THAT(tile, Not(HasSubstr(part)));
+  }
+}
+
+TEST_F(HtmlPageTest, SizesThatAreNotWantedAreNotMissing) {
+  ExpectTile(WithState(CompletePhoto("a.jpg"), ThumbState::kNotWanted, AllSizes()), "done", {},
+             {"note"});
 }
 
 TEST_F(HtmlPageTest, AMissingThumbIsNamedWithItsSize) {
-  const std::string tile = TileOf(PhotoInState(
-      "a.jpg", ThumbState::kMissing, {EA_THUMB_SIZE_M, EA_THUMB_SIZE_SM, EA_THUMB_SIZE_XL}));
-  EXPECT_THAT(tile, StartsWith("<li class=\"tile missing\">"));
-  EXPECT_THAT(tile, HasSubstr("<strong class=\"mark\">Missing</strong>"));
-  EXPECT_THAT(tile, HasSubstr("<p class=\"note\">Missing: SM\u00a0(240×240), M\u00a0(320×320), "
-                              "XL\u00a0(1280×1280)</p>"));
-  EXPECT_THAT(tile, Not(HasSubstr("Outdated")));
+  ExpectTile(
+      Missing({kM, kSM, kXL}), "missing",
+      {Mark("Missing"), Note("Missing: SM\u00a0(240×240), M\u00a0(320×320), XL\u00a0(1280×1280)")},
+      {"Outdated"});
 }
 
-TEST_F(HtmlPageTest, AnOutdatedThumbIsNamedAsSuch) {
-  const std::string tile =
-      TileOf(PhotoInState("a.jpg", ThumbState::kOutdated, {EA_THUMB_SIZE_L, EA_THUMB_SIZE_S}));
-  EXPECT_THAT(tile, StartsWith("<li class=\"tile missing\">"));
-  EXPECT_THAT(tile, HasSubstr("<strong class=\"mark\">Outdated</strong>"));
-  EXPECT_THAT(tile,
-              HasSubstr("<p class=\"note\">Outdated: S\u00a0(120×120), L\u00a0(800×800)</p>"));
-  EXPECT_THAT(tile, Not(HasSubstr("Missing")));
+TEST_F(HtmlPageTest, AnOutdatedThumbIsNamedWithItsSize) {
+  ExpectTile(Outdated({kL, kS}), "missing",
+             {Mark("Outdated"), Note("Outdated: S\u00a0(120×120), L\u00a0(800×800)")}, {"Missing"});
 }
 
-TEST_F(HtmlPageTest, AFailedSizeIsTheReasonOfAFailedTile) {
-  const TimeZone zone;
-  PhotoReport photo =
-      PhotoInState("a.jpg", ThumbState::kMissing, {EA_THUMB_SIZE_XL, EA_THUMB_SIZE_B});
-  photo.thumbs.states[EA_THUMB_SIZE_S] = ThumbState::kOutdated;
-  MarkFailed(photo, {EA_THUMB_SIZE_XL}, kTime);
-  const std::string tile = TileOf(photo);
-  EXPECT_THAT(tile, StartsWith("<li class=\"tile failed\">"));
-  EXPECT_THAT(tile, HasSubstr("<strong class=\"mark\">Failed</strong>"));
-  EXPECT_THAT(tile, HasSubstr("<p class=\"note\">Could not be made: XL\u00a0(1280×1280), since " +
-                              std::string(kTimeText) + "</p>"));
-  EXPECT_THAT(tile, HasSubstr("<p class=\"note\">Missing: B\u00a0(640×640)</p>"));
-  EXPECT_THAT(tile, HasSubstr("<p class=\"note\">Outdated: S\u00a0(120×120)</p>"));
+TEST_F(HtmlPageTest, AFailedSizeMakesAFailedTile) {
+  ExpectTile(WithFailures(WithState(Missing({kXL, kB}), ThumbState::kOutdated, {kS}), {kXL}, kTime),
+             "failed",
+             {Mark("Failed"),
+              Note("Could not be made: XL\u00a0(1280×1280), since " + std::string(kTimeText)),
+              Note("Missing: B\u00a0(640×640)"), Note("Outdated: S\u00a0(120×120)")},
+             {});
 }
 
-TEST_F(HtmlPageTest, SizesThatFailedAtOneTimeStandTogether) {
-  const TimeZone zone;
-  PhotoReport photo =
-      PhotoInState("a.jpg", ThumbState::kMissing,
-                   {EA_THUMB_SIZE_XL, EA_THUMB_SIZE_L, EA_THUMB_SIZE_B, EA_THUMB_SIZE_M});
-  MarkFailed(photo, {EA_THUMB_SIZE_XL, EA_THUMB_SIZE_M}, kTime);
-  MarkFailed(photo, {EA_THUMB_SIZE_L}, kTime - 60);
-  const std::string tile = TileOf(photo);
-  EXPECT_THAT(tile, HasSubstr("Could not be made: M\u00a0(320×320), XL\u00a0(1280×1280), since " +
-                              std::string(kTimeText)));
-  EXPECT_THAT(tile, HasSubstr("Could not be made: L\u00a0(800×800), since <time "
-                              "datetime=\"2023-11-15T03:12:20+0500\">2023-11-15 03:12</time>"));
-  EXPECT_EQ(CountOf("Could not be made", tile), 2u);
+TEST_F(HtmlPageTest, SizesThatFailedAtTheSameTimeAreGrouped) {
+  const PhotoReport photo =
+      WithFailures(WithFailures(Missing({kXL, kL, kB, kM}), {kXL, kM}, kTime), {kL}, kTime - 60);
+  ExpectTile(
+      photo, "failed",
+      {"Could not be made: M\u00a0(320×320), XL\u00a0(1280×1280), since " + std::string(kTimeText),
+       "Could not be made: L\u00a0(800×800), since <time "
+       "datetime=\"2023-11-15T03:12:20+0500\">2023-11-15 03:12</time>"},
+      {});
+  EXPECT_EQ(CountOf("Could not be made", TileOf(photo)), 2u);
 }
 
-TEST_F(HtmlPageTest, APhotoThatFailedAltogetherCouldNotBeConverted) {
-  const TimeZone zone;
-  PhotoReport photo = PhotoInState("a.jpg", ThumbState::kMissing, AllSizes());
-  photo.thumbs.states[EA_THUMB_SIZE_SM] = ThumbState::kNotWanted;
-  MarkFailed(photo, AllSizes(), kTime + 100);
-  MarkFailed(photo, {EA_THUMB_SIZE_B}, kTime);
-  photo.failures[EA_THUMB_SIZE_SM].reset();
-  const std::string tile = TileOf(photo);
-  EXPECT_THAT(tile, StartsWith("<li class=\"tile failed\">"));
-  EXPECT_THAT(tile, HasSubstr("<span class=\"none\">No thumbnail</span>"));
-  EXPECT_THAT(tile, HasSubstr("<p class=\"note\">The photo could not be converted, since " +
-                              std::string(kTimeText) + "</p>"));
-  EXPECT_EQ(CountOf("class=\"note\"", tile), 1u);
+TEST_F(HtmlPageTest, APhotoOfWhichEverySizeFailedCouldNotBeConverted) {
+  PhotoReport photo = WithState(Missing(AllSizes()), ThumbState::kNotWanted, {kSM});
+  photo = WithFailures(WithFailures(photo, AllSizes(), kTime + 100), {kB}, kTime);
+  photo.failures[kSM].reset();
+  ExpectTile(photo, "failed",
+             {"<span class=\"none\">No thumbnail</span>",
+              Note("The photo could not be converted, since " + std::string(kTimeText))},
+             {});
+  EXPECT_EQ(CountOf("class=\"note\"", TileOf(photo)), 1u);
 }
 
 TEST_F(HtmlPageTest, APhotoWithAnyThumbCouldBeConverted) {
-  PhotoReport photo = PhotoInState("a.jpg", ThumbState::kMissing, AllSizes());
-  photo.thumbs.states[EA_THUMB_SIZE_S] = ThumbState::kNotWanted;
-  MarkFailed(photo, AllSizes(), kTime);
-  WriteFile(ThumbOf(photo, EA_THUMB_SIZE_S), ThumbBytes("thumb"));
-  const std::string tile = TileOf(photo);
-  EXPECT_THAT(tile, Not(HasSubstr("could not be converted")));
-  EXPECT_THAT(tile, HasSubstr("Could not be made: SM"));
+  const PhotoReport photo =
+      WithFailures(WithState(Missing(AllSizes()), ThumbState::kNotWanted, {kS}), AllSizes(), kTime);
+  WriteFile(ThumbOf(photo, kS), ThumbBytes("thumb"));
+  ExpectTile(photo, "failed", {"Could not be made: SM"}, {"could not be converted"});
 }
 
 TEST_F(HtmlPageTest, APhotoWithASizeThatWasNotTriedMayStillBeConverted) {
-  PhotoReport photo = PhotoInState("a.jpg", ThumbState::kMissing, AllSizes());
-  MarkFailed(photo, AllSizes(), kTime);
-  photo.failures[EA_THUMB_SIZE_L].reset();
-  EXPECT_THAT(TileOf(photo), Not(HasSubstr("could not be converted")));
+  PhotoReport photo = WithFailures(Missing(AllSizes()), AllSizes(), kTime);
+  photo.failures[kL].reset();
+  ExpectTile(photo, "failed", {}, {"could not be converted"});
 }
 
-TEST_F(HtmlPageTest, AMarkerBesideAPresentThumbIsNoFailure) {
-  PhotoReport photo = PhotoInState("a.jpg", ThumbState::kMissing, {EA_THUMB_SIZE_L});
-  MarkFailed(photo, {EA_THUMB_SIZE_S}, kTime);
-  const std::string tile = TileOf(photo);
-  EXPECT_THAT(tile, StartsWith("<li class=\"tile missing\">"));
-  EXPECT_THAT(tile, Not(HasSubstr("Could not be made")));
+TEST_F(HtmlPageTest, AMarkerOfAPresentSizeIsNotAFailure) {
+  ExpectTile(WithFailures(Missing({kL}), {kS}, kTime), "missing", {}, {"Could not be made"});
   EXPECT_THAT(ReadFile(kPage), HasSubstr("5 present, 1 missing, 0 failed"));
 }
 
-TEST_F(HtmlPageTest, APhotoThatCouldNotBeLookedUpSaysSo) {
-  PhotoReport photo = PhotoInState("a.jpg", ThumbState::kNotWanted, AllSizes());
+TEST_F(HtmlPageTest, AFailedLookupIsShown) {
+  PhotoReport photo = WithState(CompletePhoto("a.jpg"), ThumbState::kNotWanted, AllSizes());
   photo.thumbs.lookup = PhotoLookup::kFailed;
-  const std::string tile = TileOf(photo);
-  EXPECT_THAT(tile, StartsWith("<li class=\"tile unknown\">"));
-  EXPECT_THAT(tile, HasSubstr("<strong class=\"mark\">Unknown</strong>"));
-  EXPECT_THAT(tile, HasSubstr("The photo could not be looked up"));
+  ExpectTile(photo, "unknown", {Mark("Unknown"), "The photo could not be looked up"}, {});
 }
 
 // Names
@@ -355,12 +325,12 @@ struct NameCase {
   const char* html;
 };
 
-/// Instead of the addresses of its members, which the test would be known by.
+/// Replaces the addresses of its members in the name of the test.
 void PrintTo(const NameCase& names, std::ostream* out) {
   *out << names.title;
 }
 
-class HtmlPageName : public SandboxTest, public ::testing::WithParamInterface<NameCase> {};
+class HtmlPageName : public SandboxTest, public WithParamInterface<NameCase> {};
 
 TEST_P(HtmlPageName, IsEscapedInTextAndAttributes) {
   const std::string html = GetParam().html;
@@ -368,7 +338,7 @@ TEST_P(HtmlPageName, IsEscapedInTextAndAttributes) {
   const std::string withoutThumb = TileOf(photo);
   EXPECT_THAT(withoutThumb,
               HasSubstr("<p class=\"name\" title=\"" + html + "\"><bdi>" + html + "</bdi></p>"));
-  WriteFile(ThumbOf(photo, EA_THUMB_SIZE_S), ThumbBytes("thumb"));
+  WriteFile(ThumbOf(photo, kS), ThumbBytes("thumb"));
   EXPECT_THAT(TileOf(photo), HasSubstr("\" alt=\"Thumbnail of " + html + "\" width=\"160\""));
 }
 
@@ -377,21 +347,23 @@ TEST_P(HtmlPageName, IsEscapedAsADirectory) {
               HasSubstr("<bdi id=\"d1\">/photos/" + std::string(GetParam().html) + "</bdi>"));
 }
 
-INSTANTIATE_TEST_SUITE_P(
-    Hostile, HtmlPageName,
-    ::testing::Values(NameCase{"Plain", "plain name.jpg", "plain name.jpg"},
-                      NameCase{"OtherAlphabets", "ÄÖ 日本.jpg", "ÄÖ 日本.jpg"},
-                      NameCase{"Element", "<script>alert(1)", "&lt;script&gt;alert(1)"},
-                      NameCase{"EndOfAttribute", "\"><img src=x onerror=alert(1)>",
-                               "&quot;&gt;&lt;img src=x onerror=alert(1)&gt;"},
-                      NameCase{"Apostrophe", "' onload='x", "&apos; onload=&apos;x"},
-                      NameCase{"Reference", "a&lt;b&amp;", "a&amp;lt;b&amp;amp;"},
-                      NameCase{"TwoLines", "two\nlines", "two\nlines"},
-                      NameCase{"EndOfComment", "--><b>", "--&gt;&lt;b&gt;"},
-                      NameCase{"BadBytes", "bad\xff\xfe.jpg", "bad\uFFFD\uFFFD.jpg"},
-                      NameCase{"CutCharacter", "cut\xe6\x97", "cut\uFFFD\uFFFD"},
-                      NameCase{"Control", "bell\a", "bell&#x7;"}),
-    [](const ::testing::TestParamInfo<NameCase>& test) { return std::string(test.param.title); });
+constexpr NameCase kNames[] = {
+    {"Plain", "plain name.jpg", "plain name.jpg"},
+    {"OtherAlphabets", "ÄÖ 日本.jpg", "ÄÖ 日本.jpg"},
+    {"Element", "<script>alert(1)", "&lt;script&gt;alert(1)"},
+    {"EndOfAttribute", "\"><img src=x onerror=alert(1)>",
+     "&quot;&gt;&lt;img src=x onerror=alert(1)&gt;"},
+    {"Apostrophe", "' onload='x", "&apos; onload=&apos;x"},
+    {"Reference", "a&lt;b&amp;", "a&amp;lt;b&amp;amp;"},
+    {"TwoLines", "two\nlines", "two\nlines"},
+    {"EndOfComment", "--><b>", "--&gt;&lt;b&gt;"},
+    {"BadBytes", "bad\xff\xfe.jpg", "bad\uFFFD\uFFFD.jpg"},
+    {"CutCharacter", "cut\xe6\x97", "cut\uFFFD\uFFFD"},
+    {"Control", "bell\a", "bell&#x7;"},
+};
+
+INSTANTIATE_TEST_SUITE_P(Hostile, HtmlPageName, ValuesIn(kNames),
+                         [](const auto& test) { return std::string(test.param.title); });
 
 TEST_F(HtmlPageTest, OnlyTheLastComponentNamesAPhoto) {
   PhotoReport photo = CompletePhoto("a.jpg");
@@ -406,67 +378,64 @@ TEST_F(HtmlPageTest, TheSmallestThumbThatExistsIsShown) {
   for (const EA_THUMB_SIZE size : AllSizes()) {
     WriteFile(ThumbOf(photo, size), ThumbBytes(rgEAThumbInfo[size].sizeString));
   }
-  for (const char* size : {"120x120", "240x240", "320x320", "640x640", "800x800", "1280x1280"}) {
-    EXPECT_THAT(TileOf(photo), HasSubstr(EmbeddedForm(ThumbBytes(size)))) << size;
-    for (const EA_THUMB_SIZE other : AllSizes()) {
-      if (std::string(rgEAThumbInfo[other].sizeString) == size) {
-        RemoveTree(ThumbOf(photo, other));
-      }
-    }
+  const std::pair<EA_THUMB_SIZE, const char*> sizes[] = {{kS, "120x120"}, {kSM, "240x240"},
+                                                         {kM, "320x320"}, {kB, "640x640"},
+                                                         {kL, "800x800"}, {kXL, "1280x1280"}};
+  for (const auto& [size, text] : sizes) {
+    EXPECT_THAT(TileOf(photo), HasSubstr(EmbeddedForm(ThumbBytes(text)))) << text;
+    RemoveTree(ThumbOf(photo, size));
   }
   EXPECT_THAT(TileOf(photo), HasSubstr("No thumbnail"));
 }
 
 TEST_F(HtmlPageTest, AThumbUnderItsOlderNameIsShown) {
   const PhotoReport photo = CompletePhoto("a.jpg");
-  WriteFile(OldThumbOf(photo, EA_THUMB_SIZE_M), ThumbBytes("older"));
-  WriteFile(ThumbOf(photo, EA_THUMB_SIZE_L), ThumbBytes("large"));
+  WriteFile(OldThumbOf(photo, kM), ThumbBytes("older"));
+  WriteFile(ThumbOf(photo, kL), ThumbBytes("large"));
   EXPECT_THAT(TileOf(photo), HasSubstr(EmbeddedForm(ThumbBytes("older"))));
 }
 
-TEST_F(HtmlPageTest, AThumbThatIsTooShortIsPassedOver) {
+TEST_F(HtmlPageTest, AFileThatDoesNotStartAsAJpegIsSkipped) {
   const PhotoReport photo = CompletePhoto("a.jpg");
-  WriteFile(ThumbOf(photo, EA_THUMB_SIZE_S), "");
-  WriteFile(ThumbOf(photo, EA_THUMB_SIZE_SM), "\xff");
-  WriteFile(ThumbOf(photo, EA_THUMB_SIZE_M), "\xff\xd8");
-  EXPECT_THAT(TileOf(photo), HasSubstr("No thumbnail"));
-  WriteFile(ThumbOf(photo, EA_THUMB_SIZE_B), ThumbBytes(""));
-  EXPECT_THAT(TileOf(photo), HasSubstr(EmbeddedForm(ThumbBytes(""))));
-}
-
-TEST_F(HtmlPageTest, WhatDoesNotBeginAsAJpegIsPassedOver) {
-  const PhotoReport photo = CompletePhoto("a.jpg");
-  const std::string others[] = {"root:x:0:0", "\x89PNG\r\n", "\xff\xd8 \xff", " \xff\xd8\xff",
+  const std::string others[] = {"",
+                                "\xff",
+                                "\xff\xd8",
+                                "root:x:0:0",
+                                "\x89PNG\r\n",
+                                "\xff\xd8 \xff",
+                                " \xff\xd8\xff",
                                 std::string("\0\xff\xd8\xff", 4)};
   for (const std::string& other : others) {
-    WriteFile(ThumbOf(photo, EA_THUMB_SIZE_S), other);
+    WriteFile(ThumbOf(photo, kS), other);
     EXPECT_THAT(TileOf(photo), HasSubstr("No thumbnail")) << other;
   }
-  WriteFile(ThumbOf(photo, EA_THUMB_SIZE_XL), ThumbBytes("large"));
-  EXPECT_THAT(TileOf(photo), HasSubstr(EmbeddedForm(ThumbBytes("large"))));
+  for (const char* text : {"", "large"}) {
+    WriteFile(ThumbOf(photo, kXL), ThumbBytes(text));
+    EXPECT_THAT(TileOf(photo), HasSubstr(EmbeddedForm(ThumbBytes(text))));
+  }
 }
 
-TEST_F(HtmlPageTest, WhatALinkLeadsToIsPassedOver) {
+TEST_F(HtmlPageTest, ALinkIsSkipped) {
   const PhotoReport photo = CompletePhoto("a.jpg");
   WriteFile("/tmp/secret.jpg", ThumbBytes("secret"));
-  WriteFile(ThumbOf(photo, EA_THUMB_SIZE_L), ThumbBytes("open"));
-  ASSERT_EQ(symlink("/tmp/secret.jpg", ThumbOf(photo, EA_THUMB_SIZE_S).c_str()), 0);
-  ASSERT_EQ(symlink("/tmp/secret.jpg", OldThumbOf(photo, EA_THUMB_SIZE_M).c_str()), 0);
+  WriteFile(ThumbOf(photo, kL), ThumbBytes("open"));
+  ASSERT_EQ(symlink("/tmp/secret.jpg", ThumbOf(photo, kS).c_str()), 0);
+  ASSERT_EQ(symlink("/tmp/secret.jpg", OldThumbOf(photo, kM).c_str()), 0);
   EXPECT_THAT(TileOf(photo), HasSubstr(EmbeddedForm(ThumbBytes("open"))));
 }
 
-TEST_F(HtmlPageTest, AThumbThatIsNoFileIsPassedOver) {
+TEST_F(HtmlPageTest, ADirectoryOrFifoIsSkipped) {
   const PhotoReport photo = CompletePhoto("a.jpg");
-  MakeDirectories(ThumbOf(photo, EA_THUMB_SIZE_S));
-  ASSERT_EQ(mkfifo(ThumbOf(photo, EA_THUMB_SIZE_SM).c_str(), 0666), 0);
+  MakeDirectories(ThumbOf(photo, kS));
+  ASSERT_EQ(mkfifo(ThumbOf(photo, kSM).c_str(), 0666), 0);
   EXPECT_THAT(TileOf(photo), HasSubstr("No thumbnail"));
 }
 
-TEST_F(HtmlPageTest, AThumbThatCannotBeReadIsPassedOver) {
+TEST_F(HtmlPageTest, AnUnreadableThumbIsSkipped) {
   const PhotoReport photo = CompletePhoto("a.jpg");
-  WriteFile(ThumbOf(photo, EA_THUMB_SIZE_S), ThumbBytes("secret"));
-  WriteFile(ThumbOf(photo, EA_THUMB_SIZE_L), ThumbBytes("open"));
-  ASSERT_EQ(chmod(ThumbOf(photo, EA_THUMB_SIZE_S).c_str(), 0), 0);
+  WriteFile(ThumbOf(photo, kS), ThumbBytes("secret"));
+  WriteFile(ThumbOf(photo, kL), ThumbBytes("open"));
+  ASSERT_EQ(chmod(ThumbOf(photo, kS).c_str(), 0), 0);
   std::string tile;
   {
     const WithoutCapabilities unprivileged;
@@ -475,26 +444,25 @@ TEST_F(HtmlPageTest, AThumbThatCannotBeReadIsPassedOver) {
   EXPECT_THAT(tile, HasSubstr(EmbeddedForm(ThumbBytes("open"))));
 }
 
-TEST_F(HtmlPageTest, AThumbOfTheGreatestSizeIsShownAndALargerOneIsNot) {
+TEST_F(HtmlPageTest, AThumbOfTheLargestSizeIsShownAndALargerOneIsNot) {
   const PhotoReport photo = CompletePhoto("a.jpg");
   const std::string largest = ThumbBytes(std::string(4 * 1024 * 1024 - 3, 'x'));
-  WriteFile(ThumbOf(photo, EA_THUMB_SIZE_S), largest + 'x');
+  WriteFile(ThumbOf(photo, kS), largest + 'x');
   EXPECT_THAT(TileOf(photo), HasSubstr("<span class=\"none\">No thumbnail</span>"));
-  WriteFile(ThumbOf(photo, EA_THUMB_SIZE_S), largest);
+  WriteFile(ThumbOf(photo, kS), largest);
   EXPECT_TRUE(TileOf(photo).find(EmbeddedForm(largest)) != std::string::npos);
 }
 
-TEST_F(HtmlPageTest, ALargePageIsWhole) {
+TEST_F(HtmlPageTest, ALargePageIsComplete) {
   std::vector<PhotoReport> photos;
   for (int i = 0; i < 40; ++i) {
     photos.push_back(CompletePhoto(std::to_string(i)));
-    WriteFile(
-        ThumbOf(photos.back(), EA_THUMB_SIZE_S),
-        ThumbBytes(std::string(static_cast<size_t>(i) * 3000, static_cast<char>('a' + i % 26))));
+    WriteFile(ThumbOf(photos.back(), kS), ThumbBytes(std::string(static_cast<size_t>(i) * 3000,
+                                                                 static_cast<char>('a' + i % 26))));
   }
   const std::string page = PageOf({{"/a", false, photos}, {"/b", false, photos}});
   for (const PhotoReport& photo : photos) {
-    const std::string form = EmbeddedForm(ReadFile(ThumbOf(photo, EA_THUMB_SIZE_S)));
+    const std::string form = EmbeddedForm(ReadFile(ThumbOf(photo, kS)));
     EXPECT_EQ(CountOf(form, page), 2u) << photo.path;
   }
   EXPECT_THAT(page, EndsWith("</html>\n"));
@@ -502,7 +470,12 @@ TEST_F(HtmlPageTest, ALargePageIsWhole) {
 
 // The file
 
-TEST_F(HtmlPageTest, NothingIsSeenBeforeThePageIsFinished) {
+void ExpectOldPageStays() {
+  EXPECT_EQ(ReadFile(kPage), "old");
+  EXPECT_THAT(ListDirectory(kPageDirectory), ElementsAre("status.html"));
+}
+
+TEST_F(HtmlPageTest, NoFileAppearsBeforeThePageIsFinished) {
   MakeDirectories(kPageDirectory);
   HtmlPage page(kPage);
   Report(page, {{"/a", false, {CompletePhoto("a.jpg")}}});
@@ -511,14 +484,13 @@ TEST_F(HtmlPageTest, NothingIsSeenBeforeThePageIsFinished) {
   EXPECT_THAT(ListDirectory(kPageDirectory), ElementsAre("status.html"));
 }
 
-TEST_F(HtmlPageTest, APageThatIsNotFinishedLeavesNothingBehind) {
+TEST_F(HtmlPageTest, AnUnfinishedPageLeavesNothingBehind) {
   WriteFile(kPage, "old");
   {
     HtmlPage page(kPage);
     Report(page, {{"/a", false, {CompletePhoto("a.jpg")}}});
   }
-  EXPECT_EQ(ReadFile(kPage), "old");
-  EXPECT_THAT(ListDirectory(kPageDirectory), ElementsAre("status.html"));
+  ExpectOldPageStays();
 }
 
 TEST_F(HtmlPageTest, AProgramThatIsKilledLeavesNothingBehind) {
@@ -535,7 +507,7 @@ TEST_F(HtmlPageTest, AProgramThatIsKilledLeavesNothingBehind) {
   EXPECT_THAT(ListDirectory(kPageDirectory), IsEmpty());
 }
 
-TEST_F(HtmlPageTest, TheFileIsReplacedAsAWhole) {
+TEST_F(HtmlPageTest, TheFileIsReplacedAtomically) {
   WriteFile(kPage, "old");
   ASSERT_EQ(link(kPage, "/tmp/page/kept"), 0);
   PageOfPhotos({CompletePhoto("a.jpg")});
@@ -559,7 +531,7 @@ bool IsLink(const std::string& path) {
   return S_ISLNK(status.st_mode);
 }
 
-TEST_F(HtmlPageTest, ALinkStaysAndWhatItLeadsToIsReplaced) {
+TEST_F(HtmlPageTest, ALinkIsKeptAndItsTargetIsReplaced) {
   WriteFile("/tmp/elsewhere/page.html", "old");
   MakeDirectories(kPageDirectory);
   ASSERT_EQ(symlink("/tmp/page/second", kPage), 0);
@@ -580,7 +552,7 @@ TEST_F(HtmlPageTest, ADanglingLinkIsReplaced) {
   EXPECT_FALSE(Exists("/tmp/nowhere"));
 }
 
-TEST_F(HtmlPageTest, APathWithoutADirectoryIsOneOfTheWorkingDirectory) {
+TEST_F(HtmlPageTest, ARelativePathRefersToTheWorkingDirectory) {
   MakeDirectories("/tmp/here");
   ASSERT_EQ(chdir("/tmp/here"), 0);
   HtmlPage page("status.html");
@@ -589,7 +561,7 @@ TEST_F(HtmlPageTest, APathWithoutADirectoryIsOneOfTheWorkingDirectory) {
   EXPECT_THAT(ListDirectory("/tmp/here"), ElementsAre("status.html"));
 }
 
-TEST_F(HtmlPageTest, TheNameMayHaveTheGreatestLength) {
+TEST_F(HtmlPageTest, TheNameMayHaveTheMaximumLength) {
   const std::string name(255, 'n');
   MakeDirectories(kPageDirectory);
   HtmlPage page(std::string(kPageDirectory) + '/' + name);
@@ -598,7 +570,7 @@ TEST_F(HtmlPageTest, TheNameMayHaveTheGreatestLength) {
   EXPECT_THAT(ListDirectory(kPageDirectory), ElementsAre(name));
 }
 
-TEST_F(HtmlPageTest, DescriptorsAreNotHandedToOtherPrograms) {
+TEST_F(HtmlPageTest, DescriptorsAreClosedOnExec) {
   MakeDirectories(kPageDirectory);
   const std::vector<std::string> before = ListDirectory("/proc/self/fd");
   HtmlPage page(kPage);
@@ -615,7 +587,7 @@ TEST_F(HtmlPageTest, DescriptorsAreNotHandedToOtherPrograms) {
 
 // Failures
 
-/// What Finish says of a page at `path` after a scan.
+/// The result of Finish for a page at `path` after a scan.
 int FinishPageAt(const std::string& path) {
   HtmlPage page(path);
   Report(page, {{"/a", false, {CompletePhoto("a.jpg")}}});
@@ -637,12 +609,10 @@ TEST_F(HtmlPageTest, AnEmptyPathIsAnError) {
 TEST_F(HtmlPageTest, ADirectoryThatCannotBeWrittenIsAnError) {
   WriteFile(kPage, "old");
   ASSERT_EQ(chmod(kPageDirectory, 0555), 0);
-  int error = 0;
   {
     const WithoutCapabilities unprivileged;
-    error = FinishPageAt(kPage);
+    EXPECT_EQ(FinishPageAt(kPage), EACCES);
   }
-  EXPECT_EQ(error, EACCES);
   EXPECT_EQ(ReadFile(kPage), "old");
 }
 
@@ -660,7 +630,7 @@ TEST_F(HtmlPageTest, ADirectoryIsNotReplaced) {
   EXPECT_THAT(ListDirectory(kPageDirectory), ElementsAre("status.html"));
 }
 
-TEST_F(HtmlPageTest, WhatIsNoFileIsNotReplaced) {
+TEST_F(HtmlPageTest, OnlyARegularFileIsReplaced) {
   MakeDirectories(kPageDirectory);
   ASSERT_EQ(mkfifo(kPage, 0666), 0);
   ASSERT_EQ(symlink("/dev/null", "/tmp/page/link"), 0);
@@ -674,35 +644,29 @@ TEST_F(HtmlPageTest, WhatIsNoFileIsNotReplaced) {
   EXPECT_THAT(ListDirectory(kPageDirectory), ElementsAre("link", "status.html"));
 }
 
-TEST_F(HtmlPageTest, AVolumeThatIsFullDuringTheScanIsAnErrorAndTheOldFileStays) {
-  SmallVolume volume(kPageDirectory, 1024 * 1024);
-  WriteFile(kPage, "old");
-  const PhotoReport photo = CompletePhoto("a.jpg");
-  WriteFile(ThumbOf(photo, EA_THUMB_SIZE_S), ThumbBytes(std::string(200 * 1024, 'x')));
-  HtmlPage page(kPage);
-  volume.SetAvailable(0);
-  Report(page, {{"/a", false, {photo, photo}}});
-  // Space that comes too late does not make half a page a whole one.
-  volume.SetAvailable(512 * SmallVolume::PageSize());
-  EXPECT_EQ(page.Finish(), ENOSPC);
-  EXPECT_EQ(ReadFile(kPage), "old");
-  EXPECT_THAT(ListDirectory(kPageDirectory), ElementsAre("status.html"));
+TEST_F(HtmlPageTest, AVolumeThatBecomesFullIsAnErrorAndTheOldFileStays) {
+  for (const bool isFullDuringScan : {true, false}) {
+    SCOPED_TRACE(isFullDuringScan ? "during the scan" : "at the end");
+    SmallVolume volume(kPageDirectory, (isFullDuringScan ? 1 : 4) * 1024 * 1024);
+    WriteFile(kPage, "old");
+    const PhotoReport photo = CompletePhoto("a.jpg");
+    WriteFile(ThumbOf(photo, kS), ThumbBytes(std::string(200 * 1024, 'x')));
+    HtmlPage page(kPage);
+    if (isFullDuringScan) {
+      volume.SetAvailable(0);
+      Report(page, {{"/a", false, {photo, photo}}});
+      // Space that becomes available later does not complete the page.
+      volume.SetAvailable(512 * SmallVolume::PageSize());
+    } else {
+      Report(page, {{"/a", false, {photo, photo}}});
+      volume.SetAvailable(0);
+    }
+    EXPECT_EQ(page.Finish(), ENOSPC);
+    ExpectOldPageStays();
+  }
 }
 
-TEST_F(HtmlPageTest, AVolumeThatIsFullAtTheEndIsAnErrorAndTheOldFileStays) {
-  SmallVolume volume(kPageDirectory, 4 * 1024 * 1024);
-  WriteFile(kPage, "old");
-  const PhotoReport photo = CompletePhoto("a.jpg");
-  WriteFile(ThumbOf(photo, EA_THUMB_SIZE_S), ThumbBytes(std::string(200 * 1024, 'x')));
-  HtmlPage page(kPage);
-  Report(page, {{"/a", false, {photo, photo}}});
-  volume.SetAvailable(0);
-  EXPECT_EQ(page.Finish(), ENOSPC);
-  EXPECT_EQ(ReadFile(kPage), "old");
-  EXPECT_THAT(ListDirectory(kPageDirectory), ElementsAre("status.html"));
-}
-
-/// What Finish says of a page at kPage in a process in which system calls fail.
+/// The result of Finish for a page at kPage in a process in which system calls fail.
 int FinishWithRefusedCalls(const BeforeExec& refuse) {
   const pid_t child = fork();
   if (child == 0) {
@@ -714,7 +678,7 @@ int FinishWithRefusedCalls(const BeforeExec& refuse) {
   return WEXITSTATUS(status);
 }
 
-TEST_F(HtmlPageTest, AFileSystemWithoutUnnamedFilesWillDo) {
+TEST_F(HtmlPageTest, AFileSystemWithoutUnnamedFilesIsSupported) {
   WriteFile(kPage, "old");
   const BeforeExec refuse = [] {
     const int error = SeccompFail(OpensWithFlags(O_TMPFILE, EOPNOTSUPP))();
@@ -726,23 +690,17 @@ TEST_F(HtmlPageTest, AFileSystemWithoutUnnamedFilesWillDo) {
   EXPECT_THAT(ListDirectory(kPageDirectory), ElementsAre("status.html"));
 }
 
-TEST_F(HtmlPageTest, AFileThatCannotBeMadeSafeIsAnErrorAndTheOldFileStays) {
+TEST_F(HtmlPageTest, AFileThatCannotBeSyncedOrRenamedIsAnErrorAndTheOldFileStays) {
   WriteFile(kPage, "old");
   EXPECT_EQ(FinishWithRefusedCalls(SeccompFail({SYS_fsync}, EIO)), EIO);
-  EXPECT_EQ(ReadFile(kPage), "old");
-  EXPECT_THAT(ListDirectory(kPageDirectory), ElementsAre("status.html"));
-}
-
-TEST_F(HtmlPageTest, AFileThatCannotBeRenamedIsAnErrorAndTheOldFileStays) {
-  WriteFile(kPage, "old");
+  ExpectOldPageStays();
   EXPECT_EQ(FinishWithRefusedCalls(SeccompFail(RenameCalls(), EPERM)), EPERM);
-  EXPECT_EQ(ReadFile(kPage), "old");
-  EXPECT_THAT(ListDirectory(kPageDirectory), ElementsAre("status.html"));
+  ExpectOldPageStays();
 }
 
 // Numbers
 
-TEST(HtmlCounts, DigitsStandInGroupsOfThree) {
+TEST(HtmlCounts, DigitsAreGroupedByThree) {
   EXPECT_EQ(GroupDigits(0), "0");
   EXPECT_EQ(GroupDigits(999), "999");
   EXPECT_EQ(GroupDigits(1000), "1,000");
@@ -750,13 +708,13 @@ TEST(HtmlCounts, DigitsStandInGroupsOfThree) {
   EXPECT_EQ(GroupDigits(1234567), "1,234,567");
 }
 
-TEST(HtmlCounts, OneIsOne) {
+TEST(HtmlCounts, OneHasItsOwnForm) {
   EXPECT_EQ(CountText(0, "photo", "photos"), "0 photos");
   EXPECT_EQ(CountText(1, "photo", "photos"), "1 photo");
   EXPECT_EQ(CountText(2000, "photo", "photos"), "2,000 photos");
 }
 
-TEST(HtmlCounts, OnlyAllIsAHundredPercentAndOnlyNothingIsZero) {
+TEST(HtmlCounts, OnlyAllIsAHundredPercentAndOnlyNoneIsZero) {
   EXPECT_EQ(PercentText(0, 7), "0%");
   EXPECT_EQ(PercentText(7, 7), "100%");
   EXPECT_EQ(PercentText(1, 100000), "1%");

@@ -1,53 +1,40 @@
 // The page as an option of the program.
-#include <gmock/gmock.h>
-#include <json/value.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
 #include <chrono>
-#include <string>
 
-#include "status_program.h"
-#include "status_text.h"
-#include "storage/photo_tree.h"
+#include "status_fixture.h"
 #include "support/daemon_peer.h"
-#include "support/files.h"
-#include "support/sandbox.h"
 #include "support/system_log.h"
 
 namespace vela_test {
 namespace {
 
-using ::testing::HasSubstr;
-using ::testing::IsEmpty;
-using ::testing::Not;
-using ::testing::StartsWith;
+using namespace ::testing;
 
-constexpr const char* kTop = "/tmp/photos";
 constexpr const char* kPage = "/tmp/page/status.html";
 
-class PageOption : public SandboxTest {
+class PageOption : public StatusTest {
  protected:
   void SetUp() override {
-    SandboxTest::SetUp();
+    StatusTest::SetUp();
     MakePhoto("/tmp/photos/a.jpg");
     MakeDirectories("/tmp/page");
   }
 
-  /// A page that cannot be made is told of before anything is looked at: there is no answer.
+  /// A page that cannot be written is reported before the scan: there is no answer.
   static void ExpectRefused(const std::string& page, const std::string& message) {
     ProgramOptions options;
     options.timeLimit = std::chrono::seconds(20);
     const ProgramResult text = RunStatus({"--html", page, "/tmp/none", kTop}, options);
-    EXPECT_EQ(text.exitCode, 2) << page;
-    EXPECT_EQ(text.err, "velathumb-status: " + page + ": " + message + "\n");
+    ExpectError(text, page + ": " + message);
     EXPECT_EQ(text.out, "");
     const ProgramResult json = RunStatus({"--html", page, "--json", kTop}, options);
     EXPECT_EQ(json.exitCode, 2) << page;
     const Json::Value errors = ReadJson(json.out)["errors"];
     ASSERT_EQ(errors.size(), 1U) << page;
-    EXPECT_EQ(errors[0]["path"], Json::Value(page));
-    EXPECT_EQ(errors[0]["message"], Json::Value(message));
+    ExpectMembers(errors[0], "{\"path\": \"" + page + "\", \"message\": \"" + message + "\"}");
   }
 };
 
@@ -59,7 +46,7 @@ TEST_F(PageOption, WritesThePageBesideTheAnswer) {
   EXPECT_THAT(ReadFile(kPage), HasSubstr("<bdi>a.jpg</bdi>"));
 }
 
-TEST_F(PageOption, WhatIsNoFileIsRefused) {
+TEST_F(PageOption, OnlyARegularFileIsReplaced) {
   ASSERT_EQ(mkfifo(kPage, 0666), 0);
   ASSERT_EQ(symlink("/dev/null", "/tmp/page/link"), 0);
   for (const std::string page : {"/dev/null", kPage, "/tmp/page/link"}) {
@@ -73,7 +60,7 @@ TEST_F(PageOption, WhatIsNoFileIsRefused) {
   EXPECT_EQ(ListDirectory("/tmp/page").size(), 2U);
 }
 
-TEST_F(PageOption, WhatIsRefusedKeepsVideosFromBeingChecked) {
+TEST_F(PageOption, VideosAreNotCheckedForARefusedPage) {
   const DaemonPeer service;
   const std::string thumb = "/tmp/photos/@eaDir/film.mp4/VELAPHOTO_THUMB_M.jpg";
   WriteFile("/tmp/photos/film.mp4", "video");
@@ -99,8 +86,7 @@ TEST_F(PageOption, APhotoThatCannotBeLookedUpIsAnErrorAndUnknownOnThePage) {
   const std::string dir = photo.substr(0, photo.rfind('/'));
   MakePhoto(photo);
   const ProgramResult result = RunStatus({"--html", kPage, dir});
-  EXPECT_EQ(result.exitCode, 2);
-  EXPECT_EQ(result.err, "velathumb-status: " + photo + ": its thumbnails cannot be looked up\n");
+  ExpectError(result, photo + ": its thumbnails cannot be looked up");
   EXPECT_EQ(ReadStatusText(result.out).totals.numbers, (StatusNumbers{1, 0, 0, 0, 0}));
   const std::string page = ReadFile(kPage);
   EXPECT_THAT(page, HasSubstr("<strong class=\"mark\">Unknown</strong>"));
@@ -110,7 +96,7 @@ TEST_F(PageOption, APhotoThatCannotBeLookedUpIsAnErrorAndUnknownOnThePage) {
   EXPECT_EQ(answer["errors"][0]["path"], Json::Value(photo));
 }
 
-TEST_F(PageOption, ALinkToNothingIsNoPhoto) {
+TEST_F(PageOption, ADanglingLinkIsNotAPhoto) {
   ASSERT_EQ(symlink("/tmp/none.jpg", "/tmp/photos/x.jpg"), 0);
   const ProgramResult result = RunStatus({"--html", kPage, "--photos", kTop});
   EXPECT_EQ(result.exitCode, 1);
@@ -121,7 +107,7 @@ TEST_F(PageOption, ALinkToNothingIsNoPhoto) {
   EXPECT_THAT(ErrorLines(), IsEmpty());
 }
 
-TEST_F(PageOption, PlantedThumbsNeverGetIntoIt) {
+TEST_F(PageOption, PlantedThumbsAreNeverEmbedded) {
   const std::string ea = "/tmp/photos/@eaDir/a.jpg";
   WriteFile("/tmp/secret.jpg", "\xff\xd8\xff secret");
   MakeDirectories(ea);
@@ -134,9 +120,9 @@ TEST_F(PageOption, PlantedThumbsNeverGetIntoIt) {
   EXPECT_THAT(ReadFile(kPage), HasSubstr("src=\"data:image/jpeg;base64,/9j/IG9wZW4=\""));
 }
 
-TEST_F(PageOption, PhotosStandInTheOrderOfTheirNames) {
+TEST_F(PageOption, PhotosAreSortedByName) {
   for (const char* name : {"c", "B", "b", "0"}) {
-    MakePhoto(std::string(kTop) + "/" + name + ".jpg");
+    MakePhoto(In(name + std::string(".jpg")));
   }
   RunStatus({"--html", kPage, kTop});
   const std::string page = ReadFile(kPage);

@@ -1,30 +1,19 @@
 // The counters of conversion progress.
-#include <gmock/gmock.h>
-#include <json/value.h>
-
-#include <string>
-#include <vector>
-
 #include "platform/velaindex.h"
 #include "progress/velamk_progress.h"
 #include "running_conversion.h"
-#include "status_program.h"
-#include "support/files.h"
-#include "support/sandbox.h"
+#include "status_fixture.h"
 #include "support/system_log.h"
 
 namespace vela_test {
 namespace {
 
-using ::testing::EndsWith;
-using ::testing::HasSubstr;
-using ::testing::IsEmpty;
-using ::testing::UnorderedElementsAre;
+using namespace ::testing;
 
 constexpr const char* kPhotoFile = "/var/spool/conv_progress_photo";
-constexpr const char* kNobody = "no velathumb is running\n";
+constexpr const char* kNotRunning = "no velathumb is running\n";
 
-/// What LogConvProgress logs, without the places in front.
+/// What LogConvProgress logs, without the source positions.
 std::string LoggedSummary() {
   ClearLog();
   LogConvProgress();
@@ -56,21 +45,21 @@ TEST_F(ProgressAnswer, IsTheSummaryOfTheLog) {
   AddConvProgress(THUMB_TYPE_VIDEO, "total", 3);
   AddConvProgress(THUMB_TYPE_VIDEO, "completed", 3);
   const std::string answer = Ask();
-  EXPECT_EQ(answer, LoggedSummary() + kNobody);
-  EXPECT_THAT(answer, HasSubstr("total_photo: 40, complete_photo: 10, progress: 0.25\n"));
-  EXPECT_THAT(answer, HasSubstr("total_thumb: 300, complete_thumb: 100, progress: 0.33\n"));
-  EXPECT_THAT(answer, HasSubstr("total_video: 3, complete_video: 3, progress: 1.00\n"));
+  EXPECT_EQ(answer, LoggedSummary() + kNotRunning);
+  EXPECT_THAT(answer, AllOf(HasSubstr("total_photo: 40, complete_photo: 10, progress: 0.25\n"),
+                            HasSubstr("total_thumb: 300, complete_thumb: 100, progress: 0.33\n"),
+                            HasSubstr("total_video: 3, complete_video: 3, progress: 1.00\n")));
 }
 
-TEST_F(ProgressAnswer, WithoutTotalsTheShareIsNothing) {
+TEST_F(ProgressAnswer, WithoutTotalsTheShareIsZero) {
   AddConvProgress(THUMB_TYPE_PHOTO, "completed", 7);
   const std::string answer = Ask();
-  EXPECT_EQ(answer, LoggedSummary() + kNobody);
+  EXPECT_EQ(answer, LoggedSummary() + kNotRunning);
   EXPECT_THAT(answer, HasSubstr("total_photo: 0, complete_photo: 7, progress: 0.00\n"));
 }
 
 TEST_F(ProgressAnswer, DoesNotMakeTheFiles) {
-  EXPECT_EQ(Ask(), LoggedSummary() + kNobody);
+  EXPECT_EQ(Ask(), LoggedSummary() + kNotRunning);
   EXPECT_THAT(ListDirectory("/var/spool"), IsEmpty());
 }
 
@@ -99,16 +88,16 @@ TEST_F(ProgressAnswer, NamesTheRunningInstance) {
   EXPECT_THAT(Ask(), EndsWith("\nvelathumb is running, process " +
                               std::to_string(conversion.Pid()) + "\n"));
   conversion.Finish();
-  EXPECT_THAT(Ask(), EndsWith(kNobody));
+  EXPECT_THAT(Ask(), EndsWith(kNotRunning));
 }
 
-TEST_F(ProgressAnswer, DoesNotTakeWhatWasLeftBehindForAnInstance) {
+TEST_F(ProgressAnswer, IgnoresStalePidFiles) {
   const Program stranger = StartProgram("/usr/bin/sleep", {"60"});
   MakePidFile(stranger.Pid());
   MakePidFile(4000000);
   WriteFile("/var/run/velathumb.word.pid", "");
   WriteFile("/var/run/other.1.pid", "");
-  EXPECT_THAT(Ask(), EndsWith(kNobody));
+  EXPECT_THAT(Ask(), EndsWith(kNotRunning));
   EXPECT_EQ(ListDirectory("/run").size(), 4U);
 }
 
@@ -122,19 +111,20 @@ TEST_F(ProgressAnswer, JsonHasTheDocumentedMembers) {
   const Json::Value progress = answer["progress"];
   EXPECT_THAT(progress.getMemberNames(),
               UnorderedElementsAre("photo", "thumb", "video", "instances"));
-  for (const char* kind : {"photo", "thumb", "video"}) {
-    EXPECT_THAT(progress[kind].getMemberNames(),
-                UnorderedElementsAre("total", "completed", "ratio"));
+  const struct {
+    const char* kind;
+    int total;
+    int completed;
+    double ratio;
+  } counters[] = {{"photo", 40, 10, 0.25}, {"thumb", 300, 0, 0}, {"video", 0, 2, 0}};
+  for (const auto& [kind, total, completed, ratio] : counters) {
+    SCOPED_TRACE(kind);
+    const Json::Value counter = progress[kind];
+    EXPECT_THAT(counter.getMemberNames(), UnorderedElementsAre("total", "completed", "ratio"));
+    EXPECT_EQ(counter["total"], Json::Value(total));
+    EXPECT_EQ(counter["completed"], Json::Value(completed));
+    EXPECT_EQ(counter["ratio"].asDouble(), ratio);
   }
-  EXPECT_EQ(progress["photo"]["total"], Json::Value(40));
-  EXPECT_EQ(progress["photo"]["completed"], Json::Value(10));
-  EXPECT_EQ(progress["photo"]["ratio"].asDouble(), 0.25);
-  EXPECT_EQ(progress["thumb"]["total"], Json::Value(300));
-  EXPECT_EQ(progress["thumb"]["completed"], Json::Value(0));
-  EXPECT_EQ(progress["thumb"]["ratio"].asDouble(), 0);
-  EXPECT_EQ(progress["video"]["total"], Json::Value(0));
-  EXPECT_EQ(progress["video"]["completed"], Json::Value(2));
-  EXPECT_EQ(progress["video"]["ratio"].asDouble(), 0);
   EXPECT_EQ(progress["instances"], Json::Value(Json::arrayValue));
 }
 
@@ -146,11 +136,10 @@ TEST_F(ProgressAnswer, JsonNamesTheRunningInstance) {
   EXPECT_EQ(instances[0].asInt(), conversion.Pid());
 }
 
-TEST_F(ProgressAnswer, WhatIsNoNumberCountsAsNothing) {
+TEST_F(ProgressAnswer, AnInvalidNumberCountsAsZero) {
   WriteFile(kPhotoFile, "total=\"many\"\ncompleted=\"99999999999999\"\n");
   const Json::Value photo = AskForJson({"--progress"})["progress"]["photo"];
-  EXPECT_EQ(photo["total"], Json::Value(0));
-  EXPECT_EQ(photo["completed"], Json::Value(2147483647));
+  ExpectMembers(photo, R"({"total": 0, "completed": 2147483647})");
   EXPECT_EQ(photo["ratio"].asDouble(), 0);
 }
 

@@ -1,29 +1,18 @@
-// What the queues hold.
-#include <gmock/gmock.h>
-#include <json/value.h>
+// The contents of the queues.
 #include <sys/stat.h>
 
 #include <chrono>
 #include <sstream>
-#include <string>
-#include <vector>
 
-#include "status_program.h"
-#include "support/files.h"
-#include "support/sandbox.h"
+#include "status_fixture.h"
 
 namespace vela_test {
 namespace {
 
-using ::testing::ElementsAre;
-using ::testing::HasSubstr;
-using ::testing::IsEmpty;
-using ::testing::UnorderedElementsAre;
+using namespace ::testing;
 
-constexpr const char* kPhotoWork = "/var/spool/thumb_create.queue.tmp";
-constexpr const char* kPhotoWaiting = "/var/spool/thumb_create.queue";
-constexpr const char* kVideoWork = "/var/spool/flv_create.queue.tmp";
-constexpr const char* kVideoWaiting = "/var/spool/flv_create.queue";
+/// The queue files in the order of the answer.
+constexpr const char* kFiles[] = {kPhotosInProgress, kPhotoQueue, kVideosInProgress, kVideoQueue};
 
 /// One queue of the text answer.
 struct QueueText {
@@ -32,10 +21,11 @@ struct QueueText {
   std::string count;
 };
 
-/// Reads the text answer: headings at the beginning of lines, the last line below each the count.
-std::vector<QueueText> ReadQueues(const std::string& text) {
+/// Asks for the queues. Headings begin at the left margin; the last line of each queue is its
+/// count.
+std::vector<QueueText> AskForQueues() {
   std::vector<QueueText> queues;
-  std::istringstream in(text);
+  std::istringstream in(RunStatus({"--queue"}).out);
   for (std::string line; std::getline(in, line);) {
     if (line.compare(0, 4, "    ") != 0) {
       queues.push_back({line, {}, {}});
@@ -49,6 +39,8 @@ std::vector<QueueText> ReadQueues(const std::string& text) {
       queue.entries.pop_back();
     }
   }
+  EXPECT_EQ(queues.size(), 4U);
+  queues.resize(4);
   return queues;
 }
 
@@ -62,32 +54,32 @@ std::vector<std::string> PathsOf(const Json::Value& queue) {
 
 class QueueAnswer : public SandboxTest {};
 
-TEST_F(QueueAnswer, TellsTheFourFilesWhatIsInWorkFirst) {
-  WriteFile(kPhotoWork, "/tmp/in work\n");
-  WriteFile(kPhotoWaiting, "/tmp/waiting\nR:/tmp/tree\n");
-  WriteFile(kVideoWork, "/tmp/a.mp4\n/tmp/b.mp4\n/tmp/c.mp4\n");
+TEST_F(QueueAnswer, ListsTheFourFilesEntriesInProgressFirst) {
+  WriteFile(kPhotosInProgress, "/tmp/in work\n");
+  WriteFile(kPhotoQueue, "/tmp/waiting\nR:/tmp/tree\n");
+  WriteFile(kVideosInProgress, "/tmp/a.mp4\n/tmp/b.mp4\n/tmp/c.mp4\n");
   const ProgramResult result = RunStatus({"--queue"});
   EXPECT_EQ(result.exitCode, 1);
   EXPECT_EQ(result.err, "");
-  const std::vector<QueueText> queues = ReadQueues(result.out);
-  ASSERT_EQ(queues.size(), 4U);
-  EXPECT_EQ(queues[0].heading, std::string("photo queue ") + kPhotoWork);
-  EXPECT_THAT(queues[0].entries, ElementsAre("/tmp/in work"));
-  EXPECT_EQ(queues[0].count, "1 entry");
-  EXPECT_EQ(queues[1].heading, std::string("photo queue ") + kPhotoWaiting);
-  EXPECT_THAT(queues[1].entries, ElementsAre("/tmp/waiting", "R:/tmp/tree"));
-  EXPECT_EQ(queues[1].count, "2 entries");
-  EXPECT_EQ(queues[2].heading, std::string("video queue ") + kVideoWork);
-  EXPECT_THAT(queues[2].entries, ElementsAre("/tmp/a.mp4", "/tmp/b.mp4", "/tmp/c.mp4"));
-  EXPECT_EQ(queues[2].count, "3 entries");
-  EXPECT_EQ(queues[3].heading, std::string("video queue ") + kVideoWaiting);
-  EXPECT_THAT(queues[3].entries, IsEmpty());
-  EXPECT_EQ(queues[3].count, "0 entries");
+  const QueueText expected[] = {
+      {"photo queue /var/spool/thumb_create.queue.tmp", {"/tmp/in work"}, "1 entry"},
+      {"photo queue /var/spool/thumb_create.queue", {"/tmp/waiting", "R:/tmp/tree"}, "2 entries"},
+      {"video queue /var/spool/flv_create.queue.tmp",
+       {"/tmp/a.mp4", "/tmp/b.mp4", "/tmp/c.mp4"},
+       "3 entries"},
+      {"video queue /var/spool/flv_create.queue", {}, "0 entries"},
+  };
+  const std::vector<QueueText> queues = AskForQueues();
+  for (size_t i = 0; i < 4; ++i) {
+    EXPECT_EQ(queues[i].heading, expected[i].heading);
+    EXPECT_EQ(queues[i].entries, expected[i].entries);
+    EXPECT_EQ(queues[i].count, expected[i].count);
+  }
 }
 
 TEST_F(QueueAnswer, AnyEntryOfAnyFileIsWork) {
   EXPECT_EQ(RunStatus({"--queue"}).exitCode, 0);
-  for (const char* file : {kPhotoWork, kPhotoWaiting, kVideoWork, kVideoWaiting}) {
+  for (const char* file : kFiles) {
     WriteFile(file, "/tmp/a\n");
     EXPECT_EQ(RunStatus({"-q"}).exitCode, 1) << file;
     EXPECT_EQ(RunStatus({"-q", "--json"}).exitCode, 1) << file;
@@ -96,37 +88,33 @@ TEST_F(QueueAnswer, AnyEntryOfAnyFileIsWork) {
   }
 }
 
-TEST_F(QueueAnswer, PassesOverBlankLinesAndTooLongOnes) {
+TEST_F(QueueAnswer, SkipsBlankAndTooLongLines) {
   const std::string longest = "/" + std::string(4093, 'd');
-  WriteFile(kPhotoWaiting, "\n\n" + longest + "\n/" + std::string(4094, 'x') + "\n\n/tmp/last");
-  const std::vector<QueueText> queues = ReadQueues(RunStatus({"--queue"}).out);
-  ASSERT_EQ(queues.size(), 4U);
-  EXPECT_THAT(queues[1].entries, ElementsAre(longest, "/tmp/last"));
-  EXPECT_EQ(queues[1].count, "2 entries");
-  WriteFile(kPhotoWaiting, "\n\n\n");
+  WriteFile(kPhotoQueue, "\n\n" + longest + "\n/" + std::string(4094, 'x') + "\n\n/tmp/last");
+  const QueueText queue = AskForQueues()[1];
+  EXPECT_THAT(queue.entries, ElementsAre(longest, "/tmp/last"));
+  EXPECT_EQ(queue.count, "2 entries");
+  WriteFile(kPhotoQueue, "\n\n\n");
   EXPECT_EQ(RunStatus({"--queue"}).exitCode, 0);
 }
 
 TEST_F(QueueAnswer, OddBytesStayOnOneLine) {
-  WriteFile(kPhotoWaiting, "/tmp/tab\t\\ \x1b[31m\xff\n");
-  const std::vector<QueueText> queues = ReadQueues(RunStatus({"--queue"}).out);
-  ASSERT_EQ(queues.size(), 4U);
-  EXPECT_THAT(queues[1].entries, ElementsAre("/tmp/tab\\x09\\\\ \\x1b[31m\xff"));
+  WriteFile(kPhotoQueue, "/tmp/tab\t\\ \x1b[31m\xff\n");
+  EXPECT_THAT(AskForQueues()[1].entries, ElementsAre("/tmp/tab\\x09\\\\ \\x1b[31m\xff"));
 }
 
 TEST_F(QueueAnswer, JsonHasTheDocumentedMembers) {
-  WriteFile(kPhotoWork, "/tmp/in work\n");
-  WriteFile(kVideoWaiting, "R:/tmp/films\n/tmp/\"a\\.mp4\n");
+  WriteFile(kPhotosInProgress, "/tmp/in work\n");
+  WriteFile(kVideoQueue, "R:/tmp/films\n/tmp/\"a\\.mp4\n");
   const Json::Value answer = AskForJson({"--queue"});
   EXPECT_THAT(answer.getMemberNames(), UnorderedElementsAre("format", "queues", "errors"));
   const Json::Value queues = answer["queues"];
   ASSERT_EQ(queues.size(), 4U);
-  const char* files[] = {kPhotoWork, kPhotoWaiting, kVideoWork, kVideoWaiting};
   const char* kinds[] = {"photo", "photo", "video", "video"};
   for (Json::ArrayIndex i = 0; i < 4; ++i) {
     EXPECT_THAT(queues[i].getMemberNames(),
                 UnorderedElementsAre("kind", "file", "videos_needing_work", "entries"));
-    EXPECT_EQ(queues[i]["file"], Json::Value(files[i]));
+    EXPECT_EQ(queues[i]["file"], Json::Value(kFiles[i]));
     EXPECT_EQ(queues[i]["kind"], Json::Value(kinds[i]));
     EXPECT_EQ(queues[i]["videos_needing_work"], Json::Value());
     EXPECT_TRUE(queues[i]["entries"].isArray());
@@ -137,35 +125,30 @@ TEST_F(QueueAnswer, JsonHasTheDocumentedMembers) {
 }
 
 TEST_F(QueueAnswer, JsonHasOddEntriesExactly) {
-  WriteFile(kPhotoWaiting, "/tmp/\xff\n");
-  const Json::Value entry = AskForJson({"--queue"})["queues"][1]["entries"][0];
-  EXPECT_THAT(entry.getMemberNames(), UnorderedElementsAre("path", "path_base64"));
-  EXPECT_EQ(entry["path"], Json::Value("/tmp/\xef\xbf\xbd"));
-  EXPECT_EQ(entry["path_base64"], Json::Value("L3RtcC//"));
+  WriteFile(kPhotoQueue, "/tmp/\xff\n");
+  EXPECT_EQ(AskForJson({"--queue"})["queues"][1]["entries"][0],
+            ReadJson("{\"path\": \"/tmp/\xef\xbf\xbd\", \"path_base64\": \"L3RtcC//\"}"));
 }
 
-TEST_F(QueueAnswer, AnUnreadableFileIsAnErrorAndTheOthersAreAnswered) {
-  WriteFile(kPhotoWork, "/tmp/secret\n");
-  WriteFile(kPhotoWaiting, "/tmp/waiting\n");
-  ASSERT_EQ(chmod(kPhotoWork, 0), 0);
+TEST_F(QueueAnswer, AnUnreadableFileIsAnErrorAndTheOthersAreListed) {
+  WriteFile(kPhotosInProgress, "/tmp/secret\n");
+  WriteFile(kPhotoQueue, "/tmp/waiting\n");
+  ASSERT_EQ(chmod(kPhotosInProgress, 0), 0);
   const ProgramResult result = RunStatusAsOrdinaryUser({"--queue"});
-  EXPECT_EQ(result.exitCode, 2);
-  EXPECT_EQ(result.err, std::string("velathumb-status: ") + kPhotoWork + ": Permission denied\n");
+  ExpectError(result, std::string(kPhotosInProgress) + ": Permission denied");
   EXPECT_THAT(result.out, HasSubstr("    /tmp/waiting\n"));
 }
 
-TEST_F(QueueAnswer, WhatIsNoFileIsAnErrorAtOnceAndTheOthersAreAnswered) {
-  ASSERT_EQ(mkfifo(kPhotoWork, 0666), 0);
-  MakeDirectories(kVideoWork);
-  WriteFile(kPhotoWaiting, "/tmp/waiting\n");
+TEST_F(QueueAnswer, AFifoOrDirectoryIsAnErrorAtOnceAndTheOthersAreListed) {
+  ASSERT_EQ(mkfifo(kPhotosInProgress, 0666), 0);
+  MakeDirectories(kVideosInProgress);
+  WriteFile(kPhotoQueue, "/tmp/waiting\n");
   ProgramOptions options;
   options.timeLimit = std::chrono::seconds(20);
   const ProgramResult result = RunStatus({"--queue"}, options);
   ASSERT_FALSE(result.timedOut);
-  EXPECT_EQ(result.exitCode, 2);
-  EXPECT_EQ(result.err, std::string("velathumb-status: ") + kPhotoWork +
-                            ": Invalid argument\nvelathumb-status: " + kVideoWork +
-                            ": Is a directory\n");
+  ExpectError(result, std::string(kPhotosInProgress) + ": Invalid argument\nvelathumb-status: " +
+                          kVideosInProgress + ": Is a directory");
   EXPECT_THAT(result.out, HasSubstr("    /tmp/waiting\n"));
   const Json::Value answer = ReadJson(RunStatus({"--queue", "--json"}, options).out);
   EXPECT_EQ(answer["errors"].size(), 2U);

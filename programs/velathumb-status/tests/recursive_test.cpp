@@ -1,43 +1,21 @@
 // Whole trees.
-#include <gmock/gmock.h>
 #include <sys/resource.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
 #include <sstream>
-#include <string>
-#include <vector>
 
-#include "status_program.h"
-#include "status_text.h"
+#include "status_fixture.h"
 #include "storage/deep_files.h"
-#include "storage/photo_tree.h"
-#include "support/files.h"
 #include "support/mounts.h"
-#include "support/sandbox.h"
 
 namespace vela_test {
 namespace {
 
-using ::testing::ElementsAre;
-using ::testing::EndsWith;
-using ::testing::HasSubstr;
-using ::testing::UnorderedElementsAre;
+using namespace ::testing;
 
-constexpr const char* kTop = "/tmp/photos";
-constexpr const char* kQueueFile = "/var/spool/thumb_create.queue";
-
-std::string In(const std::string& name) {
-  return std::string(kTop) + "/" + name;
-}
-
-class TreeAnswer : public SandboxTest {
+class TreeAnswer : public StatusTest {
  protected:
-  void SetUp() override {
-    SandboxTest::SetUp();
-    MakeDirectories(kTop);
-  }
-
   static StatusText Ask(std::vector<std::string> arguments = {kTop}) {
     arguments.insert(arguments.begin(), "--recursive");
     const ProgramResult result = RunStatus(arguments);
@@ -45,7 +23,7 @@ class TreeAnswer : public SandboxTest {
     return ReadStatusText(result.out);
   }
 
-  /// What the library says of the tree.
+  /// What the library reports for the tree.
   static PhotoWork LibraryWork(const std::string& dir = kTop) {
     PhotoWork work;
     EXPECT_EQ(GetDirThumbStatusRecursive(dir.c_str(), &work.photos, &work.thumbs), 0);
@@ -65,12 +43,12 @@ TEST_F(TreeAnswer, HasALineForEachDirectory) {
   EXPECT_EQ(answer.totals.name, "in 4 directories");
 }
 
-TEST_F(TreeAnswer, TellsADirectoryBeforeWhatIsBelowIt) {
+TEST_F(TreeAnswer, ListsADirectoryBeforeWhatIsBelowIt) {
   MakeDirectories(In("one/deep"));
   EXPECT_THAT(Ask().Names(), ElementsAre(kTop, In("one"), In("one/deep")));
 }
 
-TEST_F(TreeAnswer, LeavesOutNamesThatAreNotIndexed) {
+TEST_F(TreeAnswer, SkipsNamesThatAreNotIndexed) {
   for (const char* name : {".hidden", "@eaDir", "@tmp", "#recycle", "lost+found", "good/@eaDir"}) {
     MakePhoto(In(name) + "/a.jpg");
   }
@@ -79,7 +57,7 @@ TEST_F(TreeAnswer, LeavesOutNamesThatAreNotIndexed) {
   EXPECT_EQ(answer.totals.numbers.photos, 0);
 }
 
-TEST_F(TreeAnswer, LeavesOutOtherFileSystems) {
+TEST_F(TreeAnswer, SkipsOtherFileSystems) {
   const SmallVolume volume(In("other"), 1 << 20);
   MakePhoto(In("other/a.jpg"));
   MakePhoto(In("same/a.jpg"));
@@ -109,12 +87,12 @@ TEST_F(TreeAnswer, CountsNestedAndRepeatedRootsOnce) {
   EXPECT_EQ(up.totals.numbers.photos, 3);
 }
 
-TEST_F(TreeAnswer, AgreesWithTheLibraryWithoutWaitingDirectories) {
+TEST_F(TreeAnswer, AgreesWithTheLibraryWithoutQueuedDirectories) {
   for (const char* name : {"a.jpg", "one/a.jpg", "one/b.jpg", "one/deep/a.jpg", "two/a.jpg"}) {
     MakePhoto(In(name));
   }
   MakeThumbs(In("two"), "a.jpg", kBitS | kBitM);
-  WriteFile(kQueueFile, In("one") + "\n" + In("none") + "\nR:" + In("two") + "\n");
+  WriteFile(kPhotoQueue, In("one") + "\n" + In("none") + "\nR:" + In("two") + "\n");
   const StatusText answer = Ask();
   EXPECT_EQ(answer.totals.numbers, (StatusNumbers{5, 5, 2, 28, 0}));
   EXPECT_EQ(answer.totals.queued, "1");
@@ -130,11 +108,11 @@ TEST_F(TreeAnswer, AgreesWithTheLibraryWithoutWaitingDirectories) {
   EXPECT_EQ(free, (PhotoWork{3, 16}));
 }
 
-TEST_F(TreeAnswer, JsonTotalsLessTheQueuedOnesAreTheLibrarys) {
+TEST_F(TreeAnswer, JsonTotalsWithoutQueuedDirectoriesAgreeWithTheLibrary) {
   for (const char* name : {"a.jpg", "one/a.jpg", "one/b.jpg", "one/deep/a.jpg"}) {
     MakePhoto(In(name));
   }
-  WriteFile(std::string(kQueueFile) + ".tmp", In("one") + "\n");
+  WriteFile(kPhotosInProgress, In("one") + "\n");
   const Json::Value totals = AskForJson({"-r", kTop})["totals"];
   const PhotoWork work = LibraryWork();
   EXPECT_EQ(work, (PhotoWork{2, 12}));
@@ -144,55 +122,47 @@ TEST_F(TreeAnswer, JsonTotalsLessTheQueuedOnesAreTheLibrarys) {
             work.thumbs);
 }
 
-TEST_F(TreeAnswer, AnUnreadableDirectoryIsAnErrorAndTheRestIsAnswered) {
+TEST_F(TreeAnswer, AnUnreadableDirectoryIsAnErrorAndTheRestIsReported) {
   MakePhoto(In("a.jpg"));
   MakePhoto(In("closed/a.jpg"));
   MakePhoto(In("open/a.jpg"));
   ASSERT_EQ(chmod(In("closed").c_str(), 0), 0);
   const ProgramResult result = RunStatusAsOrdinaryUser({"-r", kTop});
-  EXPECT_EQ(result.exitCode, 2);
-  EXPECT_EQ(result.err, "velathumb-status: /tmp/photos/closed: cannot be opened\n");
+  ExpectError(result, "/tmp/photos/closed: cannot be opened");
   EXPECT_EQ(ReadStatusText(result.out).totals.numbers, (StatusNumbers{2, 2, 0, 12, 0}));
 }
 
 TEST_F(TreeAnswer, AnUnreadableRootIsAnError) {
   ASSERT_EQ(chmod(kTop, 0), 0);
-  const ProgramResult result = RunStatusAsOrdinaryUser({"-r", kTop});
-  EXPECT_EQ(result.exitCode, 2);
-  EXPECT_EQ(result.err, "velathumb-status: /tmp/photos: cannot be opened\n");
+  ExpectError(RunStatusAsOrdinaryUser({"-r", kTop}), "/tmp/photos: cannot be opened");
 }
 
-TEST_F(TreeAnswer, ATreeWhoseSubdirectoriesCannotBeLookedAtIsAnError) {
+TEST_F(TreeAnswer, ATreeWhoseSubdirectoriesCannotBeExaminedIsAnError) {
   MakePhoto(In("below/a.jpg"));
   ASSERT_EQ(chmod(kTop, 0444), 0);
-  const ProgramResult result = RunStatusAsOrdinaryUser({"-r", kTop});
-  EXPECT_EQ(result.exitCode, 2);
-  EXPECT_EQ(result.err, "velathumb-status: /tmp/photos: Permission denied\n");
+  ExpectError(RunStatusAsOrdinaryUser({"-r", kTop}), "/tmp/photos: Permission denied");
 }
 
-TEST_F(TreeAnswer, ARootThatIsLeftOutForItsNameIsAnError) {
+TEST_F(TreeAnswer, ARootThatIsSkippedBecauseOfItsNameIsAnError) {
   MakePhoto("/tmp/@eaDir/a.jpg");
   MakePhoto(In("a.jpg"));
   const ProgramResult result = RunStatus({"-r", "/tmp/@eaDir", kTop});
-  EXPECT_EQ(result.exitCode, 2);
-  EXPECT_EQ(result.err,
-            "velathumb-status: /tmp/@eaDir: is skipped in trees because of its name\n");
+  ExpectError(result, "/tmp/@eaDir: is left out of a tree because of its name");
   EXPECT_THAT(ReadStatusText(result.out).Names(), ElementsAre(kTop));
 }
 
 TEST_F(TreeAnswer, AMissingRootAndAFileAreErrors) {
   MakePhoto(In("a.jpg"));
   const ProgramResult result = RunStatus({"-r", "/tmp/none", In("a.jpg"), kTop});
-  EXPECT_EQ(result.exitCode, 2);
-  EXPECT_EQ(result.err,
-            "velathumb-status: /tmp/none: No such file or directory\n"
-            "velathumb-status: /tmp/photos/a.jpg: Not a directory\n");
+  ExpectError(result,
+              "/tmp/none: No such file or directory\n"
+              "velathumb-status: /tmp/photos/a.jpg: Not a directory");
   EXPECT_THAT(ReadStatusText(result.out).Names(), ElementsAre(kTop));
 }
 
-TEST_F(TreeAnswer, DirectoriesTooDeepForPathsAreErrorsAndTheRestIsAnswered) {
+TEST_F(TreeAnswer, DirectoriesTooDeepForAPathAreErrorsAndTheRestIsReported) {
   MakePhoto("/tmp/other/a.jpg");
-  // 11 bytes and 201 for each level: the twentieth is the last that a path leads to.
+  // 11 bytes and 201 for each level: the twentieth is the last that a path can reach.
   const DeepTree tree(kTop, std::string(200, 'd'), 25, "a.jpg");
   const ProgramResult result = RunStatus({"-r", kTop, "/tmp/other"});
   EXPECT_EQ(result.exitCode, 2);
@@ -224,7 +194,7 @@ TEST_F(TreeAnswer, AWalkThatEndsEarlyIsAnError) {
   EXPECT_EQ(ReadStatusText(result.out).Names().front(), kTop);
 }
 
-TEST_F(TreeAnswer, RelativeRootsAndThoseWithDotsAreTakenAsWhatTheyAre) {
+TEST_F(TreeAnswer, RelativeRootsAreResolved) {
   MakePhoto(In("below/a.jpg"));
   ProgramOptions options;
   options.workingDirectory = In("below");
@@ -237,7 +207,7 @@ TEST_F(TreeAnswer, RelativeRootsAndThoseWithDotsAreTakenAsWhatTheyAre) {
   EXPECT_THAT(Ask({"/tmp//photos//"}).Names(), ElementsAre(kTop, In("below")));
 }
 
-TEST_F(TreeAnswer, NamesPhotosOfEachDirectory) {
+TEST_F(TreeAnswer, ListsPhotosOfEachDirectory) {
   WriteFile("/etc/velainfo.conf", "photo_thumb_size_map=\"16\"\n");
   MakePhoto(In("a.jpg"));
   MakePhoto(In("one/b.jpg"));

@@ -1,25 +1,13 @@
-// Until when conversion is held back.
-#include <gmock/gmock.h>
-#include <json/value.h>
-
+// The time until which conversion is held back.
 #include <ctime>
-#include <string>
 
-#include "status_program.h"
-#include "support/files.h"
-#include "support/sandbox.h"
+#include "status_fixture.h"
 #include "support/system_log.h"
 
 namespace vela_test {
 namespace {
 
-using ::testing::AllOf;
-using ::testing::Ge;
-using ::testing::HasSubstr;
-using ::testing::IsEmpty;
-using ::testing::Le;
-using ::testing::MatchesRegex;
-using ::testing::UnorderedElementsAre;
+using namespace ::testing;
 
 class ResumeAnswer : public SandboxTest {
  protected:
@@ -32,25 +20,32 @@ class ResumeAnswer : public SandboxTest {
     options.addedEnvironment = {"TZ=" + timeZone};
     return RunStatus({"--resume-time"}, options);
   }
-};
 
-TEST_F(ResumeAnswer, SaysWhenNothingHoldsBack) {
-  for (const long time : {0L, 1700000000L}) {
-    Store(time);
+  static void ExpectNotHeldBack() {
     const ProgramResult result = RunStatus({"--resume-time"});
     EXPECT_EQ(result.exitCode, 0);
     EXPECT_EQ(result.out, "conversion is not paused\n");
   }
+};
+
+TEST_F(ResumeAnswer, SaysWhenNothingHoldsBack) {
+  ExpectNotHeldBack();
+  EXPECT_EQ(AskForJson({"--resume-time"})["resume"]["reached"], Json::Value(true));
+  EXPECT_THAT(ErrorLines(), IsEmpty());
+  for (const long time : {0L, 1700000000L}) {
+    Store(time);
+    ExpectNotHeldBack();
+  }
 }
 
-TEST_F(ResumeAnswer, TellsTheTimeInTheUsersZone) {
+TEST_F(ResumeAnswer, ShowsTheTimeInTheUsersZone) {
   Store(4102444800);  // 2100-01-01 00:00:00 UTC
   EXPECT_THAT(AskIn("UTC0").out, MatchesRegex("conversion is paused until "
                                               "2100-01-01 00:00:00 \\+0000, for [0-9]+ s\n"));
   EXPECT_THAT(AskIn("XYZ-2").out, HasSubstr("until 2100-01-01 02:00:00 +0200, for "));
 }
 
-TEST_F(ResumeAnswer, IsNoWork) {
+TEST_F(ResumeAnswer, IsNotWork) {
   Store(4102444800);
   EXPECT_EQ(RunStatus({"--resume-time"}).exitCode, 0);
   EXPECT_EQ(RunStatus({"--resume-time", "--json"}).exitCode, 0);
@@ -76,28 +71,13 @@ TEST_F(ResumeAnswer, JsonHasTheDocumentedMembers) {
   EXPECT_THAT(resume["wait_seconds"].asInt64(), AllOf(Le(1000), Ge(1000 - (after - before))));
 }
 
-TEST_F(ResumeAnswer, JsonOfAReachedTimeWaitsForNothing) {
+TEST_F(ResumeAnswer, JsonOfAReachedOrNegativeTimeWaitsForNothing) {
   Store(1700000000);
-  const Json::Value resume = AskForJson({"--resume-time"})["resume"];
-  EXPECT_EQ(resume["resume_time"], Json::Value(1700000000));
-  EXPECT_EQ(resume["reached"], Json::Value(true));
-  EXPECT_EQ(resume["wait_seconds"], Json::Value(0));
-}
-
-TEST_F(ResumeAnswer, JsonOfANegativeTimeIsNotReached) {
+  EXPECT_EQ(AskForJson({"--resume-time"})["resume"],
+            ReadJson(R"({"resume_time": 1700000000, "reached": true, "wait_seconds": 0})"));
   Store(-5);
-  const Json::Value resume = AskForJson({"--resume-time"})["resume"];
-  EXPECT_EQ(resume["resume_time"], Json::Value(-5));
-  EXPECT_EQ(resume["reached"], Json::Value(false));
-  EXPECT_EQ(resume["wait_seconds"], Json::Value(0));
-}
-
-TEST_F(ResumeAnswer, WithoutSettingsNothingHoldsBack) {
-  const ProgramResult result = RunStatus({"--resume-time"});
-  EXPECT_EQ(result.exitCode, 0);
-  EXPECT_EQ(result.out, "conversion is not paused\n");
-  EXPECT_EQ(AskForJson({"--resume-time"})["resume"]["reached"], Json::Value(true));
-  EXPECT_THAT(ErrorLines(), IsEmpty());
+  EXPECT_EQ(AskForJson({"--resume-time"})["resume"],
+            ReadJson(R"({"resume_time": -5, "reached": false, "wait_seconds": 0})"));
 }
 
 }  // namespace

@@ -1,4 +1,4 @@
-// A velathumb that is at work for as long as a test wants.
+// A velathumb that runs for as long as a test needs it.
 #pragma once
 
 #include <sys/types.h>
@@ -10,7 +10,7 @@
 
 namespace vela_test {
 
-/// Started with a converter that waits with the one photo there is; ended with its object.
+/// Its converter waits while it processes the only photo; both end with the object.
 class RunningConversion {
  public:
   RunningConversion();

@@ -14,7 +14,7 @@ namespace vela_test {
 
 namespace {
 
-/// The number of continuation bytes that the lead byte asks for, -1 for a byte that is none.
+/// The number of continuation bytes after the lead byte, -1 when it is not a lead byte.
 int ContinuationBytes(unsigned char lead) {
   if (lead < 0x80) return 0;
   if (lead >= 0xc2 && lead < 0xe0) return 1;

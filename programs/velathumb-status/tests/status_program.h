@@ -17,17 +17,17 @@ std::string StatusProgramPath();
 ProgramResult RunStatus(const std::vector<std::string>& arguments,
                         const ProgramOptions& options = ProgramOptions());
 
-/// Runs it with these arguments and without capabilities: permission bits hold for it.
+/// Runs it with these arguments and without capabilities, so that permission bits apply to it.
 ProgramResult RunStatusAsOrdinaryUser(const std::vector<std::string>& arguments);
 
 /// Starts the program with its standard output at the descriptor, which stays the caller's.
 ProgramOptions WithOutputAt(int descriptor);
 
-/// Reads one JSON object; the test at hand fails when the text is anything else or no valid UTF-8.
+/// Reads one JSON object; fails the test when the text is anything else or not valid UTF-8.
 Json::Value ReadJson(const std::string& text);
 
-/// Runs it with --json and these arguments, and reads its answer; the test at hand fails when that
-/// is not one JSON object.
+/// Runs it with --json and these arguments, and reads its answer; fails the test when that is not
+/// one JSON object.
 Json::Value AskForJson(std::vector<std::string> arguments);
 
 }  // namespace vela_test

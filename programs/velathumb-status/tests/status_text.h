@@ -37,7 +37,7 @@ struct StatusText {
   std::vector<std::string> Names() const;
 };
 
-/// Reads the answer; the test at hand fails when it is none.
+/// Reads the answer; fails the test when the text is anything else.
 StatusText ReadStatusText(const std::string& text);
 
 }  // namespace vela_test

@@ -17,7 +17,7 @@ Terminal::Terminal(int columns)
   if (!testSide_.IsOpen() || grantpt(testSide_.Get()) != 0 || unlockpt(testSide_.Get()) != 0) {
     EnvironmentFailureWithErrno("cannot make a terminal");
   }
-  // Not by its name, which stands for another terminal where /dev/pts is not the one that the
+  // Not by its name, which may refer to another terminal when /dev/pts is not the one that the
   // terminal was made in.
   programSide_ = Descriptor(ioctl(testSide_.Get(), TIOCGPTPEER, O_RDWR | O_NOCTTY | O_CLOEXEC));
   winsize size = {};

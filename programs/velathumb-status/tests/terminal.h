@@ -14,7 +14,7 @@ class Terminal {
   /// The side a program has as its standard output.
   int ProgramSide() const { return programSide_.Get(); }
 
-  /// Waits until `text` has been written, at most `milliseconds`; whether it was.
+  /// Waits until `text` has been written, at most `milliseconds`; returns whether it was.
   bool WaitForText(const std::string& text, int milliseconds = 20000);
 
   /// Everything written so far, newlines as a terminal gets them ("\r\n").

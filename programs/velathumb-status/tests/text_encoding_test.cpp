@@ -1,4 +1,4 @@
-// Byte strings as the reports need them.
+// Byte strings encoded for the reports.
 #include "text_encoding.h"
 
 #include <gmock/gmock.h>
@@ -16,14 +16,14 @@ using ::testing::AnyOf;
 
 const std::string kReplacement = "\xef\xbf\xbd";
 
-TEST(ToUtf8Text, LeavesValidTextAsItIs) {
+TEST(ToUtf8Text, KeepsValidText) {
   for (const char* text : {"", "abc", "\x01\x7f", "\xc3\xa4", "\xe2\x82\xac", "\xf0\x9f\x93\xb7"}) {
     EXPECT_EQ(ToUtf8(text), text);
     EXPECT_TRUE(IsUtf8(text)) << text;
   }
 }
 
-TEST(ToUtf8Text, ReplacesWhatIsNoCharacter) {
+TEST(ToUtf8Text, ReplacesInvalidBytes) {
   EXPECT_EQ(ToUtf8("a\xff"
                    "b"),
             "a" + kReplacement + "b");
@@ -35,19 +35,16 @@ TEST(ToUtf8Text, ReplacesWhatIsNoCharacter) {
   }
 }
 
-TEST(ToHtmlText, EscapesWhatHasAMeaning) {
+TEST(ToHtmlText, EscapesMarkupAndControlCharacters) {
   EXPECT_EQ(ToHtml("<a href=\"x\">&"), "&lt;a href=&quot;x&quot;&gt;&amp;");
   EXPECT_THAT(ToHtml("'"), AnyOf("&#39;", "&#x27;", "&apos;"));
   EXPECT_EQ(ToHtml("\xff<"), kReplacement + "&lt;");
   EXPECT_EQ(ToHtml(""), "");
-}
-
-TEST(ToHtmlText, EscapesControlCharacters) {
   EXPECT_EQ(ToHtml("\x01"), "&#x1;");
   EXPECT_EQ(ToHtml("\x7f"), "&#x7f;");
 }
 
-TEST(ToBase64Text, FollowsTheTestVectorsOfTheStandard) {
+TEST(ToBase64Text, MatchesTheTestVectorsOfTheStandard) {
   EXPECT_EQ(ToBase64(""), "");
   EXPECT_EQ(ToBase64("f"), "Zg==");
   EXPECT_EQ(ToBase64("fo"), "Zm8=");
@@ -76,19 +73,19 @@ TEST(ToPlainLineText, EscapesTheControlsFrom80To9fAsCharactersAndAsBytes) {
             "\\x9b31m\\x80\\x9f");
 }
 
-TEST(ToPlainLineText, LeavesOtherCharactersAlthoughTheyHoldSuchBytes) {
+TEST(ToPlainLineText, KeepsOtherCharactersThatContainSuchBytes) {
   for (const char* text : {"\xc2\xa0", "\xc3\x9b", "\xe2\x80\x93", "\xe6\x97\xa5\xe6\x9c\xac",
                            "\xf0\x9f\x93\xb7", "\xed\x95\x9c"}) {
     EXPECT_EQ(ToPlainLine(text), text);
   }
 }
 
-TEST(ToPlainLineText, LeavesBytesThatAreNeitherCharactersNorControls) {
+TEST(ToPlainLineText, KeepsInvalidBytesThatAreNotControls) {
   EXPECT_EQ(ToPlainLine("\xa0\xc2 \xff\xfe\xe4.jpg"), "\xa0\xc2 \xff\xfe\xe4.jpg");
   EXPECT_EQ(ToPlainLine("cut \xe2\xac"), "cut \xe2\xac");
 }
 
-TEST(PutBytesInJson, AddsTheExactBytesOnlyWhenTheyAreNoUtf8) {
+TEST(PutBytesInJson, AddsTheExactBytesOnlyWhenTheyAreNotUtf8) {
   Json::Value object;
   PutBytes(object, "name", "\xc3\xa4");
   PutBytes(object, "path", "\xe4");

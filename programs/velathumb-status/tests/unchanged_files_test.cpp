@@ -1,24 +1,18 @@
-// Asking changes nothing.
-#include <fcntl.h>
-#include <gmock/gmock.h>
+// Queries change nothing.
 #include <sys/stat.h>
 
 #include <ostream>
-#include <string>
-#include <vector>
+#include <tuple>
 
 #include "running_conversion.h"
-#include "status_program.h"
-#include "storage/photo_tree.h"
-#include "support/files.h"
-#include "support/sandbox.h"
+#include "status_fixture.h"
 
 namespace vela_test {
 namespace {
 
-using ::testing::IsEmpty;
+using namespace ::testing;
 
-/// All there is of a file that a change would show in.
+/// The properties of a file that a change would alter.
 struct FileState {
   std::string path;
   ino_t inode;
@@ -28,13 +22,13 @@ struct FileState {
   timespec changed;
 };
 
-bool IsSameTime(const timespec& a, const timespec& b) {
-  return a.tv_sec == b.tv_sec && a.tv_nsec == b.tv_nsec;
+auto Members(const FileState& file) {
+  return std::tie(file.path, file.inode, file.size, file.mode, file.modified.tv_sec,
+                  file.modified.tv_nsec, file.changed.tv_sec, file.changed.tv_nsec);
 }
 
 bool operator==(const FileState& a, const FileState& b) {
-  return a.path == b.path && a.inode == b.inode && a.size == b.size && a.mode == b.mode &&
-         IsSameTime(a.modified, b.modified) && IsSameTime(a.changed, b.changed);
+  return Members(a) == Members(b);
 }
 
 void PrintTo(const FileState& file, std::ostream* out) {
@@ -49,7 +43,7 @@ FileState StateOf(const std::string& path) {
   return {path, status.st_ino, status.st_size, status.st_mode, status.st_mtim, status.st_ctim};
 }
 
-/// Every place that the program could write to.
+/// Everything the program could write to.
 std::vector<FileState> AllFiles() {
   std::vector<FileState> files;
   for (const std::string place : {"/tmp", "/var/spool", "/run", "/usr/vela", "/etc"}) {
@@ -61,20 +55,19 @@ std::vector<FileState> AllFiles() {
   return files;
 }
 
-class UnchangedFiles : public SandboxTest {
+class UnchangedFiles : public StatusTest {
  protected:
   void SetUp() override {
-    SandboxTest::SetUp();
-    MakePhoto("/tmp/photos/a.jpg");
-    MakeThumbs("/tmp/photos", "a.jpg", kBitS | kBitM);
-    SetFileTime("/tmp/photos/@eaDir/a.jpg/VELAPHOTO_THUMB_S.jpg", kMediaTime - 1);
-    WriteFile("/tmp/photos/@eaDir/a.jpg/VELAPHOTO_THUMB_B.fail", "");
+    StatusTest::SetUp();
+    MakePhotoWith("a.jpg", kBitS | kBitM);
+    SetFileTime(Derived("a.jpg", "VELAPHOTO_THUMB_S.jpg"), kMediaTime - 1);
+    WriteFile(Derived("a.jpg", "VELAPHOTO_THUMB_B.fail"), "");
     WriteFile("/tmp/photos/film.mp4", "film");
     MakePhoto("/tmp/photos/below/b.jpg");
     WriteFile("/etc/velainfo.conf", "thumb_conv_resume_time=\"5\"\n");
   }
 
-  static void AskEverything() {
+  static void RunEveryQuery() {
     for (const char* format : {"--progress", "--json"}) {
       EXPECT_EQ(RunStatus({format, "--recursive", "--photos", "/tmp/photos"}).exitCode, 1);
       RunStatus({format, "--queue", "--progress", "--resume-time"});
@@ -84,24 +77,23 @@ class UnchangedFiles : public SandboxTest {
   }
 };
 
-TEST_F(UnchangedFiles, AreLeftByEveryQuestionWithoutQueuesAndProgress) {
+TEST_F(UnchangedFiles, AreLeftByEveryQueryWithoutQueuesAndProgress) {
   const std::vector<FileState> before = AllFiles();
-  AskEverything();
+  RunEveryQuery();
   RunStatus({"--watch"});
   EXPECT_EQ(AllFiles(), before);
   EXPECT_THAT(ListDirectory("/var/spool"), IsEmpty());
 }
 
-TEST_F(UnchangedFiles, AreLeftByEveryQuestionWithQueuesAndProgress) {
-  for (const char* name : {"thumb_create.queue", "thumb_create.queue.tmp", "flv_create.queue",
-                           "flv_create.queue.tmp"}) {
-    WriteFile(std::string("/var/spool/") + name, "/tmp/photos\nR:/tmp/photos/below\n");
+TEST_F(UnchangedFiles, AreLeftByEveryQueryWithQueuesAndProgress) {
+  for (const char* queue : {kPhotoQueue, kPhotosInProgress, kVideoQueue, kVideosInProgress}) {
+    WriteFile(queue, "/tmp/photos\nR:/tmp/photos/below\n");
   }
   WriteFile("/var/spool/conv_progress_photo", "total=\"5\"\ncompleted=\"2\"\n");
   WriteFile("/var/spool/conv_progress_video", "total=\"5\"\n");
   WriteFile("/var/run/velathumb.4000000.pid", "");
   const std::vector<FileState> before = AllFiles();
-  AskEverything();
+  RunEveryQuery();
   RunStatus({"--watch"});
   EXPECT_EQ(AllFiles(), before);
 }
@@ -109,11 +101,11 @@ TEST_F(UnchangedFiles, AreLeftByEveryQuestionWithQueuesAndProgress) {
 TEST_F(UnchangedFiles, AreLeftWhileAnInstanceRuns) {
   const RunningConversion conversion;
   const std::vector<FileState> before = AllFiles();
-  AskEverything();
+  RunEveryQuery();
   EXPECT_EQ(AllFiles(), before);
 }
 
-TEST_F(UnchangedFiles, AreLeftByAPageThatStandsElsewhere) {
+TEST_F(UnchangedFiles, AreLeftByAPageInAnotherPlace) {
   MakeThumbs("/tmp/photos/below", "b.jpg", kBitS);
   const std::vector<FileState> before = AllFiles();
   const std::string page = "/dev/shm/page.html";

@@ -1,25 +1,18 @@
 // Following a running instance.
 #include <fcntl.h>
-#include <gmock/gmock.h>
-#include <json/value.h>
 #include <signal.h>
 #include <unistd.h>
 
-#include <algorithm>
 #include <chrono>
 #include <sstream>
-#include <string>
 #include <thread>
-#include <vector>
 
 #include "platform/velaindex.h"
 #include "progress/progress_summary.h"
 #include "progress/velamk_progress.h"
 #include "running_conversion.h"
-#include "status_program.h"
+#include "status_fixture.h"
 #include "support/descriptor.h"
-#include "support/files.h"
-#include "support/sandbox.h"
 #include "terminal.h"
 
 using namespace vela;
@@ -27,14 +20,7 @@ using namespace vela;
 namespace vela_test {
 namespace {
 
-using ::testing::ContainsRegex;
-using ::testing::EndsWith;
-using ::testing::HasSubstr;
-using ::testing::IsEmpty;
-using ::testing::Not;
-using ::testing::StartsWith;
-using ::testing::UnorderedElementsAre;
-
+using namespace ::testing;
 using std::chrono::milliseconds;
 
 std::vector<std::string> LinesOf(const std::string& text) {
@@ -46,7 +32,7 @@ std::vector<std::string> LinesOf(const std::string& text) {
   return lines;
 }
 
-/// The progress summary as it is now, with what is said of instances behind it.
+/// The current progress summary, followed by the line about instances.
 std::string FinalText(const char* newline) {
   std::string text;
   for (const std::string& line : FormatProgressSummary(ReadProgressSummary())) {
@@ -78,7 +64,7 @@ class Watching : public SandboxTest {
   }
 };
 
-TEST_F(Watching, EndsAtOnceWhenNobodyRuns) {
+TEST_F(Watching, EndsAtOnceWithoutARunningInstance) {
   const ProgramResult result = RunStatus({"--watch"});
   EXPECT_EQ(result.exitCode, 0);
   EXPECT_EQ(result.err, "");
@@ -114,16 +100,16 @@ TEST_F(Watching, WritesALineForEachChangeUntilTheInstanceEnds) {
   EXPECT_THAT(result->out, EndsWith(FinalText("\n")));
 }
 
-TEST_F(Watching, TellsWhetherWorkIsLeftInTheEnd) {
+TEST_F(Watching, EndsWithStatus0WhenNoWorkIsLeft) {
   AddThumbs(1, 0);
-  RunningConversion first;
-  Program done = Start();
-  ASSERT_TRUE(WaitForOutput(done, "0%  0 of 1 thumbnails"));
-  first.Finish();
-  EXPECT_EQ(done.Wait()->exitCode, 0);
+  RunningConversion conversion;
+  Program watch = Start();
+  ASSERT_TRUE(WaitForOutput(watch, "0%  0 of 1 thumbnails"));
+  conversion.Finish();
+  EXPECT_EQ(watch.Wait()->exitCode, 0);
 }
 
-TEST_F(Watching, TellsTheRate) {
+TEST_F(Watching, ShowsTheRate) {
   AddThumbs(1000, 0);
   RunningConversion conversion;
   Program watch = Start();
@@ -134,7 +120,7 @@ TEST_F(Watching, TellsTheRate) {
               ContainsRegex("thumbnails  [0-9]+\\.[0-9]/s  [0-9]+:[0-9][0-9] left$"));
 }
 
-TEST_F(Watching, WithoutTotalsTellsCountAndRate) {
+TEST_F(Watching, WithoutTotalsShowsCountAndRate) {
   RunningConversion conversion;
   Program watch = Start();
   ASSERT_TRUE(WaitForOutput(watch, "0 thumbnails\n"));
@@ -143,7 +129,7 @@ TEST_F(Watching, WithoutTotalsTellsCountAndRate) {
   EXPECT_THAT(LinesOf(watch.Output()).back(), ContainsRegex("^100 thumbnails  [0-9]+\\.[0-9]/s$"));
 }
 
-TEST_F(Watching, TheRateBeginsAnewWithAnotherUnit) {
+TEST_F(Watching, TheRateRestartsWithAnotherUnit) {
   AddConvProgress(THUMB_TYPE_PHOTO, "total", 1000);
   RunningConversion conversion;
   Program watch = Start({"--watch", "--json"});
@@ -157,19 +143,16 @@ TEST_F(Watching, TheRateBeginsAnewWithAnotherUnit) {
   AddThumbs(0, 10);
   ASSERT_TRUE(WaitForOutput(watch, "\"completed\":4010,"));
   const std::vector<std::string> lines = LinesOf(watch.Output());
-  std::vector<std::string> units;
-  double fastest = 0;
+  EXPECT_EQ(ReadJson(lines.front())["unit"], Json::Value("photos"));
+  EXPECT_EQ(ReadJson(lines.back())["unit"], Json::Value("thumbnails"));
+  Json::Value unit;
   for (const std::string& line : lines) {
     const Json::Value moment = ReadJson(line);
-    const bool isFirstOfUnit = units.empty() || units.back() != moment["unit"].asString();
-    EXPECT_EQ(moment["rate"].isNull(), isFirstOfUnit) << line;
-    units.push_back(moment["unit"].asString());
-    fastest = std::max(fastest, moment["rate"].isNull() ? 0 : moment["rate"].asDouble());
+    EXPECT_EQ(moment["rate"].isNull(), moment["unit"] != unit) << line;
+    // Ten in at least the half second between two samples.
+    EXPECT_LE(moment["rate"].asDouble(), 25) << line;
+    unit = moment["unit"];
   }
-  EXPECT_EQ(units.front(), "photos");
-  EXPECT_EQ(units.back(), "thumbnails");
-  // Ten in at least the half second between two looks.
-  EXPECT_LE(fastest, 25);
 }
 
 TEST_F(Watching, JsonIsOneObjectALine) {
@@ -192,10 +175,8 @@ TEST_F(Watching, JsonIsOneObjectALine) {
     EXPECT_EQ(moments.back()["unit"], Json::Value("thumbnails"));
   }
   ASSERT_GE(moments.size(), 3U);
-  EXPECT_EQ(moments[0]["thumb"]["total"], Json::Value(100));
-  EXPECT_EQ(moments[0]["thumb"]["completed"], Json::Value(10));
-  EXPECT_EQ(moments[0]["rate"], Json::Value());
-  EXPECT_EQ(moments[0]["seconds_left"], Json::Value());
+  ExpectMembers(moments[0], R"({"rate": null, "seconds_left": null})");
+  ExpectMembers(moments[0]["thumb"], R"({"total": 100, "completed": 10})");
   EXPECT_EQ(moments[0]["instances"][0].asInt(), conversion.Pid());
   EXPECT_EQ(moments[1]["thumb"]["completed"], Json::Value(50));
   EXPECT_GT(moments[1]["rate"].asDouble(), 0);
@@ -204,7 +185,7 @@ TEST_F(Watching, JsonIsOneObjectALine) {
   EXPECT_EQ(moments.back()["instances"], Json::Value(Json::arrayValue));
 }
 
-TEST_F(Watching, OnATerminalIsABarDrawnAnew) {
+TEST_F(Watching, RedrawsABarOnATerminal) {
   AddThumbs(1000, 100);
   RunningConversion conversion;
   Terminal terminal(100);
@@ -235,7 +216,7 @@ TEST_F(Watching, OnANarrowTerminalTheLineDoesNotWrap) {
   EXPECT_EQ(watch.Wait()->signal, SIGTERM);
 }
 
-TEST_F(Watching, OnATerminalWithoutAWidthTheUsualOneIsTaken) {
+TEST_F(Watching, OnATerminalWithoutAWidthUsesTheDefault) {
   AddThumbs(1000, 100);
   Terminal terminal(0);
   Program watch = Start({"--watch"}, WithOutputAt(terminal.ProgramSide()));
@@ -253,41 +234,33 @@ TEST_F(Watching, JsonStaysJsonOnATerminal) {
   ReadJson(written.substr(0, written.size() - 2));
 }
 
-TEST_F(Watching, EndsWhenItsReaderHasGone) {
+/// Watches a running instance until the reader of its output has closed the pipe.
+ProgramResult WatchUntilReaderCloses(const std::vector<BeforeExec>& beforeExec) {
   RunningConversion conversion;
   int ends[2];
-  ASSERT_EQ(pipe2(ends, O_CLOEXEC), 0);
-  Descriptor reader(ends[0]);
-  Descriptor writer(ends[1]);
-  Program watch = Start({"--watch"}, WithOutputAt(writer.Get()));
-  writer.Close();
-  char first = '\0';
-  ASSERT_EQ(read(reader.Get(), &first, 1), 1);
-  reader.Close();
-  AddThumbs(0, 5);
-  const auto result = watch.Wait(std::chrono::seconds(20));
-  ASSERT_TRUE(result);
-  EXPECT_EQ(result->signal, SIGPIPE);
-}
-
-TEST_F(Watching, EndsWithAnErrorWhenItsReaderHasGoneAndTheSignalIsIgnored) {
-  RunningConversion conversion;
-  int ends[2];
-  ASSERT_EQ(pipe2(ends, O_CLOEXEC), 0);
+  EXPECT_EQ(pipe2(ends, O_CLOEXEC), 0);
   Descriptor reader(ends[0]);
   Descriptor writer(ends[1]);
   ProgramOptions options = WithOutputAt(writer.Get());
-  options.beforeExec.push_back(IgnoreSignal(SIGPIPE));
-  Program watch = Start({"--watch"}, options);
+  options.beforeExec.insert(options.beforeExec.end(), beforeExec.begin(), beforeExec.end());
+  Program watch = StartProgram(StatusProgramPath(), {"--watch"}, options);
   writer.Close();
   char first = '\0';
-  ASSERT_EQ(read(reader.Get(), &first, 1), 1);
+  EXPECT_EQ(read(reader.Get(), &first, 1), 1);
   reader.Close();
   AddThumbs(0, 5);
   const auto result = watch.Wait(std::chrono::seconds(20));
-  ASSERT_TRUE(result);
-  EXPECT_EQ(result->exitCode, 2);
-  EXPECT_EQ(result->err, "velathumb-status: standard output: cannot be written\n");
+  EXPECT_TRUE(result);
+  return result.value_or(ProgramResult());
+}
+
+TEST_F(Watching, EndsWhenItsReaderHasClosedThePipe) {
+  EXPECT_EQ(WatchUntilReaderCloses({}).signal, SIGPIPE);
+}
+
+TEST_F(Watching, EndsWithAnErrorWhenItsReaderHasClosedThePipeAndTheSignalIsIgnored) {
+  ExpectError(WatchUntilReaderCloses({IgnoreSignal(SIGPIPE)}),
+              "standard output: cannot be written");
 }
 
 }  // namespace

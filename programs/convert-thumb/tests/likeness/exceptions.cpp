@@ -9,7 +9,7 @@ namespace {
 struct Entry {
   const char* format;
   const char* says;
-  const char* vector;  ///< "" stands for all
+  const char* vector;  ///< "": all
   LikenessException kind;
   const char* why;
 };

@@ -1,4 +1,4 @@
-// The one list of what is known to differ from ImageMagick, and why that is all right.
+// The known differences from ImageMagick, and why they are acceptable.
 #pragma once
 
 #include <string>
@@ -8,9 +8,9 @@ namespace vela_test {
 enum class LikenessException {
   kNone,
   kSucceeds,      ///< we make thumbnails where ImageMagick fails
-  kFails,         ///< we make none where ImageMagick does
-  kUpright,       ///< ours stands upright where ImageMagick's lies on its side
-  kSurroundings,  ///< something beside the pixels differs
+  kFails,         ///< we fail where ImageMagick makes thumbnails
+  kUpright,       ///< ours is upright, ImageMagick's is not rotated
+  kSurroundings,  ///< something other than the pixels differs
 };
 
 struct KnownDifference {
@@ -18,7 +18,7 @@ struct KnownDifference {
   std::string why;
 };
 
-/// What is known of an input (its format and what it says of itself) with a vector.
+/// The known difference of an input (its format and description) with a vector.
 KnownDifference KnownDifferenceOf(const std::string& format, const std::string& says,
                                   const std::string& vector);
 

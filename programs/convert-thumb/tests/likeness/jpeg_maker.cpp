@@ -18,7 +18,7 @@ namespace {
 }
 
 bool HasInks(JpegColours colours) {
-  return colours == JpegColours::kInks || colours == JpegColours::kLumaChromaInk;
+  return colours == JpegColours::kCmyk || colours == JpegColours::kLumaChromaInk;
 }
 
 J_COLOR_SPACE StoredSpace(JpegColours colours) {
@@ -27,7 +27,7 @@ J_COLOR_SPACE StoredSpace(JpegColours colours) {
       return JCS_RGB;
     case JpegColours::kGrey:
       return JCS_GRAYSCALE;
-    case JpegColours::kInks:
+    case JpegColours::kCmyk:
       return JCS_CMYK;
     case JpegColours::kLumaChromaInk:
       return JCS_YCCK;

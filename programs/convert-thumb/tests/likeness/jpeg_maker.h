@@ -11,7 +11,7 @@ enum class JpegColours {
   kLumaChroma,     ///< as nearly every photo
   kRgb,            ///< without a change of colour space
   kGrey,           ///< one component
-  kInks,           ///< cyan, magenta, yellow, black
+  kCmyk,           ///< cyan, magenta, yellow, black
   kLumaChromaInk,  ///< inks with a change of colour space
 };
 

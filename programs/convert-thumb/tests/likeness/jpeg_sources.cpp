@@ -35,83 +35,76 @@ void AddOrientations(std::vector<LikenessSource>& sources) {
   }
 }
 
+/// A usual JPEG after `change`.
+template <typename Change>
+JpegKind Kind(Change change) {
+  JpegKind kind;
+  change(kind);
+  return kind;
+}
+
+JpegKind Sampled(int across, int down) {
+  return Kind([&](JpegKind& kind) {
+    kind.across = across;
+    kind.down = down;
+  });
+}
+
+JpegKind WithProfile(JpegKind kind, const std::string& profile) {
+  kind.profile = profile;
+  return kind;
+}
+
 void AddSampling(std::vector<LikenessSource>& sources) {
-  struct Sampling {
-    const char* says;
-    int across;
-    int down;
-  };
-  for (const Sampling& sampling :
-       {Sampling{"4:4:4", 1, 1}, {"4:2:2", 2, 1}, {"4:4:0", 1, 2}, {"4:1:1", 4, 1}}) {
-    JpegKind kind;
-    kind.across = sampling.across;
-    kind.down = sampling.down;
-    sources.push_back(Jpeg(sampling.says, kind));
-  }
+  sources.push_back(Jpeg("4:4:4", Sampled(1, 1)));
+  sources.push_back(Jpeg("4:2:2", Sampled(2, 1)));
+  sources.push_back(Jpeg("4:4:0", Sampled(1, 2)));
+  sources.push_back(Jpeg("4:1:1", Sampled(4, 1)));
 }
 
 void AddEncodings(std::vector<LikenessSource>& sources) {
-  JpegKind kind;
-  sources.push_back(Jpeg("4:2:0, no EXIF", kind));
-  kind.progressive = true;
-  sources.push_back(Jpeg("progressive", kind));
-  sources.push_back(LargeJpeg("progressive, 3 megapixels", kind, {2048, 1536}));
-  kind = {};
-  kind.arithmetic = true;
-  sources.push_back(Jpeg("arithmetic coding", kind));
-  kind.progressive = true;
-  sources.push_back(Jpeg("arithmetic coding, progressive", kind));
-  kind = {};
-  kind.restartRows = 1;
-  sources.push_back(Jpeg("restart markers", kind));
-  kind = {};
-  kind.dotsPerInch = 300;
-  sources.push_back(Jpeg("300 dots per inch", kind));
+  const JpegKind progressive = Kind([](JpegKind& kind) { kind.progressive = true; });
+  JpegKind arithmetic = Kind([](JpegKind& kind) { kind.arithmetic = true; });
+  sources.push_back(Jpeg("4:2:0, no EXIF", {}));
+  sources.push_back(Jpeg("progressive", progressive));
+  sources.push_back(LargeJpeg("progressive, 3 megapixels", progressive, {2048, 1536}));
+  sources.push_back(Jpeg("arithmetic coding", arithmetic));
+  arithmetic.progressive = true;
+  sources.push_back(Jpeg("arithmetic coding, progressive", arithmetic));
+  sources.push_back(Jpeg("restart markers", Kind([](JpegKind& kind) { kind.restartRows = 1; })));
+  sources.push_back(
+      Jpeg("300 dots per inch", Kind([](JpegKind& kind) { kind.dotsPerInch = 300; })));
   for (const int quality : {5, 100}) {
-    kind = {};
-    kind.quality = quality;
-    sources.push_back(Jpeg("quality " + std::to_string(quality), kind));
+    sources.push_back(Jpeg("quality " + std::to_string(quality),
+                           Kind([&](JpegKind& kind) { kind.quality = quality; })));
   }
 }
 
 void AddColours(std::vector<LikenessSource>& sources) {
-  JpegKind kind;
-  LikenessSource dithered = Jpeg("dithered colours", kind);
+  const JpegKind grey = Kind([](JpegKind& kind) { kind.colours = JpegColours::kGrey; });
+  JpegKind rgb = Sampled(1, 1);
+  rgb.colours = JpegColours::kRgb;
+  LikenessSource dithered = Jpeg("dithered colours", {});
   dithered.make = Written({"-dither", "FloydSteinberg", "-posterize", "2", "-quality", "92"});
   sources.push_back(dithered);
-  kind.profile = WideRgbProfile();
-  sources.push_back(Jpeg("wide RGB profile", kind));
-  kind.profile = DisplayRgbProfile();
-  sources.push_back(Jpeg("display RGB profile", kind));
-  kind = {};
-  kind.colours = JpegColours::kRgb;
-  kind.across = 1;
-  kind.down = 1;
-  sources.push_back(Jpeg("RGB components", kind));
-  kind = {};
-  kind.colours = JpegColours::kGrey;
-  sources.push_back(Jpeg("grey", kind));
-  kind.profile = GreyProfile();
-  sources.push_back(Jpeg("grey, grey profile", kind));
+  sources.push_back(Jpeg("wide RGB profile", WithProfile({}, WideRgbProfile())));
+  sources.push_back(Jpeg("display RGB profile", WithProfile({}, DisplayRgbProfile())));
+  sources.push_back(Jpeg("RGB components", rgb));
+  sources.push_back(Jpeg("grey", grey));
+  sources.push_back(Jpeg("grey, grey profile", WithProfile(grey, GreyProfile())));
 }
 
 void AddInks(std::vector<LikenessSource>& sources) {
-  JpegKind kind;
-  kind.colours = JpegColours::kInks;
-  kind.across = 1;
-  kind.down = 1;
-  sources.push_back(Jpeg("CMYK", kind));
-  kind.profile = InkProfile();
-  sources.push_back(Jpeg("CMYK, ink profile", kind));
-  kind.profile.clear();
-  kind.editorMarker = false;
-  sources.push_back(Jpeg("CMYK, no marker", kind));
-  kind = {};
-  kind.colours = JpegColours::kLumaChromaInk;
-  sources.push_back(Jpeg("YCCK", kind));
-  kind.profile = InkProfile();
-  kind.orientation = 6;
-  sources.push_back(Jpeg("YCCK, ink profile, orientation 6", kind));
+  JpegKind inks = Sampled(1, 1);
+  inks.colours = JpegColours::kCmyk;
+  sources.push_back(Jpeg("CMYK", inks));
+  sources.push_back(Jpeg("CMYK, ink profile", WithProfile(inks, InkProfile())));
+  inks.editorMarker = false;
+  sources.push_back(Jpeg("CMYK, no marker", inks));
+  JpegKind ycck = Kind([](JpegKind& kind) { kind.colours = JpegColours::kLumaChromaInk; });
+  sources.push_back(Jpeg("YCCK", ycck));
+  ycck.orientation = 6;
+  sources.push_back(Jpeg("YCCK, ink profile, orientation 6", WithProfile(ycck, InkProfile())));
 }
 
 void AddSizes(std::vector<LikenessSource>& sources) {

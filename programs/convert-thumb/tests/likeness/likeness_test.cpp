@@ -1,5 +1,5 @@
-// The converter's pictures beside ImageMagick's: inputs of every kind, with all the sets of
-// arguments that velathumb gives. The results are kept for the table in docs/.
+// The converter's pictures compared with ImageMagick's: inputs of every kind, with all the sets of
+// arguments that velathumb passes. The results are stored for the table in docs/.
 
 #include <gtest/gtest.h>
 
@@ -88,7 +88,7 @@ class Likeness : public ConverterTest, public ::testing::WithParamInterface<Like
   static void ExpectVerdict(const Runs& runs, const KnownDifference& known) {
     const bool oursFails = runs.ourExit != 0;
     const bool theirsFails = runs.theirExit != 0;
-    // A difference that is gone has to leave the list.
+    // A difference that no longer exists has to be removed from the list.
     EXPECT_EQ(!oursFails && theirsFails, known.kind == LikenessException::kSucceeds)
         << runs.messages;
     EXPECT_EQ(oursFails && !theirsFails, known.kind == LikenessException::kFails) << runs.messages;

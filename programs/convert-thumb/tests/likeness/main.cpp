@@ -12,7 +12,7 @@
 namespace {
 
 /// Listing tests, which the build does, needs no sandbox.
-bool OnlyTells(int argc, char** argv) {
+bool OnlyListsTests(int argc, char** argv) {
   for (int i = 1; i < argc; ++i) {
     if (std::string(argv[i]).compare(0, 18, "--gtest_list_tests") == 0) {
       return true;
@@ -31,7 +31,7 @@ std::string MadeResultsDirectory() {
 }  // namespace
 
 int main(int argc, char** argv) {
-  if (!OnlyTells(argc, argv)) {
+  if (!OnlyListsTests(argc, argv)) {
     vela_test::EnterSandbox(MadeResultsDirectory());
   }
   ::testing::InitGoogleMock(&argc, argv);

@@ -17,8 +17,7 @@ struct PhotoSize {
   int height = 480;
 };
 
-/// The photo as ImageMagick writes it with these options, in the format that the file's extension
-/// stands for.
+/// The photo as ImageMagick writes it with these options, in the format of the file's extension.
 FileMaker Written(std::vector<std::string> options, PhotoSize size = {});
 
 /// The same with an alpha channel.

@@ -1,4 +1,4 @@
-// A thumbnail as a viewer sees it, and how alike two are.
+// A decoded thumbnail, and how similar two of them are.
 #pragma once
 
 #include <cstdint>
@@ -22,15 +22,15 @@ struct OutputPicture {
 /// Reads a JPEG; empty unless it is whole.
 std::optional<OutputPicture> ReadOutputPicture(const std::string& path);
 
-/// Two pictures with the same pixels are this much alike, decibels.
+/// The likeness of two pictures with the same pixels, decibels.
 constexpr double kSamePixels = 99;
 
 /// Peak signal-to-noise ratio of two pictures of the same size and number of components, decibels;
 /// never more than kSamePixels.
 double Decibels(const OutputPicture& one, const OutputPicture& other);
 
-/// Names what differs beside the pixels, such as "sampling 2x2,1x1,1x1 for 1x1,1x1,1x1; "; empty
-/// when nothing does.
+/// Names what differs apart from the pixels, such as "sampling 2x2,1x1,1x1 for 1x1,1x1,1x1; ";
+/// empty when nothing does.
 std::string Differences(const OutputPicture& ours, const OutputPicture& theirs);
 
 }  // namespace vela_test

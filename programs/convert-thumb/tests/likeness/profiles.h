@@ -1,4 +1,4 @@
-// Colour profiles as cameras, monitors and presses have them.
+// Colour profiles of cameras, monitors and presses.
 #pragma once
 
 #include <string>

@@ -1,4 +1,4 @@
-// What came of one comparison, and its line for the table of results.
+// The result of one comparison, and its line for the table of results.
 #pragma once
 
 #include <string>
@@ -18,7 +18,7 @@ struct LikenessResult {
   std::string theirSize;
   double decibels = 0;      ///< meaningful for two pictures of one size
   std::string differences;  ///< beside the pixels
-  std::string remark;       ///< why a difference is all right
+  std::string remark;       ///< why a difference is acceptable
 };
 
 /// Whether there are two pictures that can be compared.
@@ -27,9 +27,8 @@ bool HasLikeness(const LikenessResult& result);
 /// Where the results are kept, as the machine sees it.
 std::string ResultsDirectory();
 
-/// Replaces what is kept of an input's results by these, one line each with tabs between the
-/// fields. Nothing is kept where the directory cannot be written, which does not concern the
-/// comparison.
+/// Replaces the stored results of an input by these, one line each with tabs between the fields.
+/// Nothing is stored when the directory cannot be written; the comparison goes on.
 void KeepResults(const std::string& testName, const std::vector<LikenessResult>& results);
 
 }  // namespace vela_test

@@ -10,7 +10,7 @@ namespace vela_test {
 
 /// One input and what is to be made of it.
 struct LikenessSource {
-  std::string format;     ///< as a reader calls it
+  std::string format;     ///< as people call it
   std::string says;       ///< what is special about it; unique within the format
   std::string extension;  ///< of its file
   /// Makes the file.
@@ -19,7 +19,7 @@ struct LikenessSource {
   std::vector<std::string> vectors;
   /// Thumbnails of the usual sizes; otherwise of sizes for the small pictures most inputs are.
   bool isLarge = false;
-  /// Whether "[0]" stands behind its name.
+  /// Whether "[0]" is appended to its name.
   bool firstPage = false;
 };
 
@@ -33,8 +33,8 @@ std::vector<LikenessSource> JpegSources();
 std::vector<LikenessSource> PngSources();
 std::vector<LikenessSource> TiffSources();
 std::vector<LikenessSource> AnimationSources();   ///< GIF and WebP
-std::vector<LikenessSource> OtherSources();       ///< what is left
+std::vector<LikenessSource> OtherSources();       ///< all other formats
 std::vector<LikenessSource> DamagedSources();     ///< of every format
-std::vector<LikenessSource> CameraFileSources();  ///< of the folder with real ones; may be empty
+std::vector<LikenessSource> CameraFileSources();  ///< from a folder with real ones; may be empty
 
 }  // namespace vela_test

@@ -1,5 +1,5 @@
-// video_probe FILE...: the results of the questions about videos, one line for each file, in a
-// process that has not asked before.
+// video_probe FILE...: the results of the queries about videos, one line for each file, in a
+// process that has not loaded the video library yet.
 #include <iostream>
 
 #include "platform/velaindex.h"
