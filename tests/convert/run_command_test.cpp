@@ -3,7 +3,7 @@
 #include <iterator>
 
 #include "convert/convert_fixture.h"
-#include "named_case.h"
+#include "support/named_case.h"
 
 using namespace vela;
 

@@ -5,10 +5,10 @@
 #include <set>
 
 #include "convert/convert_command.h"
-#include "quiet_test.h"
 #include "support/files.h"
 #include "support/mounts.h"
 #include "support/privileges.h"
+#include "support/quiet_test.h"
 
 using namespace vela;
 

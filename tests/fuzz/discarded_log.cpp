@@ -1,5 +1,5 @@
-// Stands for the system log, which a million damaged files would flood. Messages are still put
-// together, so that an argument that cannot be read is found.
+// Replaces the system log, which a million damaged files would flood. Messages are still formatted,
+// so that the sanitizers find invalid arguments.
 
 #include <syslog.h>
 

@@ -1,4 +1,4 @@
-// A photo on its whole way to thumbnails.
+// The whole conversion of a photo to thumbnails.
 
 #include <fcntl.h>
 
@@ -17,9 +17,9 @@ using namespace vela;
 
 namespace {
 
-/// Small enough for what is left to be told from a leak.
+/// Small enough to distinguish memory still in use from a leak.
 constexpr size_t kMemoryLimit = size_t{32} << 20;
-/// Larger pictures take too long to look at many.
+/// Larger pictures take too long for many runs.
 constexpr int64_t kMostPixels = 1000000;
 
 Step MakeStep(Step::Kind kind, int quarterTurns = 0) {
@@ -72,7 +72,7 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
   ConversionPlan plan;
   plan.source = input.Path();
   plan.firstPageOnly = true;
-  // What is turned is made of whole pictures, what is not while it is decoded.
+  // Turned thumbnails are made from whole pictures, others row by row while decoding.
   const int quarterTurns = static_cast<int>(size % 2);
   plan.outputs = {MakeOutput(first.Path(), {100, 80, false}, quarterTurns),
                   MakeOutput(second.Path(), {20, 20, true}, quarterTurns)};

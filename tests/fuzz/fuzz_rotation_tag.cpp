@@ -22,8 +22,8 @@ int ReadRotation() {
 
 }  // namespace
 
-/// The tool is asked for upright previews only: a preview that is not taken for one would leave
-/// nothing to test.
+/// The tool runs for upright previews only: if this preview were not recognised as one, nothing
+/// would be tested.
 extern "C" int LLVMFuzzerInitialize(int* /*count*/, char*** /*arguments*/) {
   SetToolOutput("Rotation: 90\n");
   if (ReadRotation() != 90) {

@@ -5,7 +5,7 @@
 #include <cstdint>
 #include <string>
 
-/// A file in memory that holds the input, for as long as the object lives.
+/// A file in memory that holds the input as long as the object exists.
 class InputFile {
  public:
   InputFile(const uint8_t* data, size_t size);

@@ -1,4 +1,4 @@
-// Stands for the platform's piped children: every tool that is started prints the same output.
+// Replaces the platform's piped children: every tool that is started prints the same output.
 #pragma once
 
 #include <cstddef>

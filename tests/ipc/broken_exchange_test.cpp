@@ -8,9 +8,9 @@
 #include <cstring>
 
 #include "ipc/client_operations.h"
-#include "quiet_test.h"
 #include "support/daemon_peer.h"
 #include "support/files.h"
+#include "support/quiet_test.h"
 
 namespace vela_test {
 namespace {

@@ -10,7 +10,7 @@
 
 #include "ipc/velamk_ipc.h"
 #include "platform/velaindex.h"
-#include "quiet_test.h"
+#include "support/quiet_test.h"
 
 namespace vela_test {
 

@@ -1,20 +1,11 @@
 // Status and times of files, free space of volumes.
 #include <fcntl.h>
-#include <sys/stat.h>
-#include <unistd.h>
 
-#include <cerrno>
-#include <string>
-
-#include "platform/vlibc.h"
-#include "support/files.h"
+#include "platform/platform_fixture.h"
 #include "support/mounts.h"
-#include "support/sandbox.h"
 
+namespace vela_test {
 namespace {
-
-using vela_test::FileTime;
-using vela_test::WriteFile;
 
 constexpr const char* kFile = "/tmp/file";
 
@@ -22,9 +13,9 @@ FileTime Of(const VLIBCTime& time) {
   return {time.seconds, time.nanoseconds};
 }
 
-class FileStatusTest : public vela_test::SandboxTest {};
+class FileStatusTest : public SandboxTest {};
 
-TEST_F(FileStatusTest, TellsTypeModeSizeAndBlocks) {
+TEST_F(FileStatusTest, HasTypeModeSizeAndBlocks) {
   WriteFile(kFile, std::string(5000, 'x'));
   ASSERT_EQ(chmod(kFile, 04751), 0);
   struct stat expected;
@@ -37,7 +28,7 @@ TEST_F(FileStatusTest, TellsTypeModeSizeAndBlocks) {
   EXPECT_GT(status.blocks, 0);
 }
 
-TEST_F(FileStatusTest, TellsTheThreeTimesInTheirOrder) {
+TEST_F(FileStatusTest, HasTheThreeTimesInTheirOrder) {
   WriteFile(kFile, "x");
   const timespec times[2] = {{1000000001, 11}, {1000000002, 222222222}};
   ASSERT_EQ(utimensat(AT_FDCWD, kFile, times, 0), 0);
@@ -59,7 +50,7 @@ TEST_F(FileStatusTest, FollowsLinks) {
   EXPECT_EQ(status.size, 5);
 }
 
-TEST_F(FileStatusTest, FailsForWhatIsNotThere) {
+TEST_F(FileStatusTest, FailsForAMissingFile) {
   VLIBCFileStatus status;
   EXPECT_EQ(VLIBCFileStat("/tmp/absent", 9, &status), -1);
   EXPECT_EQ(VLIBCErrGet(), ENOENT);
@@ -68,31 +59,38 @@ TEST_F(FileStatusTest, FailsForWhatIsNotThere) {
   EXPECT_EQ(VLIBCFileStat("/tmp", 9, nullptr), -1);
 }
 
-class FileTimes : public vela_test::SandboxTest {
+class FileTimes : public SandboxTest {
  protected:
   void SetUp() override {
     SandboxTest::SetUp();
     WriteFile(kFile, "x");
-    vela_test::SetFileTime(kFile, 1000, 10);
+    SetFileTime(kFile, 1000, 10);
   }
 };
 
 constexpr VLIBCFileTimes kTimes = {{2000000000, 1}, {2100000000, 999999999}, {5, 5}};
 
-TEST_F(FileTimes, SetsBothTimesToTheNanosecond) {
-  EXPECT_EQ(VLIBCFileUTime(kFile, 3, &kTimes), 0);
-  EXPECT_EQ(vela_test::AccessTime(kFile), (FileTime{2000000000, 1}));
-  EXPECT_EQ(vela_test::ModificationTime(kFile), (FileTime{2100000000, 999999999}));
-}
-
-TEST_F(FileTimes, SetsOnlyWhatTheOptionsSelect) {
-  EXPECT_EQ(VLIBCFileUTime(kFile, 1, &kTimes), 0);
-  EXPECT_EQ(vela_test::AccessTime(kFile), (FileTime{2000000000, 1}));
-  EXPECT_EQ(vela_test::ModificationTime(kFile), (FileTime{1000, 10}));
-  vela_test::SetFileTime(kFile, 1000, 10);
-  EXPECT_EQ(VLIBCFileUTime(kFile, 2, &kTimes), 0);
-  EXPECT_EQ(vela_test::AccessTime(kFile), (FileTime{1000, 10}));
-  EXPECT_EQ(vela_test::ModificationTime(kFile), (FileTime{2100000000, 999999999}));
+TEST_F(FileTimes, AreSetToTheNanosecondAsTheOptionsSelect) {
+  const struct {
+    const char* name;
+    int options;
+    VLIBCFileTimes times;
+    FileTime access;
+    FileTime modification;
+  } cases[] = {
+      {"both", 3, kTimes, {2000000000, 1}, {2100000000, 999999999}},
+      {"access time only", 1, kTimes, {2000000000, 1}, {1000, 10}},
+      {"modification time only", 2, kTimes, {1000, 10}, {2100000000, 999999999}},
+      {"before the epoch", 3, {{-100, 0}, {-200, 5}, {0, 0}}, {-100, 0}, {-200, 5}},
+      {"invalid times not selected", 2, {{5, -1}, {7, 8}, {0, -1}}, {1000, 10}, {7, 8}},
+  };
+  for (const auto& one : cases) {
+    SCOPED_TRACE(one.name);
+    SetFileTime(kFile, 1000, 10);
+    EXPECT_EQ(VLIBCFileUTime(kFile, one.options, &one.times), 0);
+    EXPECT_EQ(AccessTime(kFile), one.access);
+    EXPECT_EQ(ModificationTime(kFile), one.modification);
+  }
 }
 
 TEST_F(FileTimes, DoesNotSetTheThirdPair) {
@@ -105,13 +103,7 @@ TEST_F(FileTimes, DoesNotSetTheThirdPair) {
 TEST_F(FileTimes, FollowsLinks) {
   ASSERT_EQ(symlink(kFile, "/tmp/link"), 0);
   EXPECT_EQ(VLIBCFileUTime("/tmp/link", 3, &kTimes), 0);
-  EXPECT_EQ(vela_test::ModificationTime(kFile), (FileTime{2100000000, 999999999}));
-}
-
-TEST_F(FileTimes, TakesTimesBeforeTheEpoch) {
-  const VLIBCFileTimes early = {{-100, 0}, {-200, 5}, {0, 0}};
-  EXPECT_EQ(VLIBCFileUTime(kFile, 3, &early), 0);
-  EXPECT_EQ(vela_test::ModificationTime(kFile), (FileTime{-200, 5}));
+  EXPECT_EQ(ModificationTime(kFile), (FileTime{2100000000, 999999999}));
 }
 
 TEST_F(FileTimes, RefusesNanosecondsOutOfRange) {
@@ -122,30 +114,24 @@ TEST_F(FileTimes, RefusesNanosecondsOutOfRange) {
     EXPECT_EQ(VLIBCFileUTime(kFile, 3, &times), -1);
     EXPECT_EQ(VLIBCErrGet(), EINVAL);
   }
-  EXPECT_EQ(vela_test::ModificationTime(kFile), (FileTime{1000, 10}));
+  EXPECT_EQ(ModificationTime(kFile), (FileTime{1000, 10}));
 }
 
-TEST_F(FileTimes, DoesNotLookAtWhatItDoesNotSet) {
-  const VLIBCFileTimes times = {{5, -1}, {7, 8}, {0, -1}};
-  EXPECT_EQ(VLIBCFileUTime(kFile, 2, &times), 0);
-  EXPECT_EQ(vela_test::ModificationTime(kFile), (FileTime{7, 8}));
-}
-
-TEST_F(FileTimes, FailsForWhatIsNotThere) {
+TEST_F(FileTimes, FailsForAMissingFile) {
   EXPECT_EQ(VLIBCFileUTime("/tmp/absent", 3, &kTimes), -1);
   EXPECT_EQ(VLIBCErrGet(), ENOENT);
   EXPECT_EQ(VLIBCFileUTime(nullptr, 3, &kTimes), -1);
   EXPECT_EQ(VLIBCFileUTime(kFile, 3, nullptr), -1);
 }
 
-class FreeSpace : public vela_test::SandboxTest {};
+class FreeSpace : public SandboxTest {};
 
-TEST_F(FreeSpace, IsWhatAnOrdinaryUserHas) {
-  vela_test::SmallVolume volume("/tmp/volume", 16 << 20);
+TEST_F(FreeSpace, IsThatOfAnOrdinaryUser) {
+  SmallVolume volume("/tmp/volume", 16 << 20);
   WriteFile("/tmp/volume/file", std::string(100000, 'x'));
   EXPECT_EQ(VLIBGetFsAvailSize("/tmp/volume/file"), volume.Available());
   EXPECT_GT(volume.Available(), uint64_t{10} << 20);
-  const uint64_t wanted = vela_test::SmallVolume::PageSize() * 3;
+  const uint64_t wanted = SmallVolume::PageSize() * 3;
   volume.SetAvailable(wanted);
   EXPECT_EQ(VLIBGetFsAvailSize("/tmp/volume"), wanted);
   volume.SetAvailable(0);
@@ -153,15 +139,16 @@ TEST_F(FreeSpace, IsWhatAnOrdinaryUserHas) {
 }
 
 TEST_F(FreeSpace, CountsMoreThanFourGigabytes) {
-  vela_test::SmallVolume volume("/tmp/volume", uint64_t{40} << 30);
+  SmallVolume volume("/tmp/volume", uint64_t{40} << 30);
   EXPECT_EQ(VLIBGetFsAvailSize("/tmp/volume"), volume.Available());
   EXPECT_GT(VLIBGetFsAvailSize("/tmp/volume"), uint64_t{39} << 30);
 }
 
-TEST_F(FreeSpace, IsZeroWhenItCannotBeTold) {
+TEST_F(FreeSpace, IsZeroWhenUnknown) {
   EXPECT_EQ(VLIBGetFsAvailSize("/tmp/absent"), 0U);
   EXPECT_EQ(VLIBCErrGet(), ENOENT);
   EXPECT_EQ(VLIBGetFsAvailSize(nullptr), 0U);
 }
 
 }  // namespace
+}  // namespace vela_test

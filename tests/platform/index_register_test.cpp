@@ -1,31 +1,17 @@
 // Registering conversions in the index database.
 #include <json/value.h>
 #include <sqlite3.h>
-#include <sys/stat.h>
-#include <unistd.h>
 
 #include <algorithm>
-#include <cerrno>
-#include <chrono>
 #include <csignal>
 #include <cstdio>
 #include <cstring>
 #include <ctime>
-#include <functional>
-#include <memory>
-#include <string>
-#include <thread>
-#include <vector>
 
-#include "platform/forked_call.h"
-#include "platform/velaindex.h"
-#include "platform/vlibc.h"
-#include "support/files.h"
-#include "support/sandbox.h"
+#include "platform/platform_fixture.h"
 
+namespace vela_test {
 namespace {
-
-using vela_test::ModeOf;
 
 constexpr const char* kDirectory = "/var/lib/velaindex";
 constexpr const char* kDatabase = "/var/lib/velaindex/index.db";
@@ -48,14 +34,14 @@ int AddPath(const std::string& path, uint32_t width = 100) {
 }
 
 /// The rows of a query, each with its columns joined by '|'.
-std::vector<std::string> Query(const std::string& sql) {
+Strings Query(const std::string& sql) {
   sqlite3* database = nullptr;
   EXPECT_EQ(sqlite3_open_v2(kDatabase, &database, SQLITE_OPEN_READWRITE, nullptr), SQLITE_OK);
   sqlite3_busy_timeout(database, 10000);
   sqlite3_stmt* statement = nullptr;
   EXPECT_EQ(sqlite3_prepare_v2(database, sql.c_str(), -1, &statement, nullptr), SQLITE_OK)
       << sqlite3_errmsg(database);
-  std::vector<std::string> rows;
+  Strings rows;
   while (sqlite3_step(statement) == SQLITE_ROW) {
     std::string row;
     for (int column = 0; column < sqlite3_column_count(statement); ++column) {
@@ -71,26 +57,22 @@ std::vector<std::string> Query(const std::string& sql) {
   return rows;
 }
 
+/// The paths of all registered photos, sorted.
+Strings Photos() {
+  return Query("SELECT photo_path FROM conversion ORDER BY 1");
+}
+
 const char* const kAllButTime =
     "SELECT photo_path, photo_width, photo_height, thumbnail_path, thumbnail_width, "
     "thumbnail_height FROM conversion ORDER BY photo_path";
 
-class IndexRegister : public vela_test::SandboxTest {
+// Most tests make their calls in a process of their own: one that has registered something can no
+// longer do so in the copies of itself that other tests make.
+class IndexRegister : public SandboxTest {
  protected:
   void SetUp() override {
     SandboxTest::SetUp();
-    ASSERT_TRUE(vela_test::IsDirectory("/var/lib"));
-  }
-
-  /// Makes the calls in a process of its own: one that has registered something cannot go on doing
-  /// so in the copies of itself that other tests make.
-  static void InOwnProcess(const std::function<void()>& calls) {
-    const int result = platform_test::RunForked([&calls] {
-      calls();
-      fflush(stdout);
-      return HasFailure() ? 1 : 0;
-    });
-    EXPECT_EQ(result, 0);
+    ASSERT_TRUE(IsDirectory("/var/lib"));
   }
 };
 
@@ -98,9 +80,8 @@ TEST_F(IndexRegister, KeepsBothPathsAndResolutions) {
   InOwnProcess([] {
     EXPECT_EQ(
         Add(Media("/photo/a.jpg", 4000, 3000), Media("/photo/@eaDir/a.jpg/XL.jpg", 1280, 960)), 0);
-    EXPECT_EQ(
-        Query(kAllButTime),
-        std::vector<std::string>{"/photo/a.jpg|4000|3000|/photo/@eaDir/a.jpg/XL.jpg|1280|960"});
+    EXPECT_EQ(Query(kAllButTime),
+              Strings{"/photo/a.jpg|4000|3000|/photo/@eaDir/a.jpg/XL.jpg|1280|960"});
   });
 }
 
@@ -120,9 +101,8 @@ TEST_F(IndexRegister, ReplacesAnEarlierRegistration) {
     EXPECT_EQ(AddPath("/photo/a.jpg", 100), 0);
     EXPECT_EQ(AddPath("/photo/b.jpg", 200), 0);
     EXPECT_EQ(Add(Media("/photo/a.jpg", 7, 8), Media("/other", 9, 10)), 0);
-    EXPECT_EQ(Query(kAllButTime),
-              (std::vector<std::string>{"/photo/a.jpg|7|8|/other|9|10",
-                                        "/photo/b.jpg|200|50|/photo/b.jpg.thumb|10|5"}));
+    EXPECT_EQ(Query(kAllButTime), (Strings{"/photo/a.jpg|7|8|/other|9|10",
+                                           "/photo/b.jpg|200|50|/photo/b.jpg.thumb|10|5"}));
   });
 }
 
@@ -138,9 +118,9 @@ TEST_F(IndexRegister, MakesDirectoryAndFile) {
   });
 }
 
-TEST_F(IndexRegister, LeavesTheModesOfWhatIsThere) {
+TEST_F(IndexRegister, KeepsExistingModes) {
   InOwnProcess([] {
-    vela_test::WriteFile(kDatabase, "");
+    WriteFile(kDatabase, "");
     EXPECT_EQ(chmod(kDirectory, 0711), 0);
     EXPECT_EQ(chmod(kDatabase, 0604), 0);
     EXPECT_EQ(AddPath("/photo/a.jpg"), 0);
@@ -149,9 +129,9 @@ TEST_F(IndexRegister, LeavesTheModesOfWhatIsThere) {
   });
 }
 
-TEST_F(IndexRegister, MakesBothWithTheirModesWhateverTheMask) {
+TEST_F(IndexRegister, MakesBothWithTheirModesRegardlessOfTheMask) {
   InOwnProcess([] {
-    vela_test::RemoveTree(kDirectory);
+    RemoveTree(kDirectory);
     const mode_t mask = umask(077);
     EXPECT_EQ(AddPath("/photo/a.jpg"), 0);
     umask(mask);
@@ -163,8 +143,8 @@ TEST_F(IndexRegister, MakesBothWithTheirModesWhateverTheMask) {
 TEST_F(IndexRegister, UsesAWriteAheadLogAndMarksItsTables) {
   InOwnProcess([] {
     EXPECT_EQ(AddPath("/photo/a.jpg"), 0);
-    EXPECT_EQ(Query("PRAGMA journal_mode"), std::vector<std::string>{"wal"});
-    EXPECT_EQ(Query("PRAGMA user_version"), std::vector<std::string>{"1"});
+    EXPECT_EQ(Query("PRAGMA journal_mode"), Strings{"wal"});
+    EXPECT_EQ(Query("PRAGMA user_version"), Strings{"1"});
   });
 }
 
@@ -173,9 +153,9 @@ TEST_F(IndexRegister, KeepsEveryByteOfAPath) {
     std::string path = "/photo/";
     for (int byte = 1; byte < 256; ++byte) path += static_cast<char>(byte);
     EXPECT_EQ(AddPath(path), 0);
-    EXPECT_EQ(Query("SELECT photo_path FROM conversion"), std::vector<std::string>{path});
+    EXPECT_EQ(Photos(), Strings{path});
     EXPECT_EQ(Query("SELECT typeof(photo_path), typeof(thumbnail_path) FROM conversion"),
-              std::vector<std::string>{"blob|blob"});
+              Strings{"blob|blob"});
   });
 }
 
@@ -184,7 +164,7 @@ TEST_F(IndexRegister, TakesTheLongestPathAndTheLargestSizes) {
     const std::string path(4096, 'p');  // no room for a terminator
     EXPECT_EQ(Add(Media(path, 4294967295U, 4294967295U), Media("/t", 1, 1)), 0);
     EXPECT_EQ(Query("SELECT length(photo_path), photo_width, photo_height FROM conversion"),
-              std::vector<std::string>{"4096|4294967295|4294967295"});
+              Strings{"4096|4294967295|4294967295"});
   });
 }
 
@@ -202,59 +182,54 @@ TEST_F(IndexRegister, RefusesADatabaseOfANewerProgram) {
     Query("PRAGMA user_version = 2");
     EXPECT_EQ(AddPath("/photo/b.jpg"), -1);
     EXPECT_EQ(AddPath("/photo/c.jpg"), -1);
-    EXPECT_EQ(Query("SELECT photo_path FROM conversion"), std::vector<std::string>{"/photo/a.jpg"});
-    EXPECT_EQ(Query("PRAGMA user_version"), std::vector<std::string>{"2"});
+    EXPECT_EQ(Photos(), Strings{"/photo/a.jpg"});
+    EXPECT_EQ(Query("PRAGMA user_version"), Strings{"2"});
     Query("PRAGMA user_version = 1");
     EXPECT_EQ(AddPath("/photo/b.jpg"), 0);
   });
 }
 
 TEST_F(IndexRegister, KeepsWhatEarlierProgramsRegistered) {
-  EXPECT_EQ(platform_test::RunForked([] { return AddPath("/photo/a.jpg") == 0 ? 0 : 1; }), 0);
-  EXPECT_EQ(platform_test::RunForked([] { return AddPath("/photo/b.jpg") == 0 ? 0 : 1; }), 0);
-  EXPECT_EQ(Query("SELECT photo_path FROM conversion ORDER BY 1"),
-            (std::vector<std::string>{"/photo/a.jpg", "/photo/b.jpg"}));
+  for (const char* path : {"/photo/a.jpg", "/photo/b.jpg"}) {
+    EXPECT_EQ(RunForked([path] { return AddPath(path); }), 0);
+  }
+  EXPECT_EQ(Photos(), (Strings{"/photo/a.jpg", "/photo/b.jpg"}));
 }
 
 TEST_F(IndexRegister, KeepsWhatAKilledProgramRegistered) {
   for (int round = 0; round < 10; ++round) {
-    vela_test::RemoveTree("/tmp/first");
-    const pid_t pid = platform_test::Fork([round] {
+    RemoveTree("/tmp/first");
+    const std::string directory = "/photo/" + std::to_string(round) + "/";
+    const pid_t pid = Fork([&directory] {
       for (int i = 0;; ++i) {
-        AddPath("/photo/" + std::to_string(round) + "/" + std::to_string(i));
-        if (i == 0) vela_test::WriteFile("/tmp/first", "");
+        AddPath(directory + std::to_string(i));
+        if (i == 0) WriteFile("/tmp/first", "");
       }
       return 0;
     });
-    EXPECT_TRUE(vela_test::WaitUntilExists("/tmp/first"));
+    EXPECT_TRUE(WaitUntilExists("/tmp/first"));
     usleep(static_cast<useconds_t>(round * 1000));
     kill(pid, SIGKILL);
-    platform_test::Join(pid);
-    ASSERT_EQ(Query("SELECT count(*) FROM conversion WHERE photo_path = CAST('/photo/" +
-                    std::to_string(round) + "/0' AS BLOB)"),
-              std::vector<std::string>{"1"});
+    Join(pid);
+    ASSERT_EQ(Query("SELECT count(*) FROM conversion WHERE photo_path = CAST('" + directory +
+                    "0' AS BLOB)"),
+              Strings{"1"});
   }
-  EXPECT_EQ(Query("PRAGMA integrity_check"), std::vector<std::string>{"ok"});
+  EXPECT_EQ(Query("PRAGMA integrity_check"), Strings{"ok"});
 }
 
-TEST_F(IndexRegister, NoticesARemovedDatabase) {
-  InOwnProcess([] {
-    EXPECT_EQ(AddPath("/photo/a.jpg"), 0);
-    for (const char* suffix : {"", "-wal", "-shm"}) {
-      vela_test::RemoveTree(std::string(kDatabase) + suffix);
-    }
-    EXPECT_EQ(AddPath("/photo/b.jpg"), 0);
-    EXPECT_EQ(Query("SELECT photo_path FROM conversion"), std::vector<std::string>{"/photo/b.jpg"});
-  });
-}
-
-TEST_F(IndexRegister, NoticesARemovedDirectory) {
-  InOwnProcess([] {
-    EXPECT_EQ(AddPath("/photo/a.jpg"), 0);
-    vela_test::RemoveTree(kDirectory);
-    EXPECT_EQ(AddPath("/photo/b.jpg"), 0);
-    EXPECT_EQ(Query("SELECT photo_path FROM conversion"), std::vector<std::string>{"/photo/b.jpg"});
-  });
+TEST_F(IndexRegister, NoticesARemovedDatabaseOrDirectory) {
+  const std::string database = kDatabase;
+  for (const Strings& removed :
+       {Strings{database, database + "-wal", database + "-shm"}, Strings{kDirectory}}) {
+    InOwnProcess([&removed] {
+      EXPECT_EQ(AddPath("/photo/a.jpg"), 0);
+      for (const std::string& path : removed) RemoveTree(path);
+      EXPECT_EQ(AddPath("/photo/b.jpg"), 0);
+      EXPECT_EQ(Photos(), Strings{"/photo/b.jpg"});
+    });
+    RemoveTree(kDirectory);
+  }
 }
 
 TEST_F(IndexRegister, NoticesAReplacedDatabase) {
@@ -262,7 +237,7 @@ TEST_F(IndexRegister, NoticesAReplacedDatabase) {
     EXPECT_EQ(AddPath("/photo/a.jpg"), 0);
     ASSERT_EQ(rename(kDirectory, "/var/lib/velaindex.old"), 0);
     // The new one is made and filled by another program before the next call here.
-    EXPECT_EQ(platform_test::RunForked([] {
+    EXPECT_EQ(RunForked([] {
                 sqlite3* database = nullptr;
                 if (mkdir(kDirectory, 0755) != 0) return 1;
                 if (sqlite3_open(kDatabase, &database) != SQLITE_OK) return 2;
@@ -271,30 +246,30 @@ TEST_F(IndexRegister, NoticesAReplacedDatabase) {
               }),
               0);
     EXPECT_EQ(AddPath("/photo/b.jpg"), 0);
-    EXPECT_EQ(Query("SELECT photo_path FROM conversion"), std::vector<std::string>{"/photo/b.jpg"});
-    EXPECT_EQ(Query("SELECT count(*) FROM other"), std::vector<std::string>{"0"});
-    vela_test::RemoveTree("/var/lib/velaindex.old");
+    EXPECT_EQ(Photos(), Strings{"/photo/b.jpg"});
+    EXPECT_EQ(Query("SELECT count(*) FROM other"), Strings{"0"});
+    RemoveTree("/var/lib/velaindex.old");
   });
 }
 
 TEST_F(IndexRegister, FailsWhereNoDatabaseCanBe) {
   InOwnProcess([] {
-    vela_test::RemoveTree(kDirectory);
-    vela_test::WriteFile(kDirectory, "a file");
+    RemoveTree(kDirectory);
+    WriteFile(kDirectory, "a file");
     EXPECT_EQ(AddPath("/photo/a.jpg"), -1);
-    vela_test::RemoveTree(kDirectory);
-    vela_test::MakeDirectories(kDatabase);
+    RemoveTree(kDirectory);
+    MakeDirectories(kDatabase);
     EXPECT_EQ(AddPath("/photo/a.jpg"), -1);
-    vela_test::RemoveTree(kDirectory);
-    EXPECT_EQ(AddPath("/photo/a.jpg"), 0) << "the failures before count no more";
+    RemoveTree(kDirectory);
+    EXPECT_EQ(AddPath("/photo/a.jpg"), 0) << "remembers the failures before";
   });
 }
 
 TEST_F(IndexRegister, FailsForAFileThatIsNoDatabase) {
   InOwnProcess([] {
-    vela_test::WriteFile(kDatabase, std::string(8192, 'x'));
+    WriteFile(kDatabase, std::string(8192, 'x'));
     EXPECT_EQ(AddPath("/photo/a.jpg"), -1);
-    EXPECT_EQ(vela_test::ReadFile(kDatabase), std::string(8192, 'x'));
+    EXPECT_EQ(ReadFile(kDatabase), std::string(8192, 'x'));
   });
 }
 
@@ -331,21 +306,19 @@ TEST_F(IndexRegister, WaitsTwoSecondsAtMost) {
   InOwnProcess([] {
     EXPECT_EQ(AddPath("/photo/a.jpg"), 0);
     Writer writer;
-    const auto start = std::chrono::steady_clock::now();
+    const Stopwatch watch;
     EXPECT_EQ(AddPath("/photo/b.jpg"), -1);
     EXPECT_EQ(VLIBCErrGet(), EBUSY);
-    const std::chrono::duration<double> seconds = std::chrono::steady_clock::now() - start;
-    EXPECT_GE(seconds.count(), 1.5);
-    EXPECT_LT(seconds.count(), 6.0);
+    watch.ExpectBetween(1.5, 6.0);
   });
 }
 
 TEST_F(IndexRegister, CanBeUsedByManyProgramsFromTheFirstMomentOn) {
   for (int round = 0; round < 5; ++round) {
-    vela_test::RemoveTree(kDirectory);
+    RemoveTree(kDirectory);
     std::vector<pid_t> programs;
     for (int program = 0; program < 6; ++program) {
-      programs.push_back(platform_test::Fork([program] {
+      programs.push_back(Fork([program] {
         for (int i = 0; i < 20; ++i) {
           const std::string path = "/p/" + std::to_string(program) + "/" + std::to_string(i);
           if (AddPath(path) != 0) return VLIBCErrGet();
@@ -353,30 +326,26 @@ TEST_F(IndexRegister, CanBeUsedByManyProgramsFromTheFirstMomentOn) {
         return 0;
       }));
     }
-    for (const pid_t program : programs) ASSERT_EQ(platform_test::Join(program), 0);
-    ASSERT_EQ(Query("SELECT count(*) FROM conversion"), std::vector<std::string>{"120"});
+    for (const pid_t program : programs) ASSERT_EQ(Join(program), 0);
+    ASSERT_EQ(Query("SELECT count(*) FROM conversion"), Strings{"120"});
   }
 }
 
 TEST_F(IndexRegister, CanBeUsedByThreadsAtOnce) {
   InOwnProcess([] {
-    std::vector<std::thread> threads;
-    for (int thread = 0; thread < 4; ++thread) {
-      threads.emplace_back([thread] {
-        for (int i = 0; i < 25; ++i) {
-          EXPECT_EQ(AddPath("/t/" + std::to_string(thread) + "/" + std::to_string(i)), 0);
-        }
-      });
-    }
-    for (std::thread& thread : threads) thread.join();
-    EXPECT_EQ(Query("SELECT count(*) FROM conversion"), std::vector<std::string>{"100"});
+    RunInThreads(4, [](int thread) {
+      for (int i = 0; i < 25; ++i) {
+        EXPECT_EQ(AddPath("/t/" + std::to_string(thread) + "/" + std::to_string(i)), 0);
+      }
+    });
+    EXPECT_EQ(Query("SELECT count(*) FROM conversion"), Strings{"100"});
   });
 }
 
-TEST_F(IndexRegister, RefusesToBeCarriedAcrossAFork) {
+TEST_F(IndexRegister, RefusesUseAcrossAFork) {
   InOwnProcess([] {
     EXPECT_EQ(AddPath("/photo/a.jpg"), 0);
-    EXPECT_EQ(platform_test::RunForked([] { return AddPath("/photo/b.jpg") == -1 ? 0 : 1; }), 0);
+    EXPECT_EQ(RunForked([] { return AddPath("/photo/b.jpg") == -1 ? 0 : 1; }), 0);
     EXPECT_EQ(AddPath("/photo/c.jpg"), 0);
   });
 }
@@ -385,13 +354,13 @@ TEST_F(IndexRegister, KeepsItsDescriptorsFromOtherPrograms) {
   InOwnProcess([] {
     EXPECT_EQ(AddPath("/photo/a.jpg"), 0);
     int open = 0;
-    for (const std::string& number : vela_test::ListDirectory("/proc/self/fd")) {
+    for (const std::string& number : ListDirectory("/proc/self/fd")) {
       char target[4096] = "";
       const std::string path = "/proc/self/fd/" + number;
       if (readlink(path.c_str(), target, sizeof(target) - 1) < 0) continue;
       if (std::string(target).find(kDirectory) != 0) continue;
       ++open;
-      const std::string info = vela_test::ReadFile("/proc/self/fdinfo/" + number);
+      const std::string info = ReadFile("/proc/self/fdinfo/" + number);
       const size_t flags = info.find("flags:\t");
       ASSERT_NE(flags, std::string::npos);
       EXPECT_NE(std::stoul(info.substr(flags + 7), nullptr, 8) & 02000000U, 0U) << target;
@@ -401,3 +370,4 @@ TEST_F(IndexRegister, KeepsItsDescriptorsFromOtherPrograms) {
 }
 
 }  // namespace
+}  // namespace vela_test

@@ -1,26 +1,15 @@
-// Searching a large file for many lines: it is read once, and never taken for what it was before.
+// Searching a large file for many lines: it is read once, and every change is noticed.
 #include <fcntl.h>
-#include <sys/stat.h>
-#include <unistd.h>
 
-#include <cerrno>
-#include <chrono>
+#include <atomic>
 #include <cstdio>
-#include <string>
-#include <thread>
-#include <vector>
 
-#include "platform/forked_call.h"
-#include "platform/vlibc.h"
+#include "platform/platform_fixture.h"
 #include "support/descriptor.h"
-#include "support/files.h"
 #include "support/privileges.h"
-#include "support/sandbox.h"
 
+namespace vela_test {
 namespace {
-
-using vela_test::AppendToFile;
-using vela_test::WriteFile;
 
 constexpr const char* kFile = "/var/spool/queue";
 
@@ -50,12 +39,12 @@ std::string Lines(int count) {
 /// Bytes that this process has read from files so far.
 long long BytesRead() {
   long long bytes = -1;
-  std::sscanf(vela_test::ReadFile("/proc/self/io").c_str(), "rchar: %lld", &bytes);
+  std::sscanf(ReadFile("/proc/self/io").c_str(), "rchar: %lld", &bytes);
   return bytes;
 }
 
-/// Lets the file become old enough to be known again by its times.
-void Rest() {
+/// Lets the file become old enough to be recognised by its times.
+void LetAge() {
   std::this_thread::sleep_for(std::chrono::milliseconds(200));
 }
 
@@ -68,13 +57,13 @@ void ChangeInPlace(off_t offset, const std::string& bytes) {
 constexpr int kLineCount = 20000;
 constexpr int kLineSize = 16;  // "/photo/00000000" and the newline
 
-/// A file that is large and at rest and has been searched already.
-class LargeFile : public vela_test::SandboxTest {
+/// A large file that has not changed for a while and has been searched before.
+class LargeFile : public SandboxTest {
  protected:
   void SetUp() override {
     SandboxTest::SetUp();
     WriteFile(kFile, Lines(kLineCount));
-    Rest();
+    LetAge();
     ASSERT_TRUE(Has(Line(0)));
     ASSERT_FALSE(Has(Line(kLineCount)));
   }
@@ -82,7 +71,7 @@ class LargeFile : public vela_test::SandboxTest {
 
 TEST_F(LargeFile, IsReadOnceForManySearches) {
   WriteFile(kFile, Lines(kLineCount));
-  Rest();
+  LetAge();
   const long long before = BytesRead();
   for (int i = 0; i < kLineCount; i += 20) {
     ASSERT_TRUE(Has(Line(i)));
@@ -94,14 +83,12 @@ TEST_F(LargeFile, IsReadOnceForManySearches) {
 }
 
 TEST_F(LargeFile, FindsWholeLinesOnly) {
-  EXPECT_TRUE(Has("/photo/00000000"));
-  EXPECT_TRUE(Has("/photo/00019999"));
-  EXPECT_FALSE(Has("/photo/0000000"));
-  EXPECT_FALSE(Has("photo/00000000"));
-  EXPECT_FALSE(Has("/photo/000000000"));
-  EXPECT_FALSE(Has("/photo/00000000\n"));
-  EXPECT_FALSE(Has("/photo/00000000\n/photo/00000001"));
-  EXPECT_FALSE(Has("/PHOTO/00000000"));
+  for (const char* line : {"/photo/00000000", "/photo/00019999"}) EXPECT_TRUE(Has(line)) << line;
+  for (const char* other :
+       {"/photo/0000000", "photo/00000000", "/photo/000000000", "/PHOTO/00000000",
+        "/photo/00000000\n", "/photo/00000000\n/photo/00000001"}) {
+    EXPECT_FALSE(Has(other)) << other;
+  }
   EXPECT_EQ(Find(""), 0);
 }
 
@@ -115,9 +102,9 @@ TEST_F(LargeFile, CopiesTheLineAndReturnsItsLength) {
 
 TEST_F(LargeFile, FindsALastLineWithoutNewline) {
   AppendToFile(kFile, "last");
-  Rest();
+  LetAge();
   EXPECT_TRUE(Has("last"));
-  EXPECT_TRUE(Has("last"));
+  EXPECT_TRUE(Has("last")) << "the second time";
   EXPECT_FALSE(Has("las"));
   EXPECT_FALSE(Has("lastx"));
 }
@@ -130,7 +117,7 @@ TEST_F(LargeFile, FindsLinesOfAllLengthsAndBytes) {
   }
   for (const std::string& line : lines) content += line + "\n";
   WriteFile(kFile, content);
-  Rest();
+  LetAge();
   for (int round = 0; round < 2; ++round) {
     for (const std::string& line : lines) {
       EXPECT_TRUE(Has(line)) << line.size();
@@ -158,10 +145,10 @@ TEST_F(LargeFile, ShowsAChangeOfTheSameSizeAtOnce) {
 }
 
 TEST_F(LargeFile, ShowsAChangeWhoseTimeWasSetBack) {
-  const vela_test::FileTime time = vela_test::ModificationTime(kFile);
+  const FileTime time = ModificationTime(kFile);
   ChangeInPlace(5 * kLineSize, "/photo/changed!");
-  vela_test::SetFileTime(kFile, time.seconds, time.nanoseconds);
-  ASSERT_EQ(vela_test::ModificationTime(kFile), time);
+  SetFileTime(kFile, time.seconds, time.nanoseconds);
+  ASSERT_EQ(ModificationTime(kFile), time);
   EXPECT_TRUE(Has("/photo/changed!"));
   EXPECT_FALSE(Has(Line(5)));
 }
@@ -179,8 +166,8 @@ TEST_F(LargeFile, ShowsTheFileThatHasTakenItsPlace) {
   std::string content = Lines(kLineCount);
   content.replace(0, 15, "/photo/replaced");
   WriteFile("/var/spool/replacement", content);
-  const vela_test::FileTime time = vela_test::ModificationTime(kFile);
-  vela_test::SetFileTime("/var/spool/replacement", time.seconds, time.nanoseconds);
+  const FileTime time = ModificationTime(kFile);
+  SetFileTime("/var/spool/replacement", time.seconds, time.nanoseconds);
   ASSERT_EQ(rename("/var/spool/replacement", kFile), 0);
   EXPECT_TRUE(Has("/photo/replaced"));
   EXPECT_FALSE(Has(Line(0)));
@@ -206,7 +193,7 @@ TEST_F(LargeFile, IsGoneOnceItIsRemoved) {
 
 TEST_F(LargeFile, CannotBeSearchedAnyMoreOnceItMayNotBeRead) {
   ASSERT_EQ(chmod(kFile, 0), 0);
-  const vela_test::WithoutCapabilities ordinary;
+  const WithoutCapabilities ordinary;
   EXPECT_EQ(Find(Line(0)), -1);
   EXPECT_EQ(VLIBCErrGet(), EACCES);
   EXPECT_EQ(Find("/nowhere"), -1);
@@ -218,7 +205,7 @@ TEST_F(LargeFile, IsOneOfMany) {
     files.push_back(std::string(kFile) + std::to_string(i));
     WriteFile(files.back(), Lines(5000) + "/only/in/" + std::to_string(i) + "\n");
   }
-  Rest();
+  LetAge();
   for (int round = 0; round < 3; ++round) {
     for (int i = 0; i < 9; ++i) {
       for (int line = 0; line < 9; ++line) {
@@ -229,38 +216,35 @@ TEST_F(LargeFile, IsOneOfMany) {
 }
 
 TEST_F(LargeFile, MayBeSearchedFromSeveralThreadsWhileItChanges) {
-  constexpr int kThreads = 4;
-  std::vector<int> misses(kThreads, 0);
-  std::vector<std::thread> threads;
-  threads.reserve(kThreads);
-  for (int thread = 0; thread < kThreads; ++thread) {
-    threads.emplace_back([thread, &misses] {
+  std::atomic<int> misses = 0;
+  std::thread searching([&misses] {
+    RunInThreads(4, [&misses](int) {
       for (int i = 0; i < 300; ++i) {
         // Line 5 changes, all others stay.
-        if (Find(Line(10 + i)) != 15 || Find("/nowhere") != 0) ++misses[thread];
+        if (Find(Line(10 + i)) != 15 || Find("/nowhere") != 0) ++misses;
       }
     });
-  }
+  });
   for (int i = 0; i < 5; ++i) {
     ChangeInPlace(5 * kLineSize, "/photo/change" + std::to_string(10 + i));
     std::this_thread::sleep_for(std::chrono::milliseconds(30));
   }
-  for (std::thread& thread : threads) thread.join();
-  EXPECT_EQ(misses, std::vector<int>(kThreads, 0));
+  searching.join();
+  EXPECT_EQ(misses, 0);
 }
 
 TEST_F(LargeFile, LeavesNoDescriptorOpen) {
-  const int before = platform_test::CountDescriptors();
-  for (int i = 0; i < 10; ++i) {
-    Has(Line(i));
-    Has("/nowhere");
-    AppendToFile(kFile, "x\n");
-    Has(Line(i));
-  }
-  EXPECT_EQ(platform_test::CountDescriptors(), before);
+  ExpectNoDescriptorLeak([] {
+    for (int i = 0; i < 10; ++i) {
+      Has(Line(i));
+      Has("/nowhere");
+      AppendToFile(kFile, "x\n");
+      Has(Line(i));
+    }
+  });
 }
 
-class SearchedFile : public vela_test::SandboxTest {};
+class SearchedFile : public SandboxTest {};
 
 TEST_F(SearchedFile, IsSearchedRightAtEverySizeAroundTheOneWhereItCountsAsLarge) {
   for (const int size : {65535, 65536, 65537, 131072}) {
@@ -271,7 +255,7 @@ TEST_F(SearchedFile, IsSearchedRightAtEverySizeAroundTheOneWhereItCountsAsLarge)
       EXPECT_TRUE(Has("end")) << size;
       EXPECT_TRUE(Has(Line(0))) << size;
       EXPECT_FALSE(Has("en")) << size;
-      Rest();
+      LetAge();
     }
   }
 }
@@ -280,7 +264,7 @@ TEST_F(SearchedFile, MayHaveMoreLinesThanAreWorthRemembering) {
   std::string content((size_t{8} << 20) + 10, '\n');
   content.replace(0, 6, "first\n");
   WriteFile(kFile, content + "/last\n");
-  Rest();
+  LetAge();
   for (int round = 0; round < 2; ++round) {
     EXPECT_TRUE(Has("first"));
     EXPECT_TRUE(Has("/last"));
@@ -291,7 +275,7 @@ TEST_F(SearchedFile, MayHaveMoreLinesThanAreWorthRemembering) {
 TEST_F(SearchedFile, WithTooManyLinesIsReadOnceForEachQuestionAfterTheFirst) {
   const std::string content((size_t{8} << 20) + 10, '\n');
   WriteFile(kFile, content + "/last\n");
-  Rest();
+  LetAge();
   ASSERT_FALSE(Has("/nowhere"));
   const auto size = static_cast<long long>(content.size());
   for (int question = 0; question < 3; ++question) {
@@ -307,10 +291,10 @@ TEST_F(SearchedFile, WithTooManyLinesIsReadOnceForEachQuestionAfterTheFirst) {
 TEST_F(SearchedFile, WithTooManyLinesIsRememberedOnceTheyAreFewer) {
   const std::string content((size_t{8} << 20) + 10, '\n');
   WriteFile(kFile, content);
-  Rest();
+  LetAge();
   ASSERT_FALSE(Has("/nowhere"));
   WriteFile(kFile, Lines(kLineCount));
-  Rest();
+  LetAge();
   ASSERT_TRUE(Has(Line(7)));
   const long long before = BytesRead();
   EXPECT_FALSE(Has("/nowhere"));
@@ -320,7 +304,7 @@ TEST_F(SearchedFile, WithTooManyLinesIsRememberedOnceTheyAreFewer) {
 
 TEST_F(SearchedFile, IsNotTakenForOneOfAnotherNameWithTheSameContent) {
   WriteFile(kFile, Lines(kLineCount));
-  Rest();
+  LetAge();
   ASSERT_TRUE(Has(Line(0)));
   ASSERT_EQ(link(kFile, "/var/spool/second"), 0);
   EXPECT_TRUE(Has(Line(0), "/var/spool/second"));
@@ -330,3 +314,4 @@ TEST_F(SearchedFile, IsNotTakenForOneOfAnotherNameWithTheSameContent) {
 }
 
 }  // namespace
+}  // namespace vela_test

@@ -1,13 +1,10 @@
 // Which names are photos, videos, or not to be indexed at all.
-#include <gtest/gtest.h>
-
 #include <algorithm>
 #include <sstream>
-#include <string>
-#include <vector>
 
-#include "platform/velaindex.h"
+#include "platform/platform_fixture.h"
 
+namespace vela_test {
 namespace {
 
 std::vector<std::string> Words(const char* text) {
@@ -113,3 +110,4 @@ TEST(EntryName, AcceptsTheRest) {
 }
 
 }  // namespace
+}  // namespace vela_test

@@ -1,15 +1,14 @@
 // Media records from the daemon's objects.
-#include <gtest/gtest.h>
 #include <json/reader.h>
 #include <json/value.h>
 
 #include <cstring>
 #include <limits>
 #include <sstream>
-#include <string>
 
-#include "platform/velaindex.h"
+#include "platform/platform_fixture.h"
 
+namespace vela_test {
 namespace {
 
 Json::Value Parse(const std::string& text) {
@@ -101,3 +100,4 @@ TEST(MediaRecord, IsClearedWhenThereIsNoObject) {
 }
 
 }  // namespace
+}  // namespace vela_test

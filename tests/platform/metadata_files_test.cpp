@@ -1,22 +1,10 @@
 // Metadata directories and the derived files in them.
-#include <sys/stat.h>
-#include <unistd.h>
-
-#include <cerrno>
-#include <string>
-#include <vector>
-
-#include "platform/velaindex.h"
-#include "platform/vlibc.h"
-#include "support/files.h"
+#include "platform/platform_fixture.h"
 #include "support/mounts.h"
 #include "support/privileges.h"
-#include "support/sandbox.h"
 
+namespace vela_test {
 namespace {
-
-using vela_test::Exists;
-using vela_test::WriteFile;
 
 constexpr const char* kName = "VELAPHOTO_THUMB_M.jpg";
 constexpr const char* kOldName = "VELAPHOTO:THUMB_M.jpg";
@@ -27,42 +15,33 @@ std::string InEaDir(const char* name) {
   return std::string(kEaDir) + "/" + name;
 }
 
-class EaWriteSupport : public vela_test::SandboxTest {};
+class EaWriteSupport : public SandboxTest {};
 
-TEST_F(EaWriteSupport, IsThereForAWritableDirectory) {
-  vela_test::MakeDirectories("/tmp/photos");
-  EXPECT_EQ(IndexIsPathSupportEAWrite("/tmp/photos"), 1);
-  EXPECT_EQ(IndexIsPathSupportEAWrite("/tmp/photos/"), 1);
+TEST_F(EaWriteSupport, IsThereForWritableDirectoriesOutsideMetadata) {
+  MakeDirectories("/tmp/photos/@eaDir/sub");
+  MakeDirectories("/tmp/photos/my@eaDir/@eaDirs");
   ASSERT_EQ(symlink("photos", "/tmp/link"), 0);
-  EXPECT_EQ(IndexIsPathSupportEAWrite("/tmp/link"), 1);
-}
-
-TEST_F(EaWriteSupport, IsNotThereForAnythingElse) {
   WriteFile("/tmp/file", "x");
-  EXPECT_EQ(IndexIsPathSupportEAWrite("/tmp/file"), 0);
-  EXPECT_EQ(IndexIsPathSupportEAWrite("/tmp/absent"), 0);
-  EXPECT_EQ(IndexIsPathSupportEAWrite(""), 0);
+  for (const char* path :
+       {"/tmp/photos", "/tmp/photos/", "/tmp/link", "/tmp/photos/my@eaDir/@eaDirs"}) {
+    EXPECT_EQ(IndexIsPathSupportEAWrite(path), 1) << path;
+  }
+  for (const char* path : {"/tmp/file", "/tmp/absent", "", "/tmp/photos/@eaDir",
+                           "/tmp/photos/@eaDir/", "/tmp/photos/@eaDir/sub"}) {
+    EXPECT_EQ(IndexIsPathSupportEAWrite(path), 0) << path;
+  }
   EXPECT_EQ(IndexIsPathSupportEAWrite(nullptr), 0);
 }
 
-TEST_F(EaWriteSupport, IsNotThereInsideMetadata) {
-  vela_test::MakeDirectories("/tmp/photos/@eaDir/sub");
-  EXPECT_EQ(IndexIsPathSupportEAWrite("/tmp/photos/@eaDir"), 0);
-  EXPECT_EQ(IndexIsPathSupportEAWrite("/tmp/photos/@eaDir/"), 0);
-  EXPECT_EQ(IndexIsPathSupportEAWrite("/tmp/photos/@eaDir/sub"), 0);
-  vela_test::MakeDirectories("/tmp/photos/my@eaDir/@eaDirs");
-  EXPECT_EQ(IndexIsPathSupportEAWrite("/tmp/photos/my@eaDir/@eaDirs"), 1);
-}
-
 TEST_F(EaWriteSupport, IsNotThereOnAReadOnlyVolume) {
-  vela_test::MakeDirectories("/tmp/photos");
-  const vela_test::ReadOnlyMount closed("/tmp/photos");
+  MakeDirectories("/tmp/photos");
+  const ReadOnlyMount closed("/tmp/photos");
   EXPECT_EQ(IndexIsPathSupportEAWrite("/tmp/photos"), 0);
 }
 
 TEST_F(EaWriteSupport, NeedsWriteAndSearchPermission) {
-  vela_test::MakeDirectories("/tmp/photos");
-  const vela_test::WithoutCapabilities ordinary;
+  MakeDirectories("/tmp/photos");
+  const WithoutCapabilities ordinary;
   for (const mode_t mode : {0500, 0600, 0100, 0200}) {
     ASSERT_EQ(chmod("/tmp/photos", mode), 0);
     EXPECT_EQ(IndexIsPathSupportEAWrite("/tmp/photos"), 0) << std::oct << mode;
@@ -78,31 +57,36 @@ std::string EaDirOf(const std::string& path, size_t outSize = 4096) {
   return result == 0 ? out.data() : "failed";
 }
 
-TEST(EaDirPath, LiesBesideTheFile) {
-  EXPECT_EQ(EaDirOf("/photo/a.jpg"), "/photo/@eaDir/a.jpg");
-  EXPECT_EQ(EaDirOf("photo/a.jpg"), "photo/@eaDir/a.jpg");
-  EXPECT_EQ(EaDirOf("/a.jpg"), "/@eaDir/a.jpg");
-  EXPECT_EQ(EaDirOf("a.jpg"), "@eaDir/a.jpg");
-  EXPECT_EQ(EaDirOf("/p/\xff %\n"), "/p/@eaDir/\xff %\n");
-  EXPECT_EQ(EaDirOf("/p@eaDir/@eaDir2"), "/p@eaDir/@eaDir/@eaDir2");
+TEST(EaDirPath, IsInTheMetadataDirectoryBesideTheFile) {
+  const struct {
+    const char* path;
+    const char* result;
+  } cases[] = {
+      {"/photo/a.jpg", "/photo/@eaDir/a.jpg"},
+      {"photo/a.jpg", "photo/@eaDir/a.jpg"},
+      {"/a.jpg", "/@eaDir/a.jpg"},
+      {"a.jpg", "@eaDir/a.jpg"},
+      {"/p/\xff %\n", "/p/@eaDir/\xff %\n"},
+      {"/p@eaDir/@eaDir2", "/p@eaDir/@eaDir/@eaDir2"},
+      // without file name
+      {"/photo/", "failed"},
+      {"/", "failed"},
+      // inside metadata
+      {"/photo/@eaDir/a.jpg", "failed"},
+      {"/photo/@eaDir/a.jpg/thumb.jpg", "failed"},
+      {"@eaDir/a", "failed"},
+      {"/photo/@eaDir", "failed"},
+      {"@eaDir", "failed"},
+  };
+  for (const auto& [path, result] : cases) EXPECT_EQ(EaDirOf(path), result) << path;
 }
 
-TEST(EaDirPath, FailsWithoutAFileName) {
+TEST(EaDirPath, FailsWithoutAPathOrABuffer) {
   EXPECT_EQ(EaDirOf(""), "failed");
   EXPECT_EQ(VLIBCErrGet(), EINVAL);
-  EXPECT_EQ(EaDirOf("/photo/"), "failed");
-  EXPECT_EQ(EaDirOf("/"), "failed");
   char out[8];
   EXPECT_EQ(VELAEADirPath(0, nullptr, out, sizeof(out)), -1);
   EXPECT_EQ(VELAEADirPath(0, "a", nullptr, 8), -1);
-}
-
-TEST(EaDirPath, FailsInsideMetadata) {
-  EXPECT_EQ(EaDirOf("/photo/@eaDir/a.jpg"), "failed");
-  EXPECT_EQ(EaDirOf("/photo/@eaDir/a.jpg/thumb.jpg"), "failed");
-  EXPECT_EQ(EaDirOf("@eaDir/a"), "failed");
-  EXPECT_EQ(EaDirOf("/photo/@eaDir"), "failed");
-  EXPECT_EQ(EaDirOf("@eaDir"), "failed");
 }
 
 TEST(EaDirPath, FailsWhenTheResultDoesNotFit) {
@@ -116,54 +100,59 @@ TEST(EaDirPath, FailsWhenTheResultDoesNotFit) {
   EXPECT_EQ(EaDirOf("/" + longest + "a"), "failed");
 }
 
-class DerivedFiles : public vela_test::SandboxTest {
+class DerivedFiles : public SandboxTest {
  protected:
   void SetUp() override {
     SandboxTest::SetUp();
     WriteFile(kPhoto, "photo");
-    vela_test::MakeDirectories(kEaDir);
+    MakeDirectories(kEaDir);
   }
+
+  static const char* Find(int64_t* size = nullptr) {
+    return IsEAFileExist(kEaDir, size, kName, kOldName);
+  }
+  static int Remove(const char* eaDir = kEaDir) { return RemoveEAFile(eaDir, kName, kOldName); }
 };
 
 TEST_F(DerivedFiles, AreFoundUnderEitherName) {
-  EXPECT_EQ(IsEAFileExist(kEaDir, nullptr, kName, kOldName), nullptr);
+  EXPECT_EQ(Find(), nullptr);
   EXPECT_EQ(IsEAFileExist2(kPhoto, kName, kOldName), 0);
   WriteFile(InEaDir(kOldName), "old");
-  EXPECT_EQ(IsEAFileExist(kEaDir, nullptr, kName, kOldName), kOldName);
+  EXPECT_EQ(Find(), kOldName);
   EXPECT_GT(IsEAFileExist2(kPhoto, kName, kOldName), 0);
   WriteFile(InEaDir(kName), "new");
-  EXPECT_EQ(IsEAFileExist(kEaDir, nullptr, kName, kOldName), kName);
+  EXPECT_EQ(Find(), kName);
   EXPECT_GT(IsEAFileExist2(kPhoto, kName, kOldName), 0);
 }
 
-TEST_F(DerivedFiles, TellTheSizeOfTheOneFound) {
+TEST_F(DerivedFiles, HaveTheSizeOfTheOneFound) {
   int64_t size = -7;
-  IsEAFileExist(kEaDir, &size, kName, kOldName);
+  Find(&size);
   EXPECT_EQ(size, -7);
   WriteFile(InEaDir(kOldName), "1234567");
-  IsEAFileExist(kEaDir, &size, kName, kOldName);
+  Find(&size);
   EXPECT_EQ(size, 7);
   WriteFile(InEaDir(kName), "");
-  EXPECT_EQ(IsEAFileExist(kEaDir, &size, kName, kOldName), kName);
+  EXPECT_EQ(Find(&size), kName);
   EXPECT_EQ(size, 0);
 }
 
-TEST_F(DerivedFiles, TellSizesBeyondFourGigabytes) {
+TEST_F(DerivedFiles, CanBeLargerThanFourGigabytes) {
   WriteFile(InEaDir(kName), "x");
   constexpr int64_t kSize = int64_t{5} << 30;
   ASSERT_EQ(truncate(InEaDir(kName).c_str(), kSize), 0);
   int64_t size = 0;
-  EXPECT_EQ(IsEAFileExist(kEaDir, &size, kName, kOldName), kName);
+  EXPECT_EQ(Find(&size), kName);
   EXPECT_EQ(size, kSize);
 }
 
 TEST_F(DerivedFiles, AreRegularFilesWithLinksFollowed) {
   ASSERT_EQ(mkdir(InEaDir(kName).c_str(), 0777), 0);
-  EXPECT_EQ(IsEAFileExist(kEaDir, nullptr, kName, kOldName), nullptr);
+  EXPECT_EQ(Find(), nullptr);
   ASSERT_EQ(symlink(kPhoto, InEaDir(kOldName).c_str()), 0);
-  EXPECT_EQ(IsEAFileExist(kEaDir, nullptr, kName, kOldName), kOldName);
+  EXPECT_EQ(Find(), kOldName);
   ASSERT_EQ(unlink(kPhoto), 0);
-  EXPECT_EQ(IsEAFileExist(kEaDir, nullptr, kName, kOldName), nullptr);
+  EXPECT_EQ(Find(), nullptr);
 }
 
 TEST_F(DerivedFiles, AreNotFoundUnderNoName) {
@@ -202,56 +191,54 @@ TEST_F(DerivedFiles, AreRemovedUnderBothNames) {
     WriteFile(InEaDir(kName), "x");
     WriteFile(InEaDir(kOldName), "x");
     WriteFile(InEaDir("other"), "x");
-    EXPECT_EQ(
-        byPhoto ? RemoveEAFile2(kPhoto, kName, kOldName) : RemoveEAFile(kEaDir, kName, kOldName),
-        0);
-    EXPECT_EQ(vela_test::ListDirectory(kEaDir), std::vector<std::string>{"other"});
+    EXPECT_EQ(byPhoto ? RemoveEAFile2(kPhoto, kName, kOldName) : Remove(), 0);
+    EXPECT_EQ(ListDirectory(kEaDir), std::vector<std::string>{"other"});
   }
 }
 
 TEST_F(DerivedFiles, MayBeMissingWhenRemoved) {
-  EXPECT_EQ(RemoveEAFile(kEaDir, kName, kOldName), 0);
+  EXPECT_EQ(Remove(), 0);
   WriteFile(InEaDir(kOldName), "x");
-  EXPECT_EQ(RemoveEAFile(kEaDir, kName, kOldName), 0);
+  EXPECT_EQ(Remove(), 0);
   EXPECT_FALSE(Exists(InEaDir(kOldName)));
-  EXPECT_EQ(RemoveEAFile("/tmp/absent", kName, kOldName), 0);
-  EXPECT_EQ(RemoveEAFile(kPhoto, kName, kOldName), 0) << "a file in place of the directory";
+  EXPECT_EQ(Remove("/tmp/absent"), 0);
+  EXPECT_EQ(Remove(kPhoto), 0) << "a file in place of the directory";
   EXPECT_EQ(RemoveEAFile2("/tmp/photos/b.jpg", kName, kOldName), 0);
 }
 
 TEST_F(DerivedFiles, LeaveNothingOutWhenOneCannotBeRemoved) {
   ASSERT_EQ(mkdir(InEaDir(kName).c_str(), 0777), 0);
   WriteFile(InEaDir(kOldName), "x");
-  EXPECT_EQ(RemoveEAFile(kEaDir, kName, kOldName), -1);
+  EXPECT_EQ(Remove(), -1);
   EXPECT_EQ(VLIBCErrGet(), EISDIR);
   EXPECT_FALSE(Exists(InEaDir(kOldName)));
 }
 
 TEST_F(DerivedFiles, FailToBeRemovedOnlyWhenThere) {
-  const vela_test::ReadOnlyMount closed(kEaDir);
-  EXPECT_EQ(RemoveEAFile(kEaDir, kName, kOldName), 0);
+  const ReadOnlyMount closed(kEaDir);
+  EXPECT_EQ(Remove(), 0);
 }
 
 TEST_F(DerivedFiles, FailToBeRemovedFromAReadOnlyVolume) {
   WriteFile(InEaDir(kOldName), "x");
-  const vela_test::ReadOnlyMount closed(kEaDir);
-  EXPECT_EQ(RemoveEAFile(kEaDir, kName, kOldName), -1);
+  const ReadOnlyMount closed(kEaDir);
+  EXPECT_EQ(Remove(), -1);
   EXPECT_EQ(VLIBCErrGet(), EROFS);
   EXPECT_TRUE(Exists(InEaDir(kOldName)));
 }
 
-TEST_F(DerivedFiles, OfALinkAreRemovedButNotWhatItLeadsTo) {
+TEST_F(DerivedFiles, ThatAreLinksAreRemovedButNotTheirTargets) {
   ASSERT_EQ(symlink(kPhoto, InEaDir(kName).c_str()), 0);
-  EXPECT_EQ(RemoveEAFile(kEaDir, kName, kOldName), 0);
+  EXPECT_EQ(Remove(), 0);
   EXPECT_FALSE(Exists(InEaDir(kName)));
   EXPECT_TRUE(Exists(kPhoto));
 }
 
-class Existence : public vela_test::SandboxTest {};
+class Existence : public SandboxTest {};
 
 TEST_F(Existence, OfFiles) {
   WriteFile("/tmp/file", "");
-  vela_test::MakeDirectories("/tmp/dir");
+  MakeDirectories("/tmp/dir");
   ASSERT_EQ(mkfifo("/tmp/fifo", 0600), 0);
   ASSERT_EQ(symlink("file", "/tmp/link"), 0);
   ASSERT_EQ(symlink("absent", "/tmp/dangling"), 0);
@@ -271,7 +258,7 @@ TEST_F(Existence, OfFiles) {
 
 TEST_F(Existence, OfDirectories) {
   WriteFile("/tmp/file", "");
-  vela_test::MakeDirectories("/tmp/dir");
+  MakeDirectories("/tmp/dir");
   ASSERT_EQ(symlink("dir", "/tmp/link"), 0);
   EXPECT_EQ(IsDirExist("/tmp/dir"), 1);
   EXPECT_EQ(IsDirExist("/tmp/dir/"), 1);
@@ -282,3 +269,4 @@ TEST_F(Existence, OfDirectories) {
 }
 
 }  // namespace
+}  // namespace vela_test

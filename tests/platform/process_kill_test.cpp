@@ -1,50 +1,43 @@
 // Ending processes by name.
 #include <sys/prctl.h>
 #include <sys/time.h>
-#include <unistd.h>
 
-#include <cerrno>
 #include <csignal>
 #include <cstdio>
 #include <cstdlib>
-#include <cstring>
-#include <string>
-#include <vector>
 
-#include "platform/forked_call.h"
-#include "platform/vlibc.h"
-#include "support/files.h"
-#include "support/sandbox.h"
+#include "platform/platform_fixture.h"
 
+namespace vela_test {
 namespace {
 
 /// A process with this command name that waits for signals; SIGUSR1 ends it with status 11.
 pid_t StartNamed(const std::string& name) {
   const std::string ready = "/tmp/ready-" + name;
-  const pid_t pid = platform_test::Fork([&] {
+  const pid_t pid = Fork([&] {
     signal(SIGUSR1, [](int) { _exit(11); });
     prctl(PR_SET_NAME, name.c_str());
-    vela_test::WriteFile(ready, "");
+    WriteFile(ready, "");
     for (;;) pause();
     return 0;
   });
-  EXPECT_TRUE(vela_test::WaitUntilExists(ready));
-  vela_test::RemoveTree(ready);
+  EXPECT_TRUE(WaitUntilExists(ready));
+  RemoveTree(ready);
   return pid;
 }
 
-class ProcessKill : public vela_test::SandboxTest {};
+class ProcessKill : public SandboxTest {};
 
 TEST_F(ProcessKill, SendsSigtermForZero) {
   const pid_t pid = StartNamed("tool-a");
   EXPECT_EQ(VLIBCKill("tool-a", 0), 1);
-  EXPECT_EQ(platform_test::Join(pid), -SIGTERM);
+  EXPECT_EQ(Join(pid), -SIGTERM);
 }
 
 TEST_F(ProcessKill, SendsTheGivenSignal) {
   const pid_t pid = StartNamed("tool-a");
   EXPECT_EQ(VLIBCKill("tool-a", SIGUSR1), 1);
-  EXPECT_EQ(platform_test::Join(pid), 11);
+  EXPECT_EQ(Join(pid), 11);
 }
 
 TEST_F(ProcessKill, ReachesEveryProcessOfTheNameAndNoOther) {
@@ -54,45 +47,44 @@ TEST_F(ProcessKill, ReachesEveryProcessOfTheNameAndNoOther) {
   const pid_t shorter = StartNamed("tool-");
   const pid_t capital = StartNamed("Tool-a");
   EXPECT_EQ(VLIBCKill("tool-a", SIGKILL), 2);
-  EXPECT_EQ(platform_test::Join(first), -SIGKILL);
-  EXPECT_EQ(platform_test::Join(second), -SIGKILL);
+  EXPECT_EQ(Join(first), -SIGKILL);
+  EXPECT_EQ(Join(second), -SIGKILL);
   for (const pid_t other : {longer, shorter, capital}) {
     EXPECT_EQ(kill(other, 0), 0);
     kill(other, SIGUSR1);
-    EXPECT_EQ(platform_test::Join(other), 11);
+    EXPECT_EQ(Join(other), 11);
   }
 }
 
-TEST_F(ProcessKill, KnowsNamesThatTheKernelCuts) {
+TEST_F(ProcessKill, MatchesNamesThatTheKernelCuts) {
   const pid_t pid = StartNamed("fifteen-letters-and-more");
   EXPECT_EQ(VLIBCKill("fifteen-letter", 0), 0);
   EXPECT_EQ(VLIBCKill("fifteen-letters-and-more", 0), 1);
-  EXPECT_EQ(platform_test::Join(pid), -SIGTERM);
+  EXPECT_EQ(Join(pid), -SIGTERM);
 }
 
-TEST_F(ProcessKill, KnowsNamesWithOddBytes) {
+TEST_F(ProcessKill, MatchesNamesWithOddBytes) {
   const pid_t pid = StartNamed("a (b)\tc\xff");
   EXPECT_EQ(VLIBCKill("a (b)\tc\xff", 0), 1);
-  EXPECT_EQ(platform_test::Join(pid), -SIGTERM);
+  EXPECT_EQ(Join(pid), -SIGTERM);
 }
 
 TEST_F(ProcessKill, SparesTheCaller) {
-  EXPECT_EQ(platform_test::RunForked([] {
-              prctl(PR_SET_NAME, "tool-a");
-              return VLIBCKill("tool-a", SIGKILL) == 0 ? 0 : 1;
-            }),
-            0);
+  InOwnProcess([] {
+    prctl(PR_SET_NAME, "tool-a");
+    EXPECT_EQ(VLIBCKill("tool-a", SIGKILL), 0);
+  });
 }
 
 TEST_F(ProcessKill, DoesNotCountAProcessThatHasEnded) {
   const pid_t pid = StartNamed("tool) R 1 (a");
   EXPECT_EQ(VLIBCKill("tool) R 1 (a", SIGUSR1), 1);
-  for (int i = 0; i < 500 && platform_test::CountZombies() == 0; ++i) usleep(10000);
+  EXPECT_TRUE(WaitUntil([] { return CountZombies() > 0; }));
   EXPECT_EQ(VLIBCKill("tool) R 1 (a", SIGUSR1), 0);
-  EXPECT_EQ(platform_test::Join(pid), 11);
+  EXPECT_EQ(Join(pid), 11);
 }
 
-TEST_F(ProcessKill, IsZeroWhenThereIsNone) {
+TEST_F(ProcessKill, IsZeroForAnUnusedName) {
   EXPECT_EQ(VLIBCKill("no-such-tool", 0), 0);
 }
 
@@ -110,9 +102,8 @@ TEST_F(ProcessKill, LeavesErrnoAlone) {
 
 TEST_F(ProcessKill, CanBeCalledFromAHandlerAtAnyMoment) {
   // The interrupted code holds the locks of the allocator and of stdio much of the time.
-  const int result = platform_test::RunForked([] {
-    struct sigaction action;
-    memset(&action, 0, sizeof(action));
+  const int result = RunForked([] {
+    struct sigaction action = {};
     action.sa_handler = [](int) { VLIBCKill("no-such-tool", 0); };
     sigaction(SIGALRM, &action, nullptr);
     const itimerval often = {{0, 300}, {0, 300}};
@@ -130,3 +121,4 @@ TEST_F(ProcessKill, CanBeCalledFromAHandlerAtAnyMoment) {
 }
 
 }  // namespace
+}  // namespace vela_test

@@ -2,38 +2,33 @@
 #include <fcntl.h>
 #include <sys/file.h>
 #include <sys/resource.h>
-#include <sys/stat.h>
-#include <unistd.h>
 
-#include <cerrno>
 #include <csignal>
 #include <map>
-#include <string>
-#include <vector>
 
-#include "platform/forked_call.h"
-#include "platform/velaindex.h"
-#include "platform/vlibc.h"
-#include "support/files.h"
+#include "platform/platform_fixture.h"
 #include "support/mounts.h"
 #include "support/privileges.h"
-#include "support/sandbox.h"
 
+namespace vela_test {
 namespace {
-
-using vela_test::ReadFile;
-using vela_test::WriteFile;
 
 constexpr const char* kQueue = "/var/spool/thumb_create.queue";
 
-class QueueFile : public vela_test::SandboxTest {};
+constexpr const char* kAway = "/var/spool/thumb_create.queue.tmp";
+
+int Append() {
+  return WriteIndexQueue("/photo/a", kQueue);
+}
+
+class QueueFile : public SandboxTest {};
 
 TEST_F(QueueFile, IsMadeWithMode0644) {
   const mode_t mask = umask(077);
   EXPECT_EQ(WriteIndexQueue("/photo/a", kQueue), 0);
   umask(mask);
   EXPECT_EQ(ReadFile(kQueue), "/photo/a\n");
-  EXPECT_EQ(vela_test::ModeOf(kQueue), 0644);
+  EXPECT_EQ(ModeOf(kQueue), 0644);
 }
 
 TEST_F(QueueFile, KeepsWhatItHoldsAndItsMode) {
@@ -42,7 +37,7 @@ TEST_F(QueueFile, KeepsWhatItHoldsAndItsMode) {
   EXPECT_EQ(WriteIndexQueue("/photo/b", kQueue), 0);
   EXPECT_EQ(WriteIndexQueue("R:/photo/c \xff%s\t", kQueue), 0);
   EXPECT_EQ(ReadFile(kQueue), "/photo/a\n/photo/b\nR:/photo/c \xff%s\t\n");
-  EXPECT_EQ(vela_test::ModeOf(kQueue), 0600);
+  EXPECT_EQ(ModeOf(kQueue), 0600);
 }
 
 TEST_F(QueueFile, EndsALineThatHasNoNewlineYet) {
@@ -58,7 +53,7 @@ TEST_F(QueueFile, RefusesPathsThatAreNoLine) {
   EXPECT_EQ(WriteIndexQueue("", kQueue), -1);
   EXPECT_EQ(WriteIndexQueue(nullptr, kQueue), -1);
   EXPECT_EQ(WriteIndexQueue("/photo/a", nullptr), -1);
-  EXPECT_FALSE(vela_test::Exists(kQueue));
+  EXPECT_FALSE(Exists(kQueue));
 }
 
 TEST_F(QueueFile, FailsWhereItCannotBeWritten) {
@@ -69,27 +64,26 @@ TEST_F(QueueFile, FailsWhereItCannotBeWritten) {
   EXPECT_EQ(WriteIndexQueue("/photo/a", "/var/spool/fifo"), -1);
   WriteFile(kQueue, "");
   ASSERT_EQ(chmod(kQueue, 0444), 0);
-  const vela_test::WithoutCapabilities ordinary;
+  const WithoutCapabilities ordinary;
   EXPECT_EQ(WriteIndexQueue("/photo/a", kQueue), -1);
   EXPECT_EQ(VLIBCErrGet(), EACCES);
 }
 
 TEST_F(QueueFile, HoldsNoPartOfALineThatDoesNotFit) {
   WriteFile(kQueue, "/photo/a\n");
-  const int result = platform_test::RunForked([] {
+  InOwnProcess([] {
     signal(SIGXFSZ, SIG_IGN);
     const rlimit limit{12, 12};
     setrlimit(RLIMIT_FSIZE, &limit);
-    return WriteIndexQueue("/photo/b", kQueue) == -1 ? 0 : 1;
+    EXPECT_EQ(WriteIndexQueue("/photo/b", kQueue), -1);
   });
-  EXPECT_EQ(result, 0);
   EXPECT_EQ(ReadFile(kQueue), "/photo/a\n");
 }
 
 TEST_F(QueueFile, FailsOnAFullVolume) {
-  vela_test::SmallVolume volume("/var/spool/small", 64 << 10);
+  SmallVolume volume("/var/spool/small", 64 << 10);
   const std::string queue = "/var/spool/small/queue";
-  const std::string content(vela_test::SmallVolume::PageSize() - 1, 'x');
+  const std::string content(SmallVolume::PageSize() - 1, 'x');
   WriteFile(queue, content + "\n");
   volume.SetAvailable(0);
   EXPECT_EQ(WriteIndexQueue("/photo/b", queue.c_str()), -1);
@@ -99,54 +93,25 @@ TEST_F(QueueFile, FailsOnAFullVolume) {
 
 TEST_F(QueueFile, WaitsForTheLock) {
   WriteFile(kQueue, "");
-  const int holder = open(kQueue, O_RDWR | O_CLOEXEC);
-  ASSERT_GE(holder, 0);
-  ASSERT_EQ(flock(holder, LOCK_EX), 0);
-  const pid_t writer = platform_test::Fork([holder] {
-    close(holder);  // else the copy would keep the lock
-    return WriteIndexQueue("/photo/a", kQueue) == 0 ? 0 : 1;
-  });
-  usleep(100000);
-  EXPECT_EQ(ReadFile(kQueue), "");
-  close(holder);
-  EXPECT_EQ(platform_test::Join(writer), 0);
+  EXPECT_EQ(RunAgainstLock(kQueue, Append, [] { EXPECT_EQ(ReadFile(kQueue), ""); }), 0);
   EXPECT_EQ(ReadFile(kQueue), "/photo/a\n");
 }
 
-TEST_F(QueueFile, IsMadeAnewWhenItWasRenamedAwayWhileWaiting) {
+TEST_F(QueueFile, IsMadeAnewWhenRenamedAwayDuringTheWait) {
   WriteFile(kQueue, "/photo/old\n");
-  const int holder = open(kQueue, O_RDWR | O_CLOEXEC);
-  ASSERT_GE(holder, 0);
-  ASSERT_EQ(flock(holder, LOCK_EX), 0);
-  const pid_t writer = platform_test::Fork([holder] {
-    close(holder);  // else the copy would keep the lock
-    return WriteIndexQueue("/photo/a", kQueue) == 0 ? 0 : 1;
-  });
-  usleep(100000);
-  const std::string away = std::string(kQueue) + ".tmp";
-  ASSERT_EQ(rename(kQueue, away.c_str()), 0);
-  close(holder);
-  EXPECT_EQ(platform_test::Join(writer), 0);
-  EXPECT_EQ(ReadFile(away), "/photo/old\n");
+  EXPECT_EQ(RunAgainstLock(kQueue, Append, [] { ASSERT_EQ(rename(kQueue, kAway), 0); }), 0);
+  EXPECT_EQ(ReadFile(kAway), "/photo/old\n");
   EXPECT_EQ(ReadFile(kQueue), "/photo/a\n");
 }
 
-TEST_F(QueueFile, IsTheNewOneWhenAnotherHasMadeItWhileWaiting) {
+TEST_F(QueueFile, IsTheNewOneWhenReplacedDuringTheWait) {
   WriteFile(kQueue, "/photo/old\n");
-  const int holder = open(kQueue, O_RDWR | O_CLOEXEC);
-  ASSERT_GE(holder, 0);
-  ASSERT_EQ(flock(holder, LOCK_EX), 0);
-  const pid_t writer = platform_test::Fork([holder] {
-    close(holder);
-    return WriteIndexQueue("/photo/a", kQueue) == 0 ? 0 : 1;
-  });
-  usleep(100000);
-  const std::string away = std::string(kQueue) + ".tmp";
-  ASSERT_EQ(rename(kQueue, away.c_str()), 0);
-  WriteFile(kQueue, "/photo/new\n");
-  close(holder);
-  EXPECT_EQ(platform_test::Join(writer), 0);
-  EXPECT_EQ(ReadFile(away), "/photo/old\n");
+  const auto replace = [] {
+    ASSERT_EQ(rename(kQueue, kAway), 0);
+    WriteFile(kQueue, "/photo/new\n");
+  };
+  EXPECT_EQ(RunAgainstLock(kQueue, Append, replace), 0);
+  EXPECT_EQ(ReadFile(kAway), "/photo/old\n");
   EXPECT_EQ(ReadFile(kQueue), "/photo/new\n/photo/a\n");
 }
 
@@ -155,7 +120,7 @@ TEST_F(QueueFile, GetsEveryLineOfManyWritersOnce) {
   constexpr int kLines = 100;
   std::vector<pid_t> writers;
   for (int writer = 0; writer < kWriters; ++writer) {
-    writers.push_back(platform_test::Fork([writer] {
+    writers.push_back(Fork([writer] {
       for (int line = 0; line < kLines; ++line) {
         const std::string path = "/photo/" + std::to_string(writer) + "/" + std::to_string(line) +
                                  std::string(static_cast<size_t>(line * 31 % 4000), 'x');
@@ -164,10 +129,10 @@ TEST_F(QueueFile, GetsEveryLineOfManyWritersOnce) {
       return 0;
     }));
   }
-  // Somebody who works the queue off meanwhile, renaming it away under its lock.
+  // Meanwhile the queue is processed as usual: renamed away under its lock.
   std::map<std::string, int> seen;
   const auto collect = [&seen](const std::string& file) {
-    for (const std::string& line : vela_test::ReadLines(file)) ++seen[line];
+    for (const std::string& line : ReadLines(file)) ++seen[line];
   };
   for (int round = 0; round < 40; ++round) {
     const int queue = open(kQueue, O_RDWR | O_CLOEXEC);
@@ -180,17 +145,18 @@ TEST_F(QueueFile, GetsEveryLineOfManyWritersOnce) {
     }
     usleep(1000);
   }
-  for (const pid_t writer : writers) EXPECT_EQ(platform_test::Join(writer), 0);
-  if (vela_test::Exists(kQueue)) collect(kQueue);
+  for (const pid_t writer : writers) EXPECT_EQ(Join(writer), 0);
+  if (Exists(kQueue)) collect(kQueue);
   EXPECT_EQ(seen.size(), size_t{kWriters * kLines});
   for (const auto& [line, count] : seen) EXPECT_EQ(count, 1) << line;
 }
 
 TEST_F(QueueFile, LeavesNoDescriptorOpen) {
-  const int before = platform_test::CountDescriptors();
-  for (int i = 0; i < 10; ++i) WriteIndexQueue("/photo/a", kQueue);
-  WriteIndexQueue("/photo/a", "/var/spool");
-  EXPECT_EQ(platform_test::CountDescriptors(), before);
+  ExpectNoDescriptorLeak([] {
+    for (int i = 0; i < 10; ++i) Append();
+    WriteIndexQueue("/photo/a", "/var/spool");
+  });
 }
 
 }  // namespace
+}  // namespace vela_test

@@ -1,19 +1,8 @@
 // Size maps and the settings they come from.
-#include <unistd.h>
+#include "platform/platform_fixture.h"
 
-#include <cerrno>
-#include <string>
-#include <thread>
-#include <vector>
-
-#include "platform/velaindex.h"
-#include "platform/vlibc.h"
-#include "support/files.h"
-#include "support/sandbox.h"
-
+namespace vela_test {
 namespace {
-
-using vela_test::WriteFile;
 
 constexpr const char* kSettings = "/etc/velainfo.conf";
 
@@ -26,7 +15,12 @@ int32_t MapOf(int kind) {
   return file;
 }
 
-class SizeMaps : public vela_test::SandboxTest {};
+/// Writes the photos' setting in quotes.
+void SetPhotoMap(const std::string& value) {
+  WriteFile(kSettings, "photo_thumb_size_map=\"" + value + "\"\n");
+}
+
+class SizeMaps : public SandboxTest {};
 
 TEST_F(SizeMaps, HoldAllClassesWithoutSetting) {
   EXPECT_EQ(MapOf(1), 63);
@@ -43,7 +37,7 @@ TEST_F(SizeMaps, HaveASettingForEachKind) {
 
 TEST_F(SizeMaps, TakeEveryNumberFromZeroTo63) {
   for (int map = 0; map <= 63; ++map) {
-    WriteFile(kSettings, "photo_thumb_size_map=\"" + std::to_string(map) + "\"\n");
+    SetPhotoMap(std::to_string(map));
     ASSERT_EQ(MapOf(1), map);
   }
 }
@@ -51,26 +45,26 @@ TEST_F(SizeMaps, TakeEveryNumberFromZeroTo63) {
 TEST_F(SizeMaps, HoldAllClassesForAnyOtherValue) {
   for (const char* value : {"64", "-1", "", "x", "0x10", "1x", "1 2", " 7", "+7", "1.0", "6e0",
                             "4294967297", "18446744073709551617", "99999999999999999999999"}) {
-    WriteFile(kSettings, std::string("photo_thumb_size_map=\"") + value + "\"\n");
+    SetPhotoMap(value);
     EXPECT_EQ(MapOf(1), 63) << value;
   }
 }
 
 TEST_F(SizeMaps, FollowEveryChangeOfTheFile) {
-  // Same size and, on a coarse clock, the same time: only the content tells.
+  // Same size and, on a coarse clock, the same time: only the content differs.
   for (int i = 0; i < 200; ++i) {
     const int map = 10 + i % 50;
-    WriteFile(kSettings, "photo_thumb_size_map=\"" + std::to_string(map) + "\"\n");
+    SetPhotoMap(std::to_string(map));
     ASSERT_EQ(MapOf(1), map);
   }
 }
 
-TEST_F(SizeMaps, FollowAChangeAfterALongRest) {
-  WriteFile(kSettings, "photo_thumb_size_map=\"11\"\n");
+TEST_F(SizeMaps, FollowAChangeAfterALongPause) {
+  SetPhotoMap("11");
   usleep(150000);
   EXPECT_EQ(MapOf(1), 11);
   EXPECT_EQ(MapOf(1), 11);
-  WriteFile(kSettings, "photo_thumb_size_map=\"12\"\n");
+  SetPhotoMap("12");
   EXPECT_EQ(MapOf(1), 12);
   WriteFile(kSettings, "");
   EXPECT_EQ(MapOf(1), 63);
@@ -87,16 +81,13 @@ TEST_F(SizeMaps, AreUnknownForOtherKinds) {
   EXPECT_EQ(VELAIDX_GetThumbSizeMap("/photo/a.jpg", 1, nullptr), -1);
 }
 
-TEST_F(SizeMaps, CanBeAskedForFromSeveralThreads) {
-  WriteFile(kSettings, "photo_thumb_size_map=\"10\"\n");
+TEST_F(SizeMaps, CanBeReadFromSeveralThreads) {
+  SetPhotoMap("10");
   usleep(150000);
-  std::vector<std::thread> threads;
-  for (int i = 0; i < 4; ++i) {
-    threads.emplace_back([] {
-      for (int round = 0; round < 5000; ++round) EXPECT_EQ(MapOf(1), 10);
-    });
-  }
-  for (std::thread& thread : threads) thread.join();
+  RunInThreads(4, [](int) {
+    for (int round = 0; round < 5000; ++round) EXPECT_EQ(MapOf(1), 10);
+  });
 }
 
 }  // namespace
+}  // namespace vela_test

@@ -2,33 +2,14 @@
 #include <json/reader.h>
 #include <json/value.h>
 #include <sys/socket.h>
-#include <sys/time.h>
 #include <sys/un.h>
-#include <unistd.h>
 
-#include <cerrno>
-#include <chrono>
-#include <csignal>
-#include <cstring>
-#include <functional>
-#include <memory>
-#include <string>
-#include <thread>
-#include <vector>
-
-#include "platform/forked_call.h"
-#include "platform/velaindex.h"
-#include "platform/vlibc.h"
+#include "platform/platform_fixture.h"
 #include "support/daemon_peer.h"
-#include "support/files.h"
-#include "support/sandbox.h"
+#include "support/descriptor.h"
 
+namespace vela_test {
 namespace {
-
-using std::chrono::steady_clock;
-using vela_test::DaemonPeer;
-using vela_test::DaemonReply;
-using vela_test::kDaemonSocket;
 
 constexpr size_t kReplyMax = 16 * 1024 * 1024;
 
@@ -43,8 +24,15 @@ int Exchange(Json::Value& packet, int seconds = 10) {
   return AutoSendRecvPacket(kDaemonSocket, -1, packet, seconds);
 }
 
-void ExpectFailure(int expectedError, int seconds = 10) {
+/// The reply to a request, which must succeed.
+Json::Value Reply(int seconds = 10) {
   Json::Value packet = Request();
+  EXPECT_EQ(Exchange(packet, seconds), 0);
+  return packet;
+}
+
+/// `expectedError` 0: any.
+void ExpectFailure(int expectedError, int seconds = 10, Json::Value packet = Request()) {
   EXPECT_EQ(Exchange(packet, seconds), -1);
   EXPECT_TRUE(packet.isObject());
   EXPECT_TRUE(packet.empty());
@@ -53,20 +41,27 @@ void ExpectFailure(int expectedError, int seconds = 10) {
   }
 }
 
-double SecondsSince(steady_clock::time_point start) {
-  return std::chrono::duration<double>(steady_clock::now() - start).count();
+void ExpectTimeoutAfterOneSecond(const Json::Value& packet = Request()) {
+  const Stopwatch watch;
+  ExpectFailure(ETIMEDOUT, 1, packet);
+  watch.ExpectBetween(1.0, 3.0);
 }
 
-class SocketExchange : public vela_test::SandboxTest {};
+Json::Value RequestOfSize(size_t size) {
+  Json::Value packet(Json::objectValue);
+  packet["path"] = std::string(size, 'x');
+  return packet;
+}
+
+class SocketExchange : public SandboxTest {};
 
 TEST_F(SocketExchange, ReplacesTheRequestByTheReply) {
   DaemonPeer daemon;
   daemon.AnswerNext(DaemonReply::Line(R"({"success":true,"version":3,"media":{"width":7}})"));
-  Json::Value packet = Request();
-  EXPECT_EQ(Exchange(packet), 0);
-  EXPECT_EQ(packet.size(), 3U);
-  EXPECT_EQ(packet["version"].asInt(), 3);
-  EXPECT_EQ(packet["media"]["width"].asInt(), 7);
+  const Json::Value reply = Reply();
+  EXPECT_EQ(reply.size(), 3U);
+  EXPECT_EQ(reply["version"].asInt(), 3);
+  EXPECT_EQ(reply["media"]["width"].asInt(), 7);
 }
 
 TEST_F(SocketExchange, SendsOneCompactLine) {
@@ -96,9 +91,8 @@ TEST_F(SocketExchange, CarriesEveryByteOfAPath) {
     EXPECT_NE(line.find(static_cast<char>(byte)), std::string::npos) << "byte " << byte;
   }
   Json::Value received;
-  Json::CharReaderBuilder builder;
   std::string errors;
-  const std::unique_ptr<Json::CharReader> reader(builder.newCharReader());
+  const std::unique_ptr<Json::CharReader> reader(Json::CharReaderBuilder().newCharReader());
   ASSERT_TRUE(reader->parse(line.data(), line.data() + line.size(), &received, &errors)) << errors;
   EXPECT_EQ(received["path"].asString(), path);
 }
@@ -106,9 +100,7 @@ TEST_F(SocketExchange, CarriesEveryByteOfAPath) {
 TEST_F(SocketExchange, TakesEveryByteOfAReply) {
   DaemonPeer daemon;
   daemon.AnswerNext(DaemonReply::Line("{\"path\":\"/p/\xff\xc3\xa9\\n\\\"\\u00e9\x7f\"}"));
-  Json::Value packet = Request();
-  EXPECT_EQ(Exchange(packet), 0);
-  EXPECT_EQ(packet["path"].asString(), "/p/\xff\xc3\xa9\n\"\xc3\xa9\x7f");
+  EXPECT_EQ(Reply()["path"].asString(), "/p/\xff\xc3\xa9\n\"\xc3\xa9\x7f");
 }
 
 TEST_F(SocketExchange, TakesLargeRequestsAndReplies) {
@@ -123,130 +115,82 @@ TEST_F(SocketExchange, TakesLargeRequestsAndReplies) {
   EXPECT_EQ(daemon.Requests()[0].bytes, "{\"path\":\"" + large + "1\"}\n");
 }
 
-TEST_F(SocketExchange, TakesAReplyThatComesByteByByte) {
+TEST_F(SocketExchange, TakesRepliesHoweverTheyAreSentAndEnded) {
+  const struct {
+    const char* name;
+    DaemonReply reply;
+    int version;
+  } cases[] = {
+      {"byte by byte", DaemonReply::Line("{\"success\":true,\"version\":12}").ByteByByte(2), 12},
+      {"more behind the newline", DaemonReply::Bytes("{\"version\":4}\n{\"version\":5}\ngarbage"),
+       4},
+      {"ended by the closing", DaemonReply::Bytes("{\"version\":6}"), 6},
+      {"white space around the object", DaemonReply::Bytes(" \t {\"version\":6} \r\n"), 6},
+  };
   DaemonPeer daemon;
-  daemon.AnswerNext(DaemonReply::Line("{\"success\":true,\"version\":12}").ByteByByte(2));
-  Json::Value packet = Request();
-  EXPECT_EQ(Exchange(packet), 0);
-  EXPECT_EQ(packet["version"].asInt(), 12);
+  for (const auto& [name, reply, version] : cases) {
+    daemon.AnswerNext(reply);
+    EXPECT_EQ(Reply()["version"].asInt(), version) << name;
+  }
 }
 
 TEST_F(SocketExchange, DoesNotWaitForTheEndOfTheConnection) {
   DaemonPeer daemon;
   daemon.AnswerNext(DaemonReply::BytesThenSilence("{\"version\":4}\n"));
-  const auto start = steady_clock::now();
-  Json::Value packet = Request();
-  EXPECT_EQ(Exchange(packet), 0);
-  EXPECT_EQ(packet["version"].asInt(), 4);
-  EXPECT_LT(SecondsSince(start), 5.0);
-}
-
-TEST_F(SocketExchange, IgnoresWhatFollowsTheNewline) {
-  DaemonPeer daemon;
-  daemon.AnswerNext(DaemonReply::Bytes("{\"version\":4}\n{\"version\":5}\ngarbage"));
-  Json::Value packet = Request();
-  EXPECT_EQ(Exchange(packet), 0);
-  EXPECT_EQ(packet["version"].asInt(), 4);
-}
-
-TEST_F(SocketExchange, TakesAReplyThatTheClosingEnds) {
-  DaemonPeer daemon;
-  daemon.AnswerNext(DaemonReply::Bytes("{\"version\":6}"));
-  Json::Value packet = Request();
-  EXPECT_EQ(Exchange(packet), 0);
-  EXPECT_EQ(packet["version"].asInt(), 6);
-}
-
-TEST_F(SocketExchange, TakesWhiteSpaceAroundTheObject) {
-  DaemonPeer daemon;
-  daemon.AnswerNext(DaemonReply::Bytes(" \t {\"version\":6} \r\n"));
-  Json::Value packet = Request();
-  EXPECT_EQ(Exchange(packet), 0);
-  EXPECT_EQ(packet["version"].asInt(), 6);
+  const Stopwatch watch;
+  EXPECT_EQ(Reply()["version"].asInt(), 4);
+  EXPECT_LT(watch.Seconds(), 5.0);
 }
 
 TEST_F(SocketExchange, TakesAnEmptyObject) {
   DaemonPeer daemon;
   daemon.AnswerNext(DaemonReply::Line("{}"));
-  Json::Value packet = Request();
-  EXPECT_EQ(Exchange(packet), 0);
-  EXPECT_TRUE(packet.isObject());
-  EXPECT_TRUE(packet.empty());
+  const Json::Value reply = Reply();
+  EXPECT_TRUE(reply.isObject());
+  EXPECT_TRUE(reply.empty());
 }
 
-TEST_F(SocketExchange, TakesAllThatJsonKnows) {
+TEST_F(SocketExchange, TakesEveryKindOfValue) {
   DaemonPeer daemon;
   daemon.AnswerNext(DaemonReply::Line(
       R"({"n":[0,-0,10,-1.5e+10,2E3,0.25],"t":true,"f":false,"z":null,"s":"// \\\" /* 01 -",)"
       R"("e":{},"a":[]})"));
-  Json::Value packet = Request();
-  EXPECT_EQ(Exchange(packet), 0);
-  EXPECT_EQ(packet["n"].size(), 6U);
-  EXPECT_EQ(packet["n"][3].asDouble(), -1.5e+10);
-  EXPECT_TRUE(packet["t"].asBool());
-  EXPECT_TRUE(packet["z"].isNull());
-  EXPECT_EQ(packet["s"].asString(), "// \\\" /* 01 -");
+  const Json::Value reply = Reply();
+  EXPECT_EQ(reply["n"].size(), 6U);
+  EXPECT_EQ(reply["n"][3].asDouble(), -1.5e+10);
+  EXPECT_TRUE(reply["t"].asBool());
+  EXPECT_TRUE(reply["z"].isNull());
+  EXPECT_EQ(reply["s"].asString(), "// \\\" /* 01 -");
 }
 
 TEST_F(SocketExchange, FailsForTextThatIsNotOneObject) {
   const std::string deep(200000, '[');
-  const std::string deepObjects = [] {
-    std::string text;
-    for (int i = 0; i < 50000; ++i) text += "{\"a\":";
-    return text;
-  }();
-  const std::vector<std::string> replies = {
-      "",
-      " ",
-      "{",
-      "}",
-      "{\"a\":1",
-      "{\"a\":1}}",
-      "{\"a\":1}{\"b\":2}",
-      "{\"a\":1} x",
-      "x{\"a\":1}",
-      "[]",
-      "[{\"a\":1}]",
-      "null",
-      "true",
-      "5",
-      "\"text\"",
-      "{\"a\":}",
-      "{a:1}",
-      "{'a':1}",
-      "{\"a\":1,}",
-      "{\"a\":[1,]}",
-      "{\"a\":1 /* comment */}",
-      "// comment",
-      "{\"a\":1} // comment",
-      "{\"a\" /* comment */ :1}",
-      "{\"a\":[1 // comment\r]}",
-      "{\"a\":01}",
-      "{\"a\":-}",
-      "{\"a\":+1}",
-      "{\"a\":1.}",
-      "{\"a\":.5}",
-      "{\"a\":1e}",
-      "{\"a\":1-2}",
-      "{\"a\":0x10}",
-      "{\"a\":NaN}",
-      "{\"a\":Infinity}",
-      "{\"a\":\"open}",
-      "{\"a\":\"\\x\"}",
-      "{\"a\":\"\\ud800\"}",
-      "\xEF\xBB\xBF{\"a\":1}",
-      std::string("\0{\"a\":1}", 8),
-      deep,
-      "{\"a\":" + deep + "}",
-      deepObjects,
-  };
+  std::string deepObjects;
+  for (int i = 0; i < 50000; ++i) deepObjects += "{\"a\":";
+  const Strings replies = {
+      // no object, or more than one
+      "", " ", "{", "}", R"({"a":1)", R"({"a":1}})", R"({"a":1}{"b":2})", R"({"a":1} x)",
+      R"(x{"a":1})", "[]", R"([{"a":1}])", "null", "true", "5", R"("text")",
+      // members and lists
+      R"({"a":})", "{a:1}", "{'a':1}", R"({"a":1,})", R"({"a":[1,]})",
+      // comments
+      R"({"a":1 /* comment */})", "// comment", R"({"a":1} // comment)",
+      R"({"a" /* comment */ :1})", "{\"a\":[1 // comment\r]}",
+      // numbers
+      R"({"a":01})", R"({"a":-})", R"({"a":+1})", R"({"a":1.})", R"({"a":.5})", R"({"a":1e})",
+      R"({"a":1-2})", R"({"a":0x10})", R"({"a":NaN})", R"({"a":Infinity})",
+      // texts
+      R"({"a":"open})", R"({"a":"\x"})", R"({"a":"\ud800"})",
+      // other bytes, and depth
+      "\xEF\xBB\xBF{\"a\":1}", std::string("\0{\"a\":1}", 8), deep, "{\"a\":" + deep + "}",
+      deepObjects};
   DaemonPeer daemon;
   for (const std::string& reply : replies) {
     SCOPED_TRACE(reply.substr(0, 40));
-    daemon.AnswerNext(DaemonReply::Line(reply));
-    ExpectFailure(reply.empty() ? ECONNRESET : EPROTO);
-    daemon.AnswerNext(DaemonReply::Bytes(reply));
-    ExpectFailure(reply.empty() ? ECONNRESET : EPROTO);
+    for (const DaemonReply& sent : {DaemonReply::Line(reply), DaemonReply::Bytes(reply)}) {
+      daemon.AnswerNext(sent);
+      ExpectFailure(reply.empty() ? ECONNRESET : EPROTO);
+    }
   }
 }
 
@@ -257,9 +201,7 @@ std::string ReplyOfSize(size_t size) {
 TEST_F(SocketExchange, TakesRepliesUpToTheLimit) {
   DaemonPeer daemon;
   daemon.AnswerNext(DaemonReply::Line(ReplyOfSize(kReplyMax)));
-  Json::Value packet = Request();
-  EXPECT_EQ(Exchange(packet, 60), 0);
-  EXPECT_EQ(packet["a"].asString().size(), kReplyMax - 8);
+  EXPECT_EQ(Reply(60)["a"].asString().size(), kReplyMax - 8);
 }
 
 TEST_F(SocketExchange, FailsForLargerReplies) {
@@ -272,32 +214,49 @@ TEST_F(SocketExchange, FailsForLargerReplies) {
 
 TEST_F(SocketExchange, FailsWithoutDaemon) {
   ExpectFailure(ENOENT);
-  vela_test::WriteFile(kDaemonSocket, "no socket");
+  WriteFile(kDaemonSocket, "no socket");
   ExpectFailure(ECONNREFUSED);
-  vela_test::RemoveTree(kDaemonSocket);
-  vela_test::MakeDirectories(kDaemonSocket);
+  RemoveTree(kDaemonSocket);
+  MakeDirectories(kDaemonSocket);
   ExpectFailure(ECONNREFUSED);
 }
 
-TEST_F(SocketExchange, FailsForASocketThatNobodyListensOn) {
-  const int server = socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0);
-  sockaddr_un address;
-  memset(&address, 0, sizeof(address));
-  address.sun_family = AF_UNIX;
-  strncpy(address.sun_path, kDaemonSocket, sizeof(address.sun_path) - 1);
-  ASSERT_EQ(bind(server, reinterpret_cast<sockaddr*>(&address), sizeof(address)), 0);
+/// The address of the daemon's socket, for bind and connect.
+class DaemonAddress {
+ public:
+  DaemonAddress() {
+    address_.sun_family = AF_UNIX;
+    std::string(kDaemonSocket).copy(address_.sun_path, sizeof(address_.sun_path) - 1);
+  }
+  const sockaddr* Get() const { return reinterpret_cast<const sockaddr*>(&address_); }
+  static socklen_t Size() { return sizeof(sockaddr_un); }
+
+ private:
+  sockaddr_un address_ = {};
+};
+
+int MakeSocket(int flags = 0) {
+  return socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC | flags, 0);
+}
+
+vela_test::Descriptor BoundSocket() {
+  vela_test::Descriptor server(MakeSocket());
+  EXPECT_EQ(bind(server.Get(), DaemonAddress().Get(), DaemonAddress::Size()), 0);
+  return server;
+}
+
+TEST_F(SocketExchange, FailsForASocketWithoutListener) {
+  vela_test::Descriptor server = BoundSocket();
   ExpectFailure(ECONNREFUSED);
-  close(server);
+  server.Close();
   ExpectFailure(ECONNREFUSED);
 }
 
 TEST_F(SocketExchange, FailsForPathsThatNoSocketHas) {
-  Json::Value packet = Request();
-  EXPECT_EQ(AutoSendRecvPacket(nullptr, -1, packet, 10), -1);
-  EXPECT_TRUE(packet.isObject() && packet.empty());
-  for (const std::string& path : {std::string(), "/tmp/" + std::string(200, 's')}) {
-    packet = Request();
-    EXPECT_EQ(AutoSendRecvPacket(path.c_str(), -1, packet, 10), -1);
+  const std::string tooLong = "/tmp/" + std::string(200, 's');
+  for (const char* path : {static_cast<const char*>(nullptr), "", tooLong.c_str()}) {
+    Json::Value packet = Request();
+    EXPECT_EQ(AutoSendRecvPacket(path, -1, packet, 10), -1);
     EXPECT_TRUE(packet.isObject() && packet.empty());
   }
 }
@@ -323,111 +282,73 @@ TEST_F(SocketExchange, NeverRaisesSigpipe) {
   DaemonPeer daemon;
   for (int round = 0; round < 20; ++round) {
     daemon.AnswerNext(DaemonReply::CloseAtOnce());
-    Json::Value packet(Json::objectValue);
-    packet["path"] = std::string(4 * 1024 * 1024, 'x');
-    EXPECT_EQ(Exchange(packet), -1);
-    EXPECT_TRUE(packet.empty());
+    ExpectFailure(0, 10, RequestOfSize(4 * 1024 * 1024));
   }
 }
 
 TEST_F(SocketExchange, FailsWhenTheTimeIsOver) {
   DaemonPeer daemon;
   daemon.AnswerNext(DaemonReply::Silence());
-  const auto start = steady_clock::now();
-  ExpectFailure(ETIMEDOUT, 1);
-  EXPECT_GE(SecondsSince(start), 1.0);
-  EXPECT_LT(SecondsSince(start), 3.0);
+  ExpectTimeoutAfterOneSecond();
 }
 
 TEST_F(SocketExchange, CountsTheTimeOfTheWholeExchange) {
   DaemonPeer daemon;
   daemon.AnswerNext(DaemonReply::Bytes(std::string(1000, ' ')).ByteByByte(20));
-  const auto start = steady_clock::now();
-  ExpectFailure(ETIMEDOUT, 1);
-  EXPECT_GE(SecondsSince(start), 1.0);
-  EXPECT_LT(SecondsSince(start), 3.0);
+  ExpectTimeoutAfterOneSecond();
 }
 
 TEST_F(SocketExchange, FailsAtOnceWithoutTime) {
   DaemonPeer daemon;
-  const auto start = steady_clock::now();
+  const Stopwatch watch;
   for (const int seconds : {0, -1, -2147483647}) {
     daemon.AnswerNext(DaemonReply::Silence());
     ExpectFailure(ETIMEDOUT, seconds);
   }
-  EXPECT_LT(SecondsSince(start), 1.0);
+  EXPECT_LT(watch.Seconds(), 1.0);
 }
 
 TEST_F(SocketExchange, FailsInTimeWhenThePeerReadsNothing) {
-  const int server = socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0);
-  sockaddr_un address;
-  memset(&address, 0, sizeof(address));
-  address.sun_family = AF_UNIX;
-  strncpy(address.sun_path, kDaemonSocket, sizeof(address.sun_path) - 1);
-  ASSERT_EQ(bind(server, reinterpret_cast<sockaddr*>(&address), sizeof(address)), 0);
-  ASSERT_EQ(listen(server, 5), 0);
-  Json::Value packet(Json::objectValue);
-  packet["path"] = std::string(8 * 1024 * 1024, 'x');
-  const auto start = steady_clock::now();
-  EXPECT_EQ(Exchange(packet, 1), -1);
-  EXPECT_EQ(VLIBCErrGet(), ETIMEDOUT);
-  EXPECT_TRUE(packet.empty());
-  EXPECT_GE(SecondsSince(start), 1.0);
-  EXPECT_LT(SecondsSince(start), 3.0);
-  close(server);
+  const vela_test::Descriptor server = BoundSocket();
+  ASSERT_EQ(listen(server.Get(), 5), 0);
+  ExpectTimeoutAfterOneSecond(RequestOfSize(8 * 1024 * 1024));
 }
 
-/// A server whose queue of waiting connections is full.
+/// A server whose queue of pending connections is full.
 class FullServer {
  public:
-  FullServer() : listener_(socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0)) {
-    memset(&address_, 0, sizeof(address_));
-    address_.sun_family = AF_UNIX;
-    strncpy(address_.sun_path, kDaemonSocket, sizeof(address_.sun_path) - 1);
-    EXPECT_EQ(bind(listener_, Address(), sizeof(address_)), 0);
-    EXPECT_EQ(listen(listener_, 0), 0);
+  FullServer() {
+    EXPECT_EQ(listen(listener_.Get(), 0), 0);
     for (;;) {
-      const int client = socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC | SOCK_NONBLOCK, 0);
-      if (connect(client, Address(), sizeof(address_)) != 0) {
+      vela_test::Descriptor client(MakeSocket(SOCK_NONBLOCK));
+      if (connect(client.Get(), DaemonAddress().Get(), DaemonAddress::Size()) != 0) {
         EXPECT_EQ(errno, EAGAIN);
-        close(client);
         return;
       }
-      clients_.push_back(client);
+      clients_.push_back(std::move(client));
     }
   }
-  ~FullServer() {
-    Close();
-    for (const int client : clients_) close(client);
-  }
 
-  void Close() {
-    if (listener_ >= 0) close(listener_);
-    listener_ = -1;
-  }
+  void Close() { listener_.Close(); }
 
-  /// Accepts all connections there are and answers the last one.
+  /// Accepts all pending connections and answers the last one.
   void ServeLast() {
-    const size_t waiting = clients_.size() + 1;
-    for (size_t i = 0; i < waiting; ++i) {
-      const int connection = accept4(listener_, nullptr, nullptr, SOCK_CLOEXEC);
-      ASSERT_GE(connection, 0);
-      if (i + 1 == waiting) {
-        char request[4096];
-        EXPECT_GT(recv(connection, request, sizeof(request), 0), 0);
-        constexpr char kReply[] = "{\"version\":8}\n";
-        send(connection, kReply, sizeof(kReply) - 1, MSG_NOSIGNAL);
-      }
-      close(connection);
+    const size_t pending = clients_.size() + 1;
+    for (size_t i = 0; i < pending; ++i) {
+      const vela_test::Descriptor connection(
+          accept4(listener_.Get(), nullptr, nullptr, SOCK_CLOEXEC));
+      ASSERT_TRUE(connection.IsOpen());
+      if (i + 1 < pending) continue;
+      char request[4096];
+      EXPECT_GT(recv(connection.Get(), request, sizeof(request), 0), 0);
+      constexpr char kReply[] = "{\"version\":8}\n";
+      send(connection.Get(), kReply, sizeof(kReply) - 1, MSG_NOSIGNAL);
     }
   }
 
  private:
-  sockaddr* Address() { return reinterpret_cast<sockaddr*>(&address_); }
-
-  sockaddr_un address_;
-  int listener_;
-  std::vector<int> clients_;
+  vela_test::Descriptor listener_ = BoundSocket();
+  std::vector<vela_test::Descriptor> clients_;
 };
 
 TEST_F(SocketExchange, WaitsForAPlaceInAFullQueue) {
@@ -436,21 +357,15 @@ TEST_F(SocketExchange, WaitsForAPlaceInAFullQueue) {
     usleep(300000);
     server.ServeLast();
   });
-  const auto start = steady_clock::now();
-  Json::Value packet = Request();
-  EXPECT_EQ(Exchange(packet), 0);
-  EXPECT_EQ(packet["version"].asInt(), 8);
-  EXPECT_GE(SecondsSince(start), 0.25);
-  EXPECT_LT(SecondsSince(start), 5.0);
+  const Stopwatch watch;
+  EXPECT_EQ(Reply()["version"].asInt(), 8);
+  watch.ExpectBetween(0.25, 5.0);
   serving.join();
 }
 
 TEST_F(SocketExchange, FailsInTimeWhenTheQueueStaysFull) {
   FullServer server;
-  const auto start = steady_clock::now();
-  ExpectFailure(ETIMEDOUT, 1);
-  EXPECT_GE(SecondsSince(start), 1.0);
-  EXPECT_LT(SecondsSince(start), 3.0);
+  ExpectTimeoutAfterOneSecond();
 }
 
 TEST_F(SocketExchange, FailsWhenAFullDaemonGoesAway) {
@@ -459,84 +374,59 @@ TEST_F(SocketExchange, FailsWhenAFullDaemonGoesAway) {
     usleep(200000);
     server.Close();
   });
-  const auto start = steady_clock::now();
+  const Stopwatch watch;
   ExpectFailure(0);
-  EXPECT_LT(SecondsSince(start), 5.0);
+  EXPECT_LT(watch.Seconds(), 5.0);
   closing.join();
 }
 
-int RunInterrupted(const std::function<int()>& call) {
-  return platform_test::RunForked([&] {
-    struct sigaction action;
-    memset(&action, 0, sizeof(action));
-    action.sa_handler = [](int) {};
-    sigaction(SIGALRM, &action, nullptr);
-    const itimerval often = {{0, 2000}, {0, 2000}};
-    setitimer(ITIMER_REAL, &often, nullptr);
-    return call();
-  });
-}
-
-TEST_F(SocketExchange, GoesOnAfterInterruptions) {
+TEST_F(SocketExchange, ContinuesAfterInterruptions) {
   DaemonPeer daemon;
   daemon.AnswerNext(DaemonReply::Line("{\"version\":9}").After(300));
-  EXPECT_EQ(RunInterrupted([] {
-              Json::Value packet = Request();
-              return Exchange(packet) == 0 && packet["version"].asInt() == 9 ? 0 : 1;
-            }),
-            0);
+  EXPECT_EQ(RunInterrupted([] { return Reply()["version"].asInt(); }), 9);
+}
+
+/// An interrupted exchange of one second at most; returns 0 when it has timed out.
+int TimeOutInterrupted() {
+  return RunInterrupted([] {
+    Json::Value packet = Request();
+    return Exchange(packet, 1) == -1 && VLIBCErrGet() == ETIMEDOUT ? 0 : 1;
+  });
 }
 
 TEST_F(SocketExchange, KeepsItsTimeAcrossInterruptions) {
   DaemonPeer daemon;
   daemon.AnswerNext(DaemonReply::Silence());
-  const auto start = steady_clock::now();
-  EXPECT_EQ(RunInterrupted([] {
-              Json::Value packet = Request();
-              return Exchange(packet, 1) == -1 && VLIBCErrGet() == ETIMEDOUT ? 0 : 1;
-            }),
-            0);
-  EXPECT_GE(SecondsSince(start), 1.0);
-  EXPECT_LT(SecondsSince(start), 3.0);
+  const Stopwatch watch;
+  EXPECT_EQ(TimeOutInterrupted(), 0);
+  watch.ExpectBetween(1.0, 3.0);
 }
 
 TEST_F(SocketExchange, WaitsForAFullQueueAcrossInterruptions) {
   FullServer server;
-  const auto start = steady_clock::now();
-  EXPECT_EQ(RunInterrupted([] {
-              Json::Value packet = Request();
-              return Exchange(packet, 1) == -1 && VLIBCErrGet() == ETIMEDOUT ? 0 : 1;
-            }),
-            0);
-  EXPECT_GE(SecondsSince(start), 1.0);
-  EXPECT_LT(SecondsSince(start), 3.0);
+  const Stopwatch watch;
+  EXPECT_EQ(TimeOutInterrupted(), 0);
+  watch.ExpectBetween(1.0, 3.0);
 }
 
 TEST_F(SocketExchange, CanBeMadeFromSeveralThreads) {
   DaemonPeer daemon;
   daemon.SetIndexVersion(5);
-  std::vector<std::thread> threads;
-  for (int i = 0; i < 4; ++i) {
-    threads.emplace_back([] {
-      for (int round = 0; round < 25; ++round) {
-        Json::Value packet = Request();
-        EXPECT_EQ(Exchange(packet), 0);
-        EXPECT_EQ(packet["version"].asInt(), 5);
-      }
-    });
-  }
-  for (std::thread& thread : threads) thread.join();
+  RunInThreads(4, [](int) {
+    for (int round = 0; round < 25; ++round) EXPECT_EQ(Reply()["version"].asInt(), 5);
+  });
 }
 
 TEST_F(SocketExchange, LeavesNoDescriptorOpen) {
-  const int before = platform_test::CountDescriptors();
-  for (int i = 0; i < 10; ++i) {
-    Json::Value packet = Request();
-    Exchange(packet);
-    packet = Request();
-    AutoSendRecvPacket("/tmp", -1, packet, 1);
-  }
-  EXPECT_EQ(platform_test::CountDescriptors(), before);
+  ExpectNoDescriptorLeak([] {
+    for (int i = 0; i < 10; ++i) {
+      Json::Value packet = Request();
+      Exchange(packet);
+      packet = Request();
+      AutoSendRecvPacket("/tmp", -1, packet, 1);
+    }
+  });
 }
 
 }  // namespace
+}  // namespace vela_test

@@ -10,10 +10,10 @@
 #include <vector>
 
 #include "profiles/photo_thumb_plan.h"
-#include "quiet_test.h"
 #include "support/files.h"
+#include "support/quiet_test.h"
 #include "support/stub_tool.h"
-#include "words.h"
+#include "support/words.h"
 
 namespace vela_test {
 

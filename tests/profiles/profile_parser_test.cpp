@@ -1,12 +1,12 @@
 // Reading the profile file.
 #include <sys/stat.h>
 
-#include "named_case.h"
 #include "profiles/thumbnail_profile.h"
-#include "quiet_test.h"
 #include "support/files.h"
+#include "support/named_case.h"
 #include "support/privileges.h"
 #include "support/profile_file.h"
+#include "support/quiet_test.h"
 
 using namespace vela;
 

@@ -1,9 +1,9 @@
 // Finding the thumbnail of a profile, checking whether it is up to date, and failure markers.
 #include <sys/stat.h>
 
-#include "named_case.h"
 #include "profiles/plan_fixture.h"
 #include "support/mounts.h"
+#include "support/named_case.h"
 
 using namespace vela;
 

@@ -74,7 +74,7 @@ TEST_F(CommandLine, TakesADirectoryAsOftenAsItIsNamed) {
                   "POST_PHOTO_CONVERT /tmp/photos/a.jpg"));
 }
 
-struct DirectoryArguments : NamedRow {
+struct DirectoryArguments : NamedCase {
   Strings photos;     ///< directories with a photo
   Strings arguments;  ///< directory arguments of a run in /tmp/cwd
   Strings done;       ///< directories that get thumbnails
@@ -117,7 +117,7 @@ INSTANTIATE_TEST_SUITE_P(
                            {"R:", "R::", "R:::", "/tmp/a"},
                            {"/tmp/a"}},
         DirectoryArguments{"EmptyNamesNothing", {"/tmp/a"}, {"", "/tmp/a", ""}, {"/tmp/a"}}),
-    RowName<DirectoryArguments>);
+    CaseName());
 
 TEST_F(CommandLine, EmptyProfileFileNamesNothing) {
   MakePhotosIn({"/tmp/a"});

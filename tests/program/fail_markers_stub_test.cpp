@@ -47,7 +47,7 @@ TEST_F(FailMarkers, OfOtherPhotosStay) {
 }
 
 /// A photo whose name is a pattern, and a name that this pattern would match.
-struct Names : NamedRow {
+struct Names : NamedCase {
   const char* photo;
   const char* neighbour;
 };
@@ -69,7 +69,7 @@ INSTANTIATE_TEST_SUITE_P(Names, PatternNames,
                                            Names{"QuestionMark", "b?.jpg", "bb.jpg"},
                                            Names{"Backslash", "c\\d.jpg", "cd.jpg"},
                                            Names{"Range", "[a-z].jpg", "q.jpg"}),
-                         RowName<Names>);
+                         CaseName());
 
 TEST_F(FailMarkers, DirectoryNamesAreNotPatternsEither) {
   const std::string photo = "/tmp/[ab]*/x.jpg";

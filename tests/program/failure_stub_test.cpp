@@ -17,7 +17,7 @@ const Strings kPhase2Failed = {"VELAPHOTO_THUMB_B.jpg", "VELAPHOTO_THUMB_M.jpg",
                                "VELAPHOTO_THUMB_S.fail", "VELAPHOTO_THUMB_XL.jpg"};
 
 /// A run in which a converter call fails.
-struct FailedRun : NamedRow {
+struct FailedRun : NamedCase {
   Strings thumbs;    ///< size classes that are there before
   int call;          ///< the call that fails
   StubPlan plan;     ///< what it does
@@ -61,7 +61,7 @@ INSTANTIATE_TEST_SUITE_P(
         FailedRun{"PhotoGrows", {}, 1, kPhotoGrows, kAllMarkers, 4, SizeIs(1)},
         FailedRun{"ThumbnailMissing", {}, 1, kOmitsM, kAllMarkers, 4, SizeIs(1)},
         FailedRun{"ThumbnailTooSmall", {}, 1, kMakesTinyM, kAllMarkers, 4, ElementsAre(kTinyM)}),
-    RowName<FailedRun>);
+    CaseName());
 
 TEST_F(Failure, OfAKilledConverterIsMarked) {
   Converter().Plan(StubPlan().WriteOutputs(1).DieBySignal(SIGKILL));

@@ -30,7 +30,7 @@ class IndexVersion : public OnePhotoTest {
 };
 
 /// A reply, and whether it makes the converter rotate the photos.
-struct Reply : NamedRow {
+struct Reply : NamedCase {
   const char* text;
   bool rotates;
 };
@@ -55,7 +55,7 @@ INSTANTIATE_TEST_SUITE_P(
                       Reply{"Failure", "{\"success\":false,\"version\":2}", true},
                       Reply{"NoSuccess", "{\"version\":2}", true}, Reply{"Empty", "{}", true},
                       Reply{"NoJson", "nonsense", true}),
-    RowName<Reply>);
+    CaseName());
 
 TEST_F(IndexVersion, IsNotKnownWithoutDaemon) {
   EXPECT_SUCCESS(Run());

@@ -50,7 +50,7 @@ class PhaseChoice : public OnePhotoTest {
 const Strings kAllClasses = {"XL", "M", "B", "S"};
 
 /// A photo that has everything: only a report, and no other trace.
-struct CompletePhoto : NamedRow {
+struct CompletePhoto : NamedCase {
   const char* settings;      ///< content of the settings file, none when null
   Strings thumbs;            ///< size classes that are there
   const char* oneByteThumb;  ///< one of them that is cut to a byte, none when null
@@ -91,10 +91,10 @@ INSTANTIATE_TEST_SUITE_P(
         CompletePhoto{"ByItsPhases", nullptr, kAllClasses, nullptr},
         CompletePhoto{"ByItsStatusWithOlderNames", kThreePhasesSizeMap, kAllClasses, nullptr,
                       true}),
-    RowName<CompletePhoto>);
+    CaseName());
 
 /// The phase that is due, by the thumbnails that are missing, outdated or too small.
-struct DuePhase : NamedRow {
+struct DuePhase : NamedCase {
   Strings thumbs;    ///< size classes that are there
   Strings outdated;  ///< of these, dated before the photo
   Strings empty;     ///< of these, without content
@@ -136,7 +136,7 @@ INSTANTIATE_TEST_SUITE_P(
         DuePhase{"Phase1Outdated", kAllClasses, {"B"}, {}, {"XL: 640"}, 0, 1, true},
         DuePhase{"Phase2Outdated", kAllClasses, {"S"}, {}, {"XL: 120"}, 1, 1, false},
         DuePhase{"EarliestFirst", {"XL", "M"}, {"XL"}, {}, {"photo: 1280", "XL: 640"}, 0, 3, true}),
-    RowName<DuePhase>);
+    CaseName());
 
 TEST_F(PhaseChoice, ThumbnailOfOneByteMakesItsPhaseDue) {
   // A file of one byte is not made again, but its phase is not complete either.

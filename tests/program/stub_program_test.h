@@ -13,7 +13,7 @@
 #include "program/program_paths.h"
 #include "support/daemon_peer.h"
 #include "support/files.h"
-#include "support/named_rows.h"
+#include "support/named_case.h"
 #include "support/profile_file.h"
 #include "support/program.h"
 #include "support/sandbox.h"

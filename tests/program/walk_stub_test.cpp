@@ -37,7 +37,7 @@ TEST_F(Walk, EachDirectoryGetsItsOwnPass) {
   EXPECT_EQ(MetadataOf("/tmp/photos/sub/a.jpg"), kThumbsOfFirstRun);
 }
 
-struct Tree : NamedRow {
+struct Tree : NamedCase {
   Strings photos;  ///< directories with a photo
   std::string start;
   Strings taken;  ///< directories whose photo is reported, in order
@@ -66,7 +66,7 @@ INSTANTIATE_TEST_SUITE_P(
         Tree{"RefusedStart", {"/tmp/@tmp", "/tmp/@tmp/below"}, "/tmp/@tmp", {}},
         Tree{"RefusedNameAboveTheStart", {"/tmp/@a/sub"}, "/tmp/@a/sub", {"/tmp/@a/sub"}},
         Tree{"StartWithSlashesAtItsEnd", kTwo, "/tmp/photos///", kTwo}),
-    RowName<Tree>);
+    CaseName());
 
 TEST_F(Walk, SkipsRefusedNamesWithAllBelow) {
   MakePhotosIn({kRefused});

@@ -11,8 +11,8 @@
 #include <sstream>
 
 #include "progress/velamk_progress.h"
-#include "quiet_test.h"
 #include "support/files.h"
+#include "support/quiet_test.h"
 
 namespace vela_test {
 namespace {

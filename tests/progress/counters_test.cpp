@@ -2,9 +2,9 @@
 #include <climits>
 
 #include "progress/velamk_progress.h"
-#include "quiet_test.h"
 #include "support/files.h"
 #include "support/mounts.h"
+#include "support/quiet_test.h"
 
 namespace vela_test {
 namespace {

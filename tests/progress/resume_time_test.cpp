@@ -7,9 +7,9 @@
 #include <ctime>
 
 #include "progress/velamk_progress.h"
-#include "quiet_test.h"
 #include "support/files.h"
 #include "support/privileges.h"
+#include "support/quiet_test.h"
 
 namespace vela_test {
 namespace {

@@ -34,7 +34,7 @@ TEST_F(Distance, IsReadFromBothOutputs) {
   EXPECT_EQ(DistanceAfter(StubPlan().Print("14 ").PrintError("15 \n")), 14);
 }
 
-struct Printed : NamedRow {
+struct Printed : NamedCase {
   std::string text;
   int distance;
 };
@@ -61,7 +61,7 @@ INSTANTIATE_TEST_SUITE_P(
                       Printed{"LongLine", "5 " + std::string(100000, 'x') + "\n", 5},
                       Printed{"SpaceWithin255Bytes", std::string(252, '0') + "25 5\n", 25},
                       Printed{"Nothing", "", kUnknown}),
-    RowName<Printed>);
+    CaseName());
 
 TEST_F(Distance, IsUnknownWithoutOutput) {
   EXPECT_EQ(DistanceAfter(StubPlan()), kUnknown);

@@ -52,7 +52,7 @@ TEST_F(PreviewRotation, IsReadByExiftool) {
   EXPECT_THAT(ErrorLines(), IsEmpty());
 }
 
-struct Printed : NamedRow {
+struct Printed : NamedCase {
   std::string text;
   int rotation;
 };
@@ -76,7 +76,7 @@ INSTANTIATE_TEST_SUITE_P(Values, PrintedRotation,
                                            Printed{"Hexadecimal", "Rotation: 0x5a\n", 0},
                                            Printed{"NoNewline", "Rotation: 270", 270},
                                            Printed{"Nothing", "", 0}),
-                         RowName<Printed>);
+                         CaseName());
 
 // The last line with the tag counts; a line longer than 255 bytes is read as several.
 const std::string kLongOwner = "Owner: " + std::string(100000, 'x');
@@ -98,7 +98,7 @@ INSTANTIATE_TEST_SUITE_P(
                       Printed{"AfterALongLine", kLongOwner + "\nRotation: 90\n", 90},
                       Printed{"After255Bytes", std::string(255, 'x') + "Rotation: 90\n", 90},
                       Printed{"After254Bytes", std::string(254, 'x') + "Rotation: 90\n", 0}),
-    RowName<Printed>);
+    CaseName());
 
 TEST_F(PreviewRotation, IsNoneWithoutOutput) {
   EXPECT_EQ(RotationAfter(StubPlan().PrintError("Rotation: 90\n")), 0);
@@ -129,7 +129,7 @@ TEST_F(PreviewRotation, IsNoneForAPreviewThatIsNotUpright) {
   EXPECT_THAT(ErrorLines(), IsEmpty());
 }
 
-struct BadPreview : NamedRow {
+struct BadPreview : NamedCase {
   std::function<void()> make;
 };
 
@@ -152,7 +152,7 @@ INSTANTIATE_TEST_SUITE_P(
                       BadPreview{"Text", [] { WriteFile(kPicture, "no picture"); }},
                       BadPreview{"Empty", [] { WriteFile(kPicture, ""); }},
                       BadPreview{"Directory", [] { MakeDirectories(kPicture); }}),
-    RowName<BadPreview>);
+    CaseName());
 
 class RealRotation : public PreviewRotation {
  protected:

@@ -55,7 +55,7 @@ TEST_F(RawSize, IsReadByTheDecoder) {
   EXPECT_THAT(ErrorLines(), IsEmpty());
 }
 
-struct Printed : NamedRow {
+struct Printed : NamedCase {
   std::string text;
   std::string size;
 };
@@ -84,7 +84,7 @@ INSTANTIATE_TEST_SUITE_P(
                       Printed{"ZeroWidth", "Output size: 0 x 4\n", kNone},
                       Printed{"ZeroHeight", "Output size: 3 x 0\n", kNone},
                       Printed{"Negative", "Output size: -3 x 4\n", kNone}),
-    RowName<Printed>);
+    CaseName());
 
 const std::string kLongOwner = "Owner: " + std::string(10000, 'x');
 const char* const kSeveralSizes =
@@ -108,7 +108,7 @@ INSTANTIATE_TEST_SUITE_P(
         Printed{"After255Bytes", std::string(255, 'x') + "Output size: 3 x 4\n", "3x4"},
         Printed{"After254Bytes", std::string(254, 'x') + "Output size: 3 x 4\n", kNone},
         Printed{"After256Bytes", std::string(256, 'x') + "Output size: 3 x 4\n", kNone}),
-    RowName<Printed>);
+    CaseName());
 
 TEST_F(RawSize, IsMissingInAnEmptyOutput) {
   EXPECT_EQ(SizeIn(""), kNone);

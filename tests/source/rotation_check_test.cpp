@@ -73,7 +73,7 @@ class RotationCheck : public SourceTest {
 };
 
 /// Two turns that are possible for a reference of this size, of which the first one is preferred.
-struct Shape : NamedRow {
+struct Shape : NamedCase {
   int width;
   int height;
   int preferred;
@@ -94,7 +94,7 @@ class EachShape : public RotationCheck, public ::testing::WithParamInterface<Sha
 INSTANTIATE_TEST_SUITE_P(Shapes, EachShape,
                          ::testing::Values(Shape{"ThatOfThePhoto", 32, 24, 0, 180},
                                            Shape{"TheOther", 24, 32, 90, 270}),
-                         RowName<Shape>);
+                         CaseName());
 
 TEST_P(EachShape, TakesTheCloserTurn) {
   EXPECT_EQ(TurnAt(preferred_, 5, other_, 6), preferred_);

@@ -17,7 +17,7 @@
 #include "support/image_checks.h"
 #include "support/images.h"
 #include "support/mounts.h"
-#include "support/named_rows.h"
+#include "support/named_case.h"
 #include "support/raw_photos.h"
 #include "support/sandbox.h"
 #include "support/stub_tool.h"

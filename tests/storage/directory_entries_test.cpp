@@ -5,11 +5,11 @@
 #include <stdexcept>
 
 #include "posix/cut_text.h"
-#include "quiet_test.h"
 #include "storage/directory_tree.h"
 #include "storage/velamk_thumb_status.h"
 #include "support/files.h"
 #include "support/privileges.h"
+#include "support/quiet_test.h"
 
 using namespace vela;
 

@@ -2,9 +2,9 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
-#include "named_case.h"
 #include "storage/deep_files.h"
 #include "storage/photo_tree.h"
+#include "support/named_case.h"
 #include "support/privileges.h"
 
 namespace vela_test {

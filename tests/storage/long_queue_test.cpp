@@ -4,10 +4,10 @@
 #include <ostream>
 #include <thread>
 
-#include "quiet_test.h"
 #include "storage/creation_queue.h"
 #include "storage/velamk_thumb_status.h"
 #include "support/files.h"
+#include "support/quiet_test.h"
 
 using namespace vela;
 

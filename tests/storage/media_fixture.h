@@ -7,8 +7,8 @@
 #include <vector>
 
 #include "platform/vlibc.h"
-#include "quiet_test.h"
 #include "support/files.h"
+#include "support/quiet_test.h"
 
 namespace vela_test {
 

@@ -4,10 +4,10 @@
 #include <cerrno>
 #include <ostream>
 
-#include "quiet_test.h"
 #include "storage/creation_queue.h"
 #include "support/files.h"
 #include "support/privileges.h"
+#include "support/quiet_test.h"
 
 using namespace vela;
 

@@ -1,9 +1,9 @@
 // The table of size classes and the size map.
 #include <climits>
 
-#include "quiet_test.h"
 #include "storage/media_fixture.h"
 #include "storage/velamk_util.h"
+#include "support/quiet_test.h"
 
 using namespace vela;
 

@@ -1,8 +1,8 @@
 // The pass that checks the thumbnails of one media file and removes bad ones.
-#include "named_case.h"
 #include "storage/velamk_util.h"
 #include "storage/video_fixture.h"
 #include "support/images.h"
+#include "support/named_case.h"
 
 using namespace vela;
 

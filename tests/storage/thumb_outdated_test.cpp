@@ -1,9 +1,9 @@
 // Whether a derived file has to be made again.
 #include <unistd.h>
 
-#include "named_case.h"
 #include "storage/media_fixture.h"
 #include "storage/velamk_util.h"
+#include "support/named_case.h"
 
 using namespace vela;
 

@@ -1,10 +1,10 @@
 // The thumbnail status of one photo.
 #include <ostream>
 
-#include "named_case.h"
 #include "storage/media_fixture.h"
 #include "storage/velamk_thumb_status.h"
 #include "support/files.h"
+#include "support/named_case.h"
 
 namespace vela_test {
 namespace {

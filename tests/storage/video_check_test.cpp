@@ -6,10 +6,10 @@
 #include <tuple>
 #include <utility>
 
-#include "named_case.h"
 #include "storage/velamk_util.h"
 #include "storage/video_fixture.h"
 #include "support/mounts.h"
+#include "support/named_case.h"
 
 using namespace vela;
 

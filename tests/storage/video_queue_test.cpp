@@ -1,12 +1,12 @@
 // The videos of a queue file that need work.
 #include <sys/stat.h>
 
-#include "named_case.h"
-#include "quiet_test.h"
 #include "storage/media_fixture.h"
 #include "storage/velamk_thumb_status.h"
 #include "support/files.h"
+#include "support/named_case.h"
 #include "support/privileges.h"
+#include "support/quiet_test.h"
 
 namespace vela_test {
 namespace {

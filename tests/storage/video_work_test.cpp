@@ -1,10 +1,10 @@
 // Whether one video needs work.
 #include <utility>
 
-#include "named_case.h"
 #include "storage/velamk_thumb_status.h"
 #include "storage/video_fixture.h"
 #include "support/images.h"
+#include "support/named_case.h"
 
 namespace vela_test {
 namespace {

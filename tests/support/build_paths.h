@@ -8,7 +8,7 @@ namespace vela_test {
 /// The program under test, `velathumb`.
 std::string VelathumbPath();
 
-/// The recording stub that stands for the external tools.
+/// The recording stub that replaces the external tools.
 std::string StubToolPath();
 
 /// The project's own converter, `convert-thumb`.

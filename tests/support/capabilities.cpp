@@ -8,6 +8,9 @@
 
 #include <cerrno>
 
+#include "support/environment_failure.h"
+#include "support/privileges.h"
+
 namespace vela_test {
 
 namespace {
@@ -20,6 +23,13 @@ struct CapabilitySets {
   bool Read() { return syscall(SYS_capget, &header, data) == 0; }
   bool Write() { return syscall(SYS_capset, &header, data) == 0; }
 };
+
+void MustBeDone(int error) {
+  if (error != 0) {
+    errno = error;
+    EnvironmentFailureWithErrno("cannot change the capabilities");
+  }
+}
 
 }  // namespace
 
@@ -46,6 +56,17 @@ int GiveUpCapabilities() {
   }
   CapabilitySets sets;
   return sets.Write() ? 0 : errno;
+}
+
+WithoutCapabilities::WithoutCapabilities() : effective_(0) {
+  bool ok = false;
+  effective_ = EffectiveCapabilities(&ok);
+  MustBeDone(ok ? 0 : errno);
+  MustBeDone(SetEffectiveCapabilities(0));
+}
+
+WithoutCapabilities::~WithoutCapabilities() {
+  MustBeDone(SetEffectiveCapabilities(effective_));
 }
 
 }  // namespace vela_test

@@ -85,7 +85,7 @@ class Connection {
     }
   }
 
-  /// Whether the daemon still lives after so long.
+  /// Waits; returns whether the daemon is still running.
   bool Pause(int milliseconds) const {
     pollfd stop = {stop_, POLLIN, 0};
     return milliseconds <= 0 || poll(&stop, 1, milliseconds) == 0;
@@ -105,52 +105,6 @@ class Connection {
 
 }  // namespace
 
-DaemonReply DaemonReply::Line(const std::string& text) {
-  return Bytes(text + "\n");
-}
-
-DaemonReply DaemonReply::Bytes(const std::string& bytes) {
-  DaemonReply reply;
-  reply.bytes_ = bytes;
-  return reply;
-}
-
-DaemonReply DaemonReply::Silence() {
-  return BytesThenSilence("");
-}
-
-DaemonReply DaemonReply::BytesThenSilence(const std::string& bytes) {
-  DaemonReply reply = Bytes(bytes);
-  reply.keepOpen_ = true;
-  return reply;
-}
-
-DaemonReply DaemonReply::CloseAtOnce() {
-  DaemonReply reply;
-  reply.readRequest_ = false;
-  return reply;
-}
-
-DaemonReply DaemonReply::CloseAfterRequest() {
-  return Bytes("");
-}
-
-DaemonReply& DaemonReply::After(int milliseconds) {
-  delayMilliseconds_ = milliseconds;
-  return *this;
-}
-
-DaemonReply& DaemonReply::ByteByByte(int pauseMilliseconds) {
-  byteByByte_ = true;
-  pauseMilliseconds_ = pauseMilliseconds;
-  return *this;
-}
-
-DaemonReply& DaemonReply::Meanwhile(std::function<void(const DaemonRequest&)> action) {
-  action_ = std::move(action);
-  return *this;
-}
-
 class DaemonPeer::Server {
  public:
   explicit Server(std::string path)
@@ -158,10 +112,12 @@ class DaemonPeer::Server {
     if (!stop_.IsOpen()) {
       EnvironmentFailureWithErrno("cannot make an event descriptor");
     }
-    Answer("GET_MEDIA_FROM_PLUGIN_DB", DaemonReply::Line("{\"success\":true,\"media\":{}}"));
-    Answer("GET_INDEX_VERSION", DaemonReply::Line(VersionAnswer(0)));
-    Answer("IS_DISABLE_CONVERT_VIDEO", DaemonReply::Line("{\"success\":true,\"result\":false}"));
-    Answer("IS_DISABLE_CONVERT_PHOTO", DaemonReply::Line("{\"success\":true,\"result\":false}"));
+    const DaemonReply notDisabled = DaemonReply::Line("{\"success\":true,\"result\":false}");
+    byCommand_ = {
+        {"GET_MEDIA_FROM_PLUGIN_DB", DaemonReply::Line("{\"success\":true,\"media\":{}}")},
+        {"GET_INDEX_VERSION", DaemonReply::Line(VersionAnswer(0))},
+        {"IS_DISABLE_CONVERT_VIDEO", notDisabled},
+        {"IS_DISABLE_CONVERT_PHOTO", notDisabled}};
     acceptor_ = StartQuietThread([this] { Accept(); });
   }
 
@@ -177,31 +133,12 @@ class DaemonPeer::Server {
   Server(const Server&) = delete;
   Server& operator=(const Server&) = delete;
 
-  void Answer(const std::string& command, const DaemonReply& reply) {
-    const std::lock_guard<std::mutex> lock(mutex_);
-    byCommand_[command] = reply;
-  }
-
-  void AnswerNext(const DaemonReply& reply) {
-    const std::lock_guard<std::mutex> lock(mutex_);
-    next_.push_back(reply);
-  }
-
-  std::vector<DaemonRequest> Requests() const {
-    const std::lock_guard<std::mutex> lock(mutex_);
-    return requests_;
-  }
-
-  bool WaitForRequests(size_t count, int milliseconds) const {
-    std::unique_lock<std::mutex> lock(mutex_);
-    return requestCame_.wait_for(lock, std::chrono::milliseconds(milliseconds),
-                                 [&] { return requests_.size() >= count; });
-  }
-
-  size_t Connections() const {
-    const std::lock_guard<std::mutex> lock(mutex_);
-    return accepted_;
-  }
+  std::mutex mutex_;  // for the members below
+  std::condition_variable requestCame_;
+  std::vector<DaemonRequest> requests_;
+  std::map<std::string, DaemonReply> byCommand_;
+  std::deque<DaemonReply> next_;
+  size_t accepted_ = 0;
 
  private:
   static Descriptor Listen(const std::string& path) {
@@ -269,7 +206,7 @@ class DaemonPeer::Server {
     return request;
   }
 
-  DaemonReply ReplyFor(const std::string& command) const {
+  DaemonReply ReplyFor(const std::string& command) {
     const std::lock_guard<std::mutex> lock(mutex_);
     const auto found = byCommand_.find(command);
     return found != byCommand_.end() ? found->second : DaemonReply::Line("{\"success\":true}");
@@ -304,12 +241,6 @@ class DaemonPeer::Server {
   const std::string path_;
   const Descriptor listener_;
   const Descriptor stop_;
-  mutable std::mutex mutex_;
-  mutable std::condition_variable requestCame_;
-  std::vector<DaemonRequest> requests_;
-  std::map<std::string, DaemonReply> byCommand_;
-  std::deque<DaemonReply> next_;
-  size_t accepted_ = 0;
   std::vector<std::thread> connections_;  // the accepting thread's own until it has ended
   std::thread acceptor_;
 };
@@ -320,11 +251,13 @@ DaemonPeer::DaemonPeer(const std::string& socketPath)
 DaemonPeer::~DaemonPeer() = default;
 
 void DaemonPeer::Answer(const std::string& command, const DaemonReply& reply) {
-  server_->Answer(command, reply);
+  const std::lock_guard<std::mutex> lock(server_->mutex_);
+  server_->byCommand_[command] = reply;
 }
 
 void DaemonPeer::AnswerNext(const DaemonReply& reply) {
-  server_->AnswerNext(reply);
+  const std::lock_guard<std::mutex> lock(server_->mutex_);
+  server_->next_.push_back(reply);
 }
 
 void DaemonPeer::SetIndexVersion(int version) {
@@ -332,7 +265,8 @@ void DaemonPeer::SetIndexVersion(int version) {
 }
 
 std::vector<DaemonRequest> DaemonPeer::Requests() const {
-  return server_->Requests();
+  const std::lock_guard<std::mutex> lock(server_->mutex_);
+  return server_->requests_;
 }
 
 std::vector<std::string> DaemonPeer::Commands() const {
@@ -344,11 +278,14 @@ std::vector<std::string> DaemonPeer::Commands() const {
 }
 
 bool DaemonPeer::WaitForRequests(size_t count, int milliseconds) const {
-  return server_->WaitForRequests(count, milliseconds);
+  std::unique_lock<std::mutex> lock(server_->mutex_);
+  return server_->requestCame_.wait_for(lock, std::chrono::milliseconds(milliseconds),
+                                        [&] { return server_->requests_.size() >= count; });
 }
 
 size_t DaemonPeer::Connections() const {
-  return server_->Connections();
+  const std::lock_guard<std::mutex> lock(server_->mutex_);
+  return server_->accepted_;
 }
 
 }  // namespace vela_test

@@ -6,6 +6,7 @@
 #include <functional>
 #include <memory>
 #include <string>
+#include <utility>
 #include <vector>
 
 namespace vela_test {
@@ -23,24 +24,46 @@ struct DaemonRequest {
 class DaemonReply {
  public:
   /// Answers with the text and a newline, then closes.
-  static DaemonReply Line(const std::string& text);
+  static DaemonReply Line(const std::string& text) { return Bytes(text + "\n"); }
   /// Answers with exactly these bytes, then closes.
-  static DaemonReply Bytes(const std::string& bytes);
+  static DaemonReply Bytes(const std::string& bytes) {
+    DaemonReply reply;
+    reply.bytes_ = bytes;
+    return reply;
+  }
   /// Reads the request, never answers, keeps the connection until the other side closes it.
-  static DaemonReply Silence();
+  static DaemonReply Silence() { return BytesThenSilence(""); }
   /// Answers with exactly these bytes, then keeps the connection as Silence does.
-  static DaemonReply BytesThenSilence(const std::string& bytes);
+  static DaemonReply BytesThenSilence(const std::string& bytes) {
+    DaemonReply reply = Bytes(bytes);
+    reply.keepOpen_ = true;
+    return reply;
+  }
   /// Closes without reading the request.
-  static DaemonReply CloseAtOnce();
+  static DaemonReply CloseAtOnce() {
+    DaemonReply reply;
+    reply.readRequest_ = false;
+    return reply;
+  }
   /// Reads the request and closes without an answer.
-  static DaemonReply CloseAfterRequest();
+  static DaemonReply CloseAfterRequest() { return Bytes(""); }
 
   /// Waits this long before the answer (or the closing).
-  DaemonReply& After(int milliseconds);
+  DaemonReply& After(int milliseconds) {
+    delayMilliseconds_ = milliseconds;
+    return *this;
+  }
   /// Sends the answer one byte at a time with this pause between.
-  DaemonReply& ByteByByte(int pauseMilliseconds = 0);
+  DaemonReply& ByteByByte(int pauseMilliseconds = 0) {
+    byteByByte_ = true;
+    pauseMilliseconds_ = pauseMilliseconds;
+    return *this;
+  }
   /// Calls this, on the connection's own thread, while the other side waits for the answer.
-  DaemonReply& Meanwhile(std::function<void(const DaemonRequest&)> action);
+  DaemonReply& Meanwhile(std::function<void(const DaemonRequest&)> action) {
+    action_ = std::move(action);
+    return *this;
+  }
 
  private:
   friend class DaemonPeer;
@@ -65,7 +88,7 @@ class DaemonPeer {
 
   /// Every request with this command gets `reply`.
   void Answer(const std::string& command, const DaemonReply& reply);
-  /// The next connection that no earlier call of this kind is for gets `reply`, whatever it asks.
+  /// Queues `reply` for the next connection without one, whatever its request.
   void AnswerNext(const DaemonReply& reply);
   /// Shorthand: the index version that GET_INDEX_VERSION gives.
   void SetIndexVersion(int version);

@@ -4,21 +4,25 @@
 #include <gtest/gtest.h>
 #include <sys/stat.h>
 #include <time.h>
-#include <unistd.h>
 
 #include <algorithm>
 #include <cerrno>
 #include <chrono>
+#include <cstdio>
 #include <cstring>
+#include <filesystem>
+#include <fstream>
 #include <functional>
+#include <optional>
 #include <ostream>
+#include <sstream>
 #include <thread>
-
-#include "support/descriptor.h"
 
 namespace vela_test {
 
 namespace {
+
+namespace fs = std::filesystem;
 
 void Fail(const std::string& what, const std::string& path) {
   ADD_FAILURE() << "cannot " << what << " " << path << ": " << std::strerror(errno);
@@ -31,41 +35,30 @@ void MakeParents(const std::string& path) {
   }
 }
 
-bool WriteAll(int file, const std::string& content) {
-  size_t done = 0;
-  while (done < content.size()) {
-    const ssize_t written = write(file, content.data() + done, content.size() - done);
-    if (written < 0) {
-      return false;
-    }
-    done += static_cast<size_t>(written);
-  }
-  return true;
-}
-
-void Write(const std::string& path, const std::string& content, int flags) {
-  const Descriptor file(open(path.c_str(), O_WRONLY | O_CREAT | O_CLOEXEC | flags, 0666));
-  if (!file.IsOpen() || !WriteAll(file.Get(), content)) {
+/// `mode` as for fopen; "e" keeps the descriptor from programs that are started meanwhile.
+void Write(const std::string& path, const std::string& content, const char* mode) {
+  std::FILE* const file = std::fopen(path.c_str(), mode);
+  const bool isWritten =
+      file != nullptr && std::fwrite(content.data(), 1, content.size(), file) == content.size();
+  if ((file != nullptr && std::fclose(file) != 0) || !isWritten) {
     Fail("write", path);
   }
 }
 
-/// Status of a file, links followed; whether there is one.
-bool Status(const std::string& path, struct stat* status) {
-  return stat(path.c_str(), status) == 0;
+/// The file's status, links followed; empty when there is no such file.
+std::optional<struct stat> StatusOf(const std::string& path) {
+  struct stat status {};
+  return stat(path.c_str(), &status) == 0 ? std::optional(status) : std::nullopt;
 }
 
-void AddTree(const std::string& top, const std::string& below, std::vector<std::string>* found) {
-  for (const std::string& name : ListDirectory(top + "/" + below)) {
-    const std::string path = below + name;
-    struct stat status {};
-    const bool isDirectory =
-        lstat((top + "/" + path).c_str(), &status) == 0 && S_ISDIR(status.st_mode);
-    found->push_back(isDirectory ? path + "/" : path);
-    if (isDirectory) {
-      AddTree(top, path + "/", found);
-    }
+/// The same for a file that has to be there.
+struct stat ExistingStatus(const std::string& path) {
+  const struct stat none {};
+  const auto status = StatusOf(path);
+  if (!status) {
+    Fail("examine", path);
   }
+  return status.value_or(none);
 }
 
 bool WaitFor(const std::function<bool()>& condition, int milliseconds) {
@@ -83,7 +76,7 @@ bool WaitFor(const std::function<bool()>& condition, int milliseconds) {
 
 void WriteFile(const std::string& path, const std::string& content) {
   MakeParents(path);
-  Write(path, content, O_TRUNC);
+  Write(path, content, "we");
 }
 
 void WriteFileOfSize(const std::string& path, size_t bytes) {
@@ -91,25 +84,17 @@ void WriteFileOfSize(const std::string& path, size_t bytes) {
 }
 
 void AppendToFile(const std::string& path, const std::string& content) {
-  Write(path, content, O_APPEND);
+  Write(path, content, "ae");
 }
 
 std::string ReadFile(const std::string& path) {
-  const Descriptor file(open(path.c_str(), O_RDONLY | O_CLOEXEC));
-  if (!file.IsOpen()) {
+  const std::ifstream file(path, std::ios::binary);
+  std::ostringstream content;
+  content << file.rdbuf();
+  if (!file || content.bad()) {
     Fail("open", path);
-    return "";
   }
-  std::string content;
-  char buffer[65536];
-  ssize_t count = 0;
-  while ((count = read(file.Get(), buffer, sizeof buffer)) > 0) {
-    content.append(buffer, static_cast<size_t>(count));
-  }
-  if (count < 0) {
-    Fail("read", path);
-  }
-  return content;
+  return content.str();
 }
 
 std::vector<std::string> ReadLines(const std::string& path) {
@@ -135,15 +120,9 @@ void MakeDirectories(const std::string& path) {
 }
 
 void RemoveTree(const std::string& path) {
-  if (unlink(path.c_str()) == 0 || errno == ENOENT) {
-    return;
-  }
-  for (const std::string& name : ListDirectory(path)) {
-    RemoveTree(path + "/" + name);
-  }
-  if (rmdir(path.c_str()) != 0) {
-    Fail("remove", path);
-  }
+  std::error_code error;
+  fs::remove_all(path, error);
+  EXPECT_FALSE(error) << "cannot remove " << path << ": " << error.message();
 }
 
 void CopyFile(const std::string& from, const std::string& to) {
@@ -156,23 +135,23 @@ bool Exists(const std::string& path) {
 }
 
 bool IsRegularFile(const std::string& path) {
-  struct stat status {};
-  return Status(path, &status) && S_ISREG(status.st_mode);
+  const auto status = StatusOf(path);
+  return status && S_ISREG(status->st_mode);
 }
 
 bool IsDirectory(const std::string& path) {
-  struct stat status {};
-  return Status(path, &status) && S_ISDIR(status.st_mode);
+  const auto status = StatusOf(path);
+  return status && S_ISDIR(status->st_mode);
 }
 
 int64_t FileSize(const std::string& path) {
-  struct stat status {};
-  return Status(path, &status) ? status.st_size : -1;
+  const auto status = StatusOf(path);
+  return status ? status->st_size : -1;
 }
 
 int ModeOf(const std::string& path) {
-  struct stat status {};
-  return Status(path, &status) ? static_cast<int>(status.st_mode & 07777) : -1;
+  const auto status = StatusOf(path);
+  return status ? static_cast<int>(status->st_mode & 07777) : -1;
 }
 
 void PrintTo(const FileTime& time, std::ostream* out) {
@@ -192,32 +171,20 @@ void SetFileTimeFromNow(const std::string& path, int64_t secondsFromNow) {
 }
 
 FileTime ModificationTime(const std::string& path) {
-  struct stat status {};
-  if (!Status(path, &status)) {
-    Fail("examine", path);
-  }
+  const struct stat status = ExistingStatus(path);
   return {status.st_mtim.tv_sec, status.st_mtim.tv_nsec};
 }
 
 FileTime AccessTime(const std::string& path) {
-  struct stat status {};
-  if (!Status(path, &status)) {
-    Fail("examine", path);
-  }
+  const struct stat status = ExistingStatus(path);
   return {status.st_atim.tv_sec, status.st_atim.tv_nsec};
 }
 
 std::vector<std::string> ListDirectory(const std::string& path) {
   std::vector<std::string> names;
-  const DirectoryStream directory(opendir(path.c_str()));
-  if (directory == nullptr) {
-    return names;
-  }
-  while (const dirent* entry = readdir(directory.get())) {
-    const std::string name = entry->d_name;
-    if (name != "." && name != "..") {
-      names.push_back(name);
-    }
+  std::error_code error;
+  for (const auto& entry : fs::directory_iterator(path, error)) {
+    names.push_back(entry.path().filename().string());
   }
   std::sort(names.begin(), names.end());
   return names;
@@ -225,7 +192,11 @@ std::vector<std::string> ListDirectory(const std::string& path) {
 
 std::vector<std::string> ListTree(const std::string& path) {
   std::vector<std::string> found;
-  AddTree(path, "", &found);
+  std::error_code error;
+  for (const auto& entry : fs::recursive_directory_iterator(path, error)) {
+    const bool isDirectory = entry.symlink_status().type() == fs::file_type::directory;
+    found.push_back(entry.path().lexically_relative(path).string() + (isDirectory ? "/" : ""));
+  }
   std::sort(found.begin(), found.end());
   return found;
 }

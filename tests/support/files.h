@@ -1,4 +1,4 @@
-// Files for tests: write, read, date, list. A failure of one of these fails the test at hand.
+// Files for tests: write, read, date, list. A failure of one of these fails the current test.
 #pragma once
 
 #include <sys/types.h>
@@ -25,10 +25,10 @@ std::string ReadFile(const std::string& path);
 /// The lines of a text file without their newlines.
 std::vector<std::string> ReadLines(const std::string& path);
 
-/// Makes the directory and those above it, mode 0777 whatever the mask.
+/// Makes the directory and those above it, mode 0777 regardless of the umask.
 void MakeDirectories(const std::string& path);
 
-/// Removes a file or a whole tree; a missing one is no failure.
+/// Removes a file or a whole tree; missing ones are ignored.
 void RemoveTree(const std::string& path);
 
 /// Copies the content of one file to another (new or overwritten).
@@ -79,10 +79,10 @@ std::vector<std::string> ListDirectory(const std::string& path);
 /// trailing "/"; links are not followed.
 std::vector<std::string> ListTree(const std::string& path);
 
-/// Waits until the path exists, at most `milliseconds`; whether it came.
+/// Waits until the path exists, at most `milliseconds`; returns whether it does.
 bool WaitUntilExists(const std::string& path, int milliseconds = 10000);
 
-/// Waits until the path is gone, at most `milliseconds`; whether it went.
+/// Waits until the path is gone, at most `milliseconds`; returns whether it is.
 bool WaitUntilGone(const std::string& path, int milliseconds = 10000);
 
 }  // namespace vela_test

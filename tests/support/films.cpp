@@ -1,5 +1,6 @@
 #include "support/films.h"
 
+#include <cmath>
 #include <cstdint>
 #include <vector>
 
@@ -53,55 +54,12 @@ Arguments FfmpegArguments(const std::string& path, const FilmRecipe& recipe) {
   return arguments;
 }
 
-/// The four factors of the matrix that turns the picture: x' = a x + c y, y' = b x + d y, with y
-/// downwards.
-struct Turn {
-  int a;
-  int b;
-  int c;
-  int d;
-};
-
-Turn TurnBy(int rotation) {
-  switch (rotation) {
-    case 90:
-      return {0, 1, -1, 0};
-    case 180:
-      return {-1, 0, 0, -1};
-    case 270:
-      return {0, -1, 1, 0};
-    default:
-      EnvironmentFailure("no film is turned by " + std::to_string(rotation) + " degrees");
-  }
-}
-
-std::string BigEndian(uint32_t value) {
+/// A number with 16 fractional bits, the highest byte first.
+std::string FixedPoint(double value) {
+  const auto bits = static_cast<uint32_t>(std::lround(value * 65536));
   std::string bytes;
-  for (const int shift : {24, 16, 8, 0}) bytes += static_cast<char>(value >> shift & 0xff);
+  for (const int shift : {24, 16, 8, 0}) bytes += static_cast<char>(bits >> shift & 0xff);
   return bytes;
-}
-
-std::string FixedPoint(int value) {
-  return BigEndian(static_cast<uint32_t>(value) << 16);
-}
-
-/// Sets the matrix in the first track's header, which is the picture's: how ffmpeg is told about a
-/// rotation differs from one version to the next.
-void SetRotation(const std::string& path, int rotation) {
-  constexpr size_t kNameSize = 4;
-  constexpr size_t kMatrixOffset = 40;  // in a header of version 0
-  const Turn turn = TurnBy(rotation);
-  const std::string matrix = FixedPoint(turn.a) + FixedPoint(turn.b) + BigEndian(0) +
-                             FixedPoint(turn.c) + FixedPoint(turn.d) + BigEndian(0);
-  std::string film = ReadFile(path);
-  const size_t header = film.find("tkhd");
-  const size_t content = header + kNameSize;
-  if (header == std::string::npos || content + kMatrixOffset + matrix.size() > film.size() ||
-      film[content] != 0) {
-    EnvironmentFailure("cannot turn the film " + path);
-  }
-  film.replace(content + kMatrixOffset, matrix.size(), matrix);
-  WriteFile(path, film);
 }
 
 }  // namespace
@@ -114,7 +72,8 @@ std::string MakeFilm(const std::string& path, const FilmRecipe& recipe) {
   if (result.exitCode != 0) {
     EnvironmentFailure("cannot make the film " + path + ": " + result.err);
   }
-  if (recipe.rotation != 0) SetRotation(path, recipe.rotation);
+  // How ffmpeg is asked for a rotation differs from one version to the next.
+  if (recipe.rotation != 0) SetFilmMatrix(path, recipe.rotation);
   return path;
 }
 
@@ -122,6 +81,25 @@ std::string MakeCutFilm(const std::string& path, size_t bytes, const FilmRecipe&
   MakeFilm(path, recipe);
   WriteFile(path, ReadFile(path).substr(0, bytes));
   return path;
+}
+
+void SetFilmMatrix(const std::string& path, double degrees, double scale) {
+  constexpr double kPi = 3.14159265358979323846;
+  constexpr size_t kNameSize = 4;
+  constexpr size_t kMatrixOffset = 40;  // in a header of version 0
+  const std::string cosine = FixedPoint(std::cos(degrees * kPi / 180) * scale);
+  const double sine = std::sin(degrees * kPi / 180) * scale;
+  const std::string matrix =
+      cosine + FixedPoint(sine) + FixedPoint(0) + FixedPoint(-sine) + cosine + FixedPoint(0);
+  std::string film = ReadFile(path);
+  const size_t header = film.find("tkhd");
+  const size_t content = header + kNameSize;
+  if (header == std::string::npos || content + kMatrixOffset + matrix.size() > film.size() ||
+      film[content] != 0) {
+    EnvironmentFailure("cannot turn the film " + path);
+  }
+  film.replace(content + kMatrixOffset, matrix.size(), matrix);
+  WriteFile(path, film);
 }
 
 }  // namespace vela_test

@@ -31,4 +31,8 @@ std::string MakeFilm(const std::string& path, const FilmRecipe& recipe = FilmRec
 std::string MakeCutFilm(const std::string& path, size_t bytes,
                         const FilmRecipe& recipe = FilmRecipe());
 
+/// Replaces the matrix of the film's first track, MP4 or MOV, by that of a clockwise turn by
+/// `degrees`, scaled by `scale`.
+void SetFilmMatrix(const std::string& path, double degrees, double scale = 1);
+
 }  // namespace vela_test

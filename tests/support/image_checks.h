@@ -34,7 +34,8 @@ class DecodedImage {
 };
 
 /// Decodes a JPEG; empty unless the file is one whole JPEG and nothing else (a warning of the
-/// decoder, missing data or bytes behind the end all count); `why`, when given, tells the reason.
+/// decoder, missing data or bytes behind the end all count); `why`, when given, receives the
+/// reason.
 std::optional<DecodedImage> DecodeJpeg(const std::string& path, std::string* why = nullptr);
 
 /// Whether DecodeJpeg accepts the file.
@@ -62,7 +63,7 @@ struct JpegMetadata {
 };
 JpegMetadata ReadJpegMetadata(const std::string& path);
 
-/// What ImageMagick's identify tells of a file's first picture.
+/// What ImageMagick's identify prints about a file's first picture.
 struct ImageIdentity {
   std::string format;  ///< "JPEG", "PNG", ...; empty when it is no image
   int width = 0;

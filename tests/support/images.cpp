@@ -8,7 +8,6 @@
 #include "support/colour_profile.h"
 #include "support/environment_failure.h"
 #include "support/files.h"
-#include "support/jpeg_writer.h"
 #include "support/program.h"
 #include "support/quadrants.h"
 #include "support/sandbox.h"

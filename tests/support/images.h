@@ -1,4 +1,4 @@
-// Test photos: four quadrants in distinct colours, so that a turn of the picture can be told from
+// Test photos: four quadrants in distinct colours, so that the orientation of a picture shows in
 // its pixels.
 #pragma once
 
@@ -22,6 +22,10 @@ struct JpegRecipe {
   std::string comment;      ///< JPEG comment, none when empty
 };
 
+/// The JPEG's bytes: the picture, and the colour profile if the recipe has one, without the
+/// recipe's other metadata.
+std::string EncodeJpeg(const JpegRecipe& recipe);
+
 /// Makes the JPEG; the quadrants as stored read "RGBY". Returns `path`.
 std::string MakeJpeg(const std::string& path, const JpegRecipe& recipe = JpegRecipe());
 
@@ -39,7 +43,7 @@ std::string MakeAnimatedGif(const std::string& path, int frames = 3, int width =
 std::string MakeMultiPageTiff(const std::string& path, int pages = 2, int width = 64,
                               int height = 48);
 
-/// Any format ImageMagick writes, told by the extension, in quadrants.
+/// Any format ImageMagick writes, chosen by the extension, in quadrants.
 std::string MakeImage(const std::string& path, int width = 64, int height = 48);
 
 /// A binary PPM in quadrants.

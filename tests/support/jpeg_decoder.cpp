@@ -22,8 +22,8 @@ struct Decoder {
   char message[JMSG_LENGTH_MAX] = "";
 };
 
-/// The complaint, of whatever weight, ends the decoding.
-[[noreturn]] void Complain(j_common_ptr library) {
+/// Any error or warning ends the decoding.
+[[noreturn]] void FailDecoding(j_common_ptr library) {
   auto* decoder = static_cast<Decoder*>(library->client_data);
   library->err->format_message(library, decoder->message);
   std::longjmp(decoder->failure, 1);
@@ -31,16 +31,16 @@ struct Decoder {
 
 void OnMessage(j_common_ptr library, int level) {
   if (level < 0) {
-    Complain(library);
+    FailDecoding(library);
   }
 }
 
-/// Decodes into `pixels`; whether it could. No object with a destructor lives in here, since a
-/// failure jumps out.
+/// Decodes into `pixels`; returns whether it succeeded. No local object may have a destructor,
+/// since a failure jumps out.
 bool Decode(const std::string& file, Decoder* decoder, std::vector<uint8_t>* pixels) {
   jpeg_decompress_struct* library = &decoder->library;
   library->err = jpeg_std_error(&decoder->errors);
-  decoder->errors.error_exit = Complain;
+  decoder->errors.error_exit = FailDecoding;
   decoder->errors.emit_message = OnMessage;
   library->client_data = decoder;
   if (setjmp(decoder->failure) != 0) {
@@ -77,9 +77,9 @@ std::vector<uint8_t> RgbOfInks(const std::vector<uint8_t>& inks) {
 
 std::optional<DecodedImage> DecodeJpeg(const std::string& path, std::string* why) {
   std::string reason;
-  std::string& told = why != nullptr ? *why : reason;
+  std::string& problem = why != nullptr ? *why : reason;
   if (!IsRegularFile(path)) {
-    told = "no such file";
+    problem = "no such file";
     return std::nullopt;
   }
   const std::string file = ReadFile(path);
@@ -91,9 +91,9 @@ std::optional<DecodedImage> DecodeJpeg(const std::string& path, std::string* why
   const int components = decoder.library.num_components;
   const size_t left = decoded ? decoder.library.src->bytes_in_buffer : 0;
   jpeg_destroy_decompress(&decoder.library);
-  told =
+  problem =
       decoded ? (left == 0 ? "" : std::to_string(left) + " bytes behind the end") : decoder.message;
-  if (!told.empty()) {
+  if (!problem.empty()) {
     return std::nullopt;
   }
   return DecodedImage(width, height, components,

@@ -1,4 +1,3 @@
-#include "support/jpeg_writer.h"
 
 #include <cstdio>  // before jpeglib.h, which uses FILE
 #include <cstdlib>
@@ -7,6 +6,7 @@
 #include <jpeglib.h>
 
 #include "support/environment_failure.h"
+#include "support/images.h"
 #include "support/quadrants.h"
 
 namespace vela_test {

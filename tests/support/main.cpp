@@ -20,7 +20,7 @@ bool StartsWith(const std::string& text, const std::string& beginning) {
 }
 
 /// Listing tests, which the build does, needs no sandbox.
-bool OnlyTells(const std::vector<std::string>& arguments) {
+bool OnlyPrintsInformation(const std::vector<std::string>& arguments) {
   for (const std::string& argument : arguments) {
     if (StartsWith(argument, "--gtest_list_tests") || argument == "--help") {
       return true;
@@ -59,7 +59,7 @@ std::string RedirectResultFile(std::vector<std::string>* arguments) {
 
 int main(int argc, char** argv) {
   std::vector<std::string> arguments(argv, argv + argc);
-  if (!OnlyTells(arguments)) {
+  if (!OnlyPrintsInformation(arguments)) {
     vela_test::EnterSandbox(RedirectResultFile(&arguments));
   }
   std::vector<char*> pointers;

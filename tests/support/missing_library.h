@@ -6,7 +6,7 @@
 
 namespace vela_test {
 
-/// For as long as the object lives, no program that is started can load the library: an empty file
+/// As long as the object exists, no program that is started can load the library: an empty file
 /// hides it. Programs that have loaded it keep it.
 class MissingLibrary {
  public:

@@ -11,7 +11,7 @@
 
 #include "support/environment_failure.h"
 #include "support/files.h"
-#include "support/mount_id.h"
+#include "support/removal.h"
 
 namespace vela_test {
 

@@ -6,9 +6,8 @@
 
 namespace vela_test {
 
-/// A memory volume of its own at a directory, for as long as the object lives (or until the sandbox
-/// is reset). Memory is used for
-/// what is written only, whatever the size.
+/// A memory volume of its own at a directory, as long as the object exists (or until the sandbox
+/// is reset). Only what is written uses memory, whatever the size.
 class SmallVolume {
  public:
   /// Mounts a volume of `bytes` (counted in whole pages, rounded up) at `path`; the directory is
@@ -35,7 +34,7 @@ class SmallVolume {
   uint64_t mount_ = 0;
 };
 
-/// A directory tree that refuses changes with EROFS, for as long as the object lives. Descriptors
+/// A directory tree that refuses changes with EROFS, as long as the object exists. Descriptors
 /// opened before are not affected.
 class ReadOnlyMount {
  public:

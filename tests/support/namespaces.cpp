@@ -56,7 +56,7 @@ pid_t Fork() {
   return child;
 }
 
-/// Waits for one child, whatever interrupts; its wait status.
+/// Waits for one child across interruptions; returns its wait status.
 int AwaitChild(pid_t child) {
   int status = 0;
   while (waitpid(child, &status, 0) < 0) {
@@ -92,7 +92,7 @@ int ExitStatusOf(int waitStatus) {
   }
 }
 
-/// Ties the life of process 1 to its parent's, also when that was gone before the call.
+/// Makes process 1 end with its parent, even if that has ended before the call.
 void EndWithParent(const Descriptor& alive) {
   prctl(PR_SET_PDEATHSIG, SIGKILL);
   char byte = 0;

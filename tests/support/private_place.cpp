@@ -6,7 +6,6 @@
 #include <utility>
 
 #include "support/environment_failure.h"
-#include "support/mount_id.h"
 #include "support/removal.h"
 
 namespace vela_test {

@@ -5,7 +5,7 @@
 
 namespace vela_test {
 
-/// For as long as the object lives the calling thread has no capabilities, so that permission bits
+/// As long as the object exists the calling thread has no capabilities, so that permission bits
 /// hold for it (a directory of mode 0555 refuses new files with EACCES). Processes that it starts
 /// with exec meanwhile get them back; see DropCapabilities in program.h for those.
 class WithoutCapabilities {

@@ -20,8 +20,8 @@ struct RawRecipe {
       rotation;  ///< degrees that exiftool gives as "Rotation", not stated when empty
 };
 
-/// Makes the raw photo (a DNG whatever the name); full decode and preview both show the quadrants,
-/// as stored "RGBY". Returns `path`.
+/// Makes the raw photo (a DNG regardless of the name); full decode and preview both show the
+/// quadrants, as stored "RGBY". Returns `path`.
 std::string MakeRawPhoto(const std::string& path, const RawRecipe& recipe = RawRecipe());
 
 }  // namespace vela_test

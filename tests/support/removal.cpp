@@ -1,5 +1,6 @@
 #include "support/removal.h"
 
+#include <fcntl.h>
 #include <sys/mount.h>
 #include <sys/stat.h>
 #include <unistd.h>
@@ -18,6 +19,12 @@ bool IsRemoved(int result) {
 }
 
 }  // namespace
+
+uint64_t MountAt(const std::string& path) {
+  struct statx status {};
+  const bool known = statx(AT_FDCWD, path.c_str(), 0, STATX_MNT_ID, &status) == 0;
+  return known ? status.stx_mnt_id : 0;
+}
 
 void UnmountAll(const std::string& path) {
   while (umount2(path.c_str(), MNT_DETACH | UMOUNT_NOFOLLOW) == 0) {

@@ -1,14 +1,18 @@
-// Removal of what tests have left behind, mounts included.
+// Mounts, and the removal of what tests have left behind with them.
 #pragma once
 
+#include <cstdint>
 #include <string>
 
 namespace vela_test {
 
-/// Takes off whatever is mounted at `path` itself, however often.
+/// The number of the mount that `path` is on; 0 when there is no such path.
+uint64_t MountAt(const std::string& path);
+
+/// Unmounts everything that is mounted at `path` itself.
 void UnmountAll(const std::string& path);
 
-/// Removes a file or tree with whatever is mounted in it; a missing one is no failure.
+/// Removes a file or tree with everything that is mounted in it; missing ones are ignored.
 void RemoveWithMounts(const std::string& path);
 
 /// Removes everything in a directory in that way.

@@ -41,7 +41,7 @@ struct SandboxState {
 };
 
 SandboxState& State() {
-  static SandboxState* state = new SandboxState;  // lives as long as the process
+  static SandboxState* state = new SandboxState;  // never destroyed
   return *state;
 }
 
@@ -187,10 +187,6 @@ void EnterSandbox(const std::string& writableDirectory) {
   state.testProcess = getpid();
   SetEnvironment();
   StartLogRecorder();
-}
-
-bool IsSandboxed() {
-  return State().inside;
 }
 
 void ResetSandbox() {

@@ -21,14 +21,11 @@ void EnterSandbox(const std::string& writableDirectory = std::string());
 /// Where the sandbox shows the writable directory given to EnterSandbox.
 constexpr const char* kWritablePlace = "/.writable";
 
-/// Whether this process is the one that EnterSandbox returned in.
-bool IsSandboxed();
-
 /// Brings all private places back to their first state: ends every other process of the sandbox,
-/// takes off what tests have mounted, removes what they have written, restores /usr/bin and /etc,
+/// unmounts what tests have mounted, removes what they have written, restores /usr/bin and /etc,
 /// and clears the system log's record. The working directory becomes /. Does nothing in the child
-/// of a death test, which works in its parent's places (use gtest's "fast" style: a program started
-/// anew would not know the sandbox).
+/// of a death test, which works in its parent's places (use gtest's "fast" style: a restarted
+/// program would not be in the sandbox).
 void ResetSandbox();
 
 /// The path under which the sandbox shows the machine's own `path` (absolute): also what lies in a

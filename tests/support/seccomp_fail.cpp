@@ -107,14 +107,6 @@ std::vector<int> RenameCalls() {
       SYS_renameat, SYS_renameat2};
 }
 
-std::vector<int> UnlinkCalls() {
-  return {
-#ifdef SYS_unlink
-      SYS_unlink,
-#endif
-      SYS_unlinkat};
-}
-
 std::vector<int> MkdirCalls() {
   return {
 #ifdef SYS_mkdir
@@ -125,14 +117,6 @@ std::vector<int> MkdirCalls() {
 
 std::vector<int> FlockCalls() {
   return {SYS_flock};
-}
-
-std::vector<int> UtimeCalls() {
-  return {
-#ifdef SYS_utime
-      SYS_utime, SYS_utimes, SYS_futimesat,
-#endif
-      SYS_utimensat};
 }
 
 std::vector<int> ForkCalls() {

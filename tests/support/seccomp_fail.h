@@ -12,7 +12,7 @@ namespace vela_test {
 struct RefusedCall {
   int number;         ///< SYS_...
   int error;          ///< the errno it gives
-  int argument = -1;  ///< argument (0 to 5) to look at, -1: refuse every call
+  int argument = -1;  ///< argument (0 to 5) to examine, -1: refuse every call
   uint32_t mask = 0;  ///< with `argument`: refuse when (argument & mask) == value; low 32 bits
   uint32_t value = 0;
 };
@@ -28,10 +28,8 @@ BeforeExec SeccompFail(const std::vector<int>& numbers, int error);
 /// All system calls behind one library function, for SeccompFail.
 std::vector<int> ChmodCalls();
 std::vector<int> RenameCalls();
-std::vector<int> UnlinkCalls();
 std::vector<int> MkdirCalls();
 std::vector<int> FlockCalls();
-std::vector<int> UtimeCalls();
 std::vector<int> ForkCalls();
 
 /// Opens whose flags hold all of `flags`, such as O_CREAT or O_DIRECTORY.

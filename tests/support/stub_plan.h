@@ -10,10 +10,7 @@
 namespace vela_test {
 
 /// One step: a word and its operands.
-struct StubStep {
-  std::string word;
-  std::vector<std::string> operands;
-};
+using StubStep = std::vector<std::string>;
 
 /// The steps of one call, built one behind the other:
 ///   StubPlan().WriteOutputs(1).AppendToSource(100000).WriteOutputs().Exit(3)
@@ -32,50 +29,88 @@ class StubPlan {
   static StubPlan Normal() { return StubPlan().WriteOutputs(); }
 
   /// Writes the next `count` outputs, each a small whole grey JPEG of its "-thumbnail" box.
-  StubPlan& WriteOutputs(size_t count = kAll);
+  StubPlan& WriteOutputs(size_t count = kAll) { return Add("write-outputs", count); }
   /// Writes the next `count` outputs with exactly `bytes` bytes each (a JPEG's beginning).
-  StubPlan& WriteOutputsOfSize(size_t count, size_t bytes);
+  StubPlan& WriteOutputsOfSize(size_t count, size_t bytes) {
+    return Add("write-outputs-of-size", count, bytes);
+  }
   /// Writes the next output with this content.
-  StubPlan& WriteOutput(const std::string& content);
+  StubPlan& WriteOutput(const std::string& content) { return Add("write-output", content); }
   /// Leaves out the next `count` outputs.
-  StubPlan& SkipOutputs(size_t count = 1);
+  StubPlan& SkipOutputs(size_t count = 1) { return Add("skip-outputs", count); }
 
-  StubPlan& Print(const std::string& bytes);       ///< to standard output
-  StubPlan& PrintError(const std::string& bytes);  ///< to standard error
-  /// `times` times the text, to standard output / standard error.
-  StubPlan& PrintRepeated(const std::string& text, size_t times);
-  StubPlan& PrintErrorRepeated(const std::string& text, size_t times);
+  /// Print on standard output or standard error, as often as `times` says.
+  StubPlan& Print(const std::string& bytes) { return PrintRepeated(bytes, 1); }
+  StubPlan& PrintError(const std::string& bytes) { return PrintErrorRepeated(bytes, 1); }
+  StubPlan& PrintRepeated(const std::string& text, size_t times) {
+    return Add("print", text, times);
+  }
+  StubPlan& PrintErrorRepeated(const std::string& text, size_t times) {
+    return Add("print-error", text, times);
+  }
 
-  StubPlan& Sleep(int milliseconds);
-  StubPlan& CreateFile(const std::string& path);   ///< empty; tells the test "I am here"
-  StubPlan& WaitForFile(const std::string& path);  ///< "go on"; gives up after 60 s, status 125
-  StubPlan& WriteFile(const std::string& path, const std::string& content);
+  StubPlan& Sleep(int milliseconds) { return Add("sleep", milliseconds); }
+  /// Makes an empty file, by which the test sees that this step has been reached.
+  StubPlan& CreateFile(const std::string& path) { return WriteFile(path, ""); }
+  /// Waits until the test makes the file; gives up after 60 s with status 125.
+  StubPlan& WaitForFile(const std::string& path) { return Add("wait-for-file", path); }
+  StubPlan& WriteFile(const std::string& path, const std::string& content) {
+    return Add("write-file", path, content);
+  }
 
-  StubPlan& AppendToFile(const std::string& path, size_t bytes);    ///< size and blocks grow
-  StubPlan& GrowSizeOnly(const std::string& path, size_t bytes);    ///< a hole: blocks stay
-  StubPlan& GrowBlocksOnly(const std::string& path, size_t bytes);  ///< space beyond the end
+  /// Grow a file: in size and blocks, by a hole that takes no blocks, or by blocks beyond its end.
+  StubPlan& AppendToFile(const std::string& path, size_t bytes) {
+    return Add("append", path, bytes);
+  }
+  StubPlan& GrowSizeOnly(const std::string& path, size_t bytes) {
+    return Add("grow-size", path, bytes);
+  }
+  StubPlan& GrowBlocksOnly(const std::string& path, size_t bytes) {
+    return Add("grow-blocks", path, bytes);
+  }
   StubPlan& AppendToSource(size_t bytes) { return AppendToFile(kSource, bytes); }
-  StubPlan& Remove(const std::string& path);  ///< a file or a whole tree
-  StubPlan& ReplaceByDirectory(const std::string& path);
-  StubPlan& SetMode(const std::string& path, mode_t mode);
-  StubPlan& SetFileTime(const std::string& path, long long seconds);
+  /// Removes a file or a whole tree.
+  StubPlan& Remove(const std::string& path) { return Add("remove", path); }
+  StubPlan& ReplaceByDirectory(const std::string& path) {
+    return Add("replace-by-directory", path);
+  }
+  StubPlan& SetMode(const std::string& path, mode_t mode) { return Add("set-mode", path, mode); }
+  StubPlan& SetFileTime(const std::string& path, long long seconds) {
+    return Add("set-file-time", path, seconds);
+  }
   /// From now on every write to the memory volume at `path` fails with ENOSPC.
-  StubPlan& FillVolume(const std::string& path);
+  StubPlan& FillVolume(const std::string& path) { return Add("fill-volume", path); }
 
-  StubPlan& IgnoreSignal(int signal);
-  StubPlan& SignalParent(int signal);  ///< to the process that started the stub
-  StubPlan& DieBySignal(int signal);
-  StubPlan& CloseOutput();  ///< standard output and standard error
+  StubPlan& IgnoreSignal(int signal) { return Add("ignore-signal", signal); }
+  /// Sends the signal to the process that has started the stub.
+  StubPlan& SignalParent(int signal) { return Add("signal-parent", signal); }
+  StubPlan& DieBySignal(int signal) { return Add("die-by-signal", signal); }
+  /// Closes standard output and standard error.
+  StubPlan& CloseOutput() { return Add("close-output"); }
   /// Runs a program with these arguments behind argument zero and waits for it.
-  StubPlan& Run(const std::string& program, const std::vector<std::string>& arguments);
+  StubPlan& Run(const std::string& program, const std::vector<std::string>& arguments) {
+    Add("run", program);
+    steps_.back().insert(steps_.back().end(), arguments.begin(), arguments.end());
+    return *this;
+  }
   /// Runs a program with the stub's own arguments: the stub records, the real tool works.
-  StubPlan& PassThrough(const std::string& program);
-  StubPlan& Exit(int status);
+  StubPlan& PassThrough(const std::string& program) { return Add("pass-through", program); }
+  StubPlan& Exit(int status) { return Add("exit", status); }
 
   const std::vector<StubStep>& Steps() const { return steps_; }
 
  private:
-  StubPlan& Add(std::string word, std::vector<std::string> operands);
+  static std::string Text(const std::string& text) { return text; }
+  template <typename Number>
+  static std::string Text(Number number) {
+    return std::to_string(number);
+  }
+  template <typename... Operands>
+  StubPlan& Add(const char* word, const Operands&... operands) {
+    steps_.push_back({word, Text(operands)...});
+    return *this;
+  }
+
   std::vector<StubStep> steps_;
 };
 

@@ -29,9 +29,7 @@ std::string BaseName(const std::string& path) {
 std::string EncodePlan(const StubPlan& plan) {
   std::vector<std::string> steps;
   for (const StubStep& step : plan.Steps()) {
-    std::vector<std::string> fields = {step.word};
-    fields.insert(fields.end(), step.operands.begin(), step.operands.end());
-    steps.push_back(EncodeFields(fields));
+    steps.push_back(EncodeFields(step));
   }
   return EncodeFields(steps);
 }

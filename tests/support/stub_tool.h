@@ -12,7 +12,7 @@
 namespace vela_test {
 
 constexpr const char* kConverterPath = "/usr/vela/bin/convert-thumb";
-/// ImageMagick's own program, whatever else is called convert on this machine.
+/// ImageMagick's own program, even where another one is called convert.
 constexpr const char* kImageMagickPath = "/usr/bin/convert-im6.q16";
 constexpr const char* kExiftoolPath = "/usr/vela/bin/exiftool";
 constexpr const char* kDcrawPath = "/usr/bin/dcraw";
@@ -46,8 +46,8 @@ struct StubCall {
   std::vector<std::string> Parameters() const;
 };
 
-/// A stub installed at the path of a tool. The record and the plans live until the sandbox is
-/// reset, not longer; the object only writes and reads them.
+/// A stub installed at the path of a tool. The record and the plans exist until the sandbox is
+/// reset; the object only writes and reads them.
 class StubTool {
  public:
   /// Puts the stub at `path`, in place of what is there, with the plan StubPlan::Normal(). The
@@ -73,7 +73,7 @@ class StubTool {
 std::vector<StubCall> AllStubCalls();
 
 /// Takes the next number from the counter that orders stub starts, stub ends, daemon requests and
-/// whatever the test itself numbers.
+/// events of the test itself.
 uint64_t NextSequence();
 
 /// Which converter is the real one: the project's own, or ImageMagick when the environment has

@@ -24,12 +24,12 @@ namespace {
 // it restored without breaking connections.
 constexpr const char* kSocket = "/.log";
 constexpr const char* kLogPath = "/dev/log";
-// No header of the system log begins like this.
+// No message of the system log begins like this.
 constexpr const char* kMarkerBeginning = "\001marker ";
 constexpr size_t kLargestMessage = 1 << 20;
 constexpr size_t kTimestampLength = 16;  // "Mmm dd hh:mm:ss "
 
-/// Takes "<number>" off the beginning; -1 when there is none.
+/// Removes "<number>" from the beginning and returns the number; -1 when there is none.
 int TakePriority(std::string* text) {
   const size_t end = text->find('>');
   if (text->empty() || text->front() != '<' || end == std::string::npos || end < 2 || end > 4) {

@@ -1,4 +1,4 @@
-// Recorder of the sandbox's system log: whatever this process and its children send to /dev/log.
+// Recorder of the sandbox's system log: everything this process and its children send to /dev/log.
 #pragma once
 
 #include <sys/types.h>
@@ -18,18 +18,18 @@ struct LogMessage {
 };
 
 /// All messages since the last clearing, in order of arrival. Complete for everything that was
-/// logged, by whatever process, before the call.
+/// logged by any process before the call.
 std::vector<LogMessage> LogMessages();
 
 /// The texts of all messages, each of which must be at LOG_ERR: one at another priority is given as
 /// "<priority> text", so that a comparison shows it.
 std::vector<std::string> ErrorLines();
 
-/// Forgets all messages so far. ResetSandbox does it for every SandboxTest.
+/// Discards all messages so far. ResetSandbox does it for every SandboxTest.
 void ClearLog();
 
-/// Binds /dev/log anew when a test has removed it. Done by EnterSandbox and ResetSandbox; the
-/// recording goes on without a gap, also for a syslog connection that is already open.
+/// Restores /dev/log when a test has removed it. Done by EnterSandbox and ResetSandbox; the
+/// recording continues without a gap, also for a syslog connection that is already open.
 void StartLogRecorder();
 
 }  // namespace vela_test

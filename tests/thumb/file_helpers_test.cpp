@@ -158,7 +158,7 @@ TEST_F(RemoveByPattern, TakesShellPatterns) {
 }
 
 /// Each name is a pattern that would match the other one, if it were taken as a pattern.
-struct PatternName : NamedRow {
+struct PatternName : NamedCase {
   const char* own;
   const char* neighbour;
 };
@@ -187,7 +187,7 @@ INSTANTIATE_TEST_SUITE_P(Names, EscapedPattern,
                                            PatternName{"Tilde", "~", "root"},
                                            PatternName{"Dot", "plain.jpg", "plainxjpg"},
                                            PatternName{"Bytes", "\xe4\xff.jpg", "\xe4.jpg"}),
-                         RowName<PatternName>);
+                         CaseName());
 
 }  // namespace
 }  // namespace vela_test

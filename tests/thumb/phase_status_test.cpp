@@ -21,7 +21,7 @@ class PhaseOutdated : public PassTest {
 };
 
 /// Thumbnails with their dates relative to the photo, and whether they make a phase outdated.
-struct DatedThumbs : NamedRow {
+struct DatedThumbs : NamedCase {
   struct Thumb {
     const char* sizeClass;
     int64_t seconds;
@@ -59,7 +59,7 @@ INSTANTIATE_TEST_SUITE_P(
                       DatedThumbs{"OfALaterPhase", {{"B", -1, 0}}, 0, false},
                       DatedThumbs{"OfAnEarlierPhase", {{"B", -1, 0}}, 2, false},
                       DatedThumbs{"AllPhasesTogether", {{"B", -1, 0}}, kAllPhases, true}),
-    RowName<DatedThumbs>);
+    CaseName());
 
 TEST_F(PhaseOutdated, KnowsOlderNames) {
   UseProfiles({{"thumb_b", 640, 80, std::nullopt, "VELAPHOTO:THUMB_B.jpg", 1}});
@@ -101,7 +101,7 @@ class PhaseComplete : public PassTest {
 };
 
 /// Thumbnails with their sizes, and whether they complete a phase.
-struct SizedThumbs : NamedRow {
+struct SizedThumbs : NamedCase {
   struct Thumb {
     const char* sizeClass;
     size_t bytes;
@@ -133,7 +133,7 @@ INSTANTIATE_TEST_SUITE_P(
                       SizedThumbs{"OfItsOwnPhase", {{"B", 2}}, 1, true},
                       SizedThumbs{"OfAnEarlierPhase", {{"B", 2}}, 2, false},
                       SizedThumbs{"OnePhaseOfAll", {{"B", 2}}, kAllPhases, false}),
-    RowName<SizedThumbs>);
+    CaseName());
 
 TEST_F(PhaseComplete, AllPhasesTogether) {
   for (const char* sizeClass : {"S", "M", "B", "XL"}) {

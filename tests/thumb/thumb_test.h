@@ -17,12 +17,13 @@
 #include <string>
 #include <vector>
 
+#include "profiles/directory_job.h"
 #include "profiles/thumbnail_profile.h"
 #include "support/daemon_peer.h"
 #include "support/files.h"
 #include "support/images.h"
 #include "support/mounts.h"
-#include "support/named_rows.h"
+#include "support/named_case.h"
 #include "support/privileges.h"
 #include "support/profile_file.h"
 #include "support/program.h"
@@ -30,7 +31,6 @@
 #include "support/seccomp_fail.h"
 #include "support/stub_tool.h"
 #include "support/system_log.h"
-#include "profiles/directory_job.h"
 
 namespace vela_test {
 

@@ -5,8 +5,8 @@
 
 #include "convert/velamk_photo_thumb.h"
 #include "platform/vlibc.h"
-#include "quiet_test.h"
 #include "support/files.h"
+#include "support/quiet_test.h"
 #include "support/stub_tool.h"
 
 using namespace vela;

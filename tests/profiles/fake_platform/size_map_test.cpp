@@ -1,8 +1,8 @@
 // The profiles of a directory with a faked index library, which knows its size map or does not.
 #include "platform/velaindex.h"
 #include "profiles/thumbnail_profile.h"
-#include "quiet_test.h"
 #include "support/profile_file.h"
+#include "support/quiet_test.h"
 
 using namespace vela;
 

@@ -7,11 +7,11 @@
 #include <functional>
 
 #include "platform/vlibc.h"
-#include "quiet_test.h"
 #include "storage/creation_queue.h"
 #include "storage/velamk_thumb_status.h"
 #include "support/capabilities.h"
 #include "support/files.h"
+#include "support/quiet_test.h"
 
 using namespace vela;
 

@@ -1,8 +1,8 @@
 // The thumbnail status and the scans with the size maps of a faked index library.
 #include "platform/velaindex.h"
-#include "quiet_test.h"
 #include "storage/velamk_thumb_status.h"
 #include "support/files.h"
+#include "support/quiet_test.h"
 
 namespace {
 

@@ -8,8 +8,8 @@
 #include <map>
 
 #include "platform/velaindex.h"
-#include "quiet_test.h"
 #include "storage/velamk_util.h"
+#include "support/quiet_test.h"
 
 using namespace vela;
 

@@ -31,8 +31,8 @@ class Client {
     sockaddr_un address{};
     address.sun_family = AF_UNIX;
     std::strncpy(address.sun_path, kDaemonSocket, sizeof address.sun_path - 1);
-    EXPECT_EQ(0,
-              connect(socket_.Get(), reinterpret_cast<const sockaddr*>(&address), sizeof address));
+    EXPECT_EQ(connect(socket_.Get(), reinterpret_cast<const sockaddr*>(&address), sizeof address),
+              0);
   }
 
   void Send(const std::string& bytes) const {
@@ -72,10 +72,10 @@ class DaemonPeerTest : public SandboxTest {};
 
 TEST_F(DaemonPeerTest, AnswersEveryCommandByDefault) {
   const DaemonPeer daemon;
-  EXPECT_EQ("{\"success\":true,\"version\":0}\n", Ask(kVersionRequest));
-  EXPECT_EQ("{\"success\":true}\n", Ask("{\"command\":\"POST_PHOTO_CONVERT\",\"path\":\"/a\"}\n"));
-  EXPECT_EQ("{\"success\":true,\"result\":false}\n",
-            Ask("{\"command\":\"IS_DISABLE_CONVERT_PHOTO\"}\n"));
+  EXPECT_EQ(Ask(kVersionRequest), "{\"success\":true,\"version\":0}\n");
+  EXPECT_EQ(Ask("{\"command\":\"POST_PHOTO_CONVERT\",\"path\":\"/a\"}\n"), "{\"success\":true}\n");
+  EXPECT_EQ(Ask("{\"command\":\"IS_DISABLE_CONVERT_PHOTO\"}\n"),
+            "{\"success\":true,\"result\":false}\n");
   EXPECT_THAT(daemon.Commands(),
               ElementsAre("GET_INDEX_VERSION", "POST_PHOTO_CONVERT", "IS_DISABLE_CONVERT_PHOTO"));
 }
@@ -85,9 +85,9 @@ TEST_F(DaemonPeerTest, RecordsRawBytesAndTheirPlaceInTheOrder) {
   const uint64_t before = NextSequence();
   const std::string request = "{\"path\":\"/\xff\\\"a\", \"command\" : \"X\"}\n";
   Ask(request);
-  ASSERT_EQ(1U, daemon.Requests().size());
-  EXPECT_EQ(request, daemon.Requests()[0].bytes);
-  EXPECT_EQ("X", daemon.Requests()[0].command);
+  ASSERT_EQ(daemon.Requests().size(), 1U);
+  EXPECT_EQ(daemon.Requests()[0].bytes, request);
+  EXPECT_EQ(daemon.Requests()[0].command, "X");
   EXPECT_GT(daemon.Requests()[0].sequence, before);
 }
 
@@ -97,8 +97,8 @@ TEST_F(DaemonPeerTest, RequestMayComeInPieces) {
   client.Send("{\"command\":");
   EXPECT_FALSE(client.SomethingComesWithin(20));
   client.Send("\"A\"}\n");
-  EXPECT_EQ("{\"success\":true}\n", client.ReadAll());
-  EXPECT_EQ("{\"command\":\"A\"}\n", daemon.Requests()[0].bytes);
+  EXPECT_EQ(client.ReadAll(), "{\"success\":true}\n");
+  EXPECT_EQ(daemon.Requests()[0].bytes, "{\"command\":\"A\"}\n");
 }
 
 TEST_F(DaemonPeerTest, AnswersCanBeSetByCommandAndInTurn) {
@@ -107,21 +107,21 @@ TEST_F(DaemonPeerTest, AnswersCanBeSetByCommandAndInTurn) {
   daemon.AnswerNext(DaemonReply::Line("first"));
   daemon.AnswerNext(DaemonReply::Bytes("second"));
   daemon.Answer("A", DaemonReply::Line("a"));
-  EXPECT_EQ("first\n", Ask(kVersionRequest));
-  EXPECT_EQ("second", Ask(kVersionRequest));
-  EXPECT_EQ("{\"success\":true,\"version\":3}\n", Ask(kVersionRequest));
-  EXPECT_EQ("a\n", Ask("{\"command\":\"A\"}\n"));
+  EXPECT_EQ(Ask(kVersionRequest), "first\n");
+  EXPECT_EQ(Ask(kVersionRequest), "second");
+  EXPECT_EQ(Ask(kVersionRequest), "{\"success\":true,\"version\":3}\n");
+  EXPECT_EQ(Ask("{\"command\":\"A\"}\n"), "a\n");
 }
 
 TEST_F(DaemonPeerTest, ClosesEarly) {
   DaemonPeer daemon;
   daemon.AnswerNext(DaemonReply::CloseAtOnce());
   daemon.AnswerNext(DaemonReply::CloseAfterRequest());
-  EXPECT_EQ("", Ask(kVersionRequest));
+  EXPECT_EQ(Ask(kVersionRequest), "");
   EXPECT_THAT(daemon.Requests(), IsEmpty());
-  EXPECT_EQ("", Ask(kVersionRequest));
-  EXPECT_EQ(1U, daemon.Requests().size());
-  EXPECT_EQ(2U, daemon.Connections());
+  EXPECT_EQ(Ask(kVersionRequest), "");
+  EXPECT_EQ(daemon.Requests().size(), 1U);
+  EXPECT_EQ(daemon.Connections(), 2U);
 }
 
 TEST_F(DaemonPeerTest, KeepsSilent) {
@@ -136,20 +136,20 @@ TEST_F(DaemonPeerTest, KeepsSilent) {
   half.Send(kVersionRequest);
   EXPECT_TRUE(half.SomethingComesWithin(10000));
   // Others are answered meanwhile.
-  EXPECT_EQ("{\"success\":true,\"version\":0}\n", Ask(kVersionRequest));
+  EXPECT_EQ(Ask(kVersionRequest), "{\"success\":true,\"version\":0}\n");
 }
 
 TEST_F(DaemonPeerTest, AnswersLateAndByteByByte) {
   DaemonPeer daemon;
   daemon.AnswerNext(DaemonReply::Line("late").After(50));
   const auto start = std::chrono::steady_clock::now();
-  EXPECT_EQ("late\n", Ask(kVersionRequest));
+  EXPECT_EQ(Ask(kVersionRequest), "late\n");
   EXPECT_GE(std::chrono::steady_clock::now() - start, std::chrono::milliseconds(50));
   daemon.AnswerNext(DaemonReply::Line("slow").ByteByByte(10));
   const Client client;
   client.Send(kVersionRequest);
   int pieces = 0;
-  EXPECT_EQ("slow\n", client.ReadAll(&pieces));
+  EXPECT_EQ(client.ReadAll(&pieces), "slow\n");
   EXPECT_GT(pieces, 1);
 }
 
@@ -157,7 +157,7 @@ TEST_F(DaemonPeerTest, SendsLargeAnswersWhole) {
   DaemonPeer daemon;
   const std::string large(5000000, 'x');
   daemon.AnswerNext(DaemonReply::Bytes(large));
-  EXPECT_EQ(large, Ask(kVersionRequest));
+  EXPECT_EQ(Ask(kVersionRequest), large);
 }
 
 TEST_F(DaemonPeerTest, ActsWhileTheOtherSideWaits) {
@@ -165,8 +165,8 @@ TEST_F(DaemonPeerTest, ActsWhileTheOtherSideWaits) {
   daemon.Answer("A", DaemonReply::Line("done").Meanwhile([](const DaemonRequest& request) {
     WriteFile("/tmp/seen", request.command);
   }));
-  EXPECT_EQ("done\n", Ask("{\"command\":\"A\"}\n"));
-  EXPECT_EQ("A", ReadFile("/tmp/seen"));
+  EXPECT_EQ(Ask("{\"command\":\"A\"}\n"), "done\n");
+  EXPECT_EQ(ReadFile("/tmp/seen"), "A");
 }
 
 TEST_F(DaemonPeerTest, EndsCleanlyWithOpenConnections) {

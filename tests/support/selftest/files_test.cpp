@@ -22,13 +22,13 @@ class FilesTest : public SandboxTest {};
 TEST_F(FilesTest, ContentIsByteExact) {
   const std::string content("a\0b\n\xff", 5);
   WriteFile("/tmp/d/e/f", content);
-  EXPECT_EQ(content, ReadFile("/tmp/d/e/f"));
+  EXPECT_EQ(ReadFile("/tmp/d/e/f"), content);
   AppendToFile("/tmp/d/e/f", "more");
-  EXPECT_EQ(content + "more", ReadFile("/tmp/d/e/f"));
+  EXPECT_EQ(ReadFile("/tmp/d/e/f"), content + "more");
   CopyFile("/tmp/d/e/f", "/tmp/copy");
-  EXPECT_EQ(content + "more", ReadFile("/tmp/copy"));
+  EXPECT_EQ(ReadFile("/tmp/copy"), content + "more");
   WriteFileOfSize("/tmp/sized", 12345);
-  EXPECT_EQ(12345, FileSize("/tmp/sized"));
+  EXPECT_EQ(FileSize("/tmp/sized"), 12345);
 }
 
 TEST_F(FilesTest, FailuresFailTheTest) {
@@ -46,8 +46,8 @@ TEST_F(FilesTest, LinesAreWithoutTheirNewlines) {
 TEST_F(FilesTest, TimesAreExact) {
   WriteFile("/tmp/f", "x");
   SetFileTime("/tmp/f", 1500000000, 123456789);
-  EXPECT_EQ((FileTime{1500000000, 123456789}), ModificationTime("/tmp/f"));
-  EXPECT_EQ((FileTime{1500000000, 123456789}), AccessTime("/tmp/f"));
+  EXPECT_EQ(ModificationTime("/tmp/f"), (FileTime{1500000000, 123456789}));
+  EXPECT_EQ(AccessTime("/tmp/f"), (FileTime{1500000000, 123456789}));
   const time_t now = time(nullptr);
   SetFileTimeFromNow("/tmp/f", 3600);
   EXPECT_GE(ModificationTime("/tmp/f").seconds, now + 3600);
@@ -57,7 +57,7 @@ TEST_F(FilesTest, TimesAreExact) {
 TEST_F(FilesTest, TreesAreListedAndRemoved) {
   WriteFile("/tmp/d/b/c", "x");
   WriteFile("/tmp/d/a", "x");
-  ASSERT_EQ(0, symlink("/usr", "/tmp/d/link"));
+  ASSERT_EQ(symlink("/usr", "/tmp/d/link"), 0);
   EXPECT_THAT(ListTree("/tmp/d"), ElementsAre("a", "b/", "b/c", "link"));
   EXPECT_THAT(ListDirectory("/tmp/d"), ElementsAre("a", "b", "link"));
   RemoveTree("/tmp/d");
@@ -66,18 +66,18 @@ TEST_F(FilesTest, TreesAreListedAndRemoved) {
   EXPECT_THAT(ListTree("/tmp/d"), IsEmpty());
 }
 
-TEST_F(FilesTest, KindsAndModesAreTold) {
+TEST_F(FilesTest, KindsAndModesAreKnown) {
   const mode_t mask = umask(077);
   MakeDirectories("/tmp/d/e");
   umask(mask);
-  EXPECT_EQ(0777, ModeOf("/tmp/d"));
-  EXPECT_EQ(0777, ModeOf("/tmp/d/e"));
+  EXPECT_EQ(ModeOf("/tmp/d"), 0777);
+  EXPECT_EQ(ModeOf("/tmp/d/e"), 0777);
   WriteFile("/tmp/f", "x");
-  ASSERT_EQ(0, chmod("/tmp/f", 04640));
-  EXPECT_EQ(04640, ModeOf("/tmp/f"));
-  EXPECT_EQ(-1, ModeOf("/tmp/missing"));
-  EXPECT_EQ(-1, FileSize("/tmp/missing"));
-  ASSERT_EQ(0, symlink("nowhere", "/tmp/dangling"));
+  ASSERT_EQ(chmod("/tmp/f", 04640), 0);
+  EXPECT_EQ(ModeOf("/tmp/f"), 04640);
+  EXPECT_EQ(ModeOf("/tmp/missing"), -1);
+  EXPECT_EQ(FileSize("/tmp/missing"), -1);
+  ASSERT_EQ(symlink("nowhere", "/tmp/dangling"), 0);
   EXPECT_TRUE(Exists("/tmp/dangling"));
   EXPECT_FALSE(IsRegularFile("/tmp/dangling"));
   EXPECT_TRUE(IsRegularFile("/tmp/f"));
@@ -95,9 +95,9 @@ TEST_F(FilesTest, ProfileFileHoldsWhatIsSet) {
                                     {"other", std::nullopt, std::nullopt, std::nullopt,
                                      "VELAPHOTO:THUMB_M.jpg", std::nullopt}});
   EXPECT_EQ(
+      ReadFile("/tmp/profile"),
       "[thumb]\nsize=120\nquality=80\nunsharp=0.5x0.5\nfilename=VELAPHOTO_THUMB_S.jpg\nphase=2\n"
-      "[other]\nfilename=VELAPHOTO:THUMB_M.jpg\n",
-      ReadFile("/tmp/profile"));
+      "[other]\nfilename=VELAPHOTO:THUMB_M.jpg\n");
 }
 
 }  // namespace

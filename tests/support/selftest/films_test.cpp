@@ -20,7 +20,7 @@ std::string ShownBy(const std::string& path) {
   const ProgramResult result =
       RunProgram("/usr/bin/ffmpeg", {"-v", "error", "-y", "-i", "file:" + path, "-frames:v", "1",
                                      "-pix_fmt", "yuvj444p", "-q:v", "2", "/tmp/frame.jpg"});
-  EXPECT_EQ(0, result.exitCode) << result.err;
+  EXPECT_EQ(result.exitCode, 0) << result.err;
   const auto frame = DecodeJpeg("/tmp/frame.jpg");
   if (!frame.has_value()) return "nothing";
   return std::to_string(frame->Width()) + "x" + std::to_string(frame->Height()) + " " +
@@ -34,9 +34,9 @@ std::string Probe(const std::string& entries, const std::string& path) {
 }
 
 TEST_F(FilmsTest, FilmShowsTheQuadrants) {
-  EXPECT_EQ("/tmp/a.mp4", MakeFilm("/tmp/a.mp4"));
-  EXPECT_EQ("64x48 RGBY", ShownBy("/tmp/a.mp4"));
-  EXPECT_EQ("h264\n", Probe("stream=codec_name", "/tmp/a.mp4"));
+  EXPECT_EQ(MakeFilm("/tmp/a.mp4"), "/tmp/a.mp4");
+  EXPECT_EQ(ShownBy("/tmp/a.mp4"), "64x48 RGBY");
+  EXPECT_EQ(Probe("stream=codec_name", "/tmp/a.mp4"), "h264\n");
 }
 
 TEST_F(FilmsTest, FilmIsTurnedClockwise) {
@@ -46,7 +46,7 @@ TEST_F(FilmsTest, FilmIsTurnedClockwise) {
       recipe.rotation = rotation;
       MakeFilm(path, recipe);
       const std::string size = rotation == 180 ? "64x48 " : "48x64 ";
-      EXPECT_EQ(size + LettersAfterTurn(rotation), ShownBy(path)) << path << " " << rotation;
+      EXPECT_EQ(ShownBy(path), size + LettersAfterTurn(rotation)) << path << " " << rotation;
     }
   }
 }
@@ -60,9 +60,9 @@ TEST_F(FilmsTest, FilmHasItsSizeLengthAndCodecs) {
   recipe.seconds = 2;
   recipe.format = "webm";
   MakeFilm("/tmp/film", recipe);
-  EXPECT_EQ("96x128 RGBY", ShownBy("/tmp/film"));
-  EXPECT_EQ("vp9\nopus\n", Probe("stream=codec_name", "/tmp/film"));
-  EXPECT_NEAR(2, std::stod("0" + Probe("format=duration", "/tmp/film")), 0.1);
+  EXPECT_EQ(ShownBy("/tmp/film"), "96x128 RGBY");
+  EXPECT_EQ(Probe("stream=codec_name", "/tmp/film"), "vp9\nopus\n");
+  EXPECT_NEAR(std::stod("0" + Probe("format=duration", "/tmp/film")), 2, 0.1);
 }
 
 TEST_F(FilmsTest, HeaderComesFirstWhenAskedFor) {
@@ -78,8 +78,8 @@ TEST_F(FilmsTest, HeaderComesFirstWhenAskedFor) {
 
 TEST_F(FilmsTest, CutFilmIsTheBeginningOfTheFilm) {
   const std::string whole = ReadFile(MakeFilm("/tmp/a.mp4"));
-  EXPECT_EQ("/tmp/cut.mp4", MakeCutFilm("/tmp/cut.mp4", 300));
-  EXPECT_EQ(whole.substr(0, 300), ReadFile("/tmp/cut.mp4"));
+  EXPECT_EQ(MakeCutFilm("/tmp/cut.mp4", 300), "/tmp/cut.mp4");
+  EXPECT_EQ(ReadFile("/tmp/cut.mp4"), whole.substr(0, 300));
 }
 
 }  // namespace

@@ -25,7 +25,7 @@ std::string Exiftool(const std::vector<std::string>& options, const std::string&
 
 void Convert(const std::vector<std::string>& arguments) {
   const ProgramResult result = RunProgram("/usr/bin/convert", arguments);
-  EXPECT_EQ(0, result.exitCode) << result.err;
+  EXPECT_EQ(result.exitCode, 0) << result.err;
 }
 
 TEST_F(ImagesTest, JpegHasItsSizeAndQuadrants) {
@@ -35,48 +35,45 @@ TEST_F(ImagesTest, JpegHasItsSizeAndQuadrants) {
   MakeJpeg("/tmp/a.jpg", recipe);
   const auto image = DecodeJpeg("/tmp/a.jpg");
   ASSERT_TRUE(image.has_value());
-  EXPECT_EQ(101, image->Width());
-  EXPECT_EQ(67, image->Height());
-  EXPECT_EQ(3, image->Components());
-  EXPECT_EQ("RGBY", QuadrantLetters("/tmp/a.jpg"));
+  EXPECT_EQ(image->Width(), 101);
+  EXPECT_EQ(image->Height(), 67);
+  EXPECT_EQ(image->Components(), 3);
+  EXPECT_EQ(QuadrantLetters("/tmp/a.jpg"), "RGBY");
   const ImageIdentity identity = Identify("/tmp/a.jpg");
-  EXPECT_EQ("JPEG", identity.format);
-  EXPECT_EQ(101, identity.width);
-  EXPECT_EQ(67, identity.height);
-  EXPECT_EQ(1, identity.frames);
+  EXPECT_EQ(identity.format, "JPEG");
+  EXPECT_EQ(identity.width, 101);
+  EXPECT_EQ(identity.height, 67);
+  EXPECT_EQ(identity.frames, 1);
 }
 
 TEST_F(ImagesTest, PlainJpegCarriesNothing) {
   MakeJpeg("/tmp/a.jpg");
   const JpegMetadata metadata = ReadJpegMetadata("/tmp/a.jpg");
   EXPECT_FALSE(metadata.exif || metadata.xmp || metadata.iptc || metadata.icc || metadata.comment);
-  EXPECT_EQ(0, metadata.orientation);
+  EXPECT_EQ(metadata.orientation, 0);
 }
 
 TEST_F(ImagesTest, MetadataIsWhatOtherToolsRead) {
   JpegRecipe recipe;
-  recipe.exif = true;
-  recipe.xmp = true;
-  recipe.iptc = true;
-  recipe.iccProfile = true;
+  recipe.exif = recipe.xmp = recipe.iptc = recipe.iccProfile = true;
   recipe.comment = "remark";
   MakeJpeg("/tmp/a.jpg", recipe);
   const JpegMetadata metadata = ReadJpegMetadata("/tmp/a.jpg");
   EXPECT_TRUE(metadata.exif && metadata.xmp && metadata.iptc && metadata.icc && metadata.comment);
-  EXPECT_EQ("Make: Maker\nTitle: Title\nCaption-Abstract: Caption\nComment: remark\n",
-            Exiftool({"-S", "-Make", "-Title", "-Caption-Abstract", "-Comment"}, "/tmp/a.jpg"));
+  EXPECT_EQ(Exiftool({"-S", "-Make", "-Title", "-Caption-Abstract", "-Comment"}, "/tmp/a.jpg"),
+            "Make: Maker\nTitle: Title\nCaption-Abstract: Caption\nComment: remark\n");
   EXPECT_THAT(Exiftool({"-S", "-ICC_Profile:ProfileDescription"}, "/tmp/a.jpg"), HasSubstr("sRGB"));
 }
 
-TEST_F(ImagesTest, EachMetadataBlockIsToldApart) {
-  JpegRecipe recipe;
-  recipe.iptc = true;
-  JpegMetadata metadata = ReadJpegMetadata(MakeJpeg("/tmp/a.jpg", recipe));
+TEST_F(ImagesTest, MetadataBlocksAreDistinguished) {
+  JpegRecipe iptc;
+  iptc.iptc = true;
+  JpegMetadata metadata = ReadJpegMetadata(MakeJpeg("/tmp/a.jpg", iptc));
   EXPECT_TRUE(metadata.iptc);
   EXPECT_FALSE(metadata.exif || metadata.xmp || metadata.icc || metadata.comment);
-  recipe = JpegRecipe();
-  recipe.iccProfile = true;
-  metadata = ReadJpegMetadata(MakeJpeg("/tmp/a.jpg", recipe));
+  JpegRecipe icc;
+  icc.iccProfile = true;
+  metadata = ReadJpegMetadata(MakeJpeg("/tmp/a.jpg", icc));
   EXPECT_TRUE(metadata.icc);
   EXPECT_FALSE(metadata.exif || metadata.xmp || metadata.iptc || metadata.comment);
 }
@@ -86,10 +83,10 @@ TEST_F(ImagesTest, OrientationsReadAsImageMagickTurnsThem) {
     JpegRecipe recipe;
     recipe.orientation = orientation;
     MakeJpeg("/tmp/a.jpg", recipe);
-    EXPECT_EQ(orientation, ReadJpegMetadata("/tmp/a.jpg").orientation);
-    EXPECT_EQ("RGBY", QuadrantLetters("/tmp/a.jpg"));
+    EXPECT_EQ(ReadJpegMetadata("/tmp/a.jpg").orientation, orientation);
+    EXPECT_EQ(QuadrantLetters("/tmp/a.jpg"), "RGBY");
     Convert({"/tmp/a.jpg", "-auto-orient", "/tmp/turned.jpg"});
-    EXPECT_EQ(LettersAfterOrientation(orientation), QuadrantLetters("/tmp/turned.jpg"))
+    EXPECT_EQ(QuadrantLetters("/tmp/turned.jpg"), LettersAfterOrientation(orientation))
         << orientation;
   }
 }
@@ -98,7 +95,7 @@ TEST_F(ImagesTest, TurnsReadAsImageMagickTurns) {
   MakeJpeg("/tmp/a.jpg");
   for (const int degrees : {0, 90, 180, 270}) {
     Convert({"/tmp/a.jpg", "-rotate", std::to_string(degrees), "/tmp/turned.jpg"});
-    EXPECT_EQ(LettersAfterTurn(degrees), QuadrantLetters("/tmp/turned.jpg")) << degrees;
+    EXPECT_EQ(QuadrantLetters("/tmp/turned.jpg"), LettersAfterTurn(degrees)) << degrees;
   }
 }
 
@@ -106,81 +103,82 @@ TEST_F(ImagesTest, OrientationInBigEndianExifIsRead) {
   JpegRecipe recipe;
   recipe.orientation = 5;
   MakeJpeg("/tmp/a.jpg", recipe);
-  ASSERT_EQ(0, RunProgram("/usr/bin/exiftool",
-                          {"-all=", "-ExifByteOrder=MM", "-n", "-Orientation=7", "/tmp/a.jpg"})
-                   .exitCode);
-  EXPECT_EQ(7, ReadJpegMetadata("/tmp/a.jpg").orientation);
+  ASSERT_EQ(RunProgram("/usr/bin/exiftool",
+                       {"-all=", "-ExifByteOrder=MM", "-n", "-Orientation=7", "/tmp/a.jpg"})
+                .exitCode,
+            0);
+  EXPECT_EQ(ReadJpegMetadata("/tmp/a.jpg").orientation, 7);
 }
 
 TEST_F(ImagesTest, GreyAndCmykJpegs) {
   JpegRecipe recipe;
   recipe.colour = JpegColour::kGrey;
   MakeJpeg("/tmp/grey.jpg", recipe);
-  EXPECT_EQ(1, DecodeJpeg("/tmp/grey.jpg")->Components());
+  EXPECT_EQ(DecodeJpeg("/tmp/grey.jpg")->Components(), 1);
   recipe.colour = JpegColour::kCmyk;
   MakeJpeg("/tmp/cmyk.jpg", recipe);
-  EXPECT_EQ(4, DecodeJpeg("/tmp/cmyk.jpg")->Components());
-  EXPECT_EQ("RGBY", QuadrantLetters("/tmp/cmyk.jpg"));
+  EXPECT_EQ(DecodeJpeg("/tmp/cmyk.jpg")->Components(), 4);
+  EXPECT_EQ(QuadrantLetters("/tmp/cmyk.jpg"), "RGBY");
   // Another reader sees the same inks.
   Convert({"/tmp/cmyk.jpg", "-colorspace", "sRGB", "/tmp/rgb.jpg"});
-  EXPECT_EQ(3, DecodeJpeg("/tmp/rgb.jpg")->Components());
-  EXPECT_EQ("RGBY", QuadrantLetters("/tmp/rgb.jpg"));
+  EXPECT_EQ(DecodeJpeg("/tmp/rgb.jpg")->Components(), 3);
+  EXPECT_EQ(QuadrantLetters("/tmp/rgb.jpg"), "RGBY");
 }
 
-TEST_F(ImagesTest, WholeJpegsAreToldFromDamagedOnes) {
+TEST_F(ImagesTest, DamagedJpegsAreNotWhole) {
   std::string why;
   MakeTruncatedJpeg("/tmp/cut.jpg");
   EXPECT_FALSE(DecodeJpeg("/tmp/cut.jpg", &why).has_value());
-  EXPECT_NE("", why);
-  EXPECT_EQ("", QuadrantLetters("/tmp/cut.jpg"));
+  EXPECT_NE(why, "");
+  EXPECT_EQ(QuadrantLetters("/tmp/cut.jpg"), "");
   MakeJpeg("/tmp/a.jpg");
   EXPECT_TRUE(IsWholeJpeg("/tmp/a.jpg"));
   AppendToFile("/tmp/a.jpg", "x");
   EXPECT_FALSE(DecodeJpeg("/tmp/a.jpg", &why).has_value());
-  EXPECT_EQ("1 bytes behind the end", why);
+  EXPECT_EQ(why, "1 bytes behind the end");
   WriteFile("/tmp/none.jpg", "no picture");
-  EXPECT_FALSE(IsWholeJpeg("/tmp/none.jpg"));
   WriteFile("/tmp/empty.jpg", "");
-  EXPECT_FALSE(IsWholeJpeg("/tmp/empty.jpg"));
-  EXPECT_FALSE(IsWholeJpeg("/tmp/missing.jpg"));
+  for (const char* path : {"/tmp/none.jpg", "/tmp/empty.jpg", "/tmp/missing.jpg"}) {
+    EXPECT_FALSE(IsWholeJpeg(path)) << path;
+  }
 }
 
 TEST_F(ImagesTest, TransparentPng) {
   MakeTransparentPng("/tmp/a.png", 80, 60);
-  EXPECT_EQ("PNG", Identify("/tmp/a.png").format);
+  EXPECT_EQ(Identify("/tmp/a.png").format, "PNG");
   Convert({"/tmp/a.png", "-background", "white", "-flatten", "/tmp/white.jpg"});
-  EXPECT_EQ("RWBW", QuadrantLetters("/tmp/white.jpg"));
+  EXPECT_EQ(QuadrantLetters("/tmp/white.jpg"), "RWBW");
   Convert({"/tmp/a.png", "-background", "black", "-flatten", "/tmp/black.jpg"});
-  EXPECT_EQ("RKBK", QuadrantLetters("/tmp/black.jpg"));
+  EXPECT_EQ(QuadrantLetters("/tmp/black.jpg"), "RKBK");
 }
 
 TEST_F(ImagesTest, PicturesOfSeveralFrames) {
   MakeAnimatedGif("/tmp/a.gif", 3, 60, 40);
   const ImageIdentity gif = Identify("/tmp/a.gif");
-  EXPECT_EQ("GIF", gif.format);
-  EXPECT_EQ(3, gif.frames);
-  EXPECT_EQ(60, gif.width);
+  EXPECT_EQ(gif.format, "GIF");
+  EXPECT_EQ(gif.frames, 3);
+  EXPECT_EQ(gif.width, 60);
   MakeMultiPageTiff("/tmp/a.tif", 2);
-  EXPECT_EQ("TIFF", Identify("/tmp/a.tif").format);
-  EXPECT_EQ(2, Identify("/tmp/a.tif").frames);
+  EXPECT_EQ(Identify("/tmp/a.tif").format, "TIFF");
+  EXPECT_EQ(Identify("/tmp/a.tif").frames, 2);
   Convert({"/tmp/a.gif[0]", "/tmp/first.jpg"});
-  EXPECT_EQ("RGBY", QuadrantLetters("/tmp/first.jpg"));
+  EXPECT_EQ(QuadrantLetters("/tmp/first.jpg"), "RGBY");
   Convert({"/tmp/a.tif[1]", "/tmp/second.jpg"});
-  EXPECT_EQ("EEEE", QuadrantLetters("/tmp/second.jpg"));
+  EXPECT_EQ(QuadrantLetters("/tmp/second.jpg"), "EEEE");
 }
 
 TEST_F(ImagesTest, OtherFormatsByExtension) {
   for (const std::string format : {"png", "bmp", "webp", "psd"}) {
     const std::string path = MakeImage("/tmp/a." + format, 60, 40);
-    EXPECT_EQ(60, Identify(path).width) << format;
-    EXPECT_EQ(40, Identify(path).height) << format;
+    EXPECT_EQ(Identify(path).width, 60) << format;
+    EXPECT_EQ(Identify(path).height, 40) << format;
   }
-  EXPECT_EQ("PPM", Identify(MakePpm("/tmp/a.ppm")).format);
+  EXPECT_EQ(Identify(MakePpm("/tmp/a.ppm")).format, "PPM");
 }
 
 TEST_F(ImagesTest, WhatIsNoImageHasNoIdentity) {
   WriteFile("/tmp/a.jpg", "no picture");
-  EXPECT_EQ("", Identify("/tmp/a.jpg").format);
+  EXPECT_EQ(Identify("/tmp/a.jpg").format, "");
 }
 
 }  // namespace

@@ -31,27 +31,27 @@ int WriteError(const std::string& path, size_t bytes) {
 
 TEST_F(MountsTest, SmallVolumeHasExactlyTheSpaceAskedFor) {
   const SmallVolume volume("/tmp/volume", 0x40000000);
-  EXPECT_EQ(0x40000000U, volume.Available());
+  EXPECT_EQ(volume.Available(), 0x40000000U);
   struct statvfs status {};
-  ASSERT_EQ(0, statvfs("/tmp/volume", &status));
-  EXPECT_EQ(0x40000000U, status.f_bavail * status.f_frsize);
+  ASSERT_EQ(statvfs("/tmp/volume", &status), 0);
+  EXPECT_EQ(status.f_bavail * status.f_frsize, 0x40000000U);
 }
 
 TEST_F(MountsTest, AvailableSpaceCanBeSet) {
   SmallVolume volume("/tmp/volume", 1 << 20);
   WriteFileOfSize("/tmp/volume/photo", 10000);
   volume.SetAvailable(0x40000000);
-  EXPECT_EQ(0x40000000U, volume.Available());
+  EXPECT_EQ(volume.Available(), 0x40000000U);
   volume.SetAvailable(0x40000000 - SmallVolume::PageSize());
-  EXPECT_EQ(0x40000000U - SmallVolume::PageSize(), volume.Available());
+  EXPECT_EQ(volume.Available(), 0x40000000U - SmallVolume::PageSize());
 }
 
 TEST_F(MountsTest, FullVolumeRefusesWrites) {
   SmallVolume volume("/tmp/volume", 1 << 20);
   WriteFileOfSize("/tmp/volume/photo", 10000);
-  EXPECT_EQ(0, WriteError("/tmp/volume/before", 100));
+  EXPECT_EQ(WriteError("/tmp/volume/before", 100), 0);
   volume.SetAvailable(0);
-  EXPECT_EQ(ENOSPC, WriteError("/tmp/volume/after", 100));
+  EXPECT_EQ(WriteError("/tmp/volume/after", 100), ENOSPC);
 }
 
 TEST_F(MountsTest, SmallVolumeEndsWithItsObject) {
@@ -66,22 +66,22 @@ TEST_F(MountsTest, ReadOnlyMountRefusesChanges) {
   WriteFile("/tmp/d/file", "x");
   {
     const ReadOnlyMount mount("/tmp/d");
-    EXPECT_EQ(EROFS, WriteError("/tmp/d/new", 1));
-    EXPECT_EQ(-1, chmod("/tmp/d/file", 0600));
-    EXPECT_EQ(EROFS, errno);
-    EXPECT_EQ("x", ReadFile("/tmp/d/file"));
-    EXPECT_EQ(0, WriteError("/tmp/elsewhere", 1));
+    EXPECT_EQ(WriteError("/tmp/d/new", 1), EROFS);
+    EXPECT_EQ(chmod("/tmp/d/file", 0600), -1);
+    EXPECT_EQ(errno, EROFS);
+    EXPECT_EQ(ReadFile("/tmp/d/file"), "x");
+    EXPECT_EQ(WriteError("/tmp/elsewhere", 1), 0);
   }
-  EXPECT_EQ(0, WriteError("/tmp/d/new", 1));
+  EXPECT_EQ(WriteError("/tmp/d/new", 1), 0);
 }
 
 TEST_F(MountsTest, SystemDirectoriesCanBeReadOnly) {
-  for (const char* place : {"/var/run", "/var/spool", "/etc", "/var/lib", "/usr/vela/bin"}) {
-    const ReadOnlyMount mount(place);
-    EXPECT_EQ(EROFS, WriteError(std::string(place) + "/file", 1)) << place;
-  }
-  for (const char* place : {"/var/run", "/var/spool", "/etc", "/var/lib", "/usr/vela/bin"}) {
-    EXPECT_EQ(0, WriteError(std::string(place) + "/file", 1)) << place;
+  for (const std::string place : {"/var/run", "/var/spool", "/etc", "/var/lib", "/usr/vela/bin"}) {
+    {
+      const ReadOnlyMount mount(place);
+      EXPECT_EQ(WriteError(place + "/file", 1), EROFS) << place;
+    }
+    EXPECT_EQ(WriteError(place + "/file", 1), 0) << place;
   }
 }
 
@@ -103,8 +103,8 @@ TEST_F(MountsTest, ResetTakesOffWhatIsLeftMounted) {
   ResetSandbox();
   EXPECT_FALSE(Exists("/var/spool/volume"));
   EXPECT_FALSE(Exists("/var/lib/velaindex"));
-  EXPECT_EQ(0, WriteError("/etc/file", 1));
-  EXPECT_EQ(0, WriteError("/tmp/file", 1));
+  EXPECT_EQ(WriteError("/etc/file", 1), 0);
+  EXPECT_EQ(WriteError("/tmp/file", 1), 0);
 }
 
 }  // namespace

@@ -54,44 +54,44 @@ bool AwaitProcessCount(size_t count) {
 }
 
 TEST_F(SandboxEntry, ExitStatusIsThatOfTheTests) {
-  EXPECT_EQ(0, RunProbe(Arguments("Passes")).exitCode);
-  EXPECT_EQ(1, RunProbe(Arguments("Fails")).exitCode);
+  EXPECT_EQ(RunProbe(Arguments("Passes")).exitCode, 0);
+  EXPECT_EQ(RunProbe(Arguments("Fails")).exitCode, 1);
 }
 
-TEST_F(SandboxEntry, SignalThatEndsTheTestsIsTold) {
+TEST_F(SandboxEntry, SignalThatEndsTheTestsIsReported) {
   const ProgramResult result = RunProbe(Arguments("IsKilled"));
-  EXPECT_EQ(128 + SIGKILL, result.exitCode);
-  EXPECT_EQ("test process ended by signal 9 (Killed)\n", result.err);
+  EXPECT_EQ(result.exitCode, 128 + SIGKILL);
+  EXPECT_EQ(result.err, "test process ended by signal 9 (Killed)\n");
 }
 
 TEST_F(SandboxEntry, RunFailsInOneLineWhereThereIsNoSandbox) {
   const ProgramResult result = RunProbe(Arguments("Passes"), WithoutNamespaces());
-  EXPECT_EQ(1, result.exitCode);
-  EXPECT_EQ("", result.out);
+  EXPECT_EQ(result.exitCode, 1);
+  EXPECT_EQ(result.out, "");
   EXPECT_EQ(
-      "test environment: cannot make the user namespace of the sandbox: Operation not permitted\n",
-      result.err);
+      result.err,
+      "test environment: cannot make the user namespace of the sandbox: Operation not permitted\n");
 }
 
 TEST_F(SandboxEntry, RunFailsInOneLineWhereNothingCanBeMounted) {
   ProgramOptions options;
   options.beforeExec = {SeccompFail({SYS_mount}, EACCES)};
   const ProgramResult result = RunProbe(Arguments("Passes"), options);
-  EXPECT_EQ(1, result.exitCode);
+  EXPECT_EQ(result.exitCode, 1);
   EXPECT_THAT(result.err, StartsWith("test environment: cannot make the mounts"));
-  EXPECT_EQ(result.err.size() - 1, result.err.find('\n'));
+  EXPECT_EQ(result.err.find('\n'), result.err.size() - 1);
 }
 
 TEST_F(SandboxEntry, ListingTestsNeedsNoSandbox) {
   const ProgramResult result = RunProbe({"--gtest_list_tests"}, WithoutNamespaces());
-  EXPECT_EQ(0, result.exitCode);
+  EXPECT_EQ(result.exitCode, 0);
   EXPECT_THAT(result.out, HasSubstr("  Passes\n"));
 }
 
 TEST_F(SandboxEntry, ResultFileIsWrittenOutside) {
   std::vector<std::string> arguments = Arguments("Passes");
   arguments.push_back("--gtest_output=xml:/tmp/results/new/probe.xml");
-  EXPECT_EQ(0, RunProbe(arguments).exitCode);
+  EXPECT_EQ(RunProbe(arguments).exitCode, 0);
   EXPECT_THAT(ReadFile("/tmp/results/new/probe.xml"), HasSubstr("name=\"Passes\""));
 }
 

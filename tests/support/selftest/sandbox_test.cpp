@@ -52,31 +52,31 @@ TEST_F(Sandbox, TheMachineIsReadOnly) {
   for (const std::string place : {"/tmp", "/etc", "/var/spool", "/usr/bin", "/run", "/home"}) {
     const std::string file = HostPath(place) + "/vela_sandbox_test";
     errno = 0;
-    EXPECT_EQ(nullptr, fopen(file.c_str(), "w")) << place;
-    EXPECT_EQ(EROFS, errno) << place;
+    EXPECT_EQ(fopen(file.c_str(), "w"), nullptr) << place;
+    EXPECT_EQ(errno, EROFS) << place;
   }
 }
 
 TEST_F(Sandbox, ConfigurationFileCanBeReplacedByRename) {
   WriteFile("/etc/velainfo.conf.new", "key=\"value\"\n");
-  ASSERT_EQ(0, rename("/etc/velainfo.conf.new", "/etc/velainfo.conf"));
-  EXPECT_EQ("key=\"value\"\n", ReadFile("/etc/velainfo.conf"));
+  ASSERT_EQ(rename("/etc/velainfo.conf.new", "/etc/velainfo.conf"), 0);
+  EXPECT_EQ(ReadFile("/etc/velainfo.conf"), "key=\"value\"\n");
 }
 
 TEST_F(Sandbox, ToolsCanBeTakenAwayAndReplaced) {
   ASSERT_TRUE(Exists("/usr/bin/env"));
-  ASSERT_EQ(0, unlink("/usr/bin/env"));
+  ASSERT_EQ(unlink("/usr/bin/env"), 0);
   EXPECT_FALSE(Exists("/usr/bin/env"));
   EXPECT_FALSE(Exists("/bin/env"));
   WriteFile("/usr/bin/env", "mine");
-  EXPECT_EQ("mine", ReadFile("/usr/bin/env"));
+  EXPECT_EQ(ReadFile("/usr/bin/env"), "mine");
   ResetSandbox();
-  EXPECT_NE("mine", ReadFile("/usr/bin/env"));
+  EXPECT_NE(ReadFile("/usr/bin/env"), "mine");
 }
 
 TEST_F(Sandbox, OnlyTheSandboxsProcessesAreVisible) {
-  EXPECT_EQ(2, getpid());
-  EXPECT_EQ(1, getppid());
+  EXPECT_EQ(getpid(), 2);
+  EXPECT_EQ(getppid(), 1);
   std::vector<std::string> processes;
   for (const std::string& name : ListDirectory("/proc")) {
     if (name.find_first_not_of("0123456789") == std::string::npos) {
@@ -87,45 +87,45 @@ TEST_F(Sandbox, OnlyTheSandboxsProcessesAreVisible) {
 }
 
 TEST_F(Sandbox, UserIsRoot) {
-  EXPECT_EQ(0U, geteuid());
+  EXPECT_EQ(geteuid(), 0U);
 }
 
 TEST_F(Sandbox, OrphansAreReaped) {
   // A child that starts a grandchild and ends leaves it to process 1.
   int ends[2];
-  ASSERT_EQ(0, pipe(ends));
-  const Descriptor told(ends[0]);
-  const Descriptor tells(ends[1]);
+  ASSERT_EQ(pipe(ends), 0);
+  const Descriptor input(ends[0]);
+  const Descriptor output(ends[1]);
   const pid_t child = fork();
   if (child == 0) {
     const pid_t grandchild = fork();
     if (grandchild == 0) {
       _exit(0);
     }
-    const bool isTold = write(tells.Get(), &grandchild, sizeof grandchild) == sizeof grandchild;
-    _exit(isTold ? 0 : 1);
+    const bool isWritten = write(output.Get(), &grandchild, sizeof grandchild) == sizeof grandchild;
+    _exit(isWritten ? 0 : 1);
   }
   int status = 0;
-  ASSERT_EQ(child, waitpid(child, &status, 0));
-  ASSERT_EQ(0, status);
+  ASSERT_EQ(waitpid(child, &status, 0), child);
+  ASSERT_EQ(status, 0);
   pid_t grandchild = 0;
-  ASSERT_EQ(static_cast<ssize_t>(sizeof grandchild),
-            read(told.Get(), &grandchild, sizeof grandchild));
+  ASSERT_EQ(read(input.Get(), &grandchild, sizeof grandchild),
+            static_cast<ssize_t>(sizeof grandchild));
   EXPECT_TRUE(WaitUntilGone("/proc/" + std::to_string(grandchild)));
 }
 
 TEST_F(Sandbox, DevicesKeepTheirNames) {
   struct stat status {};
-  ASSERT_EQ(0, lstat("/dev/null", &status));
+  ASSERT_EQ(lstat("/dev/null", &status), 0);
   EXPECT_TRUE(S_ISCHR(status.st_mode));
-  EXPECT_EQ(makedev(1, 3), status.st_rdev);
-  EXPECT_EQ(0, lstat("/dev/log", &status));
+  EXPECT_EQ(status.st_rdev, makedev(1, 3));
+  EXPECT_EQ(lstat("/dev/log", &status), 0);
   EXPECT_TRUE(S_ISSOCK(status.st_mode));
 }
 
 TEST_F(Sandbox, TemporaryDirectoryIsLargeEnoughForTheDiskGuard) {
   struct statvfs volume {};
-  ASSERT_EQ(0, statvfs("/tmp", &volume));
+  ASSERT_EQ(statvfs("/tmp", &volume), 0);
   EXPECT_GE(volume.f_bavail * volume.f_frsize, 0x60000000UL);
 }
 
@@ -136,33 +136,29 @@ TEST_F(Sandbox, BuildAndSourceAreReachable) {
 }
 
 TEST_F(Sandbox, ResetRestoresEverything) {
-  WriteFile("/tmp/a/b/c", "x");
-  WriteFile("/run/velathumb.1.pid", "");
-  WriteFile("/var/spool/thumb_create.queue", "x");
-  WriteFile("/var/lib/velaindex/index.db", "x");
-  WriteFile("/etc/velainfo.conf", "x");
-  WriteFile("/usr/vela/bin/convert-thumb", "x");
-  WriteFile("/stranger", "x");
-  ASSERT_EQ(0, rename("/usr/bin/dcraw", "/usr/bin/dcraw.away"));
-  ASSERT_EQ(0, unlink("/etc/passwd"));
-  ASSERT_EQ(0, chmod("/tmp", 0700));
-  ASSERT_EQ(0, chmod("/var/lib", 0500));
-  ASSERT_EQ(0, chdir("/tmp/a"));
+  const char* const removed[] = {"/var/lib/velaindex", "/etc/velainfo.conf", "/stranger",
+                                 "/usr/bin/dcraw.away"};
+  for (const char* path : {"/tmp/a/b/c", "/run/velathumb.1.pid", "/var/spool/thumb_create.queue",
+                           "/var/lib/velaindex/index.db", "/etc/velainfo.conf",
+                           "/usr/vela/bin/convert-thumb", "/stranger"}) {
+    WriteFile(path, "x");
+  }
+  ASSERT_EQ(rename("/usr/bin/dcraw", "/usr/bin/dcraw.away"), 0);
+  ASSERT_EQ(unlink("/etc/passwd"), 0);
+  ASSERT_EQ(chmod("/tmp", 0700), 0);
+  ASSERT_EQ(chmod("/var/lib", 0500), 0);
+  ASSERT_EQ(chdir("/tmp/a"), 0);
   ResetSandbox();
-  EXPECT_THAT(ListDirectory("/tmp"), IsEmpty());
-  EXPECT_EQ(01777, ModeOf("/tmp"));
-  EXPECT_EQ(0755, ModeOf("/var/lib"));
-  EXPECT_THAT(ListDirectory("/run"), IsEmpty());
-  EXPECT_THAT(ListDirectory("/var/spool"), IsEmpty());
-  EXPECT_FALSE(Exists("/var/lib/velaindex"));
-  EXPECT_FALSE(Exists("/etc/velainfo.conf"));
-  EXPECT_FALSE(Exists("/stranger"));
-  EXPECT_THAT(ListDirectory("/usr/vela/bin"), IsEmpty());
+  for (const char* place : {"/tmp", "/run", "/var/spool", "/usr/vela/bin"}) {
+    EXPECT_THAT(ListDirectory(place), IsEmpty()) << place;
+  }
+  for (const char* path : removed) EXPECT_FALSE(Exists(path)) << path;
+  EXPECT_EQ(ModeOf("/tmp"), 01777);
+  EXPECT_EQ(ModeOf("/var/lib"), 0755);
   EXPECT_TRUE(IsRegularFile("/usr/bin/dcraw"));
-  EXPECT_FALSE(Exists("/usr/bin/dcraw.away"));
   EXPECT_TRUE(IsRegularFile("/etc/passwd"));
   char directory[16] = "";
-  EXPECT_STREQ("/", getcwd(directory, sizeof directory));
+  EXPECT_STREQ(getcwd(directory, sizeof directory), "/");
 }
 
 TEST_F(Sandbox, ResetEndsProcessesOfEarlierTests) {

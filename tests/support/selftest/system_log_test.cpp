@@ -25,12 +25,12 @@ TEST_F(SystemLogTest, RecordsPriorityIdentityAndText) {
   syslog(LOG_ERR, "%s:%d [Error] opendir: %s", "name", 404, "/a: b");
   closelog();
   const std::vector<LogMessage> messages = LogMessages();
-  ASSERT_EQ(1U, messages.size());
-  EXPECT_EQ(LOG_ERR, messages[0].priority);
-  EXPECT_EQ(LOG_DAEMON, messages[0].facility);
-  EXPECT_EQ("tester[" + std::to_string(getpid()) + "]", messages[0].identity);
-  EXPECT_EQ("name:404 [Error] opendir: /a: b", messages[0].text);
-  EXPECT_EQ(getpid(), messages[0].pid);
+  ASSERT_EQ(messages.size(), 1U);
+  EXPECT_EQ(messages[0].priority, LOG_ERR);
+  EXPECT_EQ(messages[0].facility, LOG_DAEMON);
+  EXPECT_EQ(messages[0].identity, "tester[" + std::to_string(getpid()) + "]");
+  EXPECT_EQ(messages[0].text, "name:404 [Error] opendir: /a: b");
+  EXPECT_EQ(messages[0].pid, getpid());
   openlog(nullptr, 0, LOG_USER);
 }
 
@@ -57,11 +57,11 @@ TEST_F(SystemLogTest, LongMessagesAreKeptWhole) {
 }
 
 TEST_F(SystemLogTest, RecordsOtherPrograms) {
-  ASSERT_EQ(0, RunProgram("/usr/bin/logger", {"-p", "user.err", "-t", "other", "hello"}).exitCode);
+  ASSERT_EQ(RunProgram("/usr/bin/logger", {"-p", "user.err", "-t", "other", "hello"}).exitCode, 0);
   const std::vector<LogMessage> messages = LogMessages();
-  ASSERT_EQ(1U, messages.size());
-  EXPECT_EQ("other", messages[0].identity);
-  EXPECT_EQ("hello", messages[0].text);
+  ASSERT_EQ(messages.size(), 1U);
+  EXPECT_EQ(messages[0].identity, "other");
+  EXPECT_EQ(messages[0].text, "hello");
 }
 
 TEST_F(SystemLogTest, OpenConnectionSurvivesAReset) {
@@ -80,35 +80,22 @@ TEST_F(SystemLogTest, RemovedSocketIsRestored) {
 }
 
 TEST_F(SystemLogTest, SeveralProcessesLoseNothingAndKeepTheirOrder) {
-  constexpr int kProcesses = 5;
   constexpr int kMessages = 200;
+  std::vector<std::string> expected;
+  for (int number = 0; number < kMessages; ++number) expected.push_back(std::to_string(number));
   std::vector<pid_t> children;
-  for (int i = 0; i < kProcesses; ++i) {
-    const pid_t child = fork();
-    if (child == 0) {
-      for (int number = 0; number < kMessages; ++number) {
-        syslog(LOG_ERR, "%d", number);
-      }
+  for (int i = 0; i < 5; ++i) {
+    children.push_back(fork());
+    if (children.back() == 0) {
+      for (const std::string& text : expected) syslog(LOG_ERR, "%s", text.c_str());
       _exit(0);
     }
-    children.push_back(child);
   }
-  for (const pid_t child : children) {
-    waitpid(child, nullptr, 0);
-  }
+  for (const pid_t child : children) waitpid(child, nullptr, 0);
   std::map<pid_t, std::vector<std::string>> byProcess;
-  for (const LogMessage& message : LogMessages()) {
-    byProcess[message.pid].push_back(message.text);
-  }
-  std::vector<std::string> expected;
-  expected.reserve(kMessages);
-  for (int number = 0; number < kMessages; ++number) {
-    expected.push_back(std::to_string(number));
-  }
-  ASSERT_EQ(static_cast<size_t>(kProcesses), byProcess.size());
-  for (const pid_t child : children) {
-    EXPECT_EQ(expected, byProcess[child]);
-  }
+  for (const LogMessage& message : LogMessages()) byProcess[message.pid].push_back(message.text);
+  ASSERT_EQ(byProcess.size(), 5U);
+  for (const pid_t child : children) EXPECT_EQ(byProcess[child], expected);
 }
 
 }  // namespace

@@ -11,9 +11,8 @@
 #include <utility>
 
 #include "support/stub/call_record.h"
-#include "support/stub/file_steps.h"
 #include "support/stub/grey_jpeg.h"
-#include "support/stub/process_steps.h"
+#include "support/stub/steps.h"
 #include "support/stub_plan.h"
 
 namespace vela_test {
@@ -146,7 +145,7 @@ void Performance::WriteNextOutputs(size_t count,
     const StubOutput& output = line_.outputs[nextOutput_];
     const int error = WriteContent(output.path, content(output));
     if (error != 0) {
-      // A converter reports this and goes on, as the real one does.
+      // Report it and continue, as the real converter does.
       std::fprintf(stderr, "unable to open image `%s': %s\n", output.path.c_str(),
                    std::strerror(error));
       status_ = 1;
@@ -157,7 +156,7 @@ void Performance::WriteNextOutputs(size_t count,
 void Performance::Print(int descriptor, const std::string& text, size_t times) {
   for (size_t i = 0; i < times; ++i) {
     if (WriteWhole(descriptor, text) != 0) {
-      status_ = 1;  // nobody reads on, which is for the test to judge
+      status_ = 1;  // the reader has closed its end
       return;
     }
   }

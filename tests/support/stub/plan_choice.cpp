@@ -1,11 +1,9 @@
 #include "support/stub/plan_choice.h"
 
-#include <fcntl.h>
-#include <unistd.h>
-
 #include <algorithm>
+#include <fstream>
+#include <iterator>
 
-#include "support/descriptor.h"
 #include "support/field_codec.h"
 #include "support/stub_files.h"
 
@@ -14,17 +12,11 @@ namespace vela_test {
 namespace {
 
 std::optional<std::string> Content(const std::string& path) {
-  const Descriptor file(open(path.c_str(), O_RDONLY | O_CLOEXEC));
-  if (!file.IsOpen()) {
+  std::ifstream file(path, std::ios::binary);
+  if (!file) {
     return std::nullopt;
   }
-  std::string content;
-  char buffer[65536];
-  ssize_t count = 0;
-  while ((count = read(file.Get(), buffer, sizeof buffer)) > 0) {
-    content.append(buffer, static_cast<size_t>(count));
-  }
-  return content;
+  return std::string(std::istreambuf_iterator<char>(file), {});
 }
 
 /// The plan of the latest condition that one of the arguments meets.

@@ -1,4 +1,4 @@
-// A test program whose results the sandbox's own tests look at from outside.
+// A test program that the sandbox's own tests run and whose results they check.
 #include <gtest/gtest.h>
 #include <signal.h>
 #include <unistd.h>
@@ -6,7 +6,7 @@
 namespace {
 
 TEST(Probe, Passes) {
-  EXPECT_EQ(2, getpid());
+  EXPECT_EQ(getpid(), 2);
 }
 
 TEST(Probe, Fails) {

@@ -1,4 +1,4 @@
-// Rows of test tables.
+// Rows of tables for parameterised tests.
 #pragma once
 
 #include <gtest/gtest.h>
@@ -8,19 +8,20 @@
 
 namespace vela_test {
 
-/// The base of a table's rows: tests and messages show a row by its name.
+/// Base of a row: its name becomes part of the test's name and identifies the row in messages.
 struct NamedCase {
   const char* name;
 };
+
 inline std::ostream& operator<<(std::ostream& out, const NamedCase& row) {
   return out << row.name;
 }
 
-/// Names the test of each row, for INSTANTIATE_TEST_SUITE_P.
+/// Last argument of INSTANTIATE_TEST_SUITE_P for such rows.
 struct CaseName {
   template <typename Case>
-  std::string operator()(const ::testing::TestParamInfo<Case>& row) const {
-    return row.param.name;
+  std::string operator()(const testing::TestParamInfo<Case>& test) const {
+    return test.param.name;
   }
 };
 

@@ -1,10 +1,11 @@
-// The steps of a stub that change files. Each returns 0, or the errno that stopped it.
+// What a stub does in its steps. Functions on files return 0, or the errno that stopped them.
 #pragma once
 
 #include <sys/types.h>
 
 #include <cstddef>
 #include <string>
+#include <vector>
 
 namespace vela_test {
 
@@ -22,5 +23,17 @@ int ReplaceWithDirectory(const std::string& path);
 int SetBothTimes(const std::string& path, long long seconds);
 /// Shrinks a memory volume to what is in use.
 int FillUp(const std::string& path);
+
+/// Runs a program and waits for it; its exit status, 128 + n after signal n, 127 when it cannot be
+/// started. The program ends with the stub.
+int RunAndWait(const std::string& program, const std::vector<std::string>& arguments);
+
+void SleepFor(int milliseconds);
+
+/// Waits until the path exists; false when it does not come within 60 s.
+bool AwaitFile(const std::string& path);
+
+/// Ends the process by the signal, even if that is blocked or ignored.
+[[noreturn]] void Die(int signal);
 
 }  // namespace vela_test
