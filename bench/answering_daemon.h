@@ -1,11 +1,11 @@
-// A plugin daemon that costs as little as one can.
+// A plugin daemon with the lowest possible cost.
 #pragma once
 
 #include <thread>
 
 namespace vela_bench {
 
-/// Answers every request on the plugin daemon's socket at once, until it is destroyed.
+/// Answers every request on the plugin daemon's socket immediately, until it is destroyed.
 class AnsweringDaemon {
  public:
   AnsweringDaemon();

@@ -1,4 +1,4 @@
-// The command lines that the benchmark of the converter compares.
+// The command lines that the converter benchmark compares.
 #pragma once
 
 #include <string>
@@ -10,20 +10,20 @@ using Command = std::vector<std::string>;
 
 constexpr char kImageMagick[] = "/usr/bin/convert-im6.q16";
 
-/// Six sharpened outputs of a photo in one run, as requested by velathumb, written to `directory`.
-/// `program`: the converter or ImageMagick.
+/// Makes six sharpened outputs of a photo in `directory` in one run, with the options that
+/// velathumb uses. `program`: path of the converter or of ImageMagick.
 Command SixOutputs(const std::string& program, const std::string& photo,
                    const std::string& directory);
 
-/// Only the smallest of the six.
+/// Makes only the smallest of the six outputs.
 Command SmallestOutput(const std::string& program, const std::string& photo,
                        const std::string& directory);
 
-/// Only the largest of the six, made by vipsthumbnail.
+/// Makes only the largest of the six outputs, with vipsthumbnail.
 Command LargestByVips(const std::string& photo, const std::string& directory);
 
-/// The unavoidable work: decoding the JPEG (`width` pixels wide) at a fraction of its size, and
-/// encoding the six outputs, which SixOutputs must have created in `directory`.
+/// The work that every converter has to do: decode the JPEG (`width` pixels wide) at a fraction of
+/// its size, and encode the six outputs, which SixOutputs must have made in `directory` before.
 std::vector<Command> DecodeAndEncodes(const std::string& photo, int width,
                                       const std::string& directory);
 

@@ -34,12 +34,12 @@ using vela_test::HostPath;
 
 const std::string kScratch = vela_test::kWritablePlace;
 
-/// The processor that the daemon has for itself where there is a second one for its clients.
+/// The daemon runs on this processor, the clients on the others if there are any.
 constexpr int kDaemonProcessor = 0;
 
 constexpr int kClients = 8;
 
-/// A running index daemon on one processor, its database on the scratch disk.
+/// An index daemon that runs on one processor, with its database on the scratch disk.
 class PinnedDaemon {
  public:
   PinnedDaemon()
@@ -53,7 +53,7 @@ class PinnedDaemon {
       if (AutoSendRecvPacket(PluginDaemonSocketPath, -1, packet, 10) == 0) return;
       usleep(10000);
     }
-    Fail("the index daemon does not start: " + program_.Error());
+    Fail("the index daemon did not start: " + program_.Error());
   }
 
   ~PinnedDaemon() {
@@ -82,7 +82,7 @@ class PinnedDaemon {
   vela_test::Program program_;
 };
 
-/// Keeps the calling thread off the daemon's processor, where there is another one.
+/// Keeps the calling thread off the daemon's processor if there is another one.
 void LeaveDaemonProcessor() {
   cpu_set_t processors;
   if (sched_getaffinity(0, sizeof processors, &processors) != 0) return;
@@ -90,7 +90,7 @@ void LeaveDaemonProcessor() {
   if (CPU_COUNT(&processors) > 0) sched_setaffinity(0, sizeof processors, &processors);
 }
 
-/// Calls `ask` with the numbers from 0 to `count`, from several clients at once.
+/// Calls `ask` with every number from 0 to `count` - 1, from several concurrent clients.
 void AskFromClients(int count, const std::function<void(int)>& ask) {
   std::vector<std::thread> clients;
   for (int client = 0; client < kClients; ++client) {
@@ -109,8 +109,8 @@ void ReportRequests(const char* what, const PinnedDaemon& daemon, int count,
   AskFromClients(count, ask);
   const std::chrono::duration<double> wall = std::chrono::steady_clock::now() - begin;
   const double used = daemon.Seconds() - before;
-  std::printf("%-34s %9.0f a second, %6.1f us of processor time each\n", what, count / wall.count(),
-              used * 1e6 / count);
+  std::printf("%-34s %9.0f per second, %6.1f us of processor time each\n", what,
+              count / wall.count(), used * 1e6 / count);
 }
 
 std::string PhotoPath(const std::string& directory, int number) {
@@ -127,15 +127,15 @@ void MeasureRequests() {
     const std::string path = directory + "/" + names[static_cast<size_t>(i) % names.size()];
     VELA_MEDIA_INFO media = {};
     if (GetMediaFromPluginDB(THUMB_TYPE_PHOTO, path.c_str(), media) != 0) {
-      Fail("the index daemon gives no record of " + path);
+      Fail("the index daemon returned no record of " + path);
     }
   };
-  // Records of files that were changed just now are not kept.
+  // The daemon does not keep records of files that have just been changed.
   for (const std::string& name : names) {
     vela_test::SetFileTimeFromNow(directory + "/" + name, -3600);
   }
   const PinnedDaemon daemon;
-  ReportRequests("requests: is conversion off", daemon, kRequests,
+  ReportRequests("requests: is conversion disabled", daemon, kRequests,
                  [](int) { IsDisableConvertPhoto(); });
   ReportRequests("requests: index version", daemon, kRequests, [&](int i) {
     if (GetIndexVersion(PhotoPath(directory, i).c_str()) != 0) Fail("wrong index version");
@@ -148,7 +148,8 @@ void MeasureRequests() {
   vela_test::RemoveTree(directory);
 }
 
-/// Time over photos that are up to date with this daemon, and with one that costs next to nothing.
+/// Measures photos that are up to date without a daemon, with one of almost no cost, and with the
+/// index daemon.
 void MeasureUpToDate() {
   constexpr int kPhotos = 5000;
   constexpr int kRounds = 3;
@@ -175,7 +176,7 @@ void MeasureUpToDate() {
     indexed = fastest();
   }
   std::printf(
-      "%-34s %9.3f ms without a daemon, %.3f ms with one that answers at once, %.3f ms"
+      "%-34s %9.3f ms without a daemon, %.3f ms with one that answers immediately, %.3f ms"
       " with the index daemon\n",
       "nothing to do, a photo", alone, answered, indexed);
   vela_test::RemoveTree(directory);

@@ -1,8 +1,8 @@
 // floor_commands FILE
 //
-// Runs the commands of FILE one after another and nothing else: what a pass over a directory costs
-// when only its converters count. A command is its arguments, each ended by a NUL, and an empty
-// argument ends the command.
+// Runs the commands of FILE one after another and does nothing else: the cost of the converters
+// alone. FILE contains the arguments of each command, each followed by a NUL; an empty argument
+// ends the command.
 
 #include <spawn.h>
 #include <sys/wait.h>

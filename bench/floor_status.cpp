@@ -1,7 +1,7 @@
 // floor_status DIRECTORY
 //
-// Lists a directory and takes the status of each photo, of its metadata directory and of its six
-// thumbnails, and nothing else: what a pass with nothing to do costs at the least.
+// Lists a directory and calls stat for each photo, its metadata directory and its six thumbnails,
+// and does nothing else: the minimum cost of a directory whose thumbnails are up to date.
 
 #include <dirent.h>
 #include <sys/stat.h>

@@ -7,7 +7,7 @@ namespace vela_bench {
 OneProcessor::OneProcessor() {
   int first = 0;
   if (sched_getaffinity(0, sizeof before_, &before_) != 0) {
-    Fail("cannot tell the processors");
+    Fail("cannot read the processor affinity");
   }
   while (first < CPU_SETSIZE - 1 && !CPU_ISSET(first, &before_)) {
     ++first;
@@ -16,7 +16,7 @@ OneProcessor::OneProcessor() {
   CPU_ZERO(&one);
   CPU_SET(first, &one);
   if (sched_setaffinity(0, sizeof one, &one) != 0) {
-    Fail("cannot choose a processor");
+    Fail("cannot set the processor affinity");
   }
 }
 

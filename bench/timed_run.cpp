@@ -35,7 +35,7 @@ pid_t Start(const std::vector<std::string>& command) {
   return child;
 }
 
-/// Returns its status; `usage` receives what it used.
+/// Returns the child's status; `usage` receives its resource usage.
 int WaitFor(pid_t child, const std::function<void(int)>& whileRunning, rusage& usage) {
   int status = 0;
   if (!whileRunning) {

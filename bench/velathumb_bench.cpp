@@ -1,7 +1,7 @@
 // velathumb_bench SCRATCH-DIRECTORY
 //
-// Measures velathumb against the least that could do the same, each in the same run, and prints
-// the ratios. Works in a sandbox; the scratch directory (on a real disk) takes its files.
+// Measures velathumb and the least work that could give the same result in the same run, and prints
+// the ratios. Runs in a sandbox; its files are in the scratch directory, which should be on a disk.
 
 #include <algorithm>
 #include <cstdio>
@@ -27,7 +27,7 @@ using vela_test::HostPath;
 
 const std::string kScratch = vela_test::kWritablePlace;
 
-/// All six size classes, with everything that the converter must do in one phase or the next.
+/// Writes a profile file with all six size classes, spread over the three phases.
 std::string WriteSixSizes() {
   return vela_test::WriteProfileFile(
       "/tmp/six.conf", {{"thumb_xl", 1280, 90, "0.5x0.5+1+0", "VELAPHOTO_THUMB_XL.jpg", 0},
@@ -38,10 +38,11 @@ std::string WriteSixSizes() {
                         {"thumb_s", 120, 80, "", "VELAPHOTO_THUMB_S.jpg", 2}});
 }
 
-void Report(const char* what, const Cost& subject, const Cost& floor, int photos, const char* aim) {
+void Report(const char* what, const Cost& subject, const Cost& floor, int photos,
+            const char* target) {
   std::printf("%-34s %9.3f ms %9.3f ms  ratio %6.3f  %s\n", what,
               subject.wallSeconds * 1e3 / photos, floor.wallSeconds * 1e3 / photos,
-              subject.wallSeconds / floor.wallSeconds, aim);
+              subject.wallSeconds / floor.wallSeconds, target);
 }
 
 void WriteCommands(const std::string& path) {
@@ -54,7 +55,7 @@ void WriteCommands(const std::string& path) {
   }
 }
 
-/// Wall time over 50 photos against the same converter commands alone.
+/// Compares the wall time for 50 photos with that of the same converter commands alone.
 void MeasureConversion() {
   constexpr int kPhotos = 50;
   const std::string directory = kScratch + "/real";
@@ -77,11 +78,12 @@ void MeasureConversion() {
       [&] {
         return TimedRun({HostPath(FLOOR_COMMANDS), "/tmp/commands"});
       });
-  Report("conversion, a photo", cost.subject, cost.floor, kPhotos, "(aim 1.02)");
+  Report("conversion, a photo", cost.subject, cost.floor, kPhotos, "(target 1.02)");
   vela_test::RemoveTree(directory);
 }
 
-/// Time over photos that are up to date against listing them and taking the status of their files.
+/// Compares the time for photos that are up to date with listing them and calling stat for their
+/// files.
 void MeasureNothingToDo() {
   constexpr int kPhotos = 20000;
   const std::string directory = kScratch + "/done";
@@ -91,7 +93,7 @@ void MeasureNothingToDo() {
   const auto runSubject = [&] { return TimedRun(subject); };
   const auto runFloor = [&] { return TimedRun({HostPath(FLOOR_STATUS), directory}); };
   const CostPair alone = FastestOf(5, runSubject, runFloor);
-  Report("nothing to do, no daemon, a photo", alone.subject, alone.floor, kPhotos, "(aim 2.00)");
+  Report("nothing to do, no daemon, a photo", alone.subject, alone.floor, kPhotos, "(target 2.00)");
   {
     const AnsweringDaemon daemon;
     const CostPair answered = FastestOf(3, runSubject, runFloor);
@@ -100,7 +102,7 @@ void MeasureNothingToDo() {
   vela_test::RemoveTree(directory);
 }
 
-/// Start to end on an empty directory against a program that does nothing.
+/// Compares a run on an empty directory with a program that does nothing.
 void MeasureStart() {
   constexpr int kRuns = 100;
   const std::string directory = kScratch + "/empty";
@@ -108,7 +110,7 @@ void MeasureStart() {
   const std::vector<std::string> subject = {vela_test::VelathumbPath(), WriteSixSizes(), directory};
   const CostPair cost = FastestOf(
       kRuns, [&] { return TimedRun(subject); }, [] { return TimedRun({"/bin/true"}); });
-  std::printf("%-34s %9.3f ms %9.3f ms  %.3f ms more (aim 5)\n", "start to end, empty directory",
+  std::printf("%-34s %9.3f ms %9.3f ms  %.3f ms more (target 5)\n", "start to end, empty directory",
               cost.subject.wallSeconds * 1e3, cost.floor.wallSeconds * 1e3,
               (cost.subject.wallSeconds - cost.floor.wallSeconds) * 1e3);
 }
@@ -133,12 +135,13 @@ Memory MemoryOf(int pid) {
   return memory;
 }
 
-/// Peak memory for a large directory, and whether it grows with the photos done.
+/// Measures the peak memory for a large directory and whether memory grows with the photos
+/// processed.
 void MeasureMemory() {
   constexpr int kPhotos = 100000;
   const std::string directory = kScratch + "/many";
   MakePhotoFiles(directory, kPhotos);
-  // Without a profile nothing is converted, so that every photo passes quickly.
+  // Without a profile nothing is converted, so every photo is processed quickly.
   const std::string profiles = vela_test::WriteProfileFile("/tmp/none.conf", {});
   std::vector<Memory> samples;
   TimedRun({vela_test::VelathumbPath(), profiles, directory}, [&](int pid) {
@@ -148,16 +151,16 @@ void MeasureMemory() {
     }
   });
   if (samples.size() < 10) {
-    Fail("too few samples of the memory");
+    Fail("too few memory samples");
   }
-  std::printf("%-34s %9.1f MiB  (aim below 40)\n", "peak memory, 100,000 photos",
+  std::printf("%-34s %9.1f MiB  (target below 40)\n", "peak memory, 100,000 photos",
               samples.back().peak);
-  std::printf("%-34s %9.1f MiB %9.1f MiB at the end\n", "resident after three tenths",
+  std::printf("%-34s %9.1f MiB %9.1f MiB at the end\n", "resident after 30 % of the run",
               samples[samples.size() * 3 / 10].now, samples.back().now);
   vela_test::RemoveTree(directory);
 }
 
-/// Makes a tree of directories whose photos are all up to date.
+/// Creates a tree of directories whose photos are all up to date.
 void MakeTree(const std::string& root, int directories, int photos) {
   for (int i = 0; i < directories; ++i) {
     const std::string directory = root + "/" + std::to_string(i);
@@ -166,7 +169,7 @@ void MakeTree(const std::string& root, int directories, int photos) {
   }
 }
 
-/// A queue of many directories, none of which is looked at.
+/// Writes a queue of many directories outside the scanned tree.
 void WriteLongQueue(int lines) {
   std::ofstream queue("/var/spool/thumb_create.queue");
   for (int i = 0; i < lines; ++i) {
@@ -184,8 +187,8 @@ void ReportScanMemory(const char* what, double peak) {
   std::printf("%-34s %9.1f MiB\n", what, peak);
 }
 
-/// The status of a large tree against a listing of the same files, and whether its memory grows
-/// with the photos.
+/// Compares the status of a large tree with a listing of the same files, and measures whether its
+/// memory grows with the number of photos.
 void MeasureScan() {
   constexpr int kDirectories = 1000;
   constexpr int kPhotos = 100;
@@ -208,7 +211,7 @@ void MeasureScan() {
   WriteLongQueue(1000000);
   const CostPair queued = FastestOf(3, runSubject, runFloor);
   Report("with 1,000,000 lines in the queue", queued.subject, queued.floor, kAll, "");
-  ReportScanMemory("peak with the queue's index", peak);
+  ReportScanMemory("peak memory with that queue", peak);
   vela_test::RemoveTree("/var/spool/thumb_create.queue");
   vela_test::RemoveTree(root);
 }

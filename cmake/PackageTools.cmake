@@ -1,4 +1,4 @@
-# Run by cpack when the files of the package are in place and before they are packed.
+# Run by cpack after the files of the package have been installed and before they are packed.
 set(VELA ${CPACK_TEMPORARY_DIRECTORY}${CPACK_PACKAGING_INSTALL_PREFIX}/vela)
 file(MAKE_DIRECTORY ${VELA}/bin ${VELA}/lib)
 if(NOT EXISTS ${VELA}/bin/convert-thumb)

@@ -1,11 +1,11 @@
-# Test programs; every one runs in a sandbox of its own (tests/support/).
+# Test programs; each runs in its own sandbox (tests/support/).
 include(GoogleTest)
 
-# Most of the time of a build would go into optimising the tests themselves.
+# Optimising the tests would take most of the build time.
 set(VELA_TEST_OPTIONS -O0)
 
-# Adds a test program of the given sources. It links the library and the test support, and takes the
-# headers of the test framework that tests/CMakeLists.txt compiles once for all.
+# Adds a test program with the given sources. It links the library and the test support, and reuses
+# the precompiled test framework headers of tests/CMakeLists.txt.
 function(vela_add_test_program name)
   add_executable(${name} ${ARGN})
   target_link_libraries(${name} PRIVATE vela_test_support velathumb_library)
@@ -16,7 +16,7 @@ function(vela_add_test_program name)
                        PROPERTIES TIMEOUT 600 ${VELA_TEST_PROPERTIES})
 endfunction()
 
-# Registers the tests of `name` that match `filter` once more, with ImageMagick as the real converter.
+# Registers the tests of `name` that match `filter` again, with ImageMagick as the real converter.
 function(vela_add_imagemagick_tests name filter)
   gtest_discover_tests(${name} TEST_PREFIX imagemagick.${name}. TEST_LIST ${name}_imagemagick
                        TEST_FILTER ${filter} DISCOVERY_TIMEOUT 60

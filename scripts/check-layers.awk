@@ -1,11 +1,12 @@
-# Reads tables (see scripts/check-layers) and then sources; prints the faults of their includes.
+# Reads tables (see scripts/check-layers) and then source files; prints the faults of their
+# includes.
 
-# The part of the tree that has an order of its own: src or programs/NAME.
+# Returns the part of the tree with its own order of layers: src or programs/NAME.
 function part_of(path) {
   return match(path, /^programs\/[^\/]*/) ? substr(path, 1, RLENGTH) : "src"
 }
 
-# A file with a place of its own counts as a folder.
+# A file that is listed in the order of the layers counts as a folder.
 function folder_of(file) {
   if (!(file in placed)) sub(/\/[^\/]*$/, "", file)
   return file
@@ -18,7 +19,7 @@ function without_dots(path) {
   return path
 }
 
-# The file that a quoted include names: beside the including one, below src/ or below the program.
+# Returns the file of a quoted include: next to the including file, below src/ or below the program.
 function find_target(file, name, folder) {
   folder = file
   sub(/[^\/]*$/, "", folder)

@@ -1,4 +1,4 @@
-# Functions of scripts/run: build velathumb, put the tools it drives in place, draw sample photos.
+# Functions of scripts/run: build velathumb, install the tools that it runs, draw sample photos.
 # shellcheck shell=bash
 
 ROOT=$(cd "$(dirname "${BASH_SOURCE[0]}")/.." && pwd)
@@ -25,7 +25,7 @@ build() {
   cmake --build "$BUILD"
 }
 
-# ImageMagick's own program, not whatever else is called convert on this machine.
+# Prints the path of ImageMagick's program; PATH may contain another program named convert.
 imagemagick_convert() {
   local candidate
   for candidate in /usr/bin/convert-im6.q16 /usr/bin/convert; do
@@ -48,22 +48,22 @@ link_tool() { # LINK TARGET
   "$ROOT/scripts/as-root" "$purpose" ln -sfn "$target" "$tool"
 }
 
-# The converter that is to be installed.
+# Prints the path of the converter to install.
 chosen_converter() {
   case $CONVERTER in
     own) echo "$OWN_CONVERTER" ;;
     imagemagick) echo "$CONVERTER_FRONT" ;;
-    *) fail "VELA_CONVERTER is own or imagemagick, not '$CONVERTER'" ;;
+    *) fail "VELA_CONVERTER must be own or imagemagick, not '$CONVERTER'" ;;
   esac
 }
 
-# Returns 0 if a file is a converter of this project, of whatever version: both the script and the
-# program refer to the link to ImageMagick's convert.
+# Returns 0 if a file is any version of this project's converters: both the script and the program
+# contain the path of the link to ImageMagick's convert.
 is_our_converter() { # FILE
   grep -qaF "$CONVERTER_LINK" "$1"
 }
 
-# Another converter that someone has put there stays; an older one of ours is replaced.
+# Replaces older versions of this project's converters, but keeps any other converter.
 place_converter() {
   local tool=$TOOLS/convert-thumb converter
   converter=$(chosen_converter)
@@ -71,7 +71,7 @@ place_converter() {
     return
   fi
   if [[ -e $tool && ! -L $tool ]] && ! is_our_converter "$tool"; then
-    say "Leaving $tool as it is: not a converter of this project"
+    say "Keeping $tool: not a converter of this project"
     return
   fi
   say "Installing $tool"
@@ -112,7 +112,7 @@ draw_samples() { # DIRECTORY
 
 make_samples() { # DIRECTORY
   if [[ -d $1 ]]; then
-    say "Taking the sample photos in ${1#"$ROOT/"}"
+    say "Using the sample photos in ${1#"$ROOT/"}"
     return
   fi
   say "Making sample photos in ${1#"$ROOT/"}"

@@ -1,10 +1,10 @@
-# Functions of scripts/run: what velathumb-status knows about a tree.
+# Functions of scripts/run that read the state of a tree from velathumb-status.
 # shellcheck shell=bash
 
 readonly STATUS=$BUILD/programs/velathumb-status/velathumb-status
 
-# Adds the state of directories, a JSON object, to a file. What cannot be read is skipped, as
-# velathumb does.
+# Appends the state of directories, a JSON object, to a file. Like velathumb, skips what cannot be
+# read.
 ask_status() { # STATE OPTION-OR-DIRECTORY...
   local state=$1 code=0 size
   size=$(stat -c %s "$state")
@@ -14,8 +14,8 @@ ask_status() { # STATE OPTION-OR-DIRECTORY...
   fi
 }
 
-# Stores the state of a tree in a file. Some names exclude a directory from a walk even when it
-# starts there: the state then consists of that of the directory and of those in it.
+# Stores the state of a tree in a file. Some names exclude a directory from a walk even if the walk
+# starts there; the states of the directory and of its subdirectories are then read separately.
 read_state() { # TREE STATE
   local device
   local -a below
@@ -35,12 +35,12 @@ read_state() { # TREE STATE
   fi
 }
 
-# Prints the result of a filter with the definitions of tree-state.jq.
+# Prints the result of a filter that may use the definitions of tree-state.jq.
 query() { # FILTER STATE [JQ OPTION]...
   jq -L "$ROOT/scripts" -sr "${@:3}" "include \"tree-state\"; $1" "$2"
 }
 
-# Prints the paths that a query gives in base 64, each with a NUL at its end.
+# Decodes the base64 paths that a query returns and prints each with a NUL at the end.
 query_paths() { # FILTER STATE
   query "$1, end64" "$2" | base64 -d
 }
@@ -49,7 +49,7 @@ list_directories() { # STATE
   query_paths 'directories | path64' "$1"
 }
 
-# The path of the first photo in a state that meets a condition; empty without one.
+# Prints the path of the first photo that meets a condition, or nothing.
 first_photo() { # CONDITION STATE
   local path=
   IFS= read -r -d '' path < <(query_paths "first_photo($1)" "$2") || true

@@ -1,11 +1,11 @@
 #!/bin/sh
-# Installed as /usr/vela/bin/convert-thumb in front of ImageMagick's convert, which is linked as
-# /usr/vela/lib/convert-thumb so that the process keeps its name.
+# Wrapper for ImageMagick's convert, installed as /usr/vela/bin/convert-thumb. It runs convert
+# through the link /usr/vela/lib/convert-thumb so that the process keeps its name.
 #
-# Some file names have a special meaning to ImageMagick: wildcards match other files, "@" makes it read
-# the content of the file as further arguments, which may write to other files, and a number format or
-# a doubled percent sign before a page selection refers to another file. Photos with such names are
-# rejected here, so that they get failure markers instead of the picture of another photo.
+# ImageMagick interprets special characters in file names: wildcards match other files, "@" makes it
+# read the content of the file as further arguments, which may write to other files, and a number
+# format or a doubled percent sign before a page selection refers to another file. This script
+# rejects such names, so the photo gets failure markers instead of thumbnails of another picture.
 set -eu
 LC_ALL=C
 export LC_ALL

@@ -1,4 +1,4 @@
-# Completion of velathumb-status for bash.
+# Bash completion for velathumb-status.
 
 _velathumb_status() {
   local current=${COMP_WORDS[COMP_CWORD]} previous=${COMP_WORDS[COMP_CWORD - 1]}

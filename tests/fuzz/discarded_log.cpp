@@ -1,5 +1,5 @@
 // Replaces the system log, which a million damaged files would flood. Messages are still formatted,
-// so that the sanitizers find invalid arguments.
+// so that invalid arguments are found.
 
 #include <syslog.h>
 

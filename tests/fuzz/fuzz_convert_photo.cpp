@@ -1,4 +1,4 @@
-// The whole conversion of a photo to thumbnails.
+// A photo, from decoding to the finished thumbnails.
 
 #include <fcntl.h>
 
@@ -17,9 +17,9 @@ using namespace vela;
 
 namespace {
 
-/// Small enough to distinguish memory still in use from a leak.
+/// Well below the fuzzer's memory limit, so that exceeding that limit indicates a leak.
 constexpr size_t kMemoryLimit = size_t{32} << 20;
-/// Larger pictures take too long for many runs.
+/// Larger pictures would take too long to process many of them.
 constexpr int64_t kMostPixels = 1000000;
 
 Step MakeStep(Step::Kind kind, int quarterTurns = 0) {
@@ -72,7 +72,7 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
   ConversionPlan plan;
   plan.source = input.Path();
   plan.firstPageOnly = true;
-  // Turned thumbnails are made from whole pictures, others row by row while decoding.
+  // Rotated outputs are made from whole pictures, others while the photo is being decoded.
   const int quarterTurns = static_cast<int>(size % 2);
   plan.outputs = {MakeOutput(first.Path(), {100, 80, false}, quarterTurns),
                   MakeOutput(second.Path(), {20, 20, true}, quarterTurns)};

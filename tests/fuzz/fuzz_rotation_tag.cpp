@@ -9,7 +9,7 @@
 
 namespace {
 
-/// A JPEG with nothing but an EXIF block of one entry: orientation upright.
+/// A JPEG that contains only an EXIF block with one entry: upright orientation.
 constexpr uint8_t kUprightPreview[] = {0xff, 0xd8, 0xff, 0xe1, 0x00, 0x22, 'E',  'x',  'i',  'f',
                                        0x00, 0x00, 'M',  'M',  0x00, 0x2a, 0x00, 0x00, 0x00, 0x08,
                                        0x00, 0x01, 0x01, 0x12, 0x00, 0x03, 0x00, 0x00, 0x00, 0x01,
@@ -22,8 +22,8 @@ int ReadRotation() {
 
 }  // namespace
 
-/// The tool runs for upright previews only: if this preview were not recognised as one, nothing
-/// would be tested.
+/// The tool is started only for upright previews; if the preview were not recognized as upright,
+/// the target would test nothing.
 extern "C" int LLVMFuzzerInitialize(int* /*count*/, char*** /*arguments*/) {
   SetToolOutput("Rotation: 90\n");
   if (ReadRotation() != 90) {

@@ -1,11 +1,11 @@
-// Fuzz input as a file.
+// Provides fuzz input as a file.
 #pragma once
 
 #include <cstddef>
 #include <cstdint>
 #include <string>
 
-/// A file in memory that holds the input as long as the object exists.
+/// A file in memory that contains the input; it exists as long as the object.
 class InputFile {
  public:
   InputFile(const uint8_t* data, size_t size);
@@ -13,7 +13,7 @@ class InputFile {
   InputFile(const InputFile&) = delete;
   InputFile& operator=(const InputFile&) = delete;
 
-  /// The path under which it can be opened.
+  /// Returns a path that opens the file.
   std::string Path() const { return "/proc/self/fd/" + std::to_string(descriptor_); }
 
  private:

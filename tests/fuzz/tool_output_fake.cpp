@@ -19,7 +19,7 @@ void SetToolOutput(std::string_view text) {
 }
 
 FILE* VLIBCPopen(const char* /*program*/, const char* /*mode*/, ...) {
-  // A stream in memory cannot be empty.
+  // fmemopen may reject an empty buffer.
   if (g_output.empty()) {
     return std::fopen("/dev/null", "re");
   }

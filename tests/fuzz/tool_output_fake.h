@@ -1,11 +1,11 @@
-// Replaces the platform's piped children: every tool that is started prints the same output.
+// Replaces the platform's piped child processes: every tool that is started prints the same output.
 #pragma once
 
 #include <cstddef>
 #include <cstdint>
 #include <string_view>
 
-/// Sets what every tool prints from now on; the data must stay valid.
+/// Sets the output of every tool started from now on; the data must stay valid.
 void SetToolOutput(const uint8_t* data, size_t size);
 
 /// The same for a text.
