@@ -26,7 +26,9 @@ bool IsPlain(char c) {
 
 bool IsPlain(std::string_view value) {
   for (const char c : value) {
-    if (!IsPlain(c)) return false;
+    if (!IsPlain(c)) {
+      return false;
+    }
   }
   return !value.empty();
 }
@@ -51,7 +53,9 @@ LogLine::LogLine(LogLevel level, std::string_view event) : level_(level) {
 }
 
 LogLine& LogLine::Add(std::string_view key, std::string_view value) {
-  if (!text_.empty()) text_ += ' ';
+  if (!text_.empty()) {
+    text_ += ' ';
+  }
   text_ += key;
   text_ += '=';
   if (IsPlain(value)) {
@@ -60,7 +64,9 @@ LogLine& LogLine::Add(std::string_view key, std::string_view value) {
   }
   text_ += '"';
   for (const char c : value) {
-    if (c == '"' || c == '\\') text_ += '\\';
+    if (c == '"' || c == '\\') {
+      text_ += '\\';
+    }
     text_ += c;
   }
   text_ += '"';

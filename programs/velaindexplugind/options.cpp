@@ -63,9 +63,13 @@ void AddOptions(CLI::App& app, Options& options, OptionText& text) {
 /// empty when nothing is.
 std::string ParseVersion(const std::string& argument, Options& options) {
   const size_t equals = argument.rfind('=');
-  if (equals == std::string::npos) return "--set-index-version needs DIR=N";
+  if (equals == std::string::npos) {
+    return "--set-index-version needs DIR=N";
+  }
   const auto number = ParseWholeNumber(std::string_view(argument).substr(equals + 1));
-  if (!number) return "the index version is a number from 0 to 2147483647";
+  if (!number) {
+    return "the index version is a number from 0 to 2147483647";
+  }
   options.versionDirectory = argument.substr(0, equals);
   options.version = *number;
   return {};
@@ -77,15 +81,21 @@ std::string ParseText(const CLI::App& app, const OptionText& text, Options& opti
   const bool isUnset = app.count("--unset-index-version") > 0;
   if (isSet) {
     const std::string error = ParseVersion(text.setVersion, options);
-    if (!error.empty()) return error;
+    if (!error.empty()) {
+      return error;
+    }
   }
   if (isUnset) {
     options.versionDirectory = text.unsetVersion;
     options.isVersionRemoved = true;
   }
   const bool isAbsolute = !options.versionDirectory.empty() && options.versionDirectory[0] == '/';
-  if ((isSet || isUnset) && !isAbsolute) return "the directory must begin with a slash";
-  if (options.database.empty()) return "--database needs a file";
+  if ((isSet || isUnset) && !isAbsolute) {
+    return "the directory must begin with a slash";
+  }
+  if (options.database.empty()) {
+    return "--database needs a file";
+  }
   return {};
 }
 

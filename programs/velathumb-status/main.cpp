@@ -39,17 +39,25 @@ class SinkList : public StatusSink {
   bool HasWork() const { return hasWork_; }
 
   void BeginDirectory() override {
-    for (StatusSink* sink : sinks_) sink->BeginDirectory();
+    for (StatusSink* sink : sinks_) {
+      sink->BeginDirectory();
+    }
   }
   void TakePhoto(const PhotoReport& photo) override {
-    for (StatusSink* sink : sinks_) sink->TakePhoto(photo);
+    for (StatusSink* sink : sinks_) {
+      sink->TakePhoto(photo);
+    }
   }
   void EndDirectory(const DirectoryReport& directory) override {
-    for (StatusSink* sink : sinks_) sink->EndDirectory(directory);
+    for (StatusSink* sink : sinks_) {
+      sink->EndDirectory(directory);
+    }
   }
   void TakeTotals(const StatusTotals& totals) override {
     hasWork_ = totals.all.HasWork();
-    for (StatusSink* sink : sinks_) sink->TakeTotals(totals);
+    for (StatusSink* sink : sinks_) {
+      sink->TakeTotals(totals);
+    }
   }
 
  private:
@@ -165,10 +173,18 @@ void StatusRun::Watch() {
 
 void StatusRun::Report() {
   options_.checkVideos = options_.checkVideos && CanCheckVideos();
-  if (!options_.directories.empty()) ReportDirectories();
-  if (options_.queue) ReportQueues();
-  if (options_.progress) ReportProgress();
-  if (options_.resumeTime) ReportResumeTime();
+  if (!options_.directories.empty()) {
+    ReportDirectories();
+  }
+  if (options_.queue) {
+    ReportQueues();
+  }
+  if (options_.progress) {
+    ReportProgress();
+  }
+  if (options_.resumeTime) {
+    ReportResumeTime();
+  }
   if (options_.json) {
     json_.Member("errors", errors_);
     json_.End();

@@ -65,7 +65,9 @@ std::string FindContradiction(const Options& options) {
 std::vector<std::string> LiteralArguments(std::vector<std::string> arguments) {
   for (std::string& argument : arguments) {
     const bool isListLike = !argument.empty() && std::strchr("[{%", argument.front()) != nullptr;
-    if (isListLike) argument.insert(0, "./");
+    if (isListLike) {
+      argument.insert(0, "./");
+    }
   }
   return arguments;
 }

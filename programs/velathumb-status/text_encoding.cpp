@@ -43,7 +43,9 @@ std::string ToPlainLine(std::string_view bytes) {
   std::string text;
   text.reserve(bytes.size());
   for (const char c : bytes) {
-    if (c == '\\') text += '\\';
+    if (c == '\\') {
+      text += '\\';
+    }
     text += c;
   }
   return EscapeControls(text, InvalidBytes::kKeep);

@@ -28,7 +28,9 @@ ParseOutcome ParseCommandLine(const ProgramText& text, std::vector<std::string> 
     return app.exit(error) == 0 ? ParseOutcome::kDone : ParseOutcome::kWrong;
   }
   const std::string mistake = findMistake ? findMistake(app) : std::string();
-  if (mistake.empty()) return ParseOutcome::kRun;
+  if (mistake.empty()) {
+    return ParseOutcome::kRun;
+  }
   WriteLog(LogLevel::kError, mistake + "; see --help");
   return ParseOutcome::kWrong;
 }

@@ -54,7 +54,9 @@ int RunProgram(int argc, char** argv, ParseOutcome (*parse)(int, char**, Options
   try {
     Options options;
     const ParseOutcome outcome = parse(argc, argv, options);
-    if (outcome != ParseOutcome::kRun) return outcome == ParseOutcome::kDone ? 0 : kWrongUse;
+    if (outcome != ParseOutcome::kRun) {
+      return outcome == ParseOutcome::kDone ? 0 : kWrongUse;
+    }
     status = failureStatus;
     return run(options);
   } catch (const std::exception& error) {

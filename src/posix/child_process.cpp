@@ -50,7 +50,9 @@ void SetDefaultSignals(bool keepIgnored) {
     struct sigaction old;
     const bool isKept =
         keepIgnored && sigaction(number, nullptr, &old) == 0 && old.sa_handler == SIG_IGN;
-    if (!isKept) sigaction(number, &action, nullptr);
+    if (!isKept) {
+      sigaction(number, &action, nullptr);
+    }
   }
 }
 
@@ -58,29 +60,45 @@ void SetDefaultSignals(bool keepIgnored) {
 /// open. Returns the copy, or -1 with errno set.
 int CopyAside(int fd, int fallback) {
   const int copy = fd < 0 ? -1 : fcntl(fd, F_DUPFD_CLOEXEC, kFirstOtherDescriptor);
-  if (copy >= 0) return copy;
-  if (fd >= 0 && errno != EBADF) return -1;
+  if (copy >= 0) {
+    return copy;
+  }
+  if (fd >= 0 && errno != EBADF) {
+    return -1;
+  }
   return fcntl(fallback, F_DUPFD_CLOEXEC, kFirstOtherDescriptor);
 }
 
 bool SetStreams(const ChildStreams& streams) {
   const int null = open("/dev/null", O_RDWR | O_CLOEXEC);
-  if (null < 0) return false;
+  if (null < 0) {
+    return false;
+  }
   const int input = CopyAside(null, null);
   const int output = CopyAside(streams.standardOutput, null);
   const int error = CopyAside(streams.standardError, null);
-  if (input < 0 || output < 0 || error < 0) return false;
-  if (dup2(input, STDIN_FILENO) < 0 || dup2(output, STDOUT_FILENO) < 0) return false;
-  if (dup2(error, STDERR_FILENO) < 0) return false;
+  if (input < 0 || output < 0 || error < 0) {
+    return false;
+  }
+  if (dup2(input, STDIN_FILENO) < 0 || dup2(output, STDOUT_FILENO) < 0) {
+    return false;
+  }
+  if (dup2(error, STDERR_FILENO) < 0) {
+    return false;
+  }
   // Also descriptors that this program has inherited itself.
   closefrom(kFirstOtherDescriptor);
   return true;
 }
 
 bool EndWithParent(pid_t parent) {
-  if (prctl(PR_SET_PDEATHSIG, SIGTERM) != 0) return false;
+  if (prctl(PR_SET_PDEATHSIG, SIGTERM) != 0) {
+    return false;
+  }
   // The parent may have been killed before the call above.
-  if (getppid() == parent) return true;
+  if (getppid() == parent) {
+    return true;
+  }
   errno = ESRCH;
   return false;
 }
@@ -98,10 +116,18 @@ int BecomeProgram(const ChildPlan& plan) {
   // The kernel sets this name only at the end of exec, after the parent has gone on: until then a
   // search for the program's name would miss the child.
   prctl(PR_SET_NAME, plan.commandName);
-  if (!EndWithParent(plan.parent)) return errno;
-  if (!isAttached && setpgid(0, 0) != 0) return errno;
-  if (!isAttached && !SetStreams(*plan.streams)) return errno;
-  if (!UnblockSignals()) return errno;
+  if (!EndWithParent(plan.parent)) {
+    return errno;
+  }
+  if (!isAttached && setpgid(0, 0) != 0) {
+    return errno;
+  }
+  if (!isAttached && !SetStreams(*plan.streams)) {
+    return errno;
+  }
+  if (!UnblockSignals()) {
+    return errno;
+  }
   execve(plan.program, plan.arguments, environ);
   return errno;
 }
@@ -137,13 +163,21 @@ pid_t CloneChild(ChildPlan& plan) {
 /// support this.
 int AwaitByDescriptor(pid_t pid, const Deadline& deadline) {
   const FileDescriptor process(static_cast<int>(syscall(SYS_pidfd_open, pid, 0)));
-  if (!process.IsOpen()) return errno;
+  if (!process.IsOpen()) {
+    return errno;
+  }
   pollfd entry{process.Get(), POLLIN, 0};
   for (;;) {
     const int ready = poll(&entry, 1, deadline.PollMilliseconds());
-    if (ready > 0) return 0;
-    if (ready < 0 && errno != EINTR) return errno;
-    if (ready == 0 && deadline.Left() == std::chrono::nanoseconds::zero()) return ETIMEDOUT;
+    if (ready > 0) {
+      return 0;
+    }
+    if (ready < 0 && errno != EINTR) {
+      return errno;
+    }
+    if (ready == 0 && deadline.Left() == std::chrono::nanoseconds::zero()) {
+      return ETIMEDOUT;
+    }
   }
 }
 
@@ -154,9 +188,15 @@ int AwaitByPolling(pid_t pid, const Deadline& deadline) {
     siginfo_t info;
     info.si_pid = 0;
     const int result = waitid(P_PID, static_cast<id_t>(pid), &info, WEXITED | WNOWAIT | WNOHANG);
-    if (result != 0 && errno != EINTR) return 0;
-    if (result == 0 && info.si_pid == pid) return 0;
-    if (deadline.Left() == std::chrono::nanoseconds::zero()) return ETIMEDOUT;
+    if (result != 0 && errno != EINTR) {
+      return 0;
+    }
+    if (result == 0 && info.si_pid == pid) {
+      return 0;
+    }
+    if (deadline.Left() == std::chrono::nanoseconds::zero()) {
+      return ETIMEDOUT;
+    }
     poll(nullptr, 0, kPauseMilliseconds);
   }
 }
@@ -202,14 +242,18 @@ int StartAttachedChild(const char* program, char* const arguments[], pid_t& pid)
 void AwaitChild(pid_t pid) {
   siginfo_t info;
   while (waitid(P_PID, static_cast<id_t>(pid), &info, WEXITED | WNOWAIT) != 0) {
-    if (errno != EINTR) return;
+    if (errno != EINTR) {
+      return;
+    }
   }
 }
 
 bool AwaitChildFor(pid_t pid, std::chrono::seconds limit) {
   const Deadline deadline(limit);
   const int error = AwaitByDescriptor(pid, deadline);
-  if (error == 0 || error == ETIMEDOUT) return error == 0;
+  if (error == 0 || error == ETIMEDOUT) {
+    return error == 0;
+  }
   return AwaitByPolling(pid, deadline) == 0;
 }
 

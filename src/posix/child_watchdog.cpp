@@ -20,7 +20,9 @@ bool ChildWatchdog::Start(pid_t pid, const char* program, std::chrono::seconds l
 }
 
 void ChildWatchdog::Stop() {
-  if (!thread_.joinable()) return;
+  if (!thread_.joinable()) {
+    return;
+  }
   {
     const std::lock_guard<std::mutex> lock(mutex_);
     isStopped_ = true;
@@ -33,7 +35,9 @@ void ChildWatchdog::Watch(pid_t pid, const std::string& program, std::chrono::se
   const Deadline deadline(limit);
   std::unique_lock<std::mutex> lock(mutex_);
   const bool isStopped = wakeUp_.wait_until(lock, deadline.End(), [this] { return isStopped_; });
-  if (!isStopped) EndOverdueChild(pid, program.c_str(), limit);
+  if (!isStopped) {
+    EndOverdueChild(pid, program.c_str(), limit);
+  }
 }
 
 }  // namespace vela

@@ -12,9 +12,15 @@ unsigned char ByteAt(std::string_view text, size_t index) {
 
 /// Returns the length of a character by its first byte, 0 when no character begins with it.
 size_t LengthByFirstByte(unsigned char first) {
-  if (first < 0x80) return 1;
-  if (first >= 0xc2 && first < 0xe0) return 2;
-  if (first >= 0xe0 && first < 0xf0) return 3;
+  if (first < 0x80) {
+    return 1;
+  }
+  if (first >= 0xc2 && first < 0xe0) {
+    return 2;
+  }
+  if (first >= 0xe0 && first < 0xf0) {
+    return 3;
+  }
   return first >= 0xf0 && first < 0xf5 ? 4 : 0;
 }
 
@@ -38,10 +44,16 @@ bool IsValidStart(unsigned char first, unsigned char second) {
 /// Returns the length of the UTF-8 character that `text` begins with, 0 when it begins with none.
 size_t CharacterLength(std::string_view text) {
   const size_t length = LengthByFirstByte(ByteAt(text, 0));
-  if (length == 0 || text.size() < length) return 0;
-  if (length > 1 && !IsValidStart(ByteAt(text, 0), ByteAt(text, 1))) return 0;
+  if (length == 0 || text.size() < length) {
+    return 0;
+  }
+  if (length > 1 && !IsValidStart(ByteAt(text, 0), ByteAt(text, 1))) {
+    return 0;
+  }
   for (size_t i = 1; i < length; ++i) {
-    if ((ByteAt(text, i) & 0xc0) != 0x80) return 0;
+    if ((ByteAt(text, i) & 0xc0) != 0x80) {
+      return 0;
+    }
   }
   return length;
 }
@@ -53,7 +65,9 @@ bool IsHighControl(unsigned char byte) {
 /// `character` is one valid UTF-8 character.
 bool IsControl(std::string_view character) {
   const unsigned char first = ByteAt(character, 0);
-  if (character.size() == 1) return first < 0x20 || first == 0x7f;
+  if (character.size() == 1) {
+    return first < 0x20 || first == 0x7f;
+  }
   return first == 0xc2 && IsHighControl(ByteAt(character, 1));
 }
 

@@ -89,8 +89,12 @@ std::string ReadSmallFile(const std::string& path, size_t limit) {
   const int flags = O_RDONLY | O_NONBLOCK | O_NOFOLLOW | O_NOCTTY | O_CLOEXEC;
   const FileDescriptor file(open(path.c_str(), flags));
   struct stat status = {};
-  if (!file.IsOpen() || fstat(file.Get(), &status) != 0) return {};
-  if (!S_ISREG(status.st_mode) || static_cast<uint64_t>(status.st_size) > limit) return {};
+  if (!file.IsOpen() || fstat(file.Get(), &status) != 0) {
+    return {};
+  }
+  if (!S_ISREG(status.st_mode) || static_cast<uint64_t>(status.st_size) > limit) {
+    return {};
+  }
   const auto size = static_cast<size_t>(status.st_size);
   std::string content = ReadAt(file.Get(), 0, size);
   return content.size() == size ? content : std::string();

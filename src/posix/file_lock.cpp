@@ -25,7 +25,9 @@ bool LockForProcess(int fd, bool wait) {
 
 int LockExclusively(int fd) {
   while (flock(fd, LOCK_EX) != 0) {
-    if (errno != EINTR) return errno;
+    if (errno != EINTR) {
+      return errno;
+    }
   }
   return 0;
 }
@@ -56,11 +58,21 @@ bool IsAtPath(int fd, const std::string& path) {
 int LockFileAt(const std::string& path, LockedFile& locked) {
   FileDescriptor file = OpenForReading(path);
   struct stat status = {};
-  if (!file.IsOpen() || fstat(file.Get(), &status) != 0) return errno;
-  if (!S_ISREG(status.st_mode)) return EINVAL;
-  if (const int error = TryLockExclusively(file.Get()); error != 0) return error;
-  if (!IsAtPath(file.Get(), path)) return ENOENT;
-  if (fstat(file.Get(), &status) != 0) return errno;
+  if (!file.IsOpen() || fstat(file.Get(), &status) != 0) {
+    return errno;
+  }
+  if (!S_ISREG(status.st_mode)) {
+    return EINVAL;
+  }
+  if (const int error = TryLockExclusively(file.Get()); error != 0) {
+    return error;
+  }
+  if (!IsAtPath(file.Get(), path)) {
+    return ENOENT;
+  }
+  if (fstat(file.Get(), &status) != 0) {
+    return errno;
+  }
   locked = {std::move(file), status.st_size, status.st_mtime};
   return 0;
 }
@@ -73,12 +85,16 @@ bool IsLocked(const std::string& path) {
 FileDescriptor TakeProcessLock(const std::string& path, bool wait) {
   for (;;) {
     FileDescriptor file(open(path.c_str(), O_RDWR | O_CREAT | O_CLOEXEC | O_NOCTTY, 0644));
-    if (!file.IsOpen()) return file;
+    if (!file.IsOpen()) {
+      return file;
+    }
     if (!LockForProcess(file.Get(), wait)) {
       file.Reset();
       return file;
     }
-    if (IsAtPath(file.Get(), path)) return file;
+    if (IsAtPath(file.Get(), path)) {
+      return file;
+    }
   }
 }
 

@@ -28,7 +28,9 @@ class ScratchFile {
   ScratchFile(const ScratchFile&) = delete;
   ScratchFile& operator=(const ScratchFile&) = delete;
   ~ScratchFile() {
-    if (file_.IsOpen()) unlink(path_.c_str());
+    if (file_.IsOpen()) {
+      unlink(path_.c_str());
+    }
   }
 
   /// Makes the file, empty and locked. Returns 0 or an errno value.
@@ -53,7 +55,9 @@ int ScratchFile::Open() {
   bool isReady = false;
   while (!isReady) {
     const int error = OpenOnce(isReady);
-    if (error != 0) return error;
+    if (error != 0) {
+      return error;
+    }
   }
   return 0;
 }
@@ -61,16 +65,28 @@ int ScratchFile::Open() {
 int ScratchFile::OpenOnce(bool& isReady) {
   const int flags = O_RDWR | O_CREAT | O_NOFOLLOW | O_NONBLOCK | O_NOCTTY | O_CLOEXEC;
   FileDescriptor file(open(Path(), flags, 0600));
-  if (!file.IsOpen()) return errno;
+  if (!file.IsOpen()) {
+    return errno;
+  }
   const int error = LockExclusively(file.Get());
-  if (error != 0) return error;
+  if (error != 0) {
+    return error;
+  }
 
   struct stat own;
   struct stat named;
-  if (fstat(file.Get(), &own) != 0) return errno;
-  if (lstat(Path(), &named) != 0) return errno == ENOENT ? 0 : errno;
-  if (!IsSameFile(own, named)) return 0;
-  if (!S_ISREG(own.st_mode)) return EEXIST;
+  if (fstat(file.Get(), &own) != 0) {
+    return errno;
+  }
+  if (lstat(Path(), &named) != 0) {
+    return errno == ENOENT ? 0 : errno;
+  }
+  if (!IsSameFile(own, named)) {
+    return 0;
+  }
+  if (!S_ISREG(own.st_mode)) {
+    return EEXIST;
+  }
   if (own.st_size != 0 || own.st_nlink != 1) {
     return unlink(Path()) == 0 ? 0 : errno;
   }
@@ -82,10 +98,16 @@ int ScratchFile::OpenOnce(bool& isReady) {
 
 /// Renames unless `to` exists. Returns 0 or an errno value.
 int RenameToFreeName(const char* from, const char* to) {
-  if (renameat2(AT_FDCWD, from, AT_FDCWD, to, RENAME_NOREPLACE) == 0) return 0;
-  if (errno != EINVAL && errno != ENOSYS) return errno;
+  if (renameat2(AT_FDCWD, from, AT_FDCWD, to, RENAME_NOREPLACE) == 0) {
+    return 0;
+  }
+  if (errno != EINVAL && errno != ENOSYS) {
+    return errno;
+  }
   // A file system without that flag.
-  if (link(from, to) != 0) return errno;
+  if (link(from, to) != 0) {
+    return errno;
+  }
   return unlink(from) == 0 ? 0 : errno;
 }
 
@@ -94,28 +116,46 @@ int RenameToFreeName(const char* from, const char* to) {
 int CreateWhole(const std::string& path, std::string_view content) {
   ScratchFile scratch(path);
   int error = scratch.Open();
-  if (error != 0) return error;
-  if (fchmod(scratch.Fd(), kNewFileMode) != 0) return errno;
+  if (error != 0) {
+    return error;
+  }
+  if (fchmod(scratch.Fd(), kNewFileMode) != 0) {
+    return errno;
+  }
   error = WriteAll(scratch.Fd(), content);
-  if (error != 0) return error;
+  if (error != 0) {
+    return error;
+  }
   error = RenameToFreeName(scratch.Path(), path.c_str());
-  if (error == 0) scratch.Forget();
+  if (error == 0) {
+    scratch.Forget();
+  }
   return error;
 }
 
 int ReplaceWhole(const std::string& path, std::string_view content, const struct stat& old) {
   ScratchFile scratch(path);
   int error = scratch.Open();
-  if (error != 0) return error;
+  if (error != 0) {
+    return error;
+  }
   const struct stat& own = scratch.Status();
   const bool isOwnerDifferent = own.st_uid != old.st_uid || own.st_gid != old.st_gid;
-  if (isOwnerDifferent && fchown(scratch.Fd(), old.st_uid, old.st_gid) != 0) return errno;
-  if (fchmod(scratch.Fd(), old.st_mode & kPermissionBits) != 0) return errno;
+  if (isOwnerDifferent && fchown(scratch.Fd(), old.st_uid, old.st_gid) != 0) {
+    return errno;
+  }
+  if (fchmod(scratch.Fd(), old.st_mode & kPermissionBits) != 0) {
+    return errno;
+  }
   error = WriteAll(scratch.Fd(), content);
-  if (error != 0) return error;
+  if (error != 0) {
+    return error;
+  }
   // No fsync: losing the last change in a power failure costs less than waiting for the disk at
   // every change.
-  if (rename(scratch.Path(), path.c_str()) != 0) return errno;
+  if (rename(scratch.Path(), path.c_str()) != 0) {
+    return errno;
+  }
   scratch.Forget();
   return 0;
 }

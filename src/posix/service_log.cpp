@@ -20,12 +20,16 @@ namespace {
 bool LeadsToJournal() {
   const char* stream = std::getenv("JOURNAL_STREAM");
   struct stat status;
-  if (stream == nullptr || fstat(STDERR_FILENO, &status) != 0) return false;
+  if (stream == nullptr || fstat(STDERR_FILENO, &status) != 0) {
+    return false;
+  }
   return stream == std::to_string(status.st_dev) + ':' + std::to_string(status.st_ino);
 }
 
 std::string Prefix(LogLevel level) {
-  if (IsLogInJournal()) return '<' + std::to_string(static_cast<int>(level)) + '>';
+  if (IsLogInJournal()) {
+    return '<' + std::to_string(static_cast<int>(level)) + '>';
+  }
   return std::string(program_invocation_short_name) + ": ";
 }
 
