@@ -17,6 +17,7 @@
 
 #include "posix/child_status_keeper.h"
 #include "posix/deadline.h"
+#include "posix/event_wait.h"
 #include "posix/file_descriptor.h"
 #include "posix/log.h"
 #include "posix/signal_block.h"
@@ -166,19 +167,7 @@ int AwaitByDescriptor(pid_t pid, const Deadline& deadline) {
   if (!process.IsOpen()) {
     return errno;
   }
-  pollfd entry{process.Get(), POLLIN, 0};
-  for (;;) {
-    const int ready = poll(&entry, 1, deadline.PollMilliseconds());
-    if (ready > 0) {
-      return 0;
-    }
-    if (ready < 0 && errno != EINTR) {
-      return errno;
-    }
-    if (ready == 0 && deadline.Left() == std::chrono::nanoseconds::zero()) {
-      return ETIMEDOUT;
-    }
-  }
+  return AwaitEvent(process.Get(), POLLIN, deadline);
 }
 
 /// Polls, for systems that cannot wait with a limit.

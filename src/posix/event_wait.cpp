@@ -11,6 +11,22 @@
 
 namespace vela {
 
+int AwaitEvent(int fd, short events, const Deadline& deadline) {
+  pollfd entry{fd, events, 0};
+  for (;;) {
+    const int ready = poll(&entry, 1, deadline.PollMilliseconds());
+    if (ready > 0) {
+      return 0;
+    }
+    if (ready < 0 && errno != EINTR) {
+      return errno;
+    }
+    if (deadline.Left() == std::chrono::nanoseconds::zero()) {
+      return ETIMEDOUT;
+    }
+  }
+}
+
 int EventWait::Open(const std::string& watchedFile) {
   sigset_t set;
   sigemptyset(&set);

@@ -5,9 +5,14 @@
 #include <optional>
 #include <string>
 
+#include "posix/deadline.h"
 #include "posix/file_descriptor.h"
 
 namespace vela {
+
+/// Waits until one of the poll `events` of the descriptor `fd` occurs. Returns 0, ETIMEDOUT, or
+/// another errno value.
+int AwaitEvent(int fd, short events, const Deadline& deadline);
 
 /// Waits for the events of a service that runs children. Blocks SIGCHLD, SIGTERM and SIGINT for the
 /// process.

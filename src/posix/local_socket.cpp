@@ -11,6 +11,8 @@
 #include <chrono>
 #include <cstring>
 
+#include "posix/event_wait.h"
+
 namespace vela {
 
 namespace {
@@ -66,23 +68,6 @@ int ConnectBlocking(int socket, const sockaddr_un& address, const Deadline& dead
     return error == EAGAIN || error == EINTR ? ETIMEDOUT : error;
   }
   return SetBlocking(socket, false) ? 0 : errno;
-}
-
-/// Waits for one of the poll `events`.
-int Await(int socket, short events, const Deadline& deadline) {
-  pollfd entry{socket, events, 0};
-  for (;;) {
-    const int ready = poll(&entry, 1, deadline.PollMilliseconds());
-    if (ready > 0) {
-      return 0;
-    }
-    if (ready < 0 && errno != EINTR) {
-      return errno;
-    }
-    if (IsOver(deadline)) {
-      return ETIMEDOUT;
-    }
-  }
 }
 
 }  // namespace
@@ -148,7 +133,7 @@ int SendAll(int socket, std::string_view bytes, const Deadline& deadline) {
     size_t sent = 0;
     int error = SendNow(socket, bytes, sent);
     if (error == EAGAIN) {
-      error = Await(socket, POLLOUT, deadline);
+      error = AwaitEvent(socket, POLLOUT, deadline);
     }
     if (error != 0) {
       return error;
@@ -176,7 +161,7 @@ int ReceiveNow(int socket, char* buffer, size_t size, size_t& got) {
 
 int ReceiveSome(int socket, char* buffer, size_t size, const Deadline& deadline, size_t& got) {
   for (;;) {
-    int error = Await(socket, POLLIN, deadline);
+    int error = AwaitEvent(socket, POLLIN, deadline);
     if (error == 0) {
       error = ReceiveNow(socket, buffer, size, got);
     }

@@ -153,13 +153,13 @@ TEST_F(ServiceTest, SocketLeftByADeadInstanceIsReplaced) {
 
 TEST_F(ServiceTest, AnythingButASocketIsKept) {
   WriteFile(PluginDaemonSocketPath, "precious");
-  ExpectRefusal({}, "something else than a socket");
+  ExpectRefusal({}, "is not a socket");
   EXPECT_EQ(ReadFile(PluginDaemonSocketPath), "precious");
   RemoveTree(PluginDaemonSocketPath);
 
   // A link is not followed either.
   ASSERT_EQ(symlink("/tmp/elsewhere", PluginDaemonSocketPath), 0);
-  ExpectRefusal({}, "something else than a socket");
+  ExpectRefusal({}, "is not a socket");
   EXPECT_TRUE(Exists(PluginDaemonSocketPath));
 }
 

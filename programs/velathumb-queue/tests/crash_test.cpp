@@ -34,7 +34,7 @@ TEST_F(CrashTest, OnlyTheEntryInProgressIsRepeated) {
   EXPECT_TRUE(WaitUntilEnded(velathumb_.Stub().Calls()[1].pid));
   Enqueue({"/tmp/new"});
   EXPECT_THAT(ExpectRun({"/tmp/a", "/tmp/b", "/tmp/b", "/tmp/c", "/tmp/new"}),
-              HasSubstr("going on with 2 entries\n"));
+              HasSubstr("resuming with 2 entries\n"));
 }
 
 TEST_F(CrashTest, OnlyTheEntriesOfRunningJobsAreRepeated) {
@@ -123,7 +123,7 @@ TEST_F(CrashTest, AKilledVelathumbIsRetried) {
   velathumb_.Stub().PlanCall(2, StubPlan().Exit(1));
   Enqueue({"/tmp/a"});
   EXPECT_THAT(ExpectRun({"/tmp/a", "/tmp/a", "/tmp/a"}),
-              HasSubstr("velathumb was ended, trying again: /tmp/a\n"));
+              HasSubstr("velathumb did not complete, trying again: /tmp/a\n"));
 }
 
 TEST_F(CrashTest, OthersContinueDuringARetry) {

@@ -39,7 +39,7 @@ TEST_F(LaterTest, AMissingDirectoryIsKeptUntilItExists) {
   AppendToQueue({"/tmp/none", "R:/tmp/gone"});
   Enqueue({"/tmp/a"});
   EXPECT_THAT(ExpectRunKeeps({"/tmp/none", "R:/tmp/gone"}),
-              HasSubstr("left for a later run, there is no such directory: R:/tmp/gone\n"));
+              HasSubstr("deferred to a later run, there is no such directory: R:/tmp/gone\n"));
   MakeDirectories("/tmp/gone");
   ExpectRunKeeps({"/tmp/none"});
   MakeDirectories("/tmp/none");
@@ -58,7 +58,7 @@ TEST_F(LaterTest, ANearlyFullVolumeIsSkippedUntilItHasRoom) {
   volume.SetAvailable(kGibibyte - SmallVolume::PageSize());
   Enqueue({"/tmp/small", "/tmp/a"});
   EXPECT_THAT(ExpectRunKeeps({"/tmp/small"}),
-              HasSubstr("left for a later run, its volume is nearly full: /tmp/small\n"));
+              HasSubstr("deferred to a later run, its volume is nearly full: /tmp/small\n"));
   EXPECT_THAT(velathumb_.Entries(), ElementsAre("/tmp/a"));
   volume.SetAvailable(kGibibyte);
   ExpectRun({"/tmp/a", "/tmp/small"});
@@ -78,8 +78,9 @@ TEST_F(LaterTest, AVolumeThatBecomesNearlyFullIsRepeated) {
 TEST_F(LaterTest, AnEntryWhoseVelathumbIsKilledEachTimeIsKept) {
   velathumb_.Stub().PlanWhen("/tmp/a", StubPlan().DieBySignal(SIGKILL));
   Enqueue({"/tmp/a", "/tmp/b"});
-  EXPECT_THAT(ExpectRunKeeps({"/tmp/a"}),
-              HasSubstr("left for a later run, velathumb was ended each time: /tmp/a\n"));
+  EXPECT_THAT(
+      ExpectRunKeeps({"/tmp/a"}),
+      HasSubstr("deferred to a later run, velathumb did not complete in any try: /tmp/a\n"));
   const std::vector<std::string> entries = velathumb_.Entries();
   EXPECT_EQ(std::count(entries.begin(), entries.end(), "/tmp/a"), 25);
   EXPECT_EQ(std::count(entries.begin(), entries.end(), "/tmp/b"), 1);

@@ -55,7 +55,7 @@ TEST_F(OptionsTest, InvalidArgumentsAreRefused) {
       {QueueArguments("/tmp/none.conf"),
        "velathumb-queue: /tmp/none.conf: No such file or directory\n"},
       {QueueArguments(kProfiles, {"--add", "/tmp/a\n/tmp/b"}),
-       "cannot add /tmp/a\\x0a/tmp/b: an entry cannot hold a newline\n"},
+       "cannot add /tmp/a\\n/tmp/b: an entry cannot contain a newline\n"},
   };
   for (const auto& [arguments, message] : cases) {
     ResetQueueSandbox();
@@ -116,7 +116,7 @@ TEST_F(OptionsTest, ATreeThatVelathumbWouldSkipIsRefused) {
   EXPECT_THAT(Refusal(velathumb_.Arguments({"--add", "R:/tmp/a:b"})), HasSubstr("colon"));
   RemoveTree(kQueueFile);
   EXPECT_THAT(Refusal(velathumb_.Arguments({"--add", "R:/tmp/@eaDir/"})),
-              HasSubstr("velathumb leaves out a tree of this name\n"));
+              HasSubstr("velathumb skips a tree of this name\n"));
   EXPECT_EQ(velathumb_.Run({"--add", "/tmp/a:b"}).exitCode, 0);
   EXPECT_THAT(velathumb_.Entries(), ElementsAre("/tmp/a", "/tmp/a:b"));
 }
@@ -132,7 +132,7 @@ TEST_F(OptionsTest, AProfileWithoutAThumbnailKeepsTheQueue) {
   MakeDirectories("/tmp/directory");
   for (const std::string profile : {"/tmp/invalid.conf", "/tmp/empty.conf", "/tmp/directory"}) {
     EXPECT_EQ(Refusal(QueueArguments(profile)),
-              "velathumb-queue: no profile, or none with a thumbnail to make: " + profile + "\n");
+              "velathumb-queue: no profile file, or no thumbnail in it: " + profile + "\n");
     RemoveTree(kQueueFile);
   }
 }

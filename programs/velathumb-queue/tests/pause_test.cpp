@@ -1,4 +1,4 @@
-// Conversion that is held back.
+// Conversion that is paused.
 #include "conversion_pause.h"
 
 #include <signal.h>

@@ -147,7 +147,7 @@ TEST_F(TreeAnswer, ARootThatIsSkippedBecauseOfItsNameIsAnError) {
   MakePhoto("/tmp/@eaDir/a.jpg");
   MakePhoto(In("a.jpg"));
   const ProgramResult result = RunStatus({"-r", "/tmp/@eaDir", kTop});
-  ExpectError(result, "/tmp/@eaDir: is left out of a tree because of its name");
+  ExpectError(result, "/tmp/@eaDir: is skipped in trees because of its name");
   EXPECT_THAT(ReadStatusText(result.out).Names(), ElementsAre(kTop));
 }
 

@@ -1,4 +1,4 @@
-// The time until which conversion is held back.
+// The time until which conversion is paused.
 #include <ctime>
 
 #include "status_fixture.h"
