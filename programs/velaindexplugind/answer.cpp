@@ -4,21 +4,16 @@
 
 #include <new>
 
+#include "index/strict_json.h"
 #include "index_connection.h"
 #include "media_record.h"
-#include "platform/standalone/strict_json.h"
 
 namespace vela {
 
 namespace {
 
 std::string ToLine(const Json::Value& value) {
-  std::string line;
-  // Replies contain nothing that could not be written, so the only cause is a lack of memory.
-  if (!WriteJsonLine(value, line)) {
-    throw std::bad_alloc();
-  }
-  return line;
+  return ToJsonText(value) + '\n';
 }
 
 Json::Value Success() {

@@ -8,8 +8,8 @@
 #include <string>
 #include <string_view>
 
+#include "index/index_database.h"
 #include "media_record.h"
-#include "platform/standalone/index_database.h"
 
 namespace vela {
 

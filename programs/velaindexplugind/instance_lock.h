@@ -3,7 +3,7 @@
 
 #include <string>
 
-#include "platform/standalone/index_database.h"
+#include "index/index_database.h"
 #include "posix/file_descriptor.h"
 
 namespace vela {

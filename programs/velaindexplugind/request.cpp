@@ -5,7 +5,7 @@
 #include <algorithm>
 #include <iterator>
 
-#include "platform/standalone/strict_json.h"
+#include "index/strict_json.h"
 
 namespace vela {
 

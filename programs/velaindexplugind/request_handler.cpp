@@ -30,7 +30,6 @@ Answer Failed(const std::string& error) {
 
 std::string ErrorText(int error) {
   switch (error) {
-    case EISDIR:
     case EINVAL:
       return "not a regular file";
     case ENOENT:

@@ -185,6 +185,7 @@ void Batch::ReapChildren() {
     child = children_.erase(child);
     HandleEnd(number, *status);
   }
+  ReapInheritedChildren([this](pid_t pid) { return children_.count(pid) != 0; });
 }
 
 void Batch::StopChildren() {

@@ -153,8 +153,8 @@ int TakenQueue::Defer(const std::string& entry) {
 }
 
 int TakenQueue::RequeueDeferred() {
-  // Appending would wait for the lock.
-  if (IsLocked(paths_.queue)) {
+  // Appending would wait for the lock, whatever its kind.
+  if (LockedFile queue; LockFileAt(paths_.queue, queue) == EWOULDBLOCK) {
     return EWOULDBLOCK;
   }
   int error = 0;

@@ -1,10 +1,11 @@
 #include "json_report.h"
 
-#include <json/writer.h>
+#include <json/value.h>
 
 #include <ostream>
 #include <vector>
 
+#include "index/strict_json.h"
 #include "size_class_text.h"
 #include "text_encoding.h"
 
@@ -14,13 +15,6 @@ namespace {
 
 /// Raised when a key changes its meaning or is removed; new keys do not change it.
 constexpr int kFormat = 1;
-
-Json::StreamWriterBuilder MakeWriter() {
-  Json::StreamWriterBuilder builder;
-  builder["indentation"] = "";
-  builder["emitUTF8"] = true;
-  return builder;
-}
 
 Json::Value ToList(const std::vector<std::string>& texts) {
   Json::Value list(Json::arrayValue);
@@ -55,11 +49,6 @@ Json::Value DescribePhoto(const PhotoReport& photo) {
 
 }  // namespace
 
-std::string ToJsonLine(const Json::Value& value) {
-  static const Json::StreamWriterBuilder builder = MakeWriter();
-  return Json::writeString(builder, value);
-}
-
 void PutBytes(Json::Value& object, const std::string& key, const std::string& bytes) {
   object[key] = ToUtf8(bytes);
   if (!IsUtf8(bytes)) {
@@ -77,7 +66,7 @@ void JsonReport::Separate() {
 
 void JsonReport::Member(const char* key, const Json::Value& value) {
   Separate();
-  out_ << '"' << key << "\":" << ToJsonLine(value);
+  out_ << '"' << key << "\":" << ToJsonText(value);
 }
 
 void JsonReport::BeginList(const char* key) {
@@ -87,12 +76,12 @@ void JsonReport::BeginList(const char* key) {
 }
 
 void JsonReport::Element(const Json::Value& value) {
-  out_ << (hasElements_ ? ",\n" : "\n") << ToJsonLine(value);
+  out_ << (hasElements_ ? ",\n" : "\n") << ToJsonText(value);
   hasElements_ = true;
 }
 
 void JsonReport::BeginElement(const Json::Value& object, const char* key) {
-  std::string text = ToJsonLine(object);
+  std::string text = ToJsonText(object);
   text.pop_back();
   out_ << (hasElements_ ? ",\n" : "\n") << text << ",\"" << key << "\":[";
   hasElements_ = true;
@@ -100,7 +89,7 @@ void JsonReport::BeginElement(const Json::Value& object, const char* key) {
 }
 
 void JsonReport::InnerElement(const Json::Value& value) {
-  out_ << (hasInnerElements_ ? ",\n" : "\n") << ToJsonLine(value);
+  out_ << (hasInnerElements_ ? ",\n" : "\n") << ToJsonText(value);
   hasInnerElements_ = true;
 }
 

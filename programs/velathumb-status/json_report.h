@@ -14,9 +14,6 @@ namespace vela {
 /// characters, and exactly under `key` followed by "_base64".
 void PutBytes(Json::Value& object, const std::string& key, const std::string& bytes);
 
-/// Returns the value as compact JSON without a newline.
-std::string ToJsonLine(const Json::Value& value);
-
 /// Writes one object, member by member.
 class JsonReport {
  public:

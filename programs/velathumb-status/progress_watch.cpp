@@ -7,6 +7,7 @@
 #include <string>
 #include <thread>
 
+#include "index/strict_json.h"
 #include "json_report.h"
 #include "posix/terminal.h"
 #include "progress_bar.h"
@@ -55,12 +56,12 @@ class ProgressView {
       DrawBar(out_, FormatProgressBar(followed, rate_, width), width);
       return;
     }
-    std::string counts = ToJsonLine(DescribeProgress(state));
+    std::string counts = ToJsonText(DescribeProgress(state));
     if (counts == lastCounts_) {
       return;
     }
     lastCounts_ = std::move(counts);
-    out_ << (asJson_ ? ToJsonLine(DescribeState(state, followed, rate_))
+    out_ << (asJson_ ? ToJsonText(DescribeState(state, followed, rate_))
                      : FormatProgressBar(followed, rate_, kLineWidth))
          << std::endl;
   }

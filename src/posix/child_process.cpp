@@ -269,6 +269,18 @@ std::optional<int> ReapEndedChild(pid_t pid) {
   return HasEnded(pid) ? std::optional<int>(ReapChild(pid)) : std::nullopt;
 }
 
+void ReapInheritedChildren(const std::function<bool(pid_t)>& isOwn) {
+  for (;;) {
+    siginfo_t info;
+    info.si_pid = 0;
+    if (waitid(P_ALL, 0, &info, WEXITED | WNOHANG | WNOWAIT) != 0 || info.si_pid == 0 ||
+        isOwn(info.si_pid)) {
+      return;
+    }
+    waitpid(info.si_pid, nullptr, WNOHANG);
+  }
+}
+
 void TerminateChild(pid_t pid) {
   kill(pid, SIGTERM);
 }

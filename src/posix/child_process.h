@@ -4,6 +4,7 @@
 #include <sys/types.h>
 
 #include <chrono>
+#include <functional>
 #include <optional>
 
 namespace vela {
@@ -42,6 +43,11 @@ int ReapChild(pid_t pid);
 
 /// Does the same without waiting. Returns nothing while the child is running.
 std::optional<int> ReapEndedChild(pid_t pid);
+
+/// Takes ended children that this process has inherited from others from the process table, as the
+/// first process of a container has to. `isOwn` returns true for a child of its own, which is left
+/// to ReapEndedChild.
+void ReapInheritedChildren(const std::function<bool(pid_t)>& isOwn);
 
 /// Sends SIGTERM to the child alone, not to what it has started.
 void TerminateChild(pid_t pid);

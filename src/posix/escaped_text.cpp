@@ -62,11 +62,22 @@ bool IsHighControl(unsigned char byte) {
   return byte >= 0x80 && byte < 0xa0;
 }
 
+/// Returns whether a character of three bytes separates lines or changes the direction of the text.
+bool IsInvisibleFormat(std::string_view character) {
+  const std::string_view end = character.substr(1);
+  return character.front() == '\xe2' &&
+         (end == "\x80\x8e" || end == "\x80\x8f" || (end >= "\x80\xa8" && end <= "\x80\xae") ||
+          (end >= "\x81\xa6" && end <= "\x81\xa9"));
+}
+
 /// `character` is one valid UTF-8 character.
 bool IsControl(std::string_view character) {
   const unsigned char first = ByteAt(character, 0);
   if (character.size() == 1) {
     return first < 0x20 || first == 0x7f;
+  }
+  if (character.size() == 3) {
+    return IsInvisibleFormat(character);
   }
   return first == 0xc2 && IsHighControl(ByteAt(character, 1));
 }

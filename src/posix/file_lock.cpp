@@ -21,6 +21,12 @@ bool LockForProcess(int fd, bool wait) {
   return fcntl(fd, wait ? F_SETLKW : F_SETLK, &whole) == 0;
 }
 
+bool IsAtPath(int fd, const std::string& path) {
+  struct stat open = {};
+  struct stat named = {};
+  return fstat(fd, &open) == 0 && stat(path.c_str(), &named) == 0 && IsSameFile(open, named);
+}
+
 }  // namespace
 
 int LockExclusively(int fd) {
@@ -47,12 +53,6 @@ int LockFile(const std::string& path, FileDescriptor& lock) {
     return errno;
   }
   return TryLockExclusively(lock.Get());
-}
-
-bool IsAtPath(int fd, const std::string& path) {
-  struct stat open = {};
-  struct stat named = {};
-  return fstat(fd, &open) == 0 && stat(path.c_str(), &named) == 0 && IsSameFile(open, named);
 }
 
 int LockFileAt(const std::string& path, LockedFile& locked) {

@@ -25,9 +25,6 @@ void Unlock(int fd);
 /// another process holds the lock, or another errno value.
 int LockFile(const std::string& path, FileDescriptor& lock);
 
-/// Returns true when the open file `fd` is the one at `path`.
-bool IsAtPath(int fd, const std::string& path);
-
 /// A file with an exclusive lock, and its state under the lock.
 struct LockedFile {
   FileDescriptor file;  ///< the lock is released with it

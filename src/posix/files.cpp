@@ -48,7 +48,11 @@ int IdentifyDirectory(const std::string& path, FileIdentity& identity) {
 
 int CheckAccess(const std::string& path, FileAccess access) {
   const int mode = access == FileAccess::kRead ? R_OK : X_OK;
-  return ErrnoUnless(faccessat(AT_FDCWD, path.c_str(), mode, AT_EACCESS) == 0);
+  if (faccessat(AT_FDCWD, path.c_str(), mode, AT_EACCESS) == 0) {
+    return 0;
+  }
+  // Some containers refuse the system call behind it.
+  return errno == EPERM ? ErrnoUnless(::access(path.c_str(), mode) == 0) : errno;
 }
 
 FileDescriptor OpenForReading(const std::string& path) {
@@ -56,7 +60,8 @@ FileDescriptor OpenForReading(const std::string& path) {
 }
 
 FileDescriptor CreateEmptyFile(const std::string& path, unsigned mode) {
-  return FileDescriptor(open(path.c_str(), O_RDWR | O_CREAT | O_TRUNC | O_CLOEXEC, mode));
+  const int flags = O_WRONLY | O_CREAT | O_TRUNC | O_NONBLOCK | O_NOCTTY | O_CLOEXEC;
+  return FileDescriptor(open(path.c_str(), flags, mode));
 }
 
 int CreateDirectory(const std::string& path, unsigned mode) {

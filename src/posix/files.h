@@ -64,7 +64,8 @@ int CheckAccess(const std::string& path, FileAccess access);
 FileDescriptor OpenForReading(const std::string& path);
 
 /// Creates the empty file `path` with these permission bits, or empties the one that exists, and
-/// opens it for reading and writing. Returns no open descriptor, with errno set, on failure.
+/// opens it for writing; never waits for the reader of a pipe. Returns no open descriptor, with
+/// errno set, on failure.
 FileDescriptor CreateEmptyFile(const std::string& path, unsigned mode);
 
 /// Creates the directory `path` with these permission bits. Returns 0 or an errno value.

@@ -35,7 +35,8 @@ std::string ReadOrientationText(const std::string& path) {
   const std::unique_ptr<ExifData, ExifDataUnref> data(exif_data_new_from_file(path.c_str()));
   if (data == nullptr) {
     LogError(kProgramLogSource, 696,
-             "velathumb (696) File not readable or no EXIF data in file " + path + ".\n");
+             std::string(kProgramLogSource) + " (696) File not readable or no EXIF data in file " +
+                 path + ".\n");
     return {};
   }
   char text[128] = "";

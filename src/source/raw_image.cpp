@@ -144,8 +144,9 @@ bool DcrawToFile(const std::string& rawPath, const std::string& outPath, const c
   }
   const FileDescriptor file = CreateEmptyFile(outPath, kDecodedCopyMode);
   if (!file.IsOpen()) {
+    const int error = errno;
     LogError(kProgramLogSource, 574,
-             "fopen failed, path=" + outPath + ", errno=" + std::to_string(errno));
+             "fopen failed, path=" + outPath + ", errno=" + std::to_string(error));
     return false;
   }
   const CopyResult copy = CopyDescriptor(output.Descriptor(), file.Get());

@@ -26,7 +26,7 @@ int checkCreateDir(const std::string& path) {
   }
   if (error != ENOENT) {
     LogError(kProgramLogSource, 447,
-             "velathumb: checkCreateDir(447) - mkdir(" + path +
+             std::string(kProgramLogSource) + ": checkCreateDir(447) - mkdir(" + path +
                  ", 0777 ), errno: " + std::to_string(error) + "\n");
   }
   return 0;

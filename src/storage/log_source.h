@@ -1,4 +1,4 @@
-// The source names under which this room and those above it log.
+// The source names under which this folder and those above it log.
 #pragma once
 
 namespace vela {

@@ -1,4 +1,4 @@
-
+// Whether a media file is portrait.
 #include "ipc/velamk_ipc.h"
 #include "platform/velaindex.h"
 #include "posix/log.h"

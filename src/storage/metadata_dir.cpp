@@ -12,8 +12,8 @@ bool FindMetadataDir(const char* path, int line, std::string& out) {
   char buffer[kPathBufferSize] = "";
   if (VELAEADirPath(0, path, buffer, sizeof buffer) != 0) {
     LogError(kMetadataLogSource, line,
-             "VELAEADirPath error [" + LogCode(VLIBCErrGet()) + " " + VLIBCErrorGetFile() + ":" +
-                 std::to_string(VLIBCErrorGetLine()) + "] on " + path);
+             "VELAEADirPath error [" + LogCode(VLIBCErrGet()) + " " + LogText(VLIBCErrorGetFile()) +
+                 ":" + std::to_string(VLIBCErrorGetLine()) + "] on " + LogText(path));
     return false;
   }
   out = buffer;

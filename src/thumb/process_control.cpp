@@ -70,8 +70,9 @@ std::string CreatePidFile() {
   const OwnPidPath path;
   const int descriptor = open(path.c_str(), O_WRONLY | O_CREAT | O_CLOEXEC, 0644);
   if (descriptor < 0) {
+    const int error = errno;
     LogError(kProgramLogSource, 1133,
-             "Failed to open " + std::string(path.c_str()) + ". (" + std::strerror(errno) + ")");
+             std::string("Failed to open ") + path.c_str() + ". (" + std::strerror(error) + ")");
   } else {
     close(descriptor);
   }
@@ -85,8 +86,9 @@ void KillThumbProcesses() {
       continue;
     }
     if (unlink(path) != 0) {
-      LogError("velathumb: KillThumbProcesses(1161) - unlink(" + std::string(path) + "), " +
-               std::strerror(errno) + "\n");
+      const int error = errno;
+      LogError(std::string(kProgramLogSource) + ": KillThumbProcesses(1161) - unlink(" + path +
+               "), " + std::strerror(error) + "\n");
     }
   }
 }

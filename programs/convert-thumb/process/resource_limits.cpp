@@ -10,6 +10,7 @@
 #include <string_view>
 #include <system_error>
 
+#include "platform/system_rules.h"
 #include "platform/vlibc.h"
 #include "process/worker_threads.h"
 
@@ -22,7 +23,6 @@ constexpr rlim_t kSecondsToEnd = 5;
 /// The only size that also keeps crash handlers, which read core dumps from a pipe, from being run.
 constexpr rlim_t kNoCoreDump = 1;
 
-constexpr char kSystemSettings[] = "/etc/velainfo.conf";
 constexpr char kKey[] = "convert_memory_limit";
 constexpr size_t kDefaultLimit = CONVERT_THUMB_MEMORY_LIMIT;
 
@@ -83,13 +83,13 @@ void LimitMemory(size_t memoryLimit) {
 
 size_t ConversionMemoryLimit() {
   char text[64] = "";
-  if (VLIBCFileGetKeyValue(kSystemSettings, kKey, text, sizeof text, 0) <= 0 || *text == '\0') {
+  if (VLIBCFileGetKeyValue(kSettingsFile, kKey, text, sizeof text, 0) <= 0 || *text == '\0') {
     return kDefaultLimit;
   }
   const std::optional<size_t> limit = ParseSize(text);
   if (!limit) {
     std::fprintf(stderr, "convert-thumb: %s: %s is not a number of bytes, using %zu\n",
-                 kSystemSettings, kKey, kDefaultLimit);
+                 kSettingsFile, kKey, kDefaultLimit);
   }
   return limit.value_or(kDefaultLimit);
 }

@@ -5,6 +5,7 @@
 
 #include <string>
 
+#include "index/strict_json.h"
 #include "json_report.h"
 
 using namespace vela;
@@ -95,11 +96,11 @@ TEST(PutBytesInJson, AddsTheExactBytesOnlyWhenTheyAreNotUtf8) {
   EXPECT_EQ(object["path_base64"].asString(), "5A==");
 }
 
-TEST(ToJsonLineText, IsOneLine) {
+TEST(JsonText, IsOneLine) {
   Json::Value object;
   object["a"] = "x\ny";
   object["b"] = 1;
-  EXPECT_EQ(ToJsonLine(object), "{\"a\":\"x\\ny\",\"b\":1}");
+  EXPECT_EQ(ToJsonText(object), "{\"a\":\"x\\ny\",\"b\":1}");
 }
 
 }  // namespace

@@ -5,7 +5,7 @@
 #include <mutex>
 #include <string_view>
 
-#include "platform/standalone/index_database.h"
+#include "index/index_database.h"
 #include "platform/standalone/last_error.h"
 #include "platform/velaindex.h"
 

@@ -8,8 +8,8 @@
 #include <string_view>
 #include <utility>
 
+#include "index/strict_json.h"
 #include "platform/standalone/last_error.h"
-#include "platform/standalone/strict_json.h"
 #include "platform/velaindex.h"
 #include "posix/deadline.h"
 #include "posix/file_descriptor.h"
@@ -59,10 +59,7 @@ int Exchange(const char* socketPath, const Json::Value& request, const Deadline&
   if (error != 0) {
     return error;
   }
-  std::string line;
-  if (!vela::WriteJsonLine(request, line)) {
-    return EINVAL;
-  }
+  std::string line = vela::ToJsonText(request) + '\n';
   error = vela::SendAll(connection.Get(), line, deadline);
   if (error != 0) {
     return error;
@@ -88,6 +85,8 @@ int ExchangeOrFail(const char* socketPath, Json::Value& packet, int timeoutSecon
       packet = std::move(reply);
     }
     return error;
+  } catch (const Json::Exception&) {
+    return EINVAL;
   } catch (const std::exception&) {
     return ENOMEM;
   }

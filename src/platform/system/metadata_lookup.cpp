@@ -4,6 +4,13 @@
 #include "platform/velaindex.h"
 #include "platform/vlibc.h"
 
+namespace {
+
+/// The options with which this system's programs examine files.
+constexpr int kStatusOptions = 9;
+
+}  // namespace
+
 const char* FindEAFile(const char* eaDir, const char* name, const char* oldName,
                        EAFileStatus* status) {
   const char* found = IsEAFileExist(eaDir, &status->size, name, oldName);
@@ -12,7 +19,11 @@ const char* FindEAFile(const char* eaDir, const char* name, const char* oldName,
   }
   VLIBCFileStatus file = {};
   const std::string path = std::string(eaDir) + "/" + found;
-  // A file that has gone since then is out of date.
-  status->modified = VLIBCFileStat(path.c_str(), 0, &file) == 0 ? file.modification.seconds : 0;
+  if (VLIBCFileStat(path.c_str(), kStatusOptions, &file) == 0) {
+    status->modified = file.modification.seconds;
+  } else {
+    // A file that was removed in between is outdated: an empty one always is.
+    *status = {};
+  }
   return found;
 }

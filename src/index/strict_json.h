@@ -14,9 +14,9 @@ enum class DuplicateKeys {
   kRejected,  ///< the text is invalid
 };
 
-/// Writes `value` to `line` as compact JSON followed by a newline. Strings keep their bytes, valid
-/// UTF-8 or not. Returns false when the value cannot be written.
-bool WriteJsonLine(const Json::Value& value, std::string& line);
+/// Returns `value` as compact JSON in one line, without a newline at its end. Strings keep their
+/// bytes, valid UTF-8 or not. Throws std::exception when the value cannot be written.
+std::string ToJsonText(const Json::Value& value);
 
 /// Reads `text`, which must be one whole JSON object with nothing but white space around it, into
 /// `object`. Strings may contain any bytes. Returns false for any other text. Throws only

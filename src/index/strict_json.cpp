@@ -1,4 +1,4 @@
-#include "platform/standalone/strict_json.h"
+#include "index/strict_json.h"
 
 #include <json/reader.h>
 #include <json/value.h>
@@ -101,15 +101,9 @@ bool HasExtensions(std::string_view text) {
 
 }  // namespace
 
-bool WriteJsonLine(const Json::Value& value, std::string& line) {
+std::string ToJsonText(const Json::Value& value) {
   static const Json::StreamWriterBuilder builder = MakeWriterBuilder();
-  try {
-    line = Json::writeString(builder, value);
-    line += '\n';
-    return true;
-  } catch (const std::exception&) {
-    return false;
-  }
+  return Json::writeString(builder, value);
 }
 
 bool ReadJsonObject(std::string_view text, DuplicateKeys duplicates, Json::Value& object) {

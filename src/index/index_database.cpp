@@ -1,4 +1,4 @@
-#include "platform/standalone/index_database.h"
+#include "index/index_database.h"
 
 #include <fcntl.h>
 #include <sys/stat.h>
