@@ -90,23 +90,23 @@ void LeaveDaemonProcessor() {
   if (CPU_COUNT(&processors) > 0) sched_setaffinity(0, sizeof processors, &processors);
 }
 
-/// Calls `ask` with every number from 0 to `count` - 1, from several concurrent clients.
-void AskFromClients(int count, const std::function<void(int)>& ask) {
+/// Calls `request` with every number from 0 to `count` - 1, from several concurrent clients.
+void RequestFromClients(int count, const std::function<void(int)>& request) {
   std::vector<std::thread> clients;
   for (int client = 0; client < kClients; ++client) {
-    clients.emplace_back([=, &ask] {
+    clients.emplace_back([=, &request] {
       LeaveDaemonProcessor();
-      for (int i = client; i < count; i += kClients) ask(i);
+      for (int i = client; i < count; i += kClients) request(i);
     });
   }
   for (std::thread& client : clients) client.join();
 }
 
 void ReportRequests(const char* what, const PinnedDaemon& daemon, int count,
-                    const std::function<void(int)>& ask) {
+                    const std::function<void(int)>& request) {
   const double before = daemon.Seconds();
   const auto begin = std::chrono::steady_clock::now();
-  AskFromClients(count, ask);
+  RequestFromClients(count, request);
   const std::chrono::duration<double> wall = std::chrono::steady_clock::now() - begin;
   const double used = daemon.Seconds() - before;
   std::printf("%-34s %9.0f per second, %6.1f us of processor time each\n", what,
@@ -120,10 +120,10 @@ std::string PhotoPath(const std::string& directory, int number) {
 void MeasureRequests() {
   constexpr int kRequests = 50000;
   constexpr int kPhotos = 3000;
-  const std::string directory = kScratch + "/asked";
+  const std::string directory = kScratch + "/requested";
   MakeRealPhotos(directory, kPhotos, 64, 48);
   const std::vector<std::string> names = vela_test::ListDirectory(directory);
-  const auto askForMedia = [&](int i) {
+  const auto requestMedia = [&](int i) {
     const std::string path = directory + "/" + names[static_cast<size_t>(i) % names.size()];
     VELA_MEDIA_INFO media = {};
     if (GetMediaFromPluginDB(THUMB_TYPE_PHOTO, path.c_str(), media) != 0) {
@@ -143,8 +143,8 @@ void MeasureRequests() {
   ReportRequests("requests: photo is done", daemon, kRequests,
                  [&](int i) { PostPhotoConvert(PhotoPath(directory, i).c_str()); });
   ReportRequests("requests: media record, new", daemon, static_cast<int>(names.size()),
-                 askForMedia);
-  ReportRequests("requests: media record, known", daemon, kRequests, askForMedia);
+                 requestMedia);
+  ReportRequests("requests: media record, known", daemon, kRequests, requestMedia);
   vela_test::RemoveTree(directory);
 }
 

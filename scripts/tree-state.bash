@@ -5,7 +5,7 @@ readonly STATUS=$BUILD/programs/velathumb-status/velathumb-status
 
 # Appends the state of directories, a JSON object, to a file. Like velathumb, skips what cannot be
 # read.
-ask_status() { # STATE OPTION-OR-DIRECTORY...
+append_status() { # STATE OPTION-OR-DIRECTORY...
   local state=$1 code=0 size
   size=$(stat -c %s "$state")
   "$STATUS" --json --photos "${@:2}" >>"$state" 2>"$state.log" || code=$?
@@ -20,18 +20,18 @@ read_state() { # TREE STATE
   local device
   local -a below
   : >"$2"
-  ask_status "$2" --recursive "$1"
+  append_status "$2" --recursive "$1"
   if (($(query '[directories] | length' "$2") > 0)); then
     return
   fi
   IS_EXCLUDED=1
   : >"$2"
-  ask_status "$2" "$1"
+  append_status "$2" "$1"
   device=$(stat -c %d "$1")
   mapfile -d '' -t below < <(find -L "$1" -mindepth 1 -maxdepth 1 -type d -printf '%D%p\0' \
     2>/dev/null | sed -zn "s,^$device/,/,p" | sort -z)
   if ((${#below[@]} > 0)); then
-    ask_status "$2" --recursive "${below[@]}"
+    append_status "$2" --recursive "${below[@]}"
   fi
 }
 

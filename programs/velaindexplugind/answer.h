@@ -1,4 +1,4 @@
-// What a request is answered with.
+// Replies to requests.
 #pragma once
 
 #include <cstdint>
@@ -13,13 +13,13 @@ enum class Outcome {
   kDone,     ///< succeeded
   kRefused,  ///< the request was invalid or not permitted
   kFailed,   ///< the media file could not be read
-  kFault,    ///< the daemon or the index failed; the operator should know
+  kFault,    ///< the daemon or the index failed; of interest to the administrator
 };
 
 struct Answer {
-  std::string line;  ///< the reply; empty when memory ran out
+  std::string line;  ///< the reply; empty when out of memory
   Outcome outcome = Outcome::kFault;
-  std::string error;  ///< for the log, empty when there is none
+  std::string error;  ///< for the log; empty without an error
 };
 
 // Replies as they are sent over the socket: one line of JSON each, including the newline. All of

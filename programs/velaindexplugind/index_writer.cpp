@@ -20,8 +20,8 @@ IndexResult StoreOne(IndexConnection& connection, const Request& request) {
   return connection.StorePosted(request.path, kind, std::time(nullptr));
 }
 
-/// Unlike everything else in the index, a version that is lost in a power failure cannot be
-/// determined again.
+/// A version that is lost in a power failure cannot be determined again, unlike everything else in
+/// the index.
 bool MustBeDurable(const Job& job) {
   return job.request.command == Command::kSetIndexVersion;
 }
@@ -72,7 +72,7 @@ void IndexWriter::CarryOut(std::list<Job>& jobs) const {
   try {
     CarryOutFrom(jobs.begin(), jobs);
   } catch (...) {
-    // The jobs keep the empty reply lines they started with, which mean that memory ran out.
+    // The reply lines of the jobs remain empty, which means out of memory.
     return;
   }
 }

@@ -35,7 +35,7 @@ int TryConnect(const std::string& path) {
     return errno;
   }
   const int error = ConnectNow(probe.Get(), path);
-  // A full queue also belongs to a process.
+  // A socket with a full queue also belongs to a process.
   return error == EAGAIN ? 0 : error;
 }
 
@@ -55,8 +55,8 @@ bool MoveAside(const std::string& path) {
   return false;
 }
 
-/// All users can write to the directory of the socket. None of them may keep root's daemon from
-/// starting, or answer in its place, by being first.
+/// All users can write to the directory of the socket. None of them must be able to keep root's
+/// daemon from starting, or to answer in its place, by creating the socket first.
 std::string Evict(const std::string& path, uid_t owner) {
   LogLine(LogLevel::kWarning, "socket").Add("replaced", path).Add("owner", UserName(owner)).Write();
   if (unlink(path.c_str()) == 0 || errno == ENOENT) {

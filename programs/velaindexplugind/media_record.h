@@ -1,4 +1,4 @@
-// What the daemon knows of a photo or video.
+// The record of a photo or video.
 #pragma once
 
 #include <cstdint>

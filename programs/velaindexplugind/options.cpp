@@ -20,7 +20,7 @@ constexpr ProgramText kProgramText = {
     "Answers requests about photos and videos on the local socket of the index service and stores\n"
     "their data in the embedded index database. Runs in the foreground.",
     "Exit status: 0 ended by a signal or request carried out, 1 could not start or request not\n"
-    "carried out, 2 wrong use."};
+    "carried out, 2 invalid command line."};
 
 /// Options that are parsed further.
 struct OptionText {
@@ -59,8 +59,8 @@ void AddOptions(CLI::App& app, Options& options, OptionText& text) {
       ->excludes(setVersion);
 }
 
-/// Parses DIR=N, where the name of the directory may contain a `=`. Returns what is wrong with it,
-/// empty when nothing is.
+/// Parses DIR=N, where the name of the directory may contain a `=`. Returns an error message,
+/// empty on success.
 std::string ParseVersion(const std::string& argument, Options& options) {
   const size_t equals = argument.rfind('=');
   if (equals == std::string::npos) {
@@ -75,7 +75,7 @@ std::string ParseVersion(const std::string& argument, Options& options) {
   return {};
 }
 
-/// Parses the options further. Returns what is wrong with them, empty when nothing is.
+/// Parses the options further. Returns an error message, empty on success.
 std::string ParseText(const CLI::App& app, const OptionText& text, Options& options) {
   const bool isSet = app.count("--set-index-version") > 0;
   const bool isUnset = app.count("--unset-index-version") > 0;

@@ -14,10 +14,10 @@ namespace vela {
 namespace {
 
 /// File times are accurate to two seconds on some file systems. A file that was changed so shortly
-/// before its record was read may have been changed again since, without a new time.
+/// before its record was read may have changed again since with the same time.
 constexpr int64_t kTimeResolution = 2;
 
-/// How many times a file is read that changes while it is read.
+/// Maximum number of attempts to read a file that keeps changing.
 constexpr int kReadAttempts = 3;
 
 Answer Done(std::string line) {
@@ -73,7 +73,7 @@ WorkPlace PlaceOf(Command command) {
       return WorkPlace::kFiles;
     case Command::kIsPhotoConvertDisabled:
     case Command::kIsVideoConvertDisabled:
-      return WorkPlace::kAtOnce;
+      return WorkPlace::kEventLoop;
     case Command::kGetIndexVersion:
       return WorkPlace::kIndexRead;
     default:
@@ -81,8 +81,8 @@ WorkPlace PlaceOf(Command command) {
   }
 }
 
-/// A version applies to a whole tree with the photos of all its owners, so it is for the
-/// administrator to decide. All other commands are open to every user who can connect.
+/// A version applies to a whole tree with the photos of all its owners, so only
+/// the administrator may set it. Every user who can connect may send the other commands.
 std::string ObjectionTo(Command command, const std::optional<ucred>& peer) {
   if (command != Command::kSetIndexVersion) {
     return {};

@@ -14,10 +14,10 @@ namespace vela {
 
 /// Where a request is carried out.
 enum class WorkPlace {
-  kAtOnce,      ///< on the event loop: nothing could make it wait
-  kIndexRead,   ///< by the thread that reads the index
-  kIndexWrite,  ///< by the thread that writes to the index, in IndexWriter
-  kFiles,       ///< by the threads that read media files, possibly from slow disks
+  kEventLoop,   ///< the event loop: it never waits
+  kIndexRead,   ///< the thread that reads the index
+  kIndexWrite,  ///< the thread that writes to the index, in IndexWriter
+  kFiles,       ///< the threads that read media files, possibly from slow disks
 };
 
 /// Returns where a command is carried out.

@@ -39,7 +39,7 @@ void CarryOut(const RequestHandler& handler, std::list<Job>& jobs) {
     try {
       job.answer = handler.Handle(job.request, job.settings);
     } catch (...) {
-      // An empty line means that memory ran out.
+      // An empty line means out of memory.
       job.answer.line.clear();
     }
   }
@@ -169,7 +169,7 @@ void Server::PauseAccepting(int error) {
   try {
     log_.WriteAcceptFailure(error);
   } catch (const std::exception&) {
-    return;  // there is no memory for the line
+    return;  // out of memory for the line
   }
 }
 
@@ -251,7 +251,7 @@ void Server::Dispatch(Client& client) {
   const std::string objection = ObjectionTo(request.command, PeerOf(client.connection.Fd()));
   if (!objection.empty()) {
     Finish(client, &request, {FailureReply(objection), Outcome::kRefused, objection}, false);
-  } else if (PlaceOf(request.command) == WorkPlace::kAtOnce) {
+  } else if (PlaceOf(request.command) == WorkPlace::kEventLoop) {
     Finish(client, &request, handler_.Handle(request, settings_), false);
   } else {
     GiveToWorkers(client, std::move(request));

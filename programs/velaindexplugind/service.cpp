@@ -33,7 +33,7 @@ namespace {
 constexpr int kStarted = 0;
 constexpr int kNotStarted = 1;
 
-/// The age at which a request fails that waits to write to the index.
+/// The age at which a request that waits to write to the index fails.
 constexpr std::chrono::milliseconds kWriteTimeout(5000);
 
 /// How long the daemon waits for pending requests when it stops.

@@ -1,4 +1,4 @@
-// The daemon as a service: its start, its signals and its end.
+// The daemon as a service: start, signals, stop.
 #pragma once
 
 #include "options.h"

@@ -16,7 +16,7 @@ namespace {
 /// Long enough for all valid values; a longer one is cut, which leaves it invalid.
 using Value = std::array<char, 64>;
 
-/// Returns whether the file has the key. A missing file is not worth a warning.
+/// Returns whether the file has the key. A missing file causes no warning.
 bool FindValue(const char* key, Value& value, std::string& warning) {
   const int found = VLIBCFileGetKeyValue(kSettingsFile, key, value.data(), value.size(), 0);
   if (found < 0 && VLIBCErrGet() != ENOENT) {

@@ -28,7 +28,7 @@ struct Job {
 };
 
 /// Finished jobs, returned to the thread that submitted them. Nothing here allocates memory, so
-/// that no job is lost when memory runs out.
+/// that no job is lost when out of memory.
 class DoneJobs {
  public:
   /// Returns 0 or an errno value.
@@ -37,7 +37,7 @@ class DoneJobs {
   /// Readable when there are finished jobs.
   int Fd() const { return signal_.Fd(); }
 
-  /// Moves the jobs of the list here.
+  /// Takes the jobs of the list.
   void Add(std::list<Job>& jobs);
 
   /// Removes and returns all finished jobs.
@@ -65,7 +65,7 @@ class WorkerPool {
   WorkerPool(const WorkerPool&) = delete;
   WorkerPool& operator=(const WorkerPool&) = delete;
 
-  /// Moves the one job of the list here.
+  /// Takes the only job of the list.
   void Add(std::list<Job>& job);
 
   /// Removes the job of a client. Returns false when it has been started or finished.

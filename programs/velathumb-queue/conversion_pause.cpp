@@ -13,7 +13,8 @@ namespace vela {
 
 namespace {
 
-/// How long the answer that conversion may run is valid: entries can follow each other fast.
+/// How long the answer that conversion may run is valid, so that short entries do not cause a
+/// request each.
 constexpr std::chrono::seconds kAnswerValidity(1);
 /// Both the resume time and the switch may change at any moment.
 constexpr std::chrono::seconds kLongestWait(5);
@@ -29,7 +30,7 @@ bool IsTrue(const Json::Value& packet, const char* name) {
 }
 
 /// Sends the request of IsDisableConvertPhoto, but does not wait half an hour for a daemon that
-/// does not answer: the runner handles no signals meanwhile.
+/// does not answer, because the runner handles no signals meanwhile.
 bool IsSwitchedOff() {
   constexpr int kAnswerTimeout = 3;  // seconds
   Json::Value packet(Json::objectValue);
@@ -61,7 +62,7 @@ bool PauseGate::MayStart() {
   const auto pause = FindConversionPause();
   const auto now = Clock::now();
   if (!pause) {
-    // A slow answer is valid for longer, or the runner would do nothing but ask.
+    // A slow answer is valid for longer, or the runner would spend its time on requests.
     allowedUntil_ = now + kAnswerValidity + 10 * (now - start);
     pausedUntil_.reset();
     reason_.clear();

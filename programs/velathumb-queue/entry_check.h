@@ -9,7 +9,7 @@
 namespace vela {
 
 /// Makes the path of an entry from the command line absolute, so that it does not depend on the
-/// working directory. Returns what is wrong with the entry, empty when nothing is.
+/// working directory. Returns an error message, empty when the entry is valid.
 std::string CheckAddition(std::string& entry);
 
 /// Returns why the entry cannot be processed now, empty when it can: its directory must exist, and

@@ -31,14 +31,14 @@ constexpr std::chrono::seconds kLockedDirectoryPause(2);
 constexpr milliseconds kRetryPause(200);
 /// Interval of the attempts to lock a file of the queue that is locked.
 constexpr milliseconds kLockedFilePause(200);
-/// After so many failed tries an entry is deferred: it is probably the cause itself.
+/// After so many failed tries an entry is deferred: it probably causes the failures.
 constexpr int kMaxTries = 25;
 /// velathumb queues a directory again when there is more to make in it: twice, for a photo that
 /// succeeds. One that is queued more often is deferred.
 constexpr int kMaxRounds = 16;
 
 /// Starts velathumb for one entry. It ends with this process, however that ends: an orphan would
-/// keep its directory locked. To be called from the main thread. Returns 0 and stores the process
+/// keep its directory locked. Must be called from the main thread. Returns 0 and stores the process
 /// id, or an errno value.
 int StartVelathumb(const VelathumbCommand& command, std::string entry, pid_t& pid) {
   std::string path = command.path;
@@ -120,7 +120,7 @@ void Batch::Defer(size_t number, const std::string& reason) {
   const int error = taken_.Defer(entry);
   if (error != 0) {
     // Neither done nor saved: the taken queue must stay.
-    WriteLog(LogLevel::kError, "cannot defer it", error);
+    WriteLog(LogLevel::kError, "cannot defer an entry", error);
     plan_.Postpone(number, Clock::now());
     hasFailed_ = true;
     return;
@@ -258,7 +258,7 @@ class QueueRun {
   bool isIdle_ = true;                    // no entry was in progress before
   bool hasDeferred_ = false;              // entries are left for a later run
   std::unordered_set<std::string> seen_;  // entries since the queue was last empty
-  int rounds_ = 0;                        // in a row without an entry not seen before
+  int rounds_ = 0;                        // in a row with only entries seen before
   Clock::time_point lastRequeue_;
 };
 

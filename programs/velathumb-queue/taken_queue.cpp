@@ -21,7 +21,7 @@ namespace vela {
 
 namespace {
 
-/// Returns the path without empty and "." components. Those with ".." stay: what they mean depends
+/// Returns the path without empty and "." components. ".." components stay: where they lead depends
 /// on links.
 std::string NormalizePath(const std::string& path) {
   std::string normalized;
@@ -42,7 +42,7 @@ std::string KeyOf(const std::string& entry) {
   return entry.substr(0, begin) + NormalizePath(entry.substr(begin));
 }
 
-/// Returns the size of the file, 0 when there is none.
+/// Returns the size of the file, 0 when it is missing.
 uintmax_t SizeOf(const std::string& path) {
   std::error_code error;
   const uintmax_t size = std::filesystem::file_size(path, error);
@@ -62,7 +62,7 @@ QueuePaths PhotoQueuePaths() {
 }
 
 int TakenQueue::RemoveEmptyQueue(time_t modified) const {
-  // The process that has just made it is waiting for the lock; if the file were removed at once,
+  // The process that has just created it is waiting for the lock; if the file were removed at once,
   // both could repeat that forever. That process may have been killed, though.
   constexpr time_t kGracePeriod = 10;  // seconds
   const time_t age = time(nullptr) - modified;

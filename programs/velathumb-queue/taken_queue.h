@@ -1,4 +1,5 @@
-// The entries of the photo queue that are being processed, safe against a crash at any moment.
+// The entries of the photo queue that are being processed, recorded so that a crash at any moment
+// loses none.
 #pragma once
 
 #include <cstdint>
@@ -34,7 +35,7 @@ class TakenQueue {
     kFailed,   ///< the reason is logged
   };
 
-  /// Takes the entries that an earlier run has left, else those in the queue.
+  /// Takes the entries that an earlier run has left, otherwise those in the queue.
   Outcome Take();
 
   /// Returns the entries that are not done, each once, in the order of their first appearance.

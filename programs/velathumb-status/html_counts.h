@@ -27,7 +27,7 @@ std::string GroupDigits(int64_t number);
 /// Returns the number with grouped digits and the singular or plural noun.
 std::string CountText(int64_t number, const char* one, const char* many);
 
-/// Returns "12%"; something but not everything is at least 1 and at most 99. `total` is not 0.
+/// Returns a text like "12%": 0 and 100 only when they are exact. `total` is not 0.
 std::string PercentText(int64_t part, int64_t total);
 
 /// Returns a bar of the shares for the page; empty when there are no thumbnails. `cssClass` is the

@@ -65,7 +65,7 @@ class SinkList : public StatusSink {
   bool hasWork_ = false;
 };
 
-/// Produces everything that a command line asks for.
+/// Produces everything that the command line requests.
 class StatusRun {
  public:
   explicit StatusRun(Options options) : options_(std::move(options)), json_(std::cout) {}

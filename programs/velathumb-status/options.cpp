@@ -11,11 +11,11 @@ namespace {
 constexpr ProgramText kProgramText = {
     "velathumb-status",
     "Reports the outstanding work of velathumb: which photos lack thumbnails, which videos need\n"
-    "work, what the queues contain and how far the conversion has got.",
+    "work, what the queues contain and how far the conversion has progressed.",
     "Exit status: 0 nothing to do, 1 work outstanding, 2 error.\n"
     "Nothing is changed unless --check-videos is given."};
 
-/// Returns what is wrong with the name of a file, empty when nothing is.
+/// Returns an error message, empty when the name of a file is valid.
 std::string FindNameFault(const std::string& name) {
   return name.empty() ? "the name of the file is empty; see --help" : std::string();
 }
@@ -47,11 +47,12 @@ void AddOptions(CLI::App& app, Options& options) {
   app.add_flag("-j,--json", options.json, "write JSON");
 }
 
-/// Returns what is wrong with options that are valid one by one, empty when nothing is.
+/// Returns an error message when options that are valid one by one contradict each other, otherwise
+/// an empty text.
 std::string FindContradiction(const Options& options) {
-  const bool hasQuestion = !options.directories.empty() || options.queue || options.progress ||
-                           options.watch || options.resumeTime;
-  if (!hasQuestion) {
+  const bool hasQuery = !options.directories.empty() || options.queue || options.progress ||
+                        options.watch || options.resumeTime;
+  if (!hasQuery) {
     return "give a directory, --queue, --progress, --watch or --resume-time";
   }
   if (options.checkVideos && options.directories.empty() && !options.queue) {

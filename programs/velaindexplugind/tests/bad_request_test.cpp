@@ -86,11 +86,11 @@ std::vector<std::pair<std::string, std::string>> BadRequests() {
 TEST_F(BadRequestTest, GetsAnErrorAndDoesNoHarm) {
   IndexDaemon daemon;
   for (const auto& [line, error] : BadRequests()) {
-    const Json::Value reply = ParseReply(AskWithBytes(line));
+    const Json::Value reply = ParseReply(QueryWithBytes(line));
     EXPECT_EQ(reply["success"], Json::Value(false)) << line.substr(0, 200);
     EXPECT_EQ(reply["error"], error) << line.substr(0, 200);
   }
-  EXPECT_EQ(AskForVersion("/a"), 0);
+  EXPECT_EQ(QueryVersion("/a"), 0);
   EXPECT_EQ(Query("SELECT count(*) FROM posted"), Rows{"0"});
   EXPECT_EQ(Query("SELECT count(*) FROM directory_index_version"), Rows{"0"});
   EXPECT_EQ(daemon.End(SIGTERM).exitCode, 0);
@@ -100,9 +100,9 @@ TEST_F(BadRequestTest, LineMayHave64KibibytesAndNotOneMore) {
   const IndexDaemon daemon;
   std::string line = kVersionRequest;
   line.resize(kRequestMax, ' ');
-  EXPECT_EQ(ParseReply(AskWithBytes(line))["success"], Json::Value(true));
+  EXPECT_EQ(ParseReply(QueryWithBytes(line))["success"], Json::Value(true));
   line += ' ';
-  const Json::Value reply = ParseReply(AskWithBytes(line));
+  const Json::Value reply = ParseReply(QueryWithBytes(line));
   EXPECT_EQ(reply["success"], Json::Value(false));
   EXPECT_EQ(reply["error"], "the request is longer than 65536 bytes");
 }
@@ -121,17 +121,17 @@ TEST_F(BadRequestTest, EndlessLineIsAnsweredAndClosed) {
 TEST_F(BadRequestTest, LongestPathIsAccepted) {
   const IndexDaemon daemon;
   const std::string path = "/" + std::string(4094, '"');
-  EXPECT_EQ(AskForVersion(path), 0);
+  EXPECT_EQ(QueryVersion(path), 0);
   std::string deep;
   for (int i = 0; i < 2047; ++i) deep += "/a";
   EXPECT_TRUE(SetVersion("/a", 3));
-  EXPECT_EQ(AskForVersion(deep), 3);
+  EXPECT_EQ(QueryVersion(deep), 3);
 }
 
 TEST_F(BadRequestTest, UnknownMembersAreIgnored) {
   const IndexDaemon daemon;
-  const Json::Value reply = ParseReply(
-      AskWithBytes(R"({"x":{"command":1},"path":"/a","command":"GET_INDEX_VERSION","type":"?"})"));
+  const Json::Value reply = ParseReply(QueryWithBytes(
+      R"({"x":{"command":1},"path":"/a","command":"GET_INDEX_VERSION","type":"?"})"));
   EXPECT_EQ(reply["success"], Json::Value(true));
 }
 
@@ -141,20 +141,20 @@ TEST_F(BadRequestTest, NumbersOfAllFormsAndSlashesInStringsAreJson) {
                             R"("\"/-")", R"("\\")", "[1,-2]", "{}", "null"}) {
     const std::string line =
         std::string(R"({"command":"GET_INDEX_VERSION","path":"/a//-01","x":)") + value + "}";
-    EXPECT_EQ(ParseReply(AskWithBytes(line))["success"], Json::Value(true)) << line;
+    EXPECT_EQ(ParseReply(QueryWithBytes(line))["success"], Json::Value(true)) << line;
   }
 }
 
 TEST_F(BadRequestTest, OnlyTheFirstLineCounts) {
   const IndexDaemon daemon;
   const std::string request = kVersionRequest;
-  EXPECT_EQ(ParseReply(AskWithBytes(request + "\n" + request))["version"], 0);
+  EXPECT_EQ(ParseReply(QueryWithBytes(request + "\n" + request))["version"], 0);
 }
 
 TEST_F(BadRequestTest, IsLoggedWithItsReasonAtALimitedRate) {
   IndexDaemon daemon;
   constexpr int kRequests = 300;
-  for (int i = 0; i < kRequests; ++i) AskWithBytes("x");
+  for (int i = 0; i < kRequests; ++i) QueryWithBytes("x");
   const std::string log = daemon.End(SIGTERM).err;
   size_t lines = 0;
   for (size_t at = log.find("outcome=refused"); at != std::string::npos;

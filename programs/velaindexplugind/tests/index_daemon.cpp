@@ -122,7 +122,7 @@ std::string ReceiveAll(const Descriptor& connection, bool* isEnded) {
   return bytes;
 }
 
-std::string AskWithBytes(const std::string& line) {
+std::string QueryWithBytes(const std::string& line) {
   const Descriptor connection = SendLine(line);
   bool isEnded = false;
   const std::string reply = ReceiveAll(connection, &isEnded);
@@ -157,7 +157,7 @@ Json::Value Ask(const Json::Value& request) {
   Json::StreamWriterBuilder builder;
   builder["indentation"] = "";
   builder["emitUTF8"] = true;
-  return ParseReply(AskWithBytes(Json::writeString(builder, request)));
+  return ParseReply(QueryWithBytes(Json::writeString(builder, request)));
 }
 
 Json::Value PathRequest(const std::string& command, const std::string& path) {
@@ -174,7 +174,7 @@ Json::Value AskForMedia(const std::string& path, int type) {
   return reply["success"] == Json::Value(true) ? reply["media"] : Json::Value();
 }
 
-Json::Value AskForVersion(const std::string& path) {
+Json::Value QueryVersion(const std::string& path) {
   return Ask(PathRequest("GET_INDEX_VERSION", path))["version"];
 }
 

@@ -87,7 +87,7 @@ void SendBytes(const Descriptor& connection, const std::string& bytes);
 std::string ReceiveAll(const Descriptor& connection, bool* isEnded = nullptr);
 
 /// Sends the line with a newline and receives up to the end of the connection.
-std::string AskWithBytes(const std::string& line);
+std::string QueryWithBytes(const std::string& line);
 
 /// Reads a reply, which must be one line with a JSON object, newline included; fails the test
 /// otherwise.
@@ -109,9 +109,10 @@ Json::Value PathRequest(const std::string& command, const std::string& path);
 Json::Value AskForMedia(const std::string& path, int type = 1);
 
 /// The index version of a path, as the reply has it.
-Json::Value AskForVersion(const std::string& path);
+Json::Value QueryVersion(const std::string& path);
 
-/// Sets, or with null removes, the version of a directory; returns whether the daemon did.
+/// Sets the version of a directory, or removes it with null; returns whether the daemon reports
+/// success.
 bool SetVersion(const std::string& path, const Json::Value& version);
 
 /// The rows of a query on an index database, columns joined by "|"; fails the test on an error.
@@ -131,7 +132,7 @@ class IndexHolder {
   sqlite3* database_ = nullptr;
 };
 
-/// Every test has the sandbox in its first state.
+/// Every test starts with a reset sandbox.
 class IndexDaemonTest : public SandboxTest {};
 
 }  // namespace vela_test

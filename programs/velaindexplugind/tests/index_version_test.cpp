@@ -120,7 +120,7 @@ TEST_F(IndexVersionTest, CommandLineReportsTheDaemonsRefusal) {
   EXPECT_EQ(result.err, "velaindexplugind: path is longer than 4095 bytes\n");
 }
 
-TEST_F(IndexVersionTest, CommandLineRefusesWrongUse) {
+TEST_F(IndexVersionTest, CommandLineRejectsInvalidArguments) {
   const std::vector<std::vector<std::string>> wrong = {
       {"--set-index-version", "/photos"},
       {"--set-index-version", "/photos="},

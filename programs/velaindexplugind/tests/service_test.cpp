@@ -1,4 +1,4 @@
-// The daemon as a service: start, end, sockets and who may use them.
+// The daemon as a service: start, stop, sockets and their permissions.
 #include <fcntl.h>
 #include <grp.h>
 #include <sys/file.h>
@@ -57,14 +57,14 @@ bool HasOtherUsers() {
   return count > 65535;
 }
 
-bool BecomeOther(uid_t user, gid_t group) {
+bool SwitchUser(uid_t user, gid_t group) {
   return setgroups(0, nullptr) == 0 && setgid(group) == 0 && setuid(user) == 0;
 }
 
 /// The result of `action`, 0 to 254, run by another user.
 int RunAs(uid_t user, gid_t group, const std::function<int()>& action) {
   const pid_t child = fork();
-  if (child == 0) _exit(BecomeOther(user, group) ? action() : 255);
+  if (child == 0) _exit(SwitchUser(user, group) ? action() : 255);
   int status = 0;
   EXPECT_EQ(waitpid(child, &status, 0), child);
   return WEXITSTATUS(status);
@@ -243,7 +243,7 @@ TEST_F(ServiceTest, OrdinaryUserMayRunIt) {
     EXPECT_EQ(GetIndexVersion("/a"), 3);
     return;
   }
-  options.beforeExec = {[] { return BecomeOther(1, 1) ? 0 : EPERM; }};
+  options.beforeExec = {[] { return SwitchUser(1, 1) ? 0 : EPERM; }};
   const std::vector<std::string> arguments = {"--database", "/tmp/own/index.db"};
   MakeDirectories("/tmp/own");
   const IndexDaemon daemon(arguments, options);
@@ -320,7 +320,7 @@ TEST_F(ServiceTest, GroupCanBeChosen) {
     EXPECT_EQ(ConnectAs(65534, 65534), EACCES);
   } else {
     EXPECT_EQ(RunDaemon({"--group", "daemon"}).exitCode, 1)
-        << "a group that does not exist here cannot be given";
+        << "a group that does not exist here cannot be set";
   }
 }
 
@@ -341,9 +341,9 @@ TEST_F(ServiceTest, UsesAnInheritedSocket) {
   EXPECT_TRUE(ConnectToDaemon().IsOpen()) << "the next instance finds waiting clients";
 }
 
-TEST_F(ServiceTest, HasADefiniteLogFormat) {
+TEST_F(ServiceTest, HasAFixedLogFormat) {
   IndexDaemon daemon({"--log-requests"});
-  AskForVersion("/a \"b\"\n\xff=");
+  QueryVersion("/a \"b\"\n\xff=");
   const std::string log = daemon.End(SIGTERM).err;
   EXPECT_THAT(log, HasSubstr("time=2"));
   EXPECT_THAT(log, HasSubstr(" level=info event=request command=GET_INDEX_VERSION "
@@ -354,7 +354,7 @@ TEST_F(ServiceTest, LinesForTheJournalHaveTheirLevel) {
   const std::string script = "JOURNAL_STREAM=$(stat -L -c %d:%i /proc/self/fd/2) exec \"$0\"";
   Program daemon = StartProgram("/bin/bash", {"-c", script, IndexDaemonPath()});
   WaitForDaemon();
-  AskWithBytes("x");
+  QueryWithBytes("x");
   daemon.Kill(SIGTERM);
   const std::string log = daemon.Wait()->err;
   EXPECT_THAT(log, HasSubstr("<6>level=info event=start"));
@@ -381,9 +381,9 @@ TEST_F(ServiceTest, LogsTheInheritedSocket) {
   EXPECT_THAT(program.Wait()->err, HasSubstr(" socket=/tmp/another_sock "));
 }
 
-TEST_F(ServiceTest, LogsOrdinaryRequestsOnlyOnRequest) {
+TEST_F(ServiceTest, LogsSuccessfulRequestsOnlyWithTheOption) {
   IndexDaemon daemon;
-  AskForVersion("/a");
+  QueryVersion("/a");
   EXPECT_THAT(daemon.End(SIGTERM).err, Not(HasSubstr("event=request")));
 }
 
@@ -419,7 +419,7 @@ TEST_F(ServiceTest, BrokenErrorStreamDoesNotEndIt) {
   close(ends[1]);
   close(ends[0]);
   WaitForDaemon();
-  AskWithBytes("x");
+  QueryWithBytes("x");
   EXPECT_EQ(GetIndexVersion("/a"), 0);
   ExpectCleanEnd(program);
 }

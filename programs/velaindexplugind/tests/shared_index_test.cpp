@@ -39,7 +39,7 @@ TEST_F(SharedIndexTest, IsCreatedWithItsDirectory) {
   const IndexDaemon daemon({}, options);
   EXPECT_EQ(Query("PRAGMA journal_mode"), Rows{"wal"});
   EXPECT_EQ(Query("SELECT version FROM velaindexplugind_schema"), Rows{"1"});
-  EXPECT_EQ(Query("PRAGMA user_version"), Rows{"0"}) << "that is for others to set";
+  EXPECT_EQ(Query("PRAGMA user_version"), Rows{"0"}) << "reserved for other programs";
 }
 
 TEST_F(SharedIndexTest, IsForItsOwnerAndGroupWhateverTheUmask) {

@@ -16,7 +16,7 @@ namespace {
 
 using Sizes = std::vector<size_t>;
 
-/// A pool of one thread whose first batch lasts until GoOn.
+/// A pool of one thread whose first batch ends after Continue.
 class HeldPool {
  public:
   explicit HeldPool(size_t batch)
@@ -26,7 +26,7 @@ class HeldPool {
               sizes_.push_back(jobs.size());
               if (sizes_.size() > 1) return;
               begun_.set_value();
-              goOn_.get_future().wait();
+              continue_.get_future().wait();
             },
             OpenJobs(done_)) {
     Add(0);
@@ -42,8 +42,8 @@ class HeldPool {
   bool Remove(uint64_t client) { return pool_.Remove(client); }
 
   /// Lets the work continue. Returns the clients of the finished jobs as soon as there are `count`.
-  std::vector<uint64_t> GoOn(size_t count) {
-    goOn_.set_value();
+  std::vector<uint64_t> Continue(size_t count) {
+    continue_.set_value();
     std::vector<uint64_t> clients;
     pollfd waiting = {done_.Fd(), POLLIN, 0};
     while (clients.size() < count && poll(&waiting, 1, 60000) == 1) {
@@ -52,7 +52,7 @@ class HeldPool {
     return clients;
   }
 
-  /// The number of jobs in each batch; after GoOn.
+  /// The number of jobs in each batch; after Continue.
   const Sizes& WorkSizes() const { return sizes_; }
 
  private:
@@ -63,7 +63,7 @@ class HeldPool {
 
   DoneJobs done_;
   std::promise<void> begun_;
-  std::promise<void> goOn_;
+  std::promise<void> continue_;
   Sizes sizes_;
   WorkerPool pool_;
 };
@@ -74,13 +74,13 @@ TEST(WorkerPoolTest, RemovesOnlyPendingJobs) {
   EXPECT_FALSE(pool.Remove(0)) << "it is in progress";
   EXPECT_TRUE(pool.Remove(2));
   EXPECT_FALSE(pool.Remove(2));
-  EXPECT_EQ(pool.GoOn(3), (std::vector<uint64_t>{0, 1, 3}));
+  EXPECT_EQ(pool.Continue(3), (std::vector<uint64_t>{0, 1, 3}));
 }
 
 TEST(WorkerPoolTest, HandsOutPendingJobsInBatches) {
   HeldPool pool(4);
   for (const uint64_t client : {1U, 2U, 3U, 4U, 5U, 6U}) pool.Add(client);
-  EXPECT_EQ(pool.GoOn(7), (std::vector<uint64_t>{0, 1, 2, 3, 4, 5, 6}));
+  EXPECT_EQ(pool.Continue(7), (std::vector<uint64_t>{0, 1, 2, 3, 4, 5, 6}));
   EXPECT_EQ(pool.WorkSizes(), (Sizes{1, 4, 2}));
 }
 

@@ -108,7 +108,7 @@ TEST_F(EntryPlanTest, SkipsEntriesThatOverlapWithOnesInProgress) {
   EXPECT_THAT(plan.Start(now_), Optional(3U));
 }
 
-TEST_F(EntryPlanTest, APostponedEntryWaitsForItsTimeAndHoldsNothingBack) {
+TEST_F(EntryPlanTest, APostponedEntryWaitsForItsTimeAndDelaysNoOther) {
   EntryPlan plan({"/a", "R:/a"});
   EXPECT_THAT(plan.Start(now_), Optional(0U));
   plan.Postpone(0, now_ + seconds(5));

@@ -17,17 +17,17 @@ constexpr uint64_t kGibibyte = uint64_t{1} << 30;
 
 class LaterTest : public QueueTest {
  protected:
-  /// Fails the test unless the run ends with status 1 and exactly these entries are kept for a
-  /// later one. Returns what the runner printed to standard error.
-  std::string ExpectRunKeeps(const std::vector<std::string>& entries) const {
+  /// Fails the test unless the run ends with status 1 and exactly these entries are
+  /// deferred. Returns what the runner printed to standard error.
+  std::string ExpectRunDefers(const std::vector<std::string>& entries) const {
     const ProgramResult result = velathumb_.Run();
     EXPECT_EQ(result.exitCode, 1);
-    ExpectKept(entries);
+    ExpectDeferred(entries);
     return result.err;
   }
 
-  /// Fails the test unless exactly these entries are kept for a later run.
-  static void ExpectKept(const std::vector<std::string>& entries) {
+  /// Fails the test unless exactly these entries are deferred.
+  static void ExpectDeferred(const std::vector<std::string>& entries) {
     EXPECT_EQ(ReadFile(kLaterFile), Lines(entries));
     for (const char* file : {kQueueFile, kTakenFile, kJournalFile}) {
       EXPECT_FALSE(Exists(file)) << file;
@@ -35,29 +35,29 @@ class LaterTest : public QueueTest {
   }
 };
 
-TEST_F(LaterTest, AMissingDirectoryIsKeptUntilItExists) {
+TEST_F(LaterTest, AMissingDirectoryIsDeferredUntilItExists) {
   AppendToQueue({"/tmp/none", "R:/tmp/gone"});
   Enqueue({"/tmp/a"});
-  EXPECT_THAT(ExpectRunKeeps({"/tmp/none", "R:/tmp/gone"}),
+  EXPECT_THAT(ExpectRunDefers({"/tmp/none", "R:/tmp/gone"}),
               HasSubstr("deferred to a later run, there is no such directory: R:/tmp/gone\n"));
   MakeDirectories("/tmp/gone");
-  ExpectRunKeeps({"/tmp/none"});
+  ExpectRunDefers({"/tmp/none"});
   MakeDirectories("/tmp/none");
   ExpectRun({"/tmp/a", "R:/tmp/gone", "/tmp/none"});
 }
 
-TEST_F(LaterTest, ADirectoryThatIsRemovedMeanwhileIsKept) {
+TEST_F(LaterTest, ADirectoryThatIsRemovedMeanwhileIsDeferred) {
   velathumb_.Stub().PlanCall(1, StubPlan().Remove("/tmp/a"));
   Enqueue({"/tmp/a"});
-  ExpectRunKeeps({"/tmp/a"});
+  ExpectRunDefers({"/tmp/a"});
 }
 
-TEST_F(LaterTest, ANearlyFullVolumeIsSkippedUntilItHasRoom) {
+TEST_F(LaterTest, ANearlyFullVolumeIsDeferredUntilItHasRoom) {
   SmallVolume volume("/tmp/small", 2 * kGibibyte);
   WriteFile("/tmp/small/file", "");
   volume.SetAvailable(kGibibyte - SmallVolume::PageSize());
   Enqueue({"/tmp/small", "/tmp/a"});
-  EXPECT_THAT(ExpectRunKeeps({"/tmp/small"}),
+  EXPECT_THAT(ExpectRunDefers({"/tmp/small"}),
               HasSubstr("deferred to a later run, its volume is nearly full: /tmp/small\n"));
   EXPECT_THAT(velathumb_.Entries(), ElementsAre("/tmp/a"));
   volume.SetAvailable(kGibibyte);
@@ -69,24 +69,24 @@ TEST_F(LaterTest, AVolumeThatBecomesNearlyFullIsRepeated) {
   WriteFile("/tmp/small/file", "x");
   velathumb_.Stub().PlanCall(1, StubPlan().FillVolume("/tmp/small"));
   Enqueue({"/tmp/small"});
-  ExpectRunKeeps({"/tmp/small"});
+  ExpectRunDefers({"/tmp/small"});
   volume.SetAvailable(2 * kGibibyte);
   ExpectRun({"/tmp/small", "/tmp/small"});
 }
 
 /// Takes a minute: the pauses between the tries become longer and longer.
-TEST_F(LaterTest, AnEntryWhoseVelathumbIsKilledEachTimeIsKept) {
+TEST_F(LaterTest, AnEntryWhoseVelathumbIsKilledEachTimeIsDeferred) {
   velathumb_.Stub().PlanWhen("/tmp/a", StubPlan().DieBySignal(SIGKILL));
   Enqueue({"/tmp/a", "/tmp/b"});
   EXPECT_THAT(
-      ExpectRunKeeps({"/tmp/a"}),
+      ExpectRunDefers({"/tmp/a"}),
       HasSubstr("deferred to a later run, velathumb did not complete in any try: /tmp/a\n"));
   const std::vector<std::string> entries = velathumb_.Entries();
   EXPECT_EQ(std::count(entries.begin(), entries.end(), "/tmp/a"), 25);
   EXPECT_EQ(std::count(entries.begin(), entries.end(), "/tmp/b"), 1);
 }
 
-TEST_F(LaterTest, KeptEntriesDoNotHoldBackAFollowingRunner) {
+TEST_F(LaterTest, DeferredEntriesDoNotDelayAFollowingRunner) {
   AppendToQueue({"/tmp/none"});
   Program runner = velathumb_.Start({"--follow"});
   ASSERT_TRUE(WaitUntilExists(kLaterFile));
@@ -94,10 +94,10 @@ TEST_F(LaterTest, KeptEntriesDoNotHoldBackAFollowingRunner) {
   EXPECT_TRUE(velathumb_.WaitForStarts(1));
   EXPECT_TRUE(WaitUntilGone(kTakenFile));
   Stop(runner);
-  ExpectKept({"/tmp/none"});
+  ExpectDeferred({"/tmp/none"});
 }
 
-TEST_F(LaterTest, AnEntryThatCannotBeKeptStaysTaken) {
+TEST_F(LaterTest, AnEntryThatCannotBeDeferredStaysTaken) {
   velathumb_.Stub().PlanCall(1, StubPlan().CreateFile(kLaterFile).ReplaceByDirectory(kLaterFile));
   Enqueue({"/tmp/a"});
   AppendToQueue({"/tmp/none"});
@@ -143,7 +143,7 @@ TEST_F(LaterTest, ALockedQueueIsTakenAfterwards) {
   ExpectQueueDone();
 }
 
-TEST_F(LaterTest, ASignalEndsTheWaitToPutKeptEntriesBack) {
+TEST_F(LaterTest, ASignalEndsTheWaitToPutDeferredEntriesBack) {
   WriteFile(kLaterFile, "/tmp/a\n");
   const Descriptor held = HoldLock(kQueueFile, O_RDWR | O_CREAT);
   Program runner = velathumb_.Start();

@@ -1,4 +1,4 @@
-// Conversion that is paused.
+// Paused conversion.
 #include "conversion_pause.h"
 
 #include <signal.h>
@@ -103,7 +103,7 @@ TEST_F(PauseTest, ARunningVelathumbContinues) {
   Stop(runner);
 }
 
-TEST_F(PauseTest, InvalidAnswersOfTheDaemonHoldNothingBack) {
+TEST_F(PauseTest, InvalidAnswersOfTheDaemonDoNotPauseConversion) {
   for (const char* answer :
        {"[]", R"({"success":[],"result":true})", R"({"success":true,"result":{"a":1}})",
         R"({"success":false,"result":true})", R"({"result":true})", R"({"success":true})"}) {
@@ -114,7 +114,7 @@ TEST_F(PauseTest, InvalidAnswersOfTheDaemonHoldNothingBack) {
     Enqueue({"/tmp/a"});
     const ProgramResult result = velathumb.Run();
     EXPECT_EQ(result.exitCode, 0) << answer;
-    EXPECT_THAT(result.err, Not(HasSubstr("waiting"))) << answer;
+    EXPECT_THAT(result.err, Not(HasSubstr("conversion is paused"))) << answer;
     EXPECT_THAT(velathumb.Entries(), ElementsAre("/tmp/a")) << answer;
   }
 }

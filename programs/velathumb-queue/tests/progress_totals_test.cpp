@@ -48,14 +48,14 @@ class TotalsTest : public QueueTest {
     ExpectCounters(completed, total, completedThumb, totalThumb);
   }
 
-  /// Asks for two thumbnails of each photo.
-  static void AskForTwoClasses() {
+  /// Requests two thumbnails of each photo.
+  static void RequestTwoClasses() {
     WriteFile("/etc/velainfo.conf", "photo_thumb_size_map=\"3\"\n");
   }
 };
 
 TEST_F(TotalsTest, AFreshRunStartsAtZero) {
-  AskForTwoClasses();
+  RequestTwoClasses();
   MakePhotos({"/tmp/p/a.jpg", "/tmp/p/b.jpg", "/tmp/q/c.jpg", "/tmp/q/below/d.jpg"});
   SetUpCounters(50, 70);
   Enqueue({"/tmp/p", "/tmp/q"});
@@ -63,7 +63,7 @@ TEST_F(TotalsTest, AFreshRunStartsAtZero) {
 }
 
 TEST_F(TotalsTest, AResumedRunKeepsTheCounters) {
-  AskForTwoClasses();
+  RequestTwoClasses();
   MakePhotos({"/tmp/p/a.jpg", "/tmp/q/b.jpg"});
   SetUpCounters(50, 70);
   MakeEntryDirectories({"/tmp/p", "/tmp/q"});
@@ -132,7 +132,7 @@ TEST_F(TotalsTest, AnAbortedScanSetsNothing) {
   ProgressTotals totals(false);
   totals.Set({"R:/tmp/p", "/tmp/p/3"}, [&] { return ++queries >= 10; });
   ExpectCounters(50, 1000, 70, 1000);
-  EXPECT_GE(queries, 10) << "asked for each entry only, not for each directory of a tree";
+  EXPECT_GE(queries, 10) << "checked for each entry only, not for each directory of a tree";
   totals.Set({"R:/tmp/p", "/tmp/p/3"}, [] { return false; });
   ExpectCounters(50, 70, 70, 90);
 }
@@ -200,7 +200,7 @@ TEST_F(AllPhasesTest, AfterAKilledVelathumbTheTotalsAreCorrected) {
   EXPECT_EQ(Photo("completed_thumb"), Photo("total_thumb"));
 }
 
-TEST_F(TotalsTest, VideosAreCountedWhenAskedFor) {
+TEST_F(TotalsTest, VideosAreCountedWhenRequested) {
   MakeDirectories("/tmp/v/d");
   MakeFilm("/tmp/v/a.mp4");
   MakeFilm("/tmp/v/d/b.mp4");

@@ -24,8 +24,8 @@ constexpr const char* kJournalFile = "/var/spool/thumb_create.queue.done";
 constexpr const char* kLaterFile = "/var/spool/thumb_create.queue.later";
 constexpr const char* kProfiles = "/tmp/profiles.conf";
 
-/// Resets the sandbox, then writes one profile (S, phase 0) and settings that ask for that class
-/// only.
+/// Resets the sandbox, then writes one profile (S, phase 0) and settings that request only that
+/// class.
 void ResetQueueSandbox();
 
 /// Makes the directories of the entries.
@@ -50,7 +50,7 @@ void ExpectQueueDone();
 /// The runner as its users start it.
 std::string QueueProgramPath();
 
-/// The options that make it run the velathumb that was built, with this profile file.
+/// The options for running the velathumb of this build with this profile file.
 std::vector<std::string> QueueArguments(const std::string& profileFile,
                                         const std::vector<std::string>& more = {});
 

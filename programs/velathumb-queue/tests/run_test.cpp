@@ -84,7 +84,7 @@ TEST_F(QueueRunTest, AllPhasesAreMadeInOneRun) {
                           "VELAPHOTO_THUMB_XL.jpg"));
 }
 
-TEST_F(QueueRunTest, NewEntriesAreNotTakenForReturningOnes) {
+TEST_F(QueueRunTest, NewEntriesAreNotMistakenForRepeatedOnes) {
   std::vector<std::string> entries;
   for (int i = 0; i < 30; ++i) {
     entries.push_back("/tmp/" + std::to_string(i));
@@ -97,7 +97,7 @@ TEST_F(QueueRunTest, NewEntriesAreNotTakenForReturningOnes) {
   EXPECT_THAT(ExpectRun(entries), Not(HasSubstr("again and again")));
 }
 
-TEST_F(QueueRunTest, EntriesThatKeepReturningAreLeftForALaterRun) {
+TEST_F(QueueRunTest, EntriesThatAreQueuedAgainAndAgainAreDeferred) {
   velathumb_.Stub().Plan(StubPlan().WriteFile(kQueueFile, "/tmp/a\n"));
   Enqueue({"/tmp/a"});
   const ProgramResult result = velathumb_.Run();

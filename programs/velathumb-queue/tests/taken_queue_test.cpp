@@ -200,7 +200,7 @@ TEST_F(TakenQueueTest, ALockedTakenFileIsKept) {
   EXPECT_THAT(ListDirectory("/var/spool"), IsEmpty());
 }
 
-TEST_F(TakenQueueTest, AnEntryLeftForLaterIsPutBack) {
+TEST_F(TakenQueueTest, ADeferredEntryIsPutBack) {
   AppendToQueue({"/a", "/b", "/c"});
   ASSERT_EQ(taken_.Take(), Outcome::kTaken);
   EXPECT_EQ(taken_.Defer("/c"), 0);
@@ -213,12 +213,12 @@ TEST_F(TakenQueueTest, AnEntryLeftForLaterIsPutBack) {
   ExpectTake(Outcome::kTaken, {"/c", "/a"});
 }
 
-TEST_F(TakenQueueTest, WithoutEntriesLeftForLaterNothingIsPutBack) {
+TEST_F(TakenQueueTest, WithoutDeferredEntriesNothingIsPutBack) {
   EXPECT_EQ(taken_.RequeueDeferred(), 0);
   EXPECT_THAT(ListDirectory("/var/spool"), IsEmpty());
 }
 
-TEST_F(TakenQueueTest, AnEntryThatCannotBeLeftIsNotMarkedAsDone) {
+TEST_F(TakenQueueTest, AnEntryThatCannotBeDeferredIsNotMarkedAsDone) {
   TakeNewEntry();
   MakeDirectories(kLaterFile);
   EXPECT_EQ(taken_.Defer("/a"), EISDIR);

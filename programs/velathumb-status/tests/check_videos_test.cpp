@@ -74,7 +74,7 @@ TEST_F(VideoCheck, ACompleteVideoIsKept) {
   EXPECT_THAT(Daemon().Commands(), Not(IsEmpty()));
 }
 
-TEST_F(VideoCheck, VideosThatLackThumbsAreWork) {
+TEST_F(VideoCheck, VideosThatLackThumbsNeedWork) {
   MakeVideo("a.mp4");
   MakeVideo("b.mp4");
   MakeVideoThumbs("b.mp4");
@@ -125,7 +125,7 @@ TEST_F(VideoCheck, ConvertedVideosOfTheWrongOrientationAreRemoved) {
   EXPECT_FALSE(Exists(film));
 }
 
-TEST_F(VideoCheck, WithoutTheOptionNothingIsRemovedAndTheServiceIsNotAsked) {
+TEST_F(VideoCheck, WithoutTheOptionNothingIsRemovedAndTheServiceIsNotQueried) {
   SetRecord(kPortrait);
   MakeVideo("a.mp4");
   MakeVideoThumbs("a.mp4");
@@ -152,7 +152,7 @@ TEST_F(VideoCheck, CountsOfATreeAgreeWithTheLibrary) {
   MakeVideo("a.mp4");
   MakeVideo("below/b.mp4");
   MakeVideo("below/c.mp4");
-  const StatusText answer = AskForText({"--check-videos", "--recursive", kTop});
+  const StatusText answer = QueryText({"--check-videos", "--recursive", kTop});
   ASSERT_THAT(answer.Names(), ElementsAre(kTop, In("below")));
   EXPECT_EQ(answer.directories[0].videos, "1");
   EXPECT_EQ(answer.directories[1].videos, "2");
@@ -162,14 +162,14 @@ TEST_F(VideoCheck, CountsOfATreeAgreeWithTheLibrary) {
 TEST_F(VideoCheck, JsonHasTheCounts) {
   MakeVideo("a.mp4");
   MakeDirectories("/tmp/empty");
-  const Json::Value answer = AskForJson({"--check-videos", kTop, "/tmp/empty"});
+  const Json::Value answer = QueryJson({"--check-videos", kTop, "/tmp/empty"});
   EXPECT_EQ(answer["directories"][0]["videos_needing_work"], Json::Value(1));
   EXPECT_EQ(answer["directories"][1]["videos_needing_work"], Json::Value(0));
   EXPECT_EQ(answer["totals"]["videos_needing_work"], Json::Value(1));
 }
 
 TEST_F(VideoCheck, JsonHasTheCountsEvenWithoutAnyVideo) {
-  const Json::Value nothing = AskForJson({"--check-videos", "/tmp/none"})["totals"];
+  const Json::Value nothing = QueryJson({"--check-videos", "/tmp/none"})["totals"];
   EXPECT_EQ(nothing["videos_needing_work"], Json::Value(0));
   EXPECT_EQ(nothing["queued"]["videos_needing_work"], Json::Value(0));
   MakeVideo("a.mp4");
@@ -186,7 +186,7 @@ TEST_F(VideoCheck, CountsTheVideosOfQueuedDirectoriesSeparately) {
   MakeVideo("a.mp4");
   MakeVideo("below/b.mp4");
   WriteFile(kPhotoQueue, In("below") + "\n");
-  const Json::Value totals = AskForJson({"--check-videos", "--recursive", kTop})["totals"];
+  const Json::Value totals = QueryJson({"--check-videos", "--recursive", kTop})["totals"];
   EXPECT_EQ(totals["videos_needing_work"], Json::Value(2));
   EXPECT_EQ(totals["queued"]["videos_needing_work"], Json::Value(1));
 }
@@ -205,7 +205,7 @@ TEST_F(VideoCheck, VideosOfTheQueueAreChecked) {
   EXPECT_THAT(result.out, AllOf(HasSubstr("    3 entries, videos that need work: 2\n"),
                                 HasSubstr("    1 entry, videos that need work: 0\n"),
                                 HasSubstr("    1 entry\n")));
-  const Json::Value queues = AskForJson({"--queue", "--check-videos"})["queues"];
+  const Json::Value queues = QueryJson({"--queue", "--check-videos"})["queues"];
   const Json::Value expected[] = {Json::Value(), Json::Value(), Json::Value(0), Json::Value(2)};
   for (Json::ArrayIndex i = 0; i < 4; ++i) {
     EXPECT_EQ(queues[i]["videos_needing_work"], expected[i]) << i;

@@ -114,9 +114,9 @@ Screenshot TakeScreenshot(const std::string& page, const BrowserView& view) {
   return ReadPicture(kPicture);
 }
 
-std::vector<std::string> AskPage(const std::string& page,
-                                 const std::vector<std::string>& expressions,
-                                 const BrowserView& size) {
+std::vector<std::string> EvaluateInPage(const std::string& page,
+                                        const std::vector<std::string>& expressions,
+                                        const BrowserView& size) {
   std::string script =
       "<script>onload=function(){const view=document.getElementById('frame').contentWindow;"
       "const doc=view.document;const all=(s)=>[...doc.querySelectorAll(s)];const results=[];";

@@ -11,10 +11,10 @@ namespace vela_test {
 struct BrowserView {
   int width = 1280;  ///< of the page, pixels
   int height = 900;
-  bool isDark = false;  ///< the reader prefers dark colours
+  bool isDark = false;  ///< the user prefers dark colours
 };
 
-/// What a reader sees of a page without scrolling.
+/// What is visible of a page without scrolling.
 class Screenshot {
  public:
   Screenshot(int width, int height, std::string pixels);
@@ -38,11 +38,11 @@ Screenshot TakeScreenshot(const std::string& page, const BrowserView& view = Bro
 /// Opens the page and evaluates JavaScript expressions in another page that shows it in a frame;
 /// `view` (the frame's window), `doc` (its document) and `all` (all elements of a selector) are
 /// known to them. Returns their values as text, percent-encoded as encodeURIComponent does.
-std::vector<std::string> AskPage(const std::string& page,
-                                 const std::vector<std::string>& expressions,
-                                 const BrowserView& size = BrowserView());
+std::vector<std::string> EvaluateInPage(const std::string& page,
+                                        const std::vector<std::string>& expressions,
+                                        const BrowserView& size = BrowserView());
 
-/// Opens the page by itself and returns the document as it stands when it has been loaded.
+/// Opens the page by itself and returns the document after it has loaded.
 std::string DocumentAfterLoading(const std::string& page);
 
 /// Returns the text as encodeURIComponent writes it.

@@ -1,4 +1,4 @@
-// The answer about directories in JSON.
+// The report about directories in JSON.
 #include "status_fixture.h"
 
 namespace vela_test {
@@ -39,7 +39,7 @@ using JsonDirectories = StatusTest;
 
 TEST_F(JsonDirectories, HaveTheDocumentedMembers) {
   MakePhotoWith("a.jpg", 0);
-  const Json::Value answer = AskForJson({kTop});
+  const Json::Value answer = QueryJson({kTop});
   EXPECT_THAT(answer.getMemberNames(),
               UnorderedElementsAre("format", "directories", "totals", "errors"));
   EXPECT_EQ(answer["format"], Json::Value(1));
@@ -59,7 +59,7 @@ TEST_F(JsonDirectories, HaveTheCountsAsNumbers) {
   MakePhotoWith("lacking.jpg", kBitS | kBitM);
   SetFileTime(Derived("lacking.jpg", "VELAPHOTO_THUMB_M.jpg"), kMediaTime - 1);
   WriteFile(Derived("lacking.jpg", "VELAPHOTO_THUMB_B.fail"), "");
-  EXPECT_EQ(AskForJson({kTop})["directories"][0],
+  EXPECT_EQ(QueryJson({kTop})["directories"][0],
             ReadJson(R"({"path": "/tmp/photos", "queued": false, "photos": 2,
                          "incomplete_photos": 1, "present_thumbs": 7, "missing_thumbs": 5,
                          "failure_markers": 1, "videos_needing_work": null})"));
@@ -72,7 +72,7 @@ TEST_F(JsonDirectories, TotalsCountTheQueuedOnesSeparately) {
   MakeThumbs("/tmp/waiting", "b.jpg", kAllSizes);
   WriteFile("/tmp/waiting/@eaDir/a.jpg/VELAPHOTO_THUMB_S.fail", "");
   WriteFile(kPhotoQueue, "/tmp/waiting\n");
-  const Json::Value answer = AskForJson({"/tmp/free", "/tmp/waiting"});
+  const Json::Value answer = QueryJson({"/tmp/free", "/tmp/waiting"});
   EXPECT_EQ(answer["directories"][0]["queued"], Json::Value(false));
   EXPECT_EQ(answer["directories"][1]["queued"], Json::Value(true));
   ExpectMembers(answer["totals"], R"({"directories": 2, "queued_directories": 1, "photos": 3,
@@ -88,7 +88,7 @@ TEST_F(JsonDirectories, PhotosAreListedWithTheStateOfEachSize) {
   MakePhotoWith("a.jpg", kBitXL | kBitSM | kBitB);
   SetFileTime(Derived("a.jpg", "VELAPHOTO_THUMB_B.jpg"), kMediaTime - 1);
   WriteFile(Derived("a.jpg", "VELAPHOTO:THUMB_L.fail"), "");
-  const Json::Value list = AskForJson({"--photos", kTop})["directories"][0]["photo_list"];
+  const Json::Value list = QueryJson({"--photos", kTop})["directories"][0]["photo_list"];
   ASSERT_TRUE(list.isArray());
   ASSERT_EQ(list.size(), 1U);
   EXPECT_EQ(list[0], ReadJson(R"({"name": "a.jpg", "present": ["SM", "XL"],
@@ -99,7 +99,7 @@ TEST_F(JsonDirectories, PhotosAreListedWithTheStateOfEachSize) {
 TEST_F(JsonDirectories, ThePhotoListIsEmptyWithoutIncompletePhotos) {
   MakePhotoWith("complete.jpg", kAllSizes);
   MakePhoto("/tmp/first/a.jpg");
-  const Json::Value directories = AskForJson({"--photos", "/tmp/first", kTop})["directories"];
+  const Json::Value directories = QueryJson({"--photos", "/tmp/first", kTop})["directories"];
   EXPECT_EQ(directories[0]["photo_list"].size(), 1U);
   EXPECT_EQ(directories[1]["photo_list"], Json::Value(Json::arrayValue));
 }
@@ -110,7 +110,7 @@ TEST_F(JsonDirectories, ValidUtf8IsKeptWhateverItMeansInJson) {
   const std::string dir = "/tmp/odd \"\\\n\x01";
   MakePhotoWith(names[0], 0);
   MakePhoto(dir + "/" + names[1]);
-  const Json::Value directories = AskForJson({"-p", kTop, dir})["directories"];
+  const Json::Value directories = QueryJson({"-p", kTop, dir})["directories"];
   EXPECT_EQ(directories[1]["path"].asString(), dir);
   EXPECT_FALSE(directories[1].isMember("path_base64"));
   for (const Json::ArrayIndex i : {0U, 1U}) {
@@ -127,7 +127,7 @@ TEST_F(JsonDirectories, NamesThatAreNotUtf8AreAddedExactlyInBase64) {
   for (const std::string& name : names) {
     MakePhoto(dir + "/" + name);
   }
-  const Json::Value directory = AskForJson({"-p", dir})["directories"][0];
+  const Json::Value directory = QueryJson({"-p", dir})["directories"][0];
   EXPECT_EQ(Decoded(directory["path_base64"]), dir);
   EXPECT_EQ(directory["path"], Json::Value("/tmp/\xef\xbf\xbd\xef\xbf\xbd dir"));
   std::vector<std::string> decoded;
@@ -153,13 +153,13 @@ TEST_F(JsonDirectories, AreOneWholeObjectWithTheErrorWhenADirectoryIsMissing) {
 }
 
 TEST_F(JsonDirectories, AreEmptyWhenNoDirectoryCouldBeScanned) {
-  const Json::Value answer = AskForJson({"/tmp/none"});
+  const Json::Value answer = QueryJson({"/tmp/none"});
   EXPECT_EQ(answer["directories"], Json::Value(Json::arrayValue));
   ExpectMembers(answer["totals"], R"({"directories": 0, "photos": 0})");
 }
 
-TEST_F(JsonDirectories, ShareOneObjectWithTheOtherAnswers) {
-  const Json::Value answer = AskForJson({"--queue", "--progress", "--resume-time", kTop});
+TEST_F(JsonDirectories, ShareOneObjectWithTheOtherReports) {
+  const Json::Value answer = QueryJson({"--queue", "--progress", "--resume-time", kTop});
   EXPECT_THAT(answer.getMemberNames(),
               UnorderedElementsAre("format", "directories", "totals", "queues", "progress",
                                    "resume", "errors"));

@@ -11,9 +11,9 @@ using namespace ::testing;
 
 class DirectoryLines : public StatusTest {
  protected:
-  /// The answer for kTop: its numbers, which the totals repeat.
+  /// The numbers of the report about kTop, which the totals repeat.
   static StatusNumbers Numbers() {
-    const StatusText answer = AskForText({kTop});
+    const StatusText answer = QueryText({kTop});
     EXPECT_EQ(answer.directories.size(), 1U);
     if (answer.directories.empty()) {
       return {};
@@ -134,7 +134,7 @@ TEST_F(DirectoryLines, ShowWhichDirectoriesAreQueued) {
   }
   WriteFile(kPhotoQueue, "/tmp/waiting\nR:/tmp/tree\n");
   WriteFile(kPhotosInProgress, "/tmp/taken\n");
-  const StatusText answer = AskForText({"/tmp/free", "/tmp/waiting", "/tmp/taken", "/tmp/tree"});
+  const StatusText answer = QueryText({"/tmp/free", "/tmp/waiting", "/tmp/taken", "/tmp/tree"});
   EXPECT_THAT(answer.directories,
               ElementsAre(Field(&StatusLine::queued, "no"), Field(&StatusLine::queued, "yes"),
                           Field(&StatusLine::queued, "yes"), Field(&StatusLine::queued, "no")));
@@ -142,9 +142,9 @@ TEST_F(DirectoryLines, ShowWhichDirectoriesAreQueued) {
   EXPECT_EQ(answer.totals.numbers, (StatusNumbers{4, 4, 0, 24, 0}));
 }
 
-TEST_F(DirectoryLines, ShowADashForVideosThatWereNotAskedFor) {
+TEST_F(DirectoryLines, ShowADashForUncheckedVideos) {
   WriteFile(In("film.mp4"), "film");
-  const StatusText answer = AskForText({kTop});
+  const StatusText answer = QueryText({kTop});
   EXPECT_EQ(answer.directories.at(0).videos, "-");
   EXPECT_EQ(answer.totals.videos, "-");
 }
@@ -152,13 +152,13 @@ TEST_F(DirectoryLines, ShowADashForVideosThatWereNotAskedFor) {
 TEST_F(DirectoryLines, OddNamesStayOnOneLine) {
   const std::string odd = "/tmp/new\nline\ttab\\back\x7f\xff";
   MakeDirectories(odd);
-  EXPECT_THAT(AskForText({odd}).Names(), ElementsAre("/tmp/new\\nline\\x09tab\\\\back\\x7f\xff"));
+  EXPECT_THAT(QueryText({odd}).Names(), ElementsAre("/tmp/new\\nline\\x09tab\\\\back\\x7f\xff"));
 }
 
 TEST_F(DirectoryLines, ADirectoryIsCountedOnceWhateverItsName) {
   MakePhoto(In("a.jpg"));
   ASSERT_EQ(symlink(kTop, "/tmp/link"), 0);
-  const StatusText answer = AskForText({kTop, "/tmp/photos/", "/tmp/link"});
+  const StatusText answer = QueryText({kTop, "/tmp/photos/", "/tmp/link"});
   EXPECT_THAT(answer.Names(), ElementsAre(kTop));
   EXPECT_EQ(answer.totals.numbers.photos, 1);
 }
@@ -168,12 +168,12 @@ TEST_F(DirectoryLines, NamesAreAbsoluteAndNormalized) {
   WriteFile(kPhotoQueue, std::string(kTop) + "\n");
   ProgramOptions options;
   options.workingDirectory = kTop;
-  const StatusText answer = AskForText({".", "below/"}, options);
+  const StatusText answer = QueryText({".", "below/"}, options);
   EXPECT_THAT(answer.Names(), ElementsAre(kTop, In("below")));
   EXPECT_EQ(answer.directories.at(0).queued, "yes");
   for (const char* name : {"/tmp/photos///", "/tmp//photos", "/tmp/photos/.", "/tmp/./photos/",
                            "/tmp/photos/below/.."}) {
-    const StatusText same = AskForText({name});
+    const StatusText same = QueryText({name});
     EXPECT_THAT(same.Names(), ElementsAre(kTop)) << name;
     EXPECT_EQ(same.totals.queued, "1") << name;
   }
@@ -182,13 +182,13 @@ TEST_F(DirectoryLines, NamesAreAbsoluteAndNormalized) {
 TEST_F(DirectoryLines, ALinkKeepsItsOwnName) {
   MakePhoto(In("a.jpg"));
   ASSERT_EQ(symlink(kTop, "/tmp/link"), 0);
-  const StatusText answer = AskForText({"/tmp/link/"});
+  const StatusText answer = QueryText({"/tmp/link/"});
   EXPECT_THAT(answer.Names(), ElementsAre("/tmp/link"));
   EXPECT_EQ(answer.totals.numbers.photos, 1);
 }
 
-TEST_F(DirectoryLines, TheRootDirectoryCanBeAskedFor) {
-  EXPECT_THAT(AskForText({"/"}).Names(), ElementsAre("/"));
+TEST_F(DirectoryLines, TheRootDirectoryCanBeChecked) {
+  EXPECT_THAT(QueryText({"/"}).Names(), ElementsAre("/"));
 }
 
 TEST_F(DirectoryLines, AMissingDirectoryIsAnErrorAndTheRestIsReported) {

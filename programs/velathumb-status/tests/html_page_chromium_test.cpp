@@ -95,10 +95,10 @@ TEST_F(HtmlPageInBrowser, WithoutAThumbThereAreNoPictures) {
 
 TEST_F(HtmlPageInBrowser, APortraitPictureStaysInItsBox) {
   WritePage({{"/photos", false, {WithPicture(CompletePhoto("a.jpg"), 60, 120)}}});
-  EXPECT_THAT(AskPage(kPage, {"all('.pic img')[0].getBoundingClientRect().height<="
-                              "all('.pic')[0].getBoundingClientRect().height",
-                              "all('.pic')[0].getBoundingClientRect().height<"
-                              "all('.pic')[0].getBoundingClientRect().width"}),
+  EXPECT_THAT(EvaluateInPage(kPage, {"all('.pic img')[0].getBoundingClientRect().height<="
+                                     "all('.pic')[0].getBoundingClientRect().height",
+                                     "all('.pic')[0].getBoundingClientRect().height<"
+                                     "all('.pic')[0].getBoundingClientRect().width"}),
               ElementsAre("true", "true"));
 }
 
@@ -117,10 +117,10 @@ TEST_F(HtmlPageInBrowser, StatesHaveTheirColours) {
 TEST_F(HtmlPageInBrowser, TheReasonOfAFailureIsReadable) {
   WriteFullPage();
   const std::vector<std::string> answers =
-      AskPage(kPage, {kLayOutAll, "all('.tile.failed .note')[0].innerText",
-                      "all('.tile.failed .note').every(n=>n.clientHeight>0&&n.scrollHeight<="
-                      "n.clientHeight+1&&n.getBoundingClientRect().bottom<="
-                      "n.parentElement.getBoundingClientRect().bottom)"});
+      EvaluateInPage(kPage, {kLayOutAll, "all('.tile.failed .note')[0].innerText",
+                             "all('.tile.failed .note').every(n=>n.clientHeight>0&&n.scrollHeight<="
+                             "n.clientHeight+1&&n.getBoundingClientRect().bottom<="
+                             "n.parentElement.getBoundingClientRect().bottom)"});
   EXPECT_THAT(answers[1], HasSubstr(PercentEncoded("XL\u00a0(1280×1280)")));
   EXPECT_EQ(answers[2], "true");
 }
@@ -130,10 +130,10 @@ TEST_F(HtmlPageInBrowser, ThePartsOfTheBarAreAsWideAsTheirShares) {
   PhotoReport other = WithState(CompletePhoto("b.jpg"), ThumbState::kNotWanted, AllSizes());
   WritePage({{"/photos", false, {photo, other}}});
   const std::string width = "getBoundingClientRect().width";
-  EXPECT_THAT(AskPage(kPage, {"Math.abs(all('.bar .present')[0]." + width +
-                                  "/all('.bar .missing')[0]." + width + "-4)<0.1",
-                              "Math.abs(all('.bar .failed')[0]." + width +
-                                  "/all('.bar .missing')[0]." + width + "-1)<0.1"}),
+  EXPECT_THAT(EvaluateInPage(kPage, {"Math.abs(all('.bar .present')[0]." + width +
+                                         "/all('.bar .missing')[0]." + width + "-4)<0.1",
+                                     "Math.abs(all('.bar .failed')[0]." + width +
+                                         "/all('.bar .missing')[0]." + width + "-1)<0.1"}),
               ElementsAre("true", "true"));
 }
 
@@ -142,19 +142,19 @@ TEST_F(HtmlPageInBrowser, NothingIsWiderThanAPhone) {
   const std::string tooWide =
       "all('body *').filter(e=>e.getBoundingClientRect().right>360.5)"
       ".map(e=>e.outerHTML.slice(0,80)).join()";
-  EXPECT_THAT(AskPage(kPage,
-                      {kLayOutAll, "view.innerWidth", "doc.documentElement.scrollWidth",
-                       "doc.body.scrollWidth", tooWide},
-                      kPhone),
+  EXPECT_THAT(EvaluateInPage(kPage,
+                             {kLayOutAll, "view.innerWidth", "doc.documentElement.scrollWidth",
+                              "doc.body.scrollWidth", tooWide},
+                             kPhone),
               ElementsAre("undefined", "360", "360", "360", ""));
 }
 
 TEST_F(HtmlPageInBrowser, APhoneShowsPhotosSideBySide) {
   WriteFullPage();
-  EXPECT_THAT(AskPage(kPage,
-                      {"view.getComputedStyle(all('.grid')[0]).gridTemplateColumns.split"
-                       "(' ').length"},
-                      kPhone),
+  EXPECT_THAT(EvaluateInPage(kPage,
+                             {"view.getComputedStyle(all('.grid')[0]).gridTemplateColumns.split"
+                              "(' ').length"},
+                             kPhone),
               ElementsAre("2"));
 }
 
@@ -166,7 +166,7 @@ TEST_F(HtmlPageInBrowser, TheColoursFollowThePreferredScheme) {
   EXPECT_EQ(dark.At(2, 2), 0x10141au);
 }
 
-/// Whether all texts have the contrast of 4.5 to their background that WCAG asks for.
+/// Whether all texts have the contrast of 4.5 to their background that WCAG requires.
 constexpr const char* kLeastContrast =
     "(()=>{const parts=c=>c.match(/[\\d.]+/g).map(Number);"
     "const light=c=>parts(c).slice(0,3).map(v=>v/255).map(v=>v<=0.03928?v/12.92:"
@@ -180,8 +180,8 @@ constexpr const char* kLeastContrast =
 
 TEST_F(HtmlPageInBrowser, TextsHaveEnoughContrast) {
   WriteFullPage();
-  EXPECT_THAT(AskPage(kPage, {kLeastContrast}, kDesktop), ElementsAre("true"));
-  EXPECT_THAT(AskPage(kPage, {kLeastContrast}, kDarkDesktop), ElementsAre("true"));
+  EXPECT_THAT(EvaluateInPage(kPage, {kLeastContrast}, kDesktop), ElementsAre("true"));
+  EXPECT_THAT(EvaluateInPage(kPage, {kLeastContrast}, kDarkDesktop), ElementsAre("true"));
 }
 
 TEST_F(HtmlPageInBrowser, PhotosCanBeFiltered) {
@@ -191,8 +191,8 @@ TEST_F(HtmlPageInBrowser, PhotosCanBeFiltered) {
   const auto choose = [](const std::string& id) {
     return "doc.getElementById('" + id + "').click()";
   };
-  EXPECT_THAT(AskPage(kPage, {shown, choose("show-work"), shown, choose("show-failed"), shown,
-                              choose("show-all"), shown}),
+  EXPECT_THAT(EvaluateInPage(kPage, {shown, choose("show-work"), shown, choose("show-failed"),
+                                     shown, choose("show-all"), shown}),
               ElementsAre("5", "undefined", "4", "undefined", "2", "undefined", "5"));
 }
 
@@ -230,7 +230,7 @@ TEST_F(HtmlPageInBrowser, HostileNamesAreShownAndRunNothing) {
     expected.push_back(PercentEncoded(shown));
     expected.push_back(PercentEncoded(shown));
   }
-  EXPECT_EQ(AskPage(kPage, expressions), expected);
+  EXPECT_EQ(EvaluateInPage(kPage, expressions), expected);
   EXPECT_THAT(DocumentAfterLoading(kPage), HasSubstr("<title>Thumbnail status</title>"));
 }
 
@@ -243,20 +243,20 @@ TEST_F(HtmlPageInBrowser, APageWithTwoThousandPhotosIsShown) {
     WriteFile(ThumbOf(photos.back(), kS), picture + std::string(3000, 'x') + std::to_string(i));
   }
   WritePage({{"/photos", false, photos}});
-  EXPECT_THAT(AskPage(kPage,
-                      {"all('.tile').length",
-                       "all('img').filter(i=>i.complete&&i.naturalWidth===120).length",
-                       "doc.documentElement.scrollWidth"},
-                      kPhone),
+  EXPECT_THAT(EvaluateInPage(kPage,
+                             {"all('.tile').length",
+                              "all('img').filter(i=>i.complete&&i.naturalWidth===120).length",
+                              "doc.documentElement.scrollWidth"},
+                             kPhone),
               ElementsAre("2000", "2000", "360"));
   EXPECT_GT(QuadrantPixelsIn(TakeScreenshot(kPage, kPhone), 'R'), 2000);
 }
 
-TEST_F(HtmlPageInBrowser, AThumbThatIsNoPictureIsToldByItsName) {
+TEST_F(HtmlPageInBrowser, AThumbThatIsNotAnImageIsShownAsItsName) {
   const PhotoReport photo = CompletePhoto("broken.jpg");
   WriteFile(ThumbOf(photo, kS), ThumbBytes("no picture"));
   WritePage({{"/photos", false, {photo}}});
-  EXPECT_THAT(AskPage(kPage, {"all('img')[0].naturalWidth", "all('img')[0].alt"}),
+  EXPECT_THAT(EvaluateInPage(kPage, {"all('img')[0].naturalWidth", "all('img')[0].alt"}),
               ElementsAre("0", PercentEncoded("Thumbnail of broken.jpg")));
 }
 

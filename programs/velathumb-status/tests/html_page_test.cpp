@@ -162,7 +162,7 @@ TEST_F(HtmlPageTest, AnEmptyShareHasNoPart) {
                               "<span class=\"present\" style=\"flex-grow:6\"></span></div>"));
 }
 
-TEST_F(HtmlPageTest, VideosThatWereNotAskedForAreNotShown) {
+TEST_F(HtmlPageTest, UncheckedVideosAreNotShown) {
   EXPECT_THAT(PageOfPhotos({CompletePhoto("a.jpg")}), Not(HasSubstr("ideos")));
 }
 
@@ -282,7 +282,7 @@ TEST_F(HtmlPageTest, SizesThatFailedAtTheSameTimeAreGrouped) {
   EXPECT_EQ(CountOf("Could not be made", TileOf(photo)), 2u);
 }
 
-TEST_F(HtmlPageTest, APhotoOfWhichEverySizeFailedCouldNotBeConverted) {
+TEST_F(HtmlPageTest, APhotoWhoseSizesAllFailedCouldNotBeConverted) {
   PhotoReport photo = WithState(Missing(AllSizes()), ThumbState::kNotWanted, {kSM});
   photo = WithFailures(WithFailures(photo, AllSizes(), kTime + 100), {kB}, kTime);
   photo.failures[kSM].reset();

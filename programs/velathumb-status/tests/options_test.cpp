@@ -33,7 +33,7 @@ TEST_F(CommandLine, PrintsItsVersion) {
   EXPECT_THAT(result.out, MatchesRegex("velathumb-status [0-9]+\\.[0-9]+\\.[0-9]+\n"));
 }
 
-TEST_F(CommandLine, WrongUseIsReportedOnStandardError) {
+TEST_F(CommandLine, InvalidArgumentsAreReportedOnStandardError) {
   const struct {
     std::vector<std::string> arguments;
     std::string message;
@@ -103,7 +103,7 @@ TEST_F(CommandLine, ADirectoryMayHaveAnyName) {
   EXPECT_TRUE(IsRegularFile("/tmp/odd/[page]"));
 }
 
-TEST_F(CommandLine, SeveralQuestionsAreAllAnswered) {
+TEST_F(CommandLine, SeveralReportsAreAllPrinted) {
   MakePhoto(In("a.jpg"));
   WriteFile(kVideoQueue, "/tmp/film.mp4\n");
   const ProgramResult result = RunStatus({"--queue", "--progress", "--resume-time", kTop});
@@ -113,14 +113,14 @@ TEST_F(CommandLine, SeveralQuestionsAreAllAnswered) {
                     HasSubstr("conversion is not paused")));
 }
 
-TEST_F(CommandLine, OneAnswerWithWorkIsEnoughAndAnErrorTakesPrecedence) {
+TEST_F(CommandLine, OneReportWithWorkIsEnoughAndAnErrorTakesPrecedence) {
   WriteFile(kPhotoQueue, "/tmp/a\n");
   EXPECT_EQ(RunStatus({"--queue", "--progress", kTop}).exitCode, 1);
   EXPECT_EQ(RunStatus({"--progress", kTop}).exitCode, 0);
   EXPECT_EQ(RunStatus({"--queue", "/tmp/none"}).exitCode, 2);
 }
 
-TEST_F(CommandLine, AFullOutputIsAnErrorForEveryQuestion) {
+TEST_F(CommandLine, AFullOutputIsAnErrorForEveryReport) {
   const Descriptor full(open("/dev/full", O_WRONLY | O_CLOEXEC));
   ASSERT_TRUE(full.IsOpen());
   const std::vector<std::vector<std::string>> questions = {

@@ -23,7 +23,7 @@ class PageOption : public StatusTest {
     MakeDirectories("/tmp/page");
   }
 
-  /// A page that cannot be written is reported before the scan: there is no answer.
+  /// A page that cannot be written is reported before the scan; directories are not reported.
   static void ExpectRefused(const std::string& page, const std::string& message) {
     ProgramOptions options;
     options.timeLimit = std::chrono::seconds(20);
@@ -38,7 +38,7 @@ class PageOption : public StatusTest {
   }
 };
 
-TEST_F(PageOption, WritesThePageBesideTheAnswer) {
+TEST_F(PageOption, WritesThePageBesideTheReport) {
   const ProgramResult result = RunStatus({"--html", kPage, kTop});
   EXPECT_EQ(result.exitCode, 1);
   EXPECT_EQ(result.err, "");
@@ -72,7 +72,7 @@ TEST_F(PageOption, VideosAreNotCheckedForARefusedPage) {
   EXPECT_FALSE(Exists(thumb));
 }
 
-TEST_F(PageOption, OtherQuestionsAreAnsweredBesideARefusedPage) {
+TEST_F(PageOption, OtherReportsAreMadeWithoutARefusedPage) {
   const ProgramResult result = RunStatus({"--html", "/dev/null", "--json", "--queue", kTop});
   EXPECT_EQ(result.exitCode, 2);
   const Json::Value answer = ReadJson(result.out);
@@ -91,7 +91,7 @@ TEST_F(PageOption, APhotoThatCannotBeLookedUpIsAnErrorAndUnknownOnThePage) {
   const std::string page = ReadFile(kPage);
   EXPECT_THAT(page, HasSubstr("<strong class=\"mark\">Unknown</strong>"));
   EXPECT_THAT(page, HasSubstr("<bdi>deep.jpg</bdi>"));
-  const Json::Value answer = AskForJson({dir});
+  const Json::Value answer = QueryJson({dir});
   EXPECT_EQ(answer["totals"]["photos"], Json::Value(1));
   EXPECT_EQ(answer["errors"][0]["path"], Json::Value(photo));
 }

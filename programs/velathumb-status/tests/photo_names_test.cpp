@@ -1,4 +1,4 @@
-// The photos that lack something, named.
+// The names of incomplete photos.
 #include <algorithm>
 
 #include "status_fixture.h"
@@ -11,12 +11,14 @@ using namespace ::testing;
 class PhotoNames : public StatusTest {
  protected:
   static std::vector<std::string> Named() {
-    const StatusText answer = AskForText({"--photos", kTop});
+    const StatusText answer = QueryText({"--photos", kTop});
     EXPECT_EQ(answer.directories.size(), 1U);
     return answer.directories.empty() ? std::vector<std::string>() : answer.directories[0].photos;
   }
 
-  static void AskForSizeSOnly() { WriteFile("/etc/velainfo.conf", "photo_thumb_size_map=\"1\"\n"); }
+  static void RequestSizeSOnly() {
+    WriteFile("/etc/velainfo.conf", "photo_thumb_size_map=\"1\"\n");
+  }
 };
 
 TEST_F(PhotoNames, AreThoseOfIncompletePhotosOnly) {
@@ -27,9 +29,9 @@ TEST_F(PhotoNames, AreThoseOfIncompletePhotosOnly) {
                                             "bare.jpg: missing S, SM, M, B, L, XL"));
 }
 
-TEST_F(PhotoNames, AreLeftOutUnlessAskedFor) {
+TEST_F(PhotoNames, AreOmittedUnlessRequested) {
   MakePhotoWith("bare.jpg", 0);
-  EXPECT_THAT(AskForText({kTop}).directories.at(0).photos, IsEmpty());
+  EXPECT_THAT(QueryText({kTop}).directories.at(0).photos, IsEmpty());
 }
 
 TEST_F(PhotoNames, ComeWithWhatIsOutdated) {
@@ -65,21 +67,21 @@ TEST_F(PhotoNames, MarkersOfPresentThumbsAreNotFailures) {
     WriteFile(Derived("a.jpg", marker), "");
   }
   EXPECT_THAT(Named(), ElementsAre("a.jpg: missing M, L; outdated XL; failed M, XL"));
-  EXPECT_EQ(AskForText({kTop}).totals.numbers, (StatusNumbers{1, 1, 3, 3, 2}));
-  const Json::Value answer = AskForJson({"--photos", kTop});
+  EXPECT_EQ(QueryText({kTop}).totals.numbers, (StatusNumbers{1, 1, 3, 3, 2}));
+  const Json::Value answer = QueryJson({"--photos", kTop});
   EXPECT_EQ(answer["totals"]["failure_markers"], Json::Value(2));
   EXPECT_THAT(Texts(answer["directories"][0]["photo_list"][0]["failed"]), ElementsAre("M", "XL"));
 }
 
 TEST_F(PhotoNames, MarkersOfSizesThatAreNotWantedAreNotFailures) {
-  AskForSizeSOnly();
+  RequestSizeSOnly();
   MakePhotoWith("a.jpg", 0);
   WriteFile(Derived("a.jpg", "VELAPHOTO_THUMB_B.fail"), "");
   EXPECT_THAT(Named(), ElementsAre("a.jpg: missing S"));
 }
 
 TEST_F(PhotoNames, AreSorted) {
-  AskForSizeSOnly();
+  RequestSizeSOnly();
   std::vector<std::string> expected;
   for (const char* name : {"B", "a", "\xc3\xa4", "c 10", "c 9", "Z", "0"}) {
     MakePhotoWith(std::string(name) + ".jpg", 0);
@@ -101,14 +103,14 @@ TEST_F(PhotoNames, ComeWithOutdatedThumbsUnderOlderNames) {
 TEST_F(PhotoNames, FollowTheirDirectory) {
   MakePhoto("/tmp/one/a.jpg");
   MakePhoto("/tmp/two/b.jpg");
-  const StatusText answer = AskForText({"-p", "/tmp/one", "/tmp/two"});
+  const StatusText answer = QueryText({"-p", "/tmp/one", "/tmp/two"});
   ASSERT_EQ(answer.directories.size(), 2U);
   EXPECT_THAT(answer.directories[0].photos, ElementsAre("a.jpg: missing S, SM, M, B, L, XL"));
   EXPECT_THAT(answer.directories[1].photos, ElementsAre("b.jpg: missing S, SM, M, B, L, XL"));
 }
 
 TEST_F(PhotoNames, OddNamesStayOnOneLine) {
-  AskForSizeSOnly();
+  RequestSizeSOnly();
   MakePhotoWith("new\nline\x01\\\xfe.jpg", 0);
   EXPECT_THAT(Named(), ElementsAre("new\\nline\\x01\\\\\xfe.jpg: missing S"));
 }

@@ -28,42 +28,42 @@ void MakePidFile(pid_t pid) {
   WriteFile("/var/run/velathumb." + std::to_string(pid) + ".pid", "");
 }
 
-class ProgressAnswer : public SandboxTest {
+class ProgressCountersTest : public SandboxTest {
  protected:
-  static std::string Ask() {
+  static std::string Query() {
     const ProgramResult result = RunStatus({"--progress"});
     EXPECT_EQ(result.err, "");
     return result.out;
   }
 };
 
-TEST_F(ProgressAnswer, IsTheSummaryOfTheLog) {
+TEST_F(ProgressCountersTest, IsTheSummaryOfTheLog) {
   AddConvProgress(THUMB_TYPE_PHOTO, "total", 40);
   AddConvProgress(THUMB_TYPE_PHOTO, "completed", 10);
   AddConvProgress(THUMB_TYPE_PHOTO, "total_thumb", 300);
   AddConvProgress(THUMB_TYPE_PHOTO, "completed_thumb", 100);
   AddConvProgress(THUMB_TYPE_VIDEO, "total", 3);
   AddConvProgress(THUMB_TYPE_VIDEO, "completed", 3);
-  const std::string answer = Ask();
+  const std::string answer = Query();
   EXPECT_EQ(answer, LoggedSummary() + kNotRunning);
   EXPECT_THAT(answer, AllOf(HasSubstr("total_photo: 40, complete_photo: 10, progress: 0.25\n"),
                             HasSubstr("total_thumb: 300, complete_thumb: 100, progress: 0.33\n"),
                             HasSubstr("total_video: 3, complete_video: 3, progress: 1.00\n")));
 }
 
-TEST_F(ProgressAnswer, WithoutTotalsTheShareIsZero) {
+TEST_F(ProgressCountersTest, WithoutTotalsTheShareIsZero) {
   AddConvProgress(THUMB_TYPE_PHOTO, "completed", 7);
-  const std::string answer = Ask();
+  const std::string answer = Query();
   EXPECT_EQ(answer, LoggedSummary() + kNotRunning);
   EXPECT_THAT(answer, HasSubstr("total_photo: 0, complete_photo: 7, progress: 0.00\n"));
 }
 
-TEST_F(ProgressAnswer, DoesNotMakeTheFiles) {
-  EXPECT_EQ(Ask(), LoggedSummary() + kNotRunning);
+TEST_F(ProgressCountersTest, DoesNotMakeTheFiles) {
+  EXPECT_EQ(Query(), LoggedSummary() + kNotRunning);
   EXPECT_THAT(ListDirectory("/var/spool"), IsEmpty());
 }
 
-TEST_F(ProgressAnswer, IsWorkUntilEachCounterReachesItsTotal) {
+TEST_F(ProgressCountersTest, IsWorkUntilEachCounterReachesItsTotal) {
   EXPECT_EQ(RunStatus({"--progress"}).exitCode, 0);
   const struct {
     int kind;
@@ -83,30 +83,30 @@ TEST_F(ProgressAnswer, IsWorkUntilEachCounterReachesItsTotal) {
   }
 }
 
-TEST_F(ProgressAnswer, NamesTheRunningInstance) {
+TEST_F(ProgressCountersTest, NamesTheRunningInstance) {
   RunningConversion conversion;
-  EXPECT_THAT(Ask(), EndsWith("\nvelathumb is running, process " +
-                              std::to_string(conversion.Pid()) + "\n"));
+  EXPECT_THAT(Query(), EndsWith("\nvelathumb is running, process " +
+                                std::to_string(conversion.Pid()) + "\n"));
   conversion.Finish();
-  EXPECT_THAT(Ask(), EndsWith(kNotRunning));
+  EXPECT_THAT(Query(), EndsWith(kNotRunning));
 }
 
-TEST_F(ProgressAnswer, IgnoresStalePidFiles) {
+TEST_F(ProgressCountersTest, IgnoresStalePidFiles) {
   const Program stranger = StartProgram("/usr/bin/sleep", {"60"});
   MakePidFile(stranger.Pid());
   MakePidFile(4000000);
   WriteFile("/var/run/velathumb.word.pid", "");
   WriteFile("/var/run/other.1.pid", "");
-  EXPECT_THAT(Ask(), EndsWith(kNotRunning));
+  EXPECT_THAT(Query(), EndsWith(kNotRunning));
   EXPECT_EQ(ListDirectory("/run").size(), 4U);
 }
 
-TEST_F(ProgressAnswer, JsonHasTheDocumentedMembers) {
+TEST_F(ProgressCountersTest, JsonHasTheDocumentedMembers) {
   AddConvProgress(THUMB_TYPE_PHOTO, "total", 40);
   AddConvProgress(THUMB_TYPE_PHOTO, "completed", 10);
   AddConvProgress(THUMB_TYPE_PHOTO, "total_thumb", 300);
   AddConvProgress(THUMB_TYPE_VIDEO, "completed", 2);
-  const Json::Value answer = AskForJson({"--progress"});
+  const Json::Value answer = QueryJson({"--progress"});
   EXPECT_THAT(answer.getMemberNames(), UnorderedElementsAre("format", "progress", "errors"));
   const Json::Value progress = answer["progress"];
   EXPECT_THAT(progress.getMemberNames(),
@@ -128,17 +128,17 @@ TEST_F(ProgressAnswer, JsonHasTheDocumentedMembers) {
   EXPECT_EQ(progress["instances"], Json::Value(Json::arrayValue));
 }
 
-TEST_F(ProgressAnswer, JsonNamesTheRunningInstance) {
+TEST_F(ProgressCountersTest, JsonNamesTheRunningInstance) {
   RunningConversion conversion;
   MakePidFile(4000000);
-  const Json::Value instances = AskForJson({"--progress"})["progress"]["instances"];
+  const Json::Value instances = QueryJson({"--progress"})["progress"]["instances"];
   ASSERT_EQ(instances.size(), 1U);
   EXPECT_EQ(instances[0].asInt(), conversion.Pid());
 }
 
-TEST_F(ProgressAnswer, AnInvalidNumberCountsAsZero) {
+TEST_F(ProgressCountersTest, AnInvalidNumberCountsAsZero) {
   WriteFile(kPhotoFile, "total=\"many\"\ncompleted=\"99999999999999\"\n");
-  const Json::Value photo = AskForJson({"--progress"})["progress"]["photo"];
+  const Json::Value photo = QueryJson({"--progress"})["progress"]["photo"];
   ExpectMembers(photo, R"({"total": 0, "completed": 2147483647})");
   EXPECT_EQ(photo["ratio"].asDouble(), 0);
 }

@@ -11,19 +11,19 @@ namespace {
 
 using namespace ::testing;
 
-/// The queue files in the order of the answer.
+/// The queue files in the order of the report.
 constexpr const char* kFiles[] = {kPhotosInProgress, kPhotoQueue, kVideosInProgress, kVideoQueue};
 
-/// One queue of the text answer.
+/// One queue of the text report.
 struct QueueText {
   std::string heading;
   std::vector<std::string> entries;
   std::string count;
 };
 
-/// Asks for the queues. Headings begin at the left margin; the last line of each queue is its
+/// Requests the queues. Headings begin at the left margin; the last line of each queue is its
 /// count.
-std::vector<QueueText> AskForQueues() {
+std::vector<QueueText> QueryQueues() {
   std::vector<QueueText> queues;
   std::istringstream in(RunStatus({"--queue"}).out);
   for (std::string line; std::getline(in, line);) {
@@ -52,9 +52,9 @@ std::vector<std::string> PathsOf(const Json::Value& queue) {
   return paths;
 }
 
-class QueueAnswer : public SandboxTest {};
+class QueueListTest : public SandboxTest {};
 
-TEST_F(QueueAnswer, ListsTheFourFilesEntriesInProgressFirst) {
+TEST_F(QueueListTest, ListsTheFourFilesEntriesInProgressFirst) {
   WriteFile(kPhotosInProgress, "/tmp/in work\n");
   WriteFile(kPhotoQueue, "/tmp/waiting\nR:/tmp/tree\n");
   WriteFile(kVideosInProgress, "/tmp/a.mp4\n/tmp/b.mp4\n/tmp/c.mp4\n");
@@ -69,7 +69,7 @@ TEST_F(QueueAnswer, ListsTheFourFilesEntriesInProgressFirst) {
        "3 entries"},
       {"video queue /var/spool/flv_create.queue", {}, "0 entries"},
   };
-  const std::vector<QueueText> queues = AskForQueues();
+  const std::vector<QueueText> queues = QueryQueues();
   for (size_t i = 0; i < 4; ++i) {
     EXPECT_EQ(queues[i].heading, expected[i].heading);
     EXPECT_EQ(queues[i].entries, expected[i].entries);
@@ -77,7 +77,7 @@ TEST_F(QueueAnswer, ListsTheFourFilesEntriesInProgressFirst) {
   }
 }
 
-TEST_F(QueueAnswer, AnyEntryOfAnyFileIsWork) {
+TEST_F(QueueListTest, AnyEntryOfAnyFileIsWork) {
   EXPECT_EQ(RunStatus({"--queue"}).exitCode, 0);
   for (const char* file : kFiles) {
     WriteFile(file, "/tmp/a\n");
@@ -88,25 +88,25 @@ TEST_F(QueueAnswer, AnyEntryOfAnyFileIsWork) {
   }
 }
 
-TEST_F(QueueAnswer, SkipsBlankAndTooLongLines) {
+TEST_F(QueueListTest, SkipsBlankAndTooLongLines) {
   const std::string longest = "/" + std::string(4093, 'd');
   WriteFile(kPhotoQueue, "\n\n" + longest + "\n/" + std::string(4094, 'x') + "\n\n/tmp/last");
-  const QueueText queue = AskForQueues()[1];
+  const QueueText queue = QueryQueues()[1];
   EXPECT_THAT(queue.entries, ElementsAre(longest, "/tmp/last"));
   EXPECT_EQ(queue.count, "2 entries");
   WriteFile(kPhotoQueue, "\n\n\n");
   EXPECT_EQ(RunStatus({"--queue"}).exitCode, 0);
 }
 
-TEST_F(QueueAnswer, OddBytesStayOnOneLine) {
+TEST_F(QueueListTest, OddBytesStayOnOneLine) {
   WriteFile(kPhotoQueue, "/tmp/tab\t\\ \x1b[31m\xff\n");
-  EXPECT_THAT(AskForQueues()[1].entries, ElementsAre("/tmp/tab\\x09\\\\ \\x1b[31m\xff"));
+  EXPECT_THAT(QueryQueues()[1].entries, ElementsAre("/tmp/tab\\x09\\\\ \\x1b[31m\xff"));
 }
 
-TEST_F(QueueAnswer, JsonHasTheDocumentedMembers) {
+TEST_F(QueueListTest, JsonHasTheDocumentedMembers) {
   WriteFile(kPhotosInProgress, "/tmp/in work\n");
   WriteFile(kVideoQueue, "R:/tmp/films\n/tmp/\"a\\.mp4\n");
-  const Json::Value answer = AskForJson({"--queue"});
+  const Json::Value answer = QueryJson({"--queue"});
   EXPECT_THAT(answer.getMemberNames(), UnorderedElementsAre("format", "queues", "errors"));
   const Json::Value queues = answer["queues"];
   ASSERT_EQ(queues.size(), 4U);
@@ -124,13 +124,13 @@ TEST_F(QueueAnswer, JsonHasTheDocumentedMembers) {
   EXPECT_THAT(PathsOf(queues[3]), ElementsAre("R:/tmp/films", "/tmp/\"a\\.mp4"));
 }
 
-TEST_F(QueueAnswer, JsonHasOddEntriesExactly) {
+TEST_F(QueueListTest, JsonHasOddEntriesExactly) {
   WriteFile(kPhotoQueue, "/tmp/\xff\n");
-  EXPECT_EQ(AskForJson({"--queue"})["queues"][1]["entries"][0],
+  EXPECT_EQ(QueryJson({"--queue"})["queues"][1]["entries"][0],
             ReadJson("{\"path\": \"/tmp/\xef\xbf\xbd\", \"path_base64\": \"L3RtcC//\"}"));
 }
 
-TEST_F(QueueAnswer, AnUnreadableFileIsAnErrorAndTheOthersAreListed) {
+TEST_F(QueueListTest, AnUnreadableFileIsAnErrorAndTheOthersAreListed) {
   WriteFile(kPhotosInProgress, "/tmp/secret\n");
   WriteFile(kPhotoQueue, "/tmp/waiting\n");
   ASSERT_EQ(chmod(kPhotosInProgress, 0), 0);
@@ -139,7 +139,7 @@ TEST_F(QueueAnswer, AnUnreadableFileIsAnErrorAndTheOthersAreListed) {
   EXPECT_THAT(result.out, HasSubstr("    /tmp/waiting\n"));
 }
 
-TEST_F(QueueAnswer, AFifoOrDirectoryIsAnErrorAtOnceAndTheOthersAreListed) {
+TEST_F(QueueListTest, AFifoOrDirectoryIsAnErrorAtOnceAndTheOthersAreListed) {
   ASSERT_EQ(mkfifo(kPhotosInProgress, 0666), 0);
   MakeDirectories(kVideosInProgress);
   WriteFile(kPhotoQueue, "/tmp/waiting\n");

@@ -14,16 +14,16 @@ namespace {
 
 using namespace ::testing;
 
-class TreeAnswer : public StatusTest {
+class TreeStatusTest : public StatusTest {
  protected:
-  static StatusText Ask(std::vector<std::string> arguments = {kTop}) {
+  static StatusText Query(std::vector<std::string> arguments = {kTop}) {
     arguments.insert(arguments.begin(), "--recursive");
     const ProgramResult result = RunStatus(arguments);
     EXPECT_EQ(result.err, "");
     return ReadStatusText(result.out);
   }
 
-  /// What the library reports for the tree.
+  /// The counts of the library for the tree.
   static PhotoWork LibraryWork(const std::string& dir = kTop) {
     PhotoWork work;
     EXPECT_EQ(GetDirThumbStatusRecursive(dir.c_str(), &work.photos, &work.thumbs), 0);
@@ -31,69 +31,69 @@ class TreeAnswer : public StatusTest {
   }
 };
 
-TEST_F(TreeAnswer, HasALineForEachDirectory) {
+TEST_F(TreeStatusTest, HasALineForEachDirectory) {
   MakePhoto(In("a.jpg"));
   MakePhoto(In("one/a.jpg"));
   MakePhoto(In("one/deep/a.jpg"));
   MakePhoto(In("one/deep/b.jpg"));
   MakeDirectories(In("empty"));
-  const StatusText answer = Ask();
+  const StatusText answer = Query();
   EXPECT_THAT(answer.Names(), UnorderedElementsAre(kTop, In("one"), In("one/deep"), In("empty")));
   EXPECT_EQ(answer.totals.numbers, (StatusNumbers{4, 4, 0, 24, 0}));
   EXPECT_EQ(answer.totals.name, "in 4 directories");
 }
 
-TEST_F(TreeAnswer, ListsADirectoryBeforeWhatIsBelowIt) {
+TEST_F(TreeStatusTest, ListsADirectoryBeforeWhatIsBelowIt) {
   MakeDirectories(In("one/deep"));
-  EXPECT_THAT(Ask().Names(), ElementsAre(kTop, In("one"), In("one/deep")));
+  EXPECT_THAT(Query().Names(), ElementsAre(kTop, In("one"), In("one/deep")));
 }
 
-TEST_F(TreeAnswer, SkipsNamesThatAreNotIndexed) {
+TEST_F(TreeStatusTest, SkipsNamesThatAreNotIndexed) {
   for (const char* name : {".hidden", "@eaDir", "@tmp", "#recycle", "lost+found", "good/@eaDir"}) {
     MakePhoto(In(name) + "/a.jpg");
   }
-  const StatusText answer = Ask();
+  const StatusText answer = Query();
   EXPECT_THAT(answer.Names(), UnorderedElementsAre(kTop, In("good")));
   EXPECT_EQ(answer.totals.numbers.photos, 0);
 }
 
-TEST_F(TreeAnswer, SkipsOtherFileSystems) {
+TEST_F(TreeStatusTest, SkipsOtherFileSystems) {
   const SmallVolume volume(In("other"), 1 << 20);
   MakePhoto(In("other/a.jpg"));
   MakePhoto(In("same/a.jpg"));
-  EXPECT_THAT(Ask().Names(), UnorderedElementsAre(kTop, In("same")));
-  EXPECT_THAT(Ask({In("other")}).Names(), ElementsAre(In("other")));
+  EXPECT_THAT(Query().Names(), UnorderedElementsAre(kTop, In("same")));
+  EXPECT_THAT(Query({In("other")}).Names(), ElementsAre(In("other")));
 }
 
-TEST_F(TreeAnswer, CountsALoopOfLinksOnce) {
+TEST_F(TreeStatusTest, CountsALoopOfLinksOnce) {
   MakePhoto(In("one/a.jpg"));
   ASSERT_EQ(symlink(kTop, In("one/up").c_str()), 0);
   ASSERT_EQ(symlink(".", In("self").c_str()), 0);
-  const StatusText answer = Ask();
+  const StatusText answer = Query();
   EXPECT_THAT(answer.Names(), UnorderedElementsAre(kTop, In("one")));
   EXPECT_EQ(answer.totals.numbers.photos, 1);
   EXPECT_EQ(LibraryWork(), (PhotoWork{1, 6}));
 }
 
-TEST_F(TreeAnswer, CountsNestedAndRepeatedRootsOnce) {
+TEST_F(TreeStatusTest, CountsNestedAndRepeatedRootsOnce) {
   MakePhoto(In("a.jpg"));
   MakePhoto(In("one/a.jpg"));
   MakePhoto(In("one/deep/a.jpg"));
-  const StatusText down = Ask({kTop, In("one"), kTop});
+  const StatusText down = Query({kTop, In("one"), kTop});
   EXPECT_THAT(down.Names(), UnorderedElementsAre(kTop, In("one"), In("one/deep")));
   EXPECT_EQ(down.totals.numbers.photos, 3);
-  const StatusText up = Ask({In("one/deep"), kTop});
+  const StatusText up = Query({In("one/deep"), kTop});
   EXPECT_THAT(up.Names(), UnorderedElementsAre(kTop, In("one"), In("one/deep")));
   EXPECT_EQ(up.totals.numbers.photos, 3);
 }
 
-TEST_F(TreeAnswer, AgreesWithTheLibraryWithoutQueuedDirectories) {
+TEST_F(TreeStatusTest, AgreesWithTheLibraryWithoutQueuedDirectories) {
   for (const char* name : {"a.jpg", "one/a.jpg", "one/b.jpg", "one/deep/a.jpg", "two/a.jpg"}) {
     MakePhoto(In(name));
   }
   MakeThumbs(In("two"), "a.jpg", kBitS | kBitM);
   WriteFile(kPhotoQueue, In("one") + "\n" + In("none") + "\nR:" + In("two") + "\n");
-  const StatusText answer = Ask();
+  const StatusText answer = Query();
   EXPECT_EQ(answer.totals.numbers, (StatusNumbers{5, 5, 2, 28, 0}));
   EXPECT_EQ(answer.totals.queued, "1");
   PhotoWork free = {0, 0};
@@ -108,12 +108,12 @@ TEST_F(TreeAnswer, AgreesWithTheLibraryWithoutQueuedDirectories) {
   EXPECT_EQ(free, (PhotoWork{3, 16}));
 }
 
-TEST_F(TreeAnswer, JsonTotalsWithoutQueuedDirectoriesAgreeWithTheLibrary) {
+TEST_F(TreeStatusTest, JsonTotalsWithoutQueuedDirectoriesAgreeWithTheLibrary) {
   for (const char* name : {"a.jpg", "one/a.jpg", "one/b.jpg", "one/deep/a.jpg"}) {
     MakePhoto(In(name));
   }
   WriteFile(kPhotosInProgress, In("one") + "\n");
-  const Json::Value totals = AskForJson({"-r", kTop})["totals"];
+  const Json::Value totals = QueryJson({"-r", kTop})["totals"];
   const PhotoWork work = LibraryWork();
   EXPECT_EQ(work, (PhotoWork{2, 12}));
   EXPECT_EQ(totals["incomplete_photos"].asInt() - totals["queued"]["incomplete_photos"].asInt(),
@@ -122,7 +122,7 @@ TEST_F(TreeAnswer, JsonTotalsWithoutQueuedDirectoriesAgreeWithTheLibrary) {
             work.thumbs);
 }
 
-TEST_F(TreeAnswer, AnUnreadableDirectoryIsAnErrorAndTheRestIsReported) {
+TEST_F(TreeStatusTest, AnUnreadableDirectoryIsAnErrorAndTheRestIsReported) {
   MakePhoto(In("a.jpg"));
   MakePhoto(In("closed/a.jpg"));
   MakePhoto(In("open/a.jpg"));
@@ -132,18 +132,18 @@ TEST_F(TreeAnswer, AnUnreadableDirectoryIsAnErrorAndTheRestIsReported) {
   EXPECT_EQ(ReadStatusText(result.out).totals.numbers, (StatusNumbers{2, 2, 0, 12, 0}));
 }
 
-TEST_F(TreeAnswer, AnUnreadableRootIsAnError) {
+TEST_F(TreeStatusTest, AnUnreadableRootIsAnError) {
   ASSERT_EQ(chmod(kTop, 0), 0);
   ExpectError(RunStatusAsOrdinaryUser({"-r", kTop}), "/tmp/photos: cannot be opened");
 }
 
-TEST_F(TreeAnswer, ATreeWhoseSubdirectoriesCannotBeExaminedIsAnError) {
+TEST_F(TreeStatusTest, ATreeWhoseSubdirectoriesCannotBeExaminedIsAnError) {
   MakePhoto(In("below/a.jpg"));
   ASSERT_EQ(chmod(kTop, 0444), 0);
   ExpectError(RunStatusAsOrdinaryUser({"-r", kTop}), "/tmp/photos: Permission denied");
 }
 
-TEST_F(TreeAnswer, ARootThatIsSkippedBecauseOfItsNameIsAnError) {
+TEST_F(TreeStatusTest, ARootThatIsSkippedBecauseOfItsNameIsAnError) {
   MakePhoto("/tmp/@eaDir/a.jpg");
   MakePhoto(In("a.jpg"));
   const ProgramResult result = RunStatus({"-r", "/tmp/@eaDir", kTop});
@@ -151,7 +151,7 @@ TEST_F(TreeAnswer, ARootThatIsSkippedBecauseOfItsNameIsAnError) {
   EXPECT_THAT(ReadStatusText(result.out).Names(), ElementsAre(kTop));
 }
 
-TEST_F(TreeAnswer, AMissingRootAndAFileAreErrors) {
+TEST_F(TreeStatusTest, AMissingRootAndAFileAreErrors) {
   MakePhoto(In("a.jpg"));
   const ProgramResult result = RunStatus({"-r", "/tmp/none", In("a.jpg"), kTop});
   ExpectError(result,
@@ -160,7 +160,7 @@ TEST_F(TreeAnswer, AMissingRootAndAFileAreErrors) {
   EXPECT_THAT(ReadStatusText(result.out).Names(), ElementsAre(kTop));
 }
 
-TEST_F(TreeAnswer, DirectoriesTooDeepForAPathAreErrorsAndTheRestIsReported) {
+TEST_F(TreeStatusTest, DirectoriesTooDeepForAPathAreErrorsAndTheRestIsReported) {
   MakePhoto("/tmp/other/a.jpg");
   // 11 bytes and 201 for each level: the twentieth is the last that a path can reach.
   const DeepTree tree(kTop, std::string(200, 'd'), 25, "a.jpg");
@@ -179,7 +179,7 @@ TEST_F(TreeAnswer, DirectoriesTooDeepForAPathAreErrorsAndTheRestIsReported) {
   EXPECT_EQ(answer.totals.numbers.photos, 21);
 }
 
-TEST_F(TreeAnswer, AWalkThatEndsEarlyIsAnError) {
+TEST_F(TreeStatusTest, AWalkThatEndsEarlyIsAnError) {
   std::string path = kTop;
   for (int level = 0; level < 40; ++level) {
     path += "/d";
@@ -194,7 +194,7 @@ TEST_F(TreeAnswer, AWalkThatEndsEarlyIsAnError) {
   EXPECT_EQ(ReadStatusText(result.out).Names().front(), kTop);
 }
 
-TEST_F(TreeAnswer, RelativeRootsAreResolved) {
+TEST_F(TreeStatusTest, RelativeRootsAreResolved) {
   MakePhoto(In("below/a.jpg"));
   ProgramOptions options;
   options.workingDirectory = In("below");
@@ -203,15 +203,15 @@ TEST_F(TreeAnswer, RelativeRootsAreResolved) {
     EXPECT_EQ(result.err, "") << name;
     EXPECT_EQ(ReadStatusText(result.out).totals.numbers.photos, 1) << name;
   }
-  EXPECT_THAT(Ask({"/tmp/photos/."}).Names(), ElementsAre(kTop, In("below")));
-  EXPECT_THAT(Ask({"/tmp//photos//"}).Names(), ElementsAre(kTop, In("below")));
+  EXPECT_THAT(Query({"/tmp/photos/."}).Names(), ElementsAre(kTop, In("below")));
+  EXPECT_THAT(Query({"/tmp//photos//"}).Names(), ElementsAre(kTop, In("below")));
 }
 
-TEST_F(TreeAnswer, ListsPhotosOfEachDirectory) {
+TEST_F(TreeStatusTest, ListsPhotosOfEachDirectory) {
   WriteFile("/etc/velainfo.conf", "photo_thumb_size_map=\"16\"\n");
   MakePhoto(In("a.jpg"));
   MakePhoto(In("one/b.jpg"));
-  const StatusText answer = Ask({"--photos", kTop});
+  const StatusText answer = Query({"--photos", kTop});
   ASSERT_THAT(answer.Names(), ElementsAre(kTop, In("one")));
   EXPECT_THAT(answer.directories[0].photos, ElementsAre("a.jpg: missing XL"));
   EXPECT_THAT(answer.directories[1].photos, ElementsAre("b.jpg: missing XL"));

@@ -1,4 +1,4 @@
-// A velathumb that runs for as long as a test needs it.
+// A velathumb that runs as long as a test requires.
 #pragma once
 
 #include <sys/types.h>
@@ -17,7 +17,7 @@ class RunningConversion {
 
   pid_t Pid() const { return program_->Pid(); }
 
-  /// Lets the converter go on and waits for the end of the run.
+  /// Lets the converter continue and waits for the end of the run.
   void Finish();
 
  private:

@@ -20,7 +20,7 @@ void MakePhotoWith(const std::string& name, int sizes) {
   MakeThumbs(kTop, name, sizes);
 }
 
-StatusText AskForText(const std::vector<std::string>& arguments, const ProgramOptions& options) {
+StatusText QueryText(const std::vector<std::string>& arguments, const ProgramOptions& options) {
   return ReadStatusText(RunStatus(arguments, options).out);
 }
 

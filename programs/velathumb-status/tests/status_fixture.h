@@ -1,4 +1,4 @@
-// What most tests of the program share: its answers, photos with thumbnails, and a place for them.
+// What most tests of the program share: its reports, and a directory of photos with thumbnails.
 #pragma once
 
 #include <gmock/gmock.h>
@@ -37,9 +37,9 @@ std::string Derived(const std::string& media, const std::string& name);
 /// Makes a photo in kTop with thumbnails of these sizes (bits of the size map).
 void MakePhotoWith(const std::string& name, int sizes);
 
-/// The text answer to these arguments.
-StatusText AskForText(const std::vector<std::string>& arguments,
-                      const ProgramOptions& options = ProgramOptions());
+/// The text report for these arguments.
+StatusText QueryText(const std::vector<std::string>& arguments,
+                     const ProgramOptions& options = ProgramOptions());
 
 /// Fails the test unless the run ended with status 2 and this message only.
 void ExpectError(const ProgramResult& result, const std::string& message);

@@ -91,7 +91,7 @@ Json::Value ReadJson(const std::string& text) {
   return answer;
 }
 
-Json::Value AskForJson(std::vector<std::string> arguments) {
+Json::Value QueryJson(std::vector<std::string> arguments) {
   arguments.insert(arguments.begin(), "--json");
   return ReadJson(RunStatus(arguments).out);
 }

@@ -26,8 +26,8 @@ ProgramOptions WithOutputAt(int descriptor);
 /// Reads one JSON object; fails the test when the text is anything else or not valid UTF-8.
 Json::Value ReadJson(const std::string& text);
 
-/// Runs it with --json and these arguments, and reads its answer; fails the test when that is not
+/// Runs it with --json and these arguments, and parses its output; fails the test when that is not
 /// one JSON object.
-Json::Value AskForJson(std::vector<std::string> arguments);
+Json::Value QueryJson(std::vector<std::string> arguments);
 
 }  // namespace vela_test

@@ -1,4 +1,4 @@
-// The text answer about directories, read column by column.
+// The text report about directories, parsed column by column.
 #pragma once
 
 #include <cstdint>
@@ -28,7 +28,7 @@ struct StatusLine {
   std::vector<std::string> photos;
 };
 
-/// A whole answer.
+/// A whole report.
 struct StatusText {
   std::vector<StatusLine> directories;
   StatusLine totals;
@@ -37,7 +37,7 @@ struct StatusText {
   std::vector<std::string> Names() const;
 };
 
-/// Reads the answer; fails the test when the text is anything else.
+/// Parses the report; fails the test when the text is anything else.
 StatusText ReadStatusText(const std::string& text);
 
 }  // namespace vela_test

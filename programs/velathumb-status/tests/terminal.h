@@ -11,7 +11,7 @@ class Terminal {
  public:
   explicit Terminal(int columns);
 
-  /// The side a program has as its standard output.
+  /// The side that a program uses as its standard output.
   int ProgramSide() const { return programSide_.Get(); }
 
   /// Waits until `text` has been written, at most `milliseconds`; returns whether it was.

@@ -77,7 +77,7 @@ class UnchangedFiles : public StatusTest {
   }
 };
 
-TEST_F(UnchangedFiles, AreLeftByEveryQueryWithoutQueuesAndProgress) {
+TEST_F(UnchangedFiles, RemainAfterEveryQueryWithoutQueuesAndProgress) {
   const std::vector<FileState> before = AllFiles();
   RunEveryQuery();
   RunStatus({"--watch"});
@@ -85,7 +85,7 @@ TEST_F(UnchangedFiles, AreLeftByEveryQueryWithoutQueuesAndProgress) {
   EXPECT_THAT(ListDirectory("/var/spool"), IsEmpty());
 }
 
-TEST_F(UnchangedFiles, AreLeftByEveryQueryWithQueuesAndProgress) {
+TEST_F(UnchangedFiles, RemainAfterEveryQueryWithQueuesAndProgress) {
   for (const char* queue : {kPhotoQueue, kPhotosInProgress, kVideoQueue, kVideosInProgress}) {
     WriteFile(queue, "/tmp/photos\nR:/tmp/photos/below\n");
   }
@@ -98,14 +98,14 @@ TEST_F(UnchangedFiles, AreLeftByEveryQueryWithQueuesAndProgress) {
   EXPECT_EQ(AllFiles(), before);
 }
 
-TEST_F(UnchangedFiles, AreLeftWhileAnInstanceRuns) {
+TEST_F(UnchangedFiles, RemainWhileAnInstanceRuns) {
   const RunningConversion conversion;
   const std::vector<FileState> before = AllFiles();
   RunEveryQuery();
   EXPECT_EQ(AllFiles(), before);
 }
 
-TEST_F(UnchangedFiles, AreLeftByAPageInAnotherPlace) {
+TEST_F(UnchangedFiles, RemainAfterAPageIsWrittenElsewhere) {
   MakeThumbs("/tmp/photos/below", "b.jpg", kBitS);
   const std::vector<FileState> before = AllFiles();
   const std::string page = "/dev/shm/page.html";
@@ -118,7 +118,7 @@ TEST_F(UnchangedFiles, AreLeftByAPageInAnotherPlace) {
   EXPECT_EQ(AllFiles(), before);
 }
 
-TEST_F(UnchangedFiles, AreLeftBesideAPage) {
+TEST_F(UnchangedFiles, RemainBesideAPage) {
   RunStatus({"--html", "/tmp/photos/page.html", "-r", "/tmp/photos"});
   const std::vector<std::string> tree = ListTree("/tmp/photos");
   const FileState photo = StateOf("/tmp/photos/a.jpg");

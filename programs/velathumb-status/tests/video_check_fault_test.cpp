@@ -30,7 +30,8 @@ class VideoCheckFault : public SandboxTest {
     WriteFile(kVideoQueue, std::string(kVideo) + "\n");
   }
 
-  /// Asks in every way; each time there is this one message and nothing is removed.
+  /// Requests the check in every way; expects only this message each time, and that nothing is
+  /// removed.
   static void ExpectNothingChecked(const std::string& message) {
     const std::vector<std::string> before = ListTree("/tmp");
     const ProgramResult directory = RunStatus({"--check-videos", kTop});
@@ -93,7 +94,7 @@ TEST_F(VideoCheckFault, WithoutTheVideoLibraryNothingIsRemoved) {
   ExpectChecked();
 }
 
-TEST_F(VideoCheckFault, OtherQuestionsNeedNoVideoLibrary) {
+TEST_F(VideoCheckFault, OtherReportsNeedNoVideoLibrary) {
   const MissingLibrary missing("libavformat");
   const ProgramResult result = RunStatus({"--queue", "--progress", "--resume-time", "-rp", kTop});
   EXPECT_EQ(result.exitCode, 1);
