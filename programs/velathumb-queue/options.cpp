@@ -78,7 +78,7 @@ ParseOutcome ParseOptions(int argc, char** argv, RunSettings& settings) {
   return IsUsable(settings.velathumb.path, FileAccess::kExecute) &&
                  IsUsable(settings.velathumb.profileFile, FileAccess::kRead)
              ? ParseOutcome::kRun
-             : ParseOutcome::kWrong;
+             : ParseOutcome::kUsageError;
 }
 
 }  // namespace vela

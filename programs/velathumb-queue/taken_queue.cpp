@@ -113,7 +113,7 @@ bool TakenQueue::ReadEntries() {
       entries_.push_back(entry);
     }
   });
-  return read == QueueRead::kWhole;
+  return read == QueueRead::kComplete;
 }
 
 TakenQueue::Outcome TakenQueue::Take() {
@@ -163,7 +163,7 @@ int TakenQueue::RequeueDeferred() {
       error = VLIBCErrGet();
     }
   });
-  if (read != QueueRead::kWhole) {
+  if (read != QueueRead::kComplete) {
     return errno == ENOENT ? 0 : errno;
   }
   return error != 0 ? error : RemoveFileIfPresent(paths_.later);

@@ -37,7 +37,7 @@ int64_t ReadQueue(const QueueFile& queue, const ScanErrorHandler& onError,
       visit(entry);
     }
   });
-  if (read != QueueRead::kWhole && errno != ENOENT) {
+  if (read != QueueRead::kComplete && errno != ENOENT) {
     onError(queue.path, std::strerror(errno));
   }
   return count;

@@ -15,31 +15,31 @@ std::vector<std::string> ArgumentsOf(int argc, char** argv) {
 
 ParseOutcome ParseCommandLine(const ProgramText& text, std::vector<std::string> arguments,
                               const std::function<void(CLI::App&)>& addOptions,
-                              const std::function<std::string(const CLI::App&)>& findMistake) {
+                              const std::function<std::string(const CLI::App&)>& findConflict) {
   CLI::App app(text.description, text.name);
   app.footer(text.footer);
   addOptions(app);
   app.set_version_flag("--version", std::string(text.name) + " " VELA_VERSION);
-  // The library takes them from the last to the first.
+  // The library expects them in reverse order.
   std::reverse(arguments.begin(), arguments.end());
   try {
     app.parse(std::move(arguments));
   } catch (const CLI::ParseError& error) {
-    return app.exit(error) == 0 ? ParseOutcome::kDone : ParseOutcome::kWrong;
+    return app.exit(error) == 0 ? ParseOutcome::kDone : ParseOutcome::kUsageError;
   }
-  const std::string mistake = findMistake ? findMistake(app) : std::string();
-  if (mistake.empty()) {
+  const std::string conflict = findConflict ? findConflict(app) : std::string();
+  if (conflict.empty()) {
     return ParseOutcome::kRun;
   }
-  WriteLog(LogLevel::kError, mistake + "; see --help");
-  return ParseOutcome::kWrong;
+  WriteLog(LogLevel::kError, conflict + "; see --help");
+  return ParseOutcome::kUsageError;
 }
 
 void ReportException(const char* message) noexcept {
   try {
     WriteLog(LogLevel::kError, message);
   } catch (...) {
-    // Too little memory even for the message: the exit status has to do.
+    // Not enough memory for the message: the exit status has to suffice.
   }
 }
 

@@ -2,8 +2,8 @@
 
 #include "platform/velaindex.h"
 #include "platform/velautils.h"
-#include "posix/cut_text.h"
 #include "posix/files.h"
+#include "posix/truncated_text.h"
 
 using namespace vela;
 
@@ -37,7 +37,7 @@ void AddTempPathDefine(const PhotoConvertJob& job, VELAUtils::ProcessRunner& run
     return;
   }
   const std::string define = "registry:temporary-path=" + job.settings.front().outDir;
-  runner.addArguments("-define", CutText(define).c_str());
+  runner.addArguments("-define", Truncated(define).c_str());
 }
 
 void AddThumbOptions(VELAUtils::ProcessRunner& runner, const PhotoThumbSetting& setting) {

@@ -10,8 +10,8 @@ class ProcessRunner;
 }
 
 /// Returns a unique name in the directory of `destPath`, with its extension, under which the
-/// converter writes the thumbnail; no file of that name is left. When none can be made, returns the
-/// bare template.
+/// converter writes the thumbnail; the file does not exist on return. Returns the bare template
+/// when no name can be created.
 std::string MakeTempOutputPath(const std::string& destPath);
 
 /// Appends the option that keeps the converter's scratch files in the output directory; nothing for

@@ -12,7 +12,7 @@ namespace vela {
 /// Path of the image converter.
 inline constexpr char kConvertToolPath[] = "/usr/vela/bin/convert-thumb";
 
-/// Bytes that a thumbnail has at least: a converter that fails early can leave a single one.
+/// Smallest size of a thumbnail in bytes: a converter that fails early can leave a single byte.
 inline constexpr int64_t kSmallestThumb = 2;
 
 }  // namespace vela

@@ -7,9 +7,9 @@
 /// Describes one output of a converter run. Lengths are in pixels, angles in degrees clockwise.
 struct PhotoThumbSetting {
   std::string srcPath;        ///< the source photo
-  std::string destPath;       ///< where the finished thumbnail goes
+  std::string destPath;       ///< path of the finished thumbnail
   std::string outDir;         ///< directory of the thumbnail and of the converter's scratch files
-  std::string tempPath;       ///< where the converter writes, set when added to a job
+  std::string tempPath;       ///< path that the converter writes to, set when added to a job
   bool fillArea = false;      ///< fill the box instead of fitting into it
   int32_t width = 320;        ///< box width
   int32_t height = 320;       ///< box height

@@ -8,7 +8,7 @@ constexpr int kSetAccessAndModification = 3;
 
 }  // namespace
 
-void DateLikePhoto(const std::string& path, const VLIBCFileStatus& photo) {
+void CopyPhotoTime(const std::string& path, const VLIBCFileStatus& photo) {
   const VLIBCTime modified = {photo.modification.seconds, 0};
   const VLIBCFileTimes times = {modified, modified, photo.change};
   VLIBCFileUTime(path.c_str(), kSetAccessAndModification, &times);

@@ -1,4 +1,4 @@
-// The file status of photos, and files that take their times.
+// The file status of photos, and copying their times.
 #pragma once
 
 #include <string>
@@ -7,11 +7,11 @@
 
 namespace vela {
 
-/// Option of VLIBCFileStat with which photos are examined throughout.
+/// The option that is passed to VLIBCFileStat for all photos.
 inline constexpr int kPhotoStatusOptions = 9;
 
 /// Sets the access and modification time of `path` to the photo's modification time, in whole
 /// seconds. Failures are ignored.
-void DateLikePhoto(const std::string& path, const VLIBCFileStatus& photo);
+void CopyPhotoTime(const std::string& path, const VLIBCFileStatus& photo);
 
 }  // namespace vela

@@ -8,9 +8,9 @@
 #include "platform/velaindex.h"
 #include "platform/velautils.h"
 #include "platform/vlibc.h"
-#include "posix/cut_text.h"
 #include "posix/files.h"
 #include "posix/log.h"
+#include "posix/truncated_text.h"
 
 using namespace vela;
 
@@ -18,12 +18,12 @@ namespace {
 
 constexpr char kLogSource[] = "velamk_photo_thumb";
 
-/// Every service of the system may renew a thumbnail.
+/// Every service of the system may replace a thumbnail.
 constexpr unsigned kThumbMode = 0777;
 
 std::string InputArgument(const std::string& srcPath) {
   const bool firstPageOnly = BlVELAIndexIsMultiplePagePhotoFile(srcPath.c_str());
-  return CutText(firstPageOnly ? srcPath + "[0]" : srcPath);
+  return Truncated(firstPageOnly ? srcPath + "[0]" : srcPath);
 }
 
 void AddCommand(VELAUtils::ProcessRunner& runner, const PhotoConvertJob& job,
@@ -47,8 +47,8 @@ void RemoveTempOutputs(const PhotoConvertJob& job) {
   }
 }
 
-/// Returns true when the photo was written while it was converted. One figure alone may change
-/// without the content: allocation is settled late, and sparse files are filled in place.
+/// Returns true when the photo was written while it was converted. Either value alone may change
+/// without the content: blocks are allocated late, and sparse files are filled in place.
 bool IsSourceChanged(const VLIBCFileStatus& source, int64_t oldBlocks, int64_t oldSize) {
   return source.size != oldSize && source.blocks != oldBlocks;
 }
@@ -59,8 +59,7 @@ int64_t ThumbSize(const std::string& destPath) {
   return status ? status->size : 0;
 }
 
-/// Moves one output into place. Returns false when there is no usable output; nothing of it is left
-/// then.
+/// Moves one output into place. Returns false, and removes the output, when it is unusable.
 bool CommitOutput(const PhotoThumbSetting& setting, const VLIBCFileStatus& source, time_t now) {
   const std::string& temp = setting.tempPath;
   const std::string& dest = setting.destPath;
@@ -81,8 +80,8 @@ bool CommitOutput(const PhotoThumbSetting& setting, const VLIBCFileStatus& sourc
     return false;
   }
   if (now < source.modification.seconds) {
-    // A photo from the future would make every thumbnail of it look outdated.
-    DateLikePhoto(dest, source);
+    // A photo dated in the future would make all its thumbnails look outdated.
+    CopyPhotoTime(dest, source);
   }
   return true;
 }

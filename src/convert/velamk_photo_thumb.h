@@ -1,4 +1,4 @@
-// Runs a conversion job and commits its outputs. The chief header of this folder.
+// Runs a conversion job and commits its outputs. The main header of this folder.
 #pragma once
 
 #include <cstdint>

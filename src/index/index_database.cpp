@@ -40,7 +40,7 @@ FileDescriptor CreateNew(const std::string& path) {
   return FileDescriptor(open(path.c_str(), O_RDWR | O_CREAT | O_EXCL | O_CLOEXEC, kFileMode));
 }
 
-/// SQLite would create the file with a mode that depends on the umask. A failure shows when the
+/// SQLite would create the file with a mode that depends on the umask. A failure surfaces when the
 /// file is opened.
 void CreateFileIfMissing(const IndexFile& file) {
   FileDescriptor created = CreateNew(file.path);
@@ -148,7 +148,7 @@ int IndexDatabase::CreateTables(const IndexTables& tables) {
   if (code != SQLITE_OK) {
     return code;
   }
-  // Another process may have created them since the first look, possibly a newer program.
+  // Another process, possibly a newer program, may have created them since the first check.
   int version = 0;
   code = tables.readVersion(version);
   if (code == SQLITE_OK && version > tables.version) {

@@ -18,26 +18,26 @@ inline constexpr char kIndexDatabase[] = "/var/lib/velaindex/index.db";
 /// Where the database is, and how it is created when it is missing.
 struct IndexFile {
   std::string path;
-  std::optional<gid_t> group;   ///< of what is created; nothing: as the system sets it
-  bool createsParents = false;  ///< also creates the directories above the last one
-  /// Called with the path, the group and the errno value when what was created cannot be given the
-  /// group.
+  std::optional<gid_t> group;   ///< of created files; not set: the system's default
+  bool createsParents = false;  ///< also creates missing parent directories
+  /// Called with the path, the group and the errno value when the group of a created file or
+  /// directory cannot be set.
   std::function<void(const std::string& path, gid_t group, int error)> onGroupFailure = nullptr;
 };
 
 /// Creates the directory of the database when it is missing, accessible to its owner and group
-/// only, whatever the umask. A failure shows when the database is opened.
+/// only, whatever the umask. A failure surfaces when the database is opened.
 void CreateIndexDirectory(const IndexFile& file);
 
 /// The tables of one program. The programs count their versions independently.
 struct IndexTables {
   int version;           ///< 0 is a database without the tables
   const char* creation;  ///< SQL that creates the tables and stores their version
-  /// Reads the version that the database has. Returns an SQLite result code.
+  /// Reads the version of the tables. Returns an SQLite result code.
   std::function<int(int& version)> readVersion;
 };
 
-/// Not among SQLite's result codes: the tables are those of a newer program.
+/// Not an SQLite result code: a newer program has created the tables.
 inline constexpr int kNewerTables = -1;
 
 /// A connection to the database, for one thread at a time. Functions that return an int return an
@@ -50,12 +50,12 @@ class IndexDatabase {
   using Statement = std::unique_ptr<sqlite3_stmt, Finalize>;
 
   /// Opens the file in WAL mode. Creates it and its directory when missing, accessible to their
-  /// owner and group only, whatever the umask; what exists keeps its mode. This and all later
+  /// owner and group only, whatever the umask; existing ones keep their modes. This and all later
   /// operations wait up to `timeout` for the transactions of other connections.
   int Open(const IndexFile& file, std::chrono::milliseconds timeout);
 
-  /// Creates the tables unless the database has them. Returns kNewerTables, with the database as it
-  /// was, when their version is higher than this program's.
+  /// Creates the tables unless they exist. Returns kNewerTables, and changes nothing, when their
+  /// version is higher than this program's.
   int EnsureTables(const IndexTables& tables);
 
   /// Sets how long the operations that follow wait for the transactions of other connections.

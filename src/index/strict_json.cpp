@@ -76,8 +76,8 @@ size_t EndOfString(std::string_view text, size_t begin) {
   return at + 1;
 }
 
-/// Returns true when the text contains what JsonCpp accepts although it is not JSON: comments, and
-/// numbers such as 01 or a single minus sign.
+/// Returns true when the text contains extensions that JsonCpp accepts: comments, and numbers such
+/// as 01 or a single minus sign.
 bool HasExtensions(std::string_view text) {
   for (size_t at = 0; at < text.size();) {
     const char c = text[at];

@@ -1,4 +1,4 @@
-// JSON as single lines of text, read without extensions of the format.
+// JSON on single lines, parsed without extensions to the format.
 #pragma once
 
 #include <json/forwards.h>
@@ -8,7 +8,7 @@
 
 namespace vela {
 
-/// How a key is handled that occurs more than once in an object.
+/// How a repeated key in an object is handled.
 enum class DuplicateKeys {
   kLastWins,
   kRejected,  ///< the text is invalid
@@ -18,9 +18,8 @@ enum class DuplicateKeys {
 /// bytes, valid UTF-8 or not. Throws std::exception when the value cannot be written.
 std::string ToJsonText(const Json::Value& value);
 
-/// Reads `text`, which must be one whole JSON object with nothing but white space around it, into
-/// `object`. Strings may contain any bytes. Returns false for any other text. Throws only
-/// std::bad_alloc.
+/// Reads `text`, which must be a single JSON object with only white space around it, into `object`.
+/// Strings may contain any bytes. Returns false for any other text. Throws only std::bad_alloc.
 bool ReadJsonObject(std::string_view text, DuplicateKeys duplicates, Json::Value& object);
 
 }  // namespace vela

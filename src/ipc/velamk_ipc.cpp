@@ -29,7 +29,7 @@ Json::Value Member(const Json::Value& packet, const char* name) {
   return packet.isObject() ? packet[name] : Json::Value();
 }
 
-/// The JSON library throws on a value that it cannot convert; such an answer must not end the
+/// The JSON library throws on a value that it cannot convert; such a reply must not end the
 /// program.
 bool ToBool(const Json::Value& value) {
   return value.isConvertibleTo(Json::booleanValue) && value.asBool();
@@ -50,7 +50,7 @@ bool Exchange(Json::Value& packet, int line) {
   return false;
 }
 
-bool AskResult(const char* command, int line) {
+bool QuerySwitch(const char* command, int line) {
   Json::Value packet = MakeRequest(command);
   return Exchange(packet, line) && ToBool(Member(packet, "result"));
 }
@@ -77,11 +77,11 @@ int GetIndexVersion(const char* path) {
 }
 
 bool IsDisableConvertVideo() {
-  return AskResult("IS_DISABLE_CONVERT_VIDEO", 83);
+  return QuerySwitch("IS_DISABLE_CONVERT_VIDEO", 83);
 }
 
 bool IsDisableConvertPhoto() {
-  return AskResult("IS_DISABLE_CONVERT_PHOTO", 110);
+  return QuerySwitch("IS_DISABLE_CONVERT_PHOTO", 110);
 }
 
 void PostPhotoConvert(const char* path) {

@@ -1,23 +1,23 @@
-// Rules of the whole system that several programs go by.
+// System-wide constants that several programs share.
 #pragma once
 
 #include <cstdint>
 
 namespace vela {
 
-/// Name of the metadata directory that lies next to the photos.
+/// Name of the metadata directory next to the photos.
 inline constexpr char kMetadataDirName[] = "@eaDir";
 
-/// The system's settings, one `key="value"` a line.
+/// The system's settings, one `key="value"` per line.
 inline constexpr char kSettingsFile[] = "/etc/velainfo.conf";
 
-/// Setting: until when conversion is paused, seconds since the epoch.
+/// Setting: the time until which conversion is paused, in seconds since the epoch.
 inline constexpr char kResumeTimeKey[] = "thumb_conv_resume_time";
 
 /// Bytes that must be available on a volume before a photo on it is converted.
 inline constexpr uint64_t kLeastFreeSpace = uint64_t{1} << 30;
 
-/// Marks an argument or a queue entry as a directory with everything below it.
+/// Marks an argument or a queue entry as a directory tree.
 inline constexpr char kTreePrefix[] = "R:";
 
 /// Number of size classes of thumbnails.

@@ -29,7 +29,7 @@ struct VELA_RESOLUTION {
   int32_t height;
 };
 
-/// What a video's container states.
+/// Metadata of a video, from its container.
 struct _VIDEO_METADATA_ {  // NOLINT(bugprone-reserved-identifier)
   int32_t rotation;        ///< degrees clockwise: 0, 90, 180 or 270
   int32_t duration;        ///< seconds, rounded
@@ -43,7 +43,7 @@ const char* VELAIndexExtGet(const char* path);
 /// Returns true for the extension (any case) of a camera raw format.
 bool BlVELAIndexIsRawImage(const char* extension);
 
-/// Returns true when the file name or path is that of a photo the index treats as such.
+/// Returns true when the index treats a file of this name or path as a photo.
 bool BlVELAIndexIsPhotoOnWebFile(const char* path);
 
 /// Returns true when the file name or path is that of a photo that gets thumbnails.
@@ -52,7 +52,7 @@ bool BlVELAIndexIsPhotoOnWebConvertFile(const char* path);
 /// Returns true when the file name or path is that of a photo format with several pages or frames.
 bool BlVELAIndexIsMultiplePagePhotoFile(const char* path);
 
-/// Returns true when the file name or path is that of a video the index treats as such.
+/// Returns true when the index treats a file of this name or path as a video.
 bool BlVELAIndexIsVideoOnWebFile(const char* path);
 
 /// Returns 1 when directory entries called `name` (one path component) are to be indexed, else 0.
@@ -91,7 +91,7 @@ int GetEAFilePath(const char* path, const char* name, const char* oldName, char*
                   size_t outSize);
 
 /// Removes the derived file under both names from the metadata directory `eaDir`. Returns 0, or -1
-/// when one is there and cannot be removed.
+/// when an existing one cannot be removed.
 int RemoveEAFile(const char* eaDir, const char* name, const char* oldName);
 
 /// The same for the media file `path` itself.
@@ -105,24 +105,25 @@ int VELAIndexImgResGet(const char* path, uint32_t* width, uint32_t* height);
 /// untouched).
 int VELAIDX_GetMediaResolution(const char* path, VELA_RESOLUTION* resolution);
 
-/// Reads rotation, duration and bit rate of the video `path` from its container; what the container
-/// does not state is 0. Returns 0, or -1 (record untouched) when the file is not a readable video.
+/// Reads rotation, duration and bit rate of the video `path` from its container; values that the
+/// container lacks are 0. Returns 0, or -1 (record untouched) when the file is not a readable
+/// video.
 int VELAIDX_GetVideoMetadata(const char* path, _VIDEO_METADATA_* metadata);
 
-/// Returns whether browsers need a converted version of the video `path`: 0 when they play it as it
-/// is (H.264 with AAC or no sound in MP4; VP8, VP9 or AV1 in WebM), 1 for any other video, -1 when
-/// it cannot be read.
+/// Returns whether browsers need a converted version of the video `path`: 0 when they play it
+/// directly (H.264 with AAC or no sound in MP4; VP8, VP9 or AV1 in WebM), 1 for any other video, -1
+/// when it cannot be read.
 int VELAIDX_IsVideoNeedConvert(const char* path);
 
 /// Stores the size classes that the file `path` needs, as a bit mask. Returns 0, or -1 for an
 /// unknown kind (mask untouched).
 int VELAIDX_GetThumbSizeMap(const char* path, int kind, int32_t* sizeMap);
 
-/// Stores the size classes that the files of the directory `dir` need. Returns as
+/// Stores the size classes that the files of the directory `dir` need. Returns the same as
 /// VELAIDX_GetThumbSizeMap.
 int VELAIDX_GetDirThumbSizeMap(const char* dir, int kind, int32_t* sizeMap);
 
-/// Registers a made thumbnail of a photo with the index. `extra` is an empty object. Returns 0, or
+/// Registers a new thumbnail of a photo with the index. `extra` is an empty object. Returns 0, or
 /// -1.
 int VELAIDX_IndexConvertAdd(const VELA_MEDIA_INFO& photo, const VELA_MEDIA_INFO& thumbnail,
                             const Json::Value& extra);
@@ -131,9 +132,9 @@ int VELAIDX_IndexConvertAdd(const VELA_MEDIA_INFO& photo, const VELA_MEDIA_INFO&
 /// 0, or -1 (unwritable file, path with a newline).
 int WriteIndexQueue(const char* path, const char* queueFile);
 
-/// Sends `packet` to the Unix-domain socket at `socketPath` and replaces it by the reply object; by
-/// an empty object on any failure. The second argument is unused; `timeoutSeconds` limits the whole
-/// exchange. Returns 0, or -1.
+/// Sends `packet` to the Unix-domain socket at `socketPath` and replaces it with the reply object,
+/// or with an empty object on any failure. The second argument is unused; `timeoutSeconds` limits
+/// the whole exchange. Returns 0, or -1.
 int AutoSendRecvPacket(const char* socketPath, int unused, Json::Value& packet, int timeoutSeconds);
 
 /// Fills `out` from the daemon's media object; members that are missing, of another type or out of
@@ -146,8 +147,8 @@ int IsFileExist(const char* path, int regularOnly = 1);
 /// Returns 1 when a directory is at `path`, links followed.
 int IsDirExist(const char* path);
 
-/// Copies `in` to `out` (at most `outSize` bytes, always terminated) with every `%` doubled; what
-/// does not fit is cut, never between the two of a pair.
+/// Copies `in` to `out` (at most `outSize` bytes, always terminated) with every `%` doubled,
+/// truncated if necessary, but never within a pair.
 void EscapePercentSign(const char* in, char* out, size_t outSize);
 
 /// Removes white space at both ends of `text`, in place.

@@ -1,5 +1,5 @@
 // Core C library of the platform: key/value files, line search, file status and times, piped child
-// processes, ending processes by name, free space, and the error of the last failure.
+// processes, sending signals to processes by name, free space, and the error of the last failure.
 #pragma once
 
 #include <cstddef>
@@ -32,13 +32,13 @@ struct VLIBCFileTimes {
 };
 
 /// Copies the value of `key` in the key/value file `file` into `out` (at most `outSize` bytes,
-/// always terminated; a longer value is cut). `flags` is 0. Returns 1 when the key was found (also
-/// with an empty value), 0 when it is absent, -1 when the file cannot be read.
+/// always terminated; a longer value is truncated). `flags` is 0. Returns 1 when the key was found
+/// (also with an empty value), 0 when it is absent, -1 when the file cannot be read.
 int VLIBCFileGetKeyValue(const char* file, const char* key, char* out, size_t outSize, int flags);
 
 /// Sets `key` to `value` in the key/value file `file`, which is created when missing; readers see
 /// the old file or the new one. `flags` is 0. Returns 0, or -1 (unwritable file, or a key or value
-/// that one line cannot hold).
+/// that does not fit on one line).
 int VLIBCFileSetKeyValue(const char* file, const char* key, const char* value, int flags);
 
 /// Returns 1 when `key` is in the key/value file `file` with exactly `value`, else 0. `flags` is 0.
@@ -58,7 +58,7 @@ int VLIBCFileUTime(const char* path, int options, const VLIBCFileTimes* times);
 
 /// Starts `program` directly (no shell) with the arguments that follow `mode`, ended by a null
 /// pointer, and returns a stream of its standard output; with `E` in `mode` its standard error is
-/// joined in. Returns null when the program cannot be started.
+/// included. Returns null when the program cannot be started.
 FILE* VLIBCPopen(const char* program, const char* mode, ...) __attribute__((sentinel));
 
 /// Closes a stream of VLIBCPopen, waits for its child and returns the child's exit status, or -1
@@ -74,13 +74,13 @@ int VLIBCKill(const char* name, int signal);
 /// cannot be determined.
 uint64_t VLIBGetFsAvailSize(const char* path);
 
-/// Returns the code (an errno value) of the calling thread's last platform failure, 0 before any.
+/// Returns the code (an errno value) of the calling thread's last platform failure, 0 without one.
 int VLIBCErrGet(void);
 
-/// Returns the source file of the calling thread's last platform failure, "" before any.
+/// Returns the source file of the calling thread's last platform failure, "" without one.
 const char* VLIBCErrorGetFile(void);
 
-/// Returns the source line of the calling thread's last platform failure, 0 before any.
+/// Returns the source line of the calling thread's last platform failure, 0 without one.
 int VLIBCErrorGetLine(void);
 
 }  // extern "C"

@@ -14,7 +14,7 @@ std::optional<gid_t> FindGroup(const std::string& name);
 /// Returns the name of the user, or the number in decimal when the user has none. Not thread-safe.
 std::string UserName(uid_t user);
 
-/// Returns the user that this process acts as; 0 is root.
+/// Returns the effective user of this process; 0 is root.
 uid_t EffectiveUser();
 
 }  // namespace vela

@@ -40,9 +40,9 @@ struct ChildPlan {
   int error;
 };
 
-// From here to RunChild: the child before its program, on borrowed memory. System calls only.
+// From here to RunChild: runs in the child before exec, in the parent's memory. System calls only.
 
-/// No handler of the parent may run in the child, whose memory is the parent's.
+/// No handler of the parent may run in the child, which shares the parent's memory.
 void SetDefaultSignals(bool keepIgnored) {
   struct sigaction action;
   memset(&action, 0, sizeof(action));
@@ -57,8 +57,8 @@ void SetDefaultSignals(bool keepIgnored) {
   }
 }
 
-/// Copies `fd` out of the way of the standard descriptors; `fallback` is copied for one that is not
-/// open. Returns the copy, or -1 with errno set.
+/// Copies `fd` out of the way of the standard descriptors; if it is not open, copies `fallback`.
+/// Returns the copy, or -1 with errno set.
 int CopyAside(int fd, int fallback) {
   const int copy = fd < 0 ? -1 : fcntl(fd, F_DUPFD_CLOEXEC, kFirstOtherDescriptor);
   if (copy >= 0) {
@@ -114,8 +114,8 @@ bool UnblockSignals() {
 int BecomeProgram(const ChildPlan& plan) {
   const bool isAttached = plan.streams == nullptr;
   SetDefaultSignals(isAttached);
-  // The kernel sets this name only at the end of exec, after the parent has gone on: until then a
-  // search for the program's name would miss the child.
+  // The kernel sets this name only at the end of exec, when the parent is already running again:
+  // until then a search for the program's name would miss the child.
   prctl(PR_SET_NAME, plan.commandName);
   if (!EndWithParent(plan.parent)) {
     return errno;
@@ -246,7 +246,7 @@ bool AwaitChildFor(pid_t pid, std::chrono::seconds limit) {
   return AwaitByPolling(pid, deadline) == 0;
 }
 
-void EndOverdueChild(pid_t pid, const char* program, std::chrono::seconds limit) {
+void KillOverdueChild(pid_t pid, const char* program, std::chrono::seconds limit) {
   if (!HasEnded(pid)) {
     kill(pid, SIGKILL);
     LogError(std::string(program) + " has not ended within " + std::to_string(limit.count()) +

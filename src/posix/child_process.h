@@ -15,11 +15,11 @@ struct ChildStreams {
   int standardError = -1;
 };
 
-/// Starts `program` (no search, no shell) with these arguments, ended by a null pointer. The child
-/// reads /dev/null, has the two output descriptors and no other, default signal handling and its
-/// own process group, carries the command name of the program from its first instruction on, and
-/// gets SIGTERM when the calling thread ends before it. Returns 0 and stores the process id once
-/// the program itself runs, or returns an errno value. The child must be handed to ReapChild.
+/// Starts `program` (no PATH search, no shell) with these arguments, ended by a null pointer. The
+/// child reads /dev/null, has no descriptors besides the two outputs, default signal handling, its
+/// own process group and, from the start, the command name of the program. It gets SIGTERM when the
+/// calling thread ends before it. Returns 0 and stores the process id once the program itself runs,
+/// or returns an errno value. The child must be handed to ReapChild.
 int StartChild(const char* program, char* const arguments[], const ChildStreams& streams,
                pid_t& pid);
 
@@ -27,29 +27,29 @@ int StartChild(const char* program, char* const arguments[], const ChildStreams&
 /// inheritable descriptors, ignored signals and process group. Otherwise as StartChild.
 int StartAttachedChild(const char* program, char* const arguments[], pid_t& pid);
 
-/// Waits until the child has ended; its process id stays taken until ReapChild.
+/// Waits until the child has ended; its process id is not reused before ReapChild.
 void AwaitChild(pid_t pid);
 
 /// The same, but for at most `limit`. Returns whether the child has ended.
 bool AwaitChildFor(pid_t pid, std::chrono::seconds limit);
 
-/// Ends a child that has run beyond its time limit, with what it has started in its process group,
-/// and says so in the system log. Does no more than clean up after a child that has ended.
-void EndOverdueChild(pid_t pid, const char* program, std::chrono::seconds limit);
+/// Kills a child that has exceeded its time limit, with its process group, and logs that. Of a
+/// child that has ended, kills only the process group and logs nothing.
+void KillOverdueChild(pid_t pid, const char* program, std::chrono::seconds limit);
 
-/// Takes the ended child from the process table. Returns its wait status, or -1 when another part
-/// of the process has taken it.
+/// Waits for the child and reaps it. Returns its wait status, or -1 when another part of the
+/// process has reaped it.
 int ReapChild(pid_t pid);
 
 /// Does the same without waiting. Returns nothing while the child is running.
 std::optional<int> ReapEndedChild(pid_t pid);
 
-/// Takes ended children that this process has inherited from others from the process table, as the
-/// first process of a container has to. `isOwn` returns true for a child of its own, which is left
-/// to ReapEndedChild.
+/// Reaps ended children that this process has inherited, as the first process of a container has
+/// to. `isOwn` returns true for a child that this process has started, which is left to
+/// ReapEndedChild.
 void ReapInheritedChildren(const std::function<bool(pid_t)>& isOwn);
 
-/// Sends SIGTERM to the child alone, not to what it has started.
+/// Sends SIGTERM to the child alone, not to its descendants.
 void TerminateChild(pid_t pid);
 
 /// Returns whether a wait status is that of a program that exited with 0.

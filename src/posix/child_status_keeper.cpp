@@ -53,7 +53,7 @@ void ReleaseChildStatus() {
     return;
   }
   const struct sigaction set = WithStatus(g_replaced);
-  // A handler that the program has set meanwhile stays.
+  // A handler that the program has set in the meantime is kept.
   const bool isOurs = current.sa_handler == set.sa_handler && !IsIgnoring(current);
   if (isOurs) {
     sigaction(SIGCHLD, &g_replaced, nullptr);

@@ -4,7 +4,7 @@
 namespace vela {
 
 /// A process that ignores SIGCHLD, which it can inherit from its parent, gets no exit statuses of
-/// its children. Undoes that while a child is running; called once per child.
+/// its children. Prevents that while a child is running; called once per child.
 void KeepChildStatus();
 
 /// Ends the effect of one KeepChildStatus; the last one restores the previous setting.

@@ -9,7 +9,7 @@
 namespace vela {
 
 bool ChildWatchdog::Start(pid_t pid, const char* program, std::chrono::seconds limit) {
-  // The thread inherits the block: signals stay with the threads of the program.
+  // The thread inherits the block, so signals are delivered to the program's other threads.
   const SignalBlock noSignals;
   try {
     thread_ = std::thread(&ChildWatchdog::Watch, this, pid, std::string(program), limit);
@@ -36,7 +36,7 @@ void ChildWatchdog::Watch(pid_t pid, const std::string& program, std::chrono::se
   std::unique_lock<std::mutex> lock(mutex_);
   const bool isStopped = wakeUp_.wait_until(lock, deadline.End(), [this] { return isStopped_; });
   if (!isStopped) {
-    EndOverdueChild(pid, program.c_str(), limit);
+    KillOverdueChild(pid, program.c_str(), limit);
   }
 }
 

@@ -11,7 +11,7 @@
 
 namespace vela {
 
-/// Ends a child at its time limit from a thread of its own.
+/// Kills a child at its time limit, from a separate thread.
 class ChildWatchdog {
  public:
   ChildWatchdog() = default;
@@ -19,11 +19,11 @@ class ChildWatchdog {
   ChildWatchdog& operator=(const ChildWatchdog&) = delete;
   ~ChildWatchdog() { Stop(); }
 
-  /// Starts watching the child `pid`, whose program is named in the system log. Returns false when
-  /// no thread can be had.
+  /// Starts watching the child `pid`; `program` is its name in log messages. Returns false when no
+  /// thread can be started.
   bool Start(pid_t pid, const char* program, std::chrono::seconds limit);
 
-  /// Ends the watch. To be called before the child is reaped: until then its process id is not
+  /// Stops watching. Must be called before the child is reaped: until then its process id is not
   /// reused.
   void Stop();
 

@@ -10,7 +10,7 @@ class Deadline {
  public:
   using Clock = std::chrono::steady_clock;
 
-  /// Lies `limit` ahead.
+  /// Ends `limit` from now.
   explicit Deadline(std::chrono::seconds limit) : end_(Clock::now() + limit) {}
 
   Clock::time_point End() const { return end_; }

@@ -27,9 +27,9 @@ CopyResult CopyDescriptor(int from, int to) {
       return result;
     }
     if (written != count) {
-      result.end = CopyEnd::kWriteCut;
-      result.piece = count;
-      result.taken = written;
+      result.end = CopyEnd::kShortWrite;
+      result.chunk = count;
+      result.written = written;
       return result;
     }
     result.total += count;

@@ -1,4 +1,4 @@
-// Copying what a descriptor gives to another one.
+// Copying data from one descriptor to another.
 #pragma once
 
 #include <cstdint>
@@ -10,18 +10,18 @@ enum class CopyEnd {
   kComplete,
   kReadFailed,
   kWriteFailed,
-  kWriteCut,  ///< the system took only a part of a piece
+  kShortWrite,  ///< only a part of a chunk was written
 };
 
 struct CopyResult {
   CopyEnd end = CopyEnd::kComplete;
-  int64_t total = 0;  ///< bytes that were copied in full pieces
-  int error = 0;      ///< errno of a read or write that failed
-  int64_t piece = 0;  ///< bytes of the piece that was cut
-  int64_t taken = 0;  ///< bytes of it that were written
+  int64_t total = 0;    ///< bytes copied in complete chunks
+  int error = 0;        ///< errno of the failed read or write
+  int64_t chunk = 0;    ///< size of the incomplete chunk, bytes
+  int64_t written = 0;  ///< bytes of that chunk that were written
 };
 
-/// Copies everything from descriptor `from` to descriptor `to`, from and to their present
+/// Copies everything from descriptor `from` to descriptor `to`, starting at their current
 /// positions.
 CopyResult CopyDescriptor(int from, int to);
 

@@ -41,7 +41,8 @@ bool IsValidStart(unsigned char first, unsigned char second) {
   }
 }
 
-/// Returns the length of the UTF-8 character that `text` begins with, 0 when it begins with none.
+/// Returns the length of the UTF-8 character that `text` begins with, 0 when it does not begin with
+/// one.
 size_t CharacterLength(std::string_view text) {
   const size_t length = LengthByFirstByte(ByteAt(text, 0));
   if (length == 0 || text.size() < length) {

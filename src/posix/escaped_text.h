@@ -1,4 +1,4 @@
-// Text from elsewhere, made safe for a terminal or a line of a log.
+// Untrusted text, made safe for a terminal or a log line.
 #pragma once
 
 #include <string>
@@ -6,7 +6,7 @@
 
 namespace vela {
 
-/// What becomes of bytes that are not valid UTF-8. Those from 0x80 to 0x9f are always escaped: some
+/// How bytes that are not valid UTF-8 are handled. Those from 0x80 to 0x9f are always escaped: some
 /// terminals take them for control characters.
 enum class InvalidBytes { kKeep, kEscape };
 

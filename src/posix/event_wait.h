@@ -22,8 +22,8 @@ class EventWait {
   /// Returns 0 or an errno value.
   int Open(const std::string& watchedFile);
 
-  /// Waits for an event, at most for `timeout` when given. Of the events only the request to stop
-  /// is kept; the caller has to check for the others.
+  /// Waits for an event, at most for `timeout` when given. Only a request to stop is remembered;
+  /// the caller has to check for the other events.
   void Wait(std::optional<std::chrono::milliseconds> timeout);
 
   /// Returns whether SIGTERM or SIGINT was received.

@@ -12,7 +12,7 @@ namespace vela {
 /// or an errno value.
 int ReadChunk(int fd, char* chunk, size_t size, size_t& got);
 
-/// Returns `size` bytes from `offset`, or as many as can be read. Leaves the position as it is.
+/// Returns `size` bytes from `offset`, or as many as can be read. Does not change the position.
 std::string ReadAt(int fd, int64_t offset, size_t size);
 
 /// Moves the position to the beginning. Returns 0 or an errno value, ESPIPE for a pipe.
@@ -26,9 +26,9 @@ int ReadToEnd(int fd, std::string& content);
 /// value.
 int ReadFile(const char* path, std::string& content);
 
-/// Returns the content of the regular file `path`; empty for a symbolic link, for anything else
-/// than a regular file, for a file of more than `limit` bytes and after an error. Never waits for a
-/// pipe's writer.
+/// Returns the content of the regular file `path`; empty for a symbolic link, any other file that
+/// is not regular, a file of more than `limit` bytes, and on errors. Never waits for a pipe's
+/// writer.
 std::string ReadSmallFile(const std::string& path, size_t limit);
 
 /// Writes all of `content` to `fd`. Returns 0 or an errno value.

@@ -23,10 +23,10 @@ class FileDescriptor {
   int Get() const { return fd_; }
   bool IsOpen() const { return fd_ >= 0; }
 
-  /// Gives the descriptor away; the caller closes it.
+  /// Gives up ownership; the caller closes the descriptor.
   int Release() { return std::exchange(fd_, -1); }
 
-  /// Closes the descriptor, if any, and owns `fd` instead. Leaves errno as it is.
+  /// Closes the descriptor, if any, and owns `fd` instead. Preserves errno.
   void Reset(int fd = -1) {
     const int old = std::exchange(fd_, fd);
     if (old < 0 || old == fd) {
@@ -37,8 +37,7 @@ class FileDescriptor {
     errno = savedErrno;
   }
 
-  /// Closes the descriptor, if any. Returns false, with errno set, when data that was written may
-  /// be lost.
+  /// Closes the descriptor, if any. Returns false, with errno set, when written data may be lost.
   bool Close() {
     const int old = Release();
     return old < 0 || close(old) == 0;

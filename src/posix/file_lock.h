@@ -27,22 +27,22 @@ int LockFile(const std::string& path, FileDescriptor& lock);
 
 /// A file with an exclusive lock, and its state under the lock.
 struct LockedFile {
-  FileDescriptor file;  ///< the lock is released with it
+  FileDescriptor file;  ///< closing it releases the lock
   int64_t size = 0;     ///< bytes
   time_t modified = 0;  ///< time of the last modification
 };
 
 /// Opens the regular file `path` for reading and locks it exclusively, without waiting. Returns 0
 /// or an errno value: EWOULDBLOCK when another process holds a lock, EINVAL for anything but a
-/// regular file, ENOENT also when the file was renamed or removed before the lock was there.
+/// regular file, ENOENT also when the file was renamed or removed before it was locked.
 int LockFileAt(const std::string& path, LockedFile& locked);
 
 /// Returns true when another process holds an exclusive lock on the file or directory `path`; false
-/// when that cannot be opened.
+/// when it cannot be opened.
 bool IsLocked(const std::string& path);
 
 /// Opens the lock file `path`, created with mode 0644 when missing, and takes a lock that no child
-/// inherits: it is free as soon as this process ends. With `wait` waits for the present holder.
+/// inherits: it is released when this process ends. With `wait`, waits for the current holder.
 /// Returns the open file, or none with errno set: EAGAIN or EACCES when another process has the
 /// lock.
 FileDescriptor TakeProcessLock(const std::string& path, bool wait);

@@ -20,8 +20,8 @@ constexpr mode_t kNewFileMode = 0644;
 constexpr mode_t kPermissionBits = 07777;
 
 /// The new file while it is written, next to its target and under the same name for all writers, so
-/// that the next writer finds and removes what a killed one has left. Its lock distinguishes a dead
-/// writer from a living one.
+/// that the next writer finds and removes one left by a killed writer. Its lock shows whether its
+/// writer is still running.
 class ScratchFile {
  public:
   explicit ScratchFile(const std::string& target) : path_(target + ".replacement") {}
@@ -33,14 +33,14 @@ class ScratchFile {
     }
   }
 
-  /// Makes the file, empty and locked. Returns 0 or an errno value.
+  /// Creates the file, empty and locked. Returns 0 or an errno value.
   int Open();
 
   int Fd() const { return file_.Get(); }
   const struct stat& Status() const { return status_; }
   const char* Path() const { return path_.c_str(); }
 
-  /// The file has been renamed.
+  /// Called when the file has been renamed.
   void Forget() { file_.Reset(); }
 
  private:
@@ -104,7 +104,7 @@ int RenameToFreeName(const char* from, const char* to) {
   if (errno != EINVAL && errno != ENOSYS) {
     return errno;
   }
-  // A file system without that flag.
+  // The file system does not support that flag.
   if (link(from, to) != 0) {
     return errno;
   }
@@ -113,7 +113,7 @@ int RenameToFreeName(const char* from, const char* to) {
 
 }  // namespace
 
-int CreateWhole(const std::string& path, std::string_view content) {
+int CreateAtomically(const std::string& path, std::string_view content) {
   ScratchFile scratch(path);
   int error = scratch.Open();
   if (error != 0) {
@@ -133,7 +133,7 @@ int CreateWhole(const std::string& path, std::string_view content) {
   return error;
 }
 
-int ReplaceWhole(const std::string& path, std::string_view content, const struct stat& old) {
+int ReplaceAtomically(const std::string& path, std::string_view content, const struct stat& old) {
   ScratchFile scratch(path);
   int error = scratch.Open();
   if (error != 0) {

@@ -1,4 +1,4 @@
-// Whether a file is still as it was when it was read.
+// Detects changes of a file since it was read.
 #pragma once
 
 #include <sys/stat.h>
@@ -18,7 +18,7 @@ bool IsSameVersion(const struct stat& a, const struct stat& b);
 /// can be identified by its times.
 bool IsAtRest(const struct stat& file);
 
-/// One state of a file, links followed. The default is equal to no file's.
+/// One state of a file, links followed. The default equals that of no file.
 class FileVersion {
  public:
   /// Reads the present version. Returns 0 or an errno value.

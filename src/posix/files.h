@@ -1,4 +1,4 @@
-// Files by path: what they are, and simple changes.
+// Files by path: examining and changing them.
 #pragma once
 
 #include <cstdint>
@@ -22,12 +22,12 @@ constexpr bool operator<(const FileIdentity& a, const FileIdentity& b) {
   return a.device != b.device ? a.device < b.device : a.inode < b.inode;
 }
 
-/// What the system knows of a file.
+/// The status of a file.
 struct FileStatus {
   bool isRegular = false;
   bool isDirectory = false;
   int64_t size = 0;      ///< bytes
-  int64_t blocks = 0;    ///< allocated, of 512 bytes
+  int64_t blocks = 0;    ///< allocated blocks of 512 bytes
   int64_t modified = 0;  ///< seconds since the epoch
   FileIdentity identity;
 };
@@ -35,8 +35,8 @@ struct FileStatus {
 /// Returns true when the file mode `mode`, with its type bits, is that of a regular file.
 bool IsRegularFileMode(uint32_t mode);
 
-/// Examines the file at `path`, symbolic links followed. Returns nothing, with errno set, when that
-/// fails, also for a null path.
+/// Examines the file at `path`, symbolic links followed. Returns nothing, with errno set, on
+/// failure, also for a null path.
 std::optional<FileStatus> ExamineFile(const char* path);
 inline std::optional<FileStatus> ExamineFile(const std::string& path) {
   return ExamineFile(path.c_str());
@@ -49,7 +49,7 @@ bool IsRegularFile(const std::string& path);
 /// a directory.
 int IdentifyDirectory(const std::string& path, FileIdentity& identity);
 
-/// What a process may do with a file.
+/// Kinds of access to a file.
 enum class FileAccess {
   kRead,
   kExecute,  ///< for a directory: look up names in it
@@ -63,7 +63,7 @@ int CheckAccess(const std::string& path, FileAccess access);
 /// no open descriptor, with errno set, on failure.
 FileDescriptor OpenForReading(const std::string& path);
 
-/// Creates the empty file `path` with these permission bits, or empties the one that exists, and
+/// Creates the empty file `path` with these permission bits, or truncates the existing one, and
 /// opens it for writing; never waits for the reader of a pipe. Returns no open descriptor, with
 /// errno set, on failure.
 FileDescriptor CreateEmptyFile(const std::string& path, unsigned mode);
@@ -74,7 +74,7 @@ int CreateDirectory(const std::string& path, unsigned mode);
 /// Sets the permission bits of the file at `path`. Returns 0 or an errno value.
 int SetFileMode(const std::string& path, unsigned mode);
 
-/// Renames a file, replacing any file of the new name. Returns 0 or an errno value.
+/// Renames a file, replacing any existing file. Returns 0 or an errno value.
 int RenameFile(const std::string& from, const std::string& to);
 
 /// Removes the file at `path`, a symbolic link itself and not its target. Returns 0 or an errno
@@ -89,7 +89,7 @@ int RemoveFileIfPresent(const std::string& path);
 int AppendLine(const std::string& path, const std::string& text);
 
 /// Replaces the X's at the end of `nameTemplate` so that no file has the resulting path. Returns an
-/// empty string when there is none or it could not be used.
+/// empty string when no file can be created there.
 std::string FindUnusedPath(const std::string& nameTemplate);
 
 }  // namespace vela

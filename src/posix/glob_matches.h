@@ -7,8 +7,8 @@
 
 namespace vela {
 
-/// Expands a shell pattern; holds no path when nothing matches or the expansion fails. The paths
-/// are sorted and live as long as the object.
+/// Expands a shell pattern; contains no paths when nothing matches or the expansion fails. The
+/// paths are sorted and live as long as the object.
 class GlobMatches {
  public:
   explicit GlobMatches(const std::string& pattern) {
@@ -26,7 +26,7 @@ class GlobMatches {
   bool found_ = false;
 };
 
-/// Returns a pattern that matches exactly `path`, whatever characters it holds.
+/// Returns a pattern that matches exactly `path`, whatever characters it contains.
 std::string EscapePattern(const std::string& path);
 
 }  // namespace vela

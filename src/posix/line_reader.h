@@ -11,19 +11,19 @@ namespace vela {
 /// The lines of a file, one at a time, of any length.
 class LineReader {
  public:
-  /// Opens regular files only: any other kind could block the reader for ever.
+  /// Opens regular files only: any other kind could block the reader forever.
   explicit LineReader(const char* path);
   ~LineReader();
   LineReader(const LineReader&) = delete;
   LineReader& operator=(const LineReader&) = delete;
 
-  /// Returns false, with errno set since the construction, when the file could not be opened.
+  /// Returns false, with errno set by the constructor, when the file could not be opened.
   bool IsOpen() const { return stream_ != nullptr; }
 
-  /// Reads the next line, its newline included. Returns false at the end and when that failed.
+  /// Reads the next line, its newline included. Returns false at the end and on failure.
   bool Next();
 
-  /// Returns true when the reading ended because of an error.
+  /// Returns true when reading has stopped because of an error.
   bool HasFailed() const { return std::ferror(stream_.get()) != 0; }
 
   /// Returns the length of the line in bytes, its newline included.

@@ -14,7 +14,7 @@
 
 namespace vela {
 
-/// Creates a non-blocking socket. Without success, the descriptor is not open and errno is set.
+/// Creates a non-blocking socket. On failure, the descriptor is not open and errno is set.
 FileDescriptor MakeLocalSocket();
 
 /// Returns whether a socket address can hold the path.
@@ -24,22 +24,21 @@ bool FitsLocalAddress(std::string_view path);
 int ConnectNow(int socket, std::string_view path);
 
 /// Creates a socket and connects it, waiting until the deadline when the listener's queue is full.
-/// A path where nothing exists costs only a look at it. Returns ETIMEDOUT when the queue stays
-/// full.
+/// Creates no socket when nothing exists at the path. Returns ETIMEDOUT when the queue stays full.
 int OpenConnection(const char* path, const Deadline& deadline, FileDescriptor& connection);
 
 /// Binds the socket to the path.
 int BindLocal(int socket, std::string_view path);
 
-/// Takes a connection from a listening socket; it is non-blocking as well. Without success, the
+/// Accepts a connection of a listening socket; it is non-blocking as well. On failure, the
 /// descriptor is not open and errno is set.
 FileDescriptor AcceptLocal(int listener);
 
-/// Sends as much as possible without waiting; `sent` is how much. Returns EAGAIN when nothing could
-/// be sent.
+/// Sends as much as possible without waiting; `sent` receives the number of bytes. Returns EAGAIN
+/// when nothing could be sent.
 int SendNow(int socket, std::string_view bytes, size_t& sent);
 
-/// Sends all of it. Returns ETIMEDOUT when that is not possible before the deadline.
+/// Sends all bytes. Returns ETIMEDOUT when that is not possible before the deadline.
 int SendAll(int socket, std::string_view bytes, const Deadline& deadline);
 
 /// Receives what has arrived; `got` is 0 at the end of the connection. Returns EAGAIN when nothing

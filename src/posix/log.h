@@ -16,7 +16,7 @@ void LogError(std::string_view source, int line, std::string_view text);
 /// Logs a message that does not start with its source and number.
 void LogError(std::string_view text);
 
-/// Returns `text` for a message, "(null)" for a null pointer.
+/// Returns `text` for use in a message, "(null)" for a null pointer.
 std::string LogText(const char* text);
 
 /// Returns an error code of the platform as messages show it, such as "0x0002".

@@ -46,7 +46,7 @@ void NewFile::Open(const std::string& directory, Kind kind) {
   }
 }
 
-/// A name may be taken: left behind by a process with the same id that was killed.
+/// A name may exist already, left behind by a killed process with the same id.
 bool NewFile::OpenNamed(const std::string& directory) {
   constexpr int kTries = 100;
   for (int i = 0; i < kTries && !file_.IsOpen() && (i == 0 || errno == EEXIST); ++i) {

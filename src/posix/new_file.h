@@ -1,4 +1,4 @@
-// New files that are written piece by piece, and put in place when they are whole.
+// New files that are written in steps and moved into place when complete.
 #pragma once
 
 #include <string>
@@ -8,29 +8,29 @@
 
 namespace vela {
 
-/// A new file, written from its beginning on through a buffer. The first failure is remembered and
-/// makes every later call do nothing.
+/// A new file, written sequentially through a buffer. The first failure is remembered; later calls
+/// have no effect.
 class NewFile {
  public:
   enum class Kind {
-    kScratch,  ///< without a name: gone with the object, however the program ends
+    kScratch,  ///< unnamed: disappears with the object, however the program ends
     kResult,   ///< under a temporary name until MoveTo; otherwise removed with the object
   };
 
-  /// Creates the file in `directory`, with the permissions of any new file.
+  /// Creates the file in `directory`, with the default permissions.
   NewFile(const std::string& directory, Kind kind);
   ~NewFile();
   NewFile(const NewFile&) = delete;
   NewFile& operator=(const NewFile&) = delete;
 
   void Append(std::string_view text);
-  /// Appends all that has been appended to `source`.
+  /// Appends the whole content of `source`.
   void AppendAllOf(NewFile& source);
   /// Discards the content.
   void Clear();
 
   /// Writes a kResult file to the disk and renames it to `path`, in the directory given at
-  /// construction, replacing a file that is there. Returns 0 or an errno value.
+  /// construction, replacing any existing file. Returns 0 or an errno value.
   int MoveTo(const std::string& path);
 
   /// Returns the errno value of the first failure, 0 without one.

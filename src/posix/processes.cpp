@@ -22,7 +22,7 @@ ProcessState StateOfProcess(long pid) {
   return errno == EPERM ? ProcessState::kInaccessible : ProcessState::kGone;
 }
 
-void HoldStandardDescriptors() {
+void ReserveStandardDescriptors() {
   int descriptor = 0;
   do {
     descriptor = open("/dev/null", O_RDWR);

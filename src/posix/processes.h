@@ -8,10 +8,10 @@
 
 namespace vela {
 
-/// What the system says about a process id.
+/// The state of the process with a given id.
 enum class ProcessState {
   kRunning,
-  kInaccessible,  ///< there is a process, and this one may not signal it
+  kInaccessible,  ///< the process exists, but this one may not signal it
   kGone,
 };
 
@@ -20,13 +20,13 @@ ProcessState StateOfProcess(long pid);
 
 /// Opens /dev/null for each standard descriptor that is closed, so that no file opened later gets
 /// its number.
-void HoldStandardDescriptors();
+void ReserveStandardDescriptors();
 
-/// From now on files get exactly the modes that they are created with.
+/// From now on the umask does not reduce the modes of new files.
 void CreateFilesWithExactModes();
 
-/// Raises the limit of open files to `wanted`, as far as permitted. Returns the limit that is then
-/// in effect, `wanted` when it is unknown.
+/// Raises the limit of open files to `wanted`, as far as permitted. Returns the resulting limit,
+/// `wanted` when it is unknown.
 uint64_t RaiseOpenFileLimit(uint64_t wanted);
 
 /// Blocks the signals in the calling thread and in all threads that it starts.

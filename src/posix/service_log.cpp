@@ -17,7 +17,7 @@ namespace {
 
 /// The variable alone proves nothing: it is inherited by programs whose standard error was
 /// redirected.
-bool LeadsToJournal() {
+bool IsConnectedToJournal() {
   const char* stream = std::getenv("JOURNAL_STREAM");
   struct stat status;
   if (stream == nullptr || fstat(STDERR_FILENO, &status) != 0) {
@@ -36,7 +36,7 @@ std::string Prefix(LogLevel level) {
 }  // namespace
 
 bool IsLogInJournal() {
-  static const bool isInJournal = LeadsToJournal();
+  static const bool isInJournal = IsConnectedToJournal();
   return isInJournal;
 }
 

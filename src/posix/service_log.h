@@ -8,7 +8,8 @@ namespace vela {
 /// Levels as the system log numbers them.
 enum class LogLevel { kError = 3, kWarning = 4, kInfo = 6 };
 
-/// Returns whether standard error leads to the systemd journal; determined at the first call.
+/// Returns whether standard error is connected to the systemd journal; determined at the first
+/// call.
 bool IsLogInJournal();
 
 /// Writes `message` as one line to standard error, with control characters and bytes that are not

@@ -1,4 +1,4 @@
-// Blocking signals for a while.
+// Blocking signals temporarily.
 #pragma once
 
 #include <signal.h>

@@ -21,7 +21,7 @@ void RemoveWithMarker(const std::string& thumbPath) {
   RemoveFile(FailMarkerPath(thumbPath));
 }
 
-/// Takes over what the profile says of the image.
+/// Copies the image options of the profile.
 void DescribeImage(const ThumbnailProfile& profile, PhotoThumbSetting& setting) {
   setting.width = profile.size();
   setting.height = profile.size();

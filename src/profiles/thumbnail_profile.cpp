@@ -46,7 +46,7 @@ void SortBySize(ThumbnailProfileList& list) {
             [](const auto& a, const auto& b) { return ProfileSortPredicate(*a, *b); });
 }
 
-void FileIntoPhases(ThumbnailProfileList& list) {
+void SortIntoPhases(ThumbnailProfileList& list) {
   for (const auto& profile : list.all) {
     switch (profile->phase()) {
       case 1:
@@ -105,7 +105,7 @@ int ParseThumbnailProfiles(ThumbnailProfileList& list, const std::string& profil
     }
   }
   SortBySize(list);
-  FileIntoPhases(list);
+  SortIntoPhases(list);
   return 1;
 }
 

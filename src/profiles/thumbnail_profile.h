@@ -52,8 +52,8 @@ inline constexpr int kAllPhases = -1;
 }  // namespace vela
 
 /// Reads the profile file into the empty `list`, keeping the profiles whose size class the index
-/// library wants for `dirPath`. Returns 1 (also when none was kept), or 0 when the file cannot be
-/// loaded.
+/// library requests for `dirPath`. Returns 1 (also when none was kept), or 0 when the file cannot
+/// be loaded.
 int ParseThumbnailProfiles(ThumbnailProfileList& list, const std::string& profileFilePath,
                            const std::string& dirPath);
 

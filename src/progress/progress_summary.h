@@ -1,4 +1,4 @@
-// The counters of conversion progress, together.
+// All counters of conversion progress.
 #pragma once
 
 #include <string>
@@ -9,13 +9,13 @@ namespace vela {
 /// Returns the path of the progress file of a media kind (a THUMB_TYPE), null for an unknown one.
 const char* ConvProgressFile(int kind);
 
-/// How far one kind of work has come.
+/// The progress of one kind of work.
 struct ProgressCount {
   int total;
   int completed;
 
-  /// Returns completed divided by total, from 0 to 1 unless the counters disagree; 0 without a
-  /// total.
+  /// Returns completed divided by total, from 0 to 1 unless the counters are inconsistent; 0
+  /// without a total.
   float Ratio() const {
     return total == 0 ? 0.0F : static_cast<float>(completed) / static_cast<float>(total);
   }
@@ -28,7 +28,7 @@ struct ProgressSummary {
   ProgressCount video;
 };
 
-/// Reads the counters; what is missing or no number counts as 0.
+/// Reads the counters; one that is missing or not a number counts as 0.
 ProgressSummary ReadProgressSummary();
 
 /// Returns the summary as lines of text, a heading first.

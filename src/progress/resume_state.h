@@ -1,11 +1,11 @@
-// Whether conversion is paused by the resume time, on machines with and without settings.
+// Whether conversion is paused by the resume time, with or without a settings file.
 #pragma once
 
 #include <chrono>
 
 namespace vela {
 
-/// The resume time and what follows from it.
+/// The resume time and values derived from it.
 struct ResumeState {
   long resumeTime = 0;     ///< seconds since the epoch, 0 when none is set
   bool isReached = false;  ///< conversion may run
@@ -16,7 +16,7 @@ struct ResumeState {
 /// only log errors.
 ResumeState ReadResumeState();
 
-/// Returns whether conversion is paused, without the rest of the state.
+/// Returns whether conversion is paused.
 bool IsPausedByResumeTime();
 
 /// Returns the time until the resume time, 0 when it is reached or negative.

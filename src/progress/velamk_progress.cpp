@@ -26,7 +26,7 @@ int ClampToInt(int64_t value) {
   return static_cast<int>(std::clamp(value, kLowest, kHighest));
 }
 
-/// Reads a counter; what is missing or no number counts as 0.
+/// Reads a counter; one that is missing or not a number counts as 0.
 int ReadCounter(const char* file, const char* key) {
   char text[4096] = "";
   if (VLIBCFileGetKeyValue(file, key, text, sizeof text, 0) <= 0) {

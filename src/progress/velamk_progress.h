@@ -6,7 +6,7 @@
 
 /// Returns the integer value of `key` ("total", "completed", "total_thumb", "completed_thumb") in
 /// the progress file of `kind` (a THUMB_TYPE); 0 for another kind and for a value that is missing
-/// or no number.
+/// or not a number.
 int GetConvProgress(int kind, const char* key);
 
 /// Adds `delta` to `key` in the progress file of `kind`; does nothing for another kind or a null
@@ -20,7 +20,7 @@ void LogConvProgress();
 /// set; a failed read is logged and gives 0.
 long GetThumbConvResumeTime();
 
-/// Returns 1 when conversion may run again, 0 while the resume time lies ahead or is negative.
+/// Returns 1 when conversion may run again, 0 while the resume time is in the future or negative.
 int IsThumbConvResumeTimeReached();
 
 /// Fills `out` with the time left until the resume time, never below zero. Returns 0.

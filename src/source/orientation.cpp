@@ -24,7 +24,7 @@ struct ExifDataUnref {
   void operator()(ExifData* data) const { exif_data_unref(data); }
 };
 
-/// Some builds of the library spell the upright orientation in their own way.
+/// Some builds of the library spell the upright orientation differently.
 std::string CanonicalText(const char* text) {
   return std::strcmp(text, "Top-left") == 0 ? kUprightText : text;
 }

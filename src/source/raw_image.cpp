@@ -25,8 +25,7 @@ namespace {
 constexpr char kDcrawPath[] = "/usr/bin/dcraw";
 constexpr unsigned kDecodedCopyMode = 0666;
 
-/// Reads "width x height". Returns false when the text is something else or no size that an image
-/// can have.
+/// Reads "width x height". Returns false for any other text and for a size that no image can have.
 bool ParseSize(const std::string& text, uint32_t& width, uint32_t& height) {
   constexpr long long kLargest = std::numeric_limits<uint32_t>::max();
   long long w = 0;
@@ -55,10 +54,10 @@ void LogIncompleteCopy(const CopyResult& copy, const std::string& rawPath,
       LogError(kProgramLogSource, 590,
                "write failed, path=" + outPath + ", " + std::strerror(copy.error));
       break;
-    case CopyEnd::kWriteCut:
+    case CopyEnd::kShortWrite:
       LogError(kProgramLogSource, 594,
-               "write size wrong, read_count=" + std::to_string(copy.piece) +
-                   ", write_count=" + std::to_string(copy.taken));
+               "write size wrong, read_count=" + std::to_string(copy.chunk) +
+                   ", write_count=" + std::to_string(copy.written));
       break;
   }
 }
@@ -75,8 +74,8 @@ bool IsPreviewLargeEnough(const DirectoryJob& job, const std::string& previewPat
   return largest != nullptr && std::max(width, height) >= static_cast<uint32_t>(largest->size());
 }
 
-/// Turns the preview in place as the raw photo says. A preview that could not be turned is used as
-/// it is.
+/// Turns the preview in place according to the raw photo. If that fails, the preview is used
+/// unchanged.
 void TurnPreview(const std::string& rawPath, const std::string& previewPath) {
   const int degrees = GetRawPreviewRotation(rawPath, previewPath);
   if (degrees <= 0) {
@@ -85,7 +84,7 @@ void TurnPreview(const std::string& rawPath, const std::string& previewPath) {
   VELAUtils::ProcessRunner runner(kConvertToolPath, kConvertToolPath);
   runner.addArguments("-rotate", std::to_string(degrees).c_str(), previewPath.c_str(),
                       previewPath.c_str());
-  // Readers of the log know this line as the sign of a turned preview: it is written on success.
+  // Despite its wording, this line announces a turned preview: it is written on success.
   if (runner.run(true, false) == 0) {
     LogError(kProgramLogSource, 650,
              "Failed to rotate " + previewPath + " to " + std::to_string(degrees) + " degree");

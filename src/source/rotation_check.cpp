@@ -40,7 +40,7 @@ Reference FindReference(const DirectoryJob& job, const std::string& thumbDir) {
 }
 
 /// Returns true when one of the two is landscape and the other portrait; a square is neither.
-bool IsCrossed(const std::string& photoPath, const std::string& referencePath) {
+bool DifferInOrientation(const std::string& photoPath, const std::string& referencePath) {
   uint32_t photoWidth = 0;
   uint32_t photoHeight = 0;
   uint32_t width = 0;
@@ -79,7 +79,7 @@ int CompareWithReference(const DirectoryJob& job, const std::string& photoPath,
   if (reference.path.empty()) {
     return 0;
   }
-  return IsCrossed(photoPath, reference.path)
+  return DifferInOrientation(photoPath, reference.path)
              ? CloserTurn(job, photoPath, thumbDir, reference, 90, 270)
              : CloserTurn(job, photoPath, thumbDir, reference, 0, 180);
 }

@@ -1,4 +1,4 @@
-// The turn that a photo's owner gave its thumbnails.
+// Detects the rotation that a user gave a photo's thumbnails.
 #pragma once
 
 #include <string>
@@ -6,8 +6,8 @@
 #include "profiles/directory_job.h"
 
 /// Finds the turn (0, 90, 180 or 270 degrees clockwise) at which thumbnails made from `photoPath`
-/// match those that exist in its metadata directory `thumbDir`; 0 when it is unknown. Removes
-/// its trial images.
+/// match the existing ones in its metadata directory `thumbDir`; 0 when it is unknown. Removes its
+/// trial images.
 int DetectThumbRotation(const DirectoryJob& job, const std::string& photoPath,
                         const std::string& thumbDir);
 

@@ -1,4 +1,4 @@
-// The output of a tool that is run to be read.
+// Reads the output of an external tool.
 #pragma once
 
 #include <cstdio>

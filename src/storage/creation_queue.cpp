@@ -4,15 +4,15 @@
 
 #include "platform/system_rules.h"
 #include "platform/vlibc.h"
-#include "posix/cut_text.h"
 #include "posix/files.h"
 #include "posix/line_reader.h"
+#include "posix/truncated_text.h"
 
 namespace vela {
 
 namespace {
 
-/// What the callers of the line search have always passed as its flags.
+/// The flags that all callers have always passed to the line search.
 constexpr int kLineSearchFlags = 1028;
 
 }  // namespace
@@ -24,7 +24,7 @@ bool IsTreeEntry(const std::string& entry) {
 bool HasQueueLine(const char* queueFile, const char* text) {
   char line[kPathBufferSize] = "";
   const int length = VLIBCFileGetLine(queueFile, text, line, sizeof line, kLineSearchFlags);
-  // The platform promises no more than to give a line that equals the text when there is one.
+  // The platform guarantees only that it finds a line equal to the text when there is one.
   return length > 0 && std::strlen(line) == std::strlen(text);
 }
 
@@ -46,7 +46,7 @@ QueueRead ForEachQueueEntry(const char* queueFile,
       visit(lines.WithoutNewline());
     }
   }
-  return lines.HasFailed() ? QueueRead::kIncomplete : QueueRead::kWhole;
+  return lines.HasFailed() ? QueueRead::kIncomplete : QueueRead::kComplete;
 }
 
 }  // namespace vela

@@ -19,18 +19,18 @@ inline constexpr CreationQueue kPhotoQueue = {"/var/spool/thumb_create.queue",
 inline constexpr CreationQueue kVideoQueue = {"/var/spool/flv_create.queue",
                                               "/var/spool/flv_create.queue.tmp"};
 
-/// Returns true when the entry means a directory with everything below it.
+/// Returns true when the entry stands for a directory tree.
 bool IsTreeEntry(const std::string& entry);
 
-/// Returns true when the queue file holds a line equal to `text`.
+/// Returns true when the queue file contains a line equal to `text`.
 bool HasQueueLine(const char* queueFile, const char* text);
 
-/// Returns true when one of the queue's two files holds a line equal to `path`.
+/// Returns true when one of the queue's two files contains a line equal to `path`.
 bool IsQueued(const CreationQueue& queue, const char* path);
 
-/// How reading a queue file ended; errno says why unless it is kWhole.
+/// How reading a queue file ended; errno is set unless it is kComplete.
 enum class QueueRead {
-  kWhole,
+  kComplete,
   kNotOpened,   ///< missing, not a regular file, or not readable
   kIncomplete,  ///< stopped by an error
 };

@@ -1,9 +1,9 @@
 #include "storage/directory_status.h"
 
 #include "platform/velaindex.h"
-#include "posix/cut_text.h"
 #include "posix/directory_entries.h"
 #include "posix/log.h"
+#include "posix/truncated_text.h"
 #include "storage/log_source.h"
 #include "storage/velamk_thumb_status.h"
 

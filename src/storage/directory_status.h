@@ -12,8 +12,8 @@ namespace vela {
 using PhotoStatusVisitor = std::function<void(const std::string&, const PhotoThumbStates&)>;
 
 /// Calls `visit` for each photo of the directory `dir`, subdirectories not entered, in the order in
-/// which the system lists them. Returns false when `dir` is no directory or cannot be opened; the
-/// latter is logged.
+/// which the system lists them. Returns false when `dir` is not a directory or cannot be opened;
+/// the latter is logged.
 bool ForEachPhotoStatus(const char* dir, const PhotoStatusVisitor& visit);
 
 }  // namespace vela

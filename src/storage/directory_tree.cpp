@@ -18,7 +18,7 @@ struct Walk {
   std::exception_ptr failure;
 };
 
-/// The walk hands its callback no pointer of the caller's.
+/// The C library's walk passes no user pointer to its callback.
 thread_local Walk* t_walk = nullptr;
 
 int VisitEntry(const char* path, const struct stat* /*status*/, int typeFlag, struct FTW* place) {

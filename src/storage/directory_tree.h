@@ -11,7 +11,7 @@ using DirectoryVisitor = std::function<void(const char* path, bool isReadable)>;
 /// Calls `visit` for the directory `root` and every directory below it on the same file system
 /// whose name is to be indexed, a directory before its subdirectories; links are followed, each
 /// directory is visited once. Returns 0, or -1 with errno set when the walk ended early. One walk
-/// at a time in a thread.
+/// at a time per thread.
 int ForEachIndexedDirectory(const char* root, const DirectoryVisitor& visit);
 
 }  // namespace vela

@@ -1,8 +1,8 @@
 #include "storage/fail_marker.h"
 
 #include "platform/velaindex.h"
-#include "posix/cut_text.h"
 #include "posix/files.h"
+#include "posix/truncated_text.h"
 
 namespace vela {
 

@@ -3,9 +3,8 @@
 
 #include <string>
 
-/// Makes the directory `path` with mode 0777 unless it exists. Returns 1 when it exists or was made
-/// (anything else of that name counts as existing), else 0; errors other than a missing parent are
-/// logged.
+/// Creates the directory `path` with mode 0777 unless it exists. Returns 1 when it exists or was
+/// created (any file of that name counts), else 0; errors other than a missing parent are logged.
 int checkCreateDir(const std::string& path);
 
 /// Removes every file that matches the shell pattern. Returns 0 when all matches were removed or

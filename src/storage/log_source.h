@@ -1,4 +1,4 @@
-// The source names under which this folder and those above it log.
+// The source names in the log messages of this layer and those above it.
 #pragma once
 
 namespace vela {

@@ -22,7 +22,7 @@ int IsFilePortrait(const char* path) {
     uint32_t height = 0;
     return VELAIndexImgResGet(path, &width, &height) == 0 && width < height ? 1 : 0;
   }
-  VELA_RESOLUTION film = {};
-  VELAIDX_GetMediaResolution(path, &film);
-  return film.width < film.height ? 1 : 0;
+  VELA_RESOLUTION video = {};
+  VELAIDX_GetMediaResolution(path, &video);
+  return video.width < video.height ? 1 : 0;
 }

@@ -2,8 +2,8 @@
 
 #include "platform/velaindex.h"
 #include "platform/vlibc.h"
-#include "posix/cut_text.h"
 #include "posix/log.h"
+#include "posix/truncated_text.h"
 #include "storage/log_source.h"
 
 namespace vela {

@@ -5,8 +5,8 @@
 #include <string>
 
 #include "platform/velaindex.h"
-#include "posix/cut_text.h"
 #include "posix/log.h"
+#include "posix/truncated_text.h"
 #include "storage/log_source.h"
 #include "storage/thumb_age.h"
 #include "storage/velamk_thumb_status.h"
@@ -43,7 +43,7 @@ class PhotoThumbs {
     if (!photo_) {
       photo_ = ExamineMediaFile(path_);
     }
-    // A photo that cannot be examined never has its thumbnails made again.
+    // The thumbnails of a photo that cannot be examined are never made again.
     const bool isOutdated = photo_ && IsDerivedFileOutdated(*photo_, thumb.size, thumb.modified);
     return isOutdated ? ThumbState::kOutdated : ThumbState::kPresent;
   }

@@ -10,7 +10,7 @@
 namespace vela {
 
 enum class ThumbState {
-  kNotWanted,  ///< the size map does not ask for it, or the photo could not be looked up
+  kNotWanted,  ///< not in the size map, or the photo could not be looked up
   kPresent,
   kMissing,
   kOutdated,  ///< older than the photo, or empty

@@ -1,7 +1,7 @@
 #include "storage/thumb_age.h"
 
-#include "posix/cut_text.h"
 #include "posix/log.h"
+#include "posix/truncated_text.h"
 #include "storage/log_source.h"
 #include "storage/metadata_dir.h"
 #include "storage/velamk_util.h"

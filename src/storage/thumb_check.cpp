@@ -3,8 +3,8 @@
 #include <string>
 
 #include "platform/velaindex.h"
-#include "posix/cut_text.h"
 #include "posix/log.h"
+#include "posix/truncated_text.h"
 #include "storage/log_source.h"
 #include "storage/metadata_dir.h"
 #include "storage/thumb_age.h"
@@ -14,7 +14,7 @@ using namespace vela;
 namespace {
 
 /// Returns true when the existing thumbnail `name` can be kept.
-bool IsThumbGood(const char* path, const std::string& eaDir, const char* name) {
+bool IsThumbValid(const char* path, const std::string& eaDir, const char* name) {
   if (IsEAThumbOutdated(path, name) == 1) {
     return false;
   }
@@ -22,14 +22,14 @@ bool IsThumbGood(const char* path, const std::string& eaDir, const char* name) {
   return IsMediaPortraitInDB(path) == IsFilePortrait(thumbPath.c_str());
 }
 
-/// Checks one size class and removes its thumbnail when it is bad. Returns true when it exists and
-/// is good.
+/// Checks one size class and removes its thumbnail when it is invalid. Returns true when it exists
+/// and is valid.
 bool CheckThumb(const char* path, const std::string& eaDir, const EAThumbInfo& row) {
   const char* name = IsEAFileExist(eaDir.c_str(), nullptr, row.name, row.oldName);
   if (name == nullptr) {
     return false;
   }
-  if (IsThumbGood(path, eaDir, name)) {
+  if (IsThumbValid(path, eaDir, name)) {
     return true;
   }
   RemoveEAFile(eaDir.c_str(), row.name, row.oldName);

@@ -30,23 +30,23 @@ int GetDirThumbStatusRecursive(const char* dir, int* photosOut, int* thumbsOut);
 int GetDirThumbStatusRecursive_Callback(const char* path, const struct stat* status, int typeFlag,
                                         struct FTW* walk);
 
-/// Returns 1 when the video `path` lacks thumbnails or its converted film, else 0, also for what is
-/// no video and for a path of more than 4066 bytes, which is logged. Removes thumbnails that are
-/// outdated and thumbnails and films of the wrong orientation.
+/// Returns 1 when the video `path` lacks thumbnails or a converted video, else 0, also for any
+/// other file and, logged, for a path of more than 4066 bytes. Removes outdated thumbnails, and
+/// thumbnails and converted videos of the wrong orientation.
 int IsVideoWorkNeeded(const char* path);
 
 /// Returns the number of videos in the tree `dir` that need work and are not in the video queue; 0,
 /// logged, when the directory does not exist or cannot be opened. The videos listed after a queued
-/// one in the same directory are not counted. A link to a directory above is not followed; a
-/// directory that is reached in several ways counts each time. Removes what IsVideoWorkNeeded
+/// one in the same directory are not counted. A link to a parent directory is not followed; a
+/// directory that is reached on several paths counts each time. Removes what IsVideoWorkNeeded
 /// removes.
 int CountVideoWork(const char* dir);
 
 /// Returns the number of videos that need work among the entries of the queue file `queueFile`; of
-/// the video queue without those in progress. 0 when there is no such file or it
-/// cannot be opened; the latter is logged. Removes what IsVideoWorkNeeded removes.
+/// the video queue without those in progress. 0 when the file does not exist or cannot be opened;
+/// the latter is logged. Removes what IsVideoWorkNeeded removes.
 int CountVideoQueueWork(const char* queueFile);
 
-/// Returns the number of entries of the directory `path`, "." and ".." included; 0 when it is no
+/// Returns the number of entries of the directory `path`, "." and ".." included; 0 when it is not a
 /// directory or cannot be opened.
 int CountDirEntries(const char* path);

@@ -1,4 +1,5 @@
-// Size classes and metadata names: what exists for a media file, and whether it is still good.
+// Size classes and metadata names: the derived files of a media file, and whether they are still
+// valid.
 #pragma once
 
 #include <cstdint>
@@ -13,13 +14,13 @@ int IsEAThumbOutdated(const char* path, const char* name);
 /// record is logged.
 int IsMediaPortraitInDB(const char* path);
 
-/// Returns 1 when the photo or film `path` itself is portrait, else 0, also when its size
-/// cannot be read.
+/// Returns 1 when the photo or video `path` itself is portrait, else 0, also when its size cannot
+/// be read.
 int IsFilePortrait(const char* path);
 
 /// Checks the thumbnails of the media file `path` that `sizeMap` asks for and removes, under both
 /// names, each that is outdated or of the wrong orientation. Returns 1 when all exist and are
-/// good, else 0.
+/// valid, else 0.
 int CheckEAThumbs(const char* path, int32_t sizeMap);
 
 /// Returns 1 when the video `path` is to be rotated by 90, 180 or 270 degrees for display, else 0,
@@ -27,12 +28,12 @@ int CheckEAThumbs(const char* path, int32_t sizeMap);
 int IsVideoRotated(const char* path);
 
 /// Returns 1 when the video `path` has one of the converted videos that keep its orientation (high,
-/// medium, low, mobile), of whatever size, else 0.
+/// medium, low, mobile), of any size, else 0.
 int HasConvertedFilm(const char* path);
 
 /// Compares the derived file `name` (or `oldName`) of the media file `path` with the plugin
-/// daemon's record of it. Returns 1 when both are portrait or both are not, 0 when they differ, -1
-/// when there is no such file or `path` is null, which is logged.
+/// daemon's record of it. Returns 1 when both or neither are portrait, 0 when they differ, -1 when
+/// there is no such file or `path` is null, which is logged.
 int IsEAFileOrientationMatched(const char* path, const char* name, const char* oldName);
 
 /// Returns 1 when one of the files that HasConvertedFilm looks for has the orientation of the video
@@ -40,7 +41,7 @@ int IsEAFileOrientationMatched(const char* path, const char* name, const char* o
 int HasMatchedConvertedFilm(const char* path);
 
 /// Returns 1 when the video `path` has a version for browsers, else 0; -1, logged, for a null path
-/// and a video without a metadata directory. Removes the Flash film of a rotated video, under both
+/// and a video without a metadata directory. Removes the Flash video of a rotated video, under both
 /// names, when only its orientation is wrong.
 int IsWebVideoConverted(const char* path);
 

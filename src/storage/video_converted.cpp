@@ -8,7 +8,7 @@
 #include "platform/velaindex.h"
 #include "platform/vlibc.h"
 #include "posix/log.h"
-#include "storage/film_names.h"
+#include "storage/converted_video_names.h"
 #include "storage/log_source.h"
 #include "storage/metadata_dir.h"
 #include "storage/velamk_util.h"
@@ -17,76 +17,79 @@ using namespace vela;
 
 namespace {
 
-constexpr int64_t kSmallestFilm = 2;
+constexpr int64_t kSmallestConvertedVideo = 2;
 /// Conversions of a video with this many bits per second or more lose too much quality.
 constexpr uint32_t kHighBitrate = 4500000;
 
-bool IsFilmPresent(const std::string& eaDir, const FilmName& film) {
+bool IsConvertedVideoPresent(const std::string& eaDir, const ConvertedVideoName& video) {
   int64_t size = 0;
-  return IsEAFileExist(eaDir.c_str(), &size, film.name, film.oldName) != nullptr &&
-         size >= kSmallestFilm;
+  return IsEAFileExist(eaDir.c_str(), &size, video.name, video.oldName) != nullptr &&
+         size >= kSmallestConvertedVideo;
 }
 
-enum class FilmQuality { kGood, kPoor, kUnknown };
+enum class VideoQuality { kGood, kPoor, kUnknown };
 
 /// Judges the H.264 and iPhone versions of a video by the video's own record; a failed lookup is
 /// logged with the caller's `line`.
-FilmQuality JudgeFilm(const char* path, int line) {
+VideoQuality JudgeConvertedVideo(const char* path, int line) {
   VELA_MEDIA_INFO media = {};
   if (GetMediaFromPluginDB(THUMB_TYPE_PHOTO, path, media) < 0) {
     LogError(kMetadataLogSource, line, "fail to get media from plugin db: " + LogText(path));
-    return FilmQuality::kUnknown;
+    return VideoQuality::kUnknown;
   }
-  return media.bitrate < kHighBitrate ? FilmQuality::kGood : FilmQuality::kPoor;
+  return media.bitrate < kHighBitrate ? VideoQuality::kGood : VideoQuality::kPoor;
 }
 
 /// Returns true when a conversion of a rotated video has its orientation; one that does not is
 /// removed, so that it is made again.
-bool KeepMatchingFilm(const char* path, const FilmName& film) {
-  if (IsEAFileExist2(path, film.name, film.oldName) <= 0) {
+bool KeepMatchingVideo(const char* path, const ConvertedVideoName& video) {
+  if (IsEAFileExist2(path, video.name, video.oldName) <= 0) {
     return false;
   }
-  if (IsEAFileOrientationMatched(path, film.name, film.oldName) == 1) {
+  if (IsEAFileOrientationMatched(path, video.name, video.oldName) == 1) {
     return true;
   }
-  RemoveEAFile2(path, film.name, film.oldName);
+  RemoveEAFile2(path, video.name, video.oldName);
   return false;
 }
 
-/// Judges a rotated video, for which `fallback` counts in addition to the conversions that keep its
-/// orientation.
-bool IsRotatedVideoConverted(const char* path, const FilmName& fallback) {
+/// Judges a rotated video, for which `fallback` is accepted in addition to the conversions that
+/// keep its orientation.
+bool IsRotatedVideoConverted(const char* path, const ConvertedVideoName& fallback) {
   if (HasConvertedFilm(path) != 0 && HasMatchedConvertedFilm(path) != 0) {
     return true;
   }
-  return KeepMatchingFilm(path, fallback);
+  return KeepMatchingVideo(path, fallback);
 }
 
 bool IsUprightVideoOnWeb(const char* path, const std::string& eaDir) {
-  for (const FilmName& film :
-       {kHighFilm, kMediumFilm, kLowFilm, kMobileFilm, kIphoneFilm, kFlashFilm}) {
-    if (IsFilmPresent(eaDir, film)) {
+  for (const ConvertedVideoName& video :
+       {kHighVideo, kMediumVideo, kLowVideo, kMobileVideo, kIphoneVideo, kFlashVideo}) {
+    if (IsConvertedVideoPresent(eaDir, video)) {
       return true;
     }
   }
-  return IsFilmPresent(eaDir, kH264Film) && JudgeFilm(path, 243) == FilmQuality::kGood;
+  return IsConvertedVideoPresent(eaDir, kH264Video) &&
+         JudgeConvertedVideo(path, 243) == VideoQuality::kGood;
 }
 
 /// Returns true when the H.264 or the iPhone version of a video suits mobile devices.
-bool HasGoodPhoneFilm(const char* path, const std::string& eaDir) {
-  if (IsFilmPresent(eaDir, kH264Film)) {
-    const FilmQuality quality = JudgeFilm(path, 344);
+bool HasGoodPhoneVideo(const char* path, const std::string& eaDir) {
+  if (IsConvertedVideoPresent(eaDir, kH264Video)) {
+    const VideoQuality quality = JudgeConvertedVideo(path, 344);
     // Without a record the iPhone version is not considered either.
-    if (quality != FilmQuality::kPoor) {
-      return quality == FilmQuality::kGood;
+    if (quality != VideoQuality::kPoor) {
+      return quality == VideoQuality::kGood;
     }
   }
-  return IsFilmPresent(eaDir, kIphoneFilm) && JudgeFilm(path, 357) == FilmQuality::kGood;
+  return IsConvertedVideoPresent(eaDir, kIphoneVideo) &&
+         JudgeConvertedVideo(path, 357) == VideoQuality::kGood;
 }
 
 bool IsUprightVideoOnMobile(const char* path, const std::string& eaDir) {
-  return HasConvertedFilm(path) != 0 || HasGoodPhoneFilm(path, eaDir) ||
-         IsFilmPresent(eaDir, kMpeg4Film) || IsFilmPresent(eaDir, kConvertedMpeg4Film);
+  return HasConvertedFilm(path) != 0 || HasGoodPhoneVideo(path, eaDir) ||
+         IsConvertedVideoPresent(eaDir, kMpeg4Video) ||
+         IsConvertedVideoPresent(eaDir, kConvertedMpeg4Video);
 }
 
 /// The lines with which a check logs a null path and a video without a metadata directory.
@@ -104,7 +107,7 @@ bool BeginCheck(const char* path, const CheckLines& lines, std::string& eaDir) {
   return FindMetadataDir(path, lines.noMetadataDir, eaDir);
 }
 
-bool AreMobileFilmsWanted() {
+bool AreMobileVideosWanted() {
   return VLIBCFileCheckKeyValue(kSettingsFile, "enable_mobile_video", "yes", 0) != 0;
 }
 
@@ -115,7 +118,7 @@ int IsWebVideoConverted(const char* path) {
   if (!BeginCheck(path, {460, 465}, eaDir)) {
     return -1;
   }
-  const bool isConverted = IsVideoRotated(path) != 0 ? IsRotatedVideoConverted(path, kFlashFilm)
+  const bool isConverted = IsVideoRotated(path) != 0 ? IsRotatedVideoConverted(path, kFlashVideo)
                                                      : IsUprightVideoOnWeb(path, eaDir);
   return isConverted ? 1 : 0;
 }
@@ -126,7 +129,7 @@ int IsMobileVideoConverted(const char* path) {
     return -1;
   }
   const bool isConverted = IsVideoRotated(path) != 0
-                               ? IsRotatedVideoConverted(path, kConvertedMpeg4Film)
+                               ? IsRotatedVideoConverted(path, kConvertedMpeg4Video)
                                : IsUprightVideoOnMobile(path, eaDir);
   return isConverted ? 1 : 0;
 }
@@ -136,10 +139,10 @@ int IsVideoConverted(const char* path) {
     LogError(kMetadataLogSource, 509, "Bad parameters.");
     return -1;
   }
-  const bool mobileFilmsWanted = AreMobileFilmsWanted();
+  const bool mobileVideosWanted = AreMobileVideosWanted();
   if (IsWebVideoConverted(path) == 0) {
     return 0;
   }
   // A check that ends in an error counts as converted: there is nothing to do for that video.
-  return !mobileFilmsWanted || IsMobileVideoConverted(path) != 0 ? 1 : 0;
+  return !mobileVideosWanted || IsMobileVideoConverted(path) != 0 ? 1 : 0;
 }

@@ -1,4 +1,4 @@
-// The videos of one directory, subdirectories aside.
+// The videos of one directory, without its subdirectories.
 #pragma once
 
 #include <functional>
@@ -6,12 +6,12 @@
 
 namespace vela {
 
-/// Takes the path of a subdirectory, at its place in the order of listing.
+/// Takes the path of a subdirectory, called in listing order.
 using SubdirectoryVisitor = std::function<void(const std::string& path)>;
 
-/// Checks each video of the directory `dir` (IsVideoWorkNeeded, with what that removes) and
-/// stores in `work` how many need work and count. Returns false, logged, when `dir` does not exist
-/// or cannot be opened.
+/// Checks each video of the directory `dir` with IsVideoWorkNeeded, which may remove files, and
+/// stores in `work` the number of those that need work and count. Returns false, logged, when `dir`
+/// does not exist or cannot be opened.
 bool ReadVideoLevel(const char* dir, const SubdirectoryVisitor& onSubdirectory, int& work);
 
 }  // namespace vela

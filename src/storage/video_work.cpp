@@ -1,4 +1,4 @@
-// Videos that need work: one, those of a tree, those of a queue.
+// Videos that need work: a single one, those of a tree, those of a queue.
 
 #include <algorithm>
 #include <cstring>
@@ -6,10 +6,10 @@
 #include <vector>
 
 #include "platform/velaindex.h"
-#include "posix/cut_text.h"
 #include "posix/directory_entries.h"
 #include "posix/files.h"
 #include "posix/log.h"
+#include "posix/truncated_text.h"
 #include "storage/creation_queue.h"
 #include "storage/log_source.h"
 #include "storage/velamk_thumb_status.h"

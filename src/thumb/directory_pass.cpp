@@ -23,7 +23,7 @@ bool IsPhotoName(const char* name) {
   if (std::strcmp(name, ".") == 0 || std::strcmp(name, "..") == 0) {
     return false;
   }
-  // Other systems keep a file's attributes next to it under its name with this prefix.
+  // Other systems store a file's attributes next to it, under its name with this prefix.
   if (std::strncmp(name, "._", 2) == 0) {
     return false;
   }

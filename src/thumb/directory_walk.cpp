@@ -13,7 +13,7 @@ namespace {
 
 constexpr int kWalkDescriptors = 100;
 
-/// The walk hands its callback no pointer of the caller's.
+/// The C library's walk passes no user pointer to its callback.
 std::string g_profile_path;
 
 }  // namespace

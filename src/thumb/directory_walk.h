@@ -1,4 +1,4 @@
-// From the arguments to the directories: the recursive walk and what is done in each directory.
+// From the arguments to the directories: the recursive walk and the processing of each directory.
 #pragma once
 
 #include <ftw.h>
@@ -7,8 +7,8 @@
 #include <string>
 
 /// Makes the thumbnails of the directory `dirPath` with the profiles of `profileFilePath`. Skips a
-/// directory or profile file that does not exist and a directory that may have no metadata; a
-/// profile file that cannot be loaded is reported on standard error.
+/// directory or profile file that does not exist and a directory in which no metadata may be
+/// written; a profile file that cannot be loaded is reported on standard error.
 void RunDirectoryJob(const std::string& dirPath, const std::string& profileFilePath);
 
 /// The step of the walk; returns the walk's action code.

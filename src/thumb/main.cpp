@@ -7,9 +7,9 @@
 #include <string>
 
 #include "platform/system_rules.h"
-#include "posix/cut_text.h"
 #include "posix/files.h"
 #include "posix/processes.h"
+#include "posix/truncated_text.h"
 #include "thumb/velathumb.h"
 
 using namespace vela;
@@ -26,7 +26,7 @@ std::string TreeDirectory(std::string argument) {
   char* rest = nullptr;
   strtok_r(argument.data(), ":", &rest);
   const char* directory = strtok_r(nullptr, ":", &rest);
-  return directory == nullptr ? std::string() : CutText(directory);
+  return directory == nullptr ? std::string() : Truncated(directory);
 }
 
 void RunArgument(const char* argument, const std::string& profileFile) {
@@ -37,7 +37,7 @@ void RunArgument(const char* argument, const std::string& profileFile) {
     }
     return;
   }
-  RunDirectoryJob(CutText(argument), profileFile);
+  RunDirectoryJob(Truncated(argument), profileFile);
 }
 
 }  // namespace
@@ -46,11 +46,11 @@ int main(int argc, char** argv) {
   if (argc < 3) {
     return 1;
   }
-  HoldStandardDescriptors();
+  ReserveStandardDescriptors();
   CreateFilesWithExactModes();
   KillThumbProcesses();
   std::signal(SIGTERM, OnSigTerm);
-  const std::string profileFile = CutText(argv[1]);
+  const std::string profileFile = Truncated(argv[1]);
   const std::string pidFile = CreatePidFile();
   for (int i = 2; i < argc; ++i) {
     RunArgument(argv[i], profileFile);

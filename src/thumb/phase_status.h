@@ -5,8 +5,7 @@
 
 #include "profiles/directory_job.h"
 
-/// Returns true when some thumbnail of the phase exists and is older (whole seconds) than the
-/// photo.
+/// Returns true when any thumbnail of the phase exists and is older (whole seconds) than the photo.
 bool IsPhaseThumbOutdated(const DirectoryJob& job, int phase, const std::string& photoPath,
                           const std::string& metadataDir);
 

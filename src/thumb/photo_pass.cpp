@@ -22,7 +22,7 @@ namespace vela {
 
 namespace {
 
-/// From this index version on, the index keeps the rotation that an owner gave a photo.
+/// From this index version on, the index keeps the rotation that a user gave a photo.
 constexpr int kRotationKeepingIndexVersion = 1;
 
 /// The thumbnail from which the later phases are made; null when there is none.
@@ -121,7 +121,7 @@ bool PhotoPass::DecodeRaw() {
   }
   decoded_ = true;
   if (status_.modification.seconds > passStart_) {
-    DateLikePhoto(source_, status_);
+    CopyPhotoTime(source_, status_);
   }
   return true;
 }
@@ -144,7 +144,7 @@ bool PhotoPass::MakePhase0() {
   }
   const int thumbs = GetProfileCount(job_.profiles, 0);
   if (result == -1) {
-    // What is made from a thumbnail of this phase cannot be made either.
+    // The thumbnails that are made from one of this phase cannot be made either.
     const int phase1 = MarkPhaseFailed(job_, 1, metadataDir_);
     const int phase2 = MarkPhaseFailed(job_, 2, metadataDir_);
     Finish(thumbs + phase1 + phase2);

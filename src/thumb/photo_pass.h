@@ -9,15 +9,15 @@
 
 namespace vela {
 
-/// How a photo ended.
+/// How the processing of a photo ended.
 enum class PhotoEnd {
   kNextPhoto,       ///< finished, successfully or not
   kNextPhotoQueue,  ///< the same, and the directory needs a later run
   kStopPass,        ///< no further photo of the directory may be started
 };
 
-/// Takes one photo through the phases that are due. A failure on the way leaves its markers, is
-/// counted and reported, and never stops the pass.
+/// Processes the phases of one photo that are due. A failure leaves failure markers, is counted and
+/// reported, and never stops the pass.
 class PhotoPass {
  public:
   /// `name` is the photo's name in the job's directory, `metadataRoot` the directory that holds the
@@ -49,7 +49,7 @@ class PhotoPass {
   const time_t passStart_;
 
   VLIBCFileStatus status_ = {};
-  std::string source_;       ///< what the thumbnails are made from now
+  std::string source_;       ///< what the thumbnails are currently made from
   bool decoded_ = false;     ///< the source is a temporary copy of a raw photo
   int phase_ = 0;            ///< the first phase that is due
   bool outdated_ = false;    ///< it is due because the photo is newer than a thumbnail

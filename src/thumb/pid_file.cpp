@@ -4,12 +4,12 @@
 #include <cstring>
 #include <string>
 
-#include "posix/cut_text.h"
+#include "posix/truncated_text.h"
 
 namespace vela {
 
 long PidOfFile(const char* path) {
-  std::string copy = CutText(path, kPidPathBufferSize);
+  std::string copy = Truncated(path, kPidPathBufferSize);
   char* rest = nullptr;
   strtok_r(copy.data(), ".", &rest);
   const char* number = strtok_r(nullptr, ".", &rest);

@@ -1,4 +1,4 @@
-// The pid files of running instances: the process id is in the name.
+// The pid files of running instances, whose names contain the process id.
 #pragma once
 
 #include <cstddef>
@@ -11,7 +11,7 @@ inline constexpr std::size_t kPidPathBufferSize = 4095;
 /// Matches the pid files of all instances.
 inline constexpr char kPidFilePattern[] = "/var/run/velathumb.*.pid";
 
-/// Returns the process id that a pid file's name carries, 0 when it carries none.
+/// Returns the process id in a pid file's name, 0 when there is none.
 long PidOfFile(const char* path);
 
 }  // namespace vela

@@ -14,7 +14,7 @@ namespace {
 constexpr char kCommandName[] = "velathumb";
 
 /// Returns true when the process runs this program: the number in a stale pid file may belong to
-/// another program by now. A process that may not be examined counts.
+/// another program by now. A process that may not be examined counts as one.
 bool IsInstance(pid_t pid) {
   std::ifstream file("/proc/" + std::to_string(pid) + "/comm");
   std::string name;

@@ -1,4 +1,4 @@
-// The running instances.
+// The running instances of the program.
 #pragma once
 
 #include <vector>
@@ -7,7 +7,7 @@
 
 namespace vela {
 
-/// Returns the process ids of the velathumb processes that are running, by their pid files.
+/// Returns the process ids of the running velathumb processes, according to their pid files.
 std::vector<pid_t> RunningInstances();
 
 }  // namespace vela

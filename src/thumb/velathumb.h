@@ -1,4 +1,4 @@
-// The thumbnail maker: what the program itself is made of. The chief header of this folder.
+// The parts of the program itself. The main header of this folder.
 #pragma once
 
 #include "profiles/directory_job.h"

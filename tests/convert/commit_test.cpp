@@ -1,4 +1,4 @@
-// Moving outputs into place and dating them.
+// Moving outputs into place and setting their times.
 #include <fcntl.h>
 #include <sys/stat.h>
 #include <unistd.h>
@@ -51,14 +51,14 @@ class Mask {
 
 class Commit : public ConvertTest {
  protected:
-  /// Runs a job of these widths with the converter doing as planned.
+  /// Runs a job of these widths with this plan for the converter.
   int Run(const StubPlan& plan, const std::vector<int>& widths = {1280, 320, 120}) {
     Converter().Plan(plan);
     PhotoConvertJob job = MakeJob(widths);
     return RunPhotoConvertJob(job);
   }
 
-  /// Commits one output, which the test has made.
+  /// Commits one output that the test has written.
   static int CommitOne(int width = 320) {
     struct stat photo = {};
     EXPECT_EQ(stat(kPhoto, &photo), 0);
@@ -192,7 +192,7 @@ constexpr int64_t kHour = 3600;
 
 class PhotoTimes : public ConvertTest {
  protected:
-  /// Dates the photo's last change; its last access stays an hour earlier.
+  /// Sets the photo's modification time, and its access time an hour earlier.
   static void DatePhoto(int64_t seconds, long nanoseconds) {
     const timespec times[2] = {{seconds - kHour, 5}, {seconds, nanoseconds}};
     ASSERT_EQ(utimensat(AT_FDCWD, kPhoto, times, 0), 0);

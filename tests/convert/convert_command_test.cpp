@@ -17,7 +17,7 @@ class ConvertCommand : public QuietTest {
  protected:
   using AddArguments = std::function<void(VELAUtils::ProcessRunner& runner)>;
 
-  /// The parameters that the converter gets from this call alone.
+  /// The parameters that this call alone passes to the converter.
   static Words Arguments(const AddArguments& add) {
     const StubTool converter(kConverterPath);
     converter.Plan(StubPlan());

@@ -55,7 +55,7 @@ TEST_F(SettingOrder, TheJobIsSortedEvenIfThePhotoIsMissing) {
 }
 
 TEST_F(SettingOrder, FillModesStayAtTheirPositions) {
-  // Long jobs are sorted in another way than short ones.
+  // The sort algorithm differs between long and short jobs.
   for (const int count : {1, 2, 3, 5, 16, 17, 40, 200}) {
     SCOPED_TRACE(count);
     PhotoConvertJob job;
@@ -74,7 +74,7 @@ TEST_F(SettingOrder, FillModesStayAtTheirPositions) {
 }
 
 TEST_F(SettingOrder, OutputsAreCommittedInThisOrder) {
-  // The converter writes nothing, so that every commit leaves a line.
+  // The converter writes nothing, so that every commit logs a line.
   Converter().Plan(StubPlan());
   PhotoConvertJob job = MakeJob({320, 1280, 120});
   EXPECT_EQ(RunPhotoConvertJob(job), -1);
@@ -84,7 +84,7 @@ TEST_F(SettingOrder, OutputsAreCommittedInThisOrder) {
                                             beginning + TempPath(120) + ", " + ThumbPath(120)));
 }
 
-/// A setting in which no field has its first value.
+/// A setting in which no field has its default value.
 PhotoThumbSetting FilledSetting() {
   PhotoThumbSetting setting;
   setting.srcPath = "source";

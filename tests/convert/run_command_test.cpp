@@ -16,7 +16,7 @@ using ::testing::ElementsAre;
 using ::testing::IsEmpty;
 using ::testing::Not;
 
-/// The options of a setting of MakeSetting.
+/// The options of a setting from MakeSetting.
 Words Options(const std::string& box) {
   return WordsOf("-define jpeg:size=" + box + " -thumbnail " + box +
                  "> -quality 90 +profile !icc,* -flatten -colorspace sRGB");

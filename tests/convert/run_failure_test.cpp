@@ -1,4 +1,4 @@
-// Photos that are refused or change while they are converted, and converters that fail.
+// Photos that are rejected or change while they are converted, and converters that fail.
 #include <signal.h>
 #include <sys/stat.h>
 #include <unistd.h>
@@ -19,14 +19,14 @@ using ::testing::UnorderedElementsAre;
 
 class RunFailure : public ConvertTest {
  protected:
-  /// Runs a job of these widths with the converter doing as planned; the run must fail.
+  /// Runs a job of these widths with this plan for the converter; expects it to fail.
   void ExpectFailure(const StubPlan& plan, const std::vector<int>& widths = {1280, 320, 120}) {
     Converter().Plan(plan);
     PhotoConvertJob job = MakeJob(widths);
     EXPECT_EQ(RunPhotoConvertJob(job), -1);
   }
 
-  /// Runs a job whose source is refused before the converter is started.
+  /// Runs a job whose source is rejected before the converter is started.
   void ExpectRefused(const std::string& line) {
     PhotoConvertJob job = MakeJob({1280, 320});
     WriteFile(TempPath(320), "not of this run");
@@ -123,14 +123,14 @@ std::string ChangeLine(const SourceFigures& before, const SourceFigures& now) {
 
 class SourceChange : public ConvertTest {
  protected:
-  /// Runs a job with the converter doing as planned.
+  /// Runs a job with this plan for the converter.
   int Run(const StubPlan& plan) {
     Converter().Plan(plan);
     PhotoConvertJob job = MakeJob({1280, 320});
     return RunPhotoConvertJob(job);
   }
 
-  /// Commits finished outputs of a photo that had these figures when it was read.
+  /// Commits finished outputs of a photo that had these block and byte counts when it was read.
   static int Commit(int64_t oldBlocks, int64_t oldSize) {
     const PhotoConvertJob job = MakeJob({1280, 320});
     WriteFile(TempPath(1280), "first output");

@@ -1,4 +1,4 @@
-// The names under which the converter writes.
+// The temporary names of the converter's outputs.
 #include <sys/stat.h>
 #include <unistd.h>
 

@@ -19,7 +19,7 @@ namespace {
 
 /// Well below the fuzzer's memory limit, so that exceeding that limit indicates a leak.
 constexpr size_t kMemoryLimit = size_t{32} << 20;
-/// Larger pictures would take too long to process many of them.
+/// Larger pictures would take too long.
 constexpr int64_t kMostPixels = 1000000;
 
 Step MakeStep(Step::Kind kind, int quarterTurns = 0) {

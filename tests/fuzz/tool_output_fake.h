@@ -1,4 +1,4 @@
-// Replaces the platform's piped child processes: every tool that is started prints the same output.
+// Replaces the platform's piped child processes: every tool prints the same output.
 #pragma once
 
 #include <cstddef>

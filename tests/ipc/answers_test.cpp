@@ -19,13 +19,13 @@ class Answers : public ClientTest {
 
   void AnswerNext(const std::string& line) { daemon_->AnswerNext(DaemonReply::Line(line)); }
 
-  /// The record that the client makes of this media object of a successful answer.
+  /// The record that the client reads from this media object in a successful reply.
   VELA_MEDIA_INFO Record(const std::string& media) {
     return RecordOfAnswer(R"({"success":true,"media":)" + media + "}");
   }
 
   VELA_MEDIA_INFO RecordOfAnswer(const std::string& answer) {
-    // No byte is zero, to see which of them the call writes.
+    // No byte is zero, to detect which of them the call writes.
     VELA_MEDIA_INFO record;
     std::memset(&record, 0xA5, sizeof record);
     AnswerNext(answer);
@@ -48,7 +48,7 @@ std::string Described(const VELA_MEDIA_INFO& record) {
 constexpr const char* kClearedRecord =
     "path , type 0, 0x0, rotation 0, duration 0, bitrate 0, size 0, mtime 0";
 
-TEST_F(Answers, WhatCountsAsSuccess) {
+TEST_F(Answers, Successes) {
   for (const char* success : {"true", "1", "-1", "0.5", "1e300"}) {
     for (const ClientOperation& operation : ClientOperations()) {
       SCOPED_TRACE(operation.command + " " + success);
@@ -58,7 +58,7 @@ TEST_F(Answers, WhatCountsAsSuccess) {
   }
 }
 
-TEST_F(Answers, WhatCountsAsFailure) {
+TEST_F(Answers, Failures) {
   for (const char* answer : {
            R"({"success":false})",
            R"({})",
@@ -117,7 +117,7 @@ TEST_F(Answers, Versions) {
       {R"({"success":true,"version":true})", 1},
       {R"({"success":true,"version":null})", 0},
       {R"({"success":true})", 0},
-      // Other types and numbers out of range count as no version.
+      // Values of other types and numbers out of range count as no version.
       {R"({"success":true,"version":"3"})", 0},
       {R"({"success":true,"version":[3]})", 0},
       {R"({"success":true,"version":{"version":3}})", 0},

@@ -14,12 +14,12 @@
 
 namespace vela_test {
 
-/// One operation, seen from outside.
+/// One operation and its expected effects.
 struct ClientOperation {
   std::string command;   ///< the command word it sends
   bool sendsPath;        ///< whether its request names a path
-  int failure;           ///< what `call` returns when the daemon did not carry it out
-  std::string failLine;  ///< what it then writes to the system log
+  int failure;           ///< result of `call` when the daemon fails
+  std::string failLine;  ///< the line that it then logs
   /// Calls it for a path; returns its result, a bool as 0 or 1, 0 for none.
   std::function<int(const char* path)> call;
 };
@@ -55,7 +55,7 @@ class ClientTest : public QuietTest {
  protected:
   static constexpr const char* kPath = "/volume1/photo/a.jpg";
 
-  /// Calls the operation, which has to fail with its value and its log line.
+  /// Calls the operation and expects its failure value and log line.
   static void ExpectFailure(const ClientOperation& operation) {
     EXPECT_EQ(operation.call(kPath), operation.failure) << operation.command;
     EXPECT_THAT(TakeErrorLines(), ::testing::ElementsAre(operation.failLine));

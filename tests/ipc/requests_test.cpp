@@ -1,4 +1,4 @@
-// What the client sends.
+// The requests that the client sends.
 #include <climits>
 #include <optional>
 #include <thread>

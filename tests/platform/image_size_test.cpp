@@ -44,9 +44,9 @@ class ImageSize : public SandboxTest {};
 TEST_F(ImageSize, OfEveryKindThatImageMagickWrites) {
   for (const std::string extension :
        {"jpg", "jpeg", "jpe", "png", "gif", "bmp", "tif", "tiff", "webp", "heic", "heif", "psd"}) {
-    // An odd size is padded in HEIF files, and the library gives the padded one.
+    // An odd size is padded in HEIF files, and the library returns the padded one.
     const bool isHeif = extension == "heic" || extension == "heif";
-    // ImageMagick has another name for two of these.
+    // ImageMagick uses other names for two of these.
     const std::string format = extension == "heif" ? "heic:" : extension == "jpe" ? "jpeg:" : "";
     for (const char* size : {"128x64", isHeif ? "64x128" : "61x19"}) {
       EXPECT_EQ(ConvertedSize(size, {"plasma:"}, format + "/tmp/a." + extension), size)
@@ -73,7 +73,7 @@ TEST_F(ImageSize, OfAllVariantsOfAKind) {
       {"200x300", {"plasma:", "-compress", "JPEG"}, "/tmp/jpeg.tif"},
       {"33x21", {"plasma:"}, "bmp3:/tmp/version_3.bmp"},
       {"33x21", {"plasma:"}, "bmp:/tmp/newest.bmp"},
-      // The content counts, not the name.
+      // The format is detected from the content, not from the name.
       {"31x17", {"plasma:"}, "png:/tmp/png.jpg"},
       {"31x17", {"plasma:"}, "jpeg:/tmp/noname"},
   };
@@ -99,7 +99,7 @@ TEST_F(ImageSize, IsTheStoredOneWhateverTheOrientation) {
   }
 }
 
-TEST_F(ImageSize, NeedsTheHeaderOnly) {
+TEST_F(ImageSize, NeedsOnlyTheHeader) {
   EXPECT_EQ(SizeOf(MakeTruncatedJpeg("/tmp/cut.jpg", 256, 192)), "256x192");
   const std::string png = ReadFile(MakeTransparentPng("/tmp/a.png", 52, 21));
   WriteFile("/tmp/cut.png", png.substr(0, 60));
@@ -115,14 +115,14 @@ TEST_F(ImageSize, OfATransparentPng) {
   EXPECT_EQ(SizeOf(MakeTransparentPng("/tmp/a.png", 52, 21)), "52x21");
 }
 
-/// The four bytes of a number, the lowest first.
+/// The four bytes of a number, little-endian.
 std::string LittleEndian(int32_t number) {
   std::string text;
   for (int i = 0; i < 4; ++i) text += static_cast<char>(number >> (8 * i) & 0xff);
   return text;
 }
 
-/// The size that the header of a bitmap of these dimensions is read as.
+/// The size that is read from the header of a bitmap of these dimensions.
 std::string BitmapSize(int32_t width, int32_t height) {
   WriteFile("/tmp/header.bmp", "BM" + LittleEndian(1000) + LittleEndian(0) + LittleEndian(54) +
                                    LittleEndian(40) + LittleEndian(width) + LittleEndian(height) +
@@ -140,7 +140,7 @@ TEST_F(ImageSize, OfBitmapsByTheirHeader) {
 }
 
 TEST_F(ImageSize, OfAHugePictureCostsNoMemory) {
-  BitmapSize(20000, 10000);  // what the library sets up once is not counted
+  BitmapSize(20000, 10000);  // not counted: the library's one-time initialisation
   rusage before = {};
   getrusage(RUSAGE_SELF, &before);
   EXPECT_EQ(BitmapSize(20000, 10000), "20000x10000");
@@ -273,7 +273,7 @@ TEST_F(ImageSize, OfCameraFiles) {
       {"scan.tiff", "635x348"},          {"phone_8mp.jpg", "3264x2448"},
       {"portrait_6.jpg", "600x450"},     {"corrupted.jpg", "3648x2736"},
   };
-  // The camera files are not on every machine; this one is.
+  // Camera files are not available on every machine; this file is.
   EXPECT_EQ(SizeOf(MakeJpeg("/tmp/own.jpg")), "64x48");
   const std::string directory = SharedMediaDirectory();
   if (directory.empty()) return;

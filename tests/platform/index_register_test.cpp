@@ -66,8 +66,8 @@ const char* const kAllButTime =
     "SELECT photo_path, photo_width, photo_height, thumbnail_path, thumbnail_width, "
     "thumbnail_height FROM conversion ORDER BY photo_path";
 
-// Most tests make their calls in a process of their own: one that has registered something can no
-// longer do so in the copies of itself that other tests make.
+// Most tests make their calls in a separate process: a process that has registered something can no
+// longer do so in processes that other tests fork from it.
 class IndexRegister : public SandboxTest {
  protected:
   void SetUp() override {
@@ -106,7 +106,7 @@ TEST_F(IndexRegister, ReplacesAnEarlierRegistration) {
   });
 }
 
-TEST_F(IndexRegister, MakesDirectoryAndFile) {
+TEST_F(IndexRegister, CreatesDirectoryAndFile) {
   InOwnProcess([] {
     const mode_t mask = umask(0);
     EXPECT_EQ(AddPath("/photo/a.jpg"), 0);
@@ -129,7 +129,7 @@ TEST_F(IndexRegister, KeepsExistingModes) {
   });
 }
 
-TEST_F(IndexRegister, MakesBothWithTheirModesRegardlessOfTheMask) {
+TEST_F(IndexRegister, CreatesBothWithTheirModesRegardlessOfTheMask) {
   InOwnProcess([] {
     RemoveTree(kDirectory);
     const mode_t mask = umask(077);
@@ -189,14 +189,14 @@ TEST_F(IndexRegister, RefusesADatabaseOfANewerProgram) {
   });
 }
 
-TEST_F(IndexRegister, KeepsWhatEarlierProgramsRegistered) {
+TEST_F(IndexRegister, KeepsRegistrationsOfEarlierPrograms) {
   for (const char* path : {"/photo/a.jpg", "/photo/b.jpg"}) {
     EXPECT_EQ(RunForked([path] { return AddPath(path); }), 0);
   }
   EXPECT_EQ(Photos(), (Strings{"/photo/a.jpg", "/photo/b.jpg"}));
 }
 
-TEST_F(IndexRegister, KeepsWhatAKilledProgramRegistered) {
+TEST_F(IndexRegister, KeepsRegistrationsOfAKilledProgram) {
   for (int round = 0; round < 10; ++round) {
     RemoveTree("/tmp/first");
     const std::string directory = "/photo/" + std::to_string(round) + "/";
@@ -236,7 +236,7 @@ TEST_F(IndexRegister, NoticesAReplacedDatabase) {
   InOwnProcess([] {
     EXPECT_EQ(AddPath("/photo/a.jpg"), 0);
     ASSERT_EQ(rename(kDirectory, "/var/lib/velaindex.old"), 0);
-    // The new one is made and filled by another program before the next call here.
+    // Another program creates and fills the new one before the next call here.
     EXPECT_EQ(RunForked([] {
                 sqlite3* database = nullptr;
                 if (mkdir(kDirectory, 0755) != 0) return 1;

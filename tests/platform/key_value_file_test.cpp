@@ -1,4 +1,4 @@
-// Key/value files: reading, setting, and what a crash or a second writer does.
+// Key/value files: reading, setting, crashes and concurrent writers.
 #include <fcntl.h>
 #include <sys/resource.h>
 
@@ -46,7 +46,7 @@ int Check(const char* key, const std::string& value, const char* file = kFile) {
   return VLIBCFileCheckKeyValue(file, key, value.c_str(), 0);
 }
 
-/// A file and what its keys read as.
+/// A file and the values of its keys.
 struct ReadCase : NamedCase {
   std::string content;
   std::vector<std::pair<std::string, Reading>> readings;
@@ -214,7 +214,7 @@ TEST_F(KeyValueSet, MakesTheFileWithMode0644) {
   ExpectOnlyTheFile();
 }
 
-TEST_F(KeyValueSet, WritesWhatIsReadBack) {
+TEST_F(KeyValueSet, WritesValuesThatReadBackUnchanged) {
   std::string everyByte;
   for (int byte = 1; byte < 256; ++byte) {
     if (byte != '\n') everyByte += static_cast<char>(byte);
@@ -230,7 +230,7 @@ TEST_F(KeyValueSet, WritesWhatIsReadBack) {
   }
 }
 
-TEST_F(KeyValueSet, RefusesWhatALineCannotHold) {
+TEST_F(KeyValueSet, RefusesTextThatDoesNotFitOnALine) {
   WriteFile(kFile, "a=\"1\"\n");
   EXPECT_EQ(Set("", "v"), -1);
   EXPECT_EQ(VLIBCErrGet(), EINVAL);
@@ -248,7 +248,7 @@ TEST_F(KeyValueSet, RefusesWhatALineCannotHold) {
 TEST_F(KeyValueSet, KeepsModeAndOwner) {
   WriteFile(kFile, "a=\"1\"\n");
   ASSERT_EQ(chmod(kFile, 0640), 0);
-  // Where the sandbox has no second user, the owner stays the first one.
+  // Without a second user in the sandbox, the owner does not change.
   const bool isOtherOwner = chown(kFile, 1, 1) == 0;
   ASSERT_TRUE(isOtherOwner || errno == EINVAL);
   struct stat before;
@@ -372,7 +372,7 @@ TEST_F(KeyValueSet, MakesANewFileWhenTheLockedOneIsRemoved) {
   EXPECT_EQ(ReadFile(kFile), "a=\"2\"\n");
 }
 
-TEST_F(KeyValueSet, RemovesWhatADeadWriterHasLeft) {
+TEST_F(KeyValueSet, RemovesTheScratchFileOfAKilledWriter) {
   WriteFile(kFile, "a=\"1\"\n");
   WriteFile(kScratch, "half of a line");
   EXPECT_EQ(Set("a", "2"), 0);
@@ -384,7 +384,7 @@ TEST_F(KeyValueSet, RemovesWhatADeadWriterHasLeft) {
   EXPECT_EQ(ReadFile("/var/spool/other"), "a=\"1\"\n");
 }
 
-TEST_F(KeyValueSet, DoesNotTakeTheScratchFileOfALivingWriter) {
+TEST_F(KeyValueSet, KeepsTheScratchFileOfARunningWriter) {
   WriteFile(kFile, "a=\"1\"\n");
   const int result = RunAgainstLock(
       kScratch, [] { return Set("a", "2"); },

@@ -43,8 +43,8 @@ long long BytesRead() {
   return bytes;
 }
 
-/// Lets the file become old enough to be recognised by its times.
-void LetAge() {
+/// Waits until the file is old enough to be recognised by its times.
+void WaitUntilSettled() {
   std::this_thread::sleep_for(std::chrono::milliseconds(200));
 }
 
@@ -63,7 +63,7 @@ class LargeFile : public SandboxTest {
   void SetUp() override {
     SandboxTest::SetUp();
     WriteFile(kFile, Lines(kLineCount));
-    LetAge();
+    WaitUntilSettled();
     ASSERT_TRUE(Has(Line(0)));
     ASSERT_FALSE(Has(Line(kLineCount)));
   }
@@ -71,7 +71,7 @@ class LargeFile : public SandboxTest {
 
 TEST_F(LargeFile, IsReadOnceForManySearches) {
   WriteFile(kFile, Lines(kLineCount));
-  LetAge();
+  WaitUntilSettled();
   const long long before = BytesRead();
   for (int i = 0; i < kLineCount; i += 20) {
     ASSERT_TRUE(Has(Line(i)));
@@ -102,7 +102,7 @@ TEST_F(LargeFile, CopiesTheLineAndReturnsItsLength) {
 
 TEST_F(LargeFile, FindsALastLineWithoutNewline) {
   AppendToFile(kFile, "last");
-  LetAge();
+  WaitUntilSettled();
   EXPECT_TRUE(Has("last"));
   EXPECT_TRUE(Has("last")) << "the second time";
   EXPECT_FALSE(Has("las"));
@@ -117,7 +117,7 @@ TEST_F(LargeFile, FindsLinesOfAllLengthsAndBytes) {
   }
   for (const std::string& line : lines) content += line + "\n";
   WriteFile(kFile, content);
-  LetAge();
+  WaitUntilSettled();
   for (int round = 0; round < 2; ++round) {
     for (const std::string& line : lines) {
       EXPECT_TRUE(Has(line)) << line.size();
@@ -162,7 +162,7 @@ TEST_F(LargeFile, ShowsEveryOneOfManyQuickChanges) {
   }
 }
 
-TEST_F(LargeFile, ShowsTheFileThatHasTakenItsPlace) {
+TEST_F(LargeFile, IsReadAgainAfterItsReplacement) {
   std::string content = Lines(kLineCount);
   content.replace(0, 15, "/photo/replaced");
   WriteFile("/var/spool/replacement", content);
@@ -173,7 +173,7 @@ TEST_F(LargeFile, ShowsTheFileThatHasTakenItsPlace) {
   EXPECT_FALSE(Has(Line(0)));
 }
 
-TEST_F(LargeFile, ShowsWhatIsLeftOfACutOne) {
+TEST_F(LargeFile, IsReadAgainAfterItsTruncation) {
   ASSERT_EQ(truncate(kFile, (kLineCount - 1) * kLineSize), 0);
   EXPECT_FALSE(Has(Line(kLineCount - 1)));
   ASSERT_EQ(truncate(kFile, kLineSize), 0);
@@ -183,7 +183,7 @@ TEST_F(LargeFile, ShowsWhatIsLeftOfACutOne) {
   EXPECT_FALSE(Has(Line(0)));
 }
 
-TEST_F(LargeFile, IsGoneOnceItIsRemoved) {
+TEST_F(LargeFile, IsNotFoundAfterItsRemoval) {
   ASSERT_EQ(unlink(kFile), 0);
   EXPECT_EQ(Find(Line(0)), -1);
   EXPECT_EQ(VLIBCErrGet(), ENOENT);
@@ -191,7 +191,7 @@ TEST_F(LargeFile, IsGoneOnceItIsRemoved) {
   EXPECT_FALSE(Has(Line(0)));
 }
 
-TEST_F(LargeFile, CannotBeSearchedAnyMoreOnceItMayNotBeRead) {
+TEST_F(LargeFile, CannotBeSearchedWithoutReadPermission) {
   ASSERT_EQ(chmod(kFile, 0), 0);
   const WithoutCapabilities ordinary;
   EXPECT_EQ(Find(Line(0)), -1);
@@ -205,7 +205,7 @@ TEST_F(LargeFile, IsOneOfMany) {
     files.push_back(std::string(kFile) + std::to_string(i));
     WriteFile(files.back(), Lines(5000) + "/only/in/" + std::to_string(i) + "\n");
   }
-  LetAge();
+  WaitUntilSettled();
   for (int round = 0; round < 3; ++round) {
     for (int i = 0; i < 9; ++i) {
       for (int line = 0; line < 9; ++line) {
@@ -246,7 +246,7 @@ TEST_F(LargeFile, LeavesNoDescriptorOpen) {
 
 class SearchedFile : public SandboxTest {};
 
-TEST_F(SearchedFile, IsSearchedRightAtEverySizeAroundTheOneWhereItCountsAsLarge) {
+TEST_F(SearchedFile, IsSearchedCorrectlyAtSizesAroundTheLimitForAnIndex) {
   for (const int size : {65535, 65536, 65537, 131072}) {
     std::string content = Lines(size / kLineSize + 1);
     content.resize(static_cast<size_t>(size) - 4);
@@ -255,16 +255,16 @@ TEST_F(SearchedFile, IsSearchedRightAtEverySizeAroundTheOneWhereItCountsAsLarge)
       EXPECT_TRUE(Has("end")) << size;
       EXPECT_TRUE(Has(Line(0))) << size;
       EXPECT_FALSE(Has("en")) << size;
-      LetAge();
+      WaitUntilSettled();
     }
   }
 }
 
-TEST_F(SearchedFile, MayHaveMoreLinesThanAreWorthRemembering) {
+TEST_F(SearchedFile, MayHaveTooManyLinesForAnIndex) {
   std::string content((size_t{8} << 20) + 10, '\n');
   content.replace(0, 6, "first\n");
   WriteFile(kFile, content + "/last\n");
-  LetAge();
+  WaitUntilSettled();
   for (int round = 0; round < 2; ++round) {
     EXPECT_TRUE(Has("first"));
     EXPECT_TRUE(Has("/last"));
@@ -272,10 +272,10 @@ TEST_F(SearchedFile, MayHaveMoreLinesThanAreWorthRemembering) {
   }
 }
 
-TEST_F(SearchedFile, WithTooManyLinesIsReadOnceForEachQuestionAfterTheFirst) {
+TEST_F(SearchedFile, WithTooManyLinesIsReadOnceForEachSearchAfterTheFirst) {
   const std::string content((size_t{8} << 20) + 10, '\n');
   WriteFile(kFile, content + "/last\n");
-  LetAge();
+  WaitUntilSettled();
   ASSERT_FALSE(Has("/nowhere"));
   const auto size = static_cast<long long>(content.size());
   for (int question = 0; question < 3; ++question) {
@@ -288,13 +288,13 @@ TEST_F(SearchedFile, WithTooManyLinesIsReadOnceForEachQuestionAfterTheFirst) {
   }
 }
 
-TEST_F(SearchedFile, WithTooManyLinesIsRememberedOnceTheyAreFewer) {
+TEST_F(SearchedFile, WithTooManyLinesIsIndexedOnceTheyAreFewer) {
   const std::string content((size_t{8} << 20) + 10, '\n');
   WriteFile(kFile, content);
-  LetAge();
+  WaitUntilSettled();
   ASSERT_FALSE(Has("/nowhere"));
   WriteFile(kFile, Lines(kLineCount));
-  LetAge();
+  WaitUntilSettled();
   ASSERT_TRUE(Has(Line(7)));
   const long long before = BytesRead();
   EXPECT_FALSE(Has("/nowhere"));
@@ -302,9 +302,9 @@ TEST_F(SearchedFile, WithTooManyLinesIsRememberedOnceTheyAreFewer) {
   EXPECT_LT(BytesRead() - before, kLineCount * kLineSize / 4);
 }
 
-TEST_F(SearchedFile, IsNotTakenForOneOfAnotherNameWithTheSameContent) {
+TEST_F(SearchedFile, IsDistinguishedFromACopyWithAnotherName) {
   WriteFile(kFile, Lines(kLineCount));
-  LetAge();
+  WaitUntilSettled();
   ASSERT_TRUE(Has(Line(0)));
   ASSERT_EQ(link(kFile, "/var/spool/second"), 0);
   EXPECT_TRUE(Has(Line(0), "/var/spool/second"));

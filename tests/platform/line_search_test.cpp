@@ -80,7 +80,8 @@ TEST_F(LineSearch, CutsTheCopyButNotTheLength) {
 }
 
 TEST_F(LineSearch, FindsLinesAcrossTheBordersOfItsReads) {
-  // Lines of lengths around powers of two, each unlike its neighbours in the last byte only.
+  // Lines of lengths around powers of two, each different from its neighbours in the last byte
+  // only.
   std::string content;
   std::vector<std::string> lines;
   for (const size_t length : {1U, 4095U, 4096U, 16383U, 32768U, 65535U, 65536U, 65537U, 200000U}) {

@@ -86,7 +86,7 @@ TEST(MediaKinds, NamesWithoutExtension) {
   EXPECT_FALSE(BlVELAIndexIsRawImage(""));
 }
 
-TEST(MediaKinds, NullIsNone) {
+TEST(MediaKinds, NullHasNoKind) {
   EXPECT_FALSE(BlVELAIndexIsRawImage(nullptr));
   EXPECT_FALSE(BlVELAIndexIsPhotoOnWebFile(nullptr));
   EXPECT_FALSE(BlVELAIndexIsPhotoOnWebConvertFile(nullptr));

@@ -18,7 +18,7 @@ Json::Value Parse(const std::string& text) {
   return value;
 }
 
-/// Reads the object into a record that was full of other things.
+/// Reads the object into a record that was filled with other values.
 VELA_MEDIA_INFO Read(Json::Value media, int expectedResult = 0) {
   VELA_MEDIA_INFO info;
   memset(&info, 0x5a, sizeof(info));

@@ -36,7 +36,7 @@ TEST_F(MediaResolution, OfVideosInAllContainers) {
   for (const char* extension : {"mp4", "mov", "mkv", "avi", "webm", "ts", "wmv", "ogv", "flv"}) {
     EXPECT_EQ(SizeOf(MakeVideo(std::string("/tmp/a.") + extension)), "320x180") << extension;
   }
-  // These formats allow few frame rates and sizes only.
+  // These formats allow only a few frame rates and sizes.
   for (const char* path : {"/tmp/a.mpg", "/tmp/a.m2ts"}) {
     EXPECT_EQ(SizeOf(MakeVideo(path, "320x180", {"-r", "25"})), "320x180") << path;
   }
@@ -65,7 +65,7 @@ TEST_F(MediaResolution, FailsForAnythingButMedia) {
   WriteFile("/tmp/empty.mp4", "");
   WriteFile("/tmp/text.mp4", "no film\n");
   WriteFile("/tmp/text.jpg", "no photo\n");
-  // No address in a playlist is followed.
+  // Addresses in playlists are not followed.
   WriteFile("/tmp/list.mp4",
             "#EXTM3U\n#EXT-X-TARGETDURATION:5\n#EXTINF:5,\nhttp://127.0.0.1:9/a.ts\n");
   ASSERT_EQ(mkfifo("/tmp/pipe.mp4", 0600), 0);

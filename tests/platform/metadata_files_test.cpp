@@ -17,7 +17,7 @@ std::string InEaDir(const char* name) {
 
 class EaWriteSupport : public SandboxTest {};
 
-TEST_F(EaWriteSupport, IsThereForWritableDirectoriesOutsideMetadata) {
+TEST_F(EaWriteSupport, ExistsForWritableDirectoriesOutsideMetadata) {
   MakeDirectories("/tmp/photos/@eaDir/sub");
   MakeDirectories("/tmp/photos/my@eaDir/@eaDirs");
   ASSERT_EQ(symlink("photos", "/tmp/link"), 0);
@@ -33,7 +33,7 @@ TEST_F(EaWriteSupport, IsThereForWritableDirectoriesOutsideMetadata) {
   EXPECT_EQ(IndexIsPathSupportEAWrite(nullptr), 0);
 }
 
-TEST_F(EaWriteSupport, IsNotThereOnAReadOnlyVolume) {
+TEST_F(EaWriteSupport, DoesNotExistOnAReadOnlyVolume) {
   MakeDirectories("/tmp/photos");
   const ReadOnlyMount closed("/tmp/photos");
   EXPECT_EQ(IndexIsPathSupportEAWrite("/tmp/photos"), 0);

@@ -15,7 +15,7 @@ std::string ReadAll(FILE* stream) {
   }
 }
 
-/// What a child has printed and what closing its stream returned.
+/// The output of a child and the result of closing its stream.
 struct Outcome {
   std::string output;
   int status;
@@ -73,14 +73,14 @@ TEST_F(PipedChild, GivesLargeOutputsByPlainReads) {
   EXPECT_EQ(Run("rB"), (Outcome{std::string(5000000, 'x'), 0}));
 }
 
-TEST_F(PipedChild, JoinsStandardErrorOnDemand) {
+TEST_F(PipedChild, IncludesStandardErrorOnRequest) {
   Plan(StubPlan().PrintError("error ").Print("output"));
   for (const char* mode : {"rE", "rBE", "rEB"}) {
     EXPECT_EQ(Run(mode), (Outcome{"error output", 0})) << mode;
   }
 }
 
-TEST_F(PipedChild, LosesStandardErrorOtherwise) {
+TEST_F(PipedChild, DiscardsStandardErrorOtherwise) {
   Plan(StubPlan().PrintErrorRepeated(std::string(1000, 'e'), 1000).Print("output"));
   for (const char* mode : {"r", "rB"}) EXPECT_EQ(Run(mode), (Outcome{"output", 0})) << mode;
 }
@@ -99,7 +99,7 @@ TEST_F(PipedChild, GivesMinusOneWhenASignalEndsIt) {
   EXPECT_EQ(CountZombies(), 0);
 }
 
-TEST_F(PipedChild, IsNullForWhatCannotBeStarted) {
+TEST_F(PipedChild, IsNullWhenTheProgramCannotBeStarted) {
   WriteFile("/tmp/text", "no program");
   ASSERT_EQ(chmod("/tmp/text", 0755), 0);
   const struct {
@@ -260,7 +260,7 @@ TEST_F(PipedChild, DoesNotKeepTheStreamsOfOthersOpen) {
   FILE* first = VLIBCPopen(kTool, "r", "first", nullptr);
   FILE* second = VLIBCPopen(kTool, "r", "second", nullptr);
   ASSERT_NE(second, nullptr);
-  // Would hang if the second child held the pipe.
+  // This would hang if the second child had the pipe open.
   EXPECT_EQ(ReadAndClose(first), (Outcome{"first", 0}));
   WriteFile("/tmp/go", "");
   EXPECT_EQ(VLIBCPclose(second), 0);
@@ -351,7 +351,7 @@ TEST_F(PipedChildLimit, IsTheDefaultForAnUnreadableNumber) {
 TEST_F(PipedChildLimit, RunsInItsOwnThreadThatTakesNoSignals) {
   Plan(StubPlan().CreateFile("/tmp/running").Sleep(60000));
   const int result = RunForked([] {
-    // With the caller's only thread blocking it, the signal could reach the limit's thread only.
+    // The caller's only thread blocks the signal, so only the thread of the limit could receive it.
     signal(SIGUSR1, [](int) { _exit(77); });
     sigset_t one;
     sigemptyset(&one);

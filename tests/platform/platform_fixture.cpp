@@ -83,7 +83,7 @@ int RunAgainstLock(const std::string& file, const std::function<int()>& call,
   Descriptor holder(open(file.c_str(), O_RDWR | O_CREAT | O_CLOEXEC, 0600));
   EXPECT_EQ(flock(holder.Get(), LOCK_EX), 0);
   const pid_t caller = Fork([&] {
-    holder.Close();  // otherwise the copy would keep the lock
+    holder.Close();  // otherwise the forked process would keep the lock
     return call();
   });
   usleep(100000);

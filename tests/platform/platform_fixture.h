@@ -1,5 +1,4 @@
-// Shared by the platform's tests: calls in processes and threads of their own, and checks around
-// them.
+// Shared by the platform's tests: calls in separate processes and threads, and checks around them.
 #pragma once
 
 #include <gmock/gmock.h>
@@ -37,13 +36,13 @@ int RunForked(const std::function<int()>& call);
 /// RunForked with a signal handler that interrupts the call every 2 ms.
 int RunInterrupted(const std::function<int()>& call);
 
-/// Makes the calls, which may contain expectations, in a process of their own.
+/// Makes the calls, which may contain expectations, in a separate process.
 void InOwnProcess(const std::function<void()>& calls);
 
-/// Like InOwnProcess; returns what the calls have printed on standard error.
+/// Like InOwnProcess; returns the standard error of the calls.
 std::string PrintedBy(const std::function<void()>& calls);
 
-/// Makes the call in a process of its own while this one holds an exclusive lock on the file. Runs
+/// Makes the call in a separate process while this one holds an exclusive lock on the file. Runs
 /// `meanwhile` once the call has had time to block, then releases the lock. Returns the call's
 /// result.
 int RunAgainstLock(const std::string& file, const std::function<int()>& call,

@@ -101,7 +101,7 @@ TEST_F(ProcessKill, LeavesErrnoAlone) {
 }
 
 TEST_F(ProcessKill, CanBeCalledFromAHandlerAtAnyMoment) {
-  // The interrupted code holds the locks of the allocator and of stdio much of the time.
+  // Most of the time, the interrupted code holds the locks of the allocator and of stdio.
   const int result = RunForked([] {
     struct sigaction action = {};
     action.sa_handler = [](int) { VLIBCKill("no-such-tool", 0); };

@@ -1,4 +1,4 @@
-// Children that are run to their end.
+// Children that the caller waits for, and others.
 #include <sys/syscall.h>
 
 #include "platform/tool_fixture.h"
@@ -35,7 +35,7 @@ TEST_F(ProcessRunnerTest, EndsTheArgumentsOfACallAtItsFirstNull) {
   EXPECT_EQ(OnlyCall().arguments, (Strings{kTool, "a", "c", "f"}));
 }
 
-TEST_F(ProcessRunnerTest, TakesEveryArgumentAsItIs) {
+TEST_F(ProcessRunnerTest, PassesArgumentsUnchanged) {
   ProcessRunner runner(kTool, kTool, "", " ", "*", "$HOME", "a'b\"c\\", "\xff\n\t", "-", "(");
   EXPECT_EQ(runner.run(true, false), 0);
   EXPECT_EQ(OnlyCall().Parameters(),
@@ -80,7 +80,7 @@ TEST_F(ProcessRunnerTest, IsNonZeroWhenASignalEndsTheChild) {
   }
 }
 
-TEST_F(ProcessRunnerTest, IsNonZeroForWhatCannotBeStarted) {
+TEST_F(ProcessRunnerTest, IsNonZeroWhenTheProgramCannotBeStarted) {
   EXPECT_NE(ProcessRunner(kAbsentTool, "absent").run(true, false), 0);
   EXPECT_EQ(VLIBCErrGet(), ENOENT);
   EXPECT_NE(ProcessRunner("/usr/vela", "x").run(true, false), 0);
@@ -106,7 +106,7 @@ TEST_F(ProcessRunnerTest, IsAProcessNamedAfterTheTool) {
   EXPECT_EQ(Join(caller), 128 + SIGTERM);
 }
 
-TEST_F(ProcessRunnerTest, SendsTheOutputNowhere) {
+TEST_F(ProcessRunnerTest, DiscardsTheOutput) {
   Plan(StubPlan().Print("output").PrintError("error"));
   EXPECT_EQ(Run(), 0);
   const auto descriptors = OnlyCall().descriptors;
@@ -114,7 +114,7 @@ TEST_F(ProcessRunnerTest, SendsTheOutputNowhere) {
   for (const auto& descriptor : descriptors) EXPECT_EQ(descriptor.target, "/dev/null");
 }
 
-TEST_F(ProcessRunnerTest, KeepsTheOutputOnDemand) {
+TEST_F(ProcessRunnerTest, KeepsTheOutputOnRequest) {
   Plan(StubPlan().Print("output ").PrintError("error "));
   const int result = RunForked([] {
     const int file = open("/tmp/output", O_WRONLY | O_CREAT | O_APPEND, 0644);
@@ -139,7 +139,7 @@ TEST_F(ProcessRunnerTest, KeepsAnOutputThatIsClosedAwayFromOtherFiles) {
   }
 }
 
-TEST_F(ProcessRunnerTest, LetsNoDescriptorOfTheProgramThrough) {
+TEST_F(ProcessRunnerTest, InheritsNoDescriptorOfTheProgram) {
   const int plain = open("/dev/zero", O_RDONLY);
   const int far = fcntl(plain, F_DUPFD, 900);
   EXPECT_EQ(Run(), 0);
@@ -181,7 +181,7 @@ TEST_F(ProcessRunnerTest, EndsTheChildWithACallerThatIsKilled) {
   ExpectEndWithKilledCaller([] { return Run(); });
 }
 
-TEST_F(ProcessRunnerTest, DoesNotWaitOnDemand) {
+TEST_F(ProcessRunnerTest, DoesNotWaitOnRequest) {
   Plan(StubPlan().WaitForFile("/tmp/go").CreateFile("/tmp/end-reached"));
   EXPECT_EQ(ProcessRunner(kTool, kTool).run(false, false), 0);
   EXPECT_FALSE(Exists("/tmp/end-reached"));
@@ -199,13 +199,13 @@ TEST_F(ProcessRunnerTest, LeavesNoDescriptorOpen) {
   });
 }
 
-/// Ends the tools as the program's own handler does. Exits with status 40 when all of them are
-/// gone, 41 when one was missed and still runs.
+/// Terminates the tools like the program's own handler. Exits with status 40 when all of them have
+/// ended, 41 when one was missed and is still running.
 void EndTools(int) {
   VLIBCKill("some-tool", SIGKILL);
   constexpr timespec kPause = {0, 5000000};
   for (int i = 0; i < 600; ++i) {
-    if (VLIBCKill("some-tool", SIGURG) == 0) _exit(40);  // a signal that does nothing
+    if (VLIBCKill("some-tool", SIGURG) == 0) _exit(40);  // a signal that has no effect
     nanosleep(&kPause, nullptr);
   }
   _exit(41);

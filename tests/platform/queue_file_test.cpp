@@ -15,7 +15,7 @@ namespace {
 
 constexpr const char* kQueue = "/var/spool/thumb_create.queue";
 
-constexpr const char* kAway = "/var/spool/thumb_create.queue.tmp";
+constexpr const char* kRenamedQueue = "/var/spool/thumb_create.queue.tmp";
 
 int Append() {
   return WriteIndexQueue("/photo/a", kQueue);
@@ -31,7 +31,7 @@ TEST_F(QueueFile, IsMadeWithMode0644) {
   EXPECT_EQ(ModeOf(kQueue), 0644);
 }
 
-TEST_F(QueueFile, KeepsWhatItHoldsAndItsMode) {
+TEST_F(QueueFile, KeepsItsContentAndMode) {
   WriteFile(kQueue, "/photo/a\n");
   ASSERT_EQ(chmod(kQueue, 0600), 0);
   EXPECT_EQ(WriteIndexQueue("/photo/b", kQueue), 0);
@@ -97,21 +97,21 @@ TEST_F(QueueFile, WaitsForTheLock) {
   EXPECT_EQ(ReadFile(kQueue), "/photo/a\n");
 }
 
-TEST_F(QueueFile, IsMadeAnewWhenRenamedAwayDuringTheWait) {
+TEST_F(QueueFile, IsCreatedAgainWhenRenamedDuringTheWait) {
   WriteFile(kQueue, "/photo/old\n");
-  EXPECT_EQ(RunAgainstLock(kQueue, Append, [] { ASSERT_EQ(rename(kQueue, kAway), 0); }), 0);
-  EXPECT_EQ(ReadFile(kAway), "/photo/old\n");
+  EXPECT_EQ(RunAgainstLock(kQueue, Append, [] { ASSERT_EQ(rename(kQueue, kRenamedQueue), 0); }), 0);
+  EXPECT_EQ(ReadFile(kRenamedQueue), "/photo/old\n");
   EXPECT_EQ(ReadFile(kQueue), "/photo/a\n");
 }
 
 TEST_F(QueueFile, IsTheNewOneWhenReplacedDuringTheWait) {
   WriteFile(kQueue, "/photo/old\n");
   const auto replace = [] {
-    ASSERT_EQ(rename(kQueue, kAway), 0);
+    ASSERT_EQ(rename(kQueue, kRenamedQueue), 0);
     WriteFile(kQueue, "/photo/new\n");
   };
   EXPECT_EQ(RunAgainstLock(kQueue, Append, replace), 0);
-  EXPECT_EQ(ReadFile(kAway), "/photo/old\n");
+  EXPECT_EQ(ReadFile(kRenamedQueue), "/photo/old\n");
   EXPECT_EQ(ReadFile(kQueue), "/photo/new\n/photo/a\n");
 }
 
@@ -129,7 +129,7 @@ TEST_F(QueueFile, GetsEveryLineOfManyWritersOnce) {
       return 0;
     }));
   }
-  // Meanwhile the queue is processed as usual: renamed away under its lock.
+  // Meanwhile the queue is processed as usual: renamed under its lock.
   std::map<std::string, int> seen;
   const auto collect = [&seen](const std::string& file) {
     for (const std::string& line : ReadLines(file)) ++seen[line];

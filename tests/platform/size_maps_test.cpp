@@ -1,4 +1,4 @@
-// Size maps and the settings they come from.
+// Size maps and their settings.
 #include "platform/platform_fixture.h"
 
 namespace vela_test {
@@ -51,7 +51,7 @@ TEST_F(SizeMaps, HoldAllClassesForAnyOtherValue) {
 }
 
 TEST_F(SizeMaps, FollowEveryChangeOfTheFile) {
-  // Same size and, on a coarse clock, the same time: only the content differs.
+  // The size and, on a coarse clock, the time are the same: only the content differs.
   for (int i = 0; i < 200; ++i) {
     const int map = 10 + i % 50;
     SetPhotoMap(std::to_string(map));

@@ -1,4 +1,4 @@
-// The exchange of one JSON line each way over a local socket.
+// The exchange of one JSON line in each direction over a local socket.
 #include <json/reader.h>
 #include <json/value.h>
 #include <sys/socket.h>
@@ -16,7 +16,7 @@ constexpr size_t kReplyMax = 16 * 1024 * 1024;
 Json::Value Request() {
   Json::Value packet(Json::objectValue);
   packet["command"] = "GET_INDEX_VERSION";
-  packet["success"] = true;  // must not survive a failure
+  packet["success"] = true;  // must be cleared on failure
   return packet;
 }
 
@@ -286,7 +286,7 @@ TEST_F(SocketExchange, NeverRaisesSigpipe) {
   }
 }
 
-TEST_F(SocketExchange, FailsWhenTheTimeIsOver) {
+TEST_F(SocketExchange, FailsAfterTheTimeLimit) {
   DaemonPeer daemon;
   daemon.AnswerNext(DaemonReply::Silence());
   ExpectTimeoutAfterOneSecond();
@@ -298,7 +298,7 @@ TEST_F(SocketExchange, CountsTheTimeOfTheWholeExchange) {
   ExpectTimeoutAfterOneSecond();
 }
 
-TEST_F(SocketExchange, FailsAtOnceWithoutTime) {
+TEST_F(SocketExchange, FailsAtOnceWithATimeLimitOfZero) {
   DaemonPeer daemon;
   const Stopwatch watch;
   for (const int seconds : {0, -1, -2147483647}) {
@@ -368,7 +368,7 @@ TEST_F(SocketExchange, FailsInTimeWhenTheQueueStaysFull) {
   ExpectTimeoutAfterOneSecond();
 }
 
-TEST_F(SocketExchange, FailsWhenAFullDaemonGoesAway) {
+TEST_F(SocketExchange, FailsWhenADaemonWithAFullQueueEnds) {
   FullServer server;
   std::thread closing([&server] {
     usleep(200000);
@@ -394,7 +394,7 @@ int TimeOutInterrupted() {
   });
 }
 
-TEST_F(SocketExchange, KeepsItsTimeAcrossInterruptions) {
+TEST_F(SocketExchange, KeepsItsTimeLimitAcrossInterruptions) {
   DaemonPeer daemon;
   daemon.AnswerNext(DaemonReply::Silence());
   const Stopwatch watch;

@@ -29,7 +29,7 @@ TEST(PathDirName, IsThePathWithoutItsLastComponent) {
   }
 }
 
-TEST(PathExtension, IsWhatFollowsTheLastDotOfTheLastComponent) {
+TEST(PathExtension, FollowsTheLastDotOfTheLastComponent) {
   const struct {
     const char* path;
     const char* extension;

@@ -38,7 +38,7 @@ class ToolTest : public SandboxTest {
   }
 
   /// Starts a process that makes the call, kills it once the tool runs, and expects the tool to end
-  /// as well.
+  /// too.
   void ExpectEndWithKilledCaller(const std::function<int()>& call) {
     Plan(StubPlan().CreateFile("/tmp/running").Sleep(60000));
     const pid_t caller = Fork(call);

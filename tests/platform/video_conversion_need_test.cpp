@@ -1,4 +1,4 @@
-// Which videos need a converted video for browsers.
+// Which videos need a converted version for browsers.
 #include "platform/video_fixture.h"
 #include "support/named_case.h"
 
@@ -9,7 +9,7 @@ int NeedOf(const std::string& path) {
   return VELAIDX_IsVideoNeedConvert(path.c_str());
 }
 
-/// Replaces the brand that the video's first box names as its major one.
+/// Replaces the major brand in the video's first box.
 void SetBrand(const std::string& path, const std::string& brand) {
   std::string film = ReadFile(path);
   ASSERT_EQ(film.substr(4, 4), "ftyp");
@@ -109,7 +109,7 @@ TEST_F(VideoConversionNeed, DependsOnTheBrand) {
   EXPECT_EQ(NeedOf("/tmp/a.mp4"), 1);
 }
 
-TEST_F(VideoConversionNeed, IsThereForQuicktimeWithoutBrand) {
+TEST_F(VideoConversionNeed, ExistsForQuicktimeWithoutBrand) {
   ASSERT_EQ(NeedOf(MakeFilm("/tmp/a.mov")), 1);
   // Readers skip a box of this type.
   std::string film = ReadFile("/tmp/a.mov");

@@ -1,4 +1,4 @@
-// Videos and files that are none, for the platform's functions that examine videos.
+// Videos and other files for tests of the functions that examine videos.
 #pragma once
 
 #include "platform/platform_fixture.h"
@@ -13,12 +13,13 @@ inline void Ffmpeg(const Strings& arguments) {
   ASSERT_EQ(result.exitCode, 0) << result.err;
 }
 
-/// Makes files of all sorts that are no videos. Returns their paths, a directory and an empty path.
+/// Makes files of various kinds other than videos. Returns their paths, a directory and an empty
+/// path.
 inline Strings MakeFilesThatAreNoVideos() {
   WriteFile("/tmp/empty.mp4", "");
   WriteFile("/tmp/text.mp4", "no film\n");
   WriteFile("/tmp/list.mp4", "#EXTM3U\n#EXTINF:1,\n/tmp/a.mp4\n");
-  MakeFilm("/tmp/a.mp4");  // what the list names
+  MakeFilm("/tmp/a.mp4");  // referenced by the playlist
   EXPECT_EQ(mkfifo("/tmp/pipe.mp4", 0600), 0);
   return {"/tmp/empty.mp4",
           "/tmp/text.mp4",
@@ -29,7 +30,8 @@ inline Strings MakeFilesThatAreNoVideos() {
           ""};
 }
 
-/// File names that a video library might take for patterns, protocols, options or several lines.
+/// File names that a video library might misinterpret as patterns, protocols, options or several
+/// lines.
 inline const Strings kOddNames = {
     "two  words .mp4", "100%03d%s.mp4", "http:a.mp4",     "pipe:0.mp4",
     "-i.mp4",          "\xff\xfe.mp4",  "two\nlines.mp4", "it's \"q\" $HOME `x`;.mp4"};

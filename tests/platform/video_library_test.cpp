@@ -1,4 +1,4 @@
-// When the video library is loaded.
+// The conditions under which the video library is loaded.
 #include <optional>
 
 #include "platform/platform_fixture.h"

@@ -6,7 +6,7 @@
 namespace vela_test {
 namespace {
 
-/// Empty when the call fails; the record must be as it was then.
+/// Empty when the call fails, which must leave the record unchanged.
 std::optional<_VIDEO_METADATA_> MetadataOf(const std::string& path) {
   _VIDEO_METADATA_ metadata = {7, 8, 9};
   const int result = VELAIDX_GetVideoMetadata(path.c_str(), &metadata);

@@ -1,4 +1,4 @@
-// Text made safe for a terminal or a line of a log.
+// Text made safe for a terminal or a log line.
 #include "posix/escaped_text.h"
 
 #include <gtest/gtest.h>
@@ -32,7 +32,8 @@ TEST(EscapedText, EscapesControlsAndOnRequestInvalidBytes) {
        "\\xe2\\x80\\xa8 \\xe2\\x80\\xa9 \\xe2\\x80\\xae \\xe2\\x81\\xa6 \\xe2\\x80\\x8f"},
       {"\xe2\x80\xa7\xe2\x80\xaf\xe2\x81\xaa", "\xe2\x80\xa7\xe2\x80\xaf\xe2\x81\xaa",
        "\xe2\x80\xa7\xe2\x80\xaf\xe2\x81\xaa"},
-      // A byte that begins no character, a cut character, one followed by another character.
+      // A byte that cannot begin a character, a truncated character, one followed by another
+      // character.
       {"\xff", "\xff", "\\xff"},
       {"\xe2\xac", "\xe2\xac", "\\xe2\\xac"},
       {"\xc3 x", "\xc3 x", "\\xc3 x"},

@@ -192,7 +192,7 @@ TEST_F(PhotoPlan, AFailedConversionMarksTheWholePhaseAndNoOther) {
   MakeThumb("VELAPHOTO_THUMB_M.jpg");
   MakeThumb("VELAPHOTO_THUMB_S.jpg");
   MakeThumb("VELAPHOTO:THUMB_SM.jpg");
-  MakeThumb("VELAPHOTO_THUMB_B.jpg");  // up to date, and gone with the others
+  MakeThumb("VELAPHOTO_THUMB_B.jpg");  // up to date, but removed with the others
   Converter().Plan(StubPlan().Exit(1));
   EXPECT_EQ(CreateThumbs(1), -1);
   EXPECT_THAT(EaFiles(), UnorderedElementsAre("VELAPHOTO_THUMB_M.jpg", "VELAPHOTO_THUMB_S.jpg",

@@ -30,7 +30,7 @@ class PlanTest : public QuietTest {
  protected:
   void SetUp() override {
     QuietTest::SetUp();
-    mask_ = umask(0);  // as the program runs
+    mask_ = umask(0);  // as in the program
     converter_.emplace(kConverterPath);
     WriteFile(kPhoto, "photo");
     SetFileTime(kPhoto, kPhotoTime);
@@ -44,7 +44,7 @@ class PlanTest : public QuietTest {
 
   StubTool& Converter() { return *converter_; }
 
-  /// Adds a profile; to be added in ascending order of size, as lists are.
+  /// Adds a profile; profiles must be added in ascending order of size.
   const ThumbnailProfile& AddProfile(int size, const std::string& filename, int phase = 0,
                                      int quality = 80, const std::string& unsharp = "") {
     profiles_.all.push_back(

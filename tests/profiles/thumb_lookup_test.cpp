@@ -25,7 +25,7 @@ struct Thumb {
   int64_t seconds = 1;  ///< its age relative to the photo
 };
 
-/// A profile of the older name and one of the current name.
+/// A profile with the older name and one with the current name.
 class ProfileOfEachName : public PlanTest {
  protected:
   void SetUp() override {
@@ -63,8 +63,8 @@ class ThumbLookup : public ProfileOfEachName {
 
 struct LookupCase : NamedCase {
   std::vector<Thumb> thumbs;
-  std::string colonFinds;       ///< what the profile of the older name finds, "" for nothing
-  std::string underscoreFinds;  ///< the same for that of the current name
+  std::string colonFinds;       ///< result for the profile with the older name, "" for none
+  std::string underscoreFinds;  ///< the same for the profile with the current name
   int isColonUpToDate;
   int isUnderscoreUpToDate;
 };

@@ -1,4 +1,4 @@
-// Arguments, exit status and what is printed on standard error.
+// Arguments, exit status and output on standard error.
 #include <sys/stat.h>
 #include <unistd.h>
 
@@ -264,7 +264,7 @@ TEST_F(CommandLine, LongerProfileFileIsCut) {
 }
 
 TEST_F(CommandLine, LongDirectoriesAreCut) {
-  // There is no room for a photo's name after such a path; the error line shows the path.
+  // Such a path leaves no room for a photo's name; the error line shows the path.
   MakePhotosIn({kPhotos});
   const std::string path = PathOfLength(kPhotos, kLongestPath);
   EXPECT_SUCCESS(Run({path, path + "/and/more", "R:" + path, "R:" + path + "/and/more"}));

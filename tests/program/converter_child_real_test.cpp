@@ -13,7 +13,7 @@ namespace {
 
 using ConverterChild = RealProgramTest;
 
-/// The target of a link in /proc; empty when it is gone.
+/// The target of a link in /proc; empty when it no longer exists.
 std::string LinkTarget(const std::string& path) {
   char target[PATH_MAX];
   const ssize_t length = readlink(path.c_str(), target, sizeof target);
@@ -24,7 +24,7 @@ std::string ExecutableOf(pid_t pid) {
   return LinkTarget("/proc/" + std::to_string(pid) + "/exe");
 }
 
-/// The targets of the descriptors of a process; empty when it is gone.
+/// The targets of the descriptors of a process; empty when it has ended.
 Strings DescriptorTargets(pid_t pid) {
   Strings targets;
   const std::string directory = "/proc/" + std::to_string(pid) + "/fd";
@@ -37,11 +37,11 @@ Strings DescriptorTargets(pid_t pid) {
   return targets;
 }
 
-/// The converters that run now. A child that has not called exec yet still is the program; the
-/// pause is for a child that is just calling it.
+/// The running converters. A child that has not called exec yet still is the program; the pause
+/// allows for a child that is just calling it.
 std::vector<pid_t> RunningConverters(const Program& program) {
   std::vector<pid_t> converters;
-  for (const pid_t pid : ProcessesCalled("convert-thumb")) {
+  for (const pid_t pid : ProcessesNamed("convert-thumb")) {
     const std::string executable = ExecutableOf(pid);
     if (!executable.empty() && executable != ExecutableOf(program.Pid())) {
       converters.push_back(pid);
@@ -51,8 +51,8 @@ std::vector<pid_t> RunningConverters(const Program& program) {
   return converters;
 }
 
-/// Whether a converter opens such a file by itself: the photo and its outputs, libraries, settings
-/// and files that all processes open.
+/// Whether a converter opens this file itself: the photo and its outputs, libraries, settings and
+/// files that all processes open.
 bool IsTheConvertersOwn(const std::string& target) {
   if (target.compare(0, 1, "/") != 0) {
     return target == "anon_inode:[landlock-ruleset]";  // while it sets up its own sandbox
@@ -105,7 +105,7 @@ TEST_F(ConverterChild, HasNoneOfTheCallersDescriptors) {
   EXPECT_TRUE(HasThumbs(photo, OfPhase(kinds_, 1)));
 }
 
-TEST_F(ConverterChild, StandardDescriptorsAreThereWhenTheCallerClosedThem) {
+TEST_F(ConverterChild, StandardDescriptorsAreOpenWhenTheCallerClosedThem) {
   const StubTool converter(kConverterPath);
   converter.Plan(StubPlan().PassThrough(RealConverterPath()));
   const std::string photo = MakeJpeg(InPhotos("a.jpg"));
@@ -121,8 +121,8 @@ TEST_F(ConverterChild, StandardDescriptorsAreThereWhenTheCallerClosedThem) {
   EXPECT_TRUE(HasThumbs(photo, OfPhase(kinds_, 1)));
 }
 
-// The real converter, inspected from outside as long as it runs.
-TEST_F(ConverterChild, RealConverterHoldsNothingOfTheProgram) {
+// The real converter, inspected from outside while it is running.
+TEST_F(ConverterChild, RealConverterInheritsNoDescriptorOfTheProgram) {
   JpegRecipe recipe = RecipeOf(2400, 1800);
   for (int i = 0; i < 3; ++i) {
     MakeJpeg(InPhotos(std::to_string(i) + ".jpg"), recipe);

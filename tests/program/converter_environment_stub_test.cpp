@@ -1,4 +1,4 @@
-// The environment that the converter is started in, whatever that of the program is.
+// The environment of the converter, whatever that of the program is.
 #include <fcntl.h>
 #include <signal.h>
 #include <unistd.h>
@@ -109,7 +109,8 @@ TEST_F(ConverterEnvironment, IsStartedByItsFullNameWithoutShell) {
 }
 
 TEST_F(ConverterEnvironment, NamesAreNotInterpreted) {
-  // What a shell would act on, and what the converter would expand in an output's name.
+  // Characters that a shell would interpret, and that the converter would expand in an output's
+  // name.
   const std::string photo = MakePhoto("/tmp/ph $(touch x);'\" %d/a %s b`.jpg");
   RunWithDaemon({"/tmp/ph $(touch x);'\" %d"});
   EXPECT_THAT(ConvertedSources(), ElementsAre(photo, Thumb(photo, "XL")));

@@ -1,4 +1,4 @@
-// The lock that keeps instances out of each other's directories.
+// The lock that prevents two instances from processing the same directory.
 #include <signal.h>
 #include <unistd.h>
 
@@ -72,7 +72,7 @@ TEST_F(InstanceLock, IsReleasedBeforeTheDirectoryIsQueued) {
   Program program = Start();
   ASSERT_TRUE(daemon.WaitForRequests(2));
   EXPECT_TRUE(WaitUntilUnlocked(kRoot));
-  // The program has not ended: it still waits for the queue file.
+  // The program has not ended: it is still waiting for the queue file.
   EXPECT_FALSE(program.Wait(std::chrono::milliseconds(50)).has_value());
   EXPECT_EQ(ReadFile(kQueue), "");
 }

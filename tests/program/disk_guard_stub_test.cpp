@@ -23,7 +23,8 @@ class DiskGuard : public StubProgramTest {
 
   void TearDown() override { volume_.reset(); }
 
-  /// Makes a photo with its metadata directory, so that the program needs no space to make that.
+  /// Makes a photo with its metadata directory, so that the program needs no space for that
+  /// directory.
   static std::string Put(const std::string& path) {
     MakePhoto(path);
     MakeDirectories(MetadataDirOf(path));

@@ -23,7 +23,7 @@ class FailMarkers : public StubProgramTest {
   }
 };
 
-TEST_F(FailMarkers, AreRemovedAlsoWhenNothingIsToBeMade) {
+TEST_F(FailMarkers, AreRemovedEvenIfNothingHasToBeMade) {
   const std::string photo = PutDonePhoto("a.jpg");
   WriteFile(Marker(photo, "XL"), "");
   WriteFile(Marker(photo, "L"), "");
@@ -40,7 +40,7 @@ TEST_F(FailMarkers, AreRemovedAlsoWhenNothingIsToBeMade) {
 
 TEST_F(FailMarkers, OfOtherPhotosStay) {
   PutDonePhoto("a.jpg");
-  // There is no photo of that name any more.
+  // A photo of that name no longer exists.
   WriteFile(Marker(InPhotos("gone.jpg"), "XL"), "");
   EXPECT_SUCCESS(Run());
   EXPECT_THAT(MetadataOf(InPhotos("gone.jpg")), ElementsAre("VELAPHOTO_THUMB_XL.fail"));

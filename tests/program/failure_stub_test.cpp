@@ -1,4 +1,4 @@
-// What a failed conversion leaves: markers, counts and reports.
+// The results of a failed conversion: markers, counts and reports.
 #include <signal.h>
 #include <sys/stat.h>
 #include <unistd.h>
@@ -18,10 +18,10 @@ const Strings kPhase2Failed = {"VELAPHOTO_THUMB_B.jpg", "VELAPHOTO_THUMB_M.jpg",
 
 /// A run in which a converter call fails.
 struct FailedRun : NamedCase {
-  Strings thumbs;    ///< size classes that are there before
+  Strings thumbs;    ///< size classes that exist before the run
   int call;          ///< the call that fails
   StubPlan plan;     ///< what it does
-  Strings metadata;  ///< what is there afterwards
+  Strings metadata;  ///< files that exist after the run
   int completedThumb;
   ::testing::Matcher<Strings> errors = IsEmpty();
 };
@@ -74,7 +74,7 @@ TEST_F(Failure, OfAKilledConverterIsMarked) {
 TEST_F(Failure, IsCountedBeforeItIsReported) {
   Converter().Plan(kFails);
   std::string seen;
-  RunAndLook([&](const std::string& request) {
+  RunAndObserve([&](const std::string& request) {
     if (request == kReport) {
       seen = ReadFile(kPhotoProgress);
     }
@@ -143,19 +143,19 @@ TEST_F(Failure, FileInPlaceOfThePhotosMetadataDirectory) {
   ExpectProgress(1, 4);
 }
 
-/// Something happens to the photo's files while the daemon is asked for the index version.
+/// The photo's files change while the daemon is asked for the index version.
 class WhileTheDaemonIsAsked : public Failure {
  protected:
   /// Runs the program with `happening` at the version request. Returns the requests.
   static Strings RunWith(const std::function<void()>& happening) {
-    return RunAndLook([&](const std::string& request) {
+    return RunAndObserve([&](const std::string& request) {
       if (request == kVersionRequest) {
         happening();
       }
     });
   }
 
-  /// Same, with one of the thumbnails that are there removed.
+  /// The same, removing one of the existing thumbnails.
   static Strings RunAndRemove(const std::string& sizeClass) {
     return RunWith([&] { ASSERT_EQ(unlink(Thumb(kPhoto, sizeClass).c_str()), 0); });
   }

@@ -31,7 +31,8 @@ class FullDisk : public RealProgramTest {
     volume_->SetAvailable(kRoomy);
   }
 
-  /// No thumbnail of these kinds: markers, or nothing when there was no room for markers either.
+  /// Whether there are no thumbnails of these kinds, only markers, or nothing if the markers did
+  /// not fit either.
   static bool HasNoThumbs(const std::string& photo, const std::vector<Kind>& kinds) {
     return std::none_of(kinds.begin(), kinds.end(),
                         [&](const Kind& kind) { return Exists(ThumbOf(photo, kind)); });
@@ -56,7 +57,7 @@ TEST_F(FullDisk, FullBeforeTheFirstOutput) {
             Strings{"velathumb:893 Stopping creating thumbs as the disk space is near "
                     "full, " +
                     InPhotos("b.jpg")});
-  // The failure is not permanent: with room again, everything is made.
+  // The failure is not permanent: with enough space, everything is made.
   MakeRoom();
   InstallRealConverter();
   Make();
@@ -76,7 +77,7 @@ TEST_F(FullDisk, FullBetweenTwoOutputs) {
   EXPECT_TRUE(OnlyWholeThumbsBelow(kPhotos));
 }
 
-// Room for one page more each time, so that the volume is full at every point of the outputs.
+// Space for one more page each time, so that the volume becomes full at every point of the outputs.
 TEST_F(FullDisk, FullAnywhereInTheOutputs) {
   WriteKinds(kProfiles, FullKinds());
   const std::string photo = MakeDetailedPhoto("a.jpg");

@@ -9,7 +9,7 @@ namespace {
 
 constexpr const char* kTree = "R:/tmp/photos";
 
-/// What a converter call was for: its source, and the first box, which identifies the phase.
+/// The purpose of a converter call: its source, and the first box, which identifies the phase.
 struct Work {
   std::string source;
   std::string box;
@@ -107,7 +107,7 @@ class Instances : public RealProgramTest {
     }
   }
 
-  /// The last run completes what the others have left.
+  /// A last run completes the remaining work.
   void ExpectAllDoneAfterALastRun() {
     Make({kTree});
     Make({kTree});
@@ -144,11 +144,11 @@ class Instances : public RealProgramTest {
 
 }  // namespace
 
-TEST_F(Instances, TwoShareATree) {
+TEST_F(Instances, TwoProcessATree) {
   ExpectSharedTree(2);
 }
 
-TEST_F(Instances, FourShareATree) {
+TEST_F(Instances, FourProcessATree) {
   ExpectSharedTree(4);
 }
 

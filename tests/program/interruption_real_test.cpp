@@ -57,7 +57,7 @@ class Interruption : public RealProgramTest {
 
   static bool HasEnded(Program& program) { return program.Wait(milliseconds(0)).has_value(); }
 
-  /// A run over the whole tree that has made its pid file, or is done already.
+  /// A run over the whole tree that has created its pid file or has already ended.
   static Program StartRun() {
     Program program = StartProgram(VelathumbPath(), {kProfiles, kTree});
     const std::string pidFile = PidFileOf(program);
@@ -83,7 +83,7 @@ class Interruption : public RealProgramTest {
     EXPECT_EQ(result->signal, 0);
     EXPECT_THAT(PidFiles(), IsEmpty());
     const auto left = sent + kPromptEnd - steady_clock::now();
-    EXPECT_TRUE(WaitUntilNoneIsCalled(
+    EXPECT_TRUE(WaitUntilNoProcessNamed(
         kConverterName, static_cast<int>(std::chrono::duration_cast<milliseconds>(left).count())));
   }
 
@@ -108,7 +108,7 @@ class Interruption : public RealProgramTest {
     }
   }
 
-  /// Terminates a run after `moment`; tries again earlier when the run was done before.
+  /// Terminates a run after `moment`; tries again with an earlier moment when the run ended first.
   static void TerminateOneRun(microseconds moment) {
     for (;;) {
       ForgetRuns();
@@ -153,8 +153,8 @@ class Interruption : public RealProgramTest {
     });
   }
 
-  /// Kills a run after `moment`; tries again earlier when the run was done before. Returns its pid
-  /// file.
+  /// Kills a run after `moment`; tries again with an earlier moment when the run ended first.
+  /// Returns its pid file.
   static std::string KillOneRun(microseconds moment) {
     for (;;) {
       Program program = StartRun();
@@ -174,8 +174,8 @@ class Interruption : public RealProgramTest {
   /// A child of the killed program may hold its lock until it becomes the converter, which then
   /// ends by itself.
   static void AwaitChildrenOfKilledRun() {
-    EXPECT_TRUE(WaitUntilNoneIsCalled("velathumb", 10000));
-    EXPECT_TRUE(WaitUntilNoneIsCalled(kConverterName, 10000));
+    EXPECT_TRUE(WaitUntilNoProcessNamed("velathumb", 10000));
+    EXPECT_TRUE(WaitUntilNoProcessNamed(kConverterName, 10000));
   }
 
   void ExpectThumbs(int phase) const {
@@ -204,7 +204,7 @@ TEST_P(InterruptionAtRandomMoments, Sigkill) {
 
 INSTANTIATE_TEST_SUITE_P(Quarters, InterruptionAtRandomMoments, ::testing::Range(1, 5));
 
-// The real converter is too fast to be about to start when the signal comes, except by chance.
+// The real converter is too fast to be caught while it starts, except by chance.
 TEST_F(Interruption, SigtermAroundTheStartOfAHangingConverter) {
   MakePhotos(1);
   const StubTool converter(kConverterPath);

@@ -13,7 +13,7 @@ namespace {
 
 constexpr const char* kRoot = "/tmp/photos/@eaDir";
 
-/// The line of a directory that could not be made.
+/// The log line about a directory that could not be created.
 std::string MkdirLine(const std::string& path, int error) {
   return "velathumb:447 velathumb: checkCreateDir(447) - mkdir(" + path +
          ", 0777 ), errno: " + std::to_string(error) + "\n";
@@ -43,7 +43,7 @@ TEST_F(Listing, FinishesOnePhotoBeforeTheNext) {
                                               Thumb(InPhotos("b.jpg"), "XL")));
 }
 
-TEST_F(Listing, LeavesOutWhatIsNoPhoto) {
+TEST_F(Listing, SkipsOtherFiles) {
   MakePhotos({"._a.jpg"});
   WriteFile(InPhotos("b.txt"), "");
   MakeDirectories(InPhotos("c.jpg"));

@@ -8,8 +8,8 @@ namespace vela_test::real {
 
 namespace {
 
-/// Names without extension that the converter opens like any other: it gets each name as one
-/// argument, in an absolute path.
+/// Names without extension that the converter can open: it gets each name as one argument, in an
+/// absolute path.
 Strings OpenableNames() {
   const Strings groups[] = {
       {"two words", " leading space", "trailing space ", "'single'", "\"double\"", "it's"},
@@ -29,9 +29,8 @@ Strings OpenableNames() {
   return names;
 }
 
-/// Names that ImageMagick takes for a list of file names, because of the wildcard in them: it reads
-/// the photo as text and then looks for files called like its bytes. The script in front of it
-/// refuses them.
+/// Names that ImageMagick takes for lists of file names because of a wildcard: it reads the photo
+/// as text and looks for files named in it. The wrapper script rejects them.
 Strings WildcardNames() {
   return {"[1]", "a[1]", "x[0]",  "[a-z]", "a[2x2]", "a[",      "a]",      "*",    "a*",
           "?",   "a?c",  "{a,b}", "{",     "}",      "%[fx:1]", "${HOME}", "x[0]y"};
@@ -68,7 +67,7 @@ class OddNames : public RealProgramTest {
     }
   }
 
-  /// Makes a photo whose name ImageMagick would misread; with ImageMagick it has to fail.
+  /// Makes a photo whose name ImageMagick would misinterpret; with ImageMagick it has to fail.
   void AddMisreadPhoto(const std::string& path) {
     AddPhoto(path);
     if (!IsOwnConverterReal()) {
@@ -90,7 +89,8 @@ class OddNames : public RealProgramTest {
     }
   }
 
-  /// Own picture for each photo whose name the converter can open, markers for the others.
+  /// Expects its own picture for each photo whose name the converter can open, markers for the
+  /// others.
   void ExpectOwnPicturesOrMarkers() const {
     for (const auto& [photo, colour] : colours_) {
       if (std::count(failing_.begin(), failing_.end(), photo) == 0) {
@@ -130,7 +130,7 @@ TEST_F(OddNames, PngsOfAnyOpenableName) {
   ExpectOwnPictures(OfPhase(kinds_, 1));
 }
 
-// Files that are no photos for the index get no thumbnail.
+// Files that the index does not treat as photos get no thumbnails.
 TEST_F(OddNames, NamesThatAreNoPhotos) {
   MakeJpeg("/tmp/photo.jpg");
   for (const char* name : {"x.jpg ", "x.jpg\n", "._x.jpg", "jpg", "x", ".jpg."}) {
@@ -140,7 +140,8 @@ TEST_F(OddNames, NamesThatAreNoPhotos) {
   EXPECT_FALSE(Exists(InPhotos("@eaDir")));
 }
 
-// The photos that a wildcard would match are beside it, before and after it in the order.
+// The photos that a wildcard would match are in the same directory, before and after it in the
+// order.
 TEST_F(OddNames, WildcardsStopNothing) {
   for (const std::string& name : WildcardNames()) {
     AddMisreadPhoto(InPhotos(name + ".jpg"));
@@ -176,8 +177,8 @@ TEST_F(OddNames, MarkersOfWildcardNamesAreTheirOwn) {
   }
 }
 
-// Formats with several pages are opened by their name with a page number behind it, which is no
-// existing file: ImageMagick then expands what it finds in the name.
+// Formats with several pages are opened by their name followed by a page number. No such file
+// exists, so ImageMagick expands special characters in the name.
 TEST_F(OddNames, PagedFormatsOfNamesWithoutMeaning) {
   for (const std::string& name : OpenableNames()) {
     if (name.find('%') == std::string::npos) {
@@ -218,7 +219,7 @@ TEST_F(OddNames, DirectoriesOfAnyName) {
   Make(directories);
   ExpectOwnPictures(OfPhase(kinds_, 0));
   ExpectOwnPictures(OfPhase(kinds_, 1));
-  // Each is queued for its last phase, except those that a line cannot hold.
+  // Each is queued for its last phase, except those that do not fit on one line.
   Strings queued;
   Strings unqueued;
   for (const std::string& directory : directories) {

@@ -1,4 +1,4 @@
-// Which phase a photo is in, by the thumbnails that it has.
+// The phase that is due for a photo, depending on its existing thumbnails.
 #include "program/stub_program_test.h"
 #include "support/images.h"
 
@@ -41,7 +41,7 @@ class PhaseChoice : public OnePhotoTest {
     }
   }
 
-  /// Dates a thumbnail a second before the photo.
+  /// Makes a thumbnail one second older than the photo.
   static void MakeOutdated(const std::string& sizeClass) {
     SetFileTime(Thumb(kPhoto, sizeClass), ModificationTime(kPhoto).seconds - 1);
   }
@@ -49,11 +49,11 @@ class PhaseChoice : public OnePhotoTest {
 
 const Strings kAllClasses = {"XL", "M", "B", "S"};
 
-/// A photo that has everything: only a report, and no other trace.
+/// A complete photo: only a report and no other effect.
 struct CompletePhoto : NamedCase {
   const char* settings;      ///< content of the settings file, none when null
   Strings thumbs;            ///< size classes that are there
-  const char* oneByteThumb;  ///< one of them that is cut to a byte, none when null
+  const char* oneByteThumb;  ///< one of them that is truncated to a byte, none when null
   bool hasOlderNames = false;
 };
 
@@ -80,8 +80,8 @@ TEST_P(NothingToMake, IsReportedOnly) {
   EXPECT_FALSE(Exists(kQueue));
 }
 
-// What the system does not ask for is not made, whatever the profiles say: the status of the photo
-// is checked first, and a file of one byte is enough for it.
+// Size classes outside the system's size map are not made, whatever the profiles contain: the
+// status of the photo is checked first, and a file of one byte is enough for it.
 INSTANTIATE_TEST_SUITE_P(
     Photos, NothingToMake,
     ::testing::Values(
@@ -106,7 +106,7 @@ struct DuePhase : NamedCase {
 
 class IncompletePhoto : public PhaseChoice, public ::testing::WithParamInterface<DuePhase> {};
 
-TEST_P(IncompletePhoto, GetsWhatItsFirstDuePhaseMakes) {
+TEST_P(IncompletePhoto, GetsTheThumbnailsOfItsFirstDuePhase) {
   PutThumbs(kPhoto, GetParam().thumbs);
   for (const std::string& sizeClass : GetParam().outdated) {
     MakeOutdated(sizeClass);

@@ -1,4 +1,4 @@
-// A new photo on its way through three phases and two runs: every effect, in its order.
+// A new photo in three phases and two runs: every effect, in order.
 #include <algorithm>
 #include <mutex>
 #include <regex>
@@ -17,7 +17,7 @@ class Phases : public OnePhotoTest {
   static Strings RunAndWatch() {
     std::mutex mutex;
     Strings seen;
-    RunAndLook([&](const std::string& request) {
+    RunAndObserve([&](const std::string& request) {
       const std::lock_guard<std::mutex> lock(mutex);
       seen.push_back(request + ", completed " + std::to_string(Progress("completed")) + ", " +
                      std::to_string(Progress("completed_thumb")) +
@@ -96,14 +96,14 @@ TEST_F(Phases, ThirdRunFindsNothingLeft) {
 }
 
 TEST_F(Phases, ProgressIsCountedBetweenThePhases) {
-  // The converter copies the progress file as it is during phase 1.
+  // The converter copies the progress file during phase 1.
   Converter().PlanCall(
       2, StubPlan().WriteOutputs().Run("/bin/cp", {kPhotoProgress, "/tmp/progress"}).Exit(0));
   RunAndWatch();
   EXPECT_EQ(ReadFile("/tmp/progress"), "completed_thumb=\"2\"\n");
 }
 
-TEST_F(Phases, RequestsConversionsAndQueueComeInOrder) {
+TEST_F(Phases, RequestsConversionsAndQueueAreInOrder) {
   const DaemonPeer daemon;
   EXPECT_SUCCESS(Run());
   EXPECT_SUCCESS(Run());
@@ -139,7 +139,7 @@ TEST_F(Phases, WithoutDaemonEachExchangeIsLoggedAndAllIsMade) {
   ExpectProgress(1, 4);
 }
 
-TEST_F(Phases, ProgressIsAddedToWhatIsThere) {
+TEST_F(Phases, ProgressIsAddedToExistingCounts) {
   WriteFile(kPhotoProgress, "total=\"9\"\ncompleted=\"5\"\ncompleted_thumb=\"100\"\n");
   RunAndWatch();
   EXPECT_EQ(ReadFile(kPhotoProgress), "total=\"9\"\ncompleted=\"5\"\ncompleted_thumb=\"103\"\n");

@@ -1,4 +1,4 @@
-// Where the tests of the whole program keep its files, and how the files of a photo are called.
+// Paths of the program's files in its tests, and of the files of a photo.
 #pragma once
 
 #include <string>
@@ -24,7 +24,7 @@ std::string OldThumb(const std::string& photo, const std::string& sizeClass);
 /// Failure marker of a size class of a photo.
 std::string Marker(const std::string& photo, const std::string& sizeClass);
 
-/// Photo progress: the value of a key, 0 when it is not there.
+/// Photo progress: the value of a key, 0 when it is missing.
 int Progress(const std::string& key);
 
 /// The command-line arguments: the usual profile file, then the directories.

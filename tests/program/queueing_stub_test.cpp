@@ -34,7 +34,7 @@ TEST_F(Queueing, IsNotDoneWithoutPhase1) {
 TEST_F(Queueing, IsDoneAtTheEndOfThePass) {
   MakePhotos({"a.jpg", "b.jpg"});
   bool early = false;
-  RunAndLook([&](const std::string&) { early = early || Exists(kQueue); });
+  RunAndObserve([&](const std::string&) { early = early || Exists(kQueue); });
   EXPECT_FALSE(early);
   EXPECT_TRUE(Exists(kQueue));
 }
@@ -49,7 +49,7 @@ TEST_F(Queueing, IsDoneForEachDirectoryAtItsEnd) {
   EXPECT_EQ(ReadFile(kQueue), "/tmp/1\n/tmp/3\n");
 }
 
-TEST_F(Queueing, AddsToWhatIsThere) {
+TEST_F(Queueing, AppendsToAnExistingQueue) {
   MakePhoto(InPhotos("a.jpg"));
   WriteFile(kQueue, "/somewhere/else\nR:/a/tree\n");
   EXPECT_SUCCESS(Run());
@@ -82,7 +82,7 @@ TEST_F(Queueing, FailureDoesNotStopTheNextDirectory) {
                           "velathumb:1112 Failed to write [/tmp/2%s] to thumb queue"));
 }
 
-TEST_F(Queueing, DirectoryThatNoLineCanHoldIsLogged) {
+TEST_F(Queueing, DirectoryThatDoesNotFitOnALineIsLogged) {
   MakePhoto("/tmp/two\nlines/a.jpg");
   RunWithDaemon({"/tmp/two\nlines"});
   EXPECT_THAT(ErrorLines(),

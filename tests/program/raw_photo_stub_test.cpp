@@ -41,7 +41,7 @@ TEST_F(BrokenRawPhoto, LosesTheThumbnailsItHad) {
 
 TEST_F(BrokenRawPhoto, IsCountedBeforeItIsReported) {
   std::string seen;
-  RunAndLook([&](const std::string&) { seen = ReadFile(kPhotoProgress); });
+  RunAndObserve([&](const std::string&) { seen = ReadFile(kPhotoProgress); });
   EXPECT_EQ(seen, "completed=\"1\"\ncompleted_thumb=\"4\"\n");
 }
 

@@ -30,7 +30,7 @@ class RawThumbs : public RealProgramTest {
     return InPhotos(name);
   }
 
-  /// All thumbnails are there and show these quadrants; there are no other files.
+  /// Expects all thumbnails, showing these quadrants, and no other files.
   void ExpectThumbs(const std::string& photo, const std::string& letters) const {
     EXPECT_TRUE(HasThumbs(photo, kinds_));
     for (const Kind& kind : kinds_) {
@@ -131,7 +131,7 @@ TEST_F(RawThumbs, OfDamagedPhotosAreMarkedAndTheNextPhotoIsMade) {
   if (hasCamera) {
     EXPECT_TRUE(HasThumbs(InPhotos("d.crw"), kinds_));
   }
-  // The decoded copies are gone, also those of the truncated photos.
+  // The decoded copies have been removed, also those of the truncated photos.
   for (const std::string& path : ListTree(kPhotos)) {
     EXPECT_EQ(path.find("RAW"), std::string::npos) << path;
     EXPECT_EQ(path.find("Temp_"), std::string::npos) << path;

@@ -1,5 +1,5 @@
-// A photo whose owner turned its thumbnails keeps them turned when they are made again, with the
-// real tools.
+// A photo's thumbnails that a user has rotated stay rotated when they are made again, with the real
+// tools.
 #include <optional>
 
 #include "program/real_program_test.h"
@@ -19,7 +19,7 @@ class TurnedThumbs : public RealProgramTest, public ::testing::WithParamInterfac
     WriteKinds(kProfiles, kinds_);
   }
 
-  /// Makes everything, then turns all thumbnails as their owner and dates them back.
+  /// Makes everything, then rotates all thumbnails like a user and sets their times back.
   void MakeAndTurn(const std::string& photo) {
     SetFileTimeFromNow(photo, -3000);
     Make();
@@ -32,7 +32,7 @@ class TurnedThumbs : public RealProgramTest, public ::testing::WithParamInterfac
     }
   }
 
-  /// Touches the photo; every thumbnail is made again and keeps the turn of its owner.
+  /// Touches the photo; every thumbnail is made again and keeps the user's rotation.
   void TouchAndExpectTurn(const std::string& photo) {
     SetFileTimeFromNow(photo, -1000);
     const auto before = ThumbsBelow(kPhotos);

@@ -16,7 +16,7 @@ namespace {
 
 constexpr int kPaletteLevels[] = {0, 64, 128, 191, 255};
 
-/// Half the distance of two palette colours in a channel.
+/// Half the distance between two palette colours in a channel.
 constexpr int kColourTolerance = 31;
 
 bool IsMetadata(const std::string& relativePath) {
@@ -60,7 +60,7 @@ bool HasOnlyDigits(const std::string& text) {
                                       [](unsigned char c) { return std::isdigit(c) != 0; });
 }
 
-/// The command name of a process, empty when it is gone or only its exit status is left.
+/// The command name of a process, empty when it has ended.
 std::string CommandName(const std::string& pid) {
   std::FILE* file = std::fopen(("/proc/" + pid + "/stat").c_str(), "re");
   if (file == nullptr) {
@@ -205,7 +205,7 @@ std::map<std::string, ThumbState> ThumbsBelow(const std::string& directory) {
   return ::testing::AssertionSuccess();
 }
 
-std::vector<pid_t> ProcessesCalled(const std::string& name) {
+std::vector<pid_t> ProcessesNamed(const std::string& name) {
   std::vector<pid_t> found;
   for (const std::string& entry : ListDirectory("/proc")) {
     if (HasOnlyDigits(entry) && CommandName(entry) == name) {
@@ -215,9 +215,9 @@ std::vector<pid_t> ProcessesCalled(const std::string& name) {
   return found;
 }
 
-bool WaitUntilNoneIsCalled(const std::string& name, int milliseconds) {
+bool WaitUntilNoProcessNamed(const std::string& name, int milliseconds) {
   const auto end = std::chrono::steady_clock::now() + std::chrono::milliseconds(milliseconds);
-  while (!ProcessesCalled(name).empty()) {
+  while (!ProcessesNamed(name).empty()) {
     if (std::chrono::steady_clock::now() >= end) {
       return false;
     }

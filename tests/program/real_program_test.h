@@ -54,7 +54,7 @@ std::string WriteKinds(const std::string& path, const std::vector<Kind>& kinds);
 std::string ThumbOf(const std::string& photo, const Kind& kind);
 std::string MarkerOf(const std::string& photo, const Kind& kind);
 
-/// What must not change in a photo.
+/// The properties of a photo that must not change.
 struct PhotoState {
   std::string content;
   FileTime modified;
@@ -62,10 +62,10 @@ struct PhotoState {
 bool operator==(const PhotoState& a, const PhotoState& b);
 void PrintTo(const PhotoState& state, std::ostream* out);
 
-/// Every file below `directory` that is not in a metadata directory, by its relative path.
+/// All files below `directory` outside of metadata directories, by their relative paths.
 std::map<std::string, PhotoState> PhotosBelow(const std::string& directory);
 
-/// What differs in a thumbnail that was made again.
+/// The properties that differ when a thumbnail is made again.
 struct ThumbState {
   ino_t inode = 0;
   FileTime modified;
@@ -76,22 +76,22 @@ void PrintTo(const ThumbState& state, std::ostream* out);
 /// Every thumbnail (under a final name) below `directory`, by its relative path.
 std::map<std::string, ThumbState> ThumbsBelow(const std::string& directory);
 
-/// Whether every thumbnail under a final name below `directory` is a whole JPEG.
+/// Whether every thumbnail under a final name below `directory` is a complete JPEG.
 ::testing::AssertionResult OnlyWholeThumbsBelow(const std::string& directory);
 
-/// Whether each kind's thumbnail of the photo is a whole JPEG without a failure marker beside it.
+/// Whether each kind's thumbnail of the photo is a complete JPEG without a failure marker.
 ::testing::AssertionResult HasThumbs(const std::string& photo, const std::vector<Kind>& kinds);
 
 /// Whether each kind has an empty failure marker and no thumbnail.
 ::testing::AssertionResult IsMarkedFailed(const std::string& photo, const std::vector<Kind>& kinds);
 
 /// Processes of the sandbox by their command name.
-std::vector<pid_t> ProcessesCalled(const std::string& name);
+std::vector<pid_t> ProcessesNamed(const std::string& name);
 
-/// Waits until there is no such process, at most `milliseconds`; whether none is left.
-bool WaitUntilNoneIsCalled(const std::string& name, int milliseconds);
+/// Waits until there is no such process, at most `milliseconds`; returns whether there is none.
+bool WaitUntilNoProcessNamed(const std::string& name, int milliseconds);
 
-/// Pid files of the program that are there now.
+/// The existing pid files of the program.
 std::vector<std::string> PidFiles();
 
 /// Runs ImageMagick with these arguments; a failure fails the test.
@@ -109,8 +109,8 @@ JpegRecipe RecipeOf(int width, int height, int orientation = 0);
 /// A raw photo of 240 x 160 pixels, without preview or with one of this size.
 RawRecipe RawRecipeOf(int previewWidth = 0, int previewHeight = 0);
 
-/// Index of the palette colour that the whole thumbnail shows, -1 when it shows several or is no
-/// whole JPEG.
+/// Index of the palette colour that the whole thumbnail shows, -1 when it shows several or is not a
+/// complete JPEG.
 int PaletteIndexOf(const std::string& thumb);
 
 /// Every test starts with the real converter in place, the small kinds in kProfiles and an empty
@@ -124,7 +124,7 @@ class RealProgramTest : public SandboxTest {
   void Make(const std::vector<std::string>& directories = {kPhotos},
             const ProgramOptions& options = ProgramOptions());
 
-  /// Makes a run over everything below kPhotos, which must leave each thumbnail as it is.
+  /// Runs the program over everything below kPhotos; expects each thumbnail unchanged.
   void ExpectNothingLeftToMake(const std::vector<std::string>& directories = {kPhotos});
 
   std::vector<Kind> kinds_;

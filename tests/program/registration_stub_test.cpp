@@ -1,4 +1,4 @@
-// The registration of made thumbnails with the index.
+// The registration of new thumbnails with the index.
 #include <sqlite3.h>
 
 #include "program/stub_program_test.h"
@@ -64,7 +64,7 @@ TEST_F(IndexRegistration, IsOfPhase0Only) {
   EXPECT_FALSE(Exists(kDatabase));
 }
 
-TEST_F(IndexRegistration, IsLeftOutWhenPhase0Fails) {
+TEST_F(IndexRegistration, IsSkippedWhenPhase0Fails) {
   MakePhoto(kPhoto);
   Converter().Plan(StubPlan().Exit(1));
   EXPECT_SUCCESS(Run());

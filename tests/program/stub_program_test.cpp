@@ -182,12 +182,12 @@ Strings StubProgramTest::RunWithDaemon(const Strings& directories, const Program
   return RequestsOf(daemon);
 }
 
-Strings StubProgramTest::RunAndLook(const std::function<void(const std::string&)>& look) {
+Strings StubProgramTest::RunAndObserve(const std::function<void(const std::string&)>& observe) {
   DaemonPeer daemon;
-  const auto lookAt = [&](const DaemonRequest& request) { look(RequestText(request)); };
+  const auto onRequest = [&](const DaemonRequest& request) { observe(RequestText(request)); };
   daemon.Answer("GET_INDEX_VERSION",
-                DaemonReply::Line("{\"success\":true,\"version\":0}").Meanwhile(lookAt));
-  daemon.Answer("POST_PHOTO_CONVERT", DaemonReply::Line("{\"success\":true}").Meanwhile(lookAt));
+                DaemonReply::Line("{\"success\":true,\"version\":0}").Meanwhile(onRequest));
+  daemon.Answer("POST_PHOTO_CONVERT", DaemonReply::Line("{\"success\":true}").Meanwhile(onRequest));
   EXPECT_SUCCESS(Run());
   return RequestsOf(daemon);
 }

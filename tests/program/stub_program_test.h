@@ -34,8 +34,7 @@ constexpr const char* kSettings = "/etc/velainfo.conf";
 constexpr const char* kVersionRequest = "GET_INDEX_VERSION /tmp/photos/a.jpg";
 constexpr const char* kReport = "POST_PHOTO_CONVERT /tmp/photos/a.jpg";
 
-/// XL and M in phase 0 (XL is the one that the later phases are made from), B in phase 1, S in
-/// phase 2.
+/// XL and M in phase 0 (the later phases are made from XL), B in phase 1, S in phase 2.
 std::vector<ProfileSection> ThreePhases();
 
 /// A profile whose thumbnail has the usual file name of its size class.
@@ -44,8 +43,8 @@ ProfileSection Profile(const std::string& sizeClass, int size, int phase);
 /// A size map for the system settings that asks for the thumbnails of ThreePhases().
 constexpr const char* kThreePhasesSizeMap = "photo_thumb_size_map=\"23\"\n";
 
-/// What a photo's metadata directory holds after one run, after two runs, and after a failure of
-/// all phases.
+/// The content of a photo's metadata directory after one run, after two runs, and after a failure
+/// of all phases.
 const Strings kThumbsOfFirstRun = {"VELAPHOTO_THUMB_B.jpg", "VELAPHOTO_THUMB_M.jpg",
                                    "VELAPHOTO_THUMB_XL.jpg"};
 const Strings kAllThumbs = {"VELAPHOTO_THUMB_B.jpg", "VELAPHOTO_THUMB_M.jpg",
@@ -53,7 +52,7 @@ const Strings kAllThumbs = {"VELAPHOTO_THUMB_B.jpg", "VELAPHOTO_THUMB_M.jpg",
 const Strings kAllMarkers = {"VELAPHOTO_THUMB_B.fail", "VELAPHOTO_THUMB_M.fail",
                              "VELAPHOTO_THUMB_S.fail", "VELAPHOTO_THUMB_XL.fail"};
 
-/// Makes a small photo, dated a minute back so that everything made of it is newer.
+/// Makes a small photo, a minute old so that all its thumbnails are newer.
 std::string MakePhoto(const std::string& path);
 
 /// Makes several of them in kPhotos.
@@ -62,7 +61,7 @@ void MakePhotos(const Strings& names);
 /// Makes a photo "a.jpg" in each of these directories, which are made too.
 void MakePhotosIn(const Strings& directories);
 
-/// Puts thumbnails of these size classes (whole small pictures, dated now) beside a photo.
+/// Makes thumbnails of these size classes (complete small pictures, dated now) for a photo.
 void PutThumbs(const std::string& photo, const Strings& sizeClasses);
 
 /// Names of the files in a photo's metadata directory.
@@ -90,8 +89,7 @@ ProgramOptions InDirectory(const std::string& workingDirectory);
 ProgramOptions WithUmask(mode_t umask);
 ProgramOptions WithSteps(const std::vector<BeforeExec>& beforeExec);
 
-/// Takes the exclusive lock of a directory or file without waiting, for as long as the object
-/// lives.
+/// Tries to lock a directory or file exclusively, without waiting, for the lifetime of the object.
 class HeldLock {
  public:
   explicit HeldLock(const std::string& path);
@@ -126,8 +124,8 @@ class StubProgramTest : public SandboxTest {
   static Strings RunWithDaemon(const Strings& directories = {kPhotos},
                                const ProgramOptions& options = ProgramOptions());
 
-  /// The same over kPhotos; `look` is called with each request before the daemon answers it.
-  static Strings RunAndLook(const std::function<void(const std::string& request)>& look);
+  /// The same over kPhotos; `observe` is called with each request before the daemon answers it.
+  static Strings RunAndObserve(const std::function<void(const std::string& request)>& observe);
 
   /// Starts the program and waits until the converter's call with this number has made its outputs.
   /// The call does not end before Go().
@@ -153,7 +151,7 @@ class OnePhotoTest : public StubProgramTest {
   }
 };
 
-/// Exit status 0 and no output, which every run has whatever became of its photos.
+/// Expects exit status 0 and no output, whatever happened to the photos.
 #define EXPECT_SUCCESS(result)                            \
   do {                                                    \
     const ::vela_test::ProgramResult endedRun = (result); \

@@ -159,7 +159,7 @@ TEST_F(Termination, OtherSignalsKeepTheirMeaning) {
   EXPECT_THAT(ListDirectory("/run"), SizeIs(1));
 }
 
-/// A signal at some moment of a run, however early.
+/// A signal at any moment of a run, however early.
 class TerminationAtAnyTime : public Termination, public ::testing::WithParamInterface<int> {};
 
 TEST_P(TerminationAtAnyTime, EndsPromptlyAndLeavesNoPidFile) {

@@ -28,7 +28,7 @@ bool IsRawPhoto(const std::string& name) {
   return std::count(kRaw.begin(), kRaw.end(), name.substr(name.rfind('.') + 1)) > 0;
 }
 
-/// The same photos in many orientations have a test of their own.
+/// Series of the same photo in many orientations have a separate test.
 bool IsOrientationSeries(const std::string& name) {
   return name.compare(0, 10, "landscape_") == 0 || name.compare(0, 9, "portrait_") == 0;
 }
@@ -189,7 +189,8 @@ TEST_F(ThumbContent, GreyJpegStaysGrey) {
   }
 }
 
-// A file that is no photo gets markers for every kind, counts as completed and stops nothing.
+// A file that is not a photo gets markers for every kind, counts as completed and does not stop the
+// run.
 TEST_F(ThumbContent, FilesThatAreNoPhotos) {
   const std::string good = MakeJpeg(InPhotos("m.jpg"));
   const std::string last = MakeJpeg(InPhotos("z.jpg"));
@@ -228,11 +229,11 @@ TEST_F(ThumbContent, CutJpegStopsNothing) {
   MakeAll();
   EXPECT_TRUE(HasThumbs(first, kinds_));
   EXPECT_TRUE(HasThumbs(last, kinds_));
-  // The converter may accept the part that is there.
+  // The converter may accept the part that exists.
   EXPECT_TRUE(HasThumbs(cut, kinds_) || IsMarkedFailed(cut, kinds_));
 }
 
-// Files as cameras and phones wrote them, beside some of our own.
+// Original files of cameras and phones, and some of our own.
 TEST_F(ThumbContent, CameraFilesInFullSize) {
   CopyFile(SourceDirectory() + "/config/thumb-profiles.conf", kProfiles);
   JpegRecipe recipe = RecipeOf(1800, 1350);

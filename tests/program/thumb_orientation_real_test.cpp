@@ -35,7 +35,7 @@ class ThumbOrientation : public RealProgramTest {
     EXPECT_EQ(ReadJpegMetadata(path).orientation, 0);
   }
 
-  /// Two runs; all thumbnails are upright, or else as stored.
+  /// Makes two runs; expects all thumbnails upright, or else as stored.
   void ExpectMade(bool upright) {
     Make();
     Make();
@@ -64,8 +64,8 @@ double MeanDifference(const DecodedImage& a, const DecodedImage& b, bool mirrorX
   return sum / (3 * kPoints * kPoints);
 }
 
-/// Whether two pictures of the same shape have the same orientation: mirrored or turned they would
-/// differ far more than cameras and encoders make them differ.
+/// Whether two pictures of the same shape have the same orientation: if mirrored or rotated, they
+/// would differ far more than different cameras and encoders do.
 bool HaveSameOrientation(const DecodedImage& a, const DecodedImage& b) {
   const double difference = MeanDifference(a, b, false, false);
   return 2 * difference < MeanDifference(a, b, true, false) &&
@@ -92,7 +92,7 @@ TEST_P(ThumbOrientationByIndex, IsUprightOrAsStored) {
 
 INSTANTIATE_TEST_SUITE_P(Versions, ThumbOrientationByIndex, ::testing::Values(0, 1, 7));
 
-// One photo of a camera, stored in all orientations, gives one picture.
+// A camera photo stored in all orientations always produces the same picture.
 TEST_F(ThumbOrientation, CameraPhotosOfAllOrientationsGiveOnePicture) {
   const std::string folder = SharedMediaDirectory();
   std::vector<Strings> sets(1);

@@ -89,7 +89,7 @@ TEST_F(ThumbSizes, KeepTheAspectOfOddSizes) {
 }
 
 // The converter's outputs are sorted by size after the scaling of each has been chosen by its
-// place: a mixture of both ways of scaling comes out exchanged.
+// position: if a phase mixes both kinds of scaling, they are exchanged.
 TEST_F(ThumbSizes, MixedScalingOfOnePhaseIsExchanged) {
   WriteKinds(kProfiles,
              {{"S", 40, false, 0}, {"M", 64, true, 0}, {"B", 80, false, 0}, {"XL", 120, true, 0}});
@@ -117,7 +117,7 @@ TEST_F(ThumbSizes, AllSixMixedInOnePhase) {
                         {"XL", 120, false, 0}});
 }
 
-TEST_F(ThumbSizes, NewerPhotoIsMadeAnew) {
+TEST_F(ThumbSizes, NewerPhotoIsConvertedAgain) {
   const PhotoSize before = {"a.jpg", 240, 160};
   MakeAll({before});
   for (const Kind& kind : kinds_) {

@@ -81,7 +81,7 @@ TEST_F(Walk, GoesThroughDirectoriesWithoutPhotos) {
   EXPECT_FALSE(Exists("/tmp/photos/1/@eaDir"));
 }
 
-TEST_F(Walk, LeavesOutTheMetadataItMakes) {
+TEST_F(Walk, SkipsTheMetadataThatItCreates) {
   MakePhotosIn({"/tmp/photos"});
   EXPECT_THAT(WalkTree(), ElementsAre("/tmp/photos"));
   EXPECT_FALSE(Exists("/tmp/photos/@eaDir/@eaDir"));
@@ -134,7 +134,7 @@ TEST_F(Walk, LoopsEnd) {
 }
 
 TEST_F(Walk, FailureInTheMiddleIsIgnored) {
-  // A link that leads to itself ends the C library's walk.
+  // A link to itself ends the C library's walk.
   MakePhotosIn({"/tmp/photos", "/tmp/other"});
   ASSERT_EQ(symlink("round", "/tmp/photos/round"), 0);
   EXPECT_THAT(ReportedPhotos(RunWithDaemon({"R:/tmp/photos", "R:/tmp/other"})),
@@ -148,7 +148,7 @@ TEST_F(Walk, SkipsDirectoriesThatCannotBeRead) {
   EXPECT_THAT(WalkTree(kPhotos, WithSteps({DropCapabilities()})), ElementsAre("/tmp/photos/open"));
 }
 
-TEST_F(Walk, GoesOnBelowDirectoriesThatMayHaveNoMetadata) {
+TEST_F(Walk, ContinuesBelowDirectoriesThatMayHaveNoMetadata) {
   MakePhotosIn({"/tmp/photos", "/tmp/photos/sub"});
   ASSERT_EQ(chmod("/tmp/photos", 0555), 0);
   EXPECT_THAT(WalkTree(kPhotos, WithSteps({DropCapabilities()})), ElementsAre("/tmp/photos/sub"));

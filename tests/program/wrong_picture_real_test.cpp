@@ -12,7 +12,8 @@ constexpr int kGreen = 20;
 
 class WrongPicture : public RealProgramTest {
  protected:
-  /// Two photos in one directory and two runs; `photo` has its own picture or its failure markers.
+  /// Two photos in one directory and two runs; expects that `photo` has its own picture or failure
+  /// markers.
   void ExpectOwnOrFailed(const std::string& photo, const std::string& other) {
     SCOPED_TRACE(::testing::PrintToString(photo) + " beside " + ::testing::PrintToString(other));
     RemoveTree(kPhotos);

@@ -43,7 +43,7 @@ class SharedState {
   SharedState(const SharedState&) = delete;
   SharedState& operator=(const SharedState&) = delete;
 
-  /// Keeps the adders in step: no add begins before all earlier ones have ended.
+  /// Synchronises the adders: no add begins before all earlier ones have ended.
   void WaitForAdders() { pthread_barrier_wait(&block_->barrier); }
 
   std::atomic<bool>& IsOver() { return block_->isOver; }
@@ -79,31 +79,31 @@ bool IsCount(const std::string& text, int most) {
   return isNumber && (text.size() == 1 || text[0] != '0') && std::stoi(text) <= most;
 }
 
-/// The file as a reader gets it in one go.
+/// The content of the file as one read.
 std::string RawFile() {
   std::ostringstream content;
   content << std::ifstream(kPhotoFile, std::ios::binary).rdbuf();
   return content.str();
 }
 
-/// The lines of the file as it is at the start of a test: what others set, around one counter for
-/// all adders and one for each.
+/// The lines of the file at the start of a test: other lines around one counter for all adders and
+/// one for each.
 const std::vector<std::string>& CounterKeys() {
   static const std::vector<std::string> keys = {"completed", "own0", "own1", "own2", "own3"};
   return keys;
 }
 constexpr const char* kBefore = "# set by the index\ntotal=\"900\"\n";
-constexpr const char* kBehind = "total_thumb = 5400\nlast=\"here\"\n";
+constexpr const char* kLinesAfter = "total_thumb = 5400\nlast=\"here\"\n";
 
 std::string StartContent() {
   std::string content = kBefore;
   for (const std::string& key : CounterKeys()) {
     content += key + "=\"0\"\n";
   }
-  return content + kBehind;
+  return content + kLinesAfter;
 }
 
-/// Whether the content is the start's with other counts.
+/// Whether the content is that of the start with other counts.
 bool IsWhole(const std::string& content) {
   std::istringstream lines(content);
   std::ostringstream expected;
@@ -120,7 +120,7 @@ bool IsWhole(const std::string& content) {
     }
     expected << line << "\n";
   }
-  expected << kBehind;
+  expected << kLinesAfter;
   return content == expected.str();
 }
 
@@ -131,8 +131,8 @@ class ConcurrentAdds : public QuietTest {
     WriteFile(kPhotoFile, StartContent());
   }
 
-  /// Runs the adders, each of which calls `add` with its number, and beside them two readers, each
-  /// of which calls `isGood` until the adders have ended.
+  /// Runs the adders, each of which calls `add` with its number, and at the same time two readers,
+  /// each of which calls `isGood` until the adders have ended.
   void Run(const std::function<void(int)>& add, const std::function<bool()>& isGood) {
     std::vector<pid_t> adders;
     adders.reserve(kAdders);

@@ -57,7 +57,7 @@ TEST_F(Counters, AValueIsReadAsALeadingNumber) {
                {"3.9", 3},
                {"99999999999999999999", INT_MAX},
                {std::string(4094, '0') + "5", 5},
-               {std::string(4095, '0') + "5", 0}};  // cut at its buffer
+               {std::string(4095, '0') + "5", 0}};  // truncated at the buffer
   for (const auto& c : cases) {
     WriteFile(kPhotoFile, "key=\"" + c.value + "\"\n");
     EXPECT_EQ(GetConvProgress(1, "key"), c.count) << c.value;

@@ -70,7 +70,7 @@ TEST_F(ResumeTime, IsReadAsALeadingNumber) {
                {"010", 10},
                {"1099511627776", 1099511627776},  // after 2038
                {std::string(1022, '0') + "5", 5},
-               {std::string(1023, '0') + "5", 0}};  // cut at its buffer
+               {std::string(1023, '0') + "5", 0}};  // truncated at the buffer
   for (const auto& c : cases) {
     Store(c.value);
     EXPECT_EQ(GetThumbConvResumeTime(), c.time) << c.value;

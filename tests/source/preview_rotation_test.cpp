@@ -1,4 +1,4 @@
-// How far a raw photo's preview is turned.
+// The rotation of a raw photo's preview.
 
 #include <functional>
 
@@ -78,7 +78,7 @@ INSTANTIATE_TEST_SUITE_P(Values, PrintedRotation,
                                            Printed{"Nothing", "", 0}),
                          CaseName());
 
-// The last line with the tag counts; a line longer than 255 bytes is read as several.
+// The last line with the tag is used; a line longer than 255 bytes is read as several.
 const std::string kLongOwner = "Owner: " + std::string(100000, 'x');
 
 INSTANTIATE_TEST_SUITE_P(
@@ -100,7 +100,7 @@ INSTANTIATE_TEST_SUITE_P(
                       Printed{"After254Bytes", std::string(254, 'x') + "Rotation: 90\n", 0}),
     CaseName());
 
-TEST_F(PreviewRotation, IsNoneWithoutOutput) {
+TEST_F(PreviewRotation, IsZeroWithoutOutput) {
   EXPECT_EQ(RotationAfter(StubPlan().PrintError("Rotation: 90\n")), 0);
   EXPECT_EQ(RotationAfter(StubPlan().Exit(1)), 0);
   EXPECT_THAT(ErrorLines(), IsEmpty());
@@ -120,7 +120,7 @@ TEST_F(PreviewRotation, NeedsExiftool) {
                           "/tmp/photos/a.dng"));
 }
 
-TEST_F(PreviewRotation, IsNoneForAPreviewThatIsNotUpright) {
+TEST_F(PreviewRotation, IsZeroForAPreviewThatIsNotUpright) {
   for (const int orientation : {0, 2, 3, 4, 5, 6, 7, 8, 9}) {  // 0: no such tag, 9: no such value
     SCOPED_TRACE(orientation);
     MakePreview(orientation);
@@ -169,7 +169,7 @@ class RealRotation : public PreviewRotation {
   }
 };
 
-TEST_F(RealRotation, IsWhatTheRawPhotoStates) {
+TEST_F(RealRotation, IsReadFromTheRawPhoto) {
   for (const int degrees : {0, 90, 180, 270}) {
     EXPECT_EQ(RotationOf(degrees), degrees);
   }
@@ -177,8 +177,8 @@ TEST_F(RealRotation, IsWhatTheRawPhotoStates) {
   EXPECT_THAT(ErrorLines(), IsEmpty());
 }
 
-TEST_F(RealRotation, IsNoneForABrokenOrMissingRawPhoto) {
-  EXPECT_EQ(GetRawPreviewRotation(kRaw, kPicture), 0);  // its content is no photo
+TEST_F(RealRotation, IsZeroForABrokenOrMissingRawPhoto) {
+  EXPECT_EQ(GetRawPreviewRotation(kRaw, kPicture), 0);  // its content is not a photo
   EXPECT_EQ(GetRawPreviewRotation("/tmp/photos/missing.dng", kPicture), 0);
   EXPECT_THAT(ErrorLines(), IsEmpty());
 }

@@ -48,7 +48,7 @@ class RawConvert : public SourceTest {
 
   std::string Convert() const { return ConvertRawToJpeg(Job(), kRaw, kThumbDir); }
 
-  /// The preview is what thumbnails are made from; the photo is not decoded.
+  /// Expects that thumbnails are made from the preview and the photo is not decoded.
   void ExpectPreview() const {
     EXPECT_EQ(Convert(), kPreview);
     EXPECT_THAT(ThumbDirFiles(), ElementsAre("VELAPHOTO_THUMB_RAW.jpg"));
@@ -148,7 +148,7 @@ TEST_F(RawPreview, IsTurnedInPlace) {
   ASSERT_EQ(ParametersOf(converter_->Calls()),
             (ArgumentLists{{"-rotate", "90", kPreview, kPreview}}));
   EXPECT_EQ(converter_->Calls().front().arguments.front(), kConverterPath);
-  // The line says "Failed" although this is the announcement of a turn.
+  // The line contains "Failed" although it announces a turn.
   EXPECT_THAT(ErrorLines(), ElementsAre(kTurned));
 }
 
@@ -204,7 +204,7 @@ TEST_F(RawPreview, IsUsedAsItIsWithoutExiftool) {
 
 using RawDecode = RawConvert;
 
-TEST_F(RawDecode, ThatGivesNothingIsAFailure) {
+TEST_F(RawDecode, WithoutOutputIsAFailure) {
   PlanDecode(StubPlan().PrintError("a.dng: unexpected end of file\n").Exit(1));
   ExpectNothing();
   EXPECT_THAT(ErrorLines(), ElementsAre(kDecodeFailure));

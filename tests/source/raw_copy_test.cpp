@@ -28,7 +28,7 @@ class RawCopy : public SourceTest {
   }
 };
 
-TEST_F(RawCopy, IsOfWhatTheDecoderPrints) {
+TEST_F(RawCopy, ContainsTheDecodersOutput) {
   const StubTool decoder(kDcrawPath);
   const std::string printed("first\n\0\xff second", 15);
   decoder.Plan(StubPlan().Print(printed));
@@ -57,7 +57,7 @@ TEST_F(RawCopy, OfAnyLength) {
   }
 }
 
-TEST_F(RawCopy, ReplacesWhatWasThere) {
+TEST_F(RawCopy, ReplacesAnExistingFile) {
   WriteFile(kOut, "something longer");
   EXPECT_TRUE(CopyAfter(StubPlan().Print("short")));
   EXPECT_EQ(ReadFile(kOut), "short");
@@ -106,7 +106,7 @@ TEST_F(RawCopy, NeedsAPlaceThatCanBeWritten) {
 constexpr const char* kNoRoom =
     "velathumb:590 write failed, path=/tmp/volume/out, No space left on device";
 
-/// A small volume at the place of the copy.
+/// A small volume in the directory of the copy.
 class RawCopyOnASmallVolume : public RawCopy {
  protected:
   void SetUp() override {
@@ -131,7 +131,7 @@ TEST_F(RawCopyOnASmallVolume, NeedsRoom) {
 
 TEST_F(RawCopyOnASmallVolume, NeedsRoomToItsEnd) {
   volume_->SetAvailable(4 * SmallVolume::PageSize());
-  // Each piece that is read fills one page of the volume, so that none is written in part.
+  // Each chunk fills one page of the volume, so that none is written in part.
   EXPECT_FALSE(CopyAfter(StubPlan().PrintRepeated(std::string(4096, 'x'), 64)));
   EXPECT_EQ(FileSize(kOut), static_cast<int64_t>(4 * SmallVolume::PageSize()));
   EXPECT_THAT(ErrorLines(), ElementsAre(kNoRoom));

@@ -17,7 +17,7 @@ class RealRaw : public SourceTest {
     InstallRealTools();
   }
 
-  /// The image that is made of `raw` for thumbnails up to this size.
+  /// The image made from `raw` for thumbnails up to this size.
   std::string Convert(int largest, const std::string& raw = kRaw) {
     ThumbnailProfileList list;
     list.all.push_back(
@@ -26,7 +26,7 @@ class RealRaw : public SourceTest {
     return ConvertRawToJpeg({"/tmp/photos", list}, raw, kThumbDir);
   }
 
-  /// The returned file, and no other, is there.
+  /// Expects the returned file and no other.
   static void ExpectOnly(const std::string& result) {
     if (result.empty()) {
       EXPECT_THAT(ThumbDirFiles(), IsEmpty());
@@ -118,7 +118,7 @@ TEST_F(RealRaw, ThatIsNoPhotoGivesNothing) {
 class RawOfAnyMaker : public RealRaw {
  protected:
   /// Converts it in an empty directory, where nothing but the result remains.
-  std::string ConvertAnew(int largest, const std::string& raw) {
+  std::string ConvertInEmptyDirectory(int largest, const std::string& raw) {
     RemoveTree(kThumbDir);
     MakeDirectories(kThumbDir);
     const std::string result = Convert(largest, raw);
@@ -126,12 +126,12 @@ class RawOfAnyMaker : public RealRaw {
     return result;
   }
 
-  /// A whole raw photo whose preview and full decode have longer sides of these sizes.
+  /// An undamaged raw photo whose preview and full decode have longer sides of these sizes.
   void ExpectWhole(const std::string& raw, int preview, int full) {
     SCOPED_TRACE(raw);
-    EXPECT_EQ(ConvertAnew(preview, raw), kPreview);
+    EXPECT_EQ(ConvertInEmptyDirectory(preview, raw), kPreview);
     EXPECT_EQ(Identify(kPreview).width, preview);
-    EXPECT_EQ(ConvertAnew(preview + 1, raw), kPpm);
+    EXPECT_EQ(ConvertInEmptyDirectory(preview + 1, raw), kPpm);
     EXPECT_EQ(Identify(kPpm).width, full);
     EXPECT_THAT(ErrorLines(), IsEmpty());
   }
@@ -149,12 +149,12 @@ TEST_F(RawOfAnyMaker, LeavesOneImageOrNoneWhenItIsCut) {
   const std::string whole = ReadFile(MakeRawPhoto("/tmp/own/a.dng", RawWithPreview(120, 80)));
   for (const size_t part : {1U, 10U, 50U, 99U}) {
     WriteFile("/tmp/own/cut.dng", whole.substr(0, whole.size() * part / 100));
-    ConvertAnew(120, "/tmp/own/cut.dng");
+    ConvertInEmptyDirectory(120, "/tmp/own/cut.dng");
   }
   const std::string folder = SharedMediaDirectory();
   for (const char* name : {"/tiny_preview.nef", "/broken_preview.dng"}) {
     if (IsRegularFile(folder + name)) {
-      EXPECT_NE(ConvertAnew(1280, folder + name), kPreview);
+      EXPECT_NE(ConvertInEmptyDirectory(1280, folder + name), kPreview);
     }
   }
 }

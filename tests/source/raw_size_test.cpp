@@ -10,7 +10,7 @@ namespace {
 
 constexpr const char* kNone = "none, sizes untouched";
 
-/// The size as text, or what a failure left.
+/// The size as text, or the result of a failure.
 std::string Described(int result, uint32_t width, uint32_t height) {
   const std::string size = std::to_string(width) + "x" + std::to_string(height);
   if (result == 0) {
@@ -35,7 +35,7 @@ std::string SizeOf(const std::string& path) {
 
 class RawSize : public SourceTest {
  protected:
-  /// The size that is read from a decoder that does this.
+  /// The size read from a decoder with this plan.
   static std::string SizeAfter(const StubPlan& plan) {
     const StubTool decoder(kDcrawPath);
     decoder.Plan(plan);
@@ -66,7 +66,7 @@ TEST_P(PrintedSize, IsRead) {
   EXPECT_EQ(SizeIn(GetParam().text), GetParam().size);
 }
 
-// Two numbers with an x, which a picture can have.
+// Two numbers with an x, in the range of picture sizes.
 INSTANTIATE_TEST_SUITE_P(
     Values, PrintedSize,
     ::testing::Values(Printed{"NoSpaces", "Output size:3x4\n", "3x4"},
@@ -91,7 +91,7 @@ const char* const kSeveralSizes =
     "\nFilename: a.dng\nThumb size:   160 x 120\nFull size:    640 x 480\n"
     "Image size:   630 x 470\nOutput size:  600 x 400\nRaw colors: 3\n";
 
-// The first good line counts; what follows the first 255 bytes of a line is read as another line.
+// The first valid line is used; a line is split after every 255 bytes.
 INSTANTIATE_TEST_SUITE_P(
     Lines, PrintedSize,
     ::testing::Values(
@@ -169,7 +169,7 @@ TEST_F(PhotoSize, OfOtherPhotosIsThatOfTheirPixelsAsStored) {
   EXPECT_EQ(SizeOf(MakeJpeg("/tmp/photos/a.jpg", recipe)), "64x48");
 }
 
-TEST_F(PhotoSize, OfWhatIsNoPhoto) {
+TEST_F(PhotoSize, OfOtherFiles) {
   WriteFile("/tmp/photos/a.jpg", "no photo");
   EXPECT_EQ(SizeOf("/tmp/photos/a.jpg"), kNone);
   EXPECT_EQ(SizeOf("/tmp/photos/missing.jpg"), kNone);

@@ -40,12 +40,12 @@ class RotationCheck : public SourceTest {
   static void PutPhoto(int width, int height) { MakePicture(kPhoto, width, height); }
   static void PutReference(int width, int height) { MakePicture(kReference, width, height); }
 
-  /// What compare prints for the trial at this turn.
+  /// Sets the output of compare for the trial at this turn.
   void PlanDistance(int degrees, const std::string& printed) {
     compare_->PlanWhen(Trial(degrees), StubPlan().PrintError(printed).Exit(1));
   }
 
-  /// The turn that is found; no trial image is left.
+  /// The detected turn; expects that no trial image is left.
   int Turn() const {
     const int degrees = DetectThumbRotation(Job(), kPhoto, kThumbDir);
     for (const std::string& name : ThumbDirFiles()) {
@@ -191,7 +191,7 @@ TEST_F(TrialImage, IsMadeAsTheReferenceWas) {
   const std::vector<StubCall> calls = converter_->Calls();
   ASSERT_THAT(calls, SizeIs(2));
   for (size_t i = 0; i < calls.size(); ++i) {
-    // The output is renamed when it is whole.
+    // The output is renamed when it is complete.
     EXPECT_THAT(
         calls[i].Parameters(),
         ElementsAre("-define", "registry:temporary-path=" + std::string(kThumbDir), kPhoto,

@@ -29,7 +29,7 @@ class RealTurn : public SourceTest {
     MakeJpeg(kPhoto, recipe);
   }
 
-  /// Makes thumbnails that their owner has turned.
+  /// Makes thumbnails that a user has rotated.
   void PutThumbs(int degrees, const std::string& source = kPhoto) const {
     RemoveTree(kThumbDir);
     ASSERT_EQ(CreatePhotoThumbs(Job(), 0, source, kThumbDir, false, false, degrees), 0);
@@ -90,7 +90,7 @@ TEST_P(EachTurn, ByASmallThumbnailAlone) {
 }
 
 TEST_P(EachTurn, IsDoneTwiceToThumbnailsBelowTheLargestOfARun) {
-  // They are made from the largest one, which is turned already, and are turned once more. The
+  // They are made from the largest one, which is already turned, and are turned once more. The
   // check uses the largest one.
   PutPhoto(240, 160);
   PutThumbs(degrees_);
@@ -110,7 +110,7 @@ TEST_P(EachTurn, OfARawPhotosFullDecode) {
   ExpectRecognised(decoded);
 }
 
-// A real camera picture, if this machine has one.
+// A real camera picture, if the machine has one.
 TEST_P(EachTurn, OfACameraPhotoSavedAgain) {
   const std::string camera = SharedMediaDirectory() + "/no_exif.jpg";
   if (IsRegularFile(camera)) {
@@ -145,7 +145,7 @@ TEST_F(RealTurn, OfASquareIsNeverAQuarterTurn) {
   }
 }
 
-TEST_F(RealTurn, IsNoneForAnUnreadableReference) {
+TEST_F(RealTurn, IsZeroForAnUnreadableReference) {
   PutPhoto(240, 160);
   for (const char* content : {"", "no picture"}) {
     WriteFile(InThumbDir("VELAPHOTO_THUMB_XL.jpg"), content);
@@ -153,7 +153,7 @@ TEST_F(RealTurn, IsNoneForAnUnreadableReference) {
   }
 }
 
-TEST_F(RealTurn, IsNoneForAnUnreadablePhoto) {
+TEST_F(RealTurn, IsZeroForAnUnreadablePhoto) {
   PutPhoto(240, 160);
   PutThumbs(180);
   WriteFile(kPhoto, "no picture");

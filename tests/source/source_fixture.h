@@ -70,13 +70,13 @@ class SourceTest : public SandboxTest {
     MakeDirectories(kThumbDir);
   }
 
-  /// A child left waiting would stay until this program ends.
+  /// Fails if a child was not waited for.
   void TearDown() override {
     EXPECT_EQ(waitpid(-1, nullptr, WNOHANG), -1) << "a child was left";
     EXPECT_EQ(errno, ECHILD);
   }
 
-  /// Adds a profile of phase 0; to be added in ascending order of size, as lists are.
+  /// Adds a profile of phase 0; profiles must be added in ascending order of size.
   void AddProfile(int size, const std::string& filename, int quality = 90) {
     profiles_.all.push_back(
         std::make_unique<const ThumbnailProfile>(size, quality, "", filename, 0));
@@ -91,7 +91,7 @@ class SourceTest : public SandboxTest {
   ThumbnailProfileList profiles_;
 };
 
-/// Arguments behind argument zero of each of the calls.
+/// The arguments after argument zero of each call.
 inline std::vector<std::vector<std::string>> ParametersOf(const std::vector<StubCall>& calls) {
   std::vector<std::vector<std::string>> parameters;
   for (const StubCall& call : calls) {

@@ -1,4 +1,4 @@
-// Tools that print more than is read, or do not end: each is waited for.
+// Tools that print more than is read or do not end: the program waits for each.
 
 #include <chrono>
 #include <functional>
@@ -20,7 +20,7 @@ const std::string kKilobyte = std::string(1023, 'x') + "\n";
 /// One place where a tool's output is read.
 struct Reader {
   const char* tool;
-  const char* printed;  ///< what is to be read
+  const char* printed;  ///< output to be read
   std::function<int()> read;
   int expected;
 };
@@ -49,8 +49,8 @@ class ToolEnd : public SourceTest {
     WriteFile(kRaw, "raw");
   }
 
-  /// Each reader gets its answer from a tool with this plan, and the tool has ended when the reader
-  /// returns.
+  /// Expects each reader to get its answer from a tool with this plan, and the tool to have ended
+  /// when the reader returns.
   static void ExpectAnswered(const std::function<StubPlan(const std::string&)>& plan) {
     for (const Reader& reader : Readers()) {
       SCOPED_TRACE(reader.tool + std::string(": ") + reader.printed);

@@ -1,4 +1,4 @@
-// Lines of a tool's output and what they state.
+// Lines of a tool's output and their tags.
 #include "source/tool_output.h"
 
 #include "platform/vlibc.h"
@@ -57,7 +57,7 @@ TEST_F(ToolLines, LoseWhiteSpaceAroundTheValueOnly) {
   EXPECT_EQ(Split("Rotation: \t "), "[Rotation][]");
 }
 
-TEST_F(ToolLines, WithoutAValueStateNothing) {
+TEST_F(ToolLines, WithoutAValueAreIgnored) {
   EXPECT_EQ(Split(""), "nothing");
   EXPECT_EQ(Split("Rotation 90"), "nothing");
   EXPECT_EQ(Split("Rotation:"), "nothing");

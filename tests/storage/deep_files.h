@@ -1,5 +1,5 @@
-// Files that are too deep or have too long a name for any path. Each is removed by its object,
-// because the sandbox removes files by path.
+// Files that are nested too deeply or have too long a name for any path. Each is removed by its
+// object, because the sandbox removes files by path.
 #pragma once
 
 #include <fcntl.h>

@@ -4,7 +4,7 @@
 
 #include <stdexcept>
 
-#include "posix/cut_text.h"
+#include "posix/truncated_text.h"
 #include "storage/directory_tree.h"
 #include "storage/velamk_thumb_status.h"
 #include "support/files.h"
@@ -97,7 +97,7 @@ class DirectoryTree : public QuietTest {
     MakeDirectories("/tmp/tree/a/b/c/d");
   }
 
-  /// The directories that a visitor is shown which throws at the one of this path.
+  /// The directories visited before and including this one, at which the visitor throws.
   static std::vector<std::string> VisitedUntil(const std::string& last) {
     std::vector<std::string> visited;
     const auto visit = [&](const char* path, bool /*isReadable*/) {
@@ -130,7 +130,7 @@ TEST_F(DirectoryTree, AVisitorThatThrowsLeavesNoDescriptorOpen) {
   }
 }
 
-TEST_F(DirectoryTree, TheNextWalkIsWhole) {
+TEST_F(DirectoryTree, TheNextWalkIsComplete) {
   VisitedUntil("/tmp/tree/a/b");
   EXPECT_THAT(VisitedUntil(""), UnorderedElementsAre(kTop, "/tmp/tree/a", "/tmp/tree/a/b",
                                                      "/tmp/tree/a/b/c", "/tmp/tree/a/b/c/d"));

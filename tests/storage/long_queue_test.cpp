@@ -48,7 +48,7 @@ void PrintTo(const ScanCase& scan, std::ostream* out) {
 
 class LongQueue : public QuietTest, public ::testing::WithParamInterface<ScanCase> {
  protected:
-  /// Makes a queue with ten entries of the tree in it, last touched a moment ago.
+  /// Makes a queue that contains ten entries of the tree and is old enough to be indexed.
   void SetUp() override {
     QuietTest::SetUp();
     WriteFile("/etc/velainfo.conf", "photo_thumb_size_map=\"1\"\nvideo_thumb_size_map=\"1\"\n");
@@ -86,13 +86,13 @@ class LongQueue : public QuietTest, public ::testing::WithParamInterface<ScanCas
     return photos;
   }
 
-  /// The work in the tree without that of the queued entries.
-  static int WorkBut(int waiting) { return GetParam().directories - waiting; }
+  /// The work in the tree without the queued entries.
+  static int WorkWithout(int waiting) { return GetParam().directories - waiting; }
 };
 
 TEST_P(LongQueue, IsReadOnceAndNotForEachLookup) {
   const long long before = BytesRead();
-  EXPECT_EQ(CountWork(), WorkBut(kWaiting));
+  EXPECT_EQ(CountWork(), WorkWithout(kWaiting));
   const long long read = BytesRead() - before;
   EXPECT_GE(read, FileSize(Queue())) << "bytes are not counted";
   EXPECT_LT(read, FileSize(Queue()) + FileSize(Queue()) / 4);
@@ -101,20 +101,20 @@ TEST_P(LongQueue, IsReadOnceAndNotForEachLookup) {
 TEST_P(LongQueue, IsNotReadAgainForAnotherScan) {
   CountWork();
   const long long before = BytesRead();
-  EXPECT_EQ(CountWork(), WorkBut(kWaiting));
+  EXPECT_EQ(CountWork(), WorkWithout(kWaiting));
   EXPECT_LT(BytesRead() - before, FileSize(Queue()) / 4);
 }
 
 TEST_P(LongQueue, AChangeBetweenTwoScansIsSeen) {
-  EXPECT_EQ(CountWork(), WorkBut(kWaiting));
+  EXPECT_EQ(CountWork(), WorkWithout(kWaiting));
   AppendToFile(Queue(), Entry(1) + "\n");
   Rest();
-  EXPECT_EQ(CountWork(), WorkBut(kWaiting + 1));
+  EXPECT_EQ(CountWork(), WorkWithout(kWaiting + 1));
   WriteFile("/var/spool/emptied", Entry(1) + "\n" + Entry(2) + "\n");
   ASSERT_EQ(std::rename("/var/spool/emptied", Queue()), 0);
-  EXPECT_EQ(CountWork(), WorkBut(2));
+  EXPECT_EQ(CountWork(), WorkWithout(2));
   WriteFile(Queue(), Entry(1) + "\n" + "/tmp/tree/dd" + "\n");
-  EXPECT_EQ(CountWork(), WorkBut(1));
+  EXPECT_EQ(CountWork(), WorkWithout(1));
 }
 
 INSTANTIATE_TEST_SUITE_P(

@@ -80,7 +80,7 @@ inline std::string PathOfLength(size_t length, const std::string& ending) {
   while (directory.size() + 2 * kComponent + ending.size() < length) {
     directory += "/" + std::string(kComponent, 'd');
   }
-  // One directory more takes up the rest, so that the last component is short.
+  // One more directory fills the remaining length, so that the last component is short.
   const size_t rest = length - directory.size() - ending.size() - 2;
   const size_t half = rest > kComponent ? kComponent : 0;
   if (half > 0) {

@@ -80,7 +80,7 @@ TEST_F(Orientation, OfAVideo) {
 }
 
 TEST_F(Orientation, TheExtensionDistinguishesPhotosFromVideos) {
-  // A photo reader finds no size in a video that is named as a photo.
+  // No photo size can be read from a video with the name of a photo.
   CopyFile(Video(48, 64), "/tmp/video.jpg");
   EXPECT_EQ(IsFilePortrait("/tmp/video.jpg"), 0);
 }
@@ -216,7 +216,7 @@ TEST_F(VideoOrientation, NothingIsComparedWithoutMetadataDirectory) {
 }
 
 TEST_F(VideoOrientation, TheLongestPathIsCompared) {
-  // The path of the converted video is the longest that the system takes.
+  // The path of the converted video is the longest that the system accepts.
   const std::string media = PathOfLength(4067, "long.mp4");
   const std::string eaDir = DirectoryOf(media) + "/@eaDir/long.mp4";
   const std::string converted = eaDir + "/" + kHigh.name;

@@ -34,8 +34,8 @@ inline void MakePhoto(const std::string& path) {
   SetFileTime(path, kMediaTime);
 }
 
-/// Makes the thumbnails of the media file `dir`/`name` that `sizeMap` has the bits of, `seconds`
-/// younger than it.
+/// Makes the thumbnails of the media file `dir`/`name` whose bits are set in `sizeMap`, `seconds`
+/// newer than it.
 inline void MakeThumbs(const std::string& dir, const std::string& name, int sizeMap,
                        int64_t seconds = 1) {
   for (int row = 0; row < 6; ++row) {

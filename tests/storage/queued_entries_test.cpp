@@ -34,7 +34,7 @@ class QueueFile : public QuietTest {
     std::vector<std::string> entries;
     EXPECT_EQ(ForEachQueueEntry(kFile,
                                 [&entries](const std::string& entry) { entries.push_back(entry); }),
-              QueueRead::kWhole);
+              QueueRead::kComplete);
     return entries;
   }
 };

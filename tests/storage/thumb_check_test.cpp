@@ -15,7 +15,7 @@ using ::testing::MatchesRegex;
 using ::testing::SizeIs;
 using ::testing::UnorderedElementsAreArray;
 
-/// What a derived file is; an outdated one is landscape and older than its video.
+/// The state of a derived file; an outdated one is landscape and older than its video.
 enum Kind { kLandscape, kPortrait, kOutdated, kEmpty };
 
 constexpr const char* kS = kThumbNames[0];

@@ -124,7 +124,7 @@ TEST_F(ThumbOutdated, TheLongestMetadataDirectoryFits) {
 }
 
 TEST_F(ThumbOutdated, PathsOfDerivedFilesAreTruncated) {
-  // The metadata directory still fits; of the thumbnail's name seven bytes are left.
+  // The metadata directory fits, but the thumbnail's name is truncated to seven bytes.
   const std::string media = PathOfLength(4080, "abcdefgh.jpg");
   WriteFile(media, "media");
   const std::string eaDir = DirectoryOf(media) + "/@eaDir/abcdefgh.jpg";

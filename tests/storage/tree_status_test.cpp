@@ -140,7 +140,7 @@ class QueuedTree : public TreeStatus {
 
 struct QueueCase : NamedCase {
   std::string content;
-  int photos;  ///< those in the tree that count
+  int photos;  ///< those in the tree that are counted
 };
 
 class QueuedTreeLines : public QueuedTree, public ::testing::WithParamInterface<QueueCase> {};

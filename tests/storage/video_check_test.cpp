@@ -1,5 +1,4 @@
-// Whether a video has the converted videos for browsers, for mobile devices, and for what the
-// settings ask for.
+// Whether a video has the converted videos for browsers, for mobile devices, and for the settings.
 #include <unistd.h>
 
 #include <map>
@@ -35,7 +34,7 @@ constexpr const char* kLargeButNoBitrate =
     R"("duration":5000000,"mtime":5000000}})";
 constexpr const char* kGoodPortraitRecord =
     R"({"success":true,"media":{"width":480,"height":640,"bitrate":1}})";
-/// In place of a record: the daemon closes the connection, or is not running.
+/// In place of a record: the daemon closes the connection or is not running.
 constexpr const char* kConnectionClosed = "closed";
 constexpr const char* kNoDaemon = "none";
 
@@ -52,7 +51,7 @@ struct DerivedFile {
   int size;
 };
 
-/// Both files of every one of these.
+/// Both files of each of these.
 std::vector<DerivedFile> AllOf(const std::vector<ConvertedVideo>& videos, int size) {
   std::vector<DerivedFile> files;
   for (const char* name : NamesOf(videos)) {
@@ -86,7 +85,7 @@ struct Judgement {
 };
 
 struct VideoCase : NamedCase {
-  std::vector<DerivedFile> files;  ///< what the metadata directory holds
+  std::vector<DerivedFile> files;  ///< content of the metadata directory
   Judgement expected;
   /// The daemon's answers in order, the last one for the rest; the usual one when empty.
   std::vector<std::string> records = {};
@@ -543,7 +542,7 @@ class UprightVideo : public VideoCheckTest {
 };
 
 TEST_F(UprightVideo, AConvertedVideoMayBeHuge) {
-  // Sizes of which 32 bits leave 0, 1 or a negative number.
+  // Sizes whose low 32 bits are 0, 1 or a negative number.
   for (const off_t size : {off_t{1} << 32, (off_t{1} << 32) + 1, off_t{1} << 31}) {
     SCOPED_TRACE(size);
     ASSERT_EQ(truncate(MakeDerived(kLow.name).c_str(), size), 0);

@@ -182,7 +182,8 @@ TEST_F(VideoTree, AVideoWhosePathIsTooLongIsLoggedAndStopsNoOther) {
 }
 
 TEST_F(VideoTree, ADirectoryWithoutRoomForNamesIsNotWalked) {
-  // Of 4094 bytes, so that every name after it is cut off and leads back to the directory.
+  // 4094 bytes long, so that every name after it is truncated and the path is that of the directory
+  // again.
   const std::string dir = DirectoryOfLength(4094);
   const FileInDirectory a(dir, "a.mp4");
   const FileInDirectory b(dir, "b.mp4");

@@ -12,7 +12,7 @@ namespace {
 using ::testing::ElementsAre;
 using ::testing::IsEmpty;
 
-/// What the video itself is; browsers play only the playable one.
+/// The content of the video; browsers play only the playable one.
 enum Content { kText, kPlayable, kUnplayable };
 
 enum Thumbs { kNone, kAll, kAllButSm, kMediumOnly };

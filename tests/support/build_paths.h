@@ -1,4 +1,4 @@
-// Where the sandbox shows what the build and the source tree hold.
+// Paths of the build and the source tree inside the sandbox.
 #pragma once
 
 #include <string>

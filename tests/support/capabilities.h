@@ -1,4 +1,4 @@
-// The calling thread's capabilities, as plain system calls.
+// The calling thread's capabilities, with plain system calls.
 #pragma once
 
 #include <cstdint>

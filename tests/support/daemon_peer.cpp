@@ -29,7 +29,7 @@ namespace {
 
 constexpr int kNoLimit = -1;
 
-/// The string value of "command" in the request's text, as it stands there.
+/// The unparsed string value of "command" in the request's text.
 std::string CommandIn(const std::string& request) {
   const std::string key = "\"command\"";
   size_t position = request.find(key);
@@ -51,7 +51,7 @@ class Connection {
   /// `stop` becomes readable when the daemon ends; every wait ends then too.
   Connection(int socket, int stop) : socket_(socket), stop_(stop) {}
 
-  /// Everything up to the first newline or the end.
+  /// Reads everything up to the first newline or the end.
   std::string ReadRequest() const {
     std::string request;
     while (request.find('\n') == std::string::npos && WaitFor(POLLIN)) {
@@ -241,7 +241,7 @@ class DaemonPeer::Server {
   const std::string path_;
   const Descriptor listener_;
   const Descriptor stop_;
-  std::vector<std::thread> connections_;  // the accepting thread's own until it has ended
+  std::vector<std::thread> connections_;  // used only by the accepting thread until it has ended
   std::thread acceptor_;
 };
 

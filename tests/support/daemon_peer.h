@@ -1,4 +1,4 @@
-// Plays the plugin daemon behind its socket.
+// Simulates the plugin daemon at its socket.
 #pragma once
 
 #include <cstddef>
@@ -13,7 +13,7 @@ namespace vela_test {
 
 constexpr const char* kDaemonSocket = "/tmp/velaindexplugind_sock";
 
-/// A request as it came in.
+/// A received request.
 struct DaemonRequest {
   std::string bytes;      ///< raw, the newline included
   std::string command;    ///< value of "command", empty when there is none
@@ -90,14 +90,14 @@ class DaemonPeer {
   void Answer(const std::string& command, const DaemonReply& reply);
   /// Queues `reply` for the next connection without one, whatever its request.
   void AnswerNext(const DaemonReply& reply);
-  /// Shorthand: the index version that GET_INDEX_VERSION gives.
+  /// Shorthand: sets the index version in replies to GET_INDEX_VERSION.
   void SetIndexVersion(int version);
 
   /// All requests so far, in order of arrival.
   std::vector<DaemonRequest> Requests() const;
   /// The commands of all requests so far.
   std::vector<std::string> Commands() const;
-  /// Waits until `count` requests have come in, at most `milliseconds`; whether they did.
+  /// Waits until `count` requests have come in, at most `milliseconds`; returns whether they have.
   bool WaitForRequests(size_t count, int milliseconds = 10000) const;
   /// Connections accepted so far.
   size_t Connections() const;

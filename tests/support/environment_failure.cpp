@@ -12,7 +12,7 @@ void EnvironmentFailure(const std::string& what) {
   std::fflush(stdout);
   std::fprintf(stderr, "test environment: %s\n", what.c_str());
   std::fflush(stderr);
-  // Neither leak checks nor exit handlers have anything to say about a run that never was.
+  // Leak checks and exit handlers would only confuse: no test has run.
   _exit(1);
 }
 

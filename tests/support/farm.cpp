@@ -18,7 +18,7 @@ namespace vela_test {
 
 namespace {
 
-// A time no directory gets by itself: as long as a directory carries it, nothing was added, removed
+// A time that no directory has by chance: as long as a directory has it, nothing was added, removed
 // or renamed in it.
 constexpr timespec kUntouched = {1, 0};
 
@@ -61,7 +61,7 @@ Farm::Farm(std::string path, std::set<std::string> own, const std::string& hidde
       links_[entry.name] = LinkTarget(dirfd(host.get()), entry.name, entry.type);
     }
   }
-  ReplantMissing();
+  LinkMissing();
   MarkUntouched();
 }
 
@@ -73,12 +73,12 @@ void Farm::Restore() const {
   if (IsUntouched()) {
     return;
   }
-  RemoveStrangers();
-  ReplantMissing();
+  RemoveOthers();
+  LinkMissing();
   MarkUntouched();
 }
 
-/// Links are taken over as they are, so that what they mean is looked up in the sandbox.
+/// Links are copied unchanged, so that they are resolved inside the sandbox.
 std::string Farm::LinkTarget(int directory, const std::string& name, unsigned char type) const {
   if (type == DT_LNK || type == DT_UNKNOWN) {
     std::string target = ReadLink(directory, name);
@@ -89,22 +89,22 @@ std::string Farm::LinkTarget(int directory, const std::string& name, unsigned ch
   return HostPath((path_ == "/" ? "" : path_) + "/" + name);
 }
 
-void Farm::RemoveStrangers() const {
+void Farm::RemoveOthers() const {
   const DirectoryStream directory(opendir(path_.c_str()));
   if (directory == nullptr) {
     EnvironmentFailureWithErrno("cannot read " + path_);
   }
   for (const Entry& entry : Entries(directory.get())) {
     const auto link = links_.find(entry.name);
-    const bool isPlanted =
+    const bool isOurs =
         link != links_.end() && ReadLink(dirfd(directory.get()), entry.name) == link->second;
-    if (!isPlanted && own_.count(entry.name) == 0) {
+    if (!isOurs && own_.count(entry.name) == 0) {
       RemoveWithMounts(path_ + "/" + entry.name);
     }
   }
 }
 
-void Farm::ReplantMissing() const {
+void Farm::LinkMissing() const {
   const Descriptor directory(open(path_.c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC));
   if (!directory.IsOpen()) {
     EnvironmentFailureWithErrno("cannot open " + path_);

@@ -1,5 +1,5 @@
-// A farm: a directory of the sandbox that shows the entries of the machine's directory of the same
-// path as symbolic links, so that single entries can be added, removed and replaced.
+// A symlink farm: a directory of the sandbox with symbolic links to the entries of the machine's
+// directory of the same path, so that single entries can be added, removed and replaced.
 #pragma once
 
 #include <map>
@@ -10,20 +10,20 @@ namespace vela_test {
 
 class Farm {
  public:
-  /// Plants the farm at `path` (absolute; made when missing) from HostPath(path). The names in
-  /// `own` are not planted and never touched by Restore; the names for which `hidden` is a
-  /// beginning are not planted either.
+  /// Creates the farm at `path` (absolute; created when missing) from HostPath(path). The names in
+  /// `own` are not linked and never touched by Restore; names that begin with `hidden` are not
+  /// linked either.
   Farm(std::string path, std::set<std::string> own, const std::string& hidden = std::string());
 
-  /// Brings the directory back to its first state, but for the entries of its own.
+  /// Restores the directory to its first state, except for the names in `own`.
   void Restore() const;
 
   const std::string& Path() const { return path_; }
 
  private:
   std::string LinkTarget(int directory, const std::string& name, unsigned char type) const;
-  void RemoveStrangers() const;
-  void ReplantMissing() const;
+  void RemoveOthers() const;
+  void LinkMissing() const;
   void MarkUntouched() const;
   bool IsUntouched() const;
 

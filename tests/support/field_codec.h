@@ -1,4 +1,4 @@
-// Lists of byte strings as one byte string: how plans and call records are kept in files.
+// Lists of byte strings encoded as one byte string: the format of plans and call records in files.
 #pragma once
 
 #include <cstddef>
@@ -10,11 +10,11 @@ namespace vela_test {
 /// Each field as its length, ':' and its bytes.
 std::string EncodeFields(const std::vector<std::string>& fields);
 
-/// Takes the next field off `text` from `position`, which moves behind it; false at the end and at
-/// anything that is no whole field.
+/// Reads the next field of `text` at `position` and moves it after the field; false at the end and
+/// at an incomplete field.
 bool NextField(const std::string& text, size_t* position, std::string* field);
 
-/// All fields; what is no whole field ends the list.
+/// All fields up to the first incomplete one.
 std::vector<std::string> DecodeFields(const std::string& text);
 
 }  // namespace vela_test

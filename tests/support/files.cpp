@@ -35,7 +35,7 @@ void MakeParents(const std::string& path) {
   }
 }
 
-/// `mode` as for fopen; "e" keeps the descriptor from programs that are started meanwhile.
+/// `mode` as for fopen; "e" hides the descriptor from programs that are started meanwhile.
 void Write(const std::string& path, const std::string& content, const char* mode) {
   std::FILE* const file = std::fopen(path.c_str(), mode);
   const bool isWritten =
@@ -51,7 +51,7 @@ std::optional<struct stat> StatusOf(const std::string& path) {
   return stat(path.c_str(), &status) == 0 ? std::optional(status) : std::nullopt;
 }
 
-/// The same for a file that has to be there.
+/// The same for a file that must exist.
 struct stat ExistingStatus(const std::string& path) {
   const struct stat none {};
   const auto status = StatusOf(path);

@@ -20,7 +20,7 @@ void Append(Arguments& arguments, const Arguments& more) {
   arguments.insert(arguments.end(), more.begin(), more.end());
 }
 
-/// The best picture an encoder can give does not matter here, its time does.
+/// Encoding time matters here, picture quality does not.
 Arguments SpeedOf(const std::string& videoCodec) {
   if (videoCodec == "libx264" || videoCodec == "libx265") return {"-preset", "ultrafast"};
   if (videoCodec == "libaom-av1") return {"-usage", "realtime", "-cpu-used", "8"};
@@ -49,12 +49,12 @@ Arguments FfmpegArguments(const std::string& path, const FilmRecipe& recipe) {
   if (!recipe.audioCodec.empty()) Append(arguments, {"-codec:a", recipe.audioCodec});
   if (recipe.headerFirst) Append(arguments, {"-movflags", "+faststart"});
   if (!recipe.format.empty()) Append(arguments, {"-f", recipe.format});
-  // "file:" keeps a leading dash from being an option and a colon from being a protocol.
+  // "file:" prevents a leading dash from being read as an option and a colon as a protocol.
   Append(arguments, {"-threads", "1", "-t", std::to_string(recipe.seconds), "file:" + path});
   return arguments;
 }
 
-/// A number with 16 fractional bits, the highest byte first.
+/// A number with 16 fractional bits, big-endian.
 std::string FixedPoint(double value) {
   const auto bits = static_cast<uint32_t>(std::lround(value * 65536));
   std::string bytes;
@@ -72,7 +72,7 @@ std::string MakeFilm(const std::string& path, const FilmRecipe& recipe) {
   if (result.exitCode != 0) {
     EnvironmentFailure("cannot make the film " + path + ": " + result.err);
   }
-  // How ffmpeg is asked for a rotation differs from one version to the next.
+  // The way to request a rotation differs between versions of ffmpeg.
   if (recipe.rotation != 0) SetFilmMatrix(path, recipe.rotation);
   return path;
 }

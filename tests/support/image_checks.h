@@ -1,4 +1,4 @@
-// Reads images back to see what was made.
+// Reads images back to check them.
 #pragma once
 
 #include <cstdint>
@@ -23,7 +23,7 @@ class DecodedImage {
   int Height() const { return height_; }
   /// Components as stored: 1 grey, 3 colour, 4 CMYK.
   int Components() const { return components_; }
-  /// Colour at a relative place, 0 to 1 from the left and from the top.
+  /// Colour at a relative position, 0 to 1 from the left and from the top.
   Rgb At(double x, double y) const;
 
  private:
@@ -33,8 +33,8 @@ class DecodedImage {
   std::vector<uint8_t> pixels_;  // RGB
 };
 
-/// Decodes a JPEG; empty unless the file is one whole JPEG and nothing else (a warning of the
-/// decoder, missing data or bytes behind the end all count); `why`, when given, receives the
+/// Decodes a JPEG; empty unless the file is one complete JPEG and nothing else (a warning of the
+/// decoder, missing data and bytes after the end are failures); `why`, when given, receives the
 /// reason.
 std::optional<DecodedImage> DecodeJpeg(const std::string& path, std::string* why = nullptr);
 
@@ -46,13 +46,13 @@ bool IsWholeJpeg(const std::string& path);
 /// whole JPEG.
 std::string QuadrantLetters(const std::string& path);
 
-/// What "RGBY" as stored reads after the orientation tag (1 to 8) has been applied.
+/// The letters of a stored "RGBY" after the orientation tag (1 to 8) has been applied.
 std::string LettersAfterOrientation(int orientation);
 
-/// What "RGBY" reads after a clockwise turn by 0, 90, 180 or 270 degrees.
+/// The letters of "RGBY" after a clockwise turn by 0, 90, 180 or 270 degrees.
 std::string LettersAfterTurn(int degrees);
 
-/// What a JPEG carries beside its picture.
+/// The contents of a JPEG besides its picture.
 struct JpegMetadata {
   bool exif = false;
   bool xmp = false;
@@ -63,7 +63,7 @@ struct JpegMetadata {
 };
 JpegMetadata ReadJpegMetadata(const std::string& path);
 
-/// What ImageMagick's identify prints about a file's first picture.
+/// Output of ImageMagick's identify for a file's first picture.
 struct ImageIdentity {
   std::string format;  ///< "JPEG", "PNG", ...; empty when it is no image
   int width = 0;

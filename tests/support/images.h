@@ -1,5 +1,5 @@
-// Test photos: four quadrants in distinct colours, so that the orientation of a picture shows in
-// its pixels.
+// Test photos: four quadrants in distinct colours, so that the orientation of a picture can be read
+// from its pixels.
 #pragma once
 
 #include <string>

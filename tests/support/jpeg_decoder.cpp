@@ -36,7 +36,7 @@ void OnMessage(j_common_ptr library, int level) {
 }
 
 /// Decodes into `pixels`; returns whether it succeeded. No local object may have a destructor,
-/// since a failure jumps out.
+/// since a failure leaves by longjmp.
 bool Decode(const std::string& file, Decoder* decoder, std::vector<uint8_t>* pixels) {
   jpeg_decompress_struct* library = &decoder->library;
   library->err = jpeg_std_error(&decoder->errors);

@@ -1,4 +1,4 @@
-// What a JPEG carries beside its picture, read from its segments.
+// The contents of a JPEG besides its picture, read from its segments.
 #include <cstddef>
 #include <cstdint>
 
@@ -36,7 +36,7 @@ bool StartsWith(const std::string& text, const std::string& beginning) {
   return text.compare(0, beginning.size(), beginning) == 0;
 }
 
-/// The orientation in the first directory of an EXIF block (behind its "Exif" header).
+/// The orientation in the first directory of an EXIF block (after its "Exif" header).
 int OrientationIn(const std::string& tiff) {
   constexpr size_t kEntrySize = 12;
   const bool bigEndian = StartsWith(tiff, "MM");
@@ -51,7 +51,7 @@ int OrientationIn(const std::string& tiff) {
   return 0;
 }
 
-/// Whether a Photoshop segment holds an IPTC resource with something in it.
+/// Whether a Photoshop segment contains an IPTC resource that is not empty.
 bool HoldsIptc(const std::string& segment) {
   const std::string resource = std::string("8BIM\x04\x04", 6);
   const size_t found = segment.find(resource);
@@ -64,7 +64,7 @@ bool HoldsIptc(const std::string& segment) {
   return Long(segment, name + nameSize, true) > 0;
 }
 
-void NoteSegment(int marker, const std::string& content, JpegMetadata* metadata) {
+void RecordSegment(int marker, const std::string& content, JpegMetadata* metadata) {
   const std::string exif("Exif\0\0", 6);
   if (marker == kComment) {
     metadata->comment = true;
@@ -92,7 +92,7 @@ JpegMetadata ReadJpegMetadata(const std::string& path) {
     if (marker == kStartOfScan || length < 2) {
       break;
     }
-    NoteSegment(marker, file.substr(position + 4, length - 2), &metadata);
+    RecordSegment(marker, file.substr(position + 4, length - 2), &metadata);
     position += 2 + length;
   }
   return metadata;

@@ -19,7 +19,7 @@ bool StartsWith(const std::string& text, const std::string& beginning) {
   return text.compare(0, beginning.size(), beginning) == 0;
 }
 
-/// Listing tests, which the build does, needs no sandbox.
+/// The build lists the tests, which needs no sandbox.
 bool OnlyPrintsInformation(const std::vector<std::string>& arguments) {
   for (const std::string& argument : arguments) {
     if (StartsWith(argument, "--gtest_list_tests") || argument == "--help") {
@@ -37,8 +37,8 @@ std::string AbsolutePath(const std::string& path) {
   return getcwd(directory, sizeof directory) == nullptr ? path : directory + ("/" + path);
 }
 
-/// Points a result file named on the command line (xml:path or json:path) at the place where the
-/// sandbox shows its directory; returns that directory, empty when no result file is asked for.
+/// Changes the path of a result file on the command line (xml:path or json:path) to its directory
+/// in the sandbox; returns the original directory, empty when no result file is requested.
 std::string RedirectResultFile(std::vector<std::string>* arguments) {
   for (std::string& argument : *arguments) {
     const size_t colon = argument.find(':');
@@ -47,7 +47,7 @@ std::string RedirectResultFile(std::vector<std::string>* arguments) {
     }
     const std::string path = AbsolutePath(argument.substr(colon + 1));
     const size_t slash = path.rfind('/');
-    std::error_code error;  // a directory that cannot be made shows itself when it is mounted
+    std::error_code error;  // a failure is detected when the directory is mounted
     std::filesystem::create_directories(path.substr(0, slash + 1), error);
     argument = argument.substr(0, colon + 1) + vela_test::kWritablePlace + path.substr(slash);
     return path.substr(0, slash + 1);

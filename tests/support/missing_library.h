@@ -1,4 +1,4 @@
-// A machine without some library.
+// A machine that lacks a library.
 #pragma once
 
 #include <string>
@@ -7,7 +7,7 @@
 namespace vela_test {
 
 /// As long as the object exists, no program that is started can load the library: an empty file
-/// hides it. Programs that have loaded it keep it.
+/// hides it. Programs that have already loaded it are not affected.
 class MissingLibrary {
  public:
   /// `name`: that of the library's file up to ".so", such as "libavformat".

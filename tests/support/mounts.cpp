@@ -25,7 +25,7 @@ struct statvfs VolumeOf(const std::string& path) {
   return volume;
 }
 
-/// Nothing when a reset of the sandbox has taken it off already.
+/// Does nothing when a reset of the sandbox has already unmounted it.
 void Unmount(const std::string& path, uint64_t mount) {
   if (MountAt(path) == mount) {
     umount2(path.c_str(), MNT_DETACH);
@@ -67,7 +67,7 @@ uint64_t SmallVolume::Available() const {
 }
 
 void SmallVolume::SetAvailable(uint64_t bytes) {
-  // Who writes at the same time may take up more than is left, which is refused.
+  // Fails when another writer uses more than the new size at the same time.
   constexpr int kTrials = 1000;
   for (int trial = 0; trial < kTrials; ++trial) {
     if (TrySetAvailable(path_, bytes)) {

@@ -6,8 +6,8 @@
 
 namespace vela_test {
 
-/// A memory volume of its own at a directory, as long as the object exists (or until the sandbox
-/// is reset). Only what is written uses memory, whatever the size.
+/// A separate memory volume at a directory, as long as the object exists (or until the sandbox is
+/// reset). Only written data uses memory, whatever the size.
 class SmallVolume {
  public:
   /// Mounts a volume of `bytes` (counted in whole pages, rounded up) at `path`; the directory is

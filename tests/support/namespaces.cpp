@@ -92,7 +92,7 @@ int ExitStatusOf(int waitStatus) {
   }
 }
 
-/// Makes process 1 end with its parent, even if that has ended before the call.
+/// Makes process 1 end with its parent, even if the parent has already ended.
 void EndWithParent(const Descriptor& alive) {
   prctl(PR_SET_PDEATHSIG, SIGKILL);
   char byte = 0;
@@ -110,16 +110,16 @@ void EnterNamespaces(const std::function<void()>& prepare) {
     EnvironmentFailureWithErrno("cannot make a pipe");
   }
   Descriptor alive(ends[0]);
-  Descriptor signOfLife(ends[1]);
+  Descriptor aliveWriter(ends[1]);
   const pid_t init = Fork();
   if (init > 0) {
     alive.Close();
-    const ssize_t written = write(signOfLife.Get(), "", 1);
+    const ssize_t written = write(aliveWriter.Get(), "", 1);
     static_cast<void>(written);  // process 1 sees the closed pipe otherwise
-    signOfLife.Close();
+    aliveWriter.Close();
     _exit(ExitStatusOf(AwaitChild(init)));
   }
-  signOfLife.Close();
+  aliveWriter.Close();
   EndWithParent(alive);
   prctl(PR_SET_NAME, "sandbox");
   prepare();

@@ -12,7 +12,7 @@ class PrivatePlace {
   /// `limit` its size as the kernel's memory volumes take it ("64m").
   PrivatePlace(std::string path, unsigned mode, const std::string& limit);
 
-  /// Empties it and unmounts everything that has been mounted on it or in it.
+  /// Empties it and unmounts everything mounted on it or in it.
   void Restore() const;
 
  private:

@@ -1,4 +1,5 @@
-// Tests run as user 0 of their sandbox, to whom no permission bit applies. This takes that away.
+// Tests run as user 0 of their sandbox, to whom permission bits do not apply. This makes them
+// apply.
 #pragma once
 
 #include <cstdint>

@@ -7,7 +7,7 @@
 
 namespace vela_test {
 
-/// One section of a profile file; what is not set is left out of the file.
+/// One section of a profile file; unset fields are omitted.
 struct ProfileSection {
   std::string section;
   std::optional<int> size;
@@ -17,7 +17,7 @@ struct ProfileSection {
   std::optional<int> phase;
 };
 
-/// The file's text: the sections in the given order, one `key=value` a line.
+/// The file's text: the sections in the given order, one `key=value` per line.
 std::string ProfileText(const std::vector<ProfileSection>& sections);
 
 /// Writes it to `path` and returns `path`.

@@ -21,10 +21,10 @@ namespace {
 
 using Clock = std::chrono::steady_clock;
 
-// Descriptors of the start-up itself stay out of the way of those the program gets.
+// Descriptors used for starting have high numbers, so that they do not collide with the program's.
 constexpr int kFirstOwnDescriptor = 200;
 
-Descriptor MovedUp(int number) {
+Descriptor MovedAside(int number) {
   const Descriptor original(number);
   Descriptor moved(fcntl(number, F_DUPFD_CLOEXEC, kFirstOwnDescriptor));
   if (!moved.IsOpen()) {
@@ -34,7 +34,7 @@ Descriptor MovedUp(int number) {
 }
 
 Descriptor MemoryFile(const char* name, const std::string& content = std::string()) {
-  Descriptor file = MovedUp(memfd_create(name, MFD_CLOEXEC));
+  Descriptor file = MovedAside(memfd_create(name, MFD_CLOEXEC));
   const ssize_t size = static_cast<ssize_t>(content.size());
   if (pwrite(file.Get(), content.data(), content.size(), 0) != size) {
     EnvironmentFailureWithErrno("cannot write the input of a program");
@@ -89,8 +89,8 @@ std::vector<char*> Pointers(std::vector<std::string>* texts) {
   return pointers;
 }
 
-/// All that the child needs, made before the fork: behind it only async-signal-safe calls are
-/// allowed, since this process has more than one thread.
+/// All data that the child needs, prepared before the fork: after it only async-signal-safe calls
+/// are allowed, since this process has more than one thread.
 struct Launch {
   const char* path;
   char** arguments;
@@ -250,9 +250,10 @@ Program StartProgram(const std::string& path, const std::vector<std::string>& ar
     EnvironmentFailureWithErrno("cannot make a pipe");
   }
   const Descriptor report(ends[0]);
-  Descriptor failureReport = MovedUp(ends[1]);
-  const Descriptor input = options.input.empty() ? MovedUp(open("/dev/null", O_RDONLY | O_CLOEXEC))
-                                                 : MemoryFile("input", options.input);
+  Descriptor failureReport = MovedAside(ends[1]);
+  const Descriptor input = options.input.empty()
+                               ? MovedAside(open("/dev/null", O_RDONLY | O_CLOEXEC))
+                               : MemoryFile("input", options.input);
   auto state = std::make_unique<Program::State>();
   state->output = MemoryFile("output");
   state->error = MemoryFile("error");

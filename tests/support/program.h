@@ -1,4 +1,4 @@
-// Runs programs as real child processes, with the surroundings a test wants.
+// Runs programs as real child processes, in the environment that a test wants.
 #pragma once
 
 #include <sys/types.h>
@@ -16,7 +16,7 @@ namespace vela_test {
 /// How a program ended.
 struct ProgramResult {
   int exitCode = -1;      ///< -1 when a signal ended it or it could not be started
-  int signal = 0;         ///< the signal that ended it, 0 for an ordinary end
+  int signal = 0;         ///< the signal that ended it, 0 for a normal exit
   int startError = 0;     ///< errno when the program could not be started
   bool timedOut = false;  ///< RunProgram only: killed at its time limit
   std::string out;        ///< standard output
@@ -25,10 +25,10 @@ struct ProgramResult {
 };
 
 /// A step of the child between fork and exec: only async-signal-safe calls; a result other than 0
-/// is an errno that keeps the program from starting.
+/// is an errno and prevents the program from starting.
 using BeforeExec = std::function<int()>;
 
-/// Surroundings of a program.
+/// The environment of a program.
 struct ProgramOptions {
   std::optional<mode_t> umask;                          ///< inherited when not set
   std::string workingDirectory;                         ///< inherited when empty
@@ -53,7 +53,7 @@ class Program {
 
   pid_t Pid() const;
 
-  /// Sends a signal; nothing when it has ended.
+  /// Sends a signal; does nothing when the program has ended.
   void Kill(int signal) const;
 
   /// Waits at most `limit` for the end; empty when it still runs. Later calls give the same result.
@@ -72,16 +72,16 @@ class Program {
   std::unique_ptr<State> state_;
 };
 
-/// Starts `path` (no search, no shell) with `arguments` behind argument zero. A program that cannot
+/// Starts `path` (no search, no shell) with `arguments` after argument zero. A program that cannot
 /// be started has ended already, with `startError` in its result.
 Program StartProgram(const std::string& path, const std::vector<std::string>& arguments,
                      const ProgramOptions& options = ProgramOptions());
 
-/// Starts it and waits for its end.
+/// Starts the program and waits for its end.
 ProgramResult RunProgram(const std::string& path, const std::vector<std::string>& arguments,
                          const ProgramOptions& options = ProgramOptions());
 
-/// Takes all capabilities from the program and what it starts, so that permission bits hold for it
+/// Removes all capabilities from the program and its children, so that permission bits apply to it
 /// although it runs as user 0.
 BeforeExec DropCapabilities();
 

@@ -1,4 +1,4 @@
-// The picture all test photos show, and its colours.
+// The picture in all test photos, and its colours.
 #pragma once
 
 #include <array>

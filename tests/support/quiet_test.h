@@ -11,7 +11,8 @@
 
 namespace vela_test {
 
-/// A test in the sandbox that fails when a line in the system log has not been taken by its end.
+/// A test in the sandbox that fails when the system log contains lines that TakeErrorLines has not
+/// returned.
 class QuietTest : public SandboxTest {
  protected:
   void TearDown() override { EXPECT_THAT(ErrorLines(), ::testing::IsEmpty()) << "unexpected log"; }

@@ -32,8 +32,8 @@ void Must(bool done, const std::string& what) {
   }
 }
 
-/// What the cells of a sensor see of the picture: brightness as it is in nature, not as screens
-/// encode it, each cell through the one colour of its filter.
+/// The picture as the cells of a sensor record it: linear brightness, each cell in the one colour
+/// of its filter.
 std::vector<uint16_t> SensorCells(int width, int height) {
   const std::string pixels = QuadrantPixels(width, height);
   std::vector<uint16_t> cells;
@@ -62,7 +62,7 @@ void SetSize(TIFF* tiff, int width, int height) {
   TIFFSetField(tiff, TIFFTAG_PLANARCONFIG, PLANARCONFIG_CONTIG);
 }
 
-/// What a digital negative states of its camera: one whose colours are those of the picture.
+/// Writes the camera tags of a digital negative, for a camera with the colours of the picture.
 void SetCamera(TIFF* tiff, const RawRecipe& recipe) {
   constexpr std::array<uint8_t, 4> kVersion = {1, 4, 0, 0};
   constexpr std::array<float, 3> kNeutral = {1, 1, 1};

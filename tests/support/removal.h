@@ -1,4 +1,4 @@
-// Mounts, and the removal of what tests have left behind with them.
+// Mounts, and the removal of files and mounts that tests have left behind.
 #pragma once
 
 #include <cstdint>

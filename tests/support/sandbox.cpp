@@ -30,7 +30,7 @@ namespace {
 
 constexpr const char* kHost = "/.host";
 
-// Shown as themselves, not as links, so that /proc/<pid>/fd names them as programs expect.
+// Mounted, not linked, so that they have their usual names in /proc/<pid>/fd.
 constexpr const char* kDevices[] = {"null", "zero", "full", "random", "urandom", "tty"};
 
 struct SandboxState {
@@ -85,7 +85,7 @@ void ShowDevices() {
   }
 }
 
-void PlantFarms() {
+void CreateFarms() {
   std::vector<Farm>& farms = State().farms;
   std::set<std::string> devices = {"shm", "log"};
   devices.insert(std::begin(kDevices), std::end(kDevices));
@@ -109,8 +109,8 @@ void PlantFarms() {
 
 void MountPrivatePlaces() {
   std::vector<PrivatePlace>& places = State().places;
-  // The limit of /tmp lets the program's own guard against nearly full volumes pass, which asks for
-  // 1 GiB. Memory is taken for what is written only.
+  // The size of /tmp exceeds the 1 GiB of free space that the program requires. Only written data
+  // uses memory.
   places.emplace_back("/tmp", 01777, "2g");
   places.emplace_back("/run", 0755, "64m");
   places.emplace_back("/var/spool", 0755, "64m");
@@ -118,7 +118,7 @@ void MountPrivatePlaces() {
   places.emplace_back("/dev/shm", 01777, "64m");
 }
 
-/// What belongs into the private places.
+/// Creates the initial content of the private directories.
 void FillPrivatePlaces() {
   MakeDirectory("/usr/vela/bin");
   MakeStubDirectory();
@@ -141,7 +141,7 @@ void MountProcesses() {
 void BuildSandbox(const std::string& writableDirectory) {
   const mode_t mask = umask(0);
   ReplaceRoot();
-  PlantFarms();
+  CreateFarms();
   ShowDevices();
   MountPrivatePlaces();
   FillPrivatePlaces();
@@ -153,12 +153,12 @@ void BuildSandbox(const std::string& writableDirectory) {
   umask(mask);
 }
 
-/// Leaves nothing in the environment that names a place outside.
+/// Removes everything from the environment that refers to directories outside.
 void SetEnvironment() {
   for (const char* name : {"TMPDIR", "TMP", "TEMP"}) {
     unsetenv(name);
   }
-  setenv("HOME", "/nonexistent", 1);  // tools that keep caches there do without
+  setenv("HOME", "/nonexistent", 1);  // tools then run without their caches there
 }
 
 void EndOtherProcesses() {
@@ -195,7 +195,7 @@ void ResetSandbox() {
     EnvironmentFailure("the sandbox has not been entered");
   }
   if (getpid() != state.testProcess) {
-    return;  // the child of a death test works in its parent's places
+    return;  // the child of a death test uses its parent's sandbox
   }
   EndOtherProcesses();
   if (chdir("/") != 0) {

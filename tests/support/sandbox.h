@@ -1,8 +1,8 @@
-// The sandbox every test program runs in: its own mount and process namespaces with private, empty
-// and writable /tmp, /run (= /var/run), /var/spool, /usr/vela, /dev/shm and /etc/velainfo.conf. All
-// the rest of the machine is visible and read-only; /usr/bin shows the machine's tools as symbolic
-// links, so that a test can remove or replace single ones. Where it cannot be made, the program
-// ends with status 1 and one line that says why.
+// The sandbox in which every test program runs: its own mount and process namespaces with private,
+// empty and writable /tmp, /run (= /var/run), /var/spool, /usr/vela, /dev/shm and
+// /etc/velainfo.conf. The rest of the machine is visible and read-only; /usr/bin shows the
+// machine's tools as symbolic links, so that a test can remove or replace single ones. If it cannot
+// be created, the program ends with status 1 and one line with the reason.
 #pragma once
 
 #include <gtest/gtest.h>
@@ -18,18 +18,18 @@ namespace vela_test {
 /// from inside, at kWritablePlace.
 void EnterSandbox(const std::string& writableDirectory = std::string());
 
-/// Where the sandbox shows the writable directory given to EnterSandbox.
+/// The path of the writable directory given to EnterSandbox inside the sandbox.
 constexpr const char* kWritablePlace = "/.writable";
 
-/// Brings all private places back to their first state: ends every other process of the sandbox,
+/// Restores all private directories to their first state: ends every other process of the sandbox,
 /// unmounts what tests have mounted, removes what they have written, restores /usr/bin and /etc,
 /// and clears the system log's record. The working directory becomes /. Does nothing in the child
-/// of a death test, which works in its parent's places (use gtest's "fast" style: a restarted
-/// program would not be in the sandbox).
+/// of a death test, which uses its parent's sandbox (use gtest's "fast" style: a restarted program
+/// would not be in the sandbox).
 void ResetSandbox();
 
-/// The path under which the sandbox shows the machine's own `path` (absolute): also what lies in a
-/// private place of the sandbox, such as a build directory under /tmp.
+/// The path of the machine's own `path` (absolute) inside the sandbox, also when a private
+/// directory hides it, such as a build directory under /tmp.
 std::string HostPath(const std::string& path);
 
 /// Fixture: every test starts with the private places in their first state and an empty log record.

@@ -34,7 +34,7 @@ sock_filter Load(size_t offset) {
   return Instruction(BPF_LD | BPF_W | BPF_ABS, static_cast<uint32_t>(offset));
 }
 
-/// Goes on with the next instruction when equal, else skips `otherwise` of them.
+/// Continues with the next instruction when equal, else skips `otherwise` of them.
 sock_filter WhenEqual(uint32_t value, int otherwise) {
   return Instruction(BPF_JMP | BPF_JEQ | BPF_K, value, 0, otherwise);
 }

@@ -40,7 +40,7 @@ std::string StubToolDirectory(const std::string& tool) {
   return std::string(kStubDirectory) + "/" + tool;
 }
 
-uint64_t CountUp(const std::string& file) {
+uint64_t IncrementCounter(const std::string& file) {
   const Descriptor counter(open(file.c_str(), O_RDWR | O_CLOEXEC));
   if (!counter.IsOpen()) {
     return 0;

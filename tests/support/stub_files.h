@@ -1,5 +1,5 @@
-// The files through which a test and its stub tools know of each other. They are made by the test
-// and only opened by the stubs, so that a stub works under most faults a test provokes.
+// The files through which a test and its stub tools communicate. The test creates them and the
+// stubs only open them, so that a stub works under most faults that a test causes.
 #pragma once
 
 #include <cstdint>
@@ -22,6 +22,6 @@ std::string StubToolDirectory(const std::string& tool);
 
 /// Adds 1 to the number in the file under an exclusive lock and returns the sum; 0 when the file
 /// cannot be read and written.
-uint64_t CountUp(const std::string& file);
+uint64_t IncrementCounter(const std::string& file);
 
 }  // namespace vela_test

@@ -1,4 +1,4 @@
-// What a stub tool does when it is called: steps in order, written by the test beforehand.
+// The plan of a stub tool's call: steps that the test defines beforehand.
 #pragma once
 
 #include <sys/types.h>
@@ -12,13 +12,13 @@ namespace vela_test {
 /// One step: a word and its operands.
 using StubStep = std::vector<std::string>;
 
-/// The steps of one call, built one behind the other:
+/// The steps of one call, in order:
 ///   StubPlan().WriteOutputs(1).AppendToSource(100000).WriteOutputs().Exit(3)
 /// A plan ends with exit status 0 (or that of its last Run or PassThrough) unless it says
 /// otherwise; an empty plan does nothing at all. The outputs are those of the converter's command
 /// line: the argument after each "-write", then the last argument. Where a step takes a path,
-/// kSource stands for the photo (the input argument without "[0]") and kOutputDirectory for the
-/// directory of the first output.
+/// kSource is the photo (the input argument without "[0]") and kOutputDirectory the directory of
+/// the first output.
 class StubPlan {
  public:
   static constexpr const char* kSource = "{source}";
@@ -28,7 +28,7 @@ class StubPlan {
   /// A converter that works: all outputs, status 0.
   static StubPlan Normal() { return StubPlan().WriteOutputs(); }
 
-  /// Writes the next `count` outputs, each a small whole grey JPEG of its "-thumbnail" box.
+  /// Writes the next `count` outputs, each a small complete grey JPEG of its "-thumbnail" box.
   StubPlan& WriteOutputs(size_t count = kAll) { return Add("write-outputs", count); }
   /// Writes the next `count` outputs with exactly `bytes` bytes each (a JPEG's beginning).
   StubPlan& WriteOutputsOfSize(size_t count, size_t bytes) {
@@ -50,7 +50,7 @@ class StubPlan {
   }
 
   StubPlan& Sleep(int milliseconds) { return Add("sleep", milliseconds); }
-  /// Makes an empty file, by which the test sees that this step has been reached.
+  /// Makes an empty file, from which the test knows that this step has been reached.
   StubPlan& CreateFile(const std::string& path) { return WriteFile(path, ""); }
   /// Waits until the test makes the file; gives up after 60 s with status 125.
   StubPlan& WaitForFile(const std::string& path) { return Add("wait-for-file", path); }
@@ -87,13 +87,13 @@ class StubPlan {
   StubPlan& DieBySignal(int signal) { return Add("die-by-signal", signal); }
   /// Closes standard output and standard error.
   StubPlan& CloseOutput() { return Add("close-output"); }
-  /// Runs a program with these arguments behind argument zero and waits for it.
+  /// Runs a program with these arguments after argument zero and waits for it.
   StubPlan& Run(const std::string& program, const std::vector<std::string>& arguments) {
     Add("run", program);
     steps_.back().insert(steps_.back().end(), arguments.begin(), arguments.end());
     return *this;
   }
-  /// Runs a program with the stub's own arguments: the stub records, the real tool works.
+  /// Runs a program with the stub's own arguments: the stub records, the real tool does the work.
   StubPlan& PassThrough(const std::string& program) { return Add("pass-through", program); }
   StubPlan& Exit(int status) { return Add("exit", status); }
 

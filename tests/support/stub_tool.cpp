@@ -104,7 +104,7 @@ StubCall CallFrom(Record record) {
   return call;
 }
 
-/// Notes an end in the call that it belongs to.
+/// Adds an end to the call that it belongs to.
 void AddEnd(Record* end, std::vector<StubCall>* calls) {
   const uint64_t started = Unsigned((*end)["start"]);
   for (StubCall& call : *calls) {
@@ -140,7 +140,7 @@ void StubTool::PlanCall(int number, const StubPlan& plan) const {
 }
 
 void StubTool::PlanWhen(const std::string& argument, const StubPlan& plan) {
-  // Numbered from the latest: the stub takes the highest that fits.
+  // Numbered from the latest: the stub uses the highest that matches.
   WriteFile(StubToolDirectory(tool_) + "/condition." + std::to_string(++conditions_),
             EncodeFields({argument, EncodePlan(plan)}));
 }
@@ -172,7 +172,7 @@ std::vector<StubCall> AllStubCalls() {
 }
 
 uint64_t NextSequence() {
-  return CountUp(kStubSequenceFile);
+  return IncrementCounter(kStubSequenceFile);
 }
 
 bool IsOwnConverterReal() {

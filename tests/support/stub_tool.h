@@ -38,11 +38,11 @@ struct StubCall {
   pid_t pid = 0;
   pid_t parentPid = 0;
   uint64_t startSequence = 0;    ///< place among all events, see NextSequence
-  uint64_t endSequence = 0;      ///< 0 when it did not come to its end
+  uint64_t endSequence = 0;      ///< 0 when it did not end normally
   int64_t startNanoseconds = 0;  ///< on the steady clock
-  int64_t endNanoseconds = 0;    ///< on the steady clock, 0 when it did not come to its end
+  int64_t endNanoseconds = 0;    ///< on the steady clock, 0 when it did not end normally
 
-  /// The arguments behind argument zero.
+  /// The arguments after argument zero.
   std::vector<std::string> Parameters() const;
 };
 
@@ -50,15 +50,16 @@ struct StubCall {
 /// reset; the object only writes and reads them.
 class StubTool {
  public:
-  /// Puts the stub at `path`, in place of what is there, with the plan StubPlan::Normal(). The
-  /// base name of `path` names the tool; one stub a name.
+  /// Installs the stub at `path`, replacing any file there, with the plan StubPlan::Normal(). The
+  /// base name of `path` names the tool; one stub per name.
   explicit StubTool(const std::string& path);
 
-  /// What every call does that no other plan is for.
+  /// Sets the plan of calls that have no other plan.
   void Plan(const StubPlan& plan) const;
-  /// What the call with this number (from 1) does; before PlanWhen.
+  /// Sets the plan of the call with this number (from 1); takes precedence over PlanWhen.
   void PlanCall(int number, const StubPlan& plan) const;
-  /// What calls do that have `argument` among their arguments; the latest that fits holds.
+  /// Sets the plan of calls that have `argument` among their arguments; the latest that matches is
+  /// used.
   void PlanWhen(const std::string& argument, const StubPlan& plan);
 
   /// This stub's calls, in the order of their start.
@@ -82,13 +83,13 @@ bool IsOwnConverterReal();
 /// The real converter's program.
 std::string RealConverterPath();
 
-/// The real tools at the places where the program looks for them.
+/// Install the real tools where the program looks for them.
 void InstallRealConverter();
 void InstallRealExiftool();
-/// Both; dcraw and compare are at their places in a fresh sandbox.
+/// Installs both; dcraw and compare exist in a fresh sandbox.
 void InstallRealTools();
 
-/// Takes the tool away: starting it fails.
+/// Removes the tool: starting it fails.
 void RemoveTool(const std::string& path);
 
 }  // namespace vela_test

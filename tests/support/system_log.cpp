@@ -24,7 +24,7 @@ namespace {
 // it restored without breaking connections.
 constexpr const char* kSocket = "/.log";
 constexpr const char* kLogPath = "/dev/log";
-// No message of the system log begins like this.
+// No log message begins like this.
 constexpr const char* kMarkerBeginning = "\001marker ";
 constexpr size_t kLargestMessage = 1 << 20;
 constexpr size_t kTimestampLength = 16;  // "Mmm dd hh:mm:ss "
@@ -159,8 +159,8 @@ class Recorder {
     messages_.push_back(ParseMessage(text, sender));
   }
 
-  /// Datagrams of one socket come in the order of their sending: once the reader has seen a marker
-  /// sent now, it has seen everything logged before.
+  /// Datagrams of one socket arrive in the order in which they were sent: once the reader has seen
+  /// a marker sent now, it has seen everything logged before.
   void Synchronise() {
     std::unique_lock<std::mutex> lock(mutex_);
     const unsigned long long marker = ++sentMarker_;

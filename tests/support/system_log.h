@@ -1,4 +1,5 @@
-// Recorder of the sandbox's system log: everything this process and its children send to /dev/log.
+// Recorder of the sandbox's system log: everything that this process and its children send to
+// /dev/log.
 #pragma once
 
 #include <sys/types.h>
@@ -21,8 +22,8 @@ struct LogMessage {
 /// logged by any process before the call.
 std::vector<LogMessage> LogMessages();
 
-/// The texts of all messages, each of which must be at LOG_ERR: one at another priority is given as
-/// "<priority> text", so that a comparison shows it.
+/// The texts of all messages, each of which must be at LOG_ERR: one at another priority is returned
+/// as "<priority> text", so that a comparison shows it.
 std::vector<std::string> ErrorLines();
 
 /// Discards all messages so far. ResetSandbox does it for every SandboxTest.

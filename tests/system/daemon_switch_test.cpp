@@ -1,4 +1,4 @@
-// The daemon's switch, which the runner obeys.
+// The daemon's conversion switch, which the runner obeys.
 #include <gtest/gtest.h>
 
 #include <chrono>
@@ -31,7 +31,7 @@ class DaemonSwitchTest : public SandboxTest {
   }
 };
 
-TEST_F(DaemonSwitchTest, HoldsTheRunnerBackUntilItIsTurned) {
+TEST_F(DaemonSwitchTest, StopsTheRunnerUntilItIsChanged) {
   const PhotoLibrary library(kPhotos);
   Machine machine;
   SetSwitch("yes");

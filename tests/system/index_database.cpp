@@ -24,7 +24,7 @@ std::string FirstColumn(sqlite3_stmt* statement) {
 
 }  // namespace
 
-std::vector<std::string> AskIndexDatabase(const std::string& query) {
+std::vector<std::string> QueryIndexDatabase(const std::string& query) {
   sqlite3* opened = nullptr;
   const int openResult = sqlite3_open_v2(kFile, &opened, SQLITE_OPEN_READWRITE, nullptr);
   const std::unique_ptr<sqlite3, Closer> database(opened);

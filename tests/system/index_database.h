@@ -1,4 +1,4 @@
-// The daemon's database, read from outside.
+// The daemon's database, read directly.
 #pragma once
 
 #include <string>
@@ -6,8 +6,7 @@
 
 namespace vela_test {
 
-/// The first column of what the query gives, as bytes; a failure of the test when it cannot be
-/// asked.
-std::vector<std::string> AskIndexDatabase(const std::string& query);
+/// The first column of the query's result, as bytes; fails the test when the query fails.
+std::vector<std::string> QueryIndexDatabase(const std::string& query);
 
 }  // namespace vela_test

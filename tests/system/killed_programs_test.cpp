@@ -1,4 +1,4 @@
-// The whole system from start to end, each of its programs killed again and again.
+// The whole system, with each of its programs killed repeatedly.
 #include <gmock/gmock.h>
 
 #include <algorithm>
@@ -29,8 +29,8 @@ using ::testing::ElementsAre;
 using ::testing::IsEmpty;
 
 constexpr int kPhotos = 300;
-constexpr int kLonePhotos = 30;  // of these, in a directory that is asked for once
-constexpr int kLatePhotos = 10;  // of these, added when nothing is killed any more
+constexpr int kLonePhotos = 30;  // of these, in a directory that is requested once
+constexpr int kLatePhotos = 10;  // of these, added after the last kill
 constexpr int kKills = 100;
 constexpr unsigned kSeed = 20261121;
 constexpr const char* kPhotoQueueFile = "/var/spool/thumb_create.queue";
@@ -38,7 +38,7 @@ constexpr const char* kVideoQueueFile = "/var/spool/flv_create.queue";
 
 enum class Victim { kDaemon, kRunner, kVelathumb };
 
-/// The same in every run, unless asked otherwise: --gtest_random_seed=N.
+/// The same in every run, unless set by --gtest_random_seed=N.
 unsigned Seed() {
   return kSeed + static_cast<unsigned>(GTEST_FLAG_GET(random_seed));
 }
@@ -65,7 +65,8 @@ int Photo(const char* key) {
 }
 
 std::set<std::string> PostedPhotos() {
-  const std::vector<std::string> rows = AskIndexDatabase("SELECT path FROM posted WHERE kind = 1");
+  const std::vector<std::string> rows =
+      QueryIndexDatabase("SELECT path FROM posted WHERE kind = 1");
   return {rows.begin(), rows.end()};
 }
 
@@ -117,7 +118,7 @@ void KilledProgramsTest::KillVelathumb() {
 void KilledProgramsTest::Kill(Victim victim) {
   switch (victim) {
     case Victim::kDaemon:
-      machine_->KillDaemonAndStartAnew();
+      machine_->KillAndRestartDaemon();
       break;
     case Victim::kRunner:
       machine_->KillRunner();
@@ -171,7 +172,7 @@ void KilledProgramsTest::ExpectPosted() const {
   }
 }
 
-/// The thumbnails that are not there, and in `photos` how many photos they belong to.
+/// The number of missing thumbnails, and in `photos` the number of their photos.
 int KilledProgramsTest::MissingThumbs(int* photos) const {
   int missing = 0;
   *photos = 0;
@@ -189,14 +190,14 @@ void KilledProgramsTest::ExpectAllDone() const {
     const bool isDamaged = photo == library_->Damaged();
     EXPECT_EQ(state.thumbs, isDamaged ? 0 : kThumbsOfAPhoto) << photo;
     EXPECT_EQ(state.markers, isDamaged ? kThumbsOfAPhoto : 0) << photo;
-    // What a killed program was writing stays behind; an undisturbed one leaves nothing.
+    // A killed program leaves the file it was writing; an undisturbed one leaves nothing.
     if (photo.find("/late/") != std::string::npos) {
       EXPECT_THAT(state.others, IsEmpty()) << photo;
     }
   }
 }
 
-TEST_F(KilledProgramsTest, InTheEndEverythingIsDoneAndNothingIsLost) {
+TEST_F(KilledProgramsTest, EverythingIsDoneAndNothingIsLost) {
   std::cout << "seed " << Seed() << std::endl;
   const auto began = std::chrono::steady_clock::now();
   const auto log = [&](const char* what) {
@@ -223,9 +224,9 @@ TEST_F(KilledProgramsTest, InTheEndEverythingIsDoneAndNothingIsLost) {
   EXPECT_FALSE(Machine::HasQueue());
   ExpectThumbsOrMarkers();
   ExpectNothingMissing();
-  // However wrong the counters have become by the kills: with each take the total is what is done
-  // plus what is outstanding on disk, and after the last take each outstanding photo, even one that
-  // got phases 0 and 1 before and added nothing then, has added 1.
+  // However wrong the kills have made the counters: with each take of the queue the total becomes
+  // the completed work plus that outstanding on disk, and after the last take each outstanding
+  // photo, even one that got phases 0 and 1 before and added nothing then, has added 1.
   EXPECT_EQ(Photo("completed"), Photo("total"));
   // A velathumb killed while it put the thumbnails of a phase in place leaves some of them; the
   // next one counts the whole phase. At most three in a phase, and two velathumbs at once.
@@ -245,7 +246,7 @@ TEST_F(KilledProgramsTest, InTheEndEverythingIsDoneAndNothingIsLost) {
   log("undisturbed run");
   EXPECT_FALSE(Machine::HasQueue());
   ExpectAllDone();
-  // The damaged photo is alone in its directory, so that this does not come back.
+  // The damaged photo is alone in its directory, so that this does not occur again.
   EXPECT_EQ(Photo("completed"), incomplete);
   EXPECT_EQ(Photo("total"), incomplete);
   EXPECT_EQ(Photo("completed_thumb"), missing);
@@ -263,7 +264,7 @@ TEST_F(KilledProgramsTest, InTheEndEverythingIsDoneAndNothingIsLost) {
   ASSERT_TRUE(daemon);
   EXPECT_EQ(daemon->exitCode, 0) << daemon->err;
   ExpectPosted();
-  EXPECT_THAT(AskIndexDatabase("PRAGMA integrity_check"), ElementsAre("ok"));
+  EXPECT_THAT(QueryIndexDatabase("PRAGMA integrity_check"), ElementsAre("ok"));
   log("checked");
   std::cout << topUps_ << " times more work, " << incomplete << " photos to do in the end, "
             << missing << " thumbnails" << std::endl;

@@ -41,7 +41,7 @@ void ExpectKilled(std::optional<Program>* program, const char* name) {
   (*program)->Kill(SIGKILL);
   const auto result = (*program)->Wait(seconds(10));
   ASSERT_TRUE(result) << name;
-  // A program that had ended by itself before printed the reason.
+  // A program that had already ended by itself has printed the reason.
   EXPECT_EQ(result->signal, SIGKILL) << name << ": " << result->exitCode << '\n' << result->err;
   program->reset();
 }
@@ -71,7 +71,7 @@ void Machine::StartDaemon() {
   }
 }
 
-void Machine::KillDaemonAndStartAnew() {
+void Machine::KillAndRestartDaemon() {
   ExpectKilled(&daemon_, "the daemon");
   daemon_ = StartProgram(HostPath(VELAINDEXPLUGIND_FILE), {});
 }

@@ -13,30 +13,30 @@ namespace vela_test {
 
 constexpr const char* kProfileFile = "/tmp/profiles.conf";
 
-/// The index daemon and the queue runner, started and killed as a test wants, with the velathumbs
-/// that the runner starts. All six thumbnail classes are made, in three phases.
+/// The index daemon and the queue runner, which tests start and kill, and the velathumb processes
+/// of the runner. All six thumbnail classes are made, in three phases.
 class Machine {
  public:
   Machine();
 
   /// Starts the daemon and waits until it answers.
   void StartDaemon();
-  /// Has it read its settings anew.
+  /// Makes it reload its settings.
   void ReloadDaemon();
-  /// Starts it anew after kill -9, without waiting for it.
-  void KillDaemonAndStartAnew();
-  /// Ends it with SIGTERM; its result.
+  /// Kills it with SIGKILL and restarts it, without waiting for it.
+  void KillAndRestartDaemon();
+  /// Ends it with SIGTERM; returns its result.
   std::optional<ProgramResult> StopDaemon();
 
-  /// Starts a runner that stays, two jobs at a time.
+  /// Starts a runner that keeps running, with two jobs at a time.
   void StartFollowingRunner();
   void KillRunner();
 
-  /// Kills one velathumb with kill -9; whether there was one.
+  /// Kills one velathumb with SIGKILL; returns whether there was one.
   static bool KillVelathumb();
   static std::vector<pid_t> Velathumbs();
 
-  /// Runs a runner until nothing waits, one job at a time.
+  /// Runs a runner until the queue is empty, one job at a time.
   static ProgramResult RunRunner(const std::vector<std::string>& more = {});
 
   /// Whether anything is left in the files of the photo queue.

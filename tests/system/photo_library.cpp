@@ -27,8 +27,8 @@ std::string Pattern(const std::string& kind) {
   return std::string(kPatterns) + "/pattern." + kind;
 }
 
-/// One photo of each kind; all others are copies.
-void MakePatterns() {
+/// Makes one photo of each kind; all others are copies.
+void MakeTemplates() {
   MakeDirectories(kPatterns);
   for (const char* kind : kKinds) {
     MakeImage(Pattern(kind), 96, 72);
@@ -45,7 +45,7 @@ std::string ParentOf(const std::string& path) {
 }  // namespace
 
 PhotoLibrary::PhotoLibrary(int count) {
-  MakePatterns();
+  MakeTemplates();
   const std::string top = kTop;
   MakePhotos({top + "/2019", top + "/2020", top + "/summer 50%", top + "/tree", top + "/tree/a",
               top + "/tree/a/deep", top + "/tree/\xc3\xa4 \"b\""},

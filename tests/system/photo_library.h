@@ -9,15 +9,15 @@ namespace vela_test {
 
 /// The state of a photo's six thumbnails.
 struct PhotoState {
-  int thumbs = 0;                   ///< whole JPEGs
-  int markers = 0;                  ///< failure markers in place of one
-  std::vector<std::string> others;  ///< whatever else is in its metadata directory
+  int thumbs = 0;                   ///< complete JPEGs
+  int markers = 0;                  ///< failure markers in place of a thumbnail
+  std::vector<std::string> others;  ///< all other files in its metadata directory
 };
 
 constexpr int kThumbsOfAPhoto = 6;
 
-/// Small photos of several kinds in directories and a tree, a damaged one in a directory of its
-/// own, and two videos.
+/// Small photos of several kinds in directories and a tree, a damaged one in a separate directory,
+/// and two videos.
 class PhotoLibrary {
  public:
   /// Makes `count` photos, one of them raw and one damaged, and the videos.
@@ -32,7 +32,7 @@ class PhotoLibrary {
   /// The queue entries for everything but the lone directory.
   std::vector<std::string> Entries() const { return entries_; }
 
-  /// The directory that is not among these.
+  /// The directory that is not among the entries.
   const std::string& LoneEntry() const { return loneEntry_; }
   bool IsLone(const std::string& photo) const;
 
@@ -40,8 +40,8 @@ class PhotoLibrary {
   const std::string& Damaged() const { return damaged_; }
   const std::vector<std::string>& Videos() const { return videos_; }
 
-  /// Dates every `step`-th photo now, later than its thumbnails; the damaged one and those of
-  /// the lone directory are left out.
+  /// Sets the time of every `step`-th photo to now, later than its thumbnails; skips the damaged
+  /// one and those of the lone directory.
   void Touch(int step);
 
  private:

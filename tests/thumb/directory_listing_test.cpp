@@ -28,7 +28,7 @@ TEST_F(ListPhotos, SortsByBytes) {
                                   "a.jpg", "b.jpg", "z.jpg", "\xc3\xa9.jpg", "\xff.jpg"));
 }
 
-TEST_F(ListPhotos, GivesBareNamesAndClosesTheDirectory) {
+TEST_F(ListPhotos, ReturnsBareNamesAndClosesTheDirectory) {
   Touch({"a.jpg"});
   EXPECT_THAT(ListDirectoryPhotos("/tmp/d/"), ElementsAre("a.jpg"));
   EXPECT_THAT(DescriptorsOf("/tmp/d"), IsEmpty());
@@ -40,7 +40,7 @@ TEST_F(ListPhotos, TakesPhotosOnly) {
   EXPECT_THAT(ErrorLines(), IsEmpty());
 }
 
-TEST_F(ListPhotos, LeavesOutTheFilesThatOtherSystemsPutBesideEachFile) {
+TEST_F(ListPhotos, SkipsAttributeFilesOfOtherSystems) {
   Touch({"._a.jpg", "._.jpg", "._a.nef", "a._b.jpg", "_.a.jpg"});
   EXPECT_THAT(List(), ElementsAre("_.a.jpg", "a._b.jpg"));
 }
@@ -50,7 +50,7 @@ TEST_F(ListPhotos, TakesOtherNamesWithALeadingDot) {
   EXPECT_THAT(List(), ElementsAre(".-_.jpg", "...jpg", "..a.jpg", ".a.jpg"));
 }
 
-TEST_F(ListPhotos, SkipsWhatIsNoRegularFile) {
+TEST_F(ListPhotos, SkipsOtherThanRegularFiles) {
   MakeDirectories("/tmp/d/a.jpg");
   ASSERT_EQ(mkfifo("/tmp/d/b.jpg", 0666), 0);
   ASSERT_EQ(symlink("a.jpg", "/tmp/d/c.jpg"), 0);

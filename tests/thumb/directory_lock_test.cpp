@@ -19,7 +19,7 @@ class LockedDirectory : public SandboxTest {
     MakeDirectories(kRoot);
   }
 
-  /// Whether another process can have a lock of this kind on the directory now.
+  /// Whether another process could now lock the directory in this way.
   static bool CanBeLockedElsewhere(int operation = LOCK_EX) {
     const int result = ForkCall([operation] {
       const int descriptor = open(kRoot, O_RDONLY | O_CLOEXEC);

@@ -8,13 +8,13 @@ using namespace vela;
 namespace vela_test {
 namespace {
 
-/// What the platform's walk expects.
+/// The action codes of the C library's walk.
 constexpr int kContinue = 0;
 constexpr int kSkipSubtree = 2;
 
 constexpr const char* kProfileFile = "/tmp/profiles.conf";
 
-/// A directory that has been processed shows it by a line about this link.
+/// Makes a link about which a line is logged when the directory is processed.
 void PutTrace(const std::string& dir) {
   MakeDirectories(dir);
   ASSERT_EQ(symlink("nowhere", (dir + "/trace.jpg").c_str()), 0);
@@ -92,7 +92,7 @@ TEST_F(DirectoryRun, ReportsAProfileFileThatCannotBeLoaded) {
   EXPECT_THAT(ErrorLines(), IsEmpty());
 }
 
-TEST_F(DirectoryRun, SilentlySkipsWhatIsMissing) {
+TEST_F(DirectoryRun, SilentlySkipsMissingFiles) {
   EXPECT_EQ(Run("/tmp/missing"), "");
   EXPECT_EQ(Run(""), "");
   PutTrace(kDir);

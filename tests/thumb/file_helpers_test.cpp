@@ -1,4 +1,4 @@
-// Making directories and removing files by pattern.
+// Creating directories and removing files by pattern.
 #include "storage/file_helpers.h"
 
 #include "posix/glob_matches.h"
@@ -7,7 +7,7 @@
 namespace vela_test {
 namespace {
 
-/// The line of a directory that could not be made.
+/// The log line about a directory that could not be created.
 std::string MkdirLine(const std::string& path, int error) {
   return "velathumb:447 velathumb: checkCreateDir(447) - mkdir(" + path +
          ", 0777 ), errno: " + std::to_string(error) + "\n";
@@ -18,14 +18,14 @@ class CheckCreateDir : public SandboxTest {
   ZeroMask mask_;
 };
 
-TEST_F(CheckCreateDir, MakesAMissingDirectoryWritableByAll) {
+TEST_F(CheckCreateDir, CreatesAMissingDirectoryWritableByAll) {
   EXPECT_EQ(checkCreateDir("/tmp/made"), 1);
   EXPECT_TRUE(IsDirectory("/tmp/made"));
   EXPECT_EQ(ModeOf("/tmp/made"), 0777);
   EXPECT_THAT(ErrorLines(), IsEmpty());
 }
 
-TEST_F(CheckCreateDir, LeavesAnExistingDirectoryAsItIs) {
+TEST_F(CheckCreateDir, DoesNotChangeAnExistingDirectory) {
   WriteFile("/tmp/there/file", "x");
   ASSERT_EQ(chmod("/tmp/there", 0750), 0);
   EXPECT_EQ(checkCreateDir("/tmp/there"), 1);
@@ -34,17 +34,17 @@ TEST_F(CheckCreateDir, LeavesAnExistingDirectoryAsItIs) {
   EXPECT_THAT(ErrorLines(), IsEmpty());
 }
 
-TEST_F(CheckCreateDir, DoesNotEvenTryToMakeWhatIsThere) {
+TEST_F(CheckCreateDir, DoesNotTryToCreateAnExistingDirectory) {
   MakeDirectories("/tmp/there");
   const BeforeExec refuseMkdir = SeccompFail(MkdirCalls(), ENOSPC);
   EXPECT_EQ(ForkCall([&] { return refuseMkdir() == 0 ? checkCreateDir("/tmp/there") : 99; }), 1);
   EXPECT_THAT(ErrorLines(), IsEmpty());
-  // The refusal does hold: what is missing shows it.
+  // The refusal is effective: creating a missing directory fails.
   EXPECT_EQ(ForkCall([&] { return refuseMkdir() == 0 ? checkCreateDir("/tmp/missing") : 99; }), 0);
   EXPECT_THAT(ErrorLines(), ElementsAre(MkdirLine("/tmp/missing", ENOSPC)));
 }
 
-TEST_F(CheckCreateDir, AnythingOfThatNameCountsAsThere) {
+TEST_F(CheckCreateDir, AnyFileOfThatNameCountsAsExisting) {
   MakeDirectories("/tmp/there");
   WriteFile("/tmp/file", "content");
   ASSERT_EQ(symlink("there", "/tmp/link"), 0);
@@ -99,7 +99,7 @@ class RemoveByPattern : public SandboxTest {
   }
 };
 
-TEST_F(RemoveByPattern, RemovesWhatMatchesAndNothingElse) {
+TEST_F(RemoveByPattern, RemovesOnlyMatches) {
   Touch({"a.fail", "b.fail", "c.jpg", "d.fail.jpg", ".hidden.fail"});
   EXPECT_EQ(RemoveFilesByPattern("/tmp/d/*.fail"), 0);
   EXPECT_THAT(ListDirectory("/tmp/d"), ElementsAre(".hidden.fail", "c.jpg", "d.fail.jpg"));
@@ -141,7 +141,7 @@ TEST_F(RemoveByPattern, FindsNoMatchInAnUnreadableDirectory) {
   EXPECT_TRUE(Exists("/tmp/d/a.fail"));
 }
 
-TEST_F(RemoveByPattern, RemovesLinksNotWhatTheyLeadTo) {
+TEST_F(RemoveByPattern, RemovesLinksNotTheirTargets) {
   Touch({"kept.jpg"});
   ASSERT_EQ(symlink("kept.jpg", "/tmp/d/a.fail"), 0);
   ASSERT_EQ(symlink("nowhere", "/tmp/d/b.fail"), 0);

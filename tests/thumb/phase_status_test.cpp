@@ -1,4 +1,4 @@
-// Whether the thumbnails of a phase are there and up to date, and the marking of failed phases.
+// Whether the thumbnails of a phase exist and are up to date, and the marking of failed phases.
 #include "thumb/phase_status.h"
 
 #include "thumb/thumb_test.h"
@@ -35,7 +35,7 @@ struct DatedThumbs : NamedCase {
 class DatedPhase : public PhaseOutdated, public ::testing::WithParamInterface<DatedThumbs> {};
 
 TEST_P(DatedPhase, IsOutdatedByAnyThumbnailOfAnEarlierSecond) {
-  for (const size_t bytes : {10U, 0U}) {  // an empty thumbnail counts by its date only
+  for (const size_t bytes : {10U, 0U}) {  // only the date of an empty thumbnail matters
     for (const DatedThumbs::Thumb& thumb : GetParam().thumbs) {
       PutFile(Thumb(thumb.sizeClass), bytes, kNow + thumb.seconds, thumb.nanoseconds);
     }

@@ -1,4 +1,4 @@
-// Pid files and the end by SIGTERM.
+// Pid files and termination by SIGTERM.
 #include "thumb/process_control.h"
 
 #include <sys/syscall.h>
@@ -64,7 +64,7 @@ class StalePidFiles : public SandboxTest {
     return path;
   }
 
-  /// The id of a process that is gone.
+  /// The id of a process that has ended.
   static pid_t GonePid() {
     const pid_t child = fork();
     if (child == 0) {
@@ -140,8 +140,8 @@ TEST_F(StalePidFiles, AreAllFound) {
 }
 
 TEST_F(StalePidFiles, RefusedProbeCountsAsGone) {
-  // A probe of process 0, as for names without a number, would reach the caller's own group and
-  // find it alive: none is made.
+  // A probe of process 0, as for names without a number, would find the caller's own group alive,
+  // so there must be none.
   const std::string own = Put(std::to_string(getpid()));
   const std::string word = Put("word");
   const std::string zero = Put("0");

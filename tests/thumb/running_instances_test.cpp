@@ -16,7 +16,7 @@ void MakePidFile(const std::string& number) {
   WriteFile("/var/run/velathumb." + number + ".pid", "");
 }
 
-/// A process that waits, started as a program of this name.
+/// A waiting process, started as a program of this name.
 Program StartAs(const std::string& name) {
   const std::string path = "/tmp/programs/" + name;
   if (!Exists(path)) {
@@ -36,7 +36,7 @@ class Instances : public SandboxTest {
   }
 };
 
-TEST_F(Instances, AreNoneWithoutPidFiles) {
+TEST_F(Instances, DoNotExistWithoutPidFiles) {
   const Program velathumb = StartAs("velathumb");
   EXPECT_THAT(RunningInstances(), IsEmpty());
 }
@@ -60,7 +60,7 @@ TEST_F(Instances, DoNotEndWithTheirPidFilesButWithTheirProcesses) {
   EXPECT_TRUE(Exists("/var/run/velathumb." + std::to_string(velathumb.Pid()) + ".pid"));
 }
 
-TEST_F(Instances, AreNotOtherProgramsWithTheNumber) {
+TEST_F(Instances, AreNotOtherProgramsWithThatProcessId) {
   for (const char* name : {"sleep", "velathumb-queue", "velathum", "xvelathumb"}) {
     const Program other = StartAs(name);
     MakePidFile(std::to_string(other.Pid()));
@@ -68,7 +68,7 @@ TEST_F(Instances, AreNotOtherProgramsWithTheNumber) {
   }
 }
 
-TEST_F(Instances, AreNotNamesWithoutAProcess) {
+TEST_F(Instances, DoNotExistWithoutAProcess) {
   for (const char* number : {"0", "-1", "x", "", "4000000", "99999999999999999999"}) {
     MakePidFile(number);
   }
@@ -76,7 +76,7 @@ TEST_F(Instances, AreNotNamesWithoutAProcess) {
   EXPECT_THAT(RunningInstances(), IsEmpty());
 }
 
-/// For as long as the object lives, /proc shows only processes that may be inspected.
+/// While the object exists, /proc shows only processes that may be inspected.
 class HiddenProcesses {
  public:
   HiddenProcesses() {

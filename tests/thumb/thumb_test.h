@@ -1,4 +1,4 @@
-// What the tests of this folder share: fixtures, and helpers for this process and its children.
+// Shared by the tests of this folder: fixtures, and helpers for this process and its children.
 #pragma once
 
 #include <fcntl.h>
@@ -54,7 +54,7 @@ inline int ForkCall(const std::function<int()>& work) {
   return WEXITSTATUS(status);
 }
 
-/// The path (or "socket:[...]" and the like) that a descriptor leads to.
+/// The path (or "socket:[...]" and the like) that a descriptor refers to.
 inline std::string TargetOf(int descriptor) {
   char target[PATH_MAX] = "";
   const std::string link = "/proc/self/fd/" + std::to_string(descriptor);
@@ -62,7 +62,7 @@ inline std::string TargetOf(int descriptor) {
   return length < 0 ? std::string() : std::string(target, static_cast<size_t>(length));
 }
 
-/// The descriptors that lead to `path`.
+/// The descriptors that refer to `path`.
 inline std::vector<int> DescriptorsOf(const std::string& path) {
   std::vector<int> found;
   for (const std::string& name : ListDirectory("/proc/self/fd")) {
@@ -74,7 +74,7 @@ inline std::vector<int> DescriptorsOf(const std::string& path) {
   return found;
 }
 
-/// The file-creation mask 0, which the program runs with, for as long as the object lives.
+/// Sets the umask to 0, as in the program, while the object exists.
 class ZeroMask {
  public:
   ZeroMask() : before_(umask(0)) {}

@@ -266,7 +266,7 @@ std::vector<size_t> FindOutputs(const std::vector<std::string>& arguments) {
   return indices;
 }
 
-/// The same directory as ImageMagick chooses.
+/// The same directory that ImageMagick chooses.
 std::string FindScratchDirectory(const std::vector<std::string>& arguments) {
   for (size_t i = 1; i < arguments.size(); ++i) {
     if (arguments[i - 1] == "-define" && StartsWith(arguments[i], kScratchDefine)) {

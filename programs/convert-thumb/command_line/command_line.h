@@ -21,7 +21,7 @@ struct CommandLine {
   /// A conversion or a turn only if every single argument is supported.
   std::variant<UnknownTask, ConversionPlan, TurnPlan> task;
 
-  /// Index of the argument that names the source; arguments.size() if there is none. Known for an
+  /// Index of the argument that names the source; arguments.size() if there is none. Set for an
   /// unknown task as well, like everything below.
   size_t sourceIndex = 0;
 

@@ -1,4 +1,4 @@
-// What a command line asks for, as plain values.
+// The tasks that a command line can request, as plain values.
 #pragma once
 
 #include <string>

@@ -6,10 +6,10 @@
 
 namespace vela {
 
-/// Returns true when both texts are the same apart from the case of ASCII letters.
+/// Returns true when both texts are equal, ignoring the case of ASCII letters.
 bool EqualsIgnoringCase(std::string_view a, std::string_view b);
 
-/// Returns what follows the last dot of the file name in `path`; empty when there is no dot.
+/// Returns the text after the last dot of the file name in `path`; empty when there is no dot.
 std::string_view ExtensionOf(std::string_view path);
 
 /// Returns the directory of the file at `path`, "." when the path does not name one.

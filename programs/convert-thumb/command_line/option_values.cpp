@@ -36,7 +36,7 @@ std::optional<double> TakeFraction(std::string& text) {
 }
 
 /// Removes `mark` and the fraction after it and stores that in `value`; without the mark, `value`
-/// is left alone.
+/// is unchanged.
 bool TakeMarkedFraction(std::string& text, char mark, double& value) {
   if (text.empty() || text.front() != mark) {
     return true;

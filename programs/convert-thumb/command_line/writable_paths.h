@@ -1,4 +1,4 @@
-// Where a command line may change files.
+// The paths that a command line may write to.
 #pragma once
 
 #include "command_line/command_line.h"

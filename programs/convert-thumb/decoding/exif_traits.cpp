@@ -20,7 +20,7 @@ using OwnedExif = std::unique_ptr<ExifData, ExifDataUnref>;
 OwnedExif Load(const uint8_t* data, size_t size) {
   OwnedExif exif(exif_data_new());
   if (exif != nullptr) {
-    // Would repair wrong tags, which changes their values and takes time.
+    // This option would repair wrong tags, which changes their values and takes time.
     exif_data_unset_option(exif.get(), EXIF_DATA_OPTION_FOLLOW_SPECIFICATION);
     exif_data_load_data(exif.get(), data, static_cast<unsigned>(size));
   }

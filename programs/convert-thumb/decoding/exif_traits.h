@@ -9,7 +9,7 @@
 namespace vela {
 
 /// Stores the orientation and density of an APP1 segment, which starts with "Exif", in `traits`.
-/// Leaves values alone that the data does not contain.
+/// Values that the data does not contain are unchanged.
 void ReadExifTraits(const uint8_t* data, size_t size, PhotoTraits& traits);
 
 }  // namespace vela

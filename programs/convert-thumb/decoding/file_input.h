@@ -7,7 +7,7 @@
 
 namespace vela {
 
-/// Reads a file from its start, regardless of the descriptor's position, which it leaves alone.
+/// Reads a file from its start, regardless of the descriptor's position, which does not change.
 class FileInput {
  public:
   /// Real photos have less data than this in front of the first samples; files with more were
@@ -26,7 +26,7 @@ class FileInput {
   int descriptor_;
   int64_t offset_ = 0;  ///< in the file, after the buffer
   std::array<unsigned char, 65536> buffer_;
-  size_t begin_ = 0;  ///< of the bytes that have not been read
+  size_t begin_ = 0;  ///< start of the bytes that have not been read
   size_t end_ = 0;
 };
 

@@ -4,7 +4,7 @@
 namespace vela {
 
 /// Returns true when the first frame of the file covers the whole picture, false also when that
-/// cannot be determined. Leaves the descriptor's position alone.
+/// cannot be determined. Does not change the descriptor's position.
 bool FirstFrameCoversGif(int descriptor);
 
 }  // namespace vela

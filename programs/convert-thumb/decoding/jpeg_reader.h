@@ -11,8 +11,8 @@ namespace vela {
 
 class JpegReader final : public PhotoReader {
  public:
-  /// `descriptor`: open as long as the reader is used. `memoryLimit`: bytes that the decoder may
-  /// use.
+  /// `descriptor`: must stay open while the reader is used. `memoryLimit`: bytes that the decoder
+  /// may use.
   JpegReader(int descriptor, size_t memoryLimit);
   ~JpegReader() override;
   JpegReader(const JpegReader&) = delete;

@@ -16,7 +16,7 @@ enum class PhotoFormat {
 };
 
 /// Returns the format of an open file, regardless of its name; kUnknown for any other format and
-/// when it cannot be read. Leaves the descriptor's position alone.
+/// when it cannot be read. Does not change the descriptor's position.
 PhotoFormat FormatOf(int descriptor);
 
 }  // namespace vela

@@ -14,8 +14,8 @@ struct PngHeader {
   JpegDensity density;
 };
 
-/// Reads the chunks before the samples; empty when that fails. Leaves the descriptor's position
-/// alone.
+/// Reads the chunks before the samples; empty when that fails. Does not change the descriptor's
+/// position.
 std::optional<PngHeader> ReadPngHeader(const VipsLibrary& vips, int descriptor);
 
 }  // namespace vela

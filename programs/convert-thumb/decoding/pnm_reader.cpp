@@ -19,8 +19,8 @@ constexpr sample kMaxWord = 65535;
 
 void DropMessage(const char*) {}
 
-/// The functions of libnetpbm that are used. It is loaded for a photo that needs it only. It keeps
-/// global state, so one thread at a time may use it.
+/// The functions of libnetpbm that are used. It is loaded only for a photo that needs it. It has
+/// global state, so only one thread at a time may use it.
 class NetpbmLibrary final : private LoadedLibrary {
  public:
   /// Returns the library, loaded by the first call, with its messages turned off; null when it, or
@@ -30,7 +30,7 @@ class NetpbmLibrary final : private LoadedLibrary {
     return library.IsLoaded() ? &library : nullptr;
   }
 
-  /// Sets where errors jump to; without that they end the process.
+  /// Sets the jump target for errors; without one they end the process.
   decltype(&::pm_setjmpbuf) setJump = nullptr;
   decltype(&::pnm_readpaminit) readHeader = nullptr;
 

@@ -12,8 +12,8 @@ namespace vela {
 
 class PnmReader final : public PhotoReader {
  public:
-  /// `descriptor`: open as long as the reader is used. `firstPageOnly`: ignore further pictures in
-  /// the file.
+  /// `descriptor`: must stay open while the reader is used. `firstPageOnly`: ignore further
+  /// pictures in the file.
   PnmReader(int descriptor, bool firstPageOnly);
 
   /// Returns false also when the largest sample value is neither 255 nor 65535, or when the file

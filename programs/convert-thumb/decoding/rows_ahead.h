@@ -15,8 +15,8 @@ namespace vela {
 
 class RowsAhead final : public RowSource {
  public:
-  /// `reader`: has been started. Until this object is destroyed, other code must not use it except
-  /// to query its sizes.
+  /// `reader`: has been started. Until this object is destroyed, other code may only query its
+  /// sizes.
   explicit RowsAhead(PhotoReader& reader);
   ~RowsAhead() override;
   RowsAhead(const RowsAhead&) = delete;

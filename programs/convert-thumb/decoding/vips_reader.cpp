@@ -117,7 +117,7 @@ struct VipsReader::State {
     return image->BandFmt == VIPS_FORMAT_USHORT ? sizeof(uint16_t) : sizeof(uint8_t);
   }
 
-  /// What decoding takes in memory besides a few rows.
+  /// Memory that decoding needs besides a few rows.
   uint64_t WholePictureBytes() const {
     const bool interlaced = HasVipsField(*vips, image, kInterlaced);
     const bool streamed =
@@ -131,8 +131,8 @@ struct VipsReader::State {
     return header && !header->linear;
   }
 
-  /// Returns false when libvips would interpret the file differently from ImageMagick, as far as
-  /// the picture that it returns does not show that.
+  /// Returns false when libvips would interpret the file differently from ImageMagick in ways that
+  /// the returned picture does not show.
   bool IsInterpretedAlike() {
     switch (file.format) {
       case PhotoFormat::kTiff:
@@ -312,7 +312,7 @@ bool VipsReader::ReadRow(uint8_t* row) {
 }
 
 void VipsReader::LeaveThread() {
-  // The region holds memory of the thread.
+  // The region uses memory that belongs to the thread.
   state_->DropRegion();
   state_->vips->shutDownThread();
 }

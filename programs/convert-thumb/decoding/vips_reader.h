@@ -12,14 +12,14 @@ namespace vela {
 
 /// The file that VipsReader reads.
 struct VipsSourceFile {
-  int descriptor = -1;                         ///< open as long as the reader is used
+  int descriptor = -1;                         ///< must stay open while the reader is used
   PhotoFormat format = PhotoFormat::kUnknown;  ///< anything but kJpeg and kPnm
   bool firstPageOnly = false;                  ///< ignore further pages
 };
 
 class VipsReader final : public PhotoReader {
  public:
-  /// `memoryLimit`: bytes that a picture may take that cannot be decoded row by row.
+  /// `memoryLimit`: bytes available for a picture that cannot be decoded row by row.
   VipsReader(const VipsSourceFile& file, size_t memoryLimit);
   ~VipsReader() override;
   VipsReader(const VipsReader&) = delete;

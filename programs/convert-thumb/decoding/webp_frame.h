@@ -11,8 +11,8 @@ enum class WebpFrame {
   kUnsupported,  ///< smaller than the picture, or unreadable
 };
 
-/// Examines the first frame of the file; every frame has its own transparency. Leaves the
-/// descriptor's position alone.
+/// Examines the first frame of the file; every frame has its own transparency. Does not change the
+/// descriptor's position.
 WebpFrame ReadFirstWebpFrame(const VipsLibrary& vips, int descriptor);
 
 }  // namespace vela

@@ -32,7 +32,7 @@ struct EncodedJpeg {
 /// interleaved components can have it. A colour picture that contains only grey is stored as grey.
 class JpegEncoder final : public RowSink {
  public:
-  /// `channels`: 1 or 3. `traits`: of the photo; have to outlive this. `quality`: 1 to 100.
+  /// `channels`: 1 or 3. `traits`: of the photo; must outlive this object. `quality`: 1 to 100.
   /// `withProfile`: store the photo's colour profile.
   JpegEncoder(PictureSize size, int channels, const PhotoTraits& traits, int quality,
               bool withProfile);

@@ -19,8 +19,8 @@ namespace vela {
 
 namespace {
 
-/// A link to kProgram. Processes are found by the name of their program, which has to be the
-/// converter's.
+/// A link to kProgram. Processes are found by the name of their program, so it must be the
+/// converter's name.
 constexpr char kLink[] = "/usr/vela/lib/convert-thumb";
 constexpr char kProgram[] = "/usr/bin/convert-im6.q16";
 constexpr char kArgumentZero[] = "convert-thumb";
@@ -55,7 +55,7 @@ std::string FormatPrefix(const std::string& path) {
 /// Returns true when an argument that names no file, according to the `error` of opening it, can be
 /// passed on unchanged: an option, or a picture that ImageMagick generates. With a directory in its
 /// name it is a photo that has been removed.
-bool CanBeNoFile(const std::string& argument, int error) {
+bool NeedNotBeFile(const std::string& argument, int error) {
   return error == ENOENT && argument.find('/') == std::string::npos;
 }
 
@@ -94,7 +94,7 @@ bool MakeSourceSafe(const CommandLine& line, std::vector<std::string>& arguments
   FileDescriptor source = OpenForProgram(file);
   if (!source.IsOpen()) {
     const int error = errno;
-    if (!CanBeNoFile(file, error)) {
+    if (!NeedNotBeFile(file, error)) {
       ReportFailure("%s: %s", file.c_str(), std::strerror(error));
       return false;
     }

@@ -8,7 +8,7 @@
 namespace vela {
 
 /// Replaces this process by ImageMagick with the same arguments. Where ImageMagick is not installed
-/// under the converter's name, runs it in a child and ends as the child ends.
+/// under the converter's name, runs it in a child and ends with the child's status or signal.
 ///
 /// A source whose name has a special meaning to ImageMagick is opened here and passed as a
 /// descriptor; one that cannot be opened is an error. The same applies to a photo that is turned in

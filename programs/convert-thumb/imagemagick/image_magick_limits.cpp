@@ -9,10 +9,10 @@ namespace vela {
 
 namespace {
 
-constexpr char kInMemory[] = "MAGICK_MEMORY_LIMIT";
+constexpr char kMemoryLimitVariable[] = "MAGICK_MEMORY_LIMIT";
 /// For memory-mapped files, whose memory the kernel can reclaim. Larger pictures are read and
 /// written in pieces, which takes five times as long.
-constexpr char kInMappedFiles[] = "MAGICK_MAP_LIMIT";
+constexpr char kMapLimitVariable[] = "MAGICK_MAP_LIMIT";
 
 /// Parses a size such as "64MiB"; negative if the text is not a number.
 double Bytes(const char* text) {
@@ -47,8 +47,8 @@ void LimitTo(size_t limit, const char* variable) {
 }  // namespace
 
 void LimitImageMagick(size_t memoryLimit) {
-  LimitTo(memoryLimit / 2, kInMemory);
-  LimitTo(memoryLimit, kInMappedFiles);
+  LimitTo(memoryLimit / 2, kMemoryLimitVariable);
+  LimitTo(memoryLimit, kMapLimitVariable);
 }
 
 }  // namespace vela

@@ -17,7 +17,7 @@ namespace vela {
 class ColumnScaler final : public RowSink {
  public:
   /// Scales a picture of size `from` with `channels` samples a pixel and passes the rows to `next`,
-  /// which has to outlive this.
+  /// which must outlive this object.
   ColumnScaler(PictureSize from, int channels, const ResizePlan& plan, RowSink& next);
 
   bool Put(const float* row) override;

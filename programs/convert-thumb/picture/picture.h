@@ -31,8 +31,8 @@ constexpr bool IsProfileValidInRgb(ColourSpace space) {
   return space == ColourSpace::kRgb;
 }
 
-/// Rows from the top, pixels from the left, the samples of a pixel next to each other: one, three
-/// or four. Samples are finer than those of a JPEG, because the quantisation of the JPEG that is
+/// Rows from the top, pixels from the left, the samples of a pixel (one, three or four) next to
+/// each other. Samples are finer than those of a JPEG, because the quantisation of the JPEG that is
 /// made at the end would amplify the rounding errors of each step.
 struct Picture {
   int width = 0;                  ///< pixels

@@ -13,7 +13,7 @@ namespace vela {
 
 class RowQueue final : public RowSink {
  public:
-  /// `rowSize`: samples in a row. `next` has to outlive this and must not be used by other code
+  /// `rowSize`: samples in a row. `next` must outlive this object and not be used by other code
   /// until Finish. With a single processor, Put calls `next` directly.
   RowQueue(size_t rowSize, RowSink& next);
   ~RowQueue() override;

@@ -16,7 +16,7 @@ namespace vela {
 class BlockScaler {
  public:
   /// Scales a picture of size `from` with `channels` samples a pixel and passes the rows to `next`,
-  /// which has to outlive this.
+  /// which must outlive this object.
   BlockScaler(PictureSize from, int channels, const ResizePlan& plan, RowSink& next);
 
   /// Takes the next `rows` rows, interleaved by RowBlock. Returns false when `next` rejects a row.

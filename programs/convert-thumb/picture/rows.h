@@ -41,7 +41,7 @@ class RowSink {
   RowSink& operator=(const RowSink&) = default;
 };
 
-/// Reads the rows of a picture in memory, which has to outlive this.
+/// Reads the rows of a picture in memory, which must outlive this object.
 class PictureRows final : public RowSource {
  public:
   explicit PictureRows(const Picture& picture) : picture_(picture) {}
@@ -59,7 +59,7 @@ class PictureRows final : public RowSource {
   int next_ = 0;
 };
 
-/// Writes rows into a picture, which has to outlive this.
+/// Writes rows into a picture, which must outlive this object.
 class PictureWriter final : public RowSink {
  public:
   explicit PictureWriter(Picture& picture) : picture_(picture) {}

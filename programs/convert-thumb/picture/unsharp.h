@@ -25,7 +25,7 @@ void Sharpen(Picture& picture, const UnsharpMask& mask);
 /// has arrived.
 class RowSharpener final : public RowSink {
  public:
-  /// `next` has to outlive this.
+  /// `next` must outlive this object.
   RowSharpener(PictureSize size, int channels, const UnsharpMask& mask, RowSink& next);
 
   bool Put(const float* row) override;

@@ -55,7 +55,7 @@ void ForwardSignals() {
 [[noreturn]] void ExecuteProgram(const char* program, char* const* arguments, pid_t parent,
                                  const sigset_t& mask) {
   prctl(PR_SET_PDEATHSIG, SIGKILL);
-  // The parent may have died before that call.
+  // The parent may have ended before that call.
   if (getppid() == parent) {
     sigprocmask(SIG_SETMASK, &mask, nullptr);
     execv(program, arguments);
@@ -66,7 +66,7 @@ void ForwardSignals() {
   _exit(kFailed);
 }
 
-[[noreturn]] void ExitLike(int waitStatus) {
+[[noreturn]] void ExitAs(int waitStatus) {
   if (WIFEXITED(waitStatus)) {
     _exit(WEXITSTATUS(waitStatus));
   }
@@ -108,7 +108,7 @@ void RunInChildAndExit(const char* program, char* const* arguments) {
   const pid_t self = getpid();
   const sigset_t forwarded = ForwardedSignals();
   sigset_t mask;
-  // Until there is a child to forward them to.
+  // Blocked until there is a child to forward them to.
   sigprocmask(SIG_BLOCK, &forwarded, &mask);
   ResetChildSignal();
   const pid_t child = fork();
@@ -126,7 +126,7 @@ void RunInChildAndExit(const char* program, char* const* arguments) {
     return;
   }
   if (const std::optional<int> status = WaitForExit(child)) {
-    ExitLike(*status);
+    ExitAs(*status);
   }
 }
 

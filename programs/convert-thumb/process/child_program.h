@@ -7,10 +7,10 @@ namespace vela {
 /// on failure, with errno set.
 void ReplaceProcess(const char* program, char* const* arguments);
 
-/// Runs `program` in a child process and ends this process as the child ends, with its exit status
-/// or by its signal. Forwards SIGTERM, SIGINT, SIGHUP and SIGQUIT to the child, which is killed
-/// when this process dies. Resets SIGCHLD to its default action in both processes. Returns only
-/// when no child could be started or its status cannot be determined, with errno set.
+/// Runs `program` in a child process and ends this process with the child's exit status or signal.
+/// Forwards SIGTERM, SIGINT, SIGHUP and SIGQUIT to the child, which is killed when this process
+/// dies. Resets SIGCHLD to its default action in both processes. Returns only when no child could
+/// be started or its status cannot be determined, with errno set.
 void RunInChildAndExit(const char* program, char* const* arguments);
 
 }  // namespace vela

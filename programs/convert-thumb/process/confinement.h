@@ -1,4 +1,4 @@
-// Gives up what the process does not need, before it reads a photo.
+// Drops privileges that the process does not need, before it reads a photo.
 #pragma once
 
 #include "process/landlock.h"

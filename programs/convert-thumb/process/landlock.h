@@ -1,4 +1,4 @@
-// Restricts changes of files by the kernel's Landlock.
+// Restricts changes to files with the kernel's Landlock.
 #pragma once
 
 #include <string>
@@ -6,7 +6,7 @@
 
 namespace vela {
 
-/// Where a run may change files. The paths need not exist.
+/// The paths that a run may write to. They need not exist.
 struct WritablePaths {
   std::vector<std::string> directories;  ///< including everything below them
   std::vector<std::string> files;        ///< existing outputs; symbolic links are followed

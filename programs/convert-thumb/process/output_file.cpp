@@ -25,7 +25,7 @@ bool Write(const FileDescriptor& file, const unsigned char* bytes, size_t size) 
 
 /// Access control lists are extended attributes as well.
 bool HasExtendedAttributes(const FileDescriptor& file) {
-  // Fails on file systems that do not support any.
+  // Fails on file systems without extended attributes.
   return flistxattr(file.Get(), nullptr, 0) > 0;
 }
 
@@ -47,7 +47,7 @@ FileDescriptor CreateFile(const std::string& path, mode_t mode) {
   return file;
 }
 
-/// New files may inherit the group and access control list of their directory.
+/// Checked because new files may inherit the group and access control list of their directory.
 bool HasAttributes(const FileDescriptor& file, const FileAttributes& attributes) {
   struct stat status;
   return fstat(file.Get(), &status) == 0 && status.st_uid == attributes.owner &&

@@ -13,7 +13,7 @@ namespace vela {
 /// `path` is any other kind of file; the incomplete file is removed. May be called by any thread.
 bool WriteOutputFile(const std::string& path, const unsigned char* bytes, size_t size);
 
-/// What a replacement has in common with the file that it replaces.
+/// The attributes that a replacement shares with the file that it replaces.
 struct FileAttributes {
   unsigned owner = 0;
   unsigned group = 0;

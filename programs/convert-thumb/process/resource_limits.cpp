@@ -19,7 +19,7 @@ namespace vela {
 namespace {
 
 /// From SIGXCPU until the kernel kills the process.
-constexpr rlim_t kSecondsToEnd = 5;
+constexpr rlim_t kGraceSeconds = 5;
 /// The only size that also keeps crash handlers, which read core dumps from a pipe, from being run.
 constexpr rlim_t kNoCoreDump = 1;
 
@@ -70,7 +70,7 @@ void Lower(int resource, rlim_t soft, rlim_t hard) {
 void LimitMemory(size_t memoryLimit) {
 // A sanitizer reserves many times the memory of any limit.
 #if !defined(CONVERT_THUMB_SANITIZED)
-  const size_t besides = kMemoryBesides + kStackMemory * ProcessorCount();
+  const size_t besides = kBaseMemory + kStackMemory * ProcessorCount();
   const size_t most = std::numeric_limits<size_t>::max() - besides;
   const rlim_t limit = std::min(memoryLimit, most) + besides;
   Lower(RLIMIT_DATA, limit, limit);
@@ -96,14 +96,14 @@ size_t ConversionMemoryLimit() {
 
 void LimitResources(size_t memoryLimit) {
   LimitMemory(memoryLimit);
-  Lower(RLIMIT_CPU, kMaxProcessorSeconds, kMaxProcessorSeconds + kSecondsToEnd);
+  Lower(RLIMIT_CPU, kMaxProcessorSeconds, kMaxProcessorSeconds + kGraceSeconds);
 }
 
 void DisableCoreDumps() {
   rlimit limit = {};
   getrlimit(RLIMIT_CORE, &limit);
   limit.rlim_max = std::min(limit.rlim_max, kNoCoreDump);
-  // Raised where it was 0, which would not keep crash handlers from being run.
+  // A limit of 0 is raised, because it would not keep crash handlers from being run.
   limit.rlim_cur = limit.rlim_max;
   setrlimit(RLIMIT_CORE, &limit);
 }

@@ -5,13 +5,13 @@
 
 namespace vela {
 
-/// Processor time of all threads together; more than a picture of 100 megapixels takes on a slow
+/// Processor time of all threads together; enough for a picture of 100 megapixels on a slow
 /// machine.
 constexpr unsigned kMaxProcessorSeconds = 600;
 
-/// What the program and its libraries need in addition to the picture, in bytes, and a thread stack
-/// for each processor, since libraries start that many threads.
-constexpr size_t kMemoryBesides = size_t{64} << 20;
+/// Memory of the program and its libraries besides the picture, in bytes, and a thread stack for
+/// each processor, since libraries start that many threads.
+constexpr size_t kBaseMemory = size_t{64} << 20;
 constexpr size_t kStackMemory = size_t{8} << 20;
 
 /// Returns the memory limit of a conversion in bytes: `convert_memory_limit` of the system

@@ -1,4 +1,4 @@
-// Opening and reading the files that photos come from.
+// Opening and reading source files.
 #pragma once
 
 #include <cstddef>
@@ -41,7 +41,7 @@ int64_t SizeOf(int descriptor);
 /// of the file and -1 on failure.
 int64_t ReadSome(int descriptor, void* bytes, size_t size);
 
-/// The same from `offset`; leaves the descriptor's position alone.
+/// The same from `offset`; does not change the descriptor's position.
 int64_t ReadSomeAt(int descriptor, void* bytes, size_t size, int64_t offset);
 
 /// Reads exactly `size` bytes at the descriptor's position. Returns false on failure or when the

@@ -101,7 +101,7 @@ constexpr int kFileAttributes[] = {
     SCMP_SYS(fremovexattr), SCMP_SYS(symlink),   kRemovexattrat,         SCMP_SYS(symlinkat),
     kFileSetattr,           SCMP_SYS(link),      SCMP_SYS(linkat),       SCMP_SYS(truncate)};
 
-/// Flags of clone. That of time namespaces is part of the signal number there.
+/// Flags of clone, without that of time namespaces, whose bit belongs to the signal number there.
 constexpr uint64_t kNewNamespace[] = {CLONE_NEWNS,   CLONE_NEWCGROUP, CLONE_NEWUTS, CLONE_NEWIPC,
                                       CLONE_NEWUSER, CLONE_NEWPID,    CLONE_NEWNET};
 
@@ -154,7 +154,7 @@ class SystemCallFilter {
 
  private:
   void SetAttributes() {
-    // Other calling conventions have other system call numbers; no program uses them.
+    // Other calling conventions use other system call numbers; no program here uses them.
     seccomp_attr_set(context_, SCMP_FLTATR_ACT_BADARCH, kRefuse);
     // The mitigation would slow down decoding, and this process has no secrets to protect from
     // itself.

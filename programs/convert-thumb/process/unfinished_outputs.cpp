@@ -79,7 +79,7 @@ void UnregisterOutput(const std::string& path) {
 void RemoveRegisteredOutputs() {
   g_isEnding = true;
   for (const RegisteredOutput* output = g_outputs; output != nullptr; output = output->next) {
-    // Devices stay.
+    // Devices are kept.
     if (!output->isDropped && TypeOf(output->path) == FileType::kRegular) {
       unlink(output->path.c_str());
     }

@@ -5,12 +5,12 @@
 
 namespace vela {
 
-/// Records that this run is about to create the file. Returns false when the run is already ending;
-/// the file must not be created then. May be called by any thread.
+/// Records that this run is about to create the file. Returns false when the run is already ending
+/// and the file must not be created. May be called by any thread.
 bool RegisterOutput(const std::string& path);
 
-/// Drops the latest record of this path, because the file could not be opened: a file of that name
-/// does not belong to this run. May be called by any thread.
+/// Drops the latest record of this path because the file could not be opened: an existing file of
+/// that name does not belong to this run. May be called by any thread.
 void UnregisterOutput(const std::string& path);
 
 /// Removes the registered regular files. From then on the run counts as ending.

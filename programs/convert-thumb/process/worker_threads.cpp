@@ -35,7 +35,7 @@ class Work {
     try {
       return std::thread([this] { ProcessAll(); });
     } catch (const std::system_error&) {
-      // The calling thread then does all the work.
+      // The calling thread then does all of the work.
       return std::thread();
     }
   }

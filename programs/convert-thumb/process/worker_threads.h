@@ -13,8 +13,7 @@ size_t ProcessorCount();
 bool HasSecondProcessor();
 
 /// Calls `work` with every number below `count`, in two threads if there is a second processor;
-/// each thread takes the next number that is still open. Stops when a call returns false; returns
-/// false in that case.
+/// each thread takes the next remaining number. Stops and returns false when a call returns false.
 bool DoInTwoThreads(size_t count, const std::function<bool(size_t)>& work);
 
 }  // namespace vela

@@ -21,7 +21,7 @@ Picture OnePixel(std::vector<uint16_t> samples) {
 }
 
 TEST(ColourConversion, InksAbsorbLight) {
-  // Cyan ink leaves half of the red, black ink leaves half of everything.
+  // Cyan ink halves the red, black ink halves every colour.
   Picture picture = OnePixel({32768, kLight, kLight, 32768});
   ConvertToRgb(picture, ColourSpace::kCmyk);
   EXPECT_EQ(picture.channels, 3);
@@ -29,7 +29,7 @@ TEST(ColourConversion, InksAbsorbLight) {
 }
 
 TEST(ColourConversion, BrightnessAndDifferencesMakeColours) {
-  // The middle of both differences is grey; the most red there is, at 30 percent brightness.
+  // The middle of both differences is grey; full red has 30 percent of the brightness.
   Picture grey = OnePixel({20000, 32768, 32768});
   ConvertToRgb(grey, ColourSpace::kLumaChroma);
   EXPECT_EQ(grey.samples, (std::vector<uint16_t>{20000, 20000, 20000}));
@@ -75,7 +75,7 @@ class Colours : public ConverterTest {
   }
 };
 
-/// Makes the picture transparent by another one's brightness.
+/// Makes the picture transparent according to the brightness of another one.
 std::vector<std::string> WithSoftOpacity(std::vector<std::string> options) {
   std::vector<std::string> all = {"(",      "+clone", "-flip",    "-colorspace", "Gray",      ")",
                                   "-alpha", "off",    "-compose", "CopyOpacity", "-composite"};
@@ -85,7 +85,7 @@ std::vector<std::string> WithSoftOpacity(std::vector<std::string> options) {
 
 TEST_F(Colours, InkJpeg) {
   ExpectOwn("a.jpg", {"-colorspace", "CMYK"});
-  // Large enough to be decoded at a part of its size.
+  // Large enough to be decoded at a fraction of its size.
   ExpectOwnPictures(MakePicture("b.jpg", 4000, 3000, {"-colorspace", "CMYK"}), UsualOutputs());
 }
 
@@ -124,7 +124,7 @@ TEST_F(Colours, TransparentPicturesAreFlattened) {
   ExpectOwn("a.jp2", WithSoftOpacity({}));
 }
 
-TEST_F(Colours, HardEdgesOfTransparencyToo) {
+TEST_F(Colours, HardEdgesOfTransparencyAreFlattened) {
   const std::vector<std::string> hard =
       WithSoftOpacity({"-channel", "A", "-threshold", "50%", "+channel", "-colors", "100"});
   ExpectOwn("png8:a.png", hard, 41);

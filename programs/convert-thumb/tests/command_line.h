@@ -22,11 +22,11 @@ struct ThumbOptions {
 
 struct ThumbOutput {
   ThumbOptions options;
-  std::string path;  ///< as the argument reads
+  std::string path;  ///< as written in the argument
 };
 
 struct CommandLine {
-  std::string source;            ///< as the argument reads
+  std::string source;            ///< as written in the argument
   std::string scratchDirectory;  ///< empty: none
   std::vector<ThumbOutput> outputs;
 

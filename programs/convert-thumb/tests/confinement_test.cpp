@@ -1,4 +1,4 @@
-// What the converter can no longer do once it reads a photo.
+// The restrictions of the converter while it reads a photo.
 
 #include <fcntl.h>
 #include <linux/landlock.h>
@@ -36,7 +36,7 @@ namespace {
 constexpr char kInside[] = "/tmp/inside";
 constexpr char kOutside[] = "/tmp/outside";
 
-/// The errno of a call that failed, 0 of one that did not.
+/// The errno of a failed call, 0 on success.
 int ErrorOf(long result) {
   return result < 0 ? errno : 0;
 }
@@ -53,7 +53,7 @@ int InChild(const std::function<int()>& attempt) {
   return WEXITSTATUS(status);
 }
 
-/// The same once the process has been confined to kInside.
+/// The same after the process has been confined to kInside.
 int Confined(const std::function<int()>& attempt) {
   return InChild([&attempt] {
     Confine({{kInside}, {"/dev/null", std::string(kInside) + "/link"}});
@@ -117,7 +117,7 @@ TEST_F(Confinement, MovesNothingInOrOut) {
   EXPECT_EQ(ListDirectory(kInside), std::vector<std::string>{"file"});
 }
 
-TEST_F(Confinement, MakesNothingButFiles) {
+TEST_F(Confinement, CreatesOnlyFiles) {
   EXPECT_EQ(Confined([] { return ErrorOf(mkdir("/tmp/inside/a", 0700)); }), ErrorOutside());
   EXPECT_EQ(Confined([] { return ErrorOf(symlink("/etc", "/tmp/inside/b")); }), EPERM);
   EXPECT_EQ(Confined([] { return ErrorOf(mknod("/tmp/inside/c", S_IFIFO | 0600, 0)); }), EPERM);
@@ -142,7 +142,7 @@ TEST_F(Confinement, DoesNotOpenADirectoryThatAnOutputNames) {
             ErrorOutside());
 }
 
-/// A system call that no unconfined process is refused.
+/// A system call that every unconfined process may make.
 struct Call {
   const char* name;
   std::function<long()> make;
@@ -236,7 +236,7 @@ int StartThreadAndProgram() {
   return WEXITSTATUS(status);
 }
 
-TEST_F(Confinement, StartsThreadsAlwaysAndProgramsOnlyAtFirst) {
+TEST_F(Confinement, StartsThreadsAlwaysAndProgramsOnlyInTheFirstStage) {
   EXPECT_EQ(Confined(StartThreadAndProgram), 0);
   EXPECT_EQ(Confined([] {
               ConfineToThisProgram();
@@ -245,7 +245,7 @@ TEST_F(Confinement, StartsThreadsAlwaysAndProgramsOnlyAtFirst) {
             EPERM);
 }
 
-TEST_F(Confinement, SignalsOnlyItselfAtLast) {
+TEST_F(Confinement, SignalsOnlyItselfInTheLastStage) {
   EXPECT_EQ(Confined([] {
               ConfineToThisProgram();
               return ErrorOf(kill(getppid(), 0));
@@ -258,12 +258,12 @@ TEST_F(Confinement, SignalsOnlyItselfAtLast) {
             0);
 }
 
-/// ENOENT where programs may be started.
+/// Starts a missing program: ENOENT where programs may be started.
 int ErrorOfStartingNothing() {
   return ErrorOf(execl("/tmp/inside/none", "none", nullptr));
 }
 
-TEST_F(Confinement, AppliesAtLastToExistingThreads) {
+TEST_F(Confinement, AppliesToExistingThreadsInTheLastStage) {
   EXPECT_EQ(Confined([] {
               std::promise<void> confined;
               int error = 0;
@@ -279,7 +279,7 @@ TEST_F(Confinement, AppliesAtLastToExistingThreads) {
             EPERM);
 }
 
-TEST_F(Confinement, AppliesAtLastWhenOtherThreadsCannotBeReached) {
+TEST_F(Confinement, AppliesInTheLastStageWhenOtherThreadsCannotBeReached) {
   EXPECT_EQ(Confined([] {
               std::promise<void> done;
               std::promise<void> filtered;

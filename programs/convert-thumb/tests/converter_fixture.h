@@ -1,4 +1,4 @@
-// Runs the converter and ImageMagick with the same command lines and compares what they make.
+// Runs the converter and ImageMagick with the same command lines and compares their pictures.
 #pragma once
 
 #include <gmock/gmock.h>
@@ -35,7 +35,7 @@ struct Likeness {
 };
 Likeness Compare(const std::string& one, const std::string& other);
 
-/// Takes ImageMagick away for as long as it lives.
+/// Hides ImageMagick during its lifetime.
 class WithoutImageMagick {
  public:
   WithoutImageMagick();
@@ -44,7 +44,7 @@ class WithoutImageMagick {
   WithoutImageMagick& operator=(const WithoutImageMagick&) = delete;
 };
 
-/// Sets the converter's memory limit, as the setting reads.
+/// Sets the converter's memory limit, in the syntax of the setting.
 void SetMemoryLimit(const std::string& limit);
 
 /// Runs the converter with these arguments.
@@ -56,12 +56,12 @@ void ExpectSuccess(const ProgramResult& result);
 
 class ConverterTest : public SandboxTest {
  protected:
-  /// Room for sources and outputs.
+  /// Directory of sources and outputs.
   const std::string directory_ = "/tmp/converter";
   void SetUp() override;
 
   /// Makes a photo-like JPEG: detail at every scale, the same for the same `options` and size.
-  /// `options`: further ones of ImageMagick. Returns its path.
+  /// `options`: additional options of ImageMagick. Returns its path.
   std::string MakePhoto(const std::string& name, int width, int height,
                         const std::vector<std::string>& options = {}) const;
 
@@ -74,12 +74,12 @@ class ConverterTest : public SandboxTest {
                         const std::vector<ThumbOptions>& outputs = {ThumbOptions()},
                         const ProgramOptions& options = ProgramOptions()) const;
 
-  /// The line with the outputs' paths in a directory of their own.
+  /// The command line with its outputs in the given directory.
   CommandLine Line(const std::string& source, const std::vector<ThumbOptions>& outputs,
                    const std::string& prefix) const;
 
-  /// Runs both with these outputs; expects success of both, the same sizes, and on the whole set
-  /// (as well as each output by itself) at least these likenesses.
+  /// Runs both with these outputs; expects success of both, the same sizes, and at least this
+  /// similarity, on average and of each output.
   void ExpectSamePictures(const std::string& source, const std::vector<ThumbOptions>& outputs,
                           double leastMean = 40, double least = 36) const;
 
@@ -87,10 +87,10 @@ class ConverterTest : public SandboxTest {
   void ExpectOwnPictures(const std::string& source, const std::vector<ThumbOptions>& outputs,
                          double leastMean = 40, double least = 36) const;
 
-  /// Runs the converter with and without ImageMagick in its reach; expects success only with.
+  /// Runs the converter with and without ImageMagick; expects success only with it.
   void ExpectHandedOver(const std::string& source, const std::vector<ThumbOptions>& outputs) const;
 
-  /// Runs both; expects the same verdict.
+  /// Runs both; expects the same exit status.
   void ExpectSameVerdict(const std::string& source, const std::vector<ThumbOptions>& outputs) const;
 
  private:
@@ -101,7 +101,7 @@ class ConverterTest : public SandboxTest {
 /// A thumbnail in a square box.
 ThumbOptions Square(int side);
 
-/// The usual thumbnails of a photo, from the largest.
+/// The usual thumbnails of a photo, largest first.
 std::vector<ThumbOptions> UsualOutputs();
 
 /// The same after `change` to each.

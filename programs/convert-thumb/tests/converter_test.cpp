@@ -26,7 +26,7 @@ class Converter : public ConverterTest {
 };
 
 TEST_F(Converter, MakesImageMagicksPicturesOfASmallPhoto) {
-  // Decoded at its full size: what differs is rounding.
+  // Decoded at its full size: only rounding differs.
   ExpectSamePictures(MakePhoto("a.jpg", 1400, 1050), UsualOutputs(), 48, 45);
 }
 
@@ -272,12 +272,12 @@ TEST_F(Converter, RefusesThumbnailsThatTakeTooMuchMemory) {
   EXPECT_EQ(Convert(photo, outputs).exitCode, 0);
 }
 
-// The memory that a sanitizer keeps for itself is many times the limit.
+// A sanitizer uses many times the limit for itself.
 #ifndef __SANITIZE_ADDRESS__
 TEST_F(Converter, NeedsLittleMemoryForALargePhoto) {
   const std::string photo = MakePhoto("a.jpg", 8000, 6000);
   ProgramOptions options;
-  // The libraries and two stacks take up addresses too.
+  // Includes the libraries and two stacks.
   options.beforeExec = {LimitResource(RLIMIT_DATA, 56U << 20)};
   ExpectSuccess(Convert(photo, UsualOutputs(), options));
 }

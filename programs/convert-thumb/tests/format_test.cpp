@@ -15,7 +15,8 @@ constexpr int kHeight = 660;
 
 class Formats : public ConverterTest {
  protected:
-  /// Makes a picture and expects the converter to make ImageMagick's thumbnails of it by itself.
+  /// Makes a picture and expects the converter to make the same thumbnails as ImageMagick, without
+  /// its help.
   void ExpectOwn(const std::string& name, const std::vector<std::string>& options,
                  double leastMean = 48) const {
     SCOPED_TRACE(name);
@@ -36,8 +37,8 @@ class Formats : public ConverterTest {
         .out;
   }
 
-  /// Makes a picture in ten shorter versions and some with wrong bytes, and expects ImageMagick's
-  /// verdict on each.
+  /// Makes ten truncated versions of a picture and some with wrong bytes, and expects ImageMagick's
+  /// exit status for each.
   void ExpectVerdictsOnDamage(const std::string& name,
                               const std::vector<std::string>& options = {}) const {
     const std::string bytes = ReadFile(MakePicture(name, 300, 220, options));
@@ -189,7 +190,7 @@ TEST_F(Formats, HandsOverFilesThatItReadsDifferently) {
   ExpectHandedOver(map, outputs);
 }
 
-TEST_F(Formats, HandsOverAGifWhoseFirstFrameIsFarAway) {
+TEST_F(Formats, HandsOverAGifWithMuchDataBeforeItsFirstFrame) {
   const std::string gif = MakePicture("a.gif", 300, 200, {"-colors", "256"});
   const std::string bytes = ReadFile(gif);
   constexpr size_t kColoursEnd = 13 + 3 * 256;
@@ -208,7 +209,7 @@ TEST_F(Formats, HandsOverAGifWhoseFirstFrameIsFarAway) {
 }
 
 TEST_F(Formats, AnAnimationsFirstFrameMayBeOpaqueAmongTransparentOnes) {
-  // A frame that changes a part only is written with everything else transparent.
+  // A frame that changes only a part is written with everything else transparent.
   const std::string source =
       MakePicture("a.webp", 300, 200,
                   {"-attenuate", "0.5", "+noise", "Gaussian", "-define", "webp:lossless=true", "(",
@@ -311,7 +312,7 @@ TEST_F(Formats, PicturesThatAreDecodedWholeKeepToTheMemoryLimit) {
 }
 
 TEST_F(Formats, SharpeningKeepsToTheMemoryLimit) {
-  // 101 rows as they come and as many blurred ones, of 60,000 floats, take 48 megabytes.
+  // 101 source rows and as many blurred ones, of 60,000 floats, take 48 megabytes.
   ThumbOptions options = Square(60000);
   options.unsharp = "50x10+1+0";
   const std::string map = directory_ + "/wide.pgm";

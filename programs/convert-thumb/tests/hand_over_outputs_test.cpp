@@ -30,7 +30,7 @@ class HandOverOutputs : public ConverterTest {
     }
   }
 
-  /// Runs the line in the directory of the source; the result is a picture in the file `name`.
+  /// Runs the line in the directory of the source; expects a picture in the file `name`.
   void ExpectWritten(const CommandLine& line, const std::string& name) const {
     ProgramOptions options;
     options.workingDirectory = directory_;

@@ -29,7 +29,7 @@ class HandOver : public ConverterTest {
     stub_ = std::make_unique<StubTool>(kLinkedImageMagick);
   }
 
-  /// Runs the converter so that stubs, which record their calls, can do so.
+  /// Options under which stubs can record their calls.
   static ProgramOptions Recorded() {
     ProgramOptions options;
     options.addedEnvironment = {std::string("TMPDIR=") + kStubDirectory};

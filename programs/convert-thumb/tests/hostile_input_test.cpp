@@ -1,5 +1,5 @@
-// Malicious files: every run ends by itself, within its memory limit, and leaves
-// either whole outputs or none.
+// Malicious files: every run ends by itself, within its memory limit, with either complete outputs
+// or none.
 
 #include <sys/resource.h>
 #include <sys/socket.h>
@@ -49,16 +49,16 @@ class HostileInput : public ConverterTest {
 
   static void ExpectWithinLimits(const std::string& source, const MeasuredRun& run) {
     EXPECT_FALSE(run.timedOut) << source;
-// The memory that a sanitizer keeps for itself is many times the limit.
+// A sanitizer uses many times the limit for itself.
 #ifndef __SANITIZE_ADDRESS__
-    // The programs' code, and pictures that ImageMagick keeps in files, which count as well while
-    // they are mapped.
+    // The programs' code, and ImageMagick's picture files, which count as well while they are
+    // mapped.
     constexpr size_t kFiles = (size_t{64} << 20) + kMemoryLimit;
-    EXPECT_LT(run.peakMemory, kMemoryLimit + kMemoryBesides + kFiles) << source;
+    EXPECT_LT(run.peakMemory, kMemoryLimit + kBaseMemory + kFiles) << source;
 #endif
   }
 
-  /// Success with whole outputs, or status 1 with none.
+  /// Expects success with complete outputs, or status 1 without any.
   MeasuredRun ExpectHarmless(const std::string& source) const {
     ProgramOptions options;
     options.timeLimit = std::chrono::minutes(1);
@@ -199,7 +199,7 @@ TEST_F(HostileInput, IsNotAFileToBeTurned) {
   EXPECT_EQ(RunConverter({"-rotate", "90", pipe, pipe}, options).exitCode, 1);
 }
 
-/// Cuts the source short while it is read, after more and more of the time that reading it takes.
+/// Truncates the source while it is being read, later in each run.
 TEST_F(HostileInput, ShrinksWhileItIsRead) {
   constexpr int kRounds = 12;
   for (const char* name : {"a.jpg", "a.png", "a.tif", "a.ppm"}) {
@@ -221,11 +221,11 @@ TEST_F(HostileInput, ShrinksWhileItIsRead) {
 }
 
 #ifndef __SANITIZE_ADDRESS__
-/// With less and less memory, from too little to start up to more than enough.
+/// Runs with different amounts of memory, from too little to start to more than enough.
 class ShortOfMemory : public HostileInput {
  protected:
-  /// Runs the line with that many megabytes; a run that fails leaves nothing, unless it has been
-  /// left to ImageMagick, which keeps what it has.
+  /// Runs the line with that many megabytes; a failed run leaves nothing, unless it was left to
+  /// ImageMagick, which keeps partial outputs.
   ProgramResult RunWith(uint64_t megabytes, const CommandLine& line) const {
     ProgramOptions options;
     options.beforeExec = {LimitResource(RLIMIT_DATA, megabytes << 20)};

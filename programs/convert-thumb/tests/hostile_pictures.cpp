@@ -9,7 +9,7 @@ namespace {
 
 constexpr unsigned kByteBits = 8;
 
-/// `count` bytes of a number, the highest first.
+/// `count` bytes of a number, big-endian.
 std::string Big(uint64_t number, unsigned count) {
   std::string bytes;
   for (unsigned i = count; i > 0; --i) {
@@ -18,7 +18,7 @@ std::string Big(uint64_t number, unsigned count) {
   return bytes;
 }
 
-/// The same, the lowest first.
+/// The same, little-endian.
 std::string Little(uint64_t number, unsigned count) {
   const std::string big = Big(number, count);
   return {big.rbegin(), big.rend()};
@@ -59,7 +59,7 @@ std::string Png(uint32_t width, uint32_t height, const std::string& data) {
          PngChunk("IDAT", data) + PngChunk("IEND", "");
 }
 
-/// Packs bits, the first at the lowest place of a byte.
+/// Packs bits, starting with the lowest bit of a byte.
 class Bits {
  public:
   void Add(unsigned bits, unsigned count) {
@@ -142,7 +142,7 @@ std::string TiffHeader() {
   return std::string("II*\0", 4) + Little(kTiffFirstPage, 4) + Zeros(kTiffFirstPage - kTiffData);
 }
 
-/// Places of pages of that many entries one behind the other.
+/// Offset of a page when all pages have that many entries.
 uint32_t TiffPlace(size_t page, size_t entries) {
   return static_cast<uint32_t>(kTiffFirstPage + page * (2 + entries * kTiffEntrySize + 4));
 }
@@ -153,7 +153,7 @@ std::string ClaimingJpeg(uint32_t width, uint32_t height) {
   const std::string start("\xFF\xD8\xFF\xDB\0\x43\0", 7);
   const std::string frame("\xFF\xC0\0\x0B\x08", 5);
   const std::string component("\x01\x01\x11\0", 4);
-  // One code of one bit: a block that is like the one before.
+  // One code of one bit: a block equal to the previous one.
   const std::string codes = "\xFF\xC4" + Big(20, 2);
   const std::string lengths = "\x01" + Zeros(15);
   const std::string scan("\xFF\xDA\0\x08\x01\x01\0\0\x3F\0", 10);
@@ -203,7 +203,7 @@ std::string BlackPng(uint32_t width, uint32_t height) {
 }
 
 std::string LongGif(uint32_t width, uint32_t height, size_t frames) {
-  // Every pixel a code of its own, in as many bits as there are right after a reset.
+  // A separate code for every pixel, of the width that codes have right after a reset.
   Bits bits;
   constexpr unsigned kCodeBits = 3;
   constexpr unsigned kReset = 4;

@@ -1,4 +1,4 @@
-// Small files that ask for a lot.
+// Small files that require much memory or time.
 #pragma once
 
 #include <cstddef>
@@ -7,8 +7,8 @@
 
 namespace vela_test {
 
-/// Files of these formats whose header claims a size, in pixels, followed by almost no data.
-/// JPEG and GIF hold sides of up to 65,535 pixels.
+/// Files of these formats whose header claims a size, in pixels, followed by almost no data. JPEG
+/// and GIF allow sides of up to 65,535 pixels.
 std::string ClaimingJpeg(uint32_t width, uint32_t height);
 std::string ClaimingPng(uint32_t width, uint32_t height);
 std::string ClaimingGif(uint32_t width, uint32_t height);
@@ -18,17 +18,17 @@ std::string ClaimingPpm(uint32_t width, uint32_t height);
 std::string ClaimingBmp(uint32_t width, uint32_t height);
 std::string ClaimingPsd(uint32_t width, uint32_t height);
 
-/// A whole black picture in three bytes a pixel that takes a thousandth of that in the file.
+/// A complete black picture of three bytes per pixel, whose file is a thousandth of that size.
 std::string BlackPng(uint32_t width, uint32_t height);
 
-/// An animation of that many whole frames.
+/// An animation of that many complete frames.
 std::string LongGif(uint32_t width, uint32_t height, size_t frames);
 
-/// A small grey TIFF whose pages lead from each to the next and from the last to `loopTo`, counted
-/// from 0; past the last: they end.
+/// A small grey TIFF whose last page is followed by page `loopTo`, counted from 0; by none if there
+/// is no such page.
 std::string ManyPagesTiff(size_t pages, size_t loopTo);
 
-/// A small grey TIFF each of whose pages holds another inside, that many deep.
+/// A small grey TIFF with nested pages, that many deep.
 std::string NestedTiff(size_t depth);
 
 /// `jpeg`, a progressive one, with its last scan `times` times.

@@ -36,7 +36,7 @@ Picture TwoHalves(const Colour& top, const Colour& bottom) {
   return picture;
 }
 
-/// The file that a picture is encoded to.
+/// A picture encoded to a file.
 class Encoded {
  public:
   explicit Encoded(const Picture& picture, const PhotoTraits& traits = PhotoTraits(),
@@ -97,7 +97,7 @@ TEST(JpegEncoding, KeepsThePhotosSampling) {
 }
 
 TEST(JpegEncoding, IgnoresUnsupportedSampling) {
-  // 16 and 4 and 4 blocks are more than one unit may have.
+  // 16, 4 and 4 blocks are more than one unit may have.
   const Picture picture = TwoHalves({60, 80, 60}, {200, 20, 200});
   Encoded fine(picture, ColourSampled(4, 2), 90);
   EXPECT_EQ(fine.Traits().sampling[0].horizontal, 1);

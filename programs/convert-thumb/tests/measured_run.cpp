@@ -14,7 +14,7 @@ namespace {
 
 constexpr size_t kBytesPerUnit = 1024;
 
-/// What a child hands to its parent through memory that both share.
+/// Passed from a child to its parent in shared memory.
 struct Report {
   int exitCode;
   bool timedOut;
@@ -42,7 +42,7 @@ MeasuredRun RunMeasured(const std::string& path, const std::vector<std::string>&
       mmap(nullptr, sizeof(Report), PROT_READ | PROT_WRITE, MAP_SHARED | MAP_ANONYMOUS, -1, 0);
   EXPECT_NE(shared, MAP_FAILED);
   auto& report = *static_cast<Report*>(shared);
-  // In a process of its own, which has no other children.
+  // In a separate process, which has no other children.
   const pid_t child = fork();
   if (child == 0) {
     RunAndReport(path, arguments, options, report);

@@ -1,4 +1,4 @@
-// Runs a program and measures what it took.
+// Runs a program and measures its memory.
 #pragma once
 
 #include <cstddef>
@@ -9,7 +9,7 @@
 
 namespace vela_test {
 
-/// How a program ended and what it took, with all that it started and waited for.
+/// How a program ended and the memory it used, including child processes that it waited for.
 struct MeasuredRun {
   int exitCode = -1;      ///< -1 when a signal ended it
   bool timedOut = false;  ///< killed at its time limit

@@ -1,4 +1,4 @@
-// The single steps on small pictures.
+// The processing steps, one at a time, on small pictures.
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -42,17 +42,17 @@ TEST(ThumbnailSizes, FillTheBox) {
   ExpectSize(ThumbnailSize({3000, 4000}, {120, 120, true}), 120, 160);
 }
 
-TEST(ThumbnailSizes, NeverGrowAndNeverVanish) {
+TEST(ThumbnailSizes, NeverGrowAndAreNeverEmpty) {
   ExpectSize(ThumbnailSize({100, 50}, {1280, 1280, false}), 100, 50);
   ExpectSize(ThumbnailSize({100, 50}, {1280, 1280, true}), 100, 50);
   ExpectSize(ThumbnailSize({30000, 10}, {1280, 1280, false}), 1280, 1);
   ExpectSize(ThumbnailSize({1, 1}, {65535, 65535, true}), 1, 1);
 }
 
-TEST(Sharpening, TellsTheMemoryThatItTakes) {
+TEST(Sharpening, ReportsItsMemory) {
   UnsharpMask mask;
   mask.radius = 70;
-  // 141 rows as they come and as many blurred ones, of 3000 floats.
+  // 141 source rows and as many blurred ones, of 3000 floats.
   const size_t rows = size_t{2} * 141 * 3000 * sizeof(float);
   EXPECT_GE(RowSharpener::Memory({1000, 10}, 3, mask), rows);
   EXPECT_LE(RowSharpener::Memory({1000, 10}, 3, mask), rows + rows / 10);
@@ -85,7 +85,7 @@ TEST(Resizing, KeepsAPlainColour) {
   }
 }
 
-TEST(Resizing, MirrorsLikeThePicture) {
+TEST(Resizing, CommutesWithMirroring) {
   Picture picture(41, 23, 1);
   for (size_t i = 0; i < picture.samples.size(); ++i) {
     picture.samples[i] = static_cast<uint16_t>(i * 2654435761U >> 8);
@@ -104,7 +104,7 @@ TEST(Resizing, MirrorsLikeThePicture) {
   }
 }
 
-TEST(Resizing, ThinsOutWhatShrinksByMuch) {
+TEST(Resizing, PresamplesLargeReductions) {
   EXPECT_TRUE(IsPresampled({4000, 3000}, {1000, 750}));
   EXPECT_FALSE(IsPresampled({4000, 3000}, {1280, 960}));
   EXPECT_FALSE(IsPresampled({4000, 3000}, {25, 19}));
@@ -142,7 +142,7 @@ void ExpectNear(const Picture& picture, const Picture& expected, int tolerance) 
   }
 }
 
-/// Number of samples a pixel.
+/// Number of samples per pixel.
 class Channels : public ::testing::TestWithParam<int> {};
 
 TEST_P(Channels, AreScaledAlike) {
@@ -267,7 +267,7 @@ TEST(Loops, RoundToTheNearestJpegSample) {
   }
 }
 
-TEST(Loops, CutWhatLiesOutside) {
+TEST(Loops, ClampSums) {
   std::vector<float> samples(PaddedSize(5));
   const std::vector<float> values = {-5, 0, 100, 65535, 70000};
   std::copy(values.begin(), values.end(), samples.begin());
@@ -278,7 +278,7 @@ TEST(Loops, CutWhatLiesOutside) {
   EXPECT_THAT(cut, ElementsAre(0, 0, 100, 65535, 65535));
 }
 
-TEST(Loops, LayRowsSideBySideAndBack) {
+TEST(Loops, InterleaveRowsAndBack) {
   const size_t stride = PaddedSize(40);
   std::vector<float> rows(stride * kBlockRows);
   std::iota(rows.begin(), rows.end(), 0.0F);

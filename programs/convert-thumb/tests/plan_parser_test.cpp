@@ -89,7 +89,7 @@ TEST(PlanParser, RefusesALineWithAnythingMissing) {
   for (size_t i = 0; i < whole.size(); ++i) {
     std::vector<std::string> less = whole;
     less.erase(less.begin() + static_cast<std::ptrdiff_t>(i));
-    // Only this argument of the line is optional by itself.
+    // Only this argument can be omitted alone.
     EXPECT_EQ(ParseConversion(less).has_value(), whole[i] == "-auto-orient")
         << i << " " << whole[i];
   }
@@ -133,7 +133,7 @@ TEST(PlanParser, RefusesStepsInFrontOfTheScaling) {
       {"/p.jpg", "-auto-orient", "-thumbnail", "10x10>", "-quality", "80", "/o.jpg"}));
 }
 
-TEST(SourceArgument, IsTheFirstThatIsNoOption) {
+TEST(SourceArgument, IsTheFirstThatIsNotAnOption) {
   EXPECT_EQ(FindSourceArgument({"-define", "registry:temporary-path=/x", "/a.jpg", "/b.jpg"}), 2U);
   EXPECT_EQ(FindSourceArgument({"-rotate", "90", "/a.jpg", "/a.jpg"}), 2U);
   EXPECT_EQ(FindSourceArgument({"/a.jpg"}), 0U);

@@ -15,7 +15,7 @@ using namespace vela;
 
 namespace {
 
-/// Keeps the first sample of every row, up to a row that it refuses.
+/// Keeps the first sample of every row, up to a row that it rejects.
 class FirstSamples final : public RowSink {
  public:
   explicit FirstSamples(size_t refused = 1000) : refused_(refused) {}
@@ -77,7 +77,7 @@ class NoMemory final : public RowSink {
 TEST(RowQueues, ReportExceptions) {
   NoMemory sink;
   RowQueue queue(5, sink);
-  // With one processor the exception comes out of Put.
+  // With one processor, Put throws the exception.
   try {
     EXPECT_FALSE(PutRows(queue, 100) && queue.Finish());
   } catch (const std::bad_alloc&) {

@@ -50,7 +50,7 @@ class NumberedRows final : public PhotoReader {
   int next_ = 0;
 };
 
-/// How many rows arrive before one does not.
+/// Number of rows that can be read before a failure.
 int CountRows(RowsAhead& rows) {
   std::vector<float> row(kWidth);
   int count = 0;
@@ -60,7 +60,7 @@ int CountRows(RowsAhead& rows) {
       ++count;
     }
   } catch (const std::bad_alloc&) {
-    // With one processor the exception comes out of ReadRow.
+    // With one processor, ReadRow throws the exception.
     EXPECT_FALSE(HasSecondProcessor());
   }
   return count;

@@ -30,7 +30,7 @@ using namespace ::testing;
 
 constexpr size_t kMebibyte = size_t{1} << 20;
 
-/// The status that a process of its own ends with after `work`; -1 when a signal ended it.
+/// The exit status of a separate process that does `work`; -1 when a signal ended it.
 int StatusOf(const std::function<int()>& work) {
   const pid_t child = fork();
   if (child == 0) {
@@ -83,15 +83,14 @@ TEST_F(RunLimits, AreReportedWhenInvalid) {
 
 #ifndef __SANITIZE_ADDRESS__
 TEST_F(RunLimits, HoldForTheWholeProcess) {
-  EXPECT_EQ(
-      StatusOf([] {
-        LimitResources(100 * kMebibyte);
-        const rlim_t limit = LimitOf(RLIMIT_DATA).rlim_max;
-        return limit == LimitOf(RLIMIT_DATA).rlim_cur && limit > 100 * kMebibyte + kMemoryBesides
-                   ? static_cast<int>((limit - 100 * kMebibyte - kMemoryBesides) % kStackMemory)
-                   : 1;
-      }),
-      0);
+  EXPECT_EQ(StatusOf([] {
+              LimitResources(100 * kMebibyte);
+              const rlim_t limit = LimitOf(RLIMIT_DATA).rlim_max;
+              return limit == LimitOf(RLIMIT_DATA).rlim_cur && limit > 100 * kMebibyte + kBaseMemory
+                         ? static_cast<int>((limit - 100 * kMebibyte - kBaseMemory) % kStackMemory)
+                         : 1;
+            }),
+            0);
   EXPECT_EQ(StatusOf([] {
               LimitResources(100 * kMebibyte);
               std::vector<char> fits(90 * kMebibyte);
@@ -179,7 +178,7 @@ TEST_F(RunLimits, LeaveNoOutputsBeyondTheLargestFile) {
   EXPECT_EQ(ListDirectory(directory_), std::vector<std::string>{"a.jpg"});
 }
 
-TEST_F(RunLimits, LetNoOutputStartOnceTheRunIsEnding) {
+TEST_F(RunLimits, AllowNoNewOutputOnceTheRunIsEnding) {
   const std::string path = directory_ + "/late.jpg";
   const unsigned char byte = 0;
   EXPECT_EQ(StatusOf([&] {
@@ -226,7 +225,7 @@ TEST_F(RunLimits, DoNotLetAPipeBlockTheRun) {
   EXPECT_TRUE(Exists(pipe));
 }
 
-TEST_F(RunLimits, LetOutputsGoToADevice) {
+TEST_F(RunLimits, AllowOutputsToDevices) {
   const std::string photo = MakePhoto("a.jpg", 300, 200);
   const CommandLine line = Line(photo, {ThumbOptions()}, "device");
   const std::string device = line.outputs.front().path;
@@ -237,7 +236,7 @@ TEST_F(RunLimits, LetOutputsGoToADevice) {
 
 class ImageMagickLimits : public ConverterTest {
  protected:
-  /// ImageMagick's environment when the converter's has `given`.
+  /// ImageMagick's environment when `given` is added to the converter's.
   static std::string Environment(const std::vector<std::string>& given) {
     const StubTool stub(kImageMagick);
     stub.Plan(StubPlan().Run("/usr/bin/env", {}));

@@ -25,7 +25,7 @@ struct stat StatusOf(const std::string& path) {
 }
 
 /// Gives a file, or with "default" a directory for its new files, an access control list by which
-/// user 0 may read. Attributes of this kind are those that every file system of the tests has.
+/// user 0 may read. Every file system in the tests supports such attributes.
 void SetAccessList(const std::string& path, const std::string& kind) {
   struct Entry {
     uint16_t tag;
@@ -61,7 +61,7 @@ class TurnInPlace : public ConverterTest {
     return RunConverter({"-rotate", degrees, path, path});
   }
 
-  /// Makes every turn fail that the converter does not do itself.
+  /// Makes every turn fail that the converter does not perform itself.
   static void RemoveImageMagick() { RemoveTool(kImageMagick); }
 };
 
@@ -160,7 +160,7 @@ TEST_F(TurnInPlace, LeavesFilesInDirectoriesWithDefaultAccessListsToImageMagick)
 
 TEST_F(TurnInPlace, LeavesFilesOfOtherUsersToImageMagick) {
   MakeJpeg(photo_);
-  // The sandbox of an ordinary user has no other users.
+  // An ordinary user's sandbox has no other users.
   const bool isOthers = chown(photo_.c_str(), 1, 1) == 0;
   const ino_t inode = StatusOf(photo_).st_ino;
   ExpectTurned(photo_);
@@ -216,7 +216,7 @@ TEST_F(TurnInPlace, LeavesDamagedFilesToImageMagick) {
   EXPECT_EQ(ReadFile(photo_), before);
 }
 
-TEST_F(TurnInPlace, IsImageMagicksWithoutTheLibrary) {
+TEST_F(TurnInPlace, IsDoneByImageMagickWithoutTheLibrary) {
   const MissingLibrary missing("libturbojpeg");
   MakeJpeg(photo_);
   ExpectTurned(photo_);

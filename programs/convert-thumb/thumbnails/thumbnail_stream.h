@@ -27,7 +27,7 @@ class ThumbnailStream final : public RowSink {
   static bool Supports(const ConversionPlan& plan, const PhotoTraits& traits);
 
   /// `first`, `channels`: size and samples per pixel of the first thumbnail, whose rows are put
-  /// here. `traits` have to outlive this. `exact`: see LaterResizePlan.
+  /// here. `traits` must outlive this object. `exact`: see LaterResizePlan.
   ThumbnailStream(PictureSize first, int channels, const ConversionPlan& plan,
                   const PhotoTraits& traits, bool exact);
 
@@ -49,7 +49,8 @@ class ThumbnailStream final : public RowSink {
  private:
   class Splitter;
 
-  /// Both add a step and return it; its rows go to `next` or become the output.
+  /// Both add a step and return it; the step passes its rows to `next` or encodes them as an
+  /// output.
   RowSink* AddEncoder(PictureSize size, int quality, bool withProfile);
   RowSink* AddSharpening(PictureSize size, const OutputPlan& output, RowSink* next);
 
@@ -57,7 +58,7 @@ class ThumbnailStream final : public RowSink {
   const PhotoTraits& traits_;
   std::vector<std::unique_ptr<JpegEncoder>> encoders_;
   std::vector<std::unique_ptr<RowSink>> steps_;
-  /// Separates the first thumbnail from what is made of it. Declared after the steps, so that its
+  /// Separates the first thumbnail from those made from it. Declared after the steps, so that its
   /// thread ends before they are destroyed.
   std::unique_ptr<RowQueue> queue_;
   RowSink* input_ = nullptr;  ///< the first step

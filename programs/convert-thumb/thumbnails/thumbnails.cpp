@@ -38,7 +38,7 @@ void ConvertToSrgb(Thumbnail& thumbnail) {
 void Apply(const Step& step, Thumbnail& thumbnail) {
   switch (step.kind) {
     case Step::Kind::kFlatten:
-      // Has been done while reading.
+      // Already done while reading.
       break;
     case Step::Kind::kAutoOrient:
       ApplyOrientation(thumbnail.picture, thumbnail.orientation);

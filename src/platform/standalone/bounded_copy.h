@@ -7,8 +7,8 @@
 
 namespace vela {
 
-/// Copies `text` to `out` (at most `outSize` bytes, always terminated); what does not fit is cut.
-inline void CopyCut(std::string_view text, char* out, size_t outSize) {
+/// Copies `text` to `out` (at most `outSize` bytes, always terminated), truncated if necessary.
+inline void CopyTruncated(std::string_view text, char* out, size_t outSize) {
   if (out == nullptr || outSize == 0) {
     { return; }
   }

@@ -19,8 +19,8 @@ VLIBCTime ToPlatformTime(const timespec& time) {
 }
 
 /// The system gives special meanings to some nanosecond values above a second; a caller's record
-/// must not be able to contain them.
-bool IsTime(const VLIBCTime& time) {
+/// must not contain any.
+bool IsValidTime(const VLIBCTime& time) {
   return time.nanoseconds >= 0 && time.nanoseconds < kNanosecondsPerSecond;
 }
 
@@ -56,10 +56,10 @@ int VLIBCFileUTime(const char* path, int options, const VLIBCFileTimes* times) {
   }
   const bool setAccess = (options & kSetAccessTime) != 0;
   const bool setModification = (options & kSetModificationTime) != 0;
-  if (setAccess && !IsTime(times->access)) {
+  if (setAccess && !IsValidTime(times->access)) {
     return Fail(EINVAL);
   }
-  if (setModification && !IsTime(times->modification)) {
+  if (setModification && !IsValidTime(times->modification)) {
     return Fail(EINVAL);
   }
   const timespec pair[2] = {ToSystemTime(times->access, setAccess),

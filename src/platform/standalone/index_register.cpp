@@ -155,8 +155,8 @@ int ConversionTable::Store(const VELA_MEDIA_INFO& photo, const VELA_MEDIA_INFO& 
 }
 
 /// Keeps the database open between the calls of a process: opening it costs several times as much
-/// as a store. It is never closed at the end of the process, because the next program to open the
-/// database does all that closing would do.
+/// as a store. It is not closed at the end of the process, because the next program that opens the
+/// database catches up on everything that closing would do.
 class IndexRegister {
  public:
   /// Returns 0 or an errno value.

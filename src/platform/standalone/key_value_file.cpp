@@ -36,10 +36,10 @@ int FollowLink(std::string& path) {
 }
 
 /// The result of one attempt to set a value.
-enum class Attempt { kDone, kAgain };
+enum class Attempt { kDone, kRetry };
 
 int CreateWithValue(std::string& path, const char* key, const char* value, Attempt& attempt) {
-  const int error = vela::CreateWhole(path, vela::WithValue("", key, value));
+  const int error = vela::CreateAtomically(path, vela::WithValue("", key, value));
   if (error != EEXIST) {
     return error;
   }
@@ -51,7 +51,7 @@ int CreateWithValue(std::string& path, const char* key, const char* value, Attem
       return linkError;
     }
   }
-  attempt = Attempt::kAgain;
+  attempt = Attempt::kRetry;
   return 0;
 }
 
@@ -59,7 +59,7 @@ int CreateWithValue(std::string& path, const char* key, const char* value, Attem
 /// link, changes it to the link's target, because that is the file to replace.
 int CheckIdentity(std::string& path, const struct stat& locked, Attempt& attempt) {
   struct stat named;
-  attempt = Attempt::kAgain;
+  attempt = Attempt::kRetry;
   if (lstat(path.c_str(), &named) != 0) {
     return errno == ENOENT ? 0 : errno;
   }
@@ -91,7 +91,7 @@ int TrySetValue(std::string& path, const char* key, const char* value, Attempt& 
     return EINVAL;
   }
   error = CheckIdentity(path, locked, attempt);
-  if (error != 0 || attempt == Attempt::kAgain) {
+  if (error != 0 || attempt == Attempt::kRetry) {
     return error;
   }
 
@@ -100,14 +100,14 @@ int TrySetValue(std::string& path, const char* key, const char* value, Attempt& 
   if (error != 0) {
     return error;
   }
-  return vela::ReplaceWhole(path, vela::WithValue(text, key, value), locked);
+  return vela::ReplaceAtomically(path, vela::WithValue(text, key, value), locked);
 }
 
 }  // namespace
 
 int VLIBCFileGetKeyValue(const char* file, const char* key, char* out, size_t outSize,
                          int /*flags*/) {
-  vela::CopyCut("", out, outSize);
+  vela::CopyTruncated("", out, outSize);
   if (file == nullptr || key == nullptr) {
     return Fail(EINVAL);
   }
@@ -120,7 +120,7 @@ int VLIBCFileGetKeyValue(const char* file, const char* key, char* out, size_t ou
   if (!value) {
     return 0;
   }
-  vela::CopyCut(*value, out, outSize);
+  vela::CopyTruncated(*value, out, outSize);
   return 1;
 }
 
@@ -132,8 +132,8 @@ int VLIBCFileSetKeyValue(const char* file, const char* key, const char* value, i
     return Fail(EINVAL);
   }
   std::string path(file);
-  Attempt attempt = Attempt::kAgain;
-  while (attempt == Attempt::kAgain) {
+  Attempt attempt = Attempt::kRetry;
+  while (attempt == Attempt::kRetry) {
     const int error = TrySetValue(path, key, value, attempt);
     if (error != 0) {
       return Fail(error);

@@ -74,7 +74,7 @@ std::string MakeLine(std::string_view key, std::string_view value) {
 struct Line {
   size_t begin;
   size_t length;  // without the newline
-  size_t next;    // begin of the following line
+  size_t next;    // start of the following line
 };
 
 Line LineAt(std::string_view text, size_t begin) {

@@ -22,7 +22,7 @@ struct IndexedFile {
   std::string path;
   FileVersion version;
   LineIndex index;
-  bool isTooLong = false;  // too many lines for an index; another attempt would be in vain
+  bool isTooLong = false;  // too many lines for an index; another attempt would fail too
 };
 
 /// A process searches only a few files. The oldest index is replaced when there are more.

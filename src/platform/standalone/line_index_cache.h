@@ -10,9 +10,8 @@ namespace vela {
 /// there is no index of the file's present version. Thread-safe.
 std::optional<bool> FindLineInIndex(const char* path, std::string_view text);
 
-/// Creates the index of the open file `fd`, whose path is `path`, when the file is large and at
-/// rest, so that an index is worth its memory. Changes the read position. Without success there is
-/// no index.
+/// Indexes the open file `fd`, whose path is `path`, when it is large enough to be worth the memory
+/// and has not changed recently. Changes the read position. Failures are ignored.
 void IndexLines(const char* path, int fd);
 
 }  // namespace vela

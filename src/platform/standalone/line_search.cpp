@@ -119,7 +119,7 @@ int SearchFile(const char* path, std::string_view wanted, bool& isFound) {
 }  // namespace
 
 int VLIBCFileGetLine(const char* file, const char* text, char* out, size_t outSize, int /*flags*/) {
-  vela::CopyCut("", out, outSize);
+  vela::CopyTruncated("", out, outSize);
   if (file == nullptr || text == nullptr) {
     return Fail(EINVAL);
   }
@@ -136,6 +136,6 @@ int VLIBCFileGetLine(const char* file, const char* text, char* out, size_t outSi
   if (!isFound) {
     return 0;
   }
-  vela::CopyCut(wanted, out, outSize);
+  vela::CopyTruncated(wanted, out, outSize);
   return static_cast<int>(wanted.size());
 }

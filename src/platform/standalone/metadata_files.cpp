@@ -68,7 +68,7 @@ bool ExamineRegularFile(const DerivedPath& path, EAFileStatus& out) {
   return true;
 }
 
-/// Returns whether anything has the name, even a link without a target.
+/// Returns whether any file has the name, even a dangling link.
 bool Exists(const DerivedPath& path) {
   struct stat status;
   return lstat(path.Get(), &status) == 0;

@@ -5,14 +5,14 @@
 
 namespace vela {
 
-/// Returns the last component of `path`: what follows its last slash.
+/// Returns the last component of `path`: the text after its last slash.
 constexpr std::string_view LastComponentOf(std::string_view path) {
   const size_t slash = path.rfind('/');
   return slash == std::string_view::npos ? path : path.substr(slash + 1);
 }
 
-/// Returns what follows the last dot of the last component; without a dot, an empty text at the end
-/// of `path`.
+/// Returns the text after the last dot of the last component; without a dot, an empty text at the
+/// end of `path`.
 constexpr std::string_view ExtensionOf(std::string_view path) {
   const std::string_view name = LastComponentOf(path);
   const size_t dot = name.rfind('.');

@@ -38,7 +38,7 @@ class PipedChildren {
     children_.push_back(std::move(child));
   }
 
-  /// Removes and returns the child of `stream`; one without a stream when there is none.
+  /// Removes and returns the child of `stream`; an empty one when there is none.
   PipedChild Take(const FILE* stream) {
     const std::lock_guard<std::mutex> lock(mutex_);
     const auto found = std::find_if(children_.begin(), children_.end(),
@@ -62,7 +62,7 @@ PipedChildren& OpenChildren() {
   return *children;
 }
 
-/// Kills a child that the caller does not get.
+/// Kills a child that is not returned to the caller.
 void Discard(PipedChild& child) {
   kill(child.pid, SIGKILL);
   vela::ReapChild(child.pid);

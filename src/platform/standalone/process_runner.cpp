@@ -68,7 +68,7 @@ int ResultOf(int status) {
 int Finish(pid_t pid, const std::string& program) {
   const std::chrono::seconds limit = vela::CurrentSettings().toolTimeout;
   if (limit.count() != 0 && !vela::AwaitChildFor(pid, limit)) {
-    vela::EndOverdueChild(pid, program.c_str(), limit);
+    vela::KillOverdueChild(pid, program.c_str(), limit);
   }
   return ResultOf(vela::ReapChild(pid));
 }

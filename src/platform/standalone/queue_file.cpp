@@ -39,8 +39,8 @@ int OpenQueue(const char* path, FileDescriptor& file) {
     if (errno != EEXIST) {
       return errno;
     }
-    // The path is a link without a target, which is left alone, or another writer has just created
-    // the file, which may be renamed again at any time.
+    // The path is a dangling link, which is left alone, or another writer has just created the
+    // file, which may be renamed again at any time.
     struct stat status;
     if (lstat(path, &status) == 0 && S_ISLNK(status.st_mode)) {
       return ENOENT;

@@ -16,7 +16,7 @@ namespace vela {
 
 namespace {
 
-/// Parses a text of decimal digits only. Returns the largest number for one that does not fit.
+/// Parses a text of decimal digits only. A number that does not fit becomes the largest one.
 std::optional<uint32_t> ParseNumber(std::string_view text) {
   uint32_t number = 0;
   const char* end = text.data() + text.size();

@@ -14,7 +14,7 @@ class VideoContainer {
   VideoContainer& operator=(const VideoContainer&) = delete;
   ~VideoContainer();
 
-  /// Opens the regular file `path` and reads its headers. To be called once and before the other
+  /// Opens the regular file `path` and reads its headers. Must be called once, before the other
   /// functions. Returns 0 or an errno value, EINVAL for a file that is not a video container and
   /// ELIBACC without libavformat.
   int Open(const char* path);
@@ -26,8 +26,8 @@ class VideoContainer {
   /// same as Open, and EINVAL when there is no video stream.
   int OpenWithVideo(const char* path);
 
-  /// Returns the first video stream that is not the cover picture of a piece of music; null when
-  /// none is known.
+  /// Returns the first video stream that is not the cover art of an audio file; null when none is
+  /// known.
   const AVStream* VideoStream() const;
 
   /// Returns the first audio stream; null when none is known.

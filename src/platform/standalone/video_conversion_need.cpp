@@ -41,8 +41,8 @@ bool IsMp4(const VideoContainer& container) {
   return brand != nullptr && std::strcmp(brand->value, kQuickTimeBrand) != 0;
 }
 
-/// All Matroska files have the same format in libavformat, and a web server chooses the media type
-/// by the name.
+/// All Matroska files have the same format in libavformat, and web servers choose the media type by
+/// the file name.
 bool IsWebm(const VideoContainer& container, const char* path) {
   return HasFormat(container, "webm") && strcasecmp(VELAIndexExtGet(path), "webm") == 0;
 }

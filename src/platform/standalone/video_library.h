@@ -15,7 +15,7 @@ namespace vela {
 class VideoLibrary final : private LoadedLibrary {
  public:
   /// Returns the library, which the first call loads; null when it or one of its functions is
-  /// missing. Its own messages are switched off.
+  /// missing. Its messages are turned off.
   static const VideoLibrary* Get();
 
   decltype(&::avformat_open_input) openInput = nullptr;

@@ -1,4 +1,4 @@
-// For platforms whose library has no FindEAFile of its own.
+// For platforms whose library lacks FindEAFile.
 #include <string>
 
 #include "platform/velaindex.h"
@@ -22,7 +22,7 @@ const char* FindEAFile(const char* eaDir, const char* name, const char* oldName,
   if (VLIBCFileStat(path.c_str(), kStatusOptions, &file) == 0) {
     status->modified = file.modification.seconds;
   } else {
-    // A file that was removed in between is outdated: an empty one always is.
+    // A file removed in between is reported as empty, which counts as outdated.
     *status = {};
   }
   return found;

@@ -21,7 +21,7 @@ struct TimesCall {
 
 struct FakeFiles {
   VLIBCFileStatus status = {};
-  std::vector<int> results;  ///< of the calls in order, then 0
+  std::vector<int> results;  ///< of the calls in order; later calls return 0
   std::vector<std::string> questions;
   std::vector<TimesCall> times;
   int timesResult = 0;
@@ -52,7 +52,7 @@ using ::testing::Field;
 using ::testing::IsEmpty;
 using ::testing::SizeIs;
 
-constexpr const char* kPhoto = "/tmp/photo/a.jpg";  // never made: only the platform knows it
+constexpr const char* kPhoto = "/tmp/photo/a.jpg";  // never created: known only to the platform
 
 auto IsTime(int64_t seconds, int64_t nanoseconds) {
   return AllOf(Field(&VLIBCTime::seconds, seconds), Field(&VLIBCTime::nanoseconds, nanoseconds));
@@ -108,7 +108,7 @@ TEST_F(FileStatus, AThumbOfAPhotoFromTheFutureGetsThreeTimes) {
   g_files.status.access = {11, 12};
   g_files.status.modification = {future, 22};
   g_files.status.change = {31, 32};
-  g_files.timesResult = -1;  // which is no failure of the commit
+  g_files.timesResult = -1;  // not a failure of the commit
   EXPECT_EQ(Run(), 0);
   ASSERT_THAT(g_files.times, SizeIs(1));
   const TimesCall& call = g_files.times.front();

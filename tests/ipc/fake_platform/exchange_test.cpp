@@ -1,5 +1,5 @@
-// What the client passes to the platform, and how it interprets what the platform leaves in the
-// packet. The exchange is faked.
+// What the client passes to the platform, and how it interprets the packet that the platform
+// returns. The exchange is faked.
 
 #include "ipc/client_operations.h"
 
@@ -13,7 +13,7 @@ struct ExchangeCall {
   int timeoutSeconds;
 };
 
-/// What the fake does and what it was given.
+/// The behaviour of the fake and the calls it received.
 struct FakeExchange {
   bool leavePacket = false;  ///< the exchange leaves the request in place
   Json::Value reply;

@@ -1,4 +1,4 @@
-// The profiles of a directory with a faked index library, which knows its size map or does not.
+// The profiles of a directory with a faked index library that may or may not return its size map.
 #include "platform/velaindex.h"
 #include "profiles/thumbnail_profile.h"
 #include "support/profile_file.h"
@@ -12,7 +12,7 @@ struct FakeSizeMaps {
   int result = 0;
   bool writes = true;
   int32_t sizeMap = 0;
-  int32_t before = -77;  ///< what the caller's variable held
+  int32_t before = -77;  ///< previous value of the caller's variable
   std::vector<std::string> questions;
 };
 

@@ -15,7 +15,7 @@ namespace {
 struct FakeChild {
   std::vector<std::string> started;  ///< each call as one line
   int closed = 0;
-  std::string path;  ///< what the stream reads, no stream when empty
+  std::string path;  ///< path that the stream reads, no stream when empty
 };
 
 FakeChild g_child;

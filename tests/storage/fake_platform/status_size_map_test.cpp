@@ -1,4 +1,4 @@
-// The thumbnail status and the scans with the size maps of a faked index library.
+// Thumbnail status and scans with size maps from a faked index library.
 #include "platform/velaindex.h"
 #include "storage/velamk_thumb_status.h"
 #include "support/files.h"

@@ -1,5 +1,5 @@
 // The order in which the checks for converted videos call the index library, and how they handle
-// answers that no real video leads to. The library is faked.
+// answers that no real video causes. The library is faked.
 #include <json/value.h>
 
 #include <cstdint>
@@ -269,7 +269,7 @@ TEST_F(VideoSearch, OfAnUprightVideoForBrowsers) {
   EXPECT_EQ(CallsOf(IsWebVideoConverted, 0), all);
   Put({kH264});
   EXPECT_EQ(CallsOf(IsWebVideoConverted, 1), all + Calls{kRecord});
-  // Each of the others ends the search at its place.
+  // Each of the others ends the search at its position.
   size_t place = all.size() - 1;
   for (const std::string& video : {kFlash, kIphone, kMobile, kLow, kMedium, kHigh}) {
     SCOPED_TRACE(video);

@@ -1,4 +1,4 @@
-// The daemon peer, seen from the other end of its socket.
+// The daemon peer, tested from the other end of its socket.
 #include "support/daemon_peer.h"
 
 #include <gmock/gmock.h>
@@ -39,7 +39,7 @@ class Client {
     send(socket_.Get(), bytes.data(), bytes.size(), MSG_NOSIGNAL);
   }
 
-  /// Everything up to the end of the connection; the number of pieces it came in.
+  /// Reads up to the end of the connection; stores the number of pieces received.
   std::string ReadAll(int* pieces = nullptr) const {
     std::string all;
     char buffer[65536];
@@ -53,7 +53,7 @@ class Client {
     return all;
   }
 
-  bool SomethingComesWithin(int milliseconds) const {
+  bool ReceivesWithin(int milliseconds) const {
     pollfd waiting = {socket_.Get(), POLLIN, 0};
     return poll(&waiting, 1, milliseconds) > 0;
   }
@@ -95,7 +95,7 @@ TEST_F(DaemonPeerTest, RequestMayComeInPieces) {
   const DaemonPeer daemon;
   const Client client;
   client.Send("{\"command\":");
-  EXPECT_FALSE(client.SomethingComesWithin(20));
+  EXPECT_FALSE(client.ReceivesWithin(20));
   client.Send("\"A\"}\n");
   EXPECT_EQ(client.ReadAll(), "{\"success\":true}\n");
   EXPECT_EQ(daemon.Requests()[0].bytes, "{\"command\":\"A\"}\n");
@@ -124,18 +124,18 @@ TEST_F(DaemonPeerTest, ClosesEarly) {
   EXPECT_EQ(daemon.Connections(), 2U);
 }
 
-TEST_F(DaemonPeerTest, KeepsSilent) {
+TEST_F(DaemonPeerTest, CanStaySilent) {
   DaemonPeer daemon;
   daemon.AnswerNext(DaemonReply::Silence());
   daemon.AnswerNext(DaemonReply::BytesThenSilence("{\"succ"));
   const Client silent;
   silent.Send(kVersionRequest);
   ASSERT_TRUE(daemon.WaitForRequests(1));
-  EXPECT_FALSE(silent.SomethingComesWithin(50));
+  EXPECT_FALSE(silent.ReceivesWithin(50));
   const Client half;
   half.Send(kVersionRequest);
-  EXPECT_TRUE(half.SomethingComesWithin(10000));
-  // Others are answered meanwhile.
+  EXPECT_TRUE(half.ReceivesWithin(10000));
+  // Other requests are answered meanwhile.
   EXPECT_EQ(Ask(kVersionRequest), "{\"success\":true,\"version\":0}\n");
 }
 

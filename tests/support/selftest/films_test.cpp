@@ -1,4 +1,4 @@
-// The film makers, held against what a player shows.
+// The video makers, compared with the output of a player.
 #include "support/films.h"
 
 #include <gtest/gtest.h>
@@ -15,7 +15,7 @@ namespace {
 
 class FilmsTest : public SandboxTest {};
 
-/// What a player shows of the film: its size and the letters of its quadrants.
+/// The size of the video in a player, and the letters of its quadrants.
 std::string ShownBy(const std::string& path) {
   const ProgramResult result =
       RunProgram("/usr/bin/ffmpeg", {"-v", "error", "-y", "-i", "file:" + path, "-frames:v", "1",

@@ -1,4 +1,4 @@
-// The image makers and the checks, each held against an independent tool.
+// The image makers and the checks, each compared with an independent tool.
 #include "support/images.h"
 
 #include <gmock/gmock.h>
@@ -176,7 +176,7 @@ TEST_F(ImagesTest, OtherFormatsByExtension) {
   EXPECT_EQ(Identify(MakePpm("/tmp/a.ppm")).format, "PPM");
 }
 
-TEST_F(ImagesTest, WhatIsNoImageHasNoIdentity) {
+TEST_F(ImagesTest, OtherFilesHaveNoIdentity) {
   WriteFile("/tmp/a.jpg", "no picture");
   EXPECT_EQ(Identify("/tmp/a.jpg").format, "");
 }

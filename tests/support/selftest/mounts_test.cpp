@@ -95,7 +95,7 @@ TEST_F(MountsTest, ObjectsThatOutliveAResetLeaveTheSandboxWhole) {
   EXPECT_FALSE(Exists("/tmp/file"));
 }
 
-TEST_F(MountsTest, ResetTakesOffWhatIsLeftMounted) {
+TEST_F(MountsTest, ResetUnmountsLeftoverMounts) {
   const SmallVolume volume("/var/spool/volume", 1 << 20);
   const SmallVolume database("/var/lib/velaindex", 1 << 20);
   const ReadOnlyMount etc("/etc");

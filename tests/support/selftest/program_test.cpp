@@ -1,4 +1,4 @@
-// Running programs and provoking faults in them.
+// Running programs and causing faults in them.
 #include "support/program.h"
 
 #include <fcntl.h>

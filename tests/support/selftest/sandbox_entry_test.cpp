@@ -1,5 +1,5 @@
-// How a test program enters the sandbox and how it ends, seen from outside with a program of its
-// own.
+// How a test program enters the sandbox and how it ends, tested from outside with a separate
+// program.
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <signal.h>

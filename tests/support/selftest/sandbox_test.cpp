@@ -39,7 +39,7 @@ TEST_F(Sandbox, PrivatePlacesAreEmptyAndWritable) {
   EXPECT_FALSE(Exists("/var/lib/velaindex"));
 }
 
-TEST_F(Sandbox, WhatIsWrittenDoesNotReachTheMachine) {
+TEST_F(Sandbox, WritesDoNotReachTheMachine) {
   const std::string name = "vela_sandbox_test_" + std::to_string(getpid());
   for (const std::string place : {"/tmp/", "/run/", "/var/spool/", "/etc/velainfo.conf.", "/etc/",
                                   "/usr/bin/", "/usr/vela/", "/var/lib/", "/dev/shm/"}) {
@@ -63,7 +63,7 @@ TEST_F(Sandbox, ConfigurationFileCanBeReplacedByRename) {
   EXPECT_EQ(ReadFile("/etc/velainfo.conf"), "key=\"value\"\n");
 }
 
-TEST_F(Sandbox, ToolsCanBeTakenAwayAndReplaced) {
+TEST_F(Sandbox, ToolsCanBeRemovedAndReplaced) {
   ASSERT_TRUE(Exists("/usr/bin/env"));
   ASSERT_EQ(unlink("/usr/bin/env"), 0);
   EXPECT_FALSE(Exists("/usr/bin/env"));

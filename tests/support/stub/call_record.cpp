@@ -101,7 +101,7 @@ std::vector<std::string> Surroundings() {
 
 uint64_t RecordStart(const StubCommandLine& line, uint64_t number,
                      const std::vector<std::string>& surroundings) {
-  const uint64_t sequence = CountUp(kStubSequenceFile);
+  const uint64_t sequence = IncrementCounter(kStubSequenceFile);
   Fields fields = {"event",     "start",
                    "tool",      line.tool,
                    "path",      line.path,
@@ -114,7 +114,7 @@ uint64_t RecordStart(const StubCommandLine& line, uint64_t number,
 
 void RecordEnd(uint64_t startSequence) {
   Append({"event", "end", "start", std::to_string(startSequence), "sequence",
-          std::to_string(CountUp(kStubSequenceFile)), "time", Now()});
+          std::to_string(IncrementCounter(kStubSequenceFile)), "time", Now()});
 }
 
 void RecordProblem(const std::string& tool, const std::string& problem) {

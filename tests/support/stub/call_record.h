@@ -1,4 +1,4 @@
-// What a stub writes down of its call.
+// What a stub records about its call.
 #pragma once
 
 #include <cstdint>

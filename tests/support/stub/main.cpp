@@ -1,5 +1,4 @@
-// The recording stub: writes its call down, does what the test has planned for it, writes its end
-// down.
+// The recording stub: records its call, performs the test's plan, and records its end.
 #include <cstdio>
 
 #include "support/stub/call_record.h"
@@ -12,7 +11,7 @@ int main(int argc, char** argv) {
   using namespace vela_test;
   const std::vector<std::string> surroundings = Surroundings();
   const StubCommandLine line = ReadCommandLine(argc, argv);
-  const uint64_t number = CountUp(StubToolDirectory(line.tool) + "/calls");
+  const uint64_t number = IncrementCounter(StubToolDirectory(line.tool) + "/calls");
   const uint64_t sequence = RecordStart(line, number, surroundings);
   const auto plan = PlanFor(line, number);
   if (number == 0 || sequence == 0 || !plan) {

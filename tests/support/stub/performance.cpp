@@ -32,7 +32,7 @@ std::string SmallJpeg(const StubOutput& output) {
   return GreyJpeg(output.width, output.height);
 }
 
-/// The JPEG cut or filled up to so many bytes.
+/// The JPEG truncated or padded to this number of bytes.
 std::string JpegOfSize(const StubOutput& output, size_t bytes) {
   std::string content = SmallJpeg(output);
   content.resize(bytes);

@@ -10,10 +10,10 @@
 
 namespace vela_test {
 
-/// One call of a stub on its way through its plan.
+/// Performs the plan of one call.
 class Performance {
  public:
-  /// `beforeEnd` is called before the process is ended by a signal of its own.
+  /// `beforeEnd` is called before the process ends itself by a signal.
   Performance(const StubCommandLine& line, std::function<void()> beforeEnd);
 
   /// Performs all steps up to the end or an Exit; returns the exit status: that of the Exit or of

@@ -1,4 +1,4 @@
-// Which of the plans that the test has written is for this call.
+// Chooses the plan for this call from those of the test.
 #pragma once
 
 #include <cstdint>

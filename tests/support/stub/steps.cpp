@@ -99,7 +99,7 @@ int FillUp(const std::string& path) {
   }
   const unsigned long used = (volume.f_blocks - volume.f_bfree) * volume.f_frsize;
   if (used == 0) {
-    return EINVAL;  // the kernel takes a size of 0 for no limit
+    return EINVAL;  // for the kernel, a size of 0 means no limit
   }
   const std::string options = "size=" + std::to_string(used);
   return ErrorOf(mount("tmpfs", path.c_str(), "tmpfs", MS_REMOUNT | MS_NOSUID, options.c_str()));

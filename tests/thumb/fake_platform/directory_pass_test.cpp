@@ -1,5 +1,5 @@
-// The pass over a directory: the check of the volume's free space, photos that go away meanwhile,
-// and the registration.
+// The pass over a directory: the check of the volume's free space, photos that are removed
+// meanwhile, and the registration.
 #include "thumb/directory_pass.h"
 
 #include <limits>
@@ -55,7 +55,7 @@ TEST_P(EnoughSpace, GoesOn) {
   EXPECT_THAT(ErrorLines(), IsEmpty());
 }
 
-// The last but one has its low 32 bits all 0, the last would be negative with a sign.
+// The low 32 bits of the last but one are 0; the last would be negative as a signed number.
 INSTANTIATE_TEST_SUITE_P(Bytes, EnoughSpace,
                          ::testing::Values(kThreshold, kThreshold + 1, uint64_t{1} << 32,
                                            std::numeric_limits<uint64_t>::max()));
@@ -76,9 +76,9 @@ TEST_P(TooLittleSpace, Stops) {
 
 INSTANTIATE_TEST_SUITE_P(Bytes, TooLittleSpace, ::testing::Values(kThreshold - 1, 1, 0));
 
-using SpaceQuestion = Pass;
+using FreeSpaceCheck = Pass;
 
-TEST_F(SpaceQuestion, IsAskedOfTheDirectoryOnceForEachPhoto) {
+TEST_F(FreeSpaceCheck, IsAskedOfTheDirectoryOnceForEachPhoto) {
   PutPhotos({"a.jpg", "b.jpg"});
   std::vector<std::string> asked;
   const FreeSpaceFake space([&](const std::string& path) {
@@ -90,7 +90,7 @@ TEST_F(SpaceQuestion, IsAskedOfTheDirectoryOnceForEachPhoto) {
   EXPECT_EQ(Conversions(), 4U);
 }
 
-TEST_F(SpaceQuestion, IsNotAskedForAPhotoThatNeedsNothing) {
+TEST_F(FreeSpaceCheck, IsNotAskedForAPhotoThatNeedsNothing) {
   WriteFile("/etc/velainfo.conf", "photo_thumb_size_map=\"16\"\n");
   PutPhotos({"a.jpg"});
   WriteFile(Thumb("XL"), "xx");
@@ -102,9 +102,9 @@ TEST_F(SpaceQuestion, IsNotAskedForAPhotoThatNeedsNothing) {
   EXPECT_THAT(Requests(), ElementsAre("POST_PHOTO_CONVERT"));
 }
 
-TEST_F(SpaceQuestion, IsAskedBeforeThePhaseIsChosen) {
+TEST_F(FreeSpaceCheck, IsAskedBeforeThePhaseIsChosen) {
   // The size map asks for more kinds than the profiles make: nothing is left to be made, but that
-  // is found out after the question.
+  // is detected after the free space has been checked.
   PutPhotos({"a.jpg"});
   for (const char* sizeClass : {"XL", "M", "B", "S"}) {
     WriteFile(Thumb(sizeClass), "xx");
@@ -117,7 +117,7 @@ TEST_F(SpaceQuestion, IsAskedBeforeThePhaseIsChosen) {
   EXPECT_THAT(ErrorLines(), ElementsAre(std::string(kNearlyFull) + kPhoto));
 }
 
-TEST_F(SpaceQuestion, StopsBeforeTheNextPhotoAndStillQueues) {
+TEST_F(FreeSpaceCheck, StopsBeforeTheNextPhotoAndStillQueues) {
   PutPhotos({"a.jpg", "b.jpg", "c.jpg"});
   int asked = 0;
   const FreeSpaceFake space(
@@ -130,11 +130,11 @@ TEST_F(SpaceQuestion, StopsBeforeTheNextPhotoAndStillQueues) {
   EXPECT_THAT(ErrorLines(), ElementsAre(std::string(kNearlyFull) + "/tmp/photos/b.jpg"));
 }
 
-/// A photo that goes away between its first examination and its conversion.
+/// A photo that is removed between its first examination and its conversion.
 class LostPhoto : public Pass {
  protected:
   /// Runs the pass over a.jpg and b.jpg; `lose` is called with the path of a.jpg when the free
-  /// space is asked for on its behalf.
+  /// space is checked for it.
   void RunAndLose(const std::function<void(const char*)>& lose) const {
     PutPhotos({"a.jpg"});
     PutPhotos({"b.jpg"});

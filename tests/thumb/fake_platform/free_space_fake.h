@@ -1,4 +1,4 @@
-// Plays the platform's answer about free space. For the one source file of a test program.
+// Replaces the platform's query of free space. For test programs with a single source file.
 #pragma once
 
 #include <cstdint>
@@ -11,7 +11,8 @@
 
 namespace vela_test {
 
-/// Answers VLIBGetFsAvailSize for as long as the object lives; without one a volume has plenty.
+/// Determines the result of VLIBGetFsAvailSize while the object exists; without one, volumes have
+/// plenty of space.
 class FreeSpaceFake {
  public:
   using Answer = std::function<uint64_t(const std::string& path)>;

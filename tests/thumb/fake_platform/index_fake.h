@@ -1,4 +1,4 @@
-// Plays the index library's registration. For the one source file of a test program.
+// Replaces the index library's registration. For test programs with a single source file.
 #pragma once
 
 #include <json/value.h>
@@ -16,8 +16,8 @@ struct Registration {
   Json::Value extra;
 };
 
-/// Records the calls for as long as the object lives and gives `result` to each; without one they
-/// succeed and are forgotten.
+/// Records the calls while the object exists and returns `result` from each; without one they
+/// succeed and are not recorded.
 class IndexFake {
  public:
   explicit IndexFake(int result = 0) : result_(result) { Current() = this; }

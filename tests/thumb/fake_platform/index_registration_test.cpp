@@ -1,4 +1,4 @@
-// The registration of a made thumbnail with the index.
+// The registration of a new thumbnail with the index.
 #include "thumb/index_registration.h"
 
 #include <cstring>
@@ -41,10 +41,10 @@ TEST_F(Registering, PassesPhotoAndThumbnailWithTheirSizes) {
   EXPECT_THAT(ErrorLines(), IsEmpty());
 }
 
-TEST_F(Registering, LeavesEverythingElseZero) {
+TEST_F(Registering, SetsOtherFieldsToZero) {
   MakeSized(kPhoto, 64, 48);
   MakeSized(kThumb, 20, 30);
-  // Whatever lay there before on the stack.
+  // Fills the stack with other values first.
   RegisterThumbConversion(kPhoto, kThumb);
   RegisterThumbConversion(kPhoto, kThumb);
   ASSERT_THAT(index_.Calls(), SizeIs(2));

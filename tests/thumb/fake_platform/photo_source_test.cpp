@@ -28,7 +28,7 @@ class PhotoSource : public PassTest {
     daemon_.emplace();
   }
 
-  /// Puts a photo dated at this distance from now, seconds.
+  /// Makes a photo dated this number of seconds from now.
   static void PutPhoto(const std::string& path, int64_t secondsFromNow = -60) {
     MakeJpeg(path);
     SetFileTimeFromNow(path, secondsFromNow);
@@ -44,7 +44,7 @@ class PhotoSource : public PassTest {
     return sources;
   }
 
-  /// The turns that each call is to make, in degrees.
+  /// The rotations requested in each call, in degrees.
   std::vector<std::vector<std::string>> Turns() const {
     std::vector<std::vector<std::string>> turns;
     for (const StubCall& call : converter_->Calls()) {
@@ -198,7 +198,7 @@ class OrdinarySource : public PhotoSource {
   }
 };
 
-TEST_F(OrdinarySource, IsNotDecodedAndStays) {
+TEST_F(OrdinarySource, IsNeitherDecodedNorRemoved) {
   RunPass();
   EXPECT_THAT(source_.decodings, IsEmpty());
   EXPECT_TRUE(Exists(kPhoto));

@@ -1,5 +1,5 @@
-// Plays the preparation of a photo: the decoding of camera raw photos and the search for the turn
-// that an owner gave a photo. For the one source file of a test program.
+// Replaces the preparation of a photo: the decoding of camera raw photos and the detection of a
+// user's rotation. For test programs with a single source file.
 #pragma once
 
 #include <functional>
@@ -14,11 +14,11 @@
 
 namespace vela_test {
 
-/// Answers for as long as the object lives; without one no raw photo can be decoded and no photo is
-/// turned.
+/// Determines the results while the object exists; without one no raw photo can be decoded and no
+/// photo is turned.
 class SourceFake {
  public:
-  /// One question, with the two paths it was asked with and the number of profiles of its job.
+  /// One call: its two paths and the number of profiles in its job.
   struct Question {
     std::string path;
     std::string metadataDir;

@@ -8,7 +8,7 @@ namespace {
 
 struct Entry {
   const char* format;
-  const char* says;
+  const char* description;
   const char* vector;  ///< "": all
   LikenessException kind;
   const char* why;
@@ -34,18 +34,18 @@ constexpr std::array kEntries = {
     Entry{"Camera", "phone_12mp.heic", "", LikenessException::kSurroundings, kLostProfile},
 };
 
-bool IsAbout(const Entry& entry, const std::string& format, const std::string& says,
+bool IsAbout(const Entry& entry, const std::string& format, const std::string& description,
              const std::string& vector) {
-  return format == entry.format && says == entry.says &&
+  return format == entry.format && description == entry.description &&
          (*entry.vector == '\0' || vector == entry.vector);
 }
 
 }  // namespace
 
-KnownDifference KnownDifferenceOf(const std::string& format, const std::string& says,
+KnownDifference KnownDifferenceOf(const std::string& format, const std::string& description,
                                   const std::string& vector) {
   const auto* const found = std::find_if(kEntries.begin(), kEntries.end(), [&](const Entry& entry) {
-    return IsAbout(entry, format, says, vector);
+    return IsAbout(entry, format, description, vector);
   });
   return found == kEntries.end() ? KnownDifference() : KnownDifference{found->kind, found->why};
 }

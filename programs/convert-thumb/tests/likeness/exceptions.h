@@ -7,8 +7,8 @@ namespace vela_test {
 
 enum class LikenessException {
   kNone,
-  kSucceeds,      ///< we make thumbnails where ImageMagick fails
-  kFails,         ///< we fail where ImageMagick makes thumbnails
+  kSucceeds,      ///< ours succeeds, ImageMagick fails
+  kFails,         ///< ours fails, ImageMagick succeeds
   kUpright,       ///< ours is upright, ImageMagick's is not rotated
   kSurroundings,  ///< something other than the pixels differs
 };
@@ -19,7 +19,7 @@ struct KnownDifference {
 };
 
 /// The known difference of an input (its format and description) with a vector.
-KnownDifference KnownDifferenceOf(const std::string& format, const std::string& says,
+KnownDifference KnownDifferenceOf(const std::string& format, const std::string& description,
                                   const std::string& vector);
 
 }  // namespace vela_test

@@ -10,8 +10,8 @@ namespace {
 
 // PNG
 
-LikenessSource Png(const std::string& says, FileMaker make) {
-  return {"PNG", says, "png", std::move(make), {kSix, kFill, kTurned, kBare}};
+LikenessSource Png(const std::string& description, FileMaker make) {
+  return {"PNG", description, "png", std::move(make), {kSix, kFill, kTurned, kBare}};
 }
 
 LikenessSource LargePng(LikenessSource source) {
@@ -62,7 +62,7 @@ void AddPngChunks(std::vector<LikenessSource>& sources) {
   sources.push_back(Png("orientation 6", WithOrientation(6)));
 }
 
-/// The data counts, not the name.
+/// The format is detected from the data, not from the name.
 LikenessSource Misnamed() {
   LikenessSource source = Png("under the name of a JPEG", [](const std::string& path) {
     Written({"-depth", "8"})(path + ".png");
@@ -74,8 +74,8 @@ LikenessSource Misnamed() {
 
 // TIFF
 
-LikenessSource Tiff(const std::string& says, FileMaker make) {
-  return {"TIFF", says, "tif", std::move(make), {kSix, kFill, kBare}};
+LikenessSource Tiff(const std::string& description, FileMaker make) {
+  return {"TIFF", description, "tif", std::move(make), {kSix, kFill, kBare}};
 }
 
 void AddTiffLayouts(std::vector<LikenessSource>& sources) {
@@ -111,9 +111,9 @@ void AddTiffColours(std::vector<LikenessSource>& sources) {
   sources.push_back(Tiff("Lab", Written({"-colorspace", "Lab", "-depth", "8"})));
 }
 
-LikenessSource Pages(const std::string& says, bool firstPage) {
+LikenessSource Pages(const std::string& description, bool firstPage) {
   LikenessSource source =
-      Tiff(says, Written({"-depth", "8", "(", "+clone", "-negate", "-resize", "50%", ")"}));
+      Tiff(description, Written({"-depth", "8", "(", "+clone", "-negate", "-resize", "50%", ")"}));
   source.firstPage = firstPage;
   source.vectors = {kSix, kSingle};
   return source;
@@ -121,12 +121,12 @@ LikenessSource Pages(const std::string& says, bool firstPage) {
 
 // GIF and WebP
 
-LikenessSource Gif(const std::string& says, FileMaker make) {
-  return {"GIF", says, "gif", std::move(make), {kSix, kFill, kBare}};
+LikenessSource Gif(const std::string& description, FileMaker make) {
+  return {"GIF", description, "gif", std::move(make), {kSix, kFill, kBare}};
 }
 
-LikenessSource WebP(const std::string& says, FileMaker make) {
-  return {"WebP", says, "webp", std::move(make), {kSix, kFill, kTurned, kBare}};
+LikenessSource WebP(const std::string& description, FileMaker make) {
+  return {"WebP", description, "webp", std::move(make), {kSix, kFill, kTurned, kBare}};
 }
 
 LikenessSource Animation(LikenessSource source, bool firstPage) {
@@ -142,27 +142,27 @@ FileMaker Frames() {
 
 // The other formats
 
-LikenessSource Netpbm(const std::string& says, const char* extension, FileMaker make) {
-  return {"Netpbm", says, extension, std::move(make), {kSix, kFill, kTurned, kBare}};
+LikenessSource Netpbm(const std::string& description, const char* extension, FileMaker make) {
+  return {"Netpbm", description, extension, std::move(make), {kSix, kFill, kTurned, kBare}};
 }
 
-LikenessSource Heif(const std::string& says, const char* extension, FileMaker make) {
-  return {"HEIF", says, extension, std::move(make), {kSix, kFill, kBare}};
+LikenessSource Heif(const std::string& description, const char* extension, FileMaker make) {
+  return {"HEIF", description, extension, std::move(make), {kSix, kFill, kBare}};
 }
 
-LikenessSource Other(const std::string& format, const std::string& says, const char* extension,
-                     FileMaker make) {
-  return {format, says, extension, std::move(make), {kSix, kFill}};
+LikenessSource Other(const std::string& format, const std::string& description,
+                     const char* extension, FileMaker make) {
+  return {format, description, extension, std::move(make), {kSix, kFill}};
 }
 
-/// ImageMagick's picture of all layers with inks depends on what its memory held before.
+/// ImageMagick's picture of all CMYK layers depends on uninitialised memory.
 LikenessSource FirstLayer(LikenessSource source) {
   source.firstPage = true;
   return source;
 }
 
 LikenessSource LargeRaw() {
-  // What a decoded camera raw looks like.
+  // Like a decoded camera raw file.
   LikenessSource source =
       Netpbm("PPM, 16 bits, 6 megapixels", "ppm", Written({"-depth", "16"}, {3000, 2000}));
   source.isLarge = true;

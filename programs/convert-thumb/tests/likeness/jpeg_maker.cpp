@@ -70,7 +70,7 @@ void SetInput(const Samples& picture, JpegColours colours, jpeg_compress_struct*
 
 void SetSampling(const JpegKind& kind, jpeg_compress_struct* encoder) {
   for (int i = 0; i < encoder->num_components; ++i) {
-    // Black is as fine as luma.
+    // Black has the same resolution as luma.
     const bool isFine = i == 0 || i == 3;
     encoder->comp_info[i].h_samp_factor = isFine && encoder->num_components > 1 ? kind.across : 1;
     encoder->comp_info[i].v_samp_factor = isFine && encoder->num_components > 1 ? kind.down : 1;
@@ -97,7 +97,7 @@ void SetKind(const JpegKind& kind, jpeg_compress_struct* encoder) {
   }
 }
 
-/// An EXIF block that says nothing but the orientation.
+/// An EXIF block that contains only the orientation.
 std::string ExifOf(int orientation) {
   std::string block("Exif\0\0MM\0\x2a\0\0\0\x08\0\x01\x01\x12\0\x03\0\0\0\x01\0\0\0\0\0\0\0\0", 32);
   block[25] = static_cast<char>(orientation);

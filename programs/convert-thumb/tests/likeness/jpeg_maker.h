@@ -8,7 +8,7 @@
 namespace vela_test {
 
 enum class JpegColours {
-  kLumaChroma,     ///< as nearly every photo
+  kLumaChroma,     ///< like nearly every photo
   kRgb,            ///< without a change of colour space
   kGrey,           ///< one component
   kCmyk,           ///< cyan, magenta, yellow, black
@@ -24,7 +24,7 @@ struct JpegKind {
   bool progressive = false;
   bool arithmetic = false;
   int restartRows = 0;       ///< rows of blocks between restart markers, 0: no markers
-  bool editorMarker = true;  ///< inks only: stored inverted, with the marker that says so
+  bool editorMarker = true;  ///< inks only: stored inverted, with the marker for that
   int orientation = -1;      ///< EXIF orientation, -1: no EXIF
   int dotsPerInch = 0;       ///< 0: not stated
   std::string profile;       ///< colour profile, none when empty

@@ -8,19 +8,19 @@
 namespace vela_test {
 namespace {
 
-LikenessSource Jpeg(const std::string& says, const JpegKind& kind, PhotoSize size = {}) {
-  return {"JPEG", says, "jpg", Encoded(kind, size), UsualVectors()};
+LikenessSource Jpeg(const std::string& description, const JpegKind& kind, PhotoSize size = {}) {
+  return {"JPEG", description, "jpg", Encoded(kind, size), UsualVectors()};
 }
 
-LikenessSource LargeJpeg(const std::string& says, const JpegKind& kind, PhotoSize size) {
-  LikenessSource source = Jpeg(says, kind, size);
+LikenessSource LargeJpeg(const std::string& description, const JpegKind& kind, PhotoSize size) {
+  LikenessSource source = Jpeg(description, kind, size);
   source.isLarge = true;
   return source;
 }
 
-/// Tiny and very flat ones: only what is made of them in the end matters.
-LikenessSource OddSize(const std::string& says, PhotoSize size) {
-  LikenessSource source = LargeJpeg(says, {}, size);
+/// Tiny and very flat ones: only the final thumbnails matter.
+LikenessSource OddSize(const std::string& description, PhotoSize size) {
+  LikenessSource source = LargeJpeg(description, {}, size);
   source.vectors = {kSix, kFill, kBare};
   return source;
 }

@@ -45,9 +45,9 @@ class Likeness : public ConverterTest, public ::testing::WithParamInterface<Like
     runs.ourDirectory = directory_ + "/ours_" + vector;
     runs.theirDirectory = directory_ + "/theirs_" + vector;
     const ProgramResult ours =
-        RunProgram(ConvertThumbPath(), LineInto(runs.ourDirectory, path, vector));
+        RunProgram(ConvertThumbPath(), LineWithOutputsIn(runs.ourDirectory, path, vector));
     const ProgramResult theirs =
-        RunProgram(kImageMagick, LineInto(runs.theirDirectory, path, vector));
+        RunProgram(kImageMagick, LineWithOutputsIn(runs.theirDirectory, path, vector));
     runs.ourExit = ours.exitCode;
     runs.theirExit = theirs.exitCode;
     runs.messages = "ours: " + ours.err + "\ntheirs: " + theirs.err;
@@ -55,10 +55,11 @@ class Likeness : public ConverterTest, public ::testing::WithParamInterface<Like
   }
 
   void Compare(const Runs& runs, const std::string& vector) {
-    const KnownDifference known = KnownDifferenceOf(GetParam().format, GetParam().says, vector);
+    const KnownDifference known =
+        KnownDifferenceOf(GetParam().format, GetParam().description, vector);
     LikenessResult result;
     result.format = GetParam().format;
-    result.says = GetParam().says;
+    result.description = GetParam().description;
     result.vector = vector;
     result.ourExit = runs.ourExit;
     result.theirExit = runs.theirExit;
@@ -73,8 +74,9 @@ class Likeness : public ConverterTest, public ::testing::WithParamInterface<Like
   }
 
  private:
-  std::vector<std::string> LineInto(const std::string& outputDirectory, const std::string& path,
-                                    const std::string& vector) const {
+  std::vector<std::string> LineWithOutputsIn(const std::string& outputDirectory,
+                                             const std::string& path,
+                                             const std::string& vector) const {
     MakeDirectories(outputDirectory);
     const bool firstPage = GetParam().firstPage;
     CommandLine line =
@@ -94,7 +96,7 @@ class Likeness : public ConverterTest, public ::testing::WithParamInterface<Like
     EXPECT_EQ(oursFails && !theirsFails, known.kind == LikenessException::kFails) << runs.messages;
   }
 
-  /// Where we alone succeed there have to be whole pictures at least. Returns the largest's size.
+  /// Where only our run succeeds, expects complete pictures. Returns the size of the largest one.
   static std::string ExpectPicturesWithoutOthers(const Runs& runs) {
     if (runs.ourExit != 0) {
       return "";
@@ -171,7 +173,7 @@ INSTANTIATE_TEST_SUITE_P(Other, Likeness, ::testing::ValuesIn(OtherSources()), N
 INSTANTIATE_TEST_SUITE_P(Damaged, Likeness, ::testing::ValuesIn(DamagedSources()), NameOf);
 INSTANTIATE_TEST_SUITE_P(Camera, Likeness, ::testing::ValuesIn(CameraFileSources()), NameOf);
 
-// The folder with camera files need not be there.
+// The folder with camera files need not exist.
 GTEST_ALLOW_UNINSTANTIATED_PARAMETERIZED_TEST(Likeness);
 
 }  // namespace

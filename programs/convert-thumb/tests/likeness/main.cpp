@@ -1,4 +1,4 @@
-// The main function of the comparison, which keeps its results in a directory of the build.
+// The main function of the comparison, which stores its results in the build directory.
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
@@ -11,7 +11,7 @@
 
 namespace {
 
-/// Listing tests, which the build does, needs no sandbox.
+/// The build lists the tests, which needs no sandbox.
 bool OnlyListsTests(int argc, char** argv) {
   for (int i = 1; i < argc; ++i) {
     if (std::string(argv[i]).compare(0, 18, "--gtest_list_tests") == 0) {
@@ -21,8 +21,8 @@ bool OnlyListsTests(int argc, char** argv) {
   return false;
 }
 
-/// The directory of the results; empty when there can be none.
-std::string MadeResultsDirectory() {
+/// Creates the directory of the results; empty when that fails.
+std::string MakeResultsDirectory() {
   std::error_code error;
   std::filesystem::create_directories(vela_test::ResultsDirectory(), error);
   return error ? "" : vela_test::ResultsDirectory();
@@ -32,7 +32,7 @@ std::string MadeResultsDirectory() {
 
 int main(int argc, char** argv) {
   if (!OnlyListsTests(argc, argv)) {
-    vela_test::EnterSandbox(MadeResultsDirectory());
+    vela_test::EnterSandbox(MakeResultsDirectory());
   }
   ::testing::InitGoogleMock(&argc, argv);
   return RUN_ALL_TESTS();

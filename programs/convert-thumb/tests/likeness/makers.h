@@ -1,4 +1,4 @@
-// Makes the inputs' files.
+// Creates the input files.
 #pragma once
 
 #include <cstddef>
@@ -26,7 +26,7 @@ FileMaker WrittenWithAlpha(std::vector<std::string> options, PhotoSize size = {}
 /// The same with a colour profile embedded, as profileOf() returns it.
 FileMaker WrittenWithProfile(std::vector<std::string> options, std::string (*profileOf)());
 
-/// The photo as a PPM, of sizes that ImageMagick refuses too.
+/// The photo as a PPM, also of sizes that ImageMagick rejects.
 FileMaker Raw(PhotoSize size);
 
 /// The photo as a JPEG.
@@ -35,16 +35,16 @@ FileMaker Encoded(const JpegKind& kind, PhotoSize size = {});
 /// A JPEG of `make`'s picture with EXIF orientation, rewritten in the format of the extension.
 FileMaker WithOrientation(int orientation, std::vector<std::string> options = {});
 
-/// The first `tenths` tenths of what `make` makes.
+/// The first `tenths` tenths of the file from `make`.
 FileMaker Truncated(FileMaker make, int tenths = 6);
 
-/// All but the last bytes of what `make` makes.
+/// All but the last bytes of the file from `make`.
 FileMaker WithoutEnd(FileMaker make, size_t bytes);
 
-/// What `make` makes with bytes in the middle changed.
+/// The file from `make` with bytes in the middle changed.
 FileMaker Damaged(FileMaker make);
 
-/// A file that is there already.
+/// An existing file.
 FileMaker Copied(const std::string& from);
 
 }  // namespace vela_test

@@ -15,11 +15,11 @@ struct OutputPicture {
   std::string sampling;  ///< of each component, such as "2x2,1x1,1x1"
   std::string density;   ///< such as "72x72 unit 1"
   std::string profile;   ///< the embedded colour profile's bytes, empty when there is none
-  std::string metadata;  ///< names of what else is in the file, such as "exif "
+  std::string metadata;  ///< names of other data in the file, such as "exif "
   std::vector<uint8_t> samples;
 };
 
-/// Reads a JPEG; empty unless it is whole.
+/// Reads a JPEG; empty unless it is complete.
 std::optional<OutputPicture> ReadOutputPicture(const std::string& path);
 
 /// The likeness of two pictures with the same pixels, decibels.
@@ -29,8 +29,8 @@ constexpr double kSamePixels = 99;
 /// never more than kSamePixels.
 double Decibels(const OutputPicture& one, const OutputPicture& other);
 
-/// Names what differs apart from the pixels, such as "sampling 2x2,1x1,1x1 for 1x1,1x1,1x1; ";
-/// empty when nothing does.
+/// Lists differences other than the pixels, such as "sampling 2x2,1x1,1x1 for 1x1,1x1,1x1; "; empty
+/// when nothing does.
 std::string Differences(const OutputPicture& ours, const OutputPicture& theirs);
 
 }  // namespace vela_test

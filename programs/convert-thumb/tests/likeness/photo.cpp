@@ -16,7 +16,7 @@ uint32_t Scrambled(uint32_t value) {
   return value ^ value >> 16;
 }
 
-/// Between 0 and 1, the same for the same point.
+/// A random number from 0 to 1, the same for the same point.
 double RandomAt(int x, int y, uint32_t field) {
   const uint32_t point = static_cast<uint32_t>(x) * 0x9e3779b1U + static_cast<uint32_t>(y);
   return Scrambled(point ^ Scrambled(field)) / 4294967295.0;
@@ -39,7 +39,7 @@ double Hills(int x, int y, int cell, uint32_t field) {
   return Between(upper, lower, down);
 }
 
-/// Hills on hills on hills, between 0 and 1.
+/// A sum of hills of several sizes, from 0 to 1.
 double Landscape(int x, int y) {
   double sum = 0;
   double weights = 0;

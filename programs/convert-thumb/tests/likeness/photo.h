@@ -1,4 +1,4 @@
-// The picture that the comparison's inputs show.
+// The picture in the comparison's inputs.
 #pragma once
 
 #include <cstdint>

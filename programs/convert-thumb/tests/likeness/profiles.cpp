@@ -19,7 +19,7 @@ std::string RgbProfile(const cmsCIExyYTRIPLE& primaries, double gamma) {
   return ProfileBytes(profile);
 }
 
-/// Inks as their overprint on white looks; `toLab` is a transform from RGB.
+/// The colour of inks printed on white; `toLab` is a transform from RGB.
 cmsInt32Number LabOfInks(const cmsUInt16Number* inks, cmsUInt16Number* lab, void* toLab) {
   constexpr double kFull = 65535;
   std::array<double, 3> rgb = {};
@@ -40,7 +40,7 @@ void WriteInkTable(cmsHPROFILE profile) {
   cmsPipeline* const pipeline = cmsPipelineAlloc(nullptr, 4, 3);
   cmsStage* const table = cmsStageAllocCLut16bit(nullptr, 5, 4, 3, nullptr);
   cmsStageSampleCLut16bit(table, LabOfInks, toLab, 0);
-  // The straight curves are there because the format wants them around a table.
+  // The format requires curves around a table; these are linear.
   cmsPipelineInsertStage(pipeline, cmsAT_END, cmsStageAllocToneCurves(nullptr, 4, nullptr));
   cmsPipelineInsertStage(pipeline, cmsAT_END, table);
   cmsPipelineInsertStage(pipeline, cmsAT_END, cmsStageAllocToneCurves(nullptr, 3, nullptr));

@@ -20,9 +20,9 @@ std::string DecibelsText(const LikenessResult& result) {
 std::string LineOf(const LikenessResult& result) {
   std::string line;
   for (const std::string& field :
-       {result.format, result.says, result.vector, result.output, std::to_string(result.ourExit),
-        std::to_string(result.theirExit), result.ourSize, result.theirSize, DecibelsText(result),
-        result.differences}) {
+       {result.format, result.description, result.vector, result.output,
+        std::to_string(result.ourExit), std::to_string(result.theirExit), result.ourSize,
+        result.theirSize, DecibelsText(result), result.differences}) {
     line += field + "\t";
   }
   return line + result.remark + "\n";

@@ -5,12 +5,12 @@
 namespace vela_test {
 
 void PrintTo(const LikenessSource& source, std::ostream* out) {
-  *out << source.format << ", " << source.says;
+  *out << source.format << ", " << source.description;
 }
 
 std::string TestNameOf(const LikenessSource& source) {
   std::string name;
-  for (const char letter : source.format + "_" + source.says) {
+  for (const char letter : source.format + "_" + source.description) {
     const bool isPlain = std::isalnum(static_cast<unsigned char>(letter)) != 0;
     if (isPlain || (!name.empty() && name.back() != '_')) {
       name += isPlain ? letter : '_';

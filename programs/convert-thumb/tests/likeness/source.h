@@ -8,16 +8,16 @@
 
 namespace vela_test {
 
-/// One input and what is to be made of it.
+/// One input and the argument sets for it.
 struct LikenessSource {
-  std::string format;     ///< as people call it
-  std::string says;       ///< what is special about it; unique within the format
-  std::string extension;  ///< of its file
+  std::string format;       ///< common name
+  std::string description;  ///< its special property; unique within the format
+  std::string extension;    ///< of its file
   /// Makes the file.
   std::function<void(const std::string& path)> make;
   /// By name, see vectors.h.
   std::vector<std::string> vectors;
-  /// Thumbnails of the usual sizes; otherwise of sizes for the small pictures most inputs are.
+  /// Thumbnails of the usual sizes; otherwise of smaller ones, because most inputs are small.
   bool isLarge = false;
   /// Whether "[0]" is appended to its name.
   bool firstPage = false;
@@ -35,6 +35,6 @@ std::vector<LikenessSource> TiffSources();
 std::vector<LikenessSource> AnimationSources();   ///< GIF and WebP
 std::vector<LikenessSource> OtherSources();       ///< all other formats
 std::vector<LikenessSource> DamagedSources();     ///< of every format
-std::vector<LikenessSource> CameraFileSources();  ///< from a folder with real ones; may be empty
+std::vector<LikenessSource> CameraFileSources();  ///< from a folder with real files; may be empty
 
 }  // namespace vela_test

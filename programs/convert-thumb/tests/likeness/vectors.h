@@ -14,15 +14,15 @@ constexpr const char* kTurned = "turned";  ///< two outputs, turned by 90 degree
 constexpr const char* kSingle = "single";  ///< one small output, sharpened
 constexpr const char* kSmall = "small";    ///< one very small output, sharpened
 constexpr const char* kMiddle = "middle";  ///< one output of middle size, sharpened
-constexpr const char* kBare = "bare";      ///< two outputs, as little done to them as possible
+constexpr const char* kBare = "bare";      ///< two outputs with as few options as possible
 
-/// Those that most inputs get.
+/// The sets for most inputs.
 std::vector<std::string> UsualVectors();
 
-/// Those that show what becomes of a photo that need not be decoded at its full size.
+/// The sets for photos that need not be decoded at full size.
 std::vector<std::string> PhotographVectors();
 
-/// The outputs of one, largest first. `large`: of the usual sizes, otherwise smaller ones.
+/// The outputs of one set, largest first. `large`: of the usual sizes, otherwise smaller ones.
 std::vector<ThumbOptions> OutputsOf(const std::string& vector, bool large);
 
 }  // namespace vela_test

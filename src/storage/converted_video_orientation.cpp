@@ -4,9 +4,9 @@
 #include <iterator>
 
 #include "platform/velaindex.h"
-#include "posix/cut_text.h"
 #include "posix/log.h"
-#include "storage/film_names.h"
+#include "posix/truncated_text.h"
+#include "storage/converted_video_names.h"
 #include "storage/log_source.h"
 #include "storage/velamk_util.h"
 
@@ -24,9 +24,9 @@ int IsVideoRotated(const char* path) {
 }
 
 int HasConvertedFilm(const char* path) {
-  return std::any_of(std::begin(kOrientedFilms), std::end(kOrientedFilms),
-                     [path](const FilmName& film) {
-                       return IsEAFileExist2(path, film.name, film.oldName) > 0;
+  return std::any_of(std::begin(kOrientedVideos), std::end(kOrientedVideos),
+                     [path](const ConvertedVideoName& video) {
+                       return IsEAFileExist2(path, video.name, video.oldName) > 0;
                      })
              ? 1
              : 0;
@@ -37,17 +37,17 @@ int IsEAFileOrientationMatched(const char* path, const char* name, const char* o
     LogError(kMetadataLogSource, 166, "Bad parameters.");
     return -1;
   }
-  char film[kPathBufferSize] = "";
-  if (GetEAFilePath(path, name, oldName, film, sizeof film) != 0) {
+  char video[kPathBufferSize] = "";
+  if (GetEAFilePath(path, name, oldName, video, sizeof video) != 0) {
     return -1;
   }
-  return IsMediaPortraitInDB(path) == IsFilePortrait(film) ? 1 : 0;
+  return IsMediaPortraitInDB(path) == IsFilePortrait(video) ? 1 : 0;
 }
 
 int HasMatchedConvertedFilm(const char* path) {
-  return std::any_of(std::begin(kOrientedFilms), std::end(kOrientedFilms),
-                     [path](const FilmName& film) {
-                       return IsEAFileOrientationMatched(path, film.name, film.oldName) == 1;
+  return std::any_of(std::begin(kOrientedVideos), std::end(kOrientedVideos),
+                     [path](const ConvertedVideoName& video) {
+                       return IsEAFileOrientationMatched(path, video.name, video.oldName) == 1;
                      })
              ? 1
              : 0;
