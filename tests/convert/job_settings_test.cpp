@@ -8,8 +8,6 @@
 #include "convert/convert_fixture.h"
 #include "convert/photo_convert_job.h"
 
-using namespace vela;
-
 namespace vela_test {
 namespace {
 
