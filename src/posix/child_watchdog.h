@@ -1,13 +1,13 @@
 // The time limit of a child whose output is read with blocking calls.
 #pragma once
 
-#include "posix/child_process.h"
-
 #include <chrono>
 #include <condition_variable>
 #include <mutex>
 #include <string>
 #include <thread>
+
+#include "posix/child_process.h"
 
 namespace vela {
 

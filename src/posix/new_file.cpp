@@ -7,6 +7,8 @@
 #include <atomic>
 #include <cstdio>
 
+#include "posix/file_content.h"
+
 namespace vela {
 
 namespace {
@@ -83,12 +85,8 @@ void NewFile::Flush() {
 }
 
 void NewFile::Write(std::string_view text) {
-  while (!text.empty() && error_ == 0) {
-    const ssize_t count = write(file_.Get(), text.data(), text.size());
-    Remember(count >= 0 || errno == EINTR);
-    if (count > 0) {
-      text.remove_prefix(static_cast<size_t>(count));
-    }
+  if (error_ == 0) {
+    error_ = WriteAll(file_.Get(), text);
   }
 }
 
