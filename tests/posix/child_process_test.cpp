@@ -3,6 +3,7 @@
 
 #include <gmock/gmock.h>
 #include <signal.h>
+#include <sys/prctl.h>
 #include <unistd.h>
 
 #include <cerrno>
@@ -105,6 +106,24 @@ TEST(AttachedChild, ThatCannotBeStartedLeavesNothing) {
   pid_t pid = -2;
   EXPECT_EQ(StartAttachedChild(none.c_str(), arguments, pid), ENOENT);
   EXPECT_EQ(pid, -2);
+}
+
+TEST(InheritedChild, IsReapedAndAnOwnOneIsNot) {
+  ASSERT_EQ(prctl(PR_SET_CHILD_SUBREAPER, 1, 0, 0, 0), 0);
+  EXPECT_TRUE(HasSucceeded(ReapChild(StartShell("sleep 0.1 & echo $! >/tmp/orphan"))));
+  pid_t orphan = 0;
+  std::ifstream("/tmp/orphan") >> orphan;
+  ASSERT_GT(orphan, 0);
+  AwaitChild(orphan);
+  EXPECT_EQ(kill(orphan, 0), 0) << "it is not in the process table";
+  ReapInheritedChildren([](pid_t) { return false; });
+  EXPECT_NE(kill(orphan, 0), 0) << "it is still in the process table";
+
+  const pid_t own = StartShell("exit 0");
+  AwaitChild(own);
+  ReapInheritedChildren([own](pid_t pid) { return pid == own; });
+  EXPECT_THAT(ReapEndedChild(own), Optional(0));
+  prctl(PR_SET_CHILD_SUBREAPER, 0, 0, 0, 0);
 }
 
 }  // namespace
