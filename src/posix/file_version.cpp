@@ -18,19 +18,20 @@ bool IsSameFile(const struct stat& a, const struct stat& b) {
   return a.st_dev == b.st_dev && a.st_ino == b.st_ino;
 }
 
-bool IsSameVersion(const struct stat& a, const struct stat& b) {
-  return IsSameFile(a, b) && a.st_size == b.st_size && IsSameTime(a.st_mtim, b.st_mtim) &&
-         IsSameTime(a.st_ctim, b.st_ctim);
+bool FileVersion::operator==(const FileVersion& other) const {
+  return IsSameFile(status_, other.status_) && status_.st_size == other.status_.st_size &&
+         IsSameTime(status_.st_mtim, other.status_.st_mtim) &&
+         IsSameTime(status_.st_ctim, other.status_.st_ctim);
 }
 
-bool IsAtRest(const struct stat& file) {
+bool FileVersion::IsAtRest() const {
   timespec now;
   if (clock_gettime(CLOCK_REALTIME_COARSE, &now) != 0) {
     return false;
   }
   constexpr int64_t kRestMilliseconds = 100;
-  const int64_t age =
-      (now.tv_sec - file.st_ctim.tv_sec) * 1000 + (now.tv_nsec - file.st_ctim.tv_nsec) / 1000000;
+  const int64_t age = (now.tv_sec - status_.st_ctim.tv_sec) * 1000 +
+                      (now.tv_nsec - status_.st_ctim.tv_nsec) / 1000000;
   return age > kRestMilliseconds;
 }
 
