@@ -5,8 +5,8 @@
 #include <unistd.h>
 
 #include <cerrno>
-#include <cstdio>
-#include <cstdlib>
+
+#include "posix/folder.h"
 
 namespace vela {
 
@@ -22,9 +22,15 @@ bool IsRegularFileMode(uint32_t mode) {
   return S_ISREG(mode);
 }
 
+bool IsDirectoryMode(uint32_t mode) {
+  return S_ISDIR(mode);
+}
+
 std::optional<FileStatus> ExamineFile(const char* path) {
   struct stat status = {};
-  if (stat(path, &status) != 0) {
+  const int error = path == nullptr ? EFAULT : ReadStatus(path, status);
+  if (error != 0) {
+    errno = error;
     return std::nullopt;
   }
   return FileStatus{S_ISREG(status.st_mode), S_ISDIR(status.st_mode),
@@ -59,21 +65,17 @@ FileDescriptor OpenForReading(const std::string& path) {
   return FileDescriptor(open(path.c_str(), O_RDONLY | O_NONBLOCK | O_NOCTTY | O_CLOEXEC));
 }
 
-FileDescriptor CreateEmptyFile(const std::string& path, unsigned mode) {
-  const int flags = O_WRONLY | O_CREAT | O_TRUNC | O_NONBLOCK | O_NOCTTY | O_CLOEXEC;
-  return FileDescriptor(open(path.c_str(), flags, mode));
+int SetFileMode(int fd, unsigned mode) {
+  return ErrnoUnless(fchmod(fd, mode) == 0);
 }
 
-int CreateDirectory(const std::string& path, unsigned mode) {
-  return ErrnoUnless(mkdir(path.c_str(), mode) == 0);
+int SyncFile(int fd) {
+  return ErrnoUnless(fdatasync(fd) == 0);
 }
 
-int SetFileMode(const std::string& path, unsigned mode) {
-  return ErrnoUnless(chmod(path.c_str(), mode) == 0);
-}
-
-int RenameFile(const std::string& from, const std::string& to) {
-  return ErrnoUnless(std::rename(from.c_str(), to.c_str()) == 0);
+int64_t SizeOfFile(int fd) {
+  struct stat status = {};
+  return fstat(fd, &status) == 0 ? int64_t{status.st_size} : 0;
 }
 
 int RemoveFile(const std::string& path) {
@@ -101,16 +103,6 @@ int AppendLine(const std::string& path, const std::string& text) {
     return 0;
   }
   return ftruncate(file.Get(), end) == 0 ? ENOSPC : errno;
-}
-
-std::string FindUnusedPath(const std::string& nameTemplate) {
-  std::string path = nameTemplate;
-  const FileDescriptor file(mkostemp(path.data(), O_CLOEXEC));
-  if (!file.IsOpen()) {
-    return {};
-  }
-  unlink(path.c_str());
-  return path;
 }
 
 }  // namespace vela
