@@ -31,6 +31,11 @@ int ReadFile(const char* path, std::string& content);
 /// writer.
 std::string ReadSmallFile(const std::string& path, size_t limit);
 
+/// Returns the content of the regular file `path` if only root can change it: root owns it and it
+/// is not writable for its group or others. Empty otherwise, for a file of more than `limit` bytes,
+/// and on errors. Never waits for a pipe's writer.
+std::string ReadSystemFile(const std::string& path, size_t limit);
+
 /// Writes all of `content` to `fd`. Returns 0 or an errno value.
 int WriteAll(int fd, std::string_view content);
 

@@ -2,7 +2,7 @@
 #pragma once
 
 #include "command_line/command_line.h"
-#include "process/landlock.h"
+#include "posix/landlock.h"
 
 namespace vela {
 
