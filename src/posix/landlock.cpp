@@ -140,6 +140,31 @@ int LandlockVersion() {
   return version < 0 ? 0 : static_cast<int>(version);
 }
 
+std::vector<std::string> LandlockCoverage(int version) {
+  constexpr struct {
+    int version;
+    const char* name;
+  } kCoverage[] = {{1, "reading"},
+                   {1, "writing"},
+                   {1, "running programs"},
+                   {kVersionOfTruncate, "truncating"},
+                   {kVersionOfTcp, "TCP"},
+                   {kVersionOfDeviceControl, "device control"},
+                   {kVersionOfScopes, "signals"},
+                   {kVersionOfScopes, "abstract sockets"}};
+  std::vector<std::string> names;
+  for (const auto& part : kCoverage) {
+    if (version >= part.version) {
+      names.emplace_back(part.name);
+    }
+  }
+  return names;
+}
+
+bool CanRefuseLinks() {
+  return OpenWithoutLinks("/").IsOpen();
+}
+
 int MakeLandlockRuleset(const AllowedFiles& files, FileDescriptor& ruleset) {
   ruleset.Reset();
   const int version = LandlockVersion();
