@@ -88,6 +88,10 @@ int RemoveFileIfPresent(const std::string& path);
 /// that does not fit on the volume is removed again. Returns 0 or an errno value.
 int AppendLine(const std::string& path, const std::string& text);
 
+/// Waits until the name of the file `path`, in its directory, is on the disk. Returns 0, also when
+/// the directory may not be read or its file system has nothing to wait for, or an errno value.
+int SyncNameOf(const std::string& path);
+
 /// Replaces the X's at the end of `nameTemplate` so that no file has the resulting path. Returns an
 /// empty string when no file can be created there.
 std::string FindUnusedPath(const std::string& nameTemplate);
