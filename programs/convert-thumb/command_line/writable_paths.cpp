@@ -29,7 +29,6 @@ void AddUnique(std::vector<std::string>& list, const std::string& text) {
 
 void AddOutput(WritablePaths& paths, const std::string& path) {
   AddUnique(paths.directories, DirectoryOf(path));
-  paths.files.push_back(path);
 }
 
 void AddOutputArgument(WritablePaths& paths, const std::string& argument) {
