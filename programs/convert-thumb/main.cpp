@@ -52,7 +52,7 @@ int Convert(const ConversionPlan& plan, const CommandLine& line, size_t memoryLi
     return LeaveToImageMagick(line, memoryLimit);
   }
   ConfineToThisProgram();
-  return MakeThumbnails(*reader, plan, memoryLimit) ? kDone : kFailed;
+  return MakeThumbnails(*reader, plan, memoryLimit) && SyncOutputs() ? kDone : kFailed;
 }
 
 int Turn(const TurnPlan& plan, const CommandLine& line, size_t memoryLimit) {

@@ -145,6 +145,18 @@ bool WriteOutputFile(const std::string& path, const unsigned char* bytes, size_t
   return false;
 }
 
+bool MayBeOverwritten(const std::string& path, const FileDescriptor& file) {
+  const std::optional<Place> place = FindPlace(path);
+  struct stat opened;
+  struct stat named;
+  if (!place || fstat(file.Get(), &opened) != 0 ||
+      fstatat(place->directory.Get(), place->name.c_str(), &named, AT_SYMLINK_NOFOLLOW) != 0) {
+    return false;
+  }
+  const bool isSame = opened.st_dev == named.st_dev && opened.st_ino == named.st_ino;
+  return (isSame && IsOwnFile(opened)) || IsPrivate(place->directory);
+}
+
 std::optional<ReplaceableFile> ReadReplaceableFile(const std::string& path, size_t limit) {
   std::optional<Place> place = FindPlace(path);
   if (!place) {

@@ -28,6 +28,11 @@ OpenOutput OpenForWriting(const std::string& path);
 /// bytes may not have been written; the incomplete file is removed. May be called by any thread.
 bool WriteOutputFile(const std::string& path, const unsigned char* bytes, size_t size);
 
+/// Returns true when another program may write to `file`, the open file at `path`: a regular file
+/// of the effective user with a single name and not behind a symbolic link, or any file whose name
+/// is in a directory that nobody else can change.
+bool MayBeOverwritten(const std::string& path, const FileDescriptor& file);
+
 /// The attributes that a replacement shares with the file that it replaces.
 struct FileAttributes {
   unsigned owner = 0;

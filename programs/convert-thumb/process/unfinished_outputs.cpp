@@ -12,6 +12,7 @@
 #include <memory>
 
 #include "posix/signal_block.h"
+#include "process/failure_report.h"
 
 namespace vela {
 
@@ -134,6 +135,20 @@ void RemoveOutput(const FileDescriptor& output) {
       Remove(*entry);
     }
   }
+}
+
+bool SyncOutputs() {
+  // Lets the disk work on all of them at the same time.
+  for (const Output* output = g_outputs; output != nullptr; output = output->next) {
+    sync_file_range(output->file.Get(), 0, 0, SYNC_FILE_RANGE_WRITE);
+  }
+  for (const Output* output = g_outputs; output != nullptr; output = output->next) {
+    if (fdatasync(output->file.Get()) != 0) {
+      ReportFailure("cannot write %s: %s", output->name.c_str(), std::strerror(errno));
+      return false;
+    }
+  }
+  return true;
 }
 
 void RemoveOutputs() {

@@ -18,6 +18,10 @@ FileDescriptor CreateOutput(const FileDescriptor& directory, const std::string& 
 /// be called by any thread.
 void RemoveOutput(const FileDescriptor& output);
 
+/// Waits until the content of all outputs is on the disk. Returns false, after a call of
+/// ReportFailure, when that fails.
+bool SyncOutputs();
+
 /// Removes all outputs, except those whose names refer to other files by now. From then on the run
 /// counts as ending.
 void RemoveOutputs();
