@@ -3,7 +3,8 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
-#include <chrono>
+#include <cstdint>
+#include <map>
 
 #include "hostile/hostile_test.h"
 #include "support/named_case.h"
@@ -52,11 +53,38 @@ std::vector<Disguise> References() {
            "\xff\x01\x01\xff\x01\x01"}};
 }
 
-/// The header of a pixel cache: the pixels are those of a file of the same name with ".cache".
-std::string PixelCacheHeader() {
-  return "id=MagickCache\nquantum-depth=16\nclass=DirectClass colors=0 alpha-trait=Undefined\n"
-         "columns=8 rows=8 depth=16\ncolorspace=sRGB\nnumber-channels=3 number-meta-channels=0\n"
-         "\f\n:\x1a";
+/// Changes the size in the first directory of a TIFF, and of a raw photo that is one.
+void ClaimSize(const std::string& path, int width, int height) {
+  std::string bytes = ReadFile(path);
+  const auto at = [&bytes](size_t place, size_t count) {
+    uint32_t value = 0;
+    for (size_t i = 0; i < count; ++i) {
+      value |= static_cast<uint32_t>(static_cast<uint8_t>(bytes.at(place + i))) << (8 * i);
+    }
+    return value;
+  };
+  ASSERT_EQ(bytes.substr(0, 2), "II");
+  const auto columns = static_cast<uint32_t>(width);
+  const auto rows = static_cast<uint32_t>(height);
+  // Width, height, rows in a strip, bytes in a strip.
+  const std::map<uint32_t, uint32_t> claims = {
+      {256, columns}, {257, rows}, {278, rows}, {279, columns * 2 * rows}};
+  const size_t directory = at(4, 4);
+  const uint32_t entries = at(directory, 2);
+  for (uint32_t i = 0; i < entries; ++i) {
+    constexpr uint32_t kLong = 4;
+    const size_t entry = directory + 2 + i * 12;
+    const uint32_t tag = at(entry, 2);
+    const auto claimed = claims.find(tag);
+    if (claimed != claims.end()) {
+      const uint32_t value = claimed->second;
+      bytes[entry + 2] = static_cast<char>(kLong);
+      for (size_t byte = 0; byte < 4; ++byte) {
+        bytes[entry + 8 + byte] = static_cast<char>(value >> (8 * byte) & 0xffU);
+      }
+    }
+  }
+  WriteFile(path, bytes);
 }
 
 using PictureFiles = HostileTest;
@@ -81,17 +109,58 @@ TEST_P(DisguisedFiles, GetMarkersAndRevealNothing) {
 
 INSTANTIATE_TEST_SUITE_P(All, DisguisedFiles, ::testing::ValuesIn(References()), CaseName());
 
+// The header of a pixel cache makes the bytes of any file pixels: those of x.cache beside x.mpc.
 TEST_F(PictureFiles, PixelCachesAreNotOpened) {
-  for (const char* extension : {"jpg", "gif", "bmp", "psd", "tif"}) {
-    const std::string name = std::string("x") + extension;
-    WriteFile(InPhotos(name + "." + extension), PixelCacheHeader());
-    EXPECT_TRUE(Link(kPrivatePhoto, InPhotos(name + ".cache")));
-    CopyFile(kPrivatePhoto, InPhotos(name + "." + extension + ".cache"));
+  const Rgb colour = PaletteColour(kPrivateColour);
+  Draw({"-size", "160x120",
+        "xc:rgb(" + std::to_string(colour.red) + "," + std::to_string(colour.green) + "," +
+            std::to_string(colour.blue) + ")",
+        "/tmp/private.mpc"});
+  chmod("/tmp/private.cache", 0600);
+  for (const char* name : {"x.mpc", "x.jpg"}) {
+    CopyFile("/tmp/private.mpc", InPhotos(name));
+  }
+  EXPECT_TRUE(Link("/tmp/private.cache", InPhotos("x.cache")));
+  WriteFile(InPhotos("y.jpg"), SvgImage(InPhotos("x.mpc")));
+  WriteFile(InPhotos("z.gif"), SvgImage("mpc:" + InPhotos("x.jpg")));
+  RunInTime();
+  ExpectNothingRevealed();
+  for (const char* name : {"x.jpg", "y.jpg", "z.gif"}) {
+    EXPECT_TRUE(IsMarkedFailed(InPhotos(name), kinds_));
+  }
+}
+
+// A short description of a picture that takes long to draw.
+TEST_F(PictureFiles, ImmenseDrawingsFailQuickly) {
+  const std::string photo = InPhotos("x.jpg");
+  WriteFile(photo,
+            "<svg xmlns=\"http://www.w3.org/2000/svg\" width=\"9000\" height=\"9000\"><filter "
+            "id=\"f\"><feTurbulence baseFrequency=\".5\" numOctaves=\"9999\"/></filter><rect "
+            "width=\"9000\" height=\"9000\" filter=\"url(#f)\"/></svg>");
+  RunInTime();
+  EXPECT_TRUE(IsMarkedFailed(photo, kinds_));
+}
+
+// Raw photos that take one page on the disk, being holes, and gigabytes in a decoder.
+TEST_F(PictureFiles, ImmenseRawPhotosFailQuickly) {
+  constexpr int kSide = 24000;
+  const Strings photos = {InPhotos("x.dng"), InPhotos("y.nef")};
+  for (const std::string& photo : photos) {
+    MakeRawPhoto(photo);
+    ClaimSize(photo, kSide, kSide);
+    EXPECT_EQ(truncate(photo.c_str(), FileSize(photo) + int64_t{2} * kSide * kSide), 0);
   }
   RunInTime();
-  for (const char* extension : {"jpg", "gif", "bmp", "psd", "tif"}) {
-    EXPECT_TRUE(IsMarkedFailed(InPhotos(std::string("x") + extension + "." + extension), kinds_));
+  for (const std::string& photo : photos) {
+    EXPECT_TRUE(IsMarkedFailed(photo, kinds_));
   }
+}
+
+TEST_F(PictureFiles, ImmenseTiffsFailQuickly) {
+  const std::string photo = MakeMultiPageTiff(InPhotos("x.tif"), 1);
+  ClaimSize(photo, 65535, 65535);
+  RunInTime();
+  EXPECT_TRUE(IsMarkedFailed(photo, kinds_));
 }
 
 // A name that the converter could take for an instruction.
