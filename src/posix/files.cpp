@@ -16,6 +16,34 @@ int ErrnoUnless(bool succeeded) {
   return succeeded ? 0 : errno;
 }
 
+/// Returns 0 or an errno value.
+int CheckRegular(const struct stat& status) {
+  if (S_ISDIR(status.st_mode)) {
+    return EISDIR;
+  }
+  return S_ISREG(status.st_mode) ? 0 : EINVAL;
+}
+
+/// Returns whether the last component of `path` is a name of the file with this status, or a link
+/// to it that may be followed.
+bool IsTrustedName(const char* path, const struct stat& file) {
+  struct stat name = {};
+  if (lstat(path, &name) != 0) {
+    return false;
+  }
+  if (!S_ISLNK(name.st_mode)) {
+    return name.st_dev == file.st_dev && name.st_ino == file.st_ino;
+  }
+  return name.st_uid == 0 || name.st_uid == geteuid() || name.st_uid == file.st_uid;
+}
+
+/// Opens for reading what `located` refers to. Returns 0 or an errno value.
+int Reopen(const FileDescriptor& located, FileDescriptor& out) {
+  const std::string path = "/proc/self/fd/" + std::to_string(located.Get());
+  out = OpenForReading(path);
+  return ErrnoUnless(out.IsOpen());
+}
+
 }  // namespace
 
 bool IsRegularFileMode(uint32_t mode) {
@@ -57,6 +85,35 @@ int CheckAccess(const std::string& path, FileAccess access) {
 
 FileDescriptor OpenForReading(const std::string& path) {
   return FileDescriptor(open(path.c_str(), O_RDONLY | O_NONBLOCK | O_NOCTTY | O_CLOEXEC));
+}
+
+int OpenRegularFile(const char* path, OpenedFile& out) {
+  // Unlike an ordinary open, this has no effect on a device or pipe.
+  const FileDescriptor located(open(path, O_PATH | O_CLOEXEC));
+  struct stat status = {};
+  if (!located.IsOpen() || fstat(located.Get(), &status) != 0) {
+    return errno;
+  }
+  const int error = CheckRegular(status);
+  if (error != 0) {
+    return error;
+  }
+  // Only after the file has been located: the name may be replaced at any time.
+  if (!IsTrustedName(path, status)) {
+    return ELOOP;
+  }
+  out.owner = status.st_uid;
+  return Reopen(located, out.file);
+}
+
+bool IsProgramToTrust(const std::string& path) {
+  struct stat self = {};
+  struct stat program = {};
+  if (stat("/proc/self/exe", &self) != 0 || lstat(path.c_str(), &program) != 0) {
+    return false;
+  }
+  const bool isOurs = program.st_uid == 0 || program.st_uid == self.st_uid;
+  return S_ISREG(program.st_mode) && isOurs && (program.st_mode & S_IWOTH) == 0;
 }
 
 FileDescriptor CreateEmptyFile(const std::string& path, unsigned mode) {

@@ -63,6 +63,22 @@ int CheckAccess(const std::string& path, FileAccess access);
 /// no open descriptor, with errno set, on failure.
 FileDescriptor OpenForReading(const std::string& path);
 
+/// A file that is open for reading, and the user id of its owner.
+struct OpenedFile {
+  FileDescriptor file;
+  uint32_t owner = 0;
+};
+
+/// Opens the regular file `path` for reading; never waits for anything but its file system. A
+/// symbolic link as the last component is followed only if it belongs to root, the effective user
+/// or the owner of the file that it leads to. Returns 0 or an errno value: EISDIR for a directory,
+/// ELOOP for a link that is not followed, EINVAL for any other file that is not regular.
+int OpenRegularFile(const char* path, OpenedFile& out);
+
+/// Returns whether a regular file is at `path` that belongs to root or to the owner of the running
+/// program and that others cannot change.
+bool IsProgramToTrust(const std::string& path);
+
 /// Creates the empty file `path` with these permission bits, or truncates the existing one, and
 /// opens it for writing; never waits for the reader of a pipe. Returns no open descriptor, with
 /// errno set, on failure.
