@@ -178,7 +178,6 @@ void LimitResources() {
   limits.processorSeconds = kMaxProcessorSeconds;
   limits.fileSize = 0;
   LowerLimits(limits);
-  Limit(RLIMIT_NOFILE, kMaxDescriptors);
 #if !defined(VELA_SANITIZED)
   Limit(RLIMIT_STACK, kMaxStack);
 #endif
@@ -196,6 +195,7 @@ int EnterConfinement() {
   if (error == 0) {
     error = RefuseAllFiles();
   }
+  Limit(RLIMIT_NOFILE, kMaxDescriptors);
   return error == 0 ? AllowOnlyParsing() : error;
 }
 

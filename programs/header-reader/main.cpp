@@ -32,6 +32,7 @@ bool AnswerQuestion() {
     return false;
   }
   const HeaderAnswer answer = Answer(question, file);
+  file.Reset();
   return WriteAll(kQuestionSocket, {reinterpret_cast<const char*>(&answer), sizeof answer}) == 0;
 }
 
