@@ -4,7 +4,7 @@
 #include <cstdlib>
 
 #include "header/reader_process.h"
-#include "posix/files.h"
+#include "posix/folder.h"
 
 namespace vela {
 
@@ -38,7 +38,7 @@ int ReadImageSize(const char* path, uint32_t& width, uint32_t& height) {
 
 std::optional<std::string> ReadExifOrientation(const std::string& path) {
   OpenedFile file;
-  if (OpenRegularFile(path.c_str(), file) != 0) {
+  if (OpenRegularFile(path, file) != 0) {
     return std::nullopt;
   }
   const auto answer = TheProcess().Ask(HeaderTopic::kExifOrientation, file);

@@ -12,7 +12,7 @@
 #include "header/header_question.h"
 #include "posix/child_process.h"
 #include "posix/file_descriptor.h"
-#include "posix/files.h"
+#include "posix/folder.h"
 
 namespace vela {
 

@@ -34,6 +34,8 @@ struct Confinement {
   ResourceLimits limits;
   bool blocksSystemCalls = true;      ///< those of BlockUnneededSystemCalls
   std::optional<AllowedFiles> files;  ///< nothing: all files
+  /// Variables of a program that is started, as "NAME=value", besides those that every program has.
+  std::vector<std::string> environment;
 };
 
 /// A confinement in the form that the kernel takes, so that a process can enter it without

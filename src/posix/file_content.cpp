@@ -18,6 +18,7 @@ namespace vela {
 namespace {
 
 constexpr size_t kChunkSize = 16384;
+constexpr mode_t kWritableByOthers = S_IWGRP | S_IWOTH;
 
 int AppendToEnd(int fd, std::string& content) {
   char chunk[kChunkSize];
@@ -29,6 +30,16 @@ int AppendToEnd(int fd, std::string& content) {
     }
     content.append(chunk, got);
   }
+}
+
+/// Returns the content of a regular file; empty for one of more than `limit` bytes and on errors.
+std::string ReadSmall(const FileDescriptor& file, const struct stat& status, size_t limit) {
+  if (!S_ISREG(status.st_mode) || static_cast<uint64_t>(status.st_size) > limit) {
+    return {};
+  }
+  const auto size = static_cast<size_t>(status.st_size);
+  std::string content = ReadAt(file.Get(), 0, size);
+  return content.size() == size ? content : std::string();
 }
 
 }  // namespace
@@ -93,12 +104,17 @@ std::string ReadSmallFile(const std::string& path, size_t limit) {
   if (!file.IsOpen() || fstat(file.Get(), &status) != 0) {
     return {};
   }
-  if (!S_ISREG(status.st_mode) || static_cast<uint64_t>(status.st_size) > limit) {
+  return ReadSmall(file, status, limit);
+}
+
+std::string ReadSystemFile(const std::string& path, size_t limit) {
+  const FileDescriptor file = OpenForReading(path);
+  struct stat status = {};
+  if (!file.IsOpen() || fstat(file.Get(), &status) != 0) {
     return {};
   }
-  const auto size = static_cast<size_t>(status.st_size);
-  std::string content = ReadAt(file.Get(), 0, size);
-  return content.size() == size ? content : std::string();
+  const bool isProtected = status.st_uid == 0 && (status.st_mode & kWritableByOthers) == 0;
+  return isProtected ? ReadSmall(file, status, limit) : std::string();
 }
 
 unsigned char* FileMapping::Map(int fd, size_t size) {

@@ -31,6 +31,11 @@ int ReadFile(const char* path, std::string& content);
 /// writer.
 std::string ReadSmallFile(const std::string& path, size_t limit);
 
+/// Returns the content of the regular file `path` if only root can change it: root owns it and it
+/// is not writable for its group or others. Empty otherwise, for a file of more than `limit` bytes,
+/// and on errors. Never waits for a pipe's writer.
+std::string ReadSystemFile(const std::string& path, size_t limit);
+
 /// The content of a file as memory that cannot be written to. Where the file has become shorter
 /// since, reading it ends the process.
 class FileMapping {

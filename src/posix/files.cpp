@@ -5,8 +5,8 @@
 #include <unistd.h>
 
 #include <cerrno>
-#include <cstdio>
-#include <cstdlib>
+
+#include "posix/folder.h"
 
 namespace vela {
 
@@ -16,43 +16,21 @@ int ErrnoUnless(bool succeeded) {
   return succeeded ? 0 : errno;
 }
 
-/// Returns 0 or an errno value.
-int CheckRegular(const struct stat& status) {
-  if (S_ISDIR(status.st_mode)) {
-    return EISDIR;
-  }
-  return S_ISREG(status.st_mode) ? 0 : EINVAL;
-}
-
-/// Returns whether the last component of `path` is a name of the file with this status, or a link
-/// to it that may be followed.
-bool IsTrustedName(const char* path, const struct stat& file) {
-  struct stat name = {};
-  if (lstat(path, &name) != 0) {
-    return false;
-  }
-  if (!S_ISLNK(name.st_mode)) {
-    return name.st_dev == file.st_dev && name.st_ino == file.st_ino;
-  }
-  return name.st_uid == 0 || name.st_uid == geteuid() || name.st_uid == file.st_uid;
-}
-
-/// Opens for reading what `located` refers to. Returns 0 or an errno value.
-int Reopen(const FileDescriptor& located, FileDescriptor& out) {
-  const std::string path = "/proc/self/fd/" + std::to_string(located.Get());
-  out = OpenForReading(path);
-  return ErrnoUnless(out.IsOpen());
-}
-
 }  // namespace
 
 bool IsRegularFileMode(uint32_t mode) {
   return S_ISREG(mode);
 }
 
+bool IsDirectoryMode(uint32_t mode) {
+  return S_ISDIR(mode);
+}
+
 std::optional<FileStatus> ExamineFile(const char* path) {
   struct stat status = {};
-  if (stat(path, &status) != 0) {
+  const int error = path == nullptr ? EFAULT : ReadStatus(path, status);
+  if (error != 0) {
+    errno = error;
     return std::nullopt;
   }
   return FileStatus{S_ISREG(status.st_mode), S_ISDIR(status.st_mode),
@@ -87,25 +65,6 @@ FileDescriptor OpenForReading(const std::string& path) {
   return FileDescriptor(open(path.c_str(), O_RDONLY | O_NONBLOCK | O_NOCTTY | O_CLOEXEC));
 }
 
-int OpenRegularFile(const char* path, OpenedFile& out) {
-  // Unlike an ordinary open, this has no effect on a device or pipe.
-  const FileDescriptor located(open(path, O_PATH | O_CLOEXEC));
-  struct stat status = {};
-  if (!located.IsOpen() || fstat(located.Get(), &status) != 0) {
-    return errno;
-  }
-  const int error = CheckRegular(status);
-  if (error != 0) {
-    return error;
-  }
-  // Only after the file has been located: the name may be replaced at any time.
-  if (!IsTrustedName(path, status)) {
-    return ELOOP;
-  }
-  out.owner = status.st_uid;
-  return Reopen(located, out.file);
-}
-
 bool IsProgramToTrust(const std::string& path) {
   struct stat self = {};
   struct stat program = {};
@@ -116,21 +75,17 @@ bool IsProgramToTrust(const std::string& path) {
   return S_ISREG(program.st_mode) && isOurs && (program.st_mode & S_IWOTH) == 0;
 }
 
-FileDescriptor CreateEmptyFile(const std::string& path, unsigned mode) {
-  const int flags = O_WRONLY | O_CREAT | O_TRUNC | O_NONBLOCK | O_NOCTTY | O_CLOEXEC;
-  return FileDescriptor(open(path.c_str(), flags, mode));
+int SetFileMode(int fd, unsigned mode) {
+  return ErrnoUnless(fchmod(fd, mode) == 0);
 }
 
-int CreateDirectory(const std::string& path, unsigned mode) {
-  return ErrnoUnless(mkdir(path.c_str(), mode) == 0);
+int SyncFile(int fd) {
+  return ErrnoUnless(fdatasync(fd) == 0);
 }
 
-int SetFileMode(const std::string& path, unsigned mode) {
-  return ErrnoUnless(chmod(path.c_str(), mode) == 0);
-}
-
-int RenameFile(const std::string& from, const std::string& to) {
-  return ErrnoUnless(std::rename(from.c_str(), to.c_str()) == 0);
+int64_t SizeOfFile(int fd) {
+  struct stat status = {};
+  return fstat(fd, &status) == 0 ? int64_t{status.st_size} : 0;
 }
 
 int RemoveFile(const std::string& path) {
@@ -158,16 +113,6 @@ int AppendLine(const std::string& path, const std::string& text) {
     return 0;
   }
   return ftruncate(file.Get(), end) == 0 ? ENOSPC : errno;
-}
-
-std::string FindUnusedPath(const std::string& nameTemplate) {
-  std::string path = nameTemplate;
-  const FileDescriptor file(mkostemp(path.data(), O_CLOEXEC));
-  if (!file.IsOpen()) {
-    return {};
-  }
-  unlink(path.c_str());
-  return path;
 }
 
 }  // namespace vela

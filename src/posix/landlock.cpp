@@ -234,6 +234,10 @@ int MakeLandlockRuleset(const AllowedFiles& files, FileDescriptor& ruleset) {
   RulesetBuilder builder(made, restrictions.files);
   builder.AddSystemPaths(files.programs, kRead | LANDLOCK_ACCESS_FS_EXECUTE);
   builder.AddSystemPaths(files.data, kRead);
+#if defined(VELA_SANITIZED)
+  // The checks of a sanitizer read their own process's memory map and threads.
+  builder.AddSystemPaths({"/proc"}, kRead);
+#endif
   builder.AddSystemPaths(files.devices, kRead | ChangeFile(version) | kDeviceControl);
   builder.AddUserPaths(files.inputs, kRead);
   builder.AddUserPaths(files.outputs, kRead | ChangeFile(version) | kChangeDirectory);

@@ -19,7 +19,7 @@
 #include <vector>
 
 #include "header/header_reader.h"
-#include "posix/files.h"
+#include "posix/folder.h"
 #include "support/files.h"
 #include "support/images.h"
 #include "support/sandbox.h"
@@ -64,7 +64,7 @@ bool WaitUntil(const std::function<bool()>& condition) {
 
 OpenedFile Opened(const std::string& path) {
   OpenedFile file;
-  EXPECT_EQ(OpenRegularFile(path.c_str(), file), 0) << path;
+  EXPECT_EQ(OpenRegularFile(path, file), 0) << path;
   return file;
 }
 

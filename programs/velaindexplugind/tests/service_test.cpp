@@ -8,10 +8,10 @@
 
 #include <algorithm>
 #include <cerrno>
-#include <fstream>
 #include <functional>
 
 #include "index_daemon.h"
+#include "support/users.h"
 
 namespace vela_test {
 namespace {
@@ -45,16 +45,6 @@ Program StartGiven(const Descriptor& given) {
   const std::string script = "exec 3<&" + number + " " + (number == "3" ? "" : number + "<&-") +
                              "; LISTEN_FDS=1 LISTEN_PID=$$ exec \"$0\"";
   return StartProgram("/bin/bash", {"-c", script, IndexDaemonPath()}, options);
-}
-
-/// Whether the sandbox has other users and groups than user 0, as it does when root made it.
-bool HasOtherUsers() {
-  std::ifstream map("/proc/self/uid_map");
-  unsigned long inside = 0;
-  unsigned long outside = 0;
-  unsigned long count = 0;
-  map >> inside >> outside >> count;
-  return count > 65535;
 }
 
 bool SwitchUser(uid_t user, gid_t group) {
