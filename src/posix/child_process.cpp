@@ -313,6 +313,12 @@ void TerminateChild(pid_t pid) {
   kill(pid, SIGTERM);
 }
 
+void KillChild(pid_t pid) {
+  if (!HasEnded(pid)) {
+    kill(pid, SIGKILL);
+  }
+}
+
 bool HasSucceeded(int waitStatus) {
   return WIFEXITED(waitStatus) && WEXITSTATUS(waitStatus) == 0;
 }

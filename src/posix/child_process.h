@@ -57,6 +57,9 @@ void ReapInheritedChildren(const std::function<bool(pid_t)>& isOwn);
 /// Sends SIGTERM to the child alone, not to its descendants.
 void TerminateChild(pid_t pid);
 
+/// Kills the child alone, unless it has ended.
+void KillChild(pid_t pid);
+
 /// Returns whether a wait status is that of a program that exited with 0.
 bool HasSucceeded(int waitStatus);
 

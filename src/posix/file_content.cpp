@@ -1,6 +1,7 @@
 #include "posix/file_content.h"
 
 #include <fcntl.h>
+#include <sys/mman.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
@@ -114,6 +115,24 @@ std::string ReadSystemFile(const std::string& path, size_t limit) {
   }
   const bool isProtected = status.st_uid == 0 && (status.st_mode & kWritableByOthers) == 0;
   return isProtected ? ReadSmall(file, status, limit) : std::string();
+}
+
+unsigned char* FileMapping::Map(int fd, size_t size) {
+  Unmap();
+  void* const memory = mmap(nullptr, size, PROT_READ, MAP_PRIVATE, fd, 0);
+  if (memory == MAP_FAILED) {
+    return nullptr;
+  }
+  memory_ = memory;
+  size_ = size;
+  return static_cast<unsigned char*>(memory);
+}
+
+void FileMapping::Unmap() {
+  if (memory_ != nullptr) {
+    munmap(memory_, size_);
+    memory_ = nullptr;
+  }
 }
 
 int WriteAll(int fd, std::string_view content) {

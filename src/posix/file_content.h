@@ -36,6 +36,25 @@ std::string ReadSmallFile(const std::string& path, size_t limit);
 /// and on errors. Never waits for a pipe's writer.
 std::string ReadSystemFile(const std::string& path, size_t limit);
 
+/// The content of a file as memory that cannot be written to. Where the file has become shorter
+/// since, reading it ends the process.
+class FileMapping {
+ public:
+  FileMapping() = default;
+  FileMapping(const FileMapping&) = delete;
+  FileMapping& operator=(const FileMapping&) = delete;
+  ~FileMapping() { Unmap(); }
+
+  /// Maps the first `size` bytes of the file instead of what is mapped. Returns null, with errno
+  /// set, on failure, also for size 0.
+  unsigned char* Map(int fd, size_t size);
+  void Unmap();
+
+ private:
+  void* memory_ = nullptr;
+  size_t size_ = 0;
+};
+
 /// Writes all of `content` to `fd`. Returns 0 or an errno value.
 int WriteAll(int fd, std::string_view content);
 

@@ -67,6 +67,16 @@ FileDescriptor OpenForReading(const std::string& path) {
   return FileDescriptor(open(path.c_str(), O_RDONLY | O_NONBLOCK | O_NOCTTY | O_CLOEXEC));
 }
 
+bool IsProgramToTrust(const std::string& path) {
+  struct stat self = {};
+  struct stat program = {};
+  if (stat("/proc/self/exe", &self) != 0 || lstat(path.c_str(), &program) != 0) {
+    return false;
+  }
+  const bool isOurs = program.st_uid == 0 || program.st_uid == self.st_uid;
+  return S_ISREG(program.st_mode) && isOurs && (program.st_mode & S_IWOTH) == 0;
+}
+
 int SetFileMode(int fd, unsigned mode) {
   return ErrnoUnless(fchmod(fd, mode) == 0);
 }

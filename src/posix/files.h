@@ -66,6 +66,10 @@ int CheckAccess(const std::string& path, FileAccess access);
 /// no open descriptor, with errno set, on failure.
 FileDescriptor OpenForReading(const std::string& path);
 
+/// Returns whether a regular file is at `path` that belongs to root or to the owner of the running
+/// program and that others cannot change.
+bool IsProgramToTrust(const std::string& path);
+
 /// Sets the permission bits of the open file `fd`. Returns 0 or an errno value.
 int SetFileMode(int fd, unsigned mode);
 

@@ -3,6 +3,7 @@
 #include <fcntl.h>
 #include <limits.h>
 #include <linux/openat2.h>
+#include <poll.h>
 #include <sys/random.h>
 #include <sys/syscall.h>
 #include <unistd.h>
@@ -205,6 +206,22 @@ bool Randomize(std::string& name, size_t count) {
   return true;
 }
 
+/// Opens for reading the regular file that `located` refers to. Returns 0 or an errno value.
+int Reopen(const FileDescriptor& located, FileDescriptor& out) {
+  constexpr int kTries = 200;
+  constexpr int kPauseMilliseconds = 5;
+  const std::string path = "/proc/self/fd/" + std::to_string(located.Get());
+  for (int i = 0; i < kTries; ++i) {
+    out = OpenForReading(path);
+    // The first attempt asks the holder of a lease, such as a file server, to give it up.
+    if (out.IsOpen() || errno != EAGAIN) {
+      break;
+    }
+    poll(nullptr, 0, kPauseMilliseconds);
+  }
+  return out.IsOpen() ? 0 : errno;
+}
+
 }  // namespace
 
 HeldFolder::HeldFolder(const std::string& path) {
@@ -342,6 +359,20 @@ int ReadStatus(const std::string& path, struct stat& status) {
 
 FileDescriptor OpenEntry(const std::string& path) {
   return FolderEntry(path).Open(O_RDONLY);
+}
+
+int OpenRegularFile(const std::string& path, OpenedFile& out) {
+  // Unlike an ordinary open, this has no effect on a device or pipe.
+  const FileDescriptor located = FolderEntry(path).Open(kPathOnly);
+  struct stat status = {};
+  if (!located.IsOpen() || fstat(located.Get(), &status) != 0) {
+    return errno;
+  }
+  if (!S_ISREG(status.st_mode)) {
+    return S_ISDIR(status.st_mode) ? EISDIR : EINVAL;
+  }
+  out.owner = status.st_uid;
+  return Reopen(located, out.file);
 }
 
 DIR* OpenDirectoryStream(const std::string& path) {

@@ -109,6 +109,17 @@ int ReadStatus(const std::string& path, struct stat& status);
 /// errno set, on failure.
 FileDescriptor OpenEntry(const std::string& path);
 
+/// A file that is open for reading, and the user id of its owner.
+struct OpenedFile {
+  FileDescriptor file;
+  uint32_t owner = 0;
+};
+
+/// Opens the regular file at `path` for reading, without any effect on other kinds of files. Waits
+/// only shortly for the holder of a lease. Returns 0 or an errno value: EISDIR for a directory,
+/// EINVAL for any other file that is not regular.
+int OpenRegularFile(const std::string& path, OpenedFile& out);
+
 /// Opens the directory at `path` to list its entries. The caller closes the stream. Returns null,
 /// with errno set, on failure.
 DIR* OpenDirectoryStream(const std::string& path);

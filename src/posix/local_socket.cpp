@@ -34,6 +34,45 @@ int ConnectTo(int socket, const sockaddr_un& address) {
   return connect(socket, generic, sizeof(address)) == 0 ? 0 : errno;
 }
 
+/// A message of one part, with room for one descriptor.
+class DescriptorMessage {
+ public:
+  DescriptorMessage(void* bytes, size_t size) : part_{bytes, size} {
+    header_.msg_iov = &part_;
+    header_.msg_iovlen = 1;
+    header_.msg_control = control_;
+    header_.msg_controllen = sizeof control_;
+  }
+  DescriptorMessage(const DescriptorMessage&) = delete;
+  DescriptorMessage& operator=(const DescriptorMessage&) = delete;
+
+  msghdr* Header() { return &header_; }
+
+  void Attach(int fd) {
+    cmsghdr* const item = CMSG_FIRSTHDR(&header_);
+    item->cmsg_level = SOL_SOCKET;
+    item->cmsg_type = SCM_RIGHTS;
+    item->cmsg_len = CMSG_LEN(sizeof fd);
+    std::memcpy(CMSG_DATA(item), &fd, sizeof fd);
+  }
+
+  /// Returns the descriptor that has come with the message.
+  FileDescriptor Detach() {
+    const cmsghdr* const item = CMSG_FIRSTHDR(&header_);
+    int fd = -1;
+    if (item != nullptr && item->cmsg_level == SOL_SOCKET && item->cmsg_type == SCM_RIGHTS &&
+        item->cmsg_len == CMSG_LEN(sizeof fd)) {
+      std::memcpy(&fd, CMSG_DATA(item), sizeof fd);
+    }
+    return FileDescriptor(fd);
+  }
+
+ private:
+  iovec part_;
+  msghdr header_ = {};
+  alignas(cmsghdr) char control_[CMSG_SPACE(sizeof(int))] = {};
+};
+
 bool IsOver(const Deadline& deadline) {
   return deadline.Left() == std::chrono::nanoseconds::zero();
 }
@@ -212,6 +251,43 @@ int ReceiveSome(int socket, char* buffer, size_t size, const Deadline& deadline,
     }
     if (error != EAGAIN) {
       return error;
+    }
+  }
+}
+
+MessageSockets ConnectMessageSockets() {
+  int ends[2] = {-1, -1};
+  if (socketpair(AF_UNIX, SOCK_SEQPACKET | SOCK_CLOEXEC, 0, ends) != 0) {
+    return {};
+  }
+  return {FileDescriptor(ends[0]), FileDescriptor(ends[1])};
+}
+
+int SendDescriptor(int socket, std::string_view message, int fd) {
+  std::string bytes(message);
+  DescriptorMessage packed(bytes.data(), bytes.size());
+  packed.Attach(fd);
+  for (;;) {
+    if (sendmsg(socket, packed.Header(), MSG_NOSIGNAL | MSG_DONTWAIT) >= 0) {
+      return 0;
+    }
+    if (errno != EINTR) {
+      return errno;
+    }
+  }
+}
+
+int ReceiveDescriptor(int socket, char* buffer, size_t size, size_t& got, FileDescriptor& fd) {
+  for (;;) {
+    DescriptorMessage packed(buffer, size);
+    const ssize_t count = recvmsg(socket, packed.Header(), MSG_CMSG_CLOEXEC);
+    if (count >= 0) {
+      got = static_cast<size_t>(count);
+      fd = packed.Detach();
+      return 0;
+    }
+    if (errno != EINTR) {
+      return errno;
     }
   }
 }

@@ -52,6 +52,22 @@ int ReceiveNow(int socket, char* buffer, size_t size, size_t& got);
 /// deadline.
 int ReceiveSome(int socket, char* buffer, size_t size, const Deadline& deadline, size_t& got);
 
+/// Two connected sockets for messages; the other end receives each as a whole.
+struct MessageSockets {
+  FileDescriptor own;
+  FileDescriptor other;
+};
+
+/// Connects two new sockets. On failure, neither is open and errno is set.
+MessageSockets ConnectMessageSockets();
+
+/// Sends a message with a copy of the descriptor `fd`, without waiting.
+int SendDescriptor(int socket, std::string_view message, int fd);
+
+/// Waits for a message; `got` is 0 at the end of the connection. `fd` is open only if a descriptor
+/// came with the message.
+int ReceiveDescriptor(int socket, char* buffer, size_t size, size_t& got, FileDescriptor& fd);
+
 /// Signals the end of the data to the other end, which can still send.
 void EndSending(int socket);
 

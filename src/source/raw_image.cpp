@@ -16,6 +16,7 @@
 #include "posix/log.h"
 #include "profiles/thumbnail_profile.h"
 #include "source/orientation.h"
+#include "source/raw_limit.h"
 #include "source/tool_output.h"
 #include "storage/log_source.h"
 
@@ -102,7 +103,7 @@ std::string Decode(const DirectoryJob& job, const std::string& rawPath,
   }
   RemoveEntry(previewPath);
   const std::string ppmPath = thumbDir + "/RAW_TEMP.ppm";
-  if (DcrawToFile(rawPath, ppmPath, "-w")) {
+  if (IsWithinRawLimit(rawPath) && DcrawToFile(rawPath, ppmPath, "-w")) {
     return ppmPath;
   }
   LogError(kProgramLogSource, 660, "Failed to convert raw " + rawPath + " to pnm");
