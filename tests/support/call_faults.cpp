@@ -267,8 +267,11 @@ class CallFaults::Supervisor {
     response.id = notification.id;
     response.flags = SECCOMP_USER_NOTIF_FLAG_CONTINUE;
     Decide(notification, &response);
-    // Fails when the process has been killed meanwhile.
-    ioctl(listener.Get(), SECCOMP_IOCTL_NOTIF_SEND, &response);
+    if (!killed_) {
+      // Fails when the process has ended meanwhile.
+      ioctl(listener.Get(), SECCOMP_IOCTL_NOTIF_SEND, &response);
+    }
+    killed_ = false;
   }
 
   void Decide(const seccomp_notif& notification, seccomp_notif_resp* response) {
@@ -311,7 +314,8 @@ class CallFaults::Supervisor {
       return;
     }
     if (fault_->kill) {
-      kill(ProcessOf(task), SIGKILL);
+      // Without an answer the call is never made.
+      killed_ = kill(ProcessOf(task), SIGKILL) == 0;
       return;
     }
     if (fault_->error == kShortTransfer) {
@@ -371,6 +375,7 @@ class CallFaults::Supervisor {
   CallScope scope_;
   std::optional<CallFault> fault_;
   pid_t program_ = 0;
+  bool killed_ = false;  // the process of the call in hand
   std::vector<MadeCall> calls_;
   std::map<std::pair<const WatchedCall*, std::string>, size_t> occurrences_;
   std::atomic<bool> struck_{false};
