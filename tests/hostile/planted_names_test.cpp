@@ -112,6 +112,7 @@ std::vector<Planted> MarkersAndThumbs() {
     rows.push_back({"", name, LinkToSharedText});
     rows.push_back({"", name, Fifo});
     rows.push_back({"", name, Socket});
+    rows.push_back({"", name, Directory});
   }
   return rows;
 }
