@@ -39,7 +39,7 @@ int LeaveToImageMagick(const CommandLine& line, size_t memoryLimit) {
 }
 
 int Convert(const ConversionPlan& plan, const CommandLine& line, size_t memoryLimit) {
-  const FileDescriptor file = OpenTrusted(plan.source);
+  const FileDescriptor file = OpenSource(plan.source);
   if (!file.IsOpen()) {
     ReportFailure("cannot open %s: %s", plan.source.c_str(), std::strerror(errno));
     return kFailed;

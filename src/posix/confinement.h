@@ -29,11 +29,24 @@ void LowerLimits(const ResourceLimits& limits);
 /// makes system calls.
 void DisableCoreDumps();
 
+/// The mechanisms that the kernel supports and, if this process is in a sandbox itself, that
+/// allows.
+struct ConfinementSupport {
+  bool noNewPrivileges = false;
+  bool seccomp = false;     ///< filters of system calls
+  int landlockVersion = 0;  ///< 0: none
+  bool openat2 = false;     ///< opening a path without following links
+};
+
+ConfinementSupport FindConfinementSupport();
+
 /// The restrictions of a process.
 struct Confinement {
   ResourceLimits limits;
   bool blocksSystemCalls = true;      ///< those of BlockUnneededSystemCalls
   std::optional<AllowedFiles> files;  ///< nothing: all files
+  /// Variables of a program that is started, as "NAME=value", besides those that every program has.
+  std::vector<std::string> environment;
 };
 
 /// A confinement in the form that the kernel takes, so that a process can enter it without

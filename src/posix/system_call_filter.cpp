@@ -9,10 +9,12 @@
 #include <sys/syscall.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <cerrno>
 #include <cstddef>
 #include <cstdint>
 #include <initializer_list>
+#include <utility>
 #include <vector>
 
 // Only for the numbers of the system calls: loading the library and making a filter with it takes
@@ -135,23 +137,42 @@ constexpr uint32_t kNewNamespace[] = {CLONE_NEWNS,   CLONE_NEWCGROUP, CLONE_NEWU
 
 constexpr int kPrograms[] = {SCMP_SYS(execve), SCMP_SYS(execveat)};
 
-/// A program for the kernel that allows every system call without a rule. Rules for system calls
-/// that do not exist on this architecture are ignored. Instructions that jump skip as many of the
-/// following ones as they say.
+/// Instructions for the kernel. A jump skips as many of the following ones as it says.
+using Code = std::vector<sock_filter>;
+
+sock_filter Instruction(unsigned code, uint32_t operand, unsigned ifTrue = 0,
+                        unsigned ifFalse = 0) {
+  return {static_cast<uint16_t>(code), static_cast<uint8_t>(ifTrue), static_cast<uint8_t>(ifFalse),
+          operand};
+}
+
+sock_filter Load(size_t offset) {
+  return Instruction(BPF_LD | BPF_W | BPF_ABS, static_cast<uint32_t>(offset));
+}
+
+sock_filter Return(uint32_t action) {
+  return Instruction(BPF_RET | BPF_K, action);
+}
+
+/// Refuses a call by the low 32 bits of an argument.
+struct ArgumentTest {
+  unsigned argument;
+  uint32_t mask;
+  uint32_t value;
+  bool refusesEqual;  ///< refuses the value, not all others
+};
+
+/// What to do with the system calls from this number to the next rule.
+struct Rule {
+  uint32_t first;
+  uint32_t action;  ///< if no test refuses the call
+  std::vector<ArgumentTest> tests;
+};
+
+/// A filter that allows every system call without a rule. Rules for system calls that do not exist
+/// on this architecture are ignored.
 class FilterProgram {
  public:
-  FilterProgram() {
-    Load(offsetof(seccomp_data, arch));
-    // Other calling conventions use other system call numbers; no program here uses them.
-    Add(BPF_JMP | BPF_JEQ | BPF_K, kArchitecture, 1, 0);
-    Return(kRefuse);
-    LoadNumber();
-#if defined(__x86_64__)
-    Add(BPF_JMP | BPF_JGE | BPF_K, kX32Bit, 0, 1);
-    Return(kRefuse);
-#endif
-  }
-
   template <size_t count>
   void Refuse(const int (&calls)[count]) {
     for (const int call : calls) {
@@ -159,104 +180,147 @@ class FilterProgram {
     }
   }
 
-  void Always(uint32_t action, int call) {
-    if (call >= 0) {
-      Add(BPF_JMP | BPF_JEQ | BPF_K, static_cast<uint32_t>(call), 0, 1);
-      Return(action);
-    }
+  void Always(uint32_t action, int call) { Add(call, action, {}); }
+
+  void RefuseWhen(int call, std::vector<ArgumentTest> tests) {
+    Add(call, SECCOMP_RET_ALLOW, std::move(tests));
   }
 
-  /// Refuses the call when the low 32 bits of the argument, masked, are equal to `value`.
-  void RefuseEqual(int call, unsigned argument, uint32_t mask, uint32_t value) {
-    Compare(call, argument, mask, value, true);
-  }
-  /// The same for any other value.
-  void RefuseOther(int call, unsigned argument, uint32_t value) {
-    Compare(call, argument, UINT32_MAX, value, false);
-  }
-
-  std::vector<sock_filter> Finish() {
-    Return(SECCOMP_RET_ALLOW);
-    return std::move(code_);
+  Code Finish() {
+    // Other calling conventions use other system call numbers; no program here uses them.
+    Code code = {Load(offsetof(seccomp_data, arch)),
+                 Instruction(BPF_JMP | BPF_JEQ | BPF_K, kArchitecture, 1, 0), Return(kRefuse),
+                 Load(offsetof(seccomp_data, nr))};
+    const std::vector<Rule> ranges = Ranges();
+    AppendSearch(ranges.data(), ranges.data() + ranges.size(), code);
+    return code;
   }
 
  private:
-  void Compare(int call, unsigned argument, uint32_t mask, uint32_t value, bool refusesEqual) {
-    if (call < 0) {
+  void Add(int call, uint32_t action, std::vector<ArgumentTest> tests) {
+    if (call >= 0) {
+      rules_.push_back({static_cast<uint32_t>(call), action, std::move(tests)});
+    }
+  }
+
+  /// Returns rules for all numbers, in their order.
+  std::vector<Rule> Ranges() {
+    std::sort(rules_.begin(), rules_.end(),
+              [](const Rule& a, const Rule& b) { return a.first < b.first; });
+    std::vector<Rule> ranges;
+    uint32_t next = 0;
+    for (const Rule& rule : rules_) {
+      if (rule.first > next) {
+        AddRange(ranges, {next, SECCOMP_RET_ALLOW, {}});
+      }
+      AddRange(ranges, rule);
+      next = rule.first + 1;
+    }
+    AddRange(ranges, {next, SECCOMP_RET_ALLOW, {}});
+#if defined(__x86_64__)
+    AddRange(ranges, {kX32Bit, kRefuse, {}});
+#endif
+    return ranges;
+  }
+
+  /// Extends the last range instead when it does the same.
+  static void AddRange(std::vector<Rule>& ranges, const Rule& range) {
+    const bool isSame = !ranges.empty() && ranges.back().action == range.action &&
+                        ranges.back().tests.empty() && range.tests.empty();
+    if (!isSame) {
+      ranges.push_back(range);
+    }
+  }
+
+  /// The kernel runs a new filter for every system call there is, so starting a program would take
+  /// noticeably longer with a list that is searched from its beginning.
+  static void AppendSearch(const Rule* begin, const Rule* end, Code& code) {
+    if (end - begin == 1) {
+      AppendRule(*begin, code);
       return;
     }
+    const Rule* const middle = begin + (end - begin) / 2;
+    code.push_back(Instruction(BPF_JMP | BPF_JGE | BPF_K, middle->first, 0, 1));
+    // A conditional jump reaches only 255 instructions.
+    code.push_back(Instruction(BPF_JMP | BPF_JA, 0));
+    const size_t lower = code.size();
+    AppendSearch(begin, middle, code);
+    code[lower - 1].k = static_cast<uint32_t>(code.size() - lower);
+    AppendSearch(middle, end, code);
+  }
+
+  static void AppendRule(const Rule& rule, Code& code) {
     constexpr size_t kLowHalf = __BYTE_ORDER__ == __ORDER_LITTLE_ENDIAN__ ? 0 : sizeof(uint32_t);
-    Add(BPF_JMP | BPF_JEQ | BPF_K, static_cast<uint32_t>(call), 0, 5);
-    Load(offsetof(seccomp_data, args) + argument * sizeof(uint64_t) + kLowHalf);
-    Add(BPF_ALU | BPF_AND | BPF_K, mask, 0, 0);
-    Add(BPF_JMP | BPF_JEQ | BPF_K, value, refusesEqual ? 0 : 1, refusesEqual ? 1 : 0);
-    Return(kRefuse);
-    LoadNumber();
+    for (const ArgumentTest& test : rule.tests) {
+      const unsigned skip = test.refusesEqual ? 1 : 0;
+      code.push_back(
+          Load(offsetof(seccomp_data, args) + test.argument * sizeof(uint64_t) + kLowHalf));
+      code.push_back(Instruction(BPF_ALU | BPF_AND | BPF_K, test.mask));
+      code.push_back(Instruction(BPF_JMP | BPF_JEQ | BPF_K, test.value, 1 - skip, skip));
+      code.push_back(Return(kRefuse));
+    }
+    code.push_back(Return(rule.action));
   }
 
-  void LoadNumber() {
-    Load(offsetof(seccomp_data, nr));
-  }
-  void Load(size_t offset) {
-    Add(BPF_LD | BPF_W | BPF_ABS, static_cast<uint32_t>(offset), 0, 0);
-  }
-  void Return(uint32_t action) {
-    Add(BPF_RET | BPF_K, action, 0, 0);
-  }
-  void Add(unsigned code, uint32_t operand, unsigned ifTrue, unsigned ifFalse) {
-    code_.push_back({static_cast<uint16_t>(code), static_cast<uint8_t>(ifTrue),
-                     static_cast<uint8_t>(ifFalse), operand});
-  }
-
-  std::vector<sock_filter> code_;
+  std::vector<Rule> rules_;
 };
 
-std::vector<sock_filter> MakeFilterOfUnneededCalls() {
+Code MakeFilterOfUnneededCalls() {
   FilterProgram program;
   program.Refuse(kNetwork);
   program.Refuse(kOtherProcesses);
   program.Refuse(kSystem);
   program.Refuse(kFileAttributes);
   // New namespaces would come with new privileges.
+  std::vector<ArgumentTest> namespaces;
   for (const uint32_t flag : kNewNamespace) {
-    program.RefuseEqual(SCMP_SYS(clone), 0, flag, flag);
+    namespaces.push_back({0, flag, flag, true});
   }
+  program.RefuseWhen(SCMP_SYS(clone), namespaces);
   program.Always(kUnknown, SCMP_SYS(clone3));
   // These insert input into the terminal that the program was started from.
-  for (const uint32_t request : {TIOCSTI, TIOCLINUX}) {
-    program.RefuseEqual(SCMP_SYS(ioctl), 1, UINT32_MAX, request);
-  }
+  program.RefuseWhen(SCMP_SYS(ioctl),
+                     {{1, UINT32_MAX, TIOCSTI, true}, {1, UINT32_MAX, TIOCLINUX, true}});
   return program.Finish();
 }
 
 /// Never destroyed: threads may still start tools while the program ends.
-const std::vector<sock_filter>& FilterOfUnneededCalls() {
-  static const auto* const filter = new std::vector<sock_filter>(MakeFilterOfUnneededCalls());
+const Code& FilterOfUnneededCalls() {
+  static const auto* const filter = new Code(MakeFilterOfUnneededCalls());
   return *filter;
 }
 
 /// Returns what the system call returns: 0, -1 with errno set, or the id of a thread.
-long Load(const std::vector<sock_filter>& filter, unsigned flags) {
+long Install(const Code& filter, unsigned flags) {
   sock_fprog program = {static_cast<unsigned short>(filter.size()),
                         const_cast<sock_filter*>(filter.data())};
   return syscall(SYS_seccomp, SECCOMP_SET_MODE_FILTER, flags, &program);
 }
 
 /// Activates a filter. Returns 0 or an errno value. Only makes system calls.
-int Activate(const std::vector<sock_filter>& filter) {
+int Activate(const Code& filter) {
   // The mitigation would slow down decoding, and a confined process has no secrets to protect from
   // itself.
-  if (Load(filter, SECCOMP_FILTER_FLAG_SPEC_ALLOW) == 0) {
+  if (Install(filter, SECCOMP_FILTER_FLAG_SPEC_ALLOW) == 0) {
     return 0;
   }
   // The flag is newer than filters.
-  return errno == EINVAL && Load(filter, 0) == 0 ? 0 : errno;
+  return errno == EINVAL && Install(filter, 0) == 0 ? 0 : errno;
 }
 
 }  // namespace
 
 int RefuseNewPrivileges() {
   return prctl(PR_SET_NO_NEW_PRIVS, 1, 0, 0, 0) == 0 ? 0 : errno;
+}
+
+bool CanRefuseNewPrivileges() {
+  return prctl(PR_GET_NO_NEW_PRIVS, 0, 0, 0, 0) >= 0;
+}
+
+bool CanBlockSystemCalls() {
+  // A missing filter is noticed only where filters are supported.
+  return syscall(SYS_seccomp, SECCOMP_SET_MODE_FILTER, 0, nullptr) < 0 && errno == EFAULT;
 }
 
 void PrepareSystemCallFilter() {
@@ -272,12 +336,12 @@ void BlockOtherPrograms() {
   FilterProgram program;
   program.Refuse(kPrograms);
   for (const int call : {SCMP_SYS(kill), SCMP_SYS(tgkill)}) {
-    program.RefuseOther(call, 0, self);
+    program.RefuseWhen(call, {{0, UINT32_MAX, self, false}});
   }
   program.Always(kRefuse, SCMP_SYS(tkill));
-  const std::vector<sock_filter> filter = program.Finish();
-  if (Load(filter, SECCOMP_FILTER_FLAG_TSYNC | SECCOMP_FILTER_FLAG_SPEC_ALLOW) != 0 &&
-      Load(filter, SECCOMP_FILTER_FLAG_TSYNC) != 0) {
+  const Code filter = program.Finish();
+  if (Install(filter, SECCOMP_FILTER_FLAG_TSYNC | SECCOMP_FILTER_FLAG_SPEC_ALLOW) != 0 &&
+      Install(filter, SECCOMP_FILTER_FLAG_TSYNC) != 0) {
     Activate(filter);
   }
 }

@@ -9,9 +9,9 @@ namespace vela {
 using DirectoryVisitor = std::function<void(const char* path, bool isReadable)>;
 
 /// Calls `visit` for the directory `root` and every directory below it on the same file system
-/// whose name is to be indexed, a directory before its subdirectories; links are followed, each
-/// directory is visited once. Returns 0, or -1 with errno set when the walk ended early. One walk
-/// at a time per thread.
+/// whose name is to be indexed, a directory before its subdirectories; trusted links are followed,
+/// each directory is visited once. Returns 0, or -1 with errno set when `root` does not exist or a
+/// part of the tree could not be read (see WalkTree).
 int ForEachIndexedDirectory(const char* root, const DirectoryVisitor& visit);
 
 }  // namespace vela

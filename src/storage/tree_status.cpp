@@ -9,8 +9,6 @@ using namespace vela;
 
 namespace {
 
-constexpr int kWalkDescriptors = 100;
-
 const char* LastComponent(const char* path) {
   const char* slash = std::strrchr(path, '/');
   return slash == nullptr ? path : slash + 1;
@@ -40,8 +38,7 @@ int GetDirThumbStatusRecursive_Callback(const char* path, const struct stat* /*s
 int GetDirThumbStatusRecursive(const char* dir, int* photosOut, int* thumbsOut) {
   g_incomplete_photo_num = 0;
   g_incomplete_thumb_num = 0;
-  const int result = nftw(dir, GetDirThumbStatusRecursive_Callback, kWalkDescriptors,
-                          FTW_ACTIONRETVAL | FTW_MOUNT);
+  const int result = WalkTree(dir, GetDirThumbStatusRecursive_Callback);
   *photosOut = g_incomplete_photo_num;
   *thumbsOut = g_incomplete_thumb_num;
   return result;

@@ -1,10 +1,9 @@
 // Thumbnail status: the outstanding work.
 #pragma once
 
-#include <ftw.h>
-#include <sys/stat.h>
-
 #include <cstdint>
+
+#include "posix/tree_walk.h"
 
 /// Photos with at least one missing thumbnail, and missing thumbnails, counted by the last
 /// GetDirThumbStatusRecursive. One such scan at a time in a process.
@@ -22,7 +21,8 @@ void GetThumbStatus(const char* path, int* missingOut, int* presentOut, int32_t 
 void GetDirThumbStatus(const char* dir, int* photosOut, int* thumbsOut);
 
 /// Counts the same for the tree `dir`, without other file systems and without directories in the
-/// photo queue. Returns 0, or -1 when the walk ended early.
+/// photo queue. Returns 0, or -1 when `dir` does not exist
+/// or a part of the tree could not be read.
 int GetDirThumbStatusRecursive(const char* dir, int* photosOut, int* thumbsOut);
 
 /// The step of that scan: adds a directory to the two counters above. Returns the walk's action

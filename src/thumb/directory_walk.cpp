@@ -11,9 +11,7 @@ using namespace vela;
 
 namespace {
 
-constexpr int kWalkDescriptors = 100;
-
-/// The C library's walk passes no user pointer to its callback.
+/// The step of the walk has no parameter for it.
 std::string g_profile_path;
 
 }  // namespace
@@ -49,7 +47,7 @@ namespace vela {
 
 void RunDirectoryTree(const std::string& dirPath, const std::string& profileFilePath) {
   g_profile_path = profileFilePath;
-  nftw(dirPath.c_str(), RecursiveDirCallback, kWalkDescriptors, FTW_ACTIONRETVAL | FTW_MOUNT);
+  WalkTree(dirPath.c_str(), RecursiveDirCallback);
 }
 
 }  // namespace vela

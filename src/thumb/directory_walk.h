@@ -1,10 +1,9 @@
 // From the arguments to the directories: the recursive walk and the processing of each directory.
 #pragma once
 
-#include <ftw.h>
-#include <sys/stat.h>
-
 #include <string>
+
+#include "posix/tree_walk.h"
 
 /// Makes the thumbnails of the directory `dirPath` with the profiles of `profileFilePath`. Skips a
 /// directory or profile file that does not exist and a directory in which no metadata may be

@@ -4,6 +4,7 @@
 
 #include "program/stub_program_test.h"
 #include "support/mounts.h"
+#include "support/users.h"
 
 namespace vela_test {
 namespace {
@@ -133,13 +134,35 @@ TEST_F(Walk, LoopsEnd) {
   EXPECT_THAT(WalkTree(), ElementsAre("/tmp/photos", "/tmp/photos/1"));
 }
 
-TEST_F(Walk, FailureInTheMiddleIsIgnored) {
-  // A link to itself ends the C library's walk.
-  MakePhotosIn({"/tmp/photos", "/tmp/other"});
+TEST_F(Walk, LinksThatLeadNowhereDoNotEndIt) {
+  MakePhotosIn({"/tmp/photos/1"});
   ASSERT_EQ(symlink("round", "/tmp/photos/round"), 0);
-  EXPECT_THAT(ReportedPhotos(RunWithDaemon({"R:/tmp/photos", "R:/tmp/other"})),
+  ASSERT_EQ(symlink("pong", "/tmp/photos/ping"), 0);
+  ASSERT_EQ(symlink("ping", "/tmp/photos/pong"), 0);
+  ASSERT_EQ(symlink("1/a.jpg/below", "/tmp/photos/file"), 0);
+  ASSERT_EQ(symlink(std::string(300, 'n').c_str(), "/tmp/photos/long"), 0);
+  MakePhotosIn({"/tmp/photos/2"});
+  EXPECT_THAT(WalkTree(), UnorderedElementsAre("/tmp/photos/1", "/tmp/photos/2"));
+}
+
+TEST_F(Walk, AFailureIsIgnored) {
+  MakePhotosIn({"/tmp/photos", "/tmp/other"});
+  ASSERT_EQ(symlink("round", "/tmp/round"), 0);
+  EXPECT_THAT(ReportedPhotos(RunWithDaemon({"R:/tmp/photos", "R:/tmp/round", "R:/tmp/other"})),
               ElementsAre("/tmp/photos/a.jpg", "/tmp/other/a.jpg"));
   EXPECT_THAT(ErrorLines(), IsEmpty());
+}
+
+TEST_F(Walk, DoesNotFollowLinksOfOtherUsers) {
+  if (!HasOtherUsers()) {
+    return;  // everything belongs to user 0
+  }
+  MakePhotosIn({"/tmp/private"});
+  ASSERT_EQ(chown("/tmp/private", 2000, 2000), 0);
+  ASSERT_EQ(symlink("/tmp/private", "/tmp/photos/link"), 0);
+  ASSERT_EQ(lchown("/tmp/photos/link", 1000, 1000), 0);
+  EXPECT_THAT(WalkTree(), IsEmpty());
+  EXPECT_FALSE(Exists("/tmp/private/@eaDir"));
 }
 
 TEST_F(Walk, SkipsDirectoriesThatCannotBeRead) {

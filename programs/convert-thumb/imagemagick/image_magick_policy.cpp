@@ -1,6 +1,8 @@
 #include "imagemagick/image_magick_policy.h"
 
+#include <cerrno>
 #include <cstdlib>
+#include <cstring>
 #include <string>
 
 #include "posix/files.h"
@@ -21,8 +23,9 @@ bool UsePolicy() {
   const std::string directory = kPolicyDirectory;
   const std::string last = directory + "/last";
   for (const std::string& file : {directory + "/policy.xml", last + "/ImageMagick/policy.xml"}) {
-    if (!IsRegularFile(file)) {
-      ReportFailure("%s is missing, so ImageMagick is not used", file.c_str());
+    // Opened because ImageMagick would ignore a policy that may not be read.
+    if (!OpenForReading(file).IsOpen()) {
+      ReportFailure("%s: %s, so ImageMagick is not used", file.c_str(), std::strerror(errno));
       return false;
     }
   }

@@ -13,6 +13,7 @@
 
 #include "posix/file_content.h"
 #include "posix/file_descriptor.h"
+#include "posix/folder.h"
 #include "process/source_file.h"
 #include "process/unfinished_outputs.h"
 
@@ -74,10 +75,6 @@ Replacement FillAndMove(const FileDescriptor& file, const std::string& scratch,
   }
   return WriteDurably(file, bytes, size) && MoveInto(former.place, scratch) ? Replacement::kDone
                                                                             : Replacement::kFailed;
-}
-
-bool IsOwnFile(const struct stat& status) {
-  return S_ISREG(status.st_mode) && status.st_nlink == 1 && status.st_uid == geteuid();
 }
 
 /// Makes room for a new file. Returns false, with errno set, when something is there that must not

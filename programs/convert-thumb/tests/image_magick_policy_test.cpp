@@ -89,7 +89,7 @@ TEST_F(ImageMagickPolicy, IsRequired) {
   const ProgramResult result = RunConverter({photo, "-negate", output_});
   EXPECT_EQ(result.exitCode, 1);
   EXPECT_EQ(result.err, std::string("convert-thumb: ") + kPolicies +
-                            "/policy.xml is missing, so ImageMagick is not used\n");
+                            "/policy.xml: No such file or directory, so ImageMagick is not used\n");
   EXPECT_FALSE(Exists(output_));
 }
 
