@@ -128,6 +128,11 @@ OpenOutput OpenForWriting(const std::string& path) {
   return {CreateOutput(place->directory, place->name, 0666), false};
 }
 
+bool IsDevice(const std::string& path) {
+  struct stat status;
+  return stat(path.c_str(), &status) == 0 && S_ISCHR(status.st_mode);
+}
+
 bool WriteOutputFile(const std::string& path, const unsigned char* bytes, size_t size) {
   const OpenOutput output = OpenForWriting(path);
   if (!output.file.IsOpen()) {
