@@ -201,7 +201,13 @@ std::string RealConverterPath() {
   return IsOwnConverterReal() ? OwnConverterPath() : kImageMagickPath;
 }
 
+void InstallImageMagickPolicy() {
+  MakeDirectories("/usr/vela/share");
+  InstallLink(SourceDirectory() + "/config/imagemagick", "/usr/vela/share/imagemagick");
+}
+
 void InstallRealConverter() {
+  InstallImageMagickPolicy();
   MakeDirectories("/usr/vela/lib");
   InstallLink(kImageMagickPath, "/usr/vela/lib/convert-thumb");
   InstallLink(IsOwnConverterReal() ? OwnConverterPath()

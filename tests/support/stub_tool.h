@@ -83,7 +83,10 @@ bool IsOwnConverterReal();
 /// The real converter's program.
 std::string RealConverterPath();
 
-/// Install the real tools where the program looks for them.
+/// Installs the policy of ImageMagick where the converter looks for it.
+void InstallImageMagickPolicy();
+
+/// Install the real tools where the program looks for them; the converter with the policy.
 void InstallRealConverter();
 void InstallRealExiftool();
 /// Installs both; dcraw and compare exist in a fresh sandbox.
