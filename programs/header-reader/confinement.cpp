@@ -15,6 +15,7 @@
 #include <cerrno>
 #include <cstddef>
 #include <cstdint>
+#include <utility>
 #include <vector>
 
 #include "posix/confinement.h"
@@ -85,7 +86,8 @@ void AllowCall(Filter& filter, long call) {
 }
 
 /// Allows the call unless one of these bits of an argument is set.
-void AllowCallWithout(Filter& filter, long call, std::vector<std::pair<unsigned, uint32_t>> bits) {
+void AllowCallWithout(Filter& filter, long call,
+                      const std::vector<std::pair<unsigned, uint32_t>>& bits) {
   const unsigned length = 3 * static_cast<unsigned>(bits.size()) + 1;
   filter.push_back(Instruction(BPF_JMP | BPF_JEQ | BPF_K, static_cast<uint32_t>(call), 0, length));
   for (const auto& [argument, mask] : bits) {
