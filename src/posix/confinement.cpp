@@ -41,6 +41,10 @@ int UnlessUnsupported(int error) {
 
 }  // namespace
 
+ConfinementSupport FindConfinementSupport() {
+  return {CanRefuseNewPrivileges(), CanBlockSystemCalls(), LandlockVersion(), CanRefuseLinks()};
+}
+
 void LowerLimits(const ResourceLimits& limits) {
 // A sanitizer reserves many times the memory of any limit.
 #if !defined(VELA_SANITIZED)

@@ -29,6 +29,17 @@ void LowerLimits(const ResourceLimits& limits);
 /// makes system calls.
 void DisableCoreDumps();
 
+/// The mechanisms that the kernel supports and, if this process is in a sandbox itself, that
+/// allows.
+struct ConfinementSupport {
+  bool noNewPrivileges = false;
+  bool seccomp = false;     ///< filters of system calls
+  int landlockVersion = 0;  ///< 0: none
+  bool openat2 = false;     ///< opening a path without following links
+};
+
+ConfinementSupport FindConfinementSupport();
+
 /// The restrictions of a process.
 struct Confinement {
   ResourceLimits limits;

@@ -147,4 +147,46 @@ int WriteAll(int fd, std::string_view content) {
   return 0;
 }
 
+int AppendWhole(int fd, std::string_view text) {
+  ssize_t written = -1;
+  do {
+    written = write(fd, text.data(), text.size());
+  } while (written < 0 && errno == EINTR);
+  if (written == static_cast<ssize_t>(text.size())) {
+    return 0;
+  }
+  if (written < 0) {
+    return errno;
+  }
+  // A part of a line would be read as another one. What others have appended behind it stays.
+  const off_t end = lseek(fd, 0, SEEK_CUR);
+  struct stat status = {};
+  if (end < written || fstat(fd, &status) != 0 || status.st_size != end) {
+    return ENOSPC;
+  }
+  return ftruncate(fd, end - written) == 0 ? ENOSPC : errno;
+}
+
+bool LacksFinalNewline(int fd) {
+  struct stat status = {};
+  if (fstat(fd, &status) == 0 && status.st_size == 0) {
+    return false;
+  }
+  return ReadAt(fd, status.st_size - 1, 1) != "\n";
+}
+
+int FlushFile(int fd) {
+  const int copy = fcntl(fd, F_DUPFD_CLOEXEC, 0);
+  return copy >= 0 && close(copy) == 0 ? 0 : errno;
+}
+
+int SyncFile(int fd) {
+  while (fdatasync(fd) != 0) {
+    if (errno != EINTR) {
+      return errno;
+    }
+  }
+  return 0;
+}
+
 }  // namespace vela

@@ -58,4 +58,20 @@ class FileMapping {
 /// Writes all of `content` to `fd`. Returns 0 or an errno value.
 int WriteAll(int fd, std::string_view content);
 
+/// Appends `text` to `fd`, which was opened with O_APPEND and for reading, in one write: completely
+/// or not at all, unless the remains of a failed write cannot be removed. Returns 0 or an errno
+/// value.
+int AppendWhole(int fd, std::string_view text);
+
+/// Returns true when the file is not empty and its last line has no newline at its end, or when
+/// that is unknown.
+bool LacksFinalNewline(int fd);
+
+/// Returns an error that was only noticed after the writing, as some file systems do when a file is
+/// closed: 0 or an errno value.
+int FlushFile(int fd);
+
+/// Waits until the content of the file is on the disk. Returns 0 or an errno value.
+int SyncFile(int fd);
+
 }  // namespace vela

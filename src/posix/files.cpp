@@ -8,6 +8,8 @@
 
 #include "posix/folder.h"
 
+#include "posix/file_content.h"
+
 namespace vela {
 
 namespace {
@@ -98,21 +100,24 @@ int RemoveFileIfPresent(const std::string& path) {
 }
 
 int AppendLine(const std::string& path, const std::string& text) {
-  const int flags = O_WRONLY | O_CREAT | O_APPEND | O_NOCTTY | O_CLOEXEC;
-  const FileDescriptor file(open(path.c_str(), flags, 0644));
+  const int flags = O_RDWR | O_CREAT | O_APPEND | O_NONBLOCK | O_NOCTTY | O_CLOEXEC;
+  FileDescriptor file(open(path.c_str(), flags, 0644));
   if (!file.IsOpen()) {
     return errno;
   }
-  const off_t end = lseek(file.Get(), 0, SEEK_END);
-  const std::string line = text + '\n';
-  const ssize_t written = write(file.Get(), line.data(), line.size());
-  if (written < 0) {
-    return errno;
+  const int error = AppendWhole(file.Get(), text + '\n');
+  return error != 0 || file.Close() ? error : errno;
+}
+
+int SyncNameOf(const std::string& path) {
+  const std::string name = path.substr(0, path.rfind('/') + 1);
+  const FileDescriptor directory = OpenForReading(name.empty() ? "." : name);
+  if (!directory.IsOpen()) {
+    // A user may be allowed to create files there, but not to read the directory.
+    return errno == EACCES ? 0 : errno;
   }
-  if (written == static_cast<ssize_t>(line.size())) {
-    return 0;
-  }
-  return ftruncate(file.Get(), end) == 0 ? ENOSPC : errno;
+  // EINVAL: the file system has nothing to wait for.
+  return fsync(directory.Get()) == 0 || errno == EINVAL ? 0 : errno;
 }
 
 }  // namespace vela

@@ -90,4 +90,8 @@ int RemoveFileIfPresent(const std::string& path);
 /// that does not fit on the volume is removed again. Returns 0 or an errno value.
 int AppendLine(const std::string& path, const std::string& text);
 
+/// Waits until the name of the file `path`, in its directory, is on the disk. Returns 0, also when
+/// the directory may not be read or its file system has nothing to wait for, or an errno value.
+int SyncNameOf(const std::string& path);
+
 }  // namespace vela

@@ -135,7 +135,8 @@ FileDescriptor LinkFollower::Open(int at, const std::string& path, int flags) {
   }
 }
 
-/// Opens `path` from the directory `at`; only trusted links are followed.
+}  // namespace
+
 FileDescriptor OpenTrusted(int at, const char* path, int flags) {
   open_how how = {};
   how.flags = static_cast<unsigned>(flags | ((flags & O_PATH) != 0 ? O_CLOEXEC : kNeverWait));
@@ -147,6 +148,8 @@ FileDescriptor OpenTrusted(int at, const char* path, int flags) {
   }
   return LinkFollower().Open(at, path, flags);
 }
+
+namespace {
 
 struct Held {
   std::string path;

@@ -18,6 +18,11 @@
 
 namespace vela {
 
+/// Opens `path`, which may be relative to the directory `at` (AT_FDCWD: the working directory),
+/// with the flags of open(2), which must not create anything; a pipe is never waited for. Returns
+/// no open descriptor, with errno set, on failure.
+FileDescriptor OpenTrusted(int at, const char* path, int flags);
+
 /// Keeps the directory at `path` open while the object exists: every FolderEntry in it that the
 /// same thread makes meanwhile uses it, whatever happens to the path. Objects must end in the
 /// reverse order of their creation.

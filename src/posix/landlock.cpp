@@ -2,15 +2,15 @@
 
 #include <fcntl.h>
 #include <linux/landlock.h>
-#include <linux/openat2.h>
 #include <sys/stat.h>
 #include <sys/syscall.h>
 #include <unistd.h>
 
 #include <cerrno>
-#include <climits>
 #include <cstdint>
 #include <utility>
+
+#include "posix/folder.h"
 
 namespace vela {
 
@@ -36,9 +36,6 @@ constexpr uint64_t kRead = LANDLOCK_ACCESS_FS_READ_FILE | LANDLOCK_ACCESS_FS_REA
 /// The rights that a rule for a file other than a directory can contain.
 constexpr uint64_t kOfFiles = LANDLOCK_ACCESS_FS_EXECUTE | LANDLOCK_ACCESS_FS_WRITE_FILE |
                               LANDLOCK_ACCESS_FS_READ_FILE | kTruncate | kDeviceControl;
-
-/// As many as the kernel itself follows.
-constexpr int kMaxLinks = 40;
 
 /// The kernel's structure in its latest known form; older kernels accept it as long as the fields
 /// that they do not know are zero.
@@ -91,82 +88,6 @@ void AllowChangesOf(const FileDescriptor& ruleset, const std::string& path, int 
   }
 }
 
-/// Opens the path if it contains no symbolic link at all.
-FileDescriptor OpenWithoutLinks(const std::string& path) {
-  open_how how = {};
-  how.flags = O_PATH | O_CLOEXEC;
-  how.resolve = RESOLVE_NO_SYMLINKS;
-  return FileDescriptor(
-      static_cast<int>(syscall(SYS_openat2, AT_FDCWD, path.c_str(), &how, sizeof how)));
-}
-
-bool IsTrusted(const struct stat& link, const struct stat& target) {
-  return link.st_uid == 0 || link.st_uid == geteuid() || link.st_uid == target.st_uid;
-}
-
-/// Opens a path one component after the other. No open descriptor, with errno set, on failure;
-/// ELOOP for a link that is not trusted.
-class LinkFollower {
- public:
-  FileDescriptor Open(const FileDescriptor* base, const std::string& path) {
-    FileDescriptor current(OpenStart(base, path));
-    size_t begin = path.find_first_not_of('/');
-    while (current.IsOpen() && begin != std::string::npos) {
-      const size_t end = path.find('/', begin);
-      current = OpenComponent(current, path.substr(begin, end - begin));
-      begin = end == std::string::npos ? end : path.find_first_not_of('/', end);
-    }
-    return current;
-  }
-
- private:
-  static int OpenStart(const FileDescriptor* base, const std::string& path) {
-    if (!path.empty() && path.front() == '/') {
-      return open("/", O_PATH | O_CLOEXEC);
-    }
-    return openat(base == nullptr ? AT_FDCWD : base->Get(), ".", O_PATH | O_CLOEXEC);
-  }
-
-  FileDescriptor OpenComponent(const FileDescriptor& directory, const std::string& name) {
-    FileDescriptor file(openat(directory.Get(), name.c_str(), O_PATH | O_NOFOLLOW | O_CLOEXEC));
-    struct stat status;
-    if (!file.IsOpen() || fstat(file.Get(), &status) != 0) {
-      return {};
-    }
-    return S_ISLNK(status.st_mode) ? Follow(directory, file, status) : std::move(file);
-  }
-
-  FileDescriptor Follow(const FileDescriptor& directory, const FileDescriptor& link,
-                        const struct stat& linkStatus) {
-    char text[PATH_MAX];
-    const ssize_t length = readlinkat(link.Get(), "", text, sizeof text);
-    if (length < 0 || ++links_ > kMaxLinks) {
-      errno = length < 0 ? errno : ELOOP;
-      return {};
-    }
-    FileDescriptor target = Open(&directory, std::string(text, static_cast<size_t>(length)));
-    struct stat status;
-    if (!target.IsOpen() || fstat(target.Get(), &status) != 0) {
-      return {};
-    }
-    if (!IsTrusted(linkStatus, status)) {
-      errno = ELOOP;
-      return {};
-    }
-    return target;
-  }
-
-  int links_ = 0;
-};
-
-FileDescriptor OpenTrusted(const std::string& path) {
-  FileDescriptor file = OpenWithoutLinks(path);
-  if (!file.IsOpen() && (errno == ELOOP || errno == ENOSYS || errno == EPERM)) {
-    file = LinkFollower().Open(nullptr, path);
-  }
-  return file;
-}
-
 /// Adds rules to a ruleset and remembers the first failure.
 class RulesetBuilder {
  public:
@@ -181,7 +102,7 @@ class RulesetBuilder {
 
   void AddUserPaths(const std::vector<std::string>& paths, uint64_t access) {
     for (const std::string& path : paths) {
-      Add(OpenTrusted(path), access);
+      Add(FolderEntry(path).Open(O_PATH), access);
     }
   }
 
@@ -217,6 +138,31 @@ int LandlockVersion() {
   const long version =
       syscall(SYS_landlock_create_ruleset, nullptr, 0, LANDLOCK_CREATE_RULESET_VERSION);
   return version < 0 ? 0 : static_cast<int>(version);
+}
+
+std::vector<std::string> LandlockCoverage(int version) {
+  constexpr struct {
+    int version;
+    const char* name;
+  } kCoverage[] = {{1, "reading"},
+                   {1, "writing"},
+                   {1, "running programs"},
+                   {kVersionOfTruncate, "truncating"},
+                   {kVersionOfTcp, "TCP"},
+                   {kVersionOfDeviceControl, "device control"},
+                   {kVersionOfScopes, "signals"},
+                   {kVersionOfScopes, "abstract sockets"}};
+  std::vector<std::string> names;
+  for (const auto& part : kCoverage) {
+    if (version >= part.version) {
+      names.emplace_back(part.name);
+    }
+  }
+  return names;
+}
+
+bool CanRefuseLinks() {
+  return OpenWithoutLinks("/").IsOpen();
 }
 
 int MakeLandlockRuleset(const AllowedFiles& files, FileDescriptor& ruleset) {

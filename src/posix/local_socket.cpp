@@ -2,6 +2,7 @@
 
 #include <fcntl.h>
 #include <poll.h>
+#include <sys/stat.h>
 #include <sys/time.h>
 #include <sys/un.h>
 #include <unistd.h>
@@ -109,6 +110,41 @@ int ConnectBlocking(int socket, const sockaddr_un& address, const Deadline& dead
   return SetBlocking(socket, false) ? 0 : errno;
 }
 
+int ConnectWithin(int socket, const std::string& path, const Deadline& deadline) {
+  sockaddr_un address;
+  if (!MakeAddress(path, address)) {
+    return ENAMETOOLONG;
+  }
+  const int error = ConnectTo(socket, address);
+  const bool isQueueFull = error == EAGAIN || error == EINTR;
+  return isQueueFull ? ConnectBlocking(socket, address, deadline) : error;
+}
+
+bool IsTrusted(uid_t user) {
+  return user == 0 || user == geteuid();
+}
+
+/// Opens the file at the path without using it. Returns 0 or an errno value.
+int OpenPlace(const char* path, int links, FileDescriptor& place, struct stat& status) {
+  place.Reset(open(path, O_PATH | O_CLOEXEC | links));
+  return place.IsOpen() && fstat(place.Get(), &status) == 0 ? 0 : errno;
+}
+
+/// Finds the socket of a trusted user. It is examined before the connection is made: a listener
+/// that accepts nothing would keep the client waiting without saying who it is. Returns 0 or an
+/// errno value, ECONNREFUSED when anything else is at the path.
+int FindTrustedSocket(const char* path, FileDescriptor& place) {
+  struct stat status = {};
+  int error = OpenPlace(path, O_NOFOLLOW, place, status);
+  if (error == 0 && S_ISLNK(status.st_mode) && IsTrusted(status.st_uid)) {
+    error = OpenPlace(path, 0, place, status);
+  }
+  if (error != 0) {
+    return error;
+  }
+  return S_ISSOCK(status.st_mode) && IsTrusted(status.st_uid) ? 0 : ECONNREFUSED;
+}
+
 }  // namespace
 
 FileDescriptor MakeLocalSocket() {
@@ -125,20 +161,29 @@ int ConnectNow(int socket, std::string_view path) {
 }
 
 int OpenConnection(const char* path, const Deadline& deadline, FileDescriptor& connection) {
-  sockaddr_un address;
-  if (!MakeAddress(path, address)) {
+  if (!FitsLocalAddress(path)) {
     return ENAMETOOLONG;
   }
-  if (access(path, F_OK) != 0) {
-    return errno;
+  FileDescriptor place;
+  int error = FindTrustedSocket(path, place);
+  if (error != 0) {
+    return error;
   }
   connection = MakeLocalSocket();
   if (!connection.IsOpen()) {
     return errno;
   }
-  const int error = ConnectTo(connection.Get(), address);
-  const bool isQueueFull = error == EAGAIN || error == EINTR;
-  return isQueueFull ? ConnectBlocking(connection.Get(), address, deadline) : error;
+  // The socket that was examined, whatever is at the path now.
+  error = ConnectWithin(connection.Get(), "/proc/self/fd/" + std::to_string(place.Get()), deadline);
+  if (error == ENOENT) {
+    error = ConnectWithin(connection.Get(), path, deadline);  // without a /proc
+  }
+  const std::optional<ucred> peer = error == 0 ? PeerOf(connection.Get()) : std::nullopt;
+  if (peer && IsTrusted(peer->uid)) {
+    return 0;
+  }
+  connection.Reset();
+  return error != 0 ? error : ECONNREFUSED;
 }
 
 int BindLocal(int socket, std::string_view path) {

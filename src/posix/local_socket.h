@@ -23,8 +23,11 @@ bool FitsLocalAddress(std::string_view path);
 /// Connects without waiting. Returns EAGAIN when the listener's queue is full.
 int ConnectNow(int socket, std::string_view path);
 
-/// Creates a socket and connects it, waiting until the deadline when the listener's queue is full.
-/// Creates no socket when nothing exists at the path. Returns ETIMEDOUT when the queue stays full.
+/// Creates a socket and connects it to a listener of root or of this process's user, waiting until
+/// the deadline when the listener's queue is full. Creates no socket when nothing exists at the
+/// path. Returns ETIMEDOUT when the queue stays full, ECONNREFUSED when nothing listens, when
+/// something other than a socket is at the path, and when the socket, the process behind it or a
+/// symbolic link to it is another user's.
 int OpenConnection(const char* path, const Deadline& deadline, FileDescriptor& connection);
 
 /// Binds the socket to the path.

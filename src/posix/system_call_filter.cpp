@@ -314,6 +314,15 @@ int RefuseNewPrivileges() {
   return prctl(PR_SET_NO_NEW_PRIVS, 1, 0, 0, 0) == 0 ? 0 : errno;
 }
 
+bool CanRefuseNewPrivileges() {
+  return prctl(PR_GET_NO_NEW_PRIVS, 0, 0, 0, 0) >= 0;
+}
+
+bool CanBlockSystemCalls() {
+  // A missing filter is noticed only where filters are supported.
+  return syscall(SYS_seccomp, SECCOMP_SET_MODE_FILTER, 0, nullptr) < 0 && errno == EFAULT;
+}
+
 void PrepareSystemCallFilter() {
   FilterOfUnneededCalls();
 }

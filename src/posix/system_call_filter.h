@@ -14,6 +14,10 @@ int RefuseNewPrivileges();
 /// ENOSYS or EINVAL when the kernel does not support it.
 int BlockUnneededSystemCalls();
 
+/// Return whether the kernel supports the two.
+bool CanRefuseNewPrivileges();
+bool CanBlockSystemCalls();
+
 /// After this, BlockUnneededSystemCalls only makes system calls.
 void PrepareSystemCallFilter();
 

@@ -7,6 +7,7 @@
 #include <unistd.h>
 
 #include <cerrno>
+#include <fstream>
 
 #include "support/environment_failure.h"
 #include "support/privileges.h"
@@ -56,6 +57,15 @@ int GiveUpCapabilities() {
   }
   CapabilitySets sets;
   return sets.Write() ? 0 : errno;
+}
+
+bool HasOtherUsers() {
+  std::ifstream map("/proc/self/uid_map");
+  unsigned long inside = 0;
+  unsigned long outside = 0;
+  unsigned long count = 0;
+  map >> inside >> outside >> count;
+  return count > 65535;
 }
 
 WithoutCapabilities::WithoutCapabilities() : effective_(0) {

@@ -20,4 +20,7 @@ class WithoutCapabilities {
   uint64_t effective_;
 };
 
+/// Whether the sandbox has other users and groups than user 0, as it does when root made it.
+bool HasOtherUsers();
+
 }  // namespace vela_test

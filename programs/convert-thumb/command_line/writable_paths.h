@@ -6,7 +6,7 @@
 
 namespace vela {
 
-/// Returns the outputs with their directories, the directory for temporary files and /dev/null. The
+/// Returns the directories of the outputs, the directory for temporary files and /dev/null. The
 /// paths need not exist.
 WritablePaths FindWritablePaths(const CommandLine& line);
 

@@ -15,7 +15,6 @@ namespace {
 
 using Arguments = std::vector<std::string>;
 
-constexpr size_t kMaxListSize = 65536;
 constexpr char kScratchDefine[] = "registry:temporary-path=";
 constexpr char kScratchVariable[] = "MAGICK_TEMPORARY_PATH=";
 constexpr char kFirstPage[] = "[0]";
@@ -168,7 +167,7 @@ uint64_t ProcessorSeconds(const Tool* tool, std::chrono::seconds timeLimit) {
 }
 
 bool IsUnconfined(std::string_view program) {
-  const std::string list = ReadSystemFile(kUnconfinedToolsFile, kMaxListSize);
+  const std::string list = ReadSystemFile(kUnconfinedToolsFile, kUnconfinedToolsSize);
   std::string_view rest = list;
   while (!rest.empty()) {
     const std::string_view line = rest.substr(0, rest.find('\n'));
