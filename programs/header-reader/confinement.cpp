@@ -29,7 +29,7 @@ namespace {
 /// The user and group without rights, "nobody" and "nogroup".
 constexpr uid_t kNobody = 65534;
 
-constexpr uint64_t kMaxMemory = uint64_t{256} << 20;
+constexpr uint64_t kMaxMemory = uint64_t{512} << 20;
 constexpr uint64_t kMaxProcessorSeconds = 10;
 constexpr rlim_t kMaxDescriptors = 8;
 constexpr rlim_t kMaxStack = rlim_t{8} << 20;
