@@ -9,6 +9,7 @@
 #include "platform/velaindex.h"
 #include "platform/velautils.h"
 #include "platform/vlibc.h"
+#include "posix/file_content.h"
 #include "posix/file_descriptor.h"
 #include "posix/files.h"
 #include "posix/folder.h"

@@ -5,6 +5,7 @@
 #include <algorithm>
 #include <cerrno>
 
+#include "posix/folder.h"
 #include "posix/system_call_filter.h"
 
 namespace vela {

@@ -81,10 +81,6 @@ int SetFileMode(int fd, unsigned mode) {
   return ErrnoUnless(fchmod(fd, mode) == 0);
 }
 
-int SyncFile(int fd) {
-  return ErrnoUnless(fdatasync(fd) == 0);
-}
-
 int64_t SizeOfFile(int fd) {
   struct stat status = {};
   return fstat(fd, &status) == 0 ? int64_t{status.st_size} : 0;

@@ -73,9 +73,6 @@ bool IsProgramToTrust(const std::string& path);
 /// Sets the permission bits of the open file `fd`. Returns 0 or an errno value.
 int SetFileMode(int fd, unsigned mode);
 
-/// Waits until the data of the open file `fd` is on the disk. Returns 0 or an errno value.
-int SyncFile(int fd);
-
 /// Returns the size of the open file `fd` in bytes, 0 when it cannot be examined.
 int64_t SizeOfFile(int fd);
 

@@ -135,13 +135,23 @@ FileDescriptor LinkFollower::Open(int at, const std::string& path, int flags) {
   }
 }
 
-}  // namespace
-
-FileDescriptor OpenTrusted(int at, const char* path, int flags) {
+/// Opens a path that contains no link. Returns -1 with errno set on failure, ELOOP when there is
+/// one.
+int OpenWithoutLinks(int at, const char* path, int flags) {
   open_how how = {};
   how.flags = static_cast<unsigned>(flags | ((flags & O_PATH) != 0 ? O_CLOEXEC : kNeverWait));
   how.resolve = RESOLVE_NO_SYMLINKS;
-  const auto fd = static_cast<int>(syscall(SYS_openat2, at, path, &how, sizeof how));
+  return static_cast<int>(syscall(SYS_openat2, at, path, &how, sizeof how));
+}
+
+}  // namespace
+
+bool CanRefuseLinks() {
+  return FileDescriptor(OpenWithoutLinks(AT_FDCWD, "/", O_PATH)).IsOpen();
+}
+
+FileDescriptor OpenTrusted(int at, const char* path, int flags) {
+  const int fd = OpenWithoutLinks(at, path, flags);
   // Older kernels and some containers do not have the call.
   if (fd >= 0 || (errno != ELOOP && errno != ENOSYS && errno != EPERM)) {
     return FileDescriptor(fd);

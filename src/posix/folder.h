@@ -23,6 +23,10 @@ namespace vela {
 /// no open descriptor, with errno set, on failure.
 FileDescriptor OpenTrusted(int at, const char* path, int flags);
 
+/// Returns true when the kernel can open a path without following links, which saves opening its
+/// components one by one.
+bool CanRefuseLinks();
+
 /// Keeps the directory at `path` open while the object exists: every FolderEntry in it that the
 /// same thread makes meanwhile uses it, whatever happens to the path. Objects must end in the
 /// reverse order of their creation.

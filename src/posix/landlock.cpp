@@ -161,10 +161,6 @@ std::vector<std::string> LandlockCoverage(int version) {
   return names;
 }
 
-bool CanRefuseLinks() {
-  return OpenWithoutLinks("/").IsOpen();
-}
-
 int MakeLandlockRuleset(const AllowedFiles& files, FileDescriptor& ruleset) {
   ruleset.Reset();
   const int version = LandlockVersion();

@@ -33,9 +33,6 @@ int LandlockVersion();
 /// Returns what a Landlock ruleset of this version covers, in a few words each.
 std::vector<std::string> LandlockCoverage(int version);
 
-/// Returns true when the kernel can open a path without following links.
-bool CanRefuseLinks();
-
 /// Stores a ruleset that allows exactly `files` and, where the kernel's version supports it,
 /// refuses TCP, device control, and signals and abstract sockets to processes outside. Stores no
 /// open descriptor when the kernel does not support Landlock. Returns 0 or an errno value.
