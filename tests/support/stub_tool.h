@@ -35,6 +35,8 @@ struct StubCall {
   std::vector<int> blockedSignals;
   std::vector<int> ignoredSignals;
   mode_t umask = 0;
+  uid_t user = 0;
+  gid_t group = 0;
   pid_t pid = 0;
   pid_t parentPid = 0;
   uint64_t startSequence = 0;    ///< place among all events, see NextSequence

@@ -91,6 +91,8 @@ std::vector<std::string> Surroundings() {
           "blocked",     BlockedSignals(),
           "ignored",     IgnoredSignals(),
           "umask",       Mask(),
+          "user",        std::to_string(getuid()),
+          "group",       std::to_string(getgid()),
           "pid",         std::to_string(getpid()),
           "parent",      std::to_string(getppid()),
           "time",        Now()};
