@@ -37,6 +37,23 @@ constexpr int kMaxTries = 25;
 /// succeeds. One that is queued more often is deferred.
 constexpr int kMaxRounds = 16;
 
+/// Returns whether the cause of an errno value may pass without an administrator, such as a full
+/// volume.
+bool CanPass(int error) {
+  switch (error) {
+    case ENOSPC:
+    case EDQUOT:
+    case EIO:
+    case EROFS:
+    case ENOMEM:
+    case EMFILE:
+    case ENFILE:
+      return true;
+    default:
+      return false;
+  }
+}
+
 /// Starts velathumb for one entry. It ends with this process, however that ends: an orphan would
 /// keep its directory locked. Must be called from the main thread. Returns 0 and stores the process
 /// id, or an errno value.
@@ -68,6 +85,7 @@ class Batch {
   void Retry(size_t number);
   void Defer(size_t number, const std::string& reason);
   void Finish(size_t number);
+  void FailToRecord(size_t number);
   void StopChildren();
   std::optional<milliseconds> WaitTime() const;
 
@@ -80,6 +98,7 @@ class Batch {
   std::map<size_t, int> tries_;
   int deferred_ = 0;
   bool hasFailed_ = false;
+  RunEnd failure_ = RunEnd::kFailed;
 };
 
 bool Batch::StartEntry(size_t number) {
@@ -114,17 +133,22 @@ void Batch::StartEntries() {
   }
 }
 
+/// The entry is neither done nor saved: the taken queue must stay.
+void Batch::FailToRecord(size_t number) {
+  plan_.Postpone(number, Clock::now());
+  hasFailed_ = true;
+  failure_ = RunEnd::kNotRecorded;
+}
+
 void Batch::Defer(size_t number, const std::string& reason) {
   const std::string& entry = plan_.Entry(number);
-  WriteLog(LogLevel::kWarning, "deferred to a later run, " + reason + ": " + entry);
-  const int error = taken_.Defer(entry);
+  const int error = taken_.Defer({entry});
   if (error != 0) {
-    // Neither done nor saved: the taken queue must stay.
     WriteLog(LogLevel::kError, "cannot defer an entry", error);
-    plan_.Postpone(number, Clock::now());
-    hasFailed_ = true;
+    FailToRecord(number);
     return;
   }
+  WriteLog(LogLevel::kWarning, "deferred to a later run, " + reason + ": " + entry);
   ++deferred_;
   tries_.erase(number);
   plan_.Finish(number);
@@ -133,8 +157,10 @@ void Batch::Defer(size_t number, const std::string& reason) {
 void Batch::Finish(size_t number) {
   const int error = taken_.MarkDone(plan_.Entry(number));
   if (error != 0) {
-    // The only effect is that a later run repeats the entry.
+    // What prevents this has probably prevented velathumb from queueing the directory again.
     WriteLog(LogLevel::kWarning, "cannot record that an entry is done", error);
+    FailToRecord(number);
+    return;
   }
   tries_.erase(number);
   plan_.Finish(number);
@@ -142,11 +168,15 @@ void Batch::Finish(size_t number) {
 
 void Batch::Retry(size_t number) {
   const int tries = ++tries_[number];
-  if (tries < kMaxTries) {
-    plan_.Postpone(number, Clock::now() + tries * kRetryPause);
+  if (tries >= kMaxTries) {
+    Defer(number, "velathumb did not complete in any try");
     return;
   }
-  Defer(number, "velathumb did not complete in any try");
+  if (!events_.IsStopping() && !hasFailed_) {
+    WriteLog(LogLevel::kWarning,
+             "velathumb did not complete, trying again: " + plan_.Entry(number));
+  }
+  plan_.Postpone(number, Clock::now() + tries * kRetryPause);
 }
 
 /// velathumb exits with 0 also when it skipped a directory or stopped in it.
@@ -166,10 +196,6 @@ void Batch::HandleEnd(size_t number, int status) {
   if (HasSucceeded(status)) {
     HandleSuccess(number);
     return;
-  }
-  if (!events_.IsStopping()) {
-    WriteLog(LogLevel::kWarning,
-             "velathumb did not complete, trying again: " + plan_.Entry(number));
   }
   Retry(number);
 }
@@ -224,7 +250,7 @@ RunEnd Batch::Run() {
   }
   StopChildren();
   if (hasFailed_) {
-    return RunEnd::kFailed;
+    return failure_;
   }
   return plan_.IsFinished() ? RunEnd::kEmpty : RunEnd::kStopped;
 }
@@ -247,8 +273,10 @@ class QueueRun {
   RunEnd DeferAll();
   int RetryWhileLocked(const std::function<int()>& act);
   RunEnd FinishTaken();
-  bool RequeueDeferred();
+  int RequeueDeferred();
   void WaitForEntries();
+  bool WaitAfterFailure(RunEnd end);
+  RunEnd EndWhenIdle();
 
   const RunSettings& settings_;
   TakenQueue taken_;
@@ -260,6 +288,8 @@ class QueueRun {
   std::unordered_set<std::string> seen_;  // entries since the queue was last empty
   int rounds_ = 0;                        // in a row with only entries seen before
   Clock::time_point lastRequeue_;
+  bool hasRequeued_ = false;  // the last attempt has succeeded
+  int failures_ = 0;          // in a row, of reading or writing a file of the queue
 };
 
 /// Records the taken entries. Returns whether all of them were recorded before.
@@ -309,7 +339,7 @@ RunEnd QueueRun::FinishTaken() {
     return RunEnd::kStopped;
   }
   WriteLog(LogLevel::kError, "cannot remove the finished queue", error);
-  return RunEnd::kFailed;
+  return RunEnd::kNotRecorded;
 }
 
 RunEnd QueueRun::ProcessTaken(TakenQueue::Outcome outcome) {
@@ -328,40 +358,57 @@ RunEnd QueueRun::ProcessTaken(TakenQueue::Outcome outcome) {
 }
 
 RunEnd QueueRun::DeferAll() {
+  const int error = taken_.Defer(taken_.Entries());
+  if (error != 0) {
+    WriteLog(LogLevel::kError, "cannot defer an entry", error);
+    return RunEnd::kNotRecorded;
+  }
   WriteLog(LogLevel::kWarning,
            "the same entries are queued again and again, deferred to a later run");
   hasDeferred_ = true;
-  for (const std::string& entry : taken_.Entries()) {
-    const int error = taken_.Defer(entry);
-    if (error != 0) {
-      WriteLog(LogLevel::kError, "cannot defer an entry", error);
-      return RunEnd::kFailed;
-    }
-  }
   return FinishTaken();
 }
 
-/// Returns false when that failed, which is logged.
-bool QueueRun::RequeueDeferred() {
-  lastRequeue_ = Clock::now();
+/// Returns 0 also when a signal ended the wait, or an errno value, which is logged.
+int QueueRun::RequeueDeferred() {
   const int error = RetryWhileLocked([this] { return taken_.RequeueDeferred(); });
-  if (error != 0 && error != EWOULDBLOCK) {
-    WriteLog(LogLevel::kError, "cannot put deferred entries back into the queue", error);
+  lastRequeue_ = Clock::now();
+  hasRequeued_ = error == 0 || error == EWOULDBLOCK;
+  if (hasRequeued_) {
+    return 0;
   }
-  return error == 0 || error == EWOULDBLOCK;
+  WriteLog(LogLevel::kError, "cannot put deferred entries back into the queue", error);
+  return error;
 }
 
 void QueueRun::WaitForEntries() {
   // The watch reports every new queue; the limit is for file systems that report nothing.
   constexpr milliseconds kLongestWait = std::chrono::minutes(1);
-  constexpr std::chrono::hours kRequeueInterval(1);
+  constexpr milliseconds kRequeueInterval = std::chrono::hours(1);
   isIdle_ = true;
   rounds_ = 0;
   seen_.clear();
   events_.Wait(kLongestWait);
-  if (Clock::now() - lastRequeue_ >= kRequeueInterval) {
+  if (Clock::now() - lastRequeue_ >= (hasRequeued_ ? kRequeueInterval : kLongestWait)) {
     RequeueDeferred();
   }
+}
+
+/// Waits, longer each time, when `end` is a failure that can pass and the runner is to keep
+/// running: a full volume of the queue must not end a service. Returns whether to continue.
+bool QueueRun::WaitAfterFailure(RunEnd end) {
+  constexpr int kDoublings = 6;
+  if (end != RunEnd::kNotRecorded || !settings_.follow || !CanPass(taken_.LastError())) {
+    return false;
+  }
+  const std::chrono::seconds pause(1 << std::min(failures_, kDoublings));
+  ++failures_;
+  WriteLog(LogLevel::kInfo, "trying again in " + std::to_string(pause.count()) +
+                                (pause.count() == 1 ? " second" : " seconds"));
+  for (const auto resume = Clock::now() + pause; Clock::now() < resume && !events_.IsStopping();) {
+    events_.Wait(std::chrono::ceil<milliseconds>(resume - Clock::now()));
+  }
+  return true;
 }
 
 /// Takes the pending entries and processes them. Sets `isIdle` when there are none.
@@ -372,7 +419,7 @@ RunEnd QueueRun::RunRound(bool& isIdle) {
   const TakenQueue::Outcome outcome = taken_.Take();
   switch (outcome) {
     case TakenQueue::Outcome::kFailed:
-      return RunEnd::kFailed;
+      return RunEnd::kNotRecorded;
     case TakenQueue::Outcome::kBusy:
       events_.Wait(kLockedFilePause);
       return RunEnd::kEmpty;
@@ -387,15 +434,30 @@ RunEnd QueueRun::RunRound(bool& isIdle) {
   return rounds_ > kMaxRounds ? DeferAll() : ProcessTaken(outcome);
 }
 
+RunEnd QueueRun::EndWhenIdle() {
+  if (!hasRequeued_) {
+    return RunEnd::kFailed;
+  }
+  return hasDeferred_ ? RunEnd::kDeferred : RunEnd::kEmpty;
+}
+
 RunEnd QueueRun::RunRounds() {
   while (!events_.IsStopping()) {
     bool isIdle = false;
     const RunEnd end = RunRound(isIdle);
-    if (end != RunEnd::kEmpty) {
+    if (end != RunEnd::kEmpty && !WaitAfterFailure(end)) {
       return end;
     }
+    if (end != RunEnd::kEmpty) {
+      continue;
+    }
+    failures_ = 0;
+    // Processing the queue may have made room for them.
+    if (isIdle && !hasRequeued_ && !settings_.follow && RequeueDeferred() == 0) {
+      continue;
+    }
     if (isIdle && !settings_.follow) {
-      return hasDeferred_ ? RunEnd::kDeferred : RunEnd::kEmpty;
+      return EndWhenIdle();
     }
     if (isIdle) {
       WaitForEntries();
@@ -410,7 +472,8 @@ RunEnd QueueRun::Run() {
     WriteLog(LogLevel::kError, "cannot watch the queue", error);
     return RunEnd::kFailed;
   }
-  return RequeueDeferred() ? RunRounds() : RunEnd::kFailed;
+  const int requeueError = RequeueDeferred();
+  return requeueError == 0 || CanPass(requeueError) ? RunRounds() : RunEnd::kFailed;
 }
 
 }  // namespace

@@ -8,12 +8,43 @@
 #include <cstdio>
 #include <cstdlib>
 
+#include "posix/file_content.h"
+
 namespace vela {
 
 namespace {
 
 int ErrnoUnless(bool succeeded) {
   return succeeded ? 0 : errno;
+}
+
+FileDescriptor OpenForAppending(const std::string& path) {
+  const int flags = O_RDWR | O_CREAT | O_APPEND | O_NONBLOCK | O_NOCTTY | O_CLOEXEC;
+  return FileDescriptor(open(path.c_str(), flags, 0644));
+}
+
+bool LacksFinalNewline(int fd) {
+  const off_t size = lseek(fd, 0, SEEK_END);
+  char last = '\n';
+  return size > 0 && pread(fd, &last, 1, size - 1) == 1 && last != '\n';
+}
+
+/// Appends the text completely or not at all. Returns 0 or an errno value.
+int AppendWhole(int fd, const std::string& text) {
+  const off_t end = lseek(fd, 0, SEEK_END);
+  const int error = WriteAll(fd, text);
+  if (error == 0 || ftruncate(fd, end) == 0) {
+    return error;
+  }
+  return errno;
+}
+
+int SyncDescriptor(int fd) {
+  if (fsync(fd) == 0) {
+    return 0;
+  }
+  const bool isUnsupported = errno == EINVAL || errno == ENOSYS || errno == EOPNOTSUPP;
+  return isUnsupported ? 0 : errno;
 }
 
 }  // namespace
@@ -85,22 +116,60 @@ int RemoveFileIfPresent(const std::string& path) {
   return error == ENOENT ? 0 : error;
 }
 
+int RenameToNewName(const std::string& from, const std::string& to) {
+  if (renameat2(AT_FDCWD, from.c_str(), AT_FDCWD, to.c_str(), RENAME_NOREPLACE) == 0) {
+    return 0;
+  }
+  if (errno != EINVAL && errno != ENOSYS) {
+    return errno;
+  }
+  // The file system does not support that flag.
+  if (link(from.c_str(), to.c_str()) != 0) {
+    return errno;
+  }
+  return ErrnoUnless(unlink(from.c_str()) == 0);
+}
+
 int AppendLine(const std::string& path, const std::string& text) {
-  const int flags = O_WRONLY | O_CREAT | O_APPEND | O_NOCTTY | O_CLOEXEC;
-  const FileDescriptor file(open(path.c_str(), flags, 0644));
+  FileDescriptor file = OpenForAppending(path);
   if (!file.IsOpen()) {
     return errno;
   }
-  const off_t end = lseek(file.Get(), 0, SEEK_END);
-  const std::string line = text + '\n';
-  const ssize_t written = write(file.Get(), line.data(), line.size());
-  if (written < 0) {
+  const int error = AppendWhole(file.Get(), text + '\n');
+  return error != 0 ? error : ErrnoUnless(file.Close());
+}
+
+int AppendDurably(const std::string& path, const std::vector<std::string>& lines) {
+  FileDescriptor file = OpenForAppending(path);
+  if (!file.IsOpen()) {
     return errno;
   }
-  if (written == static_cast<ssize_t>(line.size())) {
-    return 0;
+  std::string text = LacksFinalNewline(file.Get()) ? "\n" : "";
+  for (const std::string& line : lines) {
+    text += line + '\n';
   }
-  return ftruncate(file.Get(), end) == 0 ? ENOSPC : errno;
+  int error = AppendWhole(file.Get(), text);
+  if (error == 0) {
+    error = SyncDescriptor(file.Get());
+  }
+  // Some file systems report only here that the data does not fit.
+  if (!file.Close() && error == 0) {
+    error = errno;
+  }
+  return error != 0 ? error : SyncDirectoryOf(path);
+}
+
+int SyncFile(const std::string& path) {
+  const FileDescriptor file = OpenForReading(path);
+  return file.IsOpen() ? SyncDescriptor(file.Get()) : errno;
+}
+
+int SyncDirectoryOf(const std::string& path) {
+  const size_t slash = path.rfind('/');
+  if (slash == std::string::npos) {
+    return SyncFile(".");
+  }
+  return SyncFile(path.substr(0, slash + 1));
 }
 
 std::string FindUnusedPath(const std::string& nameTemplate) {
