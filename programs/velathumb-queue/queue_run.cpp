@@ -4,18 +4,17 @@
 #include <cerrno>
 #include <chrono>
 #include <functional>
-#include <map>
-#include <optional>
 #include <string>
 #include <unordered_set>
+#include <vector>
 
+#include "batch.h"
 #include "conversion_pause.h"
 #include "entry_check.h"
-#include "entry_plan.h"
-#include "posix/child_process.h"
 #include "posix/event_wait.h"
 #include "posix/service_log.h"
 #include "progress_totals.h"
+#include "storage/unfinished_directories.h"
 #include "taken_queue.h"
 
 namespace vela {
@@ -25,14 +24,8 @@ namespace {
 using std::chrono::milliseconds;
 using Clock = EntryPlan::Clock;
 
-/// How long an entry is postponed while its directory is locked by another velathumb.
-constexpr std::chrono::seconds kLockedDirectoryPause(2);
-/// How long it is postponed after its velathumb was killed or failed, times the number of tries.
-constexpr milliseconds kRetryPause(200);
 /// Interval of the attempts to lock a file of the queue that is locked.
 constexpr milliseconds kLockedFilePause(200);
-/// After so many failed tries an entry is deferred: it probably causes the failures.
-constexpr int kMaxTries = 25;
 /// velathumb queues a directory again when there is more to make in it: twice, for a photo that
 /// succeeds. One that is queued more often is deferred.
 constexpr int kMaxRounds = 16;
@@ -52,207 +45,6 @@ bool CanPass(int error) {
     default:
       return false;
   }
-}
-
-/// Starts velathumb for one entry. It ends with this process, however that ends: an orphan would
-/// keep its directory locked. Must be called from the main thread. Returns 0 and stores the process
-/// id, or an errno value.
-int StartVelathumb(const VelathumbCommand& command, std::string entry, pid_t& pid) {
-  std::string path = command.path;
-  std::string profileFile = command.profileFile;
-  char* const arguments[] = {path.data(), profileFile.data(), entry.data(), nullptr};
-  return StartAttachedChild(path.c_str(), arguments, pid);
-}
-
-/// Processes one taken queue.
-class Batch {
- public:
-  Batch(const RunSettings& settings, TakenQueue& taken, EventWait& events, PauseGate& gate)
-      : settings_(settings), taken_(taken), events_(events), gate_(gate), plan_(taken.Entries()) {}
-
-  /// Returns kEmpty when all entries are done or deferred.
-  RunEnd Run();
-
-  /// Returns how many entries were deferred to a later run.
-  int DeferredCount() const { return deferred_; }
-
- private:
-  void StartEntries();
-  bool StartEntry(size_t number);
-  void ReapChildren();
-  void HandleEnd(size_t number, int status);
-  void HandleSuccess(size_t number);
-  void Retry(size_t number);
-  void Defer(size_t number, const std::string& reason);
-  void Finish(size_t number);
-  void FailToRecord(size_t number);
-  void StopChildren();
-  std::optional<milliseconds> WaitTime() const;
-
-  const RunSettings& settings_;
-  TakenQueue& taken_;
-  EventWait& events_;
-  PauseGate& gate_;
-  EntryPlan plan_;
-  std::map<pid_t, size_t> children_;
-  std::map<size_t, int> tries_;
-  int deferred_ = 0;
-  bool hasFailed_ = false;
-  RunEnd failure_ = RunEnd::kFailed;
-};
-
-bool Batch::StartEntry(size_t number) {
-  const std::string& entry = plan_.Entry(number);
-  const std::string obstacle = FindObstacle(entry);
-  if (!obstacle.empty()) {
-    Defer(number, obstacle);
-    return !hasFailed_;
-  }
-  if (IsLockedElsewhere(TargetOf(entry))) {
-    plan_.Postpone(number, Clock::now() + kLockedDirectoryPause);
-    return true;
-  }
-  pid_t child = 0;
-  const int error = StartVelathumb(settings_.velathumb, entry, child);
-  if (error != 0) {
-    WriteLog(LogLevel::kError, "cannot start " + settings_.velathumb.path, error);
-    plan_.Postpone(number, Clock::now());
-    hasFailed_ = true;
-    return false;
-  }
-  children_.emplace(child, number);
-  return true;
-}
-
-void Batch::StartEntries() {
-  while (static_cast<int>(children_.size()) < settings_.jobs && gate_.MayStart()) {
-    const auto number = plan_.Start(Clock::now());
-    if (!number || !StartEntry(*number)) {
-      return;
-    }
-  }
-}
-
-/// The entry is neither done nor saved: the taken queue must stay.
-void Batch::FailToRecord(size_t number) {
-  plan_.Postpone(number, Clock::now());
-  hasFailed_ = true;
-  failure_ = RunEnd::kNotRecorded;
-}
-
-void Batch::Defer(size_t number, const std::string& reason) {
-  const std::string& entry = plan_.Entry(number);
-  const int error = taken_.Defer({entry});
-  if (error != 0) {
-    WriteLog(LogLevel::kError, "cannot defer an entry", error);
-    FailToRecord(number);
-    return;
-  }
-  WriteLog(LogLevel::kWarning, "deferred to a later run, " + reason + ": " + entry);
-  ++deferred_;
-  tries_.erase(number);
-  plan_.Finish(number);
-}
-
-void Batch::Finish(size_t number) {
-  const int error = taken_.MarkDone(plan_.Entry(number));
-  if (error != 0) {
-    // What prevents this has probably prevented velathumb from queueing the directory again.
-    WriteLog(LogLevel::kWarning, "cannot record that an entry is done", error);
-    FailToRecord(number);
-    return;
-  }
-  tries_.erase(number);
-  plan_.Finish(number);
-}
-
-void Batch::Retry(size_t number) {
-  const int tries = ++tries_[number];
-  if (tries >= kMaxTries) {
-    Defer(number, "velathumb did not complete in any try");
-    return;
-  }
-  if (!events_.IsStopping() && !hasFailed_) {
-    WriteLog(LogLevel::kWarning,
-             "velathumb did not complete, trying again: " + plan_.Entry(number));
-  }
-  plan_.Postpone(number, Clock::now() + tries * kRetryPause);
-}
-
-/// velathumb exits with 0 also when it skipped a directory or stopped in it.
-void Batch::HandleSuccess(size_t number) {
-  const std::string& entry = plan_.Entry(number);
-  const std::string obstacle = FindObstacle(entry);
-  if (!obstacle.empty()) {
-    Defer(number, obstacle);
-  } else if (IsLockedElsewhere(TargetOf(entry))) {
-    plan_.Postpone(number, Clock::now() + kLockedDirectoryPause);
-  } else {
-    Finish(number);
-  }
-}
-
-void Batch::HandleEnd(size_t number, int status) {
-  if (HasSucceeded(status)) {
-    HandleSuccess(number);
-    return;
-  }
-  Retry(number);
-}
-
-void Batch::ReapChildren() {
-  for (auto child = children_.begin(); child != children_.end();) {
-    const auto [pid, number] = *child;
-    const std::optional<int> status = ReapEndedChild(pid);
-    if (!status) {
-      ++child;
-      continue;
-    }
-    child = children_.erase(child);
-    HandleEnd(number, *status);
-  }
-  ReapInheritedChildren([this](pid_t pid) { return children_.count(pid) != 0; });
-}
-
-void Batch::StopChildren() {
-  for (const auto& child : children_) {
-    TerminateChild(child.first);
-  }
-  while (!children_.empty()) {
-    events_.Wait(milliseconds(1000));
-    ReapChildren();
-  }
-}
-
-std::optional<milliseconds> Batch::WaitTime() const {
-  std::optional<Clock::time_point> wake = gate_.NextCheck();
-  const bool hasFreeJob = static_cast<int>(children_.size()) < settings_.jobs;
-  if (!wake && hasFreeJob) {
-    wake = plan_.NextStart();
-  }
-  if (!wake) {
-    return std::nullopt;
-  }
-  // An entry that waits only for another one needs no time limit: the end of that one wakes the
-  // runner.
-  const auto left = std::chrono::ceil<milliseconds>(*wake - Clock::now());
-  return left > milliseconds(0) ? left : milliseconds(children_.empty() ? 0 : 1000);
-}
-
-RunEnd Batch::Run() {
-  while (!plan_.IsFinished() && !events_.IsStopping() && !hasFailed_) {
-    StartEntries();
-    if (plan_.IsFinished() || hasFailed_) {
-      break;
-    }
-    events_.Wait(WaitTime());
-    ReapChildren();
-  }
-  StopChildren();
-  if (hasFailed_) {
-    return failure_;
-  }
-  return plan_.IsFinished() ? RunEnd::kEmpty : RunEnd::kStopped;
 }
 
 /// Processes one queue after the other.
@@ -275,6 +67,7 @@ class QueueRun {
   RunEnd FinishTaken();
   int RequeueDeferred();
   void WaitForEntries();
+  void QueueUnfinished();
   bool WaitAfterFailure(RunEnd end);
   RunEnd EndWhenIdle();
 
@@ -283,7 +76,9 @@ class QueueRun {
   ProgressTotals totals_;
   EventWait events_;
   PauseGate gate_;
+  EntryHistories histories_;
   bool isIdle_ = true;                    // no entry was in progress before
+  bool hasHandedBack_ = false;            // in the last round
   bool hasDeferred_ = false;              // entries are left for a later run
   std::unordered_set<std::string> seen_;  // entries since the queue was last empty
   int rounds_ = 0;                        // in a row with only entries seen before
@@ -351,8 +146,9 @@ RunEnd QueueRun::ProcessTaken(TakenQueue::Outcome outcome) {
     return RunEnd::kStopped;
   }
   SetTotals(outcome);
-  Batch batch(settings_, taken_, events_, gate_);
+  Batch batch(settings_, taken_, events_, gate_, histories_);
   const RunEnd end = batch.Run();
+  hasHandedBack_ = batch.HasHandedBack();
   hasDeferred_ = hasDeferred_ || batch.DeferredCount() > 0;
   return end == RunEnd::kEmpty ? FinishTaken() : end;
 }
@@ -388,6 +184,7 @@ void QueueRun::WaitForEntries() {
   isIdle_ = true;
   rounds_ = 0;
   seen_.clear();
+  histories_.clear();
   events_.Wait(kLongestWait);
   if (Clock::now() - lastRequeue_ >= (hasRequeued_ ? kRequeueInterval : kLongestWait)) {
     RequeueDeferred();
@@ -411,11 +208,30 @@ bool QueueRun::WaitAfterFailure(RunEnd end) {
   return true;
 }
 
+/// Queues the directories that a velathumb could not queue, also one that this runner has not
+/// started. Other notes concern only the velathumb that made them.
+void QueueRun::QueueUnfinished() {
+  std::unordered_set<std::string> lost;
+  TakeUnfinishedDirectories([&](const UnfinishedDirectory& note) {
+    const bool isLost =
+        note.reason == UnfinishedReason::kNotQueued && note.path.find('\n') == std::string::npos;
+    if (isLost) {
+      lost.insert(note.path);
+    }
+    return !isLost;
+  });
+  if (!lost.empty() && taken_.AddToQueue({lost.begin(), lost.end()}) == 0) {
+    TakeUnfinishedDirectories(
+        [&](const UnfinishedDirectory& note) { return lost.count(note.path) != 0; });
+  }
+}
+
 /// Takes the pending entries and processes them. Sets `isIdle` when there are none.
 RunEnd QueueRun::RunRound(bool& isIdle) {
   if (!IsProfileUsable(settings_.velathumb.profileFile)) {
     return RunEnd::kFailed;
   }
+  QueueUnfinished();
   const TakenQueue::Outcome outcome = taken_.Take();
   switch (outcome) {
     case TakenQueue::Outcome::kFailed:
@@ -430,7 +246,11 @@ RunEnd QueueRun::RunRound(bool& isIdle) {
     case TakenQueue::Outcome::kTaken:
       break;
   }
-  rounds_ = RecordSeen() ? rounds_ + 1 : 0;
+  const bool isRepeated = RecordSeen();
+  // That postponed entries were put back into the queue does not mean that they were processed.
+  if (!isRepeated || !hasHandedBack_) {
+    rounds_ = isRepeated ? rounds_ + 1 : 0;
+  }
   return rounds_ > kMaxRounds ? DeferAll() : ProcessTaken(outcome);
 }
 

@@ -78,8 +78,9 @@ int LockFileAt(const std::string& path, LockedFile& locked) {
 }
 
 bool IsLocked(const std::string& path) {
-  const FileDescriptor file = OpenForReading(path);
-  return file.IsOpen() && flock(file.Get(), LOCK_SH | LOCK_NB) != 0 && errno == EWOULDBLOCK;
+  const int flags = O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC;
+  const FileDescriptor directory(open(path.c_str(), flags));
+  return directory.IsOpen() && TryLockExclusively(directory.Get()) == EWOULDBLOCK;
 }
 
 FileDescriptor TakeProcessLock(const std::string& path, bool wait) {

@@ -68,6 +68,12 @@ bool IsRegularFile(const std::string& path) {
   return status && status->isRegular;
 }
 
+bool IsPrivateFile(int fd) {
+  struct stat status = {};
+  return fstat(fd, &status) == 0 && S_ISREG(status.st_mode) && status.st_nlink == 1 &&
+         status.st_uid == geteuid() && (status.st_mode & 077) == 0;
+}
+
 int IdentifyDirectory(const std::string& path, FileIdentity& identity) {
   const std::optional<FileStatus> status = ExamineFile(path);
   if (!status) {

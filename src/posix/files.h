@@ -46,6 +46,10 @@ inline std::optional<FileStatus> ExamineFile(const std::string& path) {
 /// Returns true when a regular file is at `path`, symbolic links followed.
 bool IsRegularFile(const std::string& path);
 
+/// Returns true when the open file `fd` is a regular file with one name that belongs to the
+/// effective user and that nobody else may open.
+bool IsPrivateFile(int fd);
+
 /// Stores the identity of the directory `path`. Returns 0 or an errno value, ENOTDIR when it is not
 /// a directory.
 int IdentifyDirectory(const std::string& path, FileIdentity& identity);
