@@ -292,6 +292,7 @@ RunEnd QueueRun::Run() {
     WriteLog(LogLevel::kError, "cannot watch the queue", error);
     return RunEnd::kFailed;
   }
+  ExpectUnfinishedDirectories();
   const int requeueError = RequeueDeferred();
   return requeueError == 0 || CanPass(requeueError) ? RunRounds() : RunEnd::kFailed;
 }

@@ -65,7 +65,14 @@ void Shorten(int fd, std::string_view text) {
 
 }  // namespace
 
+void ExpectUnfinishedDirectories() {
+  OpenNotes();
+}
+
 void NoteUnfinishedDirectory(const std::string& directory, UnfinishedReason reason) {
+  if (!ExamineFile(kFile)) {
+    return;
+  }
   const FileDescriptor file = OpenNotes();
   std::string notes;
   if (!file.IsOpen() || ReadToEnd(file.Get(), notes) != 0) {

@@ -22,8 +22,11 @@ struct UnfinishedDirectory {
   std::string path;
 };
 
-/// Notes that the directory is unfinished, once for the same reason. Nothing happens when that
-/// fails. The notes have a limited size.
+/// Makes the file, when it is missing, which begins the notes. Nothing happens when that fails.
+void ExpectUnfinishedDirectories();
+
+/// Notes that the directory is unfinished, once for the same reason. Does nothing without a file,
+/// which only a runner makes, and when it fails. The notes have a limited size.
 void NoteUnfinishedDirectory(const std::string& directory, UnfinishedReason reason);
 
 /// Takes a note and returns whether it is to be removed.

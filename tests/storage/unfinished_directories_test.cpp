@@ -35,12 +35,21 @@ std::vector<std::string> TakeAll() {
 
 using UnfinishedDirectoriesTest = SandboxTest;
 
-TEST_F(UnfinishedDirectoriesTest, WithoutNotesNothingIsTakenOrMade) {
+TEST_F(UnfinishedDirectoriesTest, WithoutARunnerNothingIsNotedOrTaken) {
+  NoteUnfinishedDirectory("/a", UnfinishedReason::kLocked);
   EXPECT_THAT(TakeAll(), IsEmpty());
   EXPECT_FALSE(Exists(kNotes));
 }
 
+TEST_F(UnfinishedDirectoriesTest, NotesOutliveTheRunner) {
+  ExpectUnfinishedDirectories();
+  NoteUnfinishedDirectory("/a", UnfinishedReason::kLocked);
+  ExpectUnfinishedDirectories();
+  EXPECT_THAT(TakeAll(), ElementsAre("L/a"));
+}
+
 TEST_F(UnfinishedDirectoriesTest, EachIsTakenOnce) {
+  ExpectUnfinishedDirectories();
   NoteUnfinishedDirectory("/b", UnfinishedReason::kLocked);
   NoteUnfinishedDirectory("/a\nb \xff", UnfinishedReason::kNotQueued);
   EXPECT_THAT(TakeAll(), ElementsAre("L/b", "Q/a\nb \xff"));
@@ -50,6 +59,7 @@ TEST_F(UnfinishedDirectoriesTest, EachIsTakenOnce) {
 }
 
 TEST_F(UnfinishedDirectoriesTest, OnlyThoseThatAreWantedAreTaken) {
+  ExpectUnfinishedDirectories();
   for (const char* path : {"/a", "/b", "/c"}) {
     NoteUnfinishedDirectory(path, UnfinishedReason::kLocked);
   }
@@ -60,11 +70,12 @@ TEST_F(UnfinishedDirectoriesTest, OnlyThoseThatAreWantedAreTaken) {
 
 TEST_F(UnfinishedDirectoriesTest, NobodyElseCanOpenTheirFile) {
   umask(0);
-  NoteUnfinishedDirectory("/a", UnfinishedReason::kLocked);
+  ExpectUnfinishedDirectories();
   EXPECT_EQ(ModeOf(kNotes), 0600);
 }
 
 TEST_F(UnfinishedDirectoriesTest, ARepeatedNoteAddsNothing) {
+  ExpectUnfinishedDirectories();
   for (int i = 0; i < 100; ++i) {
     NoteUnfinishedDirectory("/a", UnfinishedReason::kLocked);
   }
@@ -72,6 +83,7 @@ TEST_F(UnfinishedDirectoriesTest, ARepeatedNoteAddsNothing) {
 }
 
 TEST_F(UnfinishedDirectoriesTest, TheirSizeIsLimitedAndThatIsNoted) {
+  ExpectUnfinishedDirectories();
   const std::string directory = '/' + std::string(4000, 'x');
   for (int i = 0; i < 300; ++i) {
     NoteUnfinishedDirectory(directory + std::to_string(i), UnfinishedReason::kLocked);
@@ -120,6 +132,7 @@ TEST_F(UnfinishedDirectoriesTest, AFileThatOthersCanOpenIsNotUsed) {
 }
 
 TEST_F(UnfinishedDirectoriesTest, ManyProcessesLoseNoNote) {
+  ExpectUnfinishedDirectories();
   constexpr int kProcesses = 8;
   constexpr int kEach = 50;
   for (int i = 0; i < kProcesses; ++i) {

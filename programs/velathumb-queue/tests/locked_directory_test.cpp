@@ -189,6 +189,7 @@ TEST_F(UnfinishedTest, APhaseOfATreeThatVelathumbCannotQueueIsMade) {
 }
 
 TEST_F(UnfinishedTest, APhaseThatAnyVelathumbCouldNotQueueIsMade) {
+  EXPECT_EQ(RunRunner().exitCode, 0);
   MakeDirectories(kQueueFile);
   EXPECT_EQ(RunProgram(VelathumbPath(), {kProfiles, "/tmp/p"}).exitCode, 0);
   RemoveTree(kQueueFile);
