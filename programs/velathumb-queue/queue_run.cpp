@@ -5,6 +5,7 @@
 #include <chrono>
 #include <functional>
 #include <string>
+#include <unordered_map>
 #include <unordered_set>
 #include <vector>
 
@@ -62,7 +63,8 @@ class QueueRun {
   bool WaitUntilAllowed();
   void SetTotals(TakenQueue::Outcome outcome);
   bool RecordSeen();
-  RunEnd DeferAll();
+  std::vector<std::string> FindEndless();
+  RunEnd DeferEndless(const std::vector<std::string>& entries);
   int RetryWhileLocked(const std::function<int()>& act);
   RunEnd FinishTaken();
   int RequeueDeferred();
@@ -77,11 +79,11 @@ class QueueRun {
   EventWait events_;
   PauseGate gate_;
   EntryHistories histories_;
-  bool isIdle_ = true;                    // no entry was in progress before
-  bool hasHandedBack_ = false;            // in the last round
-  bool hasDeferred_ = false;              // entries are left for a later run
-  std::unordered_set<std::string> seen_;  // entries since the queue was last empty
-  int rounds_ = 0;                        // in a row with only entries seen before
+  bool isIdle_ = true;                            // no entry was in progress before
+  bool hasHandedBack_ = false;                    // in the last round
+  bool hasDeferred_ = false;                      // entries are left for a later run
+  std::unordered_set<std::string> seen_;          // entries since the queue was last empty
+  std::unordered_map<std::string, int> repeats_;  // rounds in a row with only entries seen before
   Clock::time_point lastRequeue_;
   bool hasRequeued_ = false;  // the last attempt has succeeded
   int failures_ = 0;          // in a row, of reading or writing a file of the queue
@@ -153,8 +155,29 @@ RunEnd QueueRun::ProcessTaken(TakenQueue::Outcome outcome) {
   return end == RunEnd::kEmpty ? FinishTaken() : end;
 }
 
-RunEnd QueueRun::DeferAll() {
-  const int error = taken_.Defer(taken_.Entries());
+/// Counts the rounds in a row in which each entry was taken, as long as no new one is among them.
+/// Returns the entries that were taken too often.
+std::vector<std::string> QueueRun::FindEndless() {
+  std::vector<std::string> endless;
+  if (!RecordSeen()) {
+    repeats_.clear();
+    return endless;
+  }
+  // That postponed entries were put back into the queue does not mean that they were processed.
+  if (hasHandedBack_) {
+    return endless;
+  }
+  for (const std::string& entry : taken_.Entries()) {
+    if (++repeats_[entry] > kMaxRounds) {
+      endless.push_back(entry);
+    }
+  }
+  return endless;
+}
+
+/// The next round processes the others.
+RunEnd QueueRun::DeferEndless(const std::vector<std::string>& entries) {
+  const int error = taken_.Defer(entries);
   if (error != 0) {
     WriteLog(LogLevel::kError, "cannot defer an entry", error);
     return RunEnd::kNotRecorded;
@@ -162,7 +185,10 @@ RunEnd QueueRun::DeferAll() {
   WriteLog(LogLevel::kWarning,
            "the same entries are queued again and again, deferred to a later run");
   hasDeferred_ = true;
-  return FinishTaken();
+  for (const std::string& entry : entries) {
+    repeats_.erase(entry);
+  }
+  return entries.size() == taken_.Entries().size() ? FinishTaken() : RunEnd::kEmpty;
 }
 
 /// Returns 0 also when a signal ended the wait, or an errno value, which is logged.
@@ -182,7 +208,7 @@ void QueueRun::WaitForEntries() {
   constexpr milliseconds kLongestWait = std::chrono::minutes(1);
   constexpr milliseconds kRequeueInterval = std::chrono::hours(1);
   isIdle_ = true;
-  rounds_ = 0;
+  repeats_.clear();
   seen_.clear();
   histories_.clear();
   events_.Wait(kLongestWait);
@@ -246,12 +272,8 @@ RunEnd QueueRun::RunRound(bool& isIdle) {
     case TakenQueue::Outcome::kTaken:
       break;
   }
-  const bool isRepeated = RecordSeen();
-  // That postponed entries were put back into the queue does not mean that they were processed.
-  if (!isRepeated || !hasHandedBack_) {
-    rounds_ = isRepeated ? rounds_ + 1 : 0;
-  }
-  return rounds_ > kMaxRounds ? DeferAll() : ProcessTaken(outcome);
+  const std::vector<std::string> endless = FindEndless();
+  return endless.empty() ? ProcessTaken(outcome) : DeferEndless(endless);
 }
 
 RunEnd QueueRun::EndWhenIdle() {
