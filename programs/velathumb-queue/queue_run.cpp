@@ -69,6 +69,7 @@ class QueueRun {
   RunEnd FinishTaken();
   int RequeueDeferred();
   void WaitForEntries();
+  void RequeueWhenDue();
   void QueueUnfinished();
   bool WaitAfterFailure(RunEnd end);
   RunEnd EndWhenIdle();
@@ -206,13 +207,19 @@ int QueueRun::RequeueDeferred() {
 void QueueRun::WaitForEntries() {
   // The watch reports every new queue; the limit is for file systems that report nothing.
   constexpr milliseconds kLongestWait = std::chrono::minutes(1);
-  constexpr milliseconds kRequeueInterval = std::chrono::hours(1);
   isIdle_ = true;
   repeats_.clear();
   seen_.clear();
   histories_.clear();
   events_.Wait(kLongestWait);
-  if (Clock::now() - lastRequeue_ >= (hasRequeued_ ? kRequeueInterval : kLongestWait)) {
+}
+
+/// Puts deferred entries back every hour, or a minute after that has failed. A runner that is never
+/// idle must not leave them for good.
+void QueueRun::RequeueWhenDue() {
+  constexpr std::chrono::minutes kInterval(60);
+  constexpr std::chrono::minutes kRetryInterval(1);
+  if (Clock::now() - lastRequeue_ >= (hasRequeued_ ? kInterval : kRetryInterval)) {
     RequeueDeferred();
   }
 }
@@ -303,6 +310,9 @@ RunEnd QueueRun::RunRounds() {
     }
     if (isIdle) {
       WaitForEntries();
+    }
+    if (settings_.follow) {
+      RequeueWhenDue();
     }
   }
   return RunEnd::kStopped;
