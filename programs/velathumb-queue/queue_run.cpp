@@ -69,7 +69,8 @@ class QueueRun {
   RunEnd FinishTaken();
   int RequeueDeferred();
   void WaitForEntries();
-  void RequeueWhenDue();
+  void Follow(bool isIdle);
+  bool RequeueAfterAll();
   void QueueUnfinished();
   bool WaitAfterFailure(RunEnd end);
   RunEnd EndWhenIdle();
@@ -214,11 +215,14 @@ void QueueRun::WaitForEntries() {
   events_.Wait(kLongestWait);
 }
 
-/// Puts deferred entries back every hour, or a minute after that has failed. A runner that is never
-/// idle must not leave them for good.
-void QueueRun::RequeueWhenDue() {
+/// Waits for new entries when there are none. Puts deferred ones back every hour, or a minute after
+/// that has failed, also when the runner is never idle.
+void QueueRun::Follow(bool isIdle) {
   constexpr std::chrono::minutes kInterval(60);
   constexpr std::chrono::minutes kRetryInterval(1);
+  if (isIdle) {
+    WaitForEntries();
+  }
   if (Clock::now() - lastRequeue_ >= (hasRequeued_ ? kInterval : kRetryInterval)) {
     RequeueDeferred();
   }
@@ -290,29 +294,27 @@ RunEnd QueueRun::EndWhenIdle() {
   return hasDeferred_ ? RunEnd::kDeferred : RunEnd::kEmpty;
 }
 
+/// Puts deferred entries back that could not be put back before: processing the queue may have made
+/// room for them.
+bool QueueRun::RequeueAfterAll() {
+  return !hasRequeued_ && RequeueDeferred() == 0;
+}
+
 RunEnd QueueRun::RunRounds() {
   while (!events_.IsStopping()) {
     bool isIdle = false;
     const RunEnd end = RunRound(isIdle);
-    if (end != RunEnd::kEmpty && !WaitAfterFailure(end)) {
-      return end;
-    }
     if (end != RunEnd::kEmpty) {
+      if (!WaitAfterFailure(end)) {
+        return end;
+      }
       continue;
     }
     failures_ = 0;
-    // Processing the queue may have made room for them.
-    if (isIdle && !hasRequeued_ && !settings_.follow && RequeueDeferred() == 0) {
-      continue;
-    }
-    if (isIdle && !settings_.follow) {
-      return EndWhenIdle();
-    }
-    if (isIdle) {
-      WaitForEntries();
-    }
     if (settings_.follow) {
-      RequeueWhenDue();
+      Follow(isIdle);
+    } else if (isIdle && !RequeueAfterAll()) {
+      return EndWhenIdle();
     }
   }
   return RunEnd::kStopped;
