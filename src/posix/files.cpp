@@ -93,6 +93,13 @@ int AppendLine(const std::string& path, const std::string& text) {
   if (!file.IsOpen()) {
     return errno;
   }
+  struct stat status = {};
+  if (fstat(file.Get(), &status) != 0) {
+    return errno;
+  }
+  if (!S_ISREG(status.st_mode)) {
+    return EINVAL;
+  }
   const int error = AppendWhole(file.Get(), text + '\n');
   return error != 0 || file.Close() ? error : errno;
 }

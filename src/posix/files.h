@@ -85,7 +85,8 @@ int RemoveFile(const std::string& path);
 int RemoveFileIfPresent(const std::string& path);
 
 /// Appends `text` and a newline to the file `path`, created with mode 0644 when missing. A line
-/// that does not fit on the volume is removed again. Returns 0 or an errno value.
+/// that does not fit on the volume is removed again. Returns 0 or an errno value, EINVAL for
+/// anything but a regular file.
 int AppendLine(const std::string& path, const std::string& text);
 
 /// Waits until the name of the file `path`, in its directory, is on the disk. Returns 0, also when
