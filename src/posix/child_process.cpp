@@ -285,6 +285,10 @@ void TerminateChild(pid_t pid) {
   kill(pid, SIGTERM);
 }
 
+void KillChild(pid_t pid) {
+  kill(pid, SIGKILL);
+}
+
 bool HasSucceeded(int waitStatus) {
   return WIFEXITED(waitStatus) && WEXITSTATUS(waitStatus) == 0;
 }

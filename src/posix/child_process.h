@@ -52,6 +52,9 @@ void ReapInheritedChildren(const std::function<bool(pid_t)>& isOwn);
 /// Sends SIGTERM to the child alone, not to its descendants.
 void TerminateChild(pid_t pid);
 
+/// Sends SIGKILL to the child alone, not to its descendants.
+void KillChild(pid_t pid);
+
 /// Returns whether a wait status is that of a program that exited with 0.
 bool HasSucceeded(int waitStatus);
 

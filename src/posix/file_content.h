@@ -18,6 +18,9 @@ std::string ReadAt(int fd, int64_t offset, size_t size);
 /// Moves the position to the beginning. Returns 0 or an errno value, ESPIPE for a pipe.
 int Rewind(int fd);
 
+/// Sets the size of the open file `fd` to `size` bytes. Returns 0 or an errno value.
+int SetFileSize(int fd, int64_t size);
+
 /// Appends everything from the present position of `fd` to its end to `content`. Returns 0 or an
 /// errno value.
 int ReadToEnd(int fd, std::string& content);
@@ -34,9 +37,9 @@ std::string ReadSmallFile(const std::string& path, size_t limit);
 /// Writes all of `content` to `fd`. Returns 0 or an errno value.
 int WriteAll(int fd, std::string_view content);
 
-/// Appends `text` to `fd`, which was opened with O_APPEND and for reading, in one write: completely
-/// or not at all, unless the remains of a failed write cannot be removed. Returns 0 or an errno
-/// value.
+/// Appends `text` to `fd`, which was opened with O_APPEND and for reading, in one write unless that
+/// is cut short: completely or not at all, unless the remains of a failed write cannot be removed.
+/// Returns 0 or an errno value.
 int AppendWhole(int fd, std::string_view text);
 
 /// Returns true when the file is not empty and its last line has no newline at its end, or when
@@ -47,7 +50,11 @@ bool LacksFinalNewline(int fd);
 /// closed: 0 or an errno value.
 int FlushFile(int fd);
 
-/// Waits until the content of the file is on the disk. Returns 0 or an errno value.
-int SyncFile(int fd);
+/// Waits until the content of the open file or directory is on the disk. Returns 0, also when its
+/// file system cannot do that for this kind of file, or an errno value.
+int SyncOpenFile(int fd);
+
+/// Does the same with what is needed to read the content again, but not the times of the file.
+int SyncData(int fd);
 
 }  // namespace vela

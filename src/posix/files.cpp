@@ -18,6 +18,17 @@ int ErrnoUnless(bool succeeded) {
   return succeeded ? 0 : errno;
 }
 
+/// Opens or creates a regular file. Returns 0 or an errno value.
+int OpenForAppending(const std::string& path, FileDescriptor& file) {
+  const int flags = O_RDWR | O_CREAT | O_APPEND | O_NONBLOCK | O_NOCTTY | O_CLOEXEC;
+  file.Reset(open(path.c_str(), flags, 0644));
+  struct stat status = {};
+  if (!file.IsOpen() || fstat(file.Get(), &status) != 0) {
+    return errno;
+  }
+  return S_ISREG(status.st_mode) ? 0 : EINVAL;
+}
+
 }  // namespace
 
 bool IsRegularFileMode(uint32_t mode) {
@@ -37,6 +48,12 @@ std::optional<FileStatus> ExamineFile(const char* path) {
 bool IsRegularFile(const std::string& path) {
   const std::optional<FileStatus> status = ExamineFile(path);
   return status && status->isRegular;
+}
+
+bool IsPrivateFile(int fd) {
+  struct stat status = {};
+  return fstat(fd, &status) == 0 && S_ISREG(status.st_mode) && status.st_nlink == 1 &&
+         status.st_uid == geteuid() && (status.st_mode & 077) == 0;
 }
 
 int IdentifyDirectory(const std::string& path, FileIdentity& identity) {
@@ -87,32 +104,61 @@ int RemoveFileIfPresent(const std::string& path) {
   return error == ENOENT ? 0 : error;
 }
 
-int AppendLine(const std::string& path, const std::string& text) {
-  const int flags = O_RDWR | O_CREAT | O_APPEND | O_NONBLOCK | O_NOCTTY | O_CLOEXEC;
-  FileDescriptor file(open(path.c_str(), flags, 0644));
-  if (!file.IsOpen()) {
+int RenameToNewName(const std::string& from, const std::string& to) {
+  if (renameat2(AT_FDCWD, from.c_str(), AT_FDCWD, to.c_str(), RENAME_NOREPLACE) == 0) {
+    return 0;
+  }
+  if (errno != EINVAL && errno != ENOSYS) {
     return errno;
   }
-  struct stat status = {};
-  if (fstat(file.Get(), &status) != 0) {
+  // The file system does not support that flag.
+  if (link(from.c_str(), to.c_str()) != 0) {
     return errno;
   }
-  if (!S_ISREG(status.st_mode)) {
-    return EINVAL;
-  }
-  const int error = AppendWhole(file.Get(), text + '\n');
-  return error != 0 || file.Close() ? error : errno;
+  return ErrnoUnless(unlink(from.c_str()) == 0);
 }
 
-int SyncNameOf(const std::string& path) {
-  const std::string name = path.substr(0, path.rfind('/') + 1);
-  const FileDescriptor directory = OpenForReading(name.empty() ? "." : name);
-  if (!directory.IsOpen()) {
-    // A user may be allowed to create files there, but not to read the directory.
-    return errno == EACCES ? 0 : errno;
+int AppendLine(const std::string& path, const std::string& text) {
+  FileDescriptor file;
+  int error = OpenForAppending(path, file);
+  if (error == 0) {
+    error = AppendWhole(file.Get(), text + '\n');
   }
-  // EINVAL: the file system has nothing to wait for.
-  return fsync(directory.Get()) == 0 || errno == EINVAL ? 0 : errno;
+  return error != 0 ? error : ErrnoUnless(file.Close());
+}
+
+int AppendDurably(const std::string& path, const std::vector<std::string>& lines) {
+  FileDescriptor file;
+  int error = OpenForAppending(path, file);
+  if (error != 0) {
+    return error;
+  }
+  std::string text = LacksFinalNewline(file.Get()) ? "\n" : "";
+  for (const std::string& line : lines) {
+    text += line + '\n';
+  }
+  error = AppendWhole(file.Get(), text);
+  if (error == 0) {
+    error = SyncOpenFile(file.Get());
+  }
+  // Some file systems report only here that the data does not fit.
+  if (!file.Close() && error == 0) {
+    error = errno;
+  }
+  return error != 0 ? error : SyncDirectoryOf(path);
+}
+
+int SyncFile(const std::string& path) {
+  const FileDescriptor file = OpenForReading(path);
+  return file.IsOpen() ? SyncOpenFile(file.Get()) : errno;
+}
+
+int SyncDirectoryOf(const std::string& path) {
+  const size_t slash = path.rfind('/');
+  if (slash == std::string::npos) {
+    return SyncFile(".");
+  }
+  return SyncFile(path.substr(0, slash + 1));
 }
 
 std::string FindUnusedPath(const std::string& nameTemplate) {

@@ -12,6 +12,7 @@
 #include "storage/creation_queue.h"
 #include "storage/file_helpers.h"
 #include "storage/log_source.h"
+#include "storage/unfinished_directories.h"
 #include "thumb/directory_lock.h"
 #include "thumb/photo_pass.h"
 
@@ -60,6 +61,7 @@ bool MakePhotos(const DirectoryJob& job, const std::string& metadataRoot,
 void QueueDirectory(const std::string& dir) {
   if (WriteIndexQueue(dir.c_str(), kPhotoQueue.file) != 0) {
     LogError(kProgramLogSource, 1112, "Failed to write [" + dir + "] to thumb queue");
+    NoteUnfinishedDirectory(dir, UnfinishedReason::kNotQueued);
   }
 }
 
@@ -91,6 +93,9 @@ void CreateDirectoryThumbs(const DirectoryJob& job) {
   bool queue = false;
   {
     const DirectoryLock lock(metadataRoot);
+    if (lock.IsRefused()) {
+      NoteUnfinishedDirectory(job.path, UnfinishedReason::kLocked);
+    }
     if (!lock.IsHeld()) {
       return;
     }

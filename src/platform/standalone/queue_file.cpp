@@ -26,7 +26,9 @@ constexpr int kFlags = O_RDWR | O_APPEND | O_CLOEXEC | O_NONBLOCK | O_NOCTTY;
 /// Gives a new queue its mode, whatever the umask. Its name is on the disk before the first entry:
 /// those who append to it later only wait for their entry. Returns 0 or an errno value.
 int FinishNewQueue(const char* path, int fd) {
-  return fchmod(fd, kQueueMode) == 0 ? vela::SyncNameOf(path) : errno;
+  const int error = fchmod(fd, kQueueMode) == 0 ? vela::SyncDirectoryOf(path) : errno;
+  // A user may be allowed to create files in the directory, but not to read it.
+  return error == EACCES ? 0 : error;
 }
 
 /// Opens the queue file, created when missing. Returns 0 or an errno value.
@@ -102,7 +104,7 @@ int AppendLine(const char* path, const std::string& line) {
   // Others need not wait for the disk.
   queue.guard.Release();
   vela::Unlock(queue.file.Get());
-  return error != 0 ? error : vela::SyncFile(queue.file.Get());
+  return error != 0 ? error : vela::SyncData(queue.file.Get());
 }
 
 }  // namespace
