@@ -15,6 +15,7 @@
 #include <cerrno>
 #include <cstddef>
 #include <cstdint>
+#include <utility>
 #include <vector>
 
 #include "posix/confinement.h"
@@ -28,7 +29,7 @@ namespace {
 /// The user and group without rights, "nobody" and "nogroup".
 constexpr uid_t kNobody = 65534;
 
-constexpr uint64_t kMaxMemory = uint64_t{256} << 20;
+constexpr uint64_t kMaxMemory = uint64_t{512} << 20;
 constexpr uint64_t kMaxProcessorSeconds = 10;
 constexpr rlim_t kMaxDescriptors = 8;
 constexpr rlim_t kMaxStack = rlim_t{8} << 20;
@@ -85,7 +86,8 @@ void AllowCall(Filter& filter, long call) {
 }
 
 /// Allows the call unless one of these bits of an argument is set.
-void AllowCallWithout(Filter& filter, long call, std::vector<std::pair<unsigned, uint32_t>> bits) {
+void AllowCallWithout(Filter& filter, long call,
+                      const std::vector<std::pair<unsigned, uint32_t>>& bits) {
   const unsigned length = 3 * static_cast<unsigned>(bits.size()) + 1;
   filter.push_back(Instruction(BPF_JMP | BPF_JEQ | BPF_K, static_cast<uint32_t>(call), 0, length));
   for (const auto& [argument, mask] : bits) {

@@ -9,11 +9,13 @@
 #include "posix/directory_entries.h"
 #include "posix/files.h"
 #include "posix/folder.h"
+#include "posix/identity.h"
 #include "posix/log.h"
 #include "storage/creation_queue.h"
 #include "storage/file_helpers.h"
 #include "storage/log_source.h"
 #include "storage/photo_folder.h"
+#include "storage/unfinished_directories.h"
 #include "thumb/directory_lock.h"
 #include "thumb/photo_pass.h"
 
@@ -60,8 +62,10 @@ bool MakePhotos(const DirectoryJob& job, const std::string& metadataRoot,
 }
 
 void QueueDirectory(const std::string& dir) {
+  const OwnIdentity own;
   if (WriteIndexQueue(dir.c_str(), kPhotoQueue.file) != 0) {
     LogError(kProgramLogSource, 1112, "Failed to write [" + dir + "] to thumb queue");
+    NoteUnfinishedDirectory(dir, UnfinishedReason::kNotQueued);
   }
 }
 
@@ -95,6 +99,10 @@ void CreateDirectoryThumbs(const DirectoryJob& job) {
   {
     const HeldFolder root(metadataRoot);
     const DirectoryLock lock(metadataRoot);
+    if (lock.IsRefused()) {
+      const OwnIdentity own;
+      NoteUnfinishedDirectory(job.path, UnfinishedReason::kLocked);
+    }
     if (!lock.IsHeld()) {
       return;
     }

@@ -264,6 +264,63 @@ TEST_F(RawDecode, UsesTheSpaceOfARemovedPartialPreview) {
   EXPECT_THAT(ThumbDirFiles(), ElementsAre("RAW_TEMP.ppm", "other"));
 }
 
+/// The bytes of a number, little-endian.
+std::string Bytes(uint32_t number, int count) {
+  std::string bytes;
+  for (int i = 0; i < count; ++i) bytes += static_cast<char>(number >> (8 * i) & 0xff);
+  return bytes;
+}
+
+/// One number of a TIFF header.
+std::string Tag(uint32_t tag, uint32_t number) {
+  return Bytes(tag, 2) + Bytes(4, 2) + Bytes(1, 4) + Bytes(number, 4);
+}
+
+/// The header of a raw photo of this size, without pixels.
+std::string HeaderOf(uint32_t width, uint32_t height) {
+  constexpr uint32_t kSubfileType = 254;
+  constexpr uint32_t kImageWidth = 256;
+  constexpr uint32_t kImageLength = 257;
+  return std::string("II*\0", 4) + Bytes(8, 4) + Bytes(3, 2) + Tag(kSubfileType, 0) +
+         Tag(kImageWidth, width) + Tag(kImageLength, height) + Bytes(0, 4);
+}
+
+struct ClaimedSize : NamedCase {
+  uint32_t width;
+  uint32_t height;
+  std::string settings;
+  bool isDecoded;
+};
+
+class RawLimit : public RawConvert, public ::testing::WithParamInterface<ClaimedSize> {};
+
+TEST_P(RawLimit, RefusesTheFullDecodeOfMorePixels) {
+  WriteFile(kRaw, HeaderOf(GetParam().width, GetParam().height));
+  WriteFile("/etc/velainfo.conf", GetParam().settings);
+  if (GetParam().isDecoded) {
+    ExpectFullDecode();
+    EXPECT_THAT(ErrorLines(), IsEmpty());
+    return;
+  }
+  ExpectNothing();
+  EXPECT_EQ(ParametersOf(dcraw_->Calls()), (ArgumentLists{{"-e", "-c", kRaw}}));
+  EXPECT_THAT(ErrorLines(), ElementsAre(kDecodeFailure));
+}
+
+INSTANTIATE_TEST_SUITE_P(
+    Sizes, RawLimit,
+    ::testing::Values(ClaimedSize{"LargeCamera", 14204, 10652, "", true},
+                      ClaimedSize{"AtTheDefault", 25000, 20000, "", true},
+                      ClaimedSize{"AboveTheDefault", 25000, 20001, "", false},
+                      ClaimedSize{"Largest", 65535, 65535, "", false},
+                      ClaimedSize{"UnknownSize", 4294967295, 4294967295, "", true},
+                      ClaimedSize{"AtTheSetting", 10, 10, "raw_pixel_limit=100\n", true},
+                      ClaimedSize{"AboveTheSetting", 10, 11, "raw_pixel_limit=100\n", false},
+                      ClaimedSize{"NoLimit", 65535, 65535, "raw_pixel_limit=0\n", true},
+                      ClaimedSize{"InvalidSetting", 65535, 65535, "raw_pixel_limit=1G\n", false},
+                      ClaimedSize{"NoSize", 0, 65535, "", true}),
+    CaseName());
+
 using RawFile = RawConvert;
 
 TEST_F(RawFile, ThatIsNoRegularFileIsRefused) {

@@ -196,7 +196,7 @@ TEST_F(HeaderConfinement, HasNoPrivileges) {
 
 TEST_F(HeaderConfinement, HasLittleMemory) {
   if (kIsSanitized) return;  // its shadow memory exceeds every limit
-  const size_t size = size_t{300} << 20;
+  const size_t size = size_t{600} << 20;
   const auto isMapped = [size] {
     return mmap(nullptr, size, PROT_READ | PROT_WRITE, MAP_PRIVATE | MAP_ANONYMOUS, -1, 0) !=
                    MAP_FAILED
