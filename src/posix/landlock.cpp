@@ -9,6 +9,7 @@
 
 #include <cerrno>
 #include <cstdint>
+#include <iterator>
 #include <utility>
 
 #include "posix/folder.h"
@@ -37,6 +38,15 @@ constexpr uint64_t kRead = LANDLOCK_ACCESS_FS_READ_FILE | LANDLOCK_ACCESS_FS_REA
 /// The rights that a rule for a file other than a directory can contain.
 constexpr uint64_t kOfFiles = LANDLOCK_ACCESS_FS_EXECUTE | LANDLOCK_ACCESS_FS_WRITE_FILE |
                               LANDLOCK_ACCESS_FS_READ_FILE | kTruncate | kDeviceControl;
+
+/// Directories of shared libraries. The dynamic loader among them is run.
+constexpr const char* kLibraries[] = {"/lib",       "/lib32",     "/lib64",        "/usr/lib",
+                                      "/usr/lib32", "/usr/lib64", "/usr/local/lib"};
+constexpr const char* kLibraryData[] = {
+    "/etc/ld.so.cache",  "/etc/ld.so.preload",  "/etc/localtime",
+    "/usr/share/locale", "/usr/share/zoneinfo", "/dev/random",
+    "/dev/urandom",      "/dev/zero",           "/sys/devices/system/cpu"};
+constexpr char kNullDevice[] = "/dev/null";
 
 /// The kernel's structure in its latest known form; older kernels accept it as long as the fields
 /// that they do not know are zero.
@@ -119,6 +129,14 @@ class RulesetBuilder {
 };
 
 }  // namespace
+
+AllowedFiles FilesOfEveryProgram() {
+  AllowedFiles files;
+  files.programs.assign(std::begin(kLibraries), std::end(kLibraries));
+  files.data.assign(std::begin(kLibraryData), std::end(kLibraryData));
+  files.devices = {kNullDevice};
+  return files;
+}
 
 int LandlockVersion() {
   const long version =

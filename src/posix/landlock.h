@@ -21,6 +21,10 @@ struct AllowedFiles {
   std::vector<std::string> outputs;   ///< directories whose files may be read, written, removed
 };
 
+/// Returns what every program needs: shared libraries with the dynamic loader, what these and the C
+/// library read, and /dev/null.
+AllowedFiles FilesOfEveryProgram();
+
 /// Returns the kernel's Landlock version, 0 when it does not support Landlock.
 int LandlockVersion();
 

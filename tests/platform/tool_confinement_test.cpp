@@ -166,6 +166,17 @@ TEST_F(ToolConfinement, ToolsInheritNoEnvironment) {
                   "export PATH='/usr/sbin:/usr/bin:/sbin:/bin'", "export PWD='/'"));
 }
 
+TEST_F(ToolConfinement, CompareIsLimitedToPhotosByThePolicy) {
+  InstallProgram(kComparePath, ReadFile("/usr/bin/printenv"));
+  EXPECT_EQ(OutputOf(kComparePath, "MAGICK_CONFIGURE_PATH", "XDG_CONFIG_HOME", "null:"),
+            "/usr/vela/share/imagemagick\n/usr/vela/share/imagemagick/last\n");
+}
+
+TEST_F(ToolConfinement, ConverterThatIsAScriptCanExamineItsPhoto) {
+  InstallProgram(kConverterPath, "#!/bin/sh\nod -An -v -tx1 -N2 -- \"$1\" | tr -d ' \\n'\n");
+  EXPECT_EQ(OutputOf(kConverterPath, kPhoto, "/tmp/out/a.jpg"), "7068");
+}
+
 /// The limits as a shell prints them, in blocks and kilobytes.
 constexpr char kPrintLimits[] =
     "#!/bin/sh\nulimit -t\nulimit -f\nulimit -d\nulimit -c\n"

@@ -19,32 +19,23 @@ constexpr char kScratchDefine[] = "registry:temporary-path=";
 constexpr char kScratchVariable[] = "MAGICK_TEMPORARY_PATH=";
 constexpr char kFirstPage[] = "[0]";
 
-/// Directories of shared libraries; the dynamic loader among them is run.
-constexpr const char* kLibraries[] = {"/lib", "/lib64", "/usr/lib", "/usr/lib64", "/usr/local/lib"};
+/// The configuration of ImageMagick, with the policy that limits it to photos.
+constexpr const char* kImageMagickData[] = {"/etc/ImageMagick-6", "/usr/share/ImageMagick-6",
+                                            "/usr/share/color", "/usr/vela/share/imagemagick"};
 
-/// What libraries read.
-constexpr const char* kData[] = {"/etc/ld.so.cache", "/etc/localtime", "/dev/urandom",
-                                 "/sys/devices/system/cpu"};
-
-/// ImageMagick reads the policy here, which limits it to photos, before that of the system, and the
-/// one in the directory below after it.
-constexpr char kImageMagickPolicies[] = "/usr/vela/share/imagemagick";
-constexpr const char* kPolicyEnvironment[] = {"MAGICK_CONFIGURE_PATH=/usr/vela/share/imagemagick",
+/// Makes ImageMagick read that policy, before and after the system's.
+constexpr const char* kImageMagickPolicy[] = {"MAGICK_CONFIGURE_PATH=/usr/vela/share/imagemagick",
                                               "XDG_CONFIG_HOME=/usr/vela/share/imagemagick/last"};
 
-/// The configuration of ImageMagick and what it consists of.
-constexpr const char* kImageMagickData[] = {"/etc/ImageMagick-6", "/usr/share/ImageMagick-6",
-                                            "/usr/share/color", kImageMagickPolicies};
-
-/// What the converter runs when it does not support a photo, and the shell for a converter that is
-/// a script.
-constexpr const char* kConverterPrograms[] = {"/usr/vela/lib/convert-thumb", "/bin/sh"};
+/// ImageMagick, which the converter runs when it does not support a photo, and what a converter
+/// that is a script runs.
+constexpr const char* kConverterPrograms[] = {"/usr/vela/lib/convert-thumb",
+                                              "/usr/bin/convert-im6.q16", "/bin/sh", "/usr/bin/od",
+                                              "/usr/bin/tr"};
 
 constexpr const char* kPerlPrograms[] = {"/usr/bin/perl"};
 constexpr const char* kPerlData[] = {"/usr/share/perl", "/usr/share/perl5", "/etc/perl",
                                      "/usr/local/share/perl"};
-
-constexpr const char* kNullDevice[] = {"/dev/null"};
 
 template <size_t count>
 void Append(Arguments& list, const char* const (&more)[count]) {
@@ -134,7 +125,7 @@ void AllowExiftool(const Arguments& arguments, Confinement& confinement) {
 /// The two images are followed by the name of the output, which is no file.
 void AllowCompare(const Arguments& arguments, Confinement& confinement) {
   Append(confinement.files->data, kImageMagickData);
-  Append(confinement.environment, kPolicyEnvironment);
+  Append(confinement.environment, kImageMagickPolicy);
   constexpr size_t kLast = 3;
   if (arguments.size() > kLast) {
     const auto output = arguments.end() - 1;
@@ -208,11 +199,8 @@ Confinement ConfinementOfTool(const char* program, char* const arguments[],
   for (char* const* argument = arguments; *argument != nullptr; ++argument) {
     list.emplace_back(*argument);
   }
-  confinement.files.emplace();
+  confinement.files = FilesOfEveryProgram();
   confinement.files->programs.emplace_back(program);
-  Append(confinement.files->programs, kLibraries);
-  Append(confinement.files->data, kData);
-  Append(confinement.files->devices, kNullDevice);
   if (!list.empty()) {
     tool->allow(list, confinement);
   }
