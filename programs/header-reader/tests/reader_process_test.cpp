@@ -92,12 +92,15 @@ TEST_F(HostileReader, AnswersManyQuestions) {
 }
 
 TEST_F(HostileReader, IsReplacedAfterEachFailure) {
-  for (const char* command :
-       {"crash", "say nothing", "say too little", "take memory", "end afterwards"}) {
+  std::vector<std::string> commands = {"crash", "say nothing", "say too little", "end afterwards"};
+#if !defined(__SANITIZE_ADDRESS__)
+  commands.emplace_back("take memory");  // a sanitizer's shadow memory exceeds every limit
+#endif
+  for (const std::string& command : commands) {
     SCOPED_TRACE(command);
     const pid_t first = Ask("answer");
     const bool hasAnswer = Ask(command) != 0;
-    EXPECT_EQ(hasAnswer, command == std::string("end afterwards"));
+    EXPECT_EQ(hasAnswer, command == "end afterwards");
     const pid_t second = Ask("answer");
     EXPECT_NE(second, 0);
     EXPECT_NE(second, first);
