@@ -77,6 +77,28 @@ function check_system(name, folder) {
   else fault("includes <" name ">: neither in a folder that wraps the system nor on the allow-list")
 }
 
+# Calls by which a file is opened or changed under its path: where other users can change the
+# directory, the path may lead elsewhere at the next call.
+function check_calls(line, folder) {
+  for (folder in path_folders) if (index(FILENAME, folder "/") == 1) return
+  gsub(/"([^"\\]|\\.)*"/, "", line)
+  sub(/\/\/.*/, "", line)
+  if (line !~ path_calls) return
+  if (FILENAME in path_reason) {
+    calls_paths[FILENAME]
+    return
+  }
+  fault("opens or changes a file by its path: use posix/folder.h")
+}
+
+# Faults of an allow-list.
+function check_list(list, used, what, file) {
+  for (file in list) {
+    if (!(file in used)) printf "%s:1: is on the list of %s, which it does not need\n", file, what
+    else if (list[file] == "") printf "%s:1: is on the list of %s without a reason\n", file, what
+  }
+}
+
 BEGIN {
   printf "" >file_graph
   printf "" >folder_graph
@@ -99,17 +121,18 @@ input == "order" {
 input == "closed" { closed[$1] = $2; next }
 input == "system" { system_folders[$1]; next }
 input == "allowed" && NF > 0 { file = $1; $1 = ""; reason[file] = $0; next }
+input == "path_folders" { path_folders[$1]; next }
+input == "paths" && NF > 0 { file = $1; $1 = ""; path_reason[file] = $0; next }
 input == "files" { files[$1]; ++file_count; next }
 
 FNR == 1 { check_folder(folder_of(FILENAME)) }
 match($0, /^[ \t]*#[ \t]*include[ \t]*"[^"]*"/) { split($0, words, "\""); check_own(words[2]) }
 match($0, /^[ \t]*#[ \t]*include[ \t]*<[^>]*>/) { split($0, words, /[<>]/); check_system(words[2]) }
+{ check_calls($0) }
 
 END {
-  for (file in reason) {
-    if (!(file in needed)) printf "%s:1: is on the allow-list, which it does not need\n", file
-    else if (reason[file] == "") printf "%s:1: is on the allow-list without a reason\n", file
-  }
+  check_list(reason, needed, "system headers")
+  check_list(path_reason, calls_paths, "paths")
   printf "%d of %d product files (%.1f %%) include POSIX or Linux headers; allowed are %d %%\n",
     system_files, file_count, 100 * system_files / file_count, max_percent >share
   exit 100 * system_files > max_percent * file_count

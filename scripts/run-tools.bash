@@ -9,6 +9,8 @@ readonly CONVERTER=${VELA_CONVERTER:-own}
 readonly OWN_CONVERTER=$BUILD/programs/convert-thumb/convert-thumb
 readonly CONVERTER_FRONT=$ROOT/programs/convert-thumb/convert-thumb.sh
 readonly CONVERTER_LINK=/usr/vela/lib/convert-thumb
+readonly POLICY=$ROOT/config/imagemagick
+readonly POLICY_PLACE=/usr/vela/share/imagemagick
 
 say() { printf '==> %s\n' "$*"; }
 
@@ -80,8 +82,20 @@ place_converter() {
   "$ROOT/scripts/as-root" "$purpose" install -m 0755 "$converter" "$tool"
 }
 
+# Installs what limits ImageMagick to photos. Each file is replaced when it differs.
+place_policy() {
+  local file purpose="install $POLICY_PLACE"
+  for file in policy.xml last/ImageMagick/policy.xml; do
+    if ! cmp -s "$POLICY/$file" "$POLICY_PLACE/$file"; then
+      say "Installing $POLICY_PLACE/$file"
+      "$ROOT/scripts/as-root" "$purpose" install -D -m 0644 "$POLICY/$file" "$POLICY_PLACE/$file"
+    fi
+  done
+}
+
 place_tools() {
   local convert
+  place_policy
   convert=$(imagemagick_convert)
   link_tool "$CONVERTER_LINK" "$convert"
   place_converter

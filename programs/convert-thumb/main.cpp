@@ -10,8 +10,8 @@
 #include <variant>
 #include <vector>
 
+#include "command_line/allowed_files.h"
 #include "command_line/command_line.h"
-#include "command_line/writable_paths.h"
 #include "decoding/photo_opener.h"
 #include "imagemagick/image_magick.h"
 #include "posix/file_descriptor.h"
@@ -39,7 +39,7 @@ int LeaveToImageMagick(const CommandLine& line, size_t memoryLimit) {
 }
 
 int Convert(const ConversionPlan& plan, const CommandLine& line, size_t memoryLimit) {
-  const FileDescriptor file = OpenTrusted(plan.source);
+  const FileDescriptor file = OpenSource(plan.source);
   if (!file.IsOpen()) {
     ReportFailure("cannot open %s: %s", plan.source.c_str(), std::strerror(errno));
     return kFailed;
@@ -77,6 +77,14 @@ int Run(const CommandLine& line, size_t memoryLimit) {
   return LeaveToImageMagick(line, memoryLimit);
 }
 
+int RunConfined(const CommandLine& line, size_t memoryLimit) {
+  if (const int error = Confine(FindAllowedFiles(line)); error != 0) {
+    ReportFailure("cannot give up privileges: %s", std::strerror(error));
+    return kFailed;
+  }
+  return Run(line, memoryLimit);
+}
+
 int RunMain(int argc, char** argv) {
   int status = kFailed;
   try {
@@ -86,8 +94,7 @@ int RunMain(int argc, char** argv) {
     CleanUpOnFatalSignals();
     const size_t memoryLimit = ConversionMemoryLimit();
     LimitResources(memoryLimit);
-    Confine(FindWritablePaths(line));
-    status = Run(line, memoryLimit);
+    status = RunConfined(line, memoryLimit);
   } catch (const std::bad_alloc&) {
     ReportFailure("out of memory");
   } catch (const std::exception& error) {

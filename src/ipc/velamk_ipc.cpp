@@ -3,6 +3,7 @@
 #include <json/value.h>
 
 #include "platform/velaindex.h"
+#include "posix/identity.h"
 #include "posix/log.h"
 
 using namespace vela;
@@ -42,6 +43,7 @@ int ToInt(const Json::Value& value) {
 /// Replaces the request by the daemon's reply. Returns true when the daemon succeeded; a failure is
 /// logged with the operation's `line`.
 bool Exchange(Json::Value& packet, int line) {
+  const OwnIdentity own;
   AutoSendRecvPacket(PluginDaemonSocketPath, -1, packet, kExchangeSeconds);
   if (ToBool(Member(packet, "success"))) {
     return true;

@@ -1,6 +1,7 @@
 #include "posix/child_process.h"
 
 #include <fcntl.h>
+#include <linux/futex.h>
 #include <poll.h>
 #include <sched.h>
 #include <signal.h>
@@ -9,6 +10,7 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include <atomic>
 #include <cerrno>
 #include <cstring>
 #include <memory>
@@ -20,6 +22,7 @@
 #include "posix/deadline.h"
 #include "posix/event_wait.h"
 #include "posix/file_descriptor.h"
+#include "posix/identity.h"
 #include "posix/log.h"
 #include "posix/signal_block.h"
 
@@ -30,6 +33,8 @@ namespace {
 constexpr int kFirstOtherDescriptor = STDERR_FILENO + 1;
 constexpr size_t kCommandNameSize = 16;
 constexpr size_t kChildStackSize = 64 * 1024;
+/// For a child to run its program.
+constexpr std::chrono::seconds kStartLimit{10};
 
 /// The environment of every confined child.
 constexpr const char* kEnvironment[] = {"PATH=/usr/sbin:/usr/bin:/sbin:/bin", "LC_ALL=C", "HOME=/"};
@@ -118,6 +123,10 @@ int BecomeProgram(const ChildPlan& plan) {
   // The kernel sets this name only at the end of exec, when the parent is already running again:
   // until then a search for the program's name would miss the child.
   prctl(PR_SET_NAME, plan.commandName);
+  // Before the next call, whose setting the kernel drops with the rights.
+  if (const int error = BecomeFileUser(); error != 0) {
+    return error;
+  }
   if (!EndWithParent(plan.parent)) {
     return errno;
   }
@@ -166,6 +175,39 @@ std::vector<char*> MakeEnvironment(const Confinement& confinement) {
   return environment;
 }
 
+/// Waits until the kernel clears `isSharing`, which it does when the child stops sharing its
+/// parent's memory. Returns false when that has not happened within `limit`.
+bool AwaitOwnMemory(const std::atomic<int>& isSharing, std::chrono::seconds limit) {
+  const Deadline deadline(limit);
+  while (isSharing != 0) {
+    const auto left = deadline.Left();
+    if (left == std::chrono::nanoseconds::zero()) {
+      return false;
+    }
+    const auto seconds = std::chrono::duration_cast<std::chrono::seconds>(left);
+    const timespec time = {seconds.count(), (left - seconds).count()};
+    syscall(SYS_futex, &isSharing, FUTEX_WAIT, 1, &time, nullptr, 0);
+  }
+  return true;
+}
+
+/// Starts a child that becomes another user, who may stop it before it runs its program: it is not
+/// waited for without a limit. Otherwise as CloneChild.
+pid_t CloneChildOfOther(char* stackEnd, ChildPlan& plan) {
+  std::atomic<int> isSharing = 1;
+  static_assert(sizeof isSharing == sizeof(int), "the kernel clears an int");
+  const pid_t child = clone(RunChild, stackEnd, CLONE_VM | CLONE_CHILD_CLEARTID | SIGCHLD, &plan,
+                            nullptr, nullptr, &isSharing);
+  if (child < 0 || AwaitOwnMemory(isSharing, kStartLimit)) {
+    return child;
+  }
+  do {
+    kill(child, SIGKILL);
+  } while (!AwaitOwnMemory(isSharing, kStartLimit));
+  plan.error = ETIMEDOUT;
+  return child;
+}
+
 /// Returns the process id, or -1 with errno set. The parent is suspended until the program runs or
 /// the child has ended, which makes sharing its memory safe and the time to start independent of
 /// how much memory that is.
@@ -177,7 +219,11 @@ pid_t CloneChild(ChildPlan& plan) {
     errno = ENOMEM;
     return -1;
   }
-  return clone(RunChild, stack.get() + kChildStackSize, CLONE_VM | CLONE_VFORK | SIGCHLD, &plan);
+  char* const stackEnd = stack.get() + kChildStackSize;
+  if (FileUser() != geteuid()) {
+    return CloneChildOfOther(stackEnd, plan);
+  }
+  return clone(RunChild, stackEnd, CLONE_VM | CLONE_VFORK | SIGCHLD, &plan);
 }
 
 /// Returns 0 when the child has ended, ETIMEDOUT, or another errno value when the system does not

@@ -19,11 +19,11 @@ struct ChildStreams {
 
 /// Starts `program` (no PATH search, no shell) with these arguments, ended by a null pointer. The
 /// child reads /dev/null, has no descriptors besides the two outputs, default signal handling, its
-/// own process group and, from the start, the command name of the program. It gets SIGTERM when the
-/// calling thread ends before it. It inherits no environment: it gets PATH, LC_ALL, HOME and the
-/// variables of `confinement`, which it enters before the program runs. Returns 0 and stores the
-/// process id once the program itself runs, or returns an errno value. The child must be handed to
-/// ReapChild.
+/// own process group and, from the start, the command name of the program. It runs as the user with
+/// whose rights the calling thread accesses files (see identity.h) and gets SIGTERM when that
+/// thread ends before it. It inherits no environment: it gets PATH, LC_ALL, HOME and the variables
+/// of `confinement`, which it enters before the program runs. Returns 0 and stores the process id
+/// once the program itself runs, or returns an errno value. The child must be handed to ReapChild.
 int StartChild(const char* program, char* const arguments[], const ChildStreams& streams,
                const Confinement& confinement, pid_t& pid);
 

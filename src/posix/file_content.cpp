@@ -12,6 +12,7 @@
 
 #include "posix/file_descriptor.h"
 #include "posix/files.h"
+#include "posix/folder.h"
 
 namespace vela {
 
@@ -98,8 +99,7 @@ int ReadFile(const char* path, std::string& content) {
 }
 
 std::string ReadSmallFile(const std::string& path, size_t limit) {
-  const int flags = O_RDONLY | O_NONBLOCK | O_NOFOLLOW | O_NOCTTY | O_CLOEXEC;
-  const FileDescriptor file(open(path.c_str(), flags));
+  const FileDescriptor file = FolderEntry(path).Open(O_RDONLY | O_NOFOLLOW);
   struct stat status = {};
   if (!file.IsOpen() || fstat(file.Get(), &status) != 0) {
     return {};

@@ -2,6 +2,7 @@
 
 #include <fcntl.h>
 #include <linux/landlock.h>
+#include <linux/openat2.h>
 #include <sys/stat.h>
 #include <sys/syscall.h>
 #include <unistd.h>
@@ -71,21 +72,6 @@ int Allow(const FileDescriptor& ruleset, const FileDescriptor& file, uint64_t ac
   const long result =
       syscall(SYS_landlock_add_rule, ruleset.Get(), LANDLOCK_RULE_PATH_BENEATH, &rule, 0);
   return result == 0 ? 0 : errno;
-}
-
-void AllowChangesBelow(const FileDescriptor& ruleset, const std::string& directory, int version) {
-  const FileDescriptor file(open(directory.c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC));
-  if (file.IsOpen()) {
-    Allow(ruleset, file, ChangeFile(version) | kChangeDirectory);
-  }
-}
-
-void AllowChangesOf(const FileDescriptor& ruleset, const std::string& path, int version) {
-  const FileDescriptor file(open(path.c_str(), O_PATH | O_CLOEXEC));
-  struct stat status;
-  if (file.IsOpen() && fstat(file.Get(), &status) == 0 && !S_ISDIR(status.st_mode)) {
-    Allow(ruleset, file, ChangeFile(version));
-  }
 }
 
 /// Adds rules to a ruleset and remembers the first failure.
@@ -189,24 +175,6 @@ int MakeLandlockRuleset(const AllowedFiles& files, FileDescriptor& ruleset) {
 
 int EnterLandlockRuleset(int ruleset) {
   return syscall(SYS_landlock_restrict_self, ruleset, 0) == 0 ? 0 : errno;
-}
-
-void RestrictWritingTo(const WritablePaths& paths) {
-  const int version = LandlockVersion();
-  if (version < 1) {
-    return;
-  }
-  const FileDescriptor ruleset = CreateRuleset(WritingRestrictions(version));
-  if (!ruleset.IsOpen()) {
-    return;
-  }
-  for (const std::string& directory : paths.directories) {
-    AllowChangesBelow(ruleset, directory, version);
-  }
-  for (const std::string& path : paths.files) {
-    AllowChangesOf(ruleset, path, version);
-  }
-  EnterLandlockRuleset(ruleset.Get());
 }
 
 }  // namespace vela

@@ -8,12 +8,6 @@
 
 namespace vela {
 
-/// The paths that a process may write to. They need not exist.
-struct WritablePaths {
-  std::vector<std::string> directories;  ///< including everything below them
-  std::vector<std::string> files;        ///< existing outputs; symbolic links are followed
-};
-
 /// The only files that a process may open. A directory stands for everything below it. Paths that
 /// do not exist are skipped. In the paths of inputs and outputs, which ordinary users control, a
 /// symbolic link is followed only if it belongs to root, the effective user or the owner of the
@@ -42,12 +36,5 @@ int MakeLandlockRuleset(const AllowedFiles& files, FileDescriptor& ruleset);
 /// descriptors are not affected. Requires RefuseNewPrivileges. Only makes a system call. Returns 0
 /// or an errno value.
 int EnterLandlockRuleset(int ruleset);
-
-/// From now on this thread, and all threads and programs that it starts, can write, create,
-/// truncate and remove regular files only at `paths`; it cannot create other kinds of files, use
-/// TCP, or send signals to processes that were started earlier. Restrictions that the kernel does
-/// not support and paths that do not exist are skipped. Open descriptors are not affected. Requires
-/// RefuseNewPrivileges.
-void RestrictWritingTo(const WritablePaths& paths);
 
 }  // namespace vela

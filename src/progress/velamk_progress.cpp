@@ -11,6 +11,7 @@
 #include "platform/system_rules.h"
 #include "platform/velaindex.h"
 #include "platform/vlibc.h"
+#include "posix/identity.h"
 #include "posix/log.h"
 #include "progress/progress_summary.h"
 
@@ -47,6 +48,7 @@ void AddConvProgress(int kind, const char* key, int delta) {
   if (file == nullptr || key == nullptr) {
     return;
   }
+  const OwnIdentity own;
   const int64_t sum = int64_t{ReadCounter(file, key)} + delta;
   const std::string text = std::to_string(ClampToInt(sum));
   if (VLIBCFileSetKeyValue(file, key, text.c_str(), 0) < 0) {

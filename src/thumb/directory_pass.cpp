@@ -9,6 +9,7 @@
 #include "posix/directory_entries.h"
 #include "posix/files.h"
 #include "posix/folder.h"
+#include "posix/identity.h"
 #include "posix/log.h"
 #include "storage/creation_queue.h"
 #include "storage/file_helpers.h"
@@ -60,6 +61,7 @@ bool MakePhotos(const DirectoryJob& job, const std::string& metadataRoot,
 }
 
 void QueueDirectory(const std::string& dir) {
+  const OwnIdentity own;
   if (WriteIndexQueue(dir.c_str(), kPhotoQueue.file) != 0) {
     LogError(kProgramLogSource, 1112, "Failed to write [" + dir + "] to thumb queue");
   }

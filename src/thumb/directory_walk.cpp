@@ -4,8 +4,10 @@
 
 #include "platform/velaindex.h"
 #include "posix/files.h"
+#include "posix/identity.h"
 #include "profiles/thumbnail_profile.h"
 #include "thumb/directory_pass.h"
+#include "thumb/work_as_owner.h"
 
 using namespace vela;
 
@@ -14,6 +16,11 @@ namespace {
 /// The step of the walk has no parameter for it.
 std::string g_profile_path;
 
+bool ReadProfiles(ThumbnailProfileList& profiles, const std::string& file, const std::string& dir) {
+  const OwnIdentity own;
+  return ParseThumbnailProfiles(profiles, file, dir) != 0;
+}
+
 }  // namespace
 
 void RunDirectoryJob(const std::string& dirPath, const std::string& profileFilePath) {
@@ -21,10 +28,11 @@ void RunDirectoryJob(const std::string& dirPath, const std::string& profileFileP
   if (!ExamineFile(dirPath) || !ExamineFile(profileFilePath)) {
     return;
   }
+  const WorkAsOwner owner(dirPath);
   if (IndexIsPathSupportEAWrite(dirPath.c_str()) == 0) {
     return;
   }
-  if (ParseThumbnailProfiles(profiles, profileFilePath, dirPath) == 0) {
+  if (!ReadProfiles(profiles, profileFilePath, dirPath)) {
     std::fprintf(stderr, "Failed to parse %s", profileFilePath.c_str());
     return;
   }

@@ -5,6 +5,7 @@
 #include <cstring>
 
 #include "platform/velaindex.h"
+#include "posix/identity.h"
 #include "posix/log.h"
 #include "source/raw_image.h"
 #include "storage/log_source.h"
@@ -33,5 +34,6 @@ void RegisterThumbConversion(const std::string& photoPath, const std::string& th
   if (!DescribeImage(photoPath, 469, photo) || !DescribeImage(thumbPath, 474, thumb)) {
     return;
   }
+  const OwnIdentity own;
   VELAIDX_IndexConvertAdd(photo, thumb, Json::Value(Json::objectValue));
 }

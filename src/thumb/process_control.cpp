@@ -10,6 +10,7 @@
 #include "convert/photo_convert_job.h"
 #include "platform/vlibc.h"
 #include "posix/glob_matches.h"
+#include "posix/identity.h"
 #include "posix/log.h"
 #include "posix/processes.h"
 #include "storage/log_source.h"
@@ -95,6 +96,7 @@ void KillThumbProcesses() {
 
 void OnSigTerm(int /*signal*/) {
   const OwnPidPath path;
+  ResumeOwnIdentity();
   unlink(path.c_str());
   VLIBCKill(BaseName(kConvertToolPath), 0);
   _exit(1);

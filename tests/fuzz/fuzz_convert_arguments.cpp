@@ -1,12 +1,14 @@
 // The converter's command line: arguments separated by zero bytes.
 
+#include <algorithm>
 #include <cstdlib>
 #include <string>
 #include <variant>
 #include <vector>
 
+#include "command_line/allowed_files.h"
 #include "command_line/command_line.h"
-#include "command_line/writable_paths.h"
+#include "command_line/file_name.h"
 
 using namespace vela;
 
@@ -30,20 +32,19 @@ bool IsWhole(const OutputPlan& output) {
   return hasBox && hasQuality && !output.path.empty();
 }
 
-bool CanBeWritten(const std::string& path, const WritablePaths& paths) {
-  for (const std::string& file : paths.files) {
-    if (file == path) {
-      return true;
-    }
-  }
-  return false;
+bool Contains(const std::vector<std::string>& list, const std::string& text) {
+  return std::find(list.begin(), list.end(), text) != list.end();
+}
+
+bool CanBeWritten(const std::string& path, const AllowedFiles& files) {
+  return Contains(files.outputs, DirectoryOf(path)) || Contains(files.devices, path);
 }
 
 }  // namespace
 
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
   const CommandLine line = ParseCommandLine(Split(data, size));
-  const WritablePaths paths = FindWritablePaths(line);
+  const AllowedFiles files = FindAllowedFiles(line);
   if (line.sourceIndex > line.arguments.size()) {
     std::abort();
   }
@@ -59,7 +60,7 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
     std::abort();
   }
   for (const OutputPlan& output : conversion->outputs) {
-    if (!IsWhole(output) || !CanBeWritten(output.path, paths)) {
+    if (!IsWhole(output) || !CanBeWritten(output.path, files)) {
       std::abort();
     }
   }

@@ -84,14 +84,16 @@ TEST_F(Companions, RunnerTakesNewEntriesWhileADirectoryIsLocked) {
 TEST_F(Companions, StatusPageIsNotWrittenThroughALink) {
   MakePhotoOf(kAttacker, "d");
   const std::string page = InPhotos("d/page.html");
-  ActAs(kAttacker, [&] { return Link(kPrivateText, page); });
   ProgramOptions options;
   options.timeLimit = kSoon;
-  const ProgramResult linked =
-      RunProgram(HostPath(VELATHUMB_STATUS_FILE), {"--html", page, InPhotos("d")}, options);
-  EXPECT_FALSE(linked.timedOut);
-  ExpectVictimUnchanged();
-  RemoveTree(page);
+  if (CanDistinguishOwners()) {
+    ActAs(kAttacker, [&] { return Link(kPrivateText, page); });
+    const ProgramResult linked =
+        RunProgram(HostPath(VELATHUMB_STATUS_FILE), {"--html", page, InPhotos("d")}, options);
+    EXPECT_FALSE(linked.timedOut);
+    ExpectVictimUnchanged();
+    RemoveTree(page);
+  }
   ActAs(kAttacker, [&] { return Fifo(page); });
   const ProgramResult piped =
       RunProgram(HostPath(VELATHUMB_STATUS_FILE), {"--html", page, InPhotos("d")}, options);

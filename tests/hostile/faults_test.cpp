@@ -1,189 +1,148 @@
-// A run in which one system call fails, of the program or of a tool, or in which the program or a
-// tool is killed at that call. Whatever happens, the photos stay as they are, no thumbnail is half
-// written, and the next runs leave the same files as if nothing had happened.
-//
-// Each test tries a sample of all calls and errors, the same in every run unless set by
-// --gtest_random_seed=N; all of them when the environment has VELA_TEST_ROUNDS=full.
-#include <sys/stat.h>
-
+// Faults in a run. Whatever happens, the photos stay as they are, no thumbnail is half written, and
+// the next runs leave the same files as if nothing had happened.
 #include <algorithm>
 #include <cstring>
-#include <iostream>
-#include <random>
 
-#include "hostile/hostile_test.h"
-#include "support/call_faults.h"
+#include "hostile/fault_trials.h"
 #include "support/named_case.h"
 
 namespace vela_test::hostile {
 
 namespace {
 
-constexpr unsigned kSeed = 20261122;
-
-/// What a test varies.
-struct Trials : NamedCase {
-  CallScope scope;
+struct Row : NamedCase {
+  FaultRange range;
   bool firstPhasesDone;  ///< whether an undisturbed run comes before
-  bool kill;             ///< instead of errors
-  size_t sample;
 };
 
-std::string DescriptionOf(const MadeCall& made, const CallFault& fault) {
-  std::string end = fault.kill                      ? "killed"
-                    : fault.error == kShortTransfer ? "half done"
-                                                    : std::strerror(fault.error);
-  return "call " + std::to_string(fault.at) + ", " + made.call->name + " '" + made.object +
-         "': " + end;
-}
+const Row kRows[] = {
+    {{"ErrorsOfTheProgram"}, {CallScope::kProgram, FaultKind::kErrors, 60}, false},
+    {{"ErrorsOfTheProgramInPhase2"}, {CallScope::kProgram, FaultKind::kErrors, 20}, true},
+    {{"ErrorsOfTools"}, {CallScope::kTools, FaultKind::kErrors, 40}, false},
+    {{"ErrorsOfToolsInPhase2"}, {CallScope::kTools, FaultKind::kErrors, 10}, true},
+    {{"KillsOfTheProgram"}, {CallScope::kProgram, FaultKind::kKills, 50}, false},
+    {{"KillsOfTheProgramInPhase2"}, {CallScope::kProgram, FaultKind::kKills, 15}, true},
+    {{"KillsOfTools"}, {CallScope::kTools, FaultKind::kKills, 25}, false},
+    {{"KillsOfToolsInPhase2"}, {CallScope::kTools, FaultKind::kKills, 10}, true},
+};
 
-bool SetsModes(const MadeCall& made) {
-  return std::strstr(made.call->name, "chmod") != nullptr;
-}
+/// How much of the result a fault may still determine.
+enum class Effect {
+  kNone,
+  kMode,    ///< a thumbnail whose mode could not be set is used as it is
+  kPicture  ///< a decoder makes what it can of a photo that it cannot read completely
+};
 
 }  // namespace
 
-class Faults : public HostileTest, public ::testing::WithParamInterface<Trials> {
+class Faults : public FaultTrials, public ::testing::WithParamInterface<Row> {
  protected:
   void SetUp() override {
     HostileTest::SetUp();
-    MakeJpeg(InPhotos("a.jpg"), RecipeOf(160, 120));
-    MakeRawPhoto(InPhotos("b.dng"), RawRecipeOf());
+    MakeJpeg(jpeg_, RecipeOf(160, 120));
+    MakeRawPhoto(raw_, RawRecipeOf());
     photos_ = PhotosBelow(kPhotos);
     Make();
     Make();
-    undisturbed_ = RecordTree(kPhotos, RecordDetail::kContent);
+    undisturbed_ = RecordTree(kPhotos, RecordDetail::kNone);
+    pictures_ = Pictures();
   }
 
-  /// All faults that the test may try.
-  std::vector<CallFault> AllFaults() {
-    std::vector<CallFault> faults;
-    for (size_t at = 0; at < calls_.size(); ++at) {
-      if (GetParam().kill) {
-        faults.push_back({at, 0, true});
-        continue;
-      }
-      for (const int error : calls_[at].call->errors) {
-        faults.push_back({at, error, false});
-      }
-    }
-    return faults;
-  }
+  std::string Path() const override { return VelathumbPath(); }
+  Strings Arguments() const override { return ArgumentsFor({kPhotos}); }
 
-  std::vector<CallFault> FaultsToTry() {
-    std::vector<CallFault> faults = AllFaults();
-    if (!IsLongRun()) {
-      std::mt19937 random(kSeed + static_cast<unsigned>(GTEST_FLAG_GET(random_seed)));
-      std::shuffle(faults.begin(), faults.end(), random);
-      faults.resize(std::min(faults.size(), GetParam().sample));
-    }
-    return faults;
-  }
-
-  /// Restores the state before the run that is to be disturbed.
-  void Begin() {
-    RemoveTree(InPhotos("@eaDir"));
-    for (const char* file : {kQueue, kPhotoProgress}) {
-      RemoveTree(file);
+  void Begin() override {
+    for (const std::string& path :
+         {InPhotos("@eaDir"), std::string(kQueue), std::string(kPhotoProgress)}) {
+      RemoveTree(path);
     }
     if (GetParam().firstPhasesDone) {
       Make();
     }
   }
 
-  void CountCalls() {
-    Begin();
-    CallFaults counter(GetParam().scope, std::nullopt);
-    ProgramOptions options;
-    options.beforeExec = {counter.Step()};
-    Make({kPhotos}, options);
-    ASSERT_TRUE(counter.WaitForEnd(20000));
-    calls_ = counter.Calls();
-  }
-
-  void RunWith(const CallFault& fault) {
-    CallFaults faults(GetParam().scope, fault);
-    ProgramOptions options;
-    options.beforeExec = {faults.Step()};
-    options.timeLimit = kSoon;
-    const ProgramResult result = RunProgram(VelathumbPath(), ArgumentsFor({kPhotos}), options);
-    EXPECT_FALSE(result.timedOut) << "still running after " << kSoon.count() << " s";
-    const bool isKilled =
-        fault.kill && faults.HasStruck() && GetParam().scope == CallScope::kProgram;
-    EXPECT_EQ(result.signal, isKilled ? SIGKILL : 0);
-    EXPECT_TRUE(faults.WaitForEnd(20000)) << "a tool is still running";
-    struck_ += faults.HasStruck() ? 1 : 0;
-  }
-
-  /// The thumbnails that exist must be complete in every respect.
-  void ExpectOnlyFinishedThumbs(bool withModes) {
-    EXPECT_TRUE(OnlyWholeThumbsBelow(kPhotos));
-    for (const auto& [path, state] : ThumbsBelow(kPhotos)) {
-      EXPECT_TRUE(!withModes || ModeOf(InPhotos(path)) == 0777) << path;
-    }
-  }
-
-  void ExpectSameTreeAfterNextRuns(bool withModes) {
+  void Check(const CallFault& fault) override {
+    const Effect effect = EffectOf(fault);
+    ExpectOnlyFinishedThumbs(effect);
+    EXPECT_TRUE(PhotosBelow(kPhotos) == photos_) << "the run touched a photo";
     Make();
     Make();
-    if (withModes) {
-      EXPECT_THAT(Differences(undisturbed_, RecordTree(kPhotos, RecordDetail::kContent)),
-                  IsEmpty());
+    for (const std::string& photo : {jpeg_, raw_}) {
+      EXPECT_TRUE(HasThumbs(photo, kinds_));
     }
-    EXPECT_TRUE(HasThumbs(InPhotos("a.jpg"), kinds_));
-    EXPECT_TRUE(HasThumbs(InPhotos("b.dng"), kinds_));
+    if (effect != Effect::kPicture) {
+      EXPECT_EQ(Pictures(), pictures_);
+    }
+    if (effect == Effect::kMode) {
+      EXPECT_EQ(ListTree(kPhotos), TreeOf(undisturbed_));
+    } else {
+      EXPECT_THAT(Differences(undisturbed_, RecordTree(kPhotos, RecordDetail::kNone)), IsEmpty());
+    }
     EXPECT_THAT(PidFiles(), IsEmpty());
   }
 
-  void Try(const CallFault& fault) {
-    const MadeCall& made = calls_.at(fault.at);
-    SCOPED_TRACE(DescriptionOf(made, fault));
-    Begin();
-    RunWith(fault);
-    // A thumbnail whose mode cannot be set is used as it is.
-    const bool withModes = fault.kill || !SetsModes(made);
-    ExpectOnlyFinishedThumbs(withModes);
-    EXPECT_TRUE(PhotosBelow(kPhotos) == photos_) << "the run touched a photo";
-    ExpectSameTreeAfterNextRuns(withModes);
+ private:
+  Effect EffectOf(const CallFault& fault) const {
+    const bool setsMode = std::strstr(fault.made.call->name, "chmod") != nullptr;
+    if (setsMode && !fault.kill) {
+      return Effect::kMode;
+    }
+    const bool isDecoder = GetParam().range.scope == CallScope::kTools && fault.made.object == raw_;
+    return isDecoder ? Effect::kPicture : Effect::kNone;
   }
 
-  std::vector<MadeCall> calls_;
+  /// The thumbnails that exist are complete in every respect.
+  void ExpectOnlyFinishedThumbs(Effect effect) const {
+    for (const std::string& photo : {jpeg_, raw_}) {
+      for (const Kind& kind : kinds_) {
+        const std::string thumb = ThumbOf(photo, kind);
+        std::string why;
+        EXPECT_TRUE(!Exists(thumb) || DecodeJpeg(thumb, &why)) << thumb << ": " << why;
+        EXPECT_TRUE(!Exists(thumb) || effect == Effect::kMode || ModeOf(thumb) == 0777)
+            << thumb << " has mode " << std::oct << ModeOf(thumb);
+      }
+    }
+  }
+
+  /// Size and picture of each thumbnail. The bytes may differ: a thumbnail that is made again alone
+  /// is scaled in other steps than one that is made together with others.
+  std::map<std::string, std::string> Pictures() const {
+    std::map<std::string, std::string> pictures;
+    for (const std::string& photo : {jpeg_, raw_}) {
+      for (const Kind& kind : kinds_) {
+        const std::string thumb = ThumbOf(photo, kind);
+        const auto image = DecodeJpeg(thumb);
+        pictures[thumb] = image ? std::to_string(image->Width()) + "x" +
+                                      std::to_string(image->Height()) + " " + QuadrantLetters(thumb)
+                                : "none";
+      }
+    }
+    return pictures;
+  }
+
+  /// The paths of a record as ListTree gives them.
+  static Strings TreeOf(const TreeRecord& record) {
+    Strings paths;
+    for (const auto& [path, description] : record) {
+      if (!path.empty()) {
+        paths.push_back(description.front() == '4' ? path + "/" : path);
+      }
+    }
+    std::sort(paths.begin(), paths.end());
+    return paths;
+  }
+
+  const std::string jpeg_ = InPhotos("a.jpg");
+  const std::string raw_ = InPhotos("b.dng");
   std::map<std::string, PhotoState> photos_;
   TreeRecord undisturbed_;
-  size_t struck_ = 0;
+  std::map<std::string, std::string> pictures_;
 };
 
 TEST_P(Faults, LeaveNothingBehind) {
-  CountCalls();
-  const std::vector<CallFault> faults = FaultsToTry();
-  size_t failed = 0;
-  constexpr size_t kEnough = 10;
-  for (const CallFault& fault : faults) {
-    const int before =
-        ::testing::UnitTest::GetInstance()->current_test_info()->result()->total_part_count();
-    Try(fault);
-    const int after =
-        ::testing::UnitTest::GetInstance()->current_test_info()->result()->total_part_count();
-    failed += after > before ? 1 : 0;
-    if (failed == kEnough && !IsLongRun()) {
-      break;
-    }
-  }
-  std::cout << calls_.size() << " calls, " << AllFaults().size() << " faults, " << faults.size()
-            << " tried, " << struck_ << " occurred, " << failed << " with consequences"
-            << std::endl;
-  EXPECT_GT(struck_, faults.size() / 2) << "most faults did not occur";
+  TryFaults(GetParam().range);
 }
 
-INSTANTIATE_TEST_SUITE_P(
-    All, Faults,
-    ::testing::Values(Trials{{"ErrorsOfTheProgram"}, CallScope::kProgram, false, false, 100},
-                      Trials{{"ErrorsOfTheProgramInPhase2"}, CallScope::kProgram, true, false, 30},
-                      Trials{{"ErrorsOfTools"}, CallScope::kTools, false, false, 60},
-                      Trials{{"ErrorsOfToolsInPhase2"}, CallScope::kTools, true, false, 20},
-                      Trials{{"KillsOfTheProgram"}, CallScope::kProgram, false, true, 60},
-                      Trials{{"KillsOfTheProgramInPhase2"}, CallScope::kProgram, true, true, 20},
-                      Trials{{"KillsOfTools"}, CallScope::kTools, false, true, 40}),
-    CaseName());
+INSTANTIATE_TEST_SUITE_P(All, Faults, ::testing::ValuesIn(kRows), CaseName());
 
 }  // namespace vela_test::hostile

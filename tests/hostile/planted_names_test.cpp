@@ -88,7 +88,20 @@ INSTANTIATE_TEST_SUITE_P(All, PlantedForRawPhoto, ::testing::ValuesIn(DecodedRaw
 
 namespace {
 
-using PlantedNames = HostileTest;
+class PlantedNames : public HostileTest {
+ protected:
+  static std::string PipeOf(const std::string& photo, const std::string& name) {
+    return MetadataDirOf(photo) + "/" + name;
+  }
+
+  static std::string MakeRawWithPipe(const std::string& name) {
+    RemoveTree(InPhotos("@eaDir"));
+    const std::string photo = MakeRaw(InPhotos("a.dng"), name);
+    MakeMetadataDir(photo);
+    ActAs(kAttacker, [&] { return Fifo(PipeOf(photo, name)); });
+    return photo;
+  }
+};
 
 std::vector<Planted> MarkersAndThumbs() {
   std::vector<Planted> rows;
@@ -99,23 +112,42 @@ std::vector<Planted> MarkersAndThumbs() {
     rows.push_back({"", name, LinkToSharedText});
     rows.push_back({"", name, Fifo});
     rows.push_back({"", name, Socket});
+    rows.push_back({"", name, Directory});
   }
   return rows;
 }
 
 }  // namespace
 
-/// A pipe that the attacker keeps open: opening it does not fail, and nothing ever leaves it.
+/// A pipe that the attacker keeps open for reading and writing: opening it does not fail, and what
+/// is written stays in it.
 TEST_F(PlantedNames, OpenPipesAreNotWaitedFor) {
   for (const std::string& name : {kDecoded, kPreview}) {
     SCOPED_TRACE(name);
-    RemoveTree(InPhotos("@eaDir"));
-    const std::string photo = MakeRaw(InPhotos("a.dng"), name);
-    MakeMetadataDir(photo);
-    const std::string pipe = MetadataDirOf(photo) + "/" + name;
-    ActAs(kAttacker, [&] { return Fifo(pipe); });
-    const Descriptor bothEnds(open(pipe.c_str(), O_RDWR | O_CLOEXEC));
+    const std::string photo = MakeRawWithPipe(name);
+    const Descriptor bothEnds(open(PipeOf(photo, name).c_str(), O_RDWR | O_CLOEXEC));
     ASSERT_TRUE(bothEnds.IsOpen());
+    RunInTime();
+    ExpectThumbsOrMarkers(photo);
+  }
+}
+
+/// A pipe that the attacker empties: writing succeeds, and opening it for reading waits for another
+/// writer.
+TEST_F(PlantedNames, EmptiedPipesAreNotWaitedFor) {
+  for (const std::string& name : {kDecoded, kPreview}) {
+    SCOPED_TRACE(name);
+    const std::string photo = MakeRawWithPipe(name);
+    const Descriptor end(open(PipeOf(photo, name).c_str(), O_RDONLY | O_NONBLOCK | O_CLOEXEC));
+    ASSERT_TRUE(end.IsOpen());
+    const UserProcess reader(kAttacker, [&end] {
+      char bytes[65536];
+      for (;;) {
+        if (read(end.Get(), bytes, sizeof bytes) <= 0) {
+          usleep(100);
+        }
+      }
+    });
     RunInTime();
     ExpectThumbsOrMarkers(photo);
   }

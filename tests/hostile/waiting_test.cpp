@@ -2,6 +2,7 @@
 #include <fcntl.h>
 #include <signal.h>
 #include <sys/file.h>
+#include <sys/resource.h>
 #include <sys/socket.h>
 #include <sys/stat.h>
 #include <sys/un.h>
@@ -106,6 +107,30 @@ TEST_F(Waiting, AStrangersSocketIsNotAsked) {
   RunInTime();
   EXPECT_FALSE(Exists("/tmp/asked")) << "the stranger was sent a request";
   EXPECT_TRUE(HasThumbs(photo, FirstKinds(kinds_)));
+}
+
+// The peer is the user's own, so it is asked, but what it says is limited.
+TEST_F(Waiting, AnImmenseReplyIsNotKept) {
+  constexpr uint64_t kMemory = 512U << 20U;
+  constexpr size_t kReply = 16U << 20U;
+  const std::string photo = MakeJpeg(InPhotos("a.jpg"));
+  DaemonPeer daemon;
+  for (const char* reply : {"[", "[1,"}) {
+    SCOPED_TRACE(reply);
+    RemoveTree(InPhotos("@eaDir"));
+    std::string bytes;
+    while (bytes.size() < kReply) {
+      bytes += reply;
+    }
+    daemon.Answer("GET_INDEX_VERSION", DaemonReply::BytesThenSilence(bytes));
+    ProgramOptions options;
+    options.timeLimit = kSoon;
+    options.beforeExec = {LimitResource(RLIMIT_AS, kMemory)};
+    const ProgramResult result = RunProgram(VelathumbPath(), ArgumentsFor({kPhotos}), options);
+    EXPECT_FALSE(result.timedOut);
+    EXPECT_EQ(result.exitCode, 0) << result.err;
+    EXPECT_TRUE(HasThumbs(photo, FirstKinds(kinds_)));
+  }
 }
 
 // A lease makes whoever opens the file wait until its holder gives it up, for tens of seconds.

@@ -19,7 +19,9 @@
 #include <cerrno>
 #include <cstdint>
 #include <cstring>
+#include <map>
 #include <thread>
+#include <utility>
 
 #include "support/descriptor.h"
 #include "support/environment_failure.h"
@@ -153,6 +155,31 @@ bool BelongsToTheSystem(const std::string& object) {
   return false;
 }
 
+/// Replaces the letters of temporary names, and the numbers of processes and pipes.
+std::string WithoutRandomParts(std::string object) {
+  constexpr size_t kRandomLetters = 6;
+  const std::string temporary = "VELAPHOTO.tmp.";
+  const size_t begin = object.find(temporary);
+  if (begin != std::string::npos) {
+    object.replace(begin + temporary.size(), kRandomLetters, "*");
+  }
+  const size_t name = object.rfind('/') + 1;
+  std::string result = object.substr(0, name);
+  bool inNumber = false;
+  for (const char letter : object.substr(name)) {
+    const bool isDigit = letter >= '0' && letter <= '9';
+    if (!isDigit || !inNumber) {
+      result += isDigit ? '#' : letter;
+    }
+    inNumber = isDigit;
+  }
+  return result;
+}
+
+bool IsSame(const MadeCall& a, const MadeCall& b) {
+  return a.call == b.call && a.object == b.object && a.occurrence == b.occurrence;
+}
+
 const WatchedCall* FindCall(int number) {
   for (const WatchedCall& call : WatchedCalls()) {
     if (call.number == number) {
@@ -240,8 +267,11 @@ class CallFaults::Supervisor {
     response.id = notification.id;
     response.flags = SECCOMP_USER_NOTIF_FLAG_CONTINUE;
     Decide(notification, &response);
-    // Fails when the process has been killed meanwhile.
-    ioctl(listener.Get(), SECCOMP_IOCTL_NOTIF_SEND, &response);
+    if (!killed_) {
+      // Fails when the process has ended meanwhile.
+      ioctl(listener.Get(), SECCOMP_IOCTL_NOTIF_SEND, &response);
+    }
+    killed_ = false;
   }
 
   void Decide(const seccomp_notif& notification, seccomp_notif_resp* response) {
@@ -253,13 +283,13 @@ class CallFaults::Supervisor {
     if (call == nullptr || isProgram != (scope_ == CallScope::kProgram)) {
       return;
     }
-    const std::string object = ObjectOf(*call, task, notification.data);
+    const std::string object = WithoutRandomParts(ObjectOf(*call, task, notification.data));
     if (BelongsToTheSystem(object)) {
       return;
     }
-    const size_t number = calls_.size();
-    calls_.push_back({call, object});
-    if (fault_ && fault_->at == number) {
+    const MadeCall made = {call, object, occurrences_[{call, object}]++};
+    calls_.push_back(made);
+    if (fault_ && IsSame(made, fault_->made)) {
       Strike(*call, task, notification.data, response);
     }
   }
@@ -279,8 +309,13 @@ class CallFaults::Supervisor {
   void Strike(const WatchedCall& call, pid_t task, const seccomp_data& data,
               seccomp_notif_resp* response) {
     struck_ = true;
+    if (fault_->action) {
+      fault_->action();
+      return;
+    }
     if (fault_->kill) {
-      kill(ProcessOf(task), SIGKILL);
+      // Without an answer the call is never made.
+      killed_ = kill(ProcessOf(task), SIGKILL) == 0;
       return;
     }
     if (fault_->error == kShortTransfer) {
@@ -340,7 +375,9 @@ class CallFaults::Supervisor {
   CallScope scope_;
   std::optional<CallFault> fault_;
   pid_t program_ = 0;
+  bool killed_ = false;  // the process of the call in hand
   std::vector<MadeCall> calls_;
+  std::map<std::pair<const WatchedCall*, std::string>, size_t> occurrences_;
   std::atomic<bool> struck_{false};
   std::atomic<bool> ended_{false};
   std::thread thread_;

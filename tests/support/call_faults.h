@@ -4,6 +4,7 @@
 
 #include <sys/types.h>
 
+#include <functional>
 #include <memory>
 #include <optional>
 #include <string>
@@ -20,17 +21,20 @@ enum class CallScope {
   kTools     ///< those of all processes that it has started, before and after they become tools
 };
 
-/// A call that a program has made.
+/// A call that a program has made. Numbers and random letters in names are replaced, so that the
+/// same call of another run is equal.
 struct MadeCall {
-  const WatchedCall* call;
-  std::string object;  ///< the path, or what its descriptor refers to
+  const WatchedCall* call = nullptr;
+  std::string object;     ///< the path, or what its descriptor refers to
+  size_t occurrence = 0;  ///< how many such calls there were before
 };
 
-/// What happens to the call with the number `at`, counted from 0 within the scope.
+/// What happens at a call.
 struct CallFault {
-  size_t at = 0;
-  int error = 0;      ///< errno or kShortTransfer
-  bool kill = false;  ///< instead, the process that makes the call is killed
+  MadeCall made;
+  int error = 0;                 ///< errno or kShortTransfer
+  bool kill = false;             ///< instead, the process that makes the call is killed
+  std::function<void()> action;  ///< instead, this is done before the call is made
 };
 
 /// Watches one run of a program. Calls for what belongs to the system (libraries, programs, /proc)

@@ -59,15 +59,6 @@ int GiveUpCapabilities() {
   return sets.Write() ? 0 : errno;
 }
 
-bool HasOtherUsers() {
-  std::ifstream map("/proc/self/uid_map");
-  unsigned long inside = 0;
-  unsigned long outside = 0;
-  unsigned long count = 0;
-  map >> inside >> outside >> count;
-  return count > 65535;
-}
-
 WithoutCapabilities::WithoutCapabilities() : effective_(0) {
   bool ok = false;
   effective_ = EffectiveCapabilities(&ok);

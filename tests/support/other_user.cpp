@@ -56,25 +56,7 @@ int Await(pid_t child) {
   return status;
 }
 
-bool MapsManyUsers() {
-  std::FILE* const map = std::fopen("/proc/self/uid_map", "re");
-  if (map == nullptr) {
-    EnvironmentFailureWithErrno("cannot read the users of the sandbox");
-  }
-  long long inside = 0;
-  long long outside = 0;
-  long long count = 0;
-  const bool isRead = std::fscanf(map, "%lld %lld %lld", &inside, &outside, &count) == 3;
-  std::fclose(map);
-  return isRead && inside == 0 && count > kOwner;
-}
-
 }  // namespace
-
-bool HasOtherUsers() {
-  static const bool hasOthers = MapsManyUsers();
-  return hasOthers;
-}
 
 void ActAs(uid_t user, const std::function<bool()>& action) {
   const pid_t child = StartAs(user, [&action] {

@@ -5,15 +5,13 @@
 
 #include <functional>
 
+#include "support/users.h"
+
 namespace vela_test {
 
 /// A user who owns a photo directory, and one who wants to do harm.
 constexpr uid_t kOwner = 12346;
 constexpr uid_t kAttacker = 12345;
-
-/// Whether the sandbox has users besides user 0. It has none when an ordinary user runs the tests:
-/// then everyone is user 0, and only what does not depend on the owner of a file can be checked.
-bool HasOtherUsers();
 
 /// Runs `action` in a child process with the user's identity (no groups, no capabilities, umask 0)
 /// and waits for it. An action that returns false or does not return in a minute ends the test

@@ -4,6 +4,8 @@
 
 #include <cstdint>
 
+#include "support/users.h"
+
 namespace vela_test {
 
 /// As long as the object exists the calling thread has no capabilities, so that permission bits
@@ -19,8 +21,5 @@ class WithoutCapabilities {
  private:
   uint64_t effective_;
 };
-
-/// Whether the sandbox has other users and groups than user 0, as it does when root made it.
-bool HasOtherUsers();
 
 }  // namespace vela_test

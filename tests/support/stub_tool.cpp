@@ -113,6 +113,8 @@ StubCall CallFrom(Record record) {
   call.blockedSignals = Numbers(record["blocked"]);
   call.ignoredSignals = Numbers(record["ignored"]);
   call.umask = static_cast<mode_t>(Number(record["umask"]));
+  call.user = static_cast<uid_t>(Number(record["user"]));
+  call.group = static_cast<gid_t>(Number(record["group"]));
   call.pid = static_cast<pid_t>(Number(record["pid"]));
   call.parentPid = static_cast<pid_t>(Number(record["parent"]));
   call.startSequence = Unsigned(record["sequence"]);
@@ -143,6 +145,7 @@ StubTool::StubTool(const std::string& path) : tool_(BaseName(path)) {
   RemoveTree(directory);
   MakeDirectories(directory);
   WriteFile(directory + "/calls", "");
+  chmod((directory + "/calls").c_str(), 0666);  // the stub may run as another user
   Plan(StubPlan::Normal());
   InstallLink(StubToolPath(), path);
   SetUnconfined(path, true);
@@ -201,7 +204,13 @@ std::string RealConverterPath() {
   return IsOwnConverterReal() ? OwnConverterPath() : kImageMagickPath;
 }
 
+void InstallImageMagickPolicy() {
+  MakeDirectories("/usr/vela/share");
+  InstallLink(SourceDirectory() + "/config/imagemagick", "/usr/vela/share/imagemagick");
+}
+
 void InstallRealConverter() {
+  InstallImageMagickPolicy();
   MakeDirectories("/usr/vela/lib");
   InstallLink(kImageMagickPath, "/usr/vela/lib/convert-thumb");
   InstallLink(IsOwnConverterReal() ? OwnConverterPath()

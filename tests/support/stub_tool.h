@@ -35,6 +35,8 @@ struct StubCall {
   std::vector<int> blockedSignals;
   std::vector<int> ignoredSignals;
   mode_t umask = 0;
+  uid_t user = 0;
+  gid_t group = 0;
   pid_t pid = 0;
   pid_t parentPid = 0;
   uint64_t startSequence = 0;    ///< place among all events, see NextSequence
@@ -83,7 +85,10 @@ bool IsOwnConverterReal();
 /// The real converter's program.
 std::string RealConverterPath();
 
-/// Install the real tools where the program looks for them.
+/// Installs the policy of ImageMagick where the converter looks for it.
+void InstallImageMagickPolicy();
+
+/// Install the real tools where the program looks for them; the converter with the policy.
 void InstallRealConverter();
 void InstallRealExiftool();
 /// Installs both; dcraw and compare exist in a fresh sandbox.

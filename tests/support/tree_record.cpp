@@ -43,10 +43,11 @@ std::string Describe(const std::string& path, RecordDetail detail) {
   if (lstat(path.c_str(), &status) != 0) {
     EnvironmentFailureWithErrno("cannot examine " + path);
   }
-  std::string text = Octal(status.st_mode) + ContentOf(path, status);
+  std::string text = Octal(status.st_mode);
   if (detail == RecordDetail::kAll) {
-    text += " of " + std::to_string(status.st_uid) + ":" + std::to_string(status.st_gid) + " at " +
-            std::to_string(status.st_mtim.tv_sec) + "." + std::to_string(status.st_mtim.tv_nsec);
+    text += ContentOf(path, status) + " of " + std::to_string(status.st_uid) + ":" +
+            std::to_string(status.st_gid) + " at " + std::to_string(status.st_mtim.tv_sec) + "." +
+            std::to_string(status.st_mtim.tv_nsec);
   }
   return text;
 }

@@ -7,10 +7,10 @@
 
 namespace vela_test {
 
-/// What a comparison of two records covers besides names, kinds and permission bits.
+/// What a record contains besides names, kinds and permission bits.
 enum class RecordDetail {
-  kContent,  ///< the content of files and links
-  kAll       ///< that, the owners and the modification times, of directories too
+  kNone,
+  kAll  ///< content, owners and modification times, of directories too
 };
 
 /// Relative path ("" for the directory itself) to description.

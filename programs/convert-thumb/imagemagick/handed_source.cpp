@@ -63,7 +63,7 @@ bool HandSource(const CommandLine& line, HandedLine& handed) {
     return true;
   }
   const std::string& file = line.sourceFile;
-  FileDescriptor source = OpenTrusted(file);
+  FileDescriptor source = OpenSource(file);
   if (!source.IsOpen()) {
     const int error = errno;
     if (error == ENOENT && CanStayMissing(file)) {

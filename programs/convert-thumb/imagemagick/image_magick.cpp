@@ -10,6 +10,7 @@
 #include "imagemagick/handed_outputs.h"
 #include "imagemagick/handed_source.h"
 #include "imagemagick/image_magick_limits.h"
+#include "imagemagick/image_magick_policy.h"
 #include "process/child_program.h"
 #include "process/failure_report.h"
 #include "process/source_file.h"
@@ -67,7 +68,7 @@ bool Finish(const HandedLine& handed, bool succeeded) {
 
 void HandOver(const CommandLine& line, size_t memoryLimit) {
   HandedLine handed;
-  if (!Hand(line, handed)) {
+  if (!UsePolicy() || !Hand(line, handed)) {
     return;
   }
   LimitImageMagick(memoryLimit);

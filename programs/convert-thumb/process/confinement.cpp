@@ -5,11 +5,12 @@
 
 namespace vela {
 
-void Confine(const WritablePaths& paths) {
-  RefuseNewPrivileges();
-  DisableCoreDumps();
-  RestrictWritingTo(paths);
-  BlockUnneededSystemCalls();
+int Confine(const AllowedFiles& files) {
+  Confinement confinement;
+  confinement.files = files;
+  PreparedConfinement prepared;
+  const int error = prepared.Prepare(confinement);
+  return error != 0 ? error : prepared.Enter();
 }
 
 void ConfineToThisProgram() {

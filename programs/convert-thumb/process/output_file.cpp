@@ -13,6 +13,7 @@
 
 #include "posix/file_content.h"
 #include "posix/file_descriptor.h"
+#include "posix/folder.h"
 #include "process/source_file.h"
 #include "process/unfinished_outputs.h"
 
@@ -76,10 +77,6 @@ Replacement FillAndMove(const FileDescriptor& file, const std::string& scratch,
                                                                             : Replacement::kFailed;
 }
 
-bool IsOwnFile(const struct stat& status) {
-  return S_ISREG(status.st_mode) && status.st_nlink == 1 && status.st_uid == geteuid();
-}
-
 /// Makes room for a new file. Returns false, with errno set, when something is there that must not
 /// be replaced.
 bool RemoveFormer(const Place& place) {
@@ -129,6 +126,11 @@ OpenOutput OpenForWriting(const std::string& path) {
     return {};
   }
   return {CreateOutput(place->directory, place->name, 0666), false};
+}
+
+bool IsDevice(const std::string& path) {
+  struct stat status;
+  return stat(path.c_str(), &status) == 0 && S_ISCHR(status.st_mode);
 }
 
 bool WriteOutputFile(const std::string& path, const unsigned char* bytes, size_t size) {

@@ -24,6 +24,9 @@ struct OpenOutput {
 /// names. May be called by any thread.
 OpenOutput OpenForWriting(const std::string& path);
 
+/// Returns true when a character device or a symbolic link to one is at `path`.
+bool IsDevice(const std::string& path);
+
 /// Writes the whole file, as opened by OpenForWriting. Returns false when it is refused or some
 /// bytes may not have been written; the incomplete file is removed. May be called by any thread.
 bool WriteOutputFile(const std::string& path, const unsigned char* bytes, size_t size);

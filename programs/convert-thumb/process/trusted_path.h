@@ -14,18 +14,21 @@ struct Place {
   std::string name;          ///< the last component of a path
 };
 
-/// Finds the place of a file that may not exist yet. A symbolic link among the directories is
-/// followed only if it belongs to root, the effective user or the owner of the directory that it
-/// leads to. Empty, with errno set, when there is no such directory or `path` does not end with a
-/// file name; ELOOP for any other link.
+/// Finds the place of a file that may not exist yet. Symbolic links among the directories are
+/// followed if they are trusted (see posix/folder.h). Empty, with errno set, when there is no such
+/// directory or `path` does not end with a file name.
 std::optional<Place> FindPlace(const std::string& path);
 
-/// Opens the file at `path` for reading without waiting for the writer of a pipe. Symbolic links
-/// are followed under the same condition. No open descriptor, with errno set, on failure.
-FileDescriptor OpenTrusted(const std::string& path);
+/// Opens the file at `path` for reading without waiting for the writer of a pipe. Trusted symbolic
+/// links are followed. No open descriptor, with errno set, on failure.
+FileDescriptor OpenSource(const std::string& path);
 
 /// Returns true when nobody but root and the effective user can create or replace names in this
 /// directory or exchange a directory above it.
 bool IsPrivate(const FileDescriptor& directory);
+
+/// Returns true when nobody but root and the effective user can replace files of theirs in this
+/// directory, although others may perhaps create files there, as in /tmp.
+bool ProtectsOwnFiles(const FileDescriptor& directory);
 
 }  // namespace vela

@@ -24,7 +24,7 @@
 #include <system_error>
 #include <thread>
 
-#include "command_line/writable_paths.h"
+#include "command_line/allowed_files.h"
 #include "converter_fixture.h"
 #include "process/confinement.h"
 #include "support/seccomp_fail.h"
@@ -36,6 +36,8 @@ namespace {
 
 constexpr char kInside[] = "/tmp/inside";
 constexpr char kOutside[] = "/tmp/outside";
+constexpr char kInput[] = "/tmp/outside/input";
+constexpr char kData[] = "/tmp/data";
 
 /// The errno of a failed call, 0 on success.
 int ErrorOf(long result) {
@@ -54,10 +56,21 @@ int InChild(const std::function<int()>& attempt) {
   return WEXITSTATUS(status);
 }
 
+AllowedFiles FilesInside() {
+  AllowedFiles files;
+  // "true", its loader and its libraries.
+  files.programs = {"/bin/true", "/lib", "/lib64", "/usr/lib"};
+  files.data = {"/etc/ld.so.cache", kData};
+  files.devices = {"/dev/null"};
+  files.inputs = {kInput};
+  files.outputs = {kInside};
+  return files;
+}
+
 /// The same after the process has been confined to kInside.
 int Confined(const std::function<int()>& attempt) {
   return InChild([&attempt] {
-    Confine({{kInside}, {"/dev/null", std::string(kInside) + "/link"}});
+    Confine(FilesInside());
     return attempt();
   });
 }
@@ -77,10 +90,11 @@ class Confinement : public ConverterTest {
  protected:
   void SetUp() override {
     ConverterTest::SetUp();
-    for (const std::string directory : {kInside, kOutside}) {
+    for (const std::string directory : {kInside, kOutside, kData}) {
       MakeDirectories(directory);
       WriteFile(directory + "/file", "content");
     }
+    WriteFile(kInput, "content");
   }
 };
 
@@ -104,7 +118,7 @@ TEST_F(Confinement, ChangesNoFilesElsewhere) {
   EXPECT_EQ(Confined([] { return ErrorOf(unlink("/tmp/outside/file")); }), error);
   if (error != 0) {
     EXPECT_EQ(ReadFile("/tmp/outside/file"), "content");
-    EXPECT_EQ(ListDirectory(kOutside), std::vector<std::string>{"file"});
+    EXPECT_EQ(ListDirectory(kOutside), (std::vector<std::string>{"file", "input"}));
   }
 }
 
@@ -125,18 +139,70 @@ TEST_F(Confinement, CreatesOnlyFiles) {
   EXPECT_EQ(Confined([] { return ErrorOf(link("/tmp/inside/file", "/tmp/inside/d")); }), EPERM);
 }
 
-TEST_F(Confinement, ReadsEverywhere) {
-  EXPECT_EQ(Confined([] { return ErrorOfOpening("/tmp/outside/file", O_RDONLY); }), 0);
-  EXPECT_EQ(Confined([] { return ErrorOfOpening("/etc", O_RDONLY | O_DIRECTORY); }), 0);
+TEST_F(Confinement, ReadsItsInputAndItsLibraries) {
+  EXPECT_EQ(Confined([] { return ErrorOfOpening(kInput, O_RDONLY); }), 0);
+  EXPECT_EQ(Confined([] { return ErrorOfOpening("/tmp/data/file", O_RDONLY); }), 0);
+  EXPECT_EQ(Confined([] { return ErrorOfOpening("/usr/lib", O_RDONLY | O_DIRECTORY); }), 0);
+  EXPECT_EQ(Confined([] { return ErrorOfOpening("/tmp/inside/file", O_RDONLY); }), 0);
+}
+
+TEST_F(Confinement, ReadsNothingElse) {
+  const int error = ErrorOutside();
+  for (const char* path : {"/tmp/outside/file", "/etc/passwd", "/proc/1/environ", "/dev/zero"}) {
+    EXPECT_EQ(InChild([path] { return ErrorOfOpening(path, O_RDONLY); }), 0) << path;
+    EXPECT_EQ(Confined([path] { return ErrorOfOpening(path, O_RDONLY); }), error) << path;
+  }
+  for (const char* path : {"/tmp/outside", "/etc", "/"}) {
+    EXPECT_EQ(Confined([path] { return ErrorOfOpening(path, O_RDONLY | O_DIRECTORY); }), error)
+        << path;
+  }
+  EXPECT_EQ(Confined([] { return ErrorOfOpening(kInput, O_RDWR); }), error);
+  EXPECT_EQ(Confined([] { return ErrorOfOpening("/tmp/data/file", O_WRONLY); }), error);
+}
+
+TEST_F(Confinement, RunsOnlyImageMagick) {
+  if (ErrorOutside() == 0) {
+    return;
+  }
+  CopyFile("/bin/true", "/tmp/inside/program");
+  ASSERT_EQ(chmod("/tmp/inside/program", 0755), 0);
+  EXPECT_EQ(Confined([] { return ErrorOf(execl("/tmp/inside/program", "a", nullptr)); }), EACCES);
+  EXPECT_EQ(Confined([] { return ErrorOf(execl("/bin/true", "true", nullptr)); }), 0);
+}
+
+TEST_F(Confinement, KeepsItsOwnPhotoReadable) {
+  // Neither in the directory of an output nor below one of the system.
+  CopyFile(MakePhoto("a.jpg", 300, 200), "/tmp/outside/a.jpg");
+  CopyFile(MakePicture("a.bmp", 300, 200), "/tmp/outside/a.bmp");
+  for (const char* photo : {"/tmp/outside/a.jpg", "/tmp/outside/a.bmp"}) {
+    const CommandLine line{photo, directory_, {{{}, directory_ + "/o.jpg"}}};
+    ExpectSuccess(RunConverter(line.Arguments()));
+  }
+}
+
+TEST_F(Confinement, LetsOneCommandLineReadNoSecondPhoto) {
+  if (ErrorOutside() == 0) {
+    return;
+  }
+  CopyFile(MakePicture("a.bmp", 30, 20), "/tmp/outside/a.bmp");
+  CopyFile("/tmp/outside/a.bmp", "/tmp/outside/b.bmp");
+  const std::string output = directory_ + "/o.png";
+  ProgramOptions options;
+  options.addedEnvironment = {"TMPDIR=" + directory_};
+  ExpectSuccess(RunConverter({"/tmp/outside/a.bmp", "-negate", output}, options));
+  RemoveTree(output);
+  RunConverter({"/tmp/outside/a.bmp", "/tmp/outside/b.bmp", "-append", output}, options);
+  // Its height would be twice that of the first.
+  EXPECT_TRUE(!Exists(output) || Identify(output).height == 20);
 }
 
 TEST_F(Confinement, RefusesTheFileBehindAnOutputThatIsALink) {
   const std::string photo = MakePhoto("a.jpg", 300, 200);
   ASSERT_EQ(symlink("/tmp/outside/file", "/tmp/inside/link.jpg"), 0);
   const CommandLine line{photo, directory_, {{{}, "/tmp/inside/link.jpg"}}};
-  const WritablePaths paths = FindWritablePaths(ParseCommandLine(line.Arguments()));
-  EXPECT_EQ(InChild([&paths] {
-              Confine(paths);
+  const AllowedFiles files = FindAllowedFiles(ParseCommandLine(line.Arguments()));
+  EXPECT_EQ(InChild([&files] {
+              Confine(files);
               return ErrorOfOpening("/tmp/inside/link.jpg", O_WRONLY | O_TRUNC);
             }),
             ErrorOutside());
@@ -307,7 +373,7 @@ TEST_F(Confinement, AppliesInTheLastStageWhenOtherThreadsCannotBeReached) {
 
 TEST_F(Confinement, WorksInsideAnother) {
   EXPECT_EQ(Confined([] {
-              Confine({{kInside}, {}});
+              Confine(FilesInside());
               return ErrorOfOpening("/tmp/inside/new", O_WRONLY | O_CREAT);
             }),
             0);

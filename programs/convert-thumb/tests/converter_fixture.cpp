@@ -9,6 +9,8 @@
 #include <cstdio>
 #include <cstdlib>
 
+#include "support/stub_tool.h"
+
 namespace vela_test {
 namespace {
 
@@ -87,6 +89,7 @@ WithoutImageMagick::~WithoutImageMagick() {
 
 void ConverterTest::SetUp() {
   SandboxTest::SetUp();
+  InstallImageMagickPolicy();
   MakeDirectories(directory_);
   ASSERT_EQ(chmod(directory_.c_str(), 0755), 0);
 }

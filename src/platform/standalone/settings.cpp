@@ -11,6 +11,7 @@
 #include "platform/system_rules.h"
 #include "posix/file_content.h"
 #include "posix/file_version.h"
+#include "posix/identity.h"
 
 namespace vela {
 
@@ -78,6 +79,7 @@ Settings SettingsCache::Get() {
   // The version is read before the text, so that a change in between is noticed next time.
   const bool isAtRest = now.IsAtRest();
   std::string text;
+  const OwnIdentity own;
   if (ReadFile(kSettingsFile, text) != 0) {
     return Settings();
   }

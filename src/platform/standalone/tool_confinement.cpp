@@ -26,9 +26,15 @@ constexpr const char* kLibraries[] = {"/lib", "/lib64", "/usr/lib", "/usr/lib64"
 constexpr const char* kData[] = {"/etc/ld.so.cache", "/etc/localtime", "/dev/urandom",
                                  "/sys/devices/system/cpu"};
 
+/// ImageMagick reads the policy here, which limits it to photos, before that of the system, and the
+/// one in the directory below after it.
+constexpr char kImageMagickPolicies[] = "/usr/vela/share/imagemagick";
+constexpr const char* kPolicyEnvironment[] = {"MAGICK_CONFIGURE_PATH=/usr/vela/share/imagemagick",
+                                              "XDG_CONFIG_HOME=/usr/vela/share/imagemagick/last"};
+
 /// The configuration of ImageMagick and what it consists of.
 constexpr const char* kImageMagickData[] = {"/etc/ImageMagick-6", "/usr/share/ImageMagick-6",
-                                            "/usr/share/color"};
+                                            "/usr/share/color", kImageMagickPolicies};
 
 /// What the converter runs when it does not support a photo, and the shell for a converter that is
 /// a script.
@@ -128,6 +134,7 @@ void AllowExiftool(const Arguments& arguments, Confinement& confinement) {
 /// The two images are followed by the name of the output, which is no file.
 void AllowCompare(const Arguments& arguments, Confinement& confinement) {
   Append(confinement.files->data, kImageMagickData);
+  Append(confinement.environment, kPolicyEnvironment);
   constexpr size_t kLast = 3;
   if (arguments.size() > kLast) {
     const auto output = arguments.end() - 1;

@@ -24,19 +24,16 @@ std::string Now() {
   return std::to_string(now.tv_sec * 1000000000LL + now.tv_nsec);
 }
 
+/// Without listing a directory, which a confined program may not do.
 std::string OpenDescriptors() {
+  constexpr int kMost = 1024;
   Fields fields;
-  const DirectoryStream directory(opendir("/proc/self/fd"));
-  if (directory == nullptr) {
-    return "";
-  }
-  while (const dirent* entry = readdir(directory.get())) {
-    const std::string number = entry->d_name;
+  for (int number = 0; number < kMost; ++number) {
     char target[PATH_MAX];
-    const ssize_t length =
-        readlinkat(dirfd(directory.get()), number.c_str(), target, sizeof target);
-    if (length >= 0 && number != std::to_string(dirfd(directory.get()))) {
-      fields.push_back(number);
+    const std::string link = "/proc/self/fd/" + std::to_string(number);
+    const ssize_t length = readlink(link.c_str(), target, sizeof target);
+    if (length >= 0) {
+      fields.push_back(std::to_string(number));
       fields.emplace_back(target, static_cast<size_t>(length));
     }
   }
@@ -94,6 +91,8 @@ std::vector<std::string> Surroundings() {
           "blocked",     BlockedSignals(),
           "ignored",     IgnoredSignals(),
           "umask",       Mask(),
+          "user",        std::to_string(getuid()),
+          "group",       std::to_string(getgid()),
           "pid",         std::to_string(getpid()),
           "parent",      std::to_string(getppid()),
           "time",        Now()};
