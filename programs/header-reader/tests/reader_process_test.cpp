@@ -20,8 +20,10 @@
 
 #include "header/header_reader.h"
 #include "posix/folder.h"
+#include "posix/identity.h"
 #include "support/files.h"
 #include "support/images.h"
+#include "support/other_user.h"
 #include "support/sandbox.h"
 #include "support/stub_tool.h"
 #include "support/system_log.h"
@@ -256,6 +258,19 @@ TEST_F(HeaderReader, AnswersThreadsThatComeAndGo) {
 TEST_F(HeaderReader, ReadsFilesLargerThanItsMemory) {
   ASSERT_EQ(truncate("/tmp/a.jpg", off_t{1} << 32), 0);
   EXPECT_EQ(Size(), "64x48");
+}
+
+TEST_F(HeaderReader, DoesNotBelongToTheUserThatTheParentWorksFor) {
+  if (!HasOtherUsers()) return;  // an ordinary user's sandbox
+  {
+    const AssumedIdentity identity({kOwner, kOwner, {}});
+    ASSERT_EQ(identity.Error(), 0);
+    EXPECT_EQ(Size(), "64x48");
+  }
+  ASSERT_EQ(Readers().size(), 1U);
+  const std::string process = "/proc/" + std::to_string(*Readers().begin());
+  EXPECT_THAT(ReadFile(process + "/status"),
+              testing::HasSubstr("\nUid:\t65534\t65534\t65534\t65534\n"));
 }
 
 TEST_F(HeaderReader, FollowsLinksOfTrustedOwnersOnly) {
