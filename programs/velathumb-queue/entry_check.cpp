@@ -3,6 +3,7 @@
 #include <cstdint>
 #include <cstring>
 #include <filesystem>
+#include <functional>
 #include <system_error>
 
 #include "platform/system_rules.h"
@@ -27,8 +28,19 @@ std::string FindTreeFault(const std::string& path) {
 }
 
 bool IsDirectoryLocked(const std::string& directory) {
-  // With the slash at the end anything but a directory fails to open.
-  return IsLocked(directory + "/" + kMetadataDirName + "/");
+  return IsLocked(directory + "/" + kMetadataDirName);
+}
+
+void ForEachDirectory(const EntryTarget& target, const std::function<void(const char*)>& visit) {
+  if (!target.isTree) {
+    visit(target.directory.c_str());
+    return;
+  }
+  ForEachIndexedDirectory(target.directory.c_str(), [&](const char* path, bool isReadable) {
+    if (isReadable) {
+      visit(path);
+    }
+  });
 }
 
 }  // namespace
@@ -63,15 +75,20 @@ std::string FindObstacle(const std::string& entry) {
   return VLIBGetFsAvailSize(directory.c_str()) < kLeastFreeSpace ? "its volume is nearly full" : "";
 }
 
-bool IsLockedElsewhere(const EntryTarget& target) {
-  if (!target.isTree) {
-    return IsDirectoryLocked(target.directory);
-  }
-  bool isLocked = false;
-  ForEachIndexedDirectory(target.directory.c_str(), [&](const char* path, bool isReadable) {
-    isLocked = isLocked || (isReadable && IsDirectoryLocked(path));
+std::vector<std::string> ListDirectories(const EntryTarget& target) {
+  std::vector<std::string> directories;
+  ForEachDirectory(target, [&](const char* path) { directories.emplace_back(path); });
+  return directories;
+}
+
+std::vector<std::string> FindLockedDirectories(const EntryTarget& target) {
+  std::vector<std::string> locked;
+  ForEachDirectory(target, [&](const char* path) {
+    if (IsDirectoryLocked(path)) {
+      locked.emplace_back(path);
+    }
   });
-  return isLocked;
+  return locked;
 }
 
 bool IsProfileUsable(const std::string& profileFile) {

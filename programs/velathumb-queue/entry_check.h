@@ -3,6 +3,7 @@
 #pragma once
 
 #include <string>
+#include <vector>
 
 #include "entry_plan.h"
 
@@ -16,9 +17,12 @@ std::string CheckAddition(std::string& entry);
 /// its volume have enough free space.
 std::string FindObstacle(const std::string& entry);
 
-/// Returns whether another process holds the lock on a directory of the entry: velathumb would skip
-/// it.
-bool IsLockedElsewhere(const EntryTarget& target);
+/// Returns the directories of the entry that velathumb would skip, because another process holds a
+/// lock on their metadata directory.
+std::vector<std::string> FindLockedDirectories(const EntryTarget& target);
+
+/// Returns the directories of the entry that velathumb would process.
+std::vector<std::string> ListDirectories(const EntryTarget& target);
 
 /// Returns whether velathumb can read the profile file and it defines a thumbnail; logs when not.
 /// Without a usable profile velathumb skips every directory, and each entry would count as done.

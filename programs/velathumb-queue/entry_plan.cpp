@@ -1,8 +1,10 @@
 #include "entry_plan.h"
 
 #include <algorithm>
+#include <cstddef>
 #include <cstring>
 #include <filesystem>
+#include <functional>
 #include <system_error>
 #include <utility>
 
@@ -12,9 +14,6 @@
 namespace vela {
 
 namespace {
-
-/// How many entries are considered, from the first one that is not done.
-constexpr size_t kLookAhead = 1000;
 
 /// Returns the directory that velathumb reads from a tree entry: without leading colons, up to the
 /// next colon.
@@ -54,70 +53,108 @@ bool DoOverlap(const EntryTarget& a, const EntryTarget& b) {
          (b.isTree && IsInTree(a.directory, b.directory));
 }
 
-EntryPlan::EntryPlan(std::vector<std::string> entries) {
-  items_.reserve(entries.size());
-  for (std::string& entry : entries) {
-    items_.push_back({std::move(entry), State::kPending, Clock::time_point(), std::nullopt});
+EntryPlan::EntryPlan(std::vector<std::string> entries) : left_(entries.size()) {
+  items_.resize(entries.size());
+  for (size_t number = 0; number < entries.size(); ++number) {
+    items_[number].entry = std::move(entries[number]);
+    ready_.emplace_back(0, entries.size() - 1 - number);
   }
 }
 
-EntryPlan::Range EntryPlan::Window() const {
-  return {first_, std::min(items_.size(), first_ + kLookAhead)};
+EntryPlan::Item* EntryPlan::FindOverlapping(const EntryTarget& target) {
+  const auto other = std::find_if(inProgress_.begin(), inProgress_.end(), [&](size_t number) {
+    return DoOverlap(target, *items_[number].target);
+  });
+  return other == inProgress_.end() ? nullptr : &items_[*other];
 }
 
-bool EntryPlan::OverlapsWithProgress(Item& item) {
-  if (inProgress_.empty()) {
-    return false;
+void EntryPlan::MakeReady(const std::vector<size_t>& numbers) {
+  const auto middle = static_cast<std::ptrdiff_t>(ready_.size());
+  for (const size_t number : numbers) {
+    items_[number].state = State::kReady;
+    ready_.emplace_back(items_[number].starts, number);
   }
-  if (!item.target) {
-    item.target = TargetOf(item.entry);
+  std::sort(ready_.begin() + middle, ready_.end(), std::greater<>());
+  std::inplace_merge(ready_.begin(), ready_.begin() + middle, ready_.end(), std::greater<>());
+}
+
+void EntryPlan::WakePostponed(Clock::time_point now) {
+  std::vector<size_t> due;
+  while (!postponed_.empty() && postponed_.begin()->first <= now) {
+    due.push_back(postponed_.begin()->second);
+    postponed_.erase(postponed_.begin());
   }
-  return std::any_of(inProgress_.begin(), inProgress_.end(),
-                     [&](size_t other) { return DoOverlap(*item.target, *items_[other].target); });
+  MakeReady(due);
 }
 
 std::optional<size_t> EntryPlan::Start(Clock::time_point now) {
-  const auto [begin, end] = Window();
-  for (size_t number = begin; number < end; ++number) {
+  WakePostponed(now);
+  while (!ready_.empty()) {
+    const size_t number = ready_.back().second;
+    ready_.pop_back();
     Item& item = items_[number];
-    if (item.state != State::kPending || item.notBefore > now || OverlapsWithProgress(item)) {
-      continue;
-    }
     if (!item.target) {
       item.target = TargetOf(item.entry);
     }
+    if (Item* other = FindOverlapping(*item.target)) {
+      item.state = State::kWaiting;
+      other->waiting.push_back(number);
+      continue;
+    }
     item.state = State::kInProgress;
+    ++item.starts;
     inProgress_.push_back(number);
     return number;
   }
   return std::nullopt;
 }
 
+/// Removes an entry from the set that it is in.
+void EntryPlan::Leave(size_t number) {
+  Item& item = items_[number];
+  if (item.state == State::kReady) {
+    const auto place = std::find(ready_.begin(), ready_.end(), Rank(item.starts, number));
+    ready_.erase(place);
+  }
+  postponed_.erase({item.notBefore, number});
+  if (item.state == State::kInProgress) {
+    inProgress_.erase(std::find(inProgress_.begin(), inProgress_.end(), number));
+    MakeReady(std::exchange(item.waiting, {}));
+  }
+  // Where the path leads may change.
+  item.target.reset();
+}
+
 void EntryPlan::Postpone(size_t number, Clock::time_point time) {
-  inProgress_.erase(std::remove(inProgress_.begin(), inProgress_.end(), number), inProgress_.end());
-  items_[number].state = State::kPending;
+  Leave(number);
+  items_[number].state = State::kPostponed;
   items_[number].notBefore = time;
+  postponed_.emplace(time, number);
 }
 
 void EntryPlan::Finish(size_t number) {
-  inProgress_.erase(std::remove(inProgress_.begin(), inProgress_.end(), number), inProgress_.end());
+  Leave(number);
   items_[number].state = State::kDone;
-  items_[number].target.reset();
-  while (first_ < items_.size() && items_[first_].state == State::kDone) {
-    ++first_;
-  }
+  --left_;
 }
 
 std::optional<EntryPlan::Clock::time_point> EntryPlan::NextStart() const {
-  std::optional<Clock::time_point> next;
-  const auto [begin, end] = Window();
-  for (size_t number = begin; number < end; ++number) {
-    const Item& item = items_[number];
-    if (item.state == State::kPending && (!next || item.notBefore < *next)) {
-      next = item.notBefore;
-    }
+  if (!ready_.empty()) {
+    return Clock::time_point();
   }
-  return next;
+  return postponed_.empty() ? std::nullopt : std::make_optional(postponed_.begin()->first);
+}
+
+std::vector<size_t> EntryPlan::OnlyPostponed(Clock::time_point now) const {
+  std::vector<size_t> numbers;
+  const bool isNoneDue = postponed_.empty() || postponed_.begin()->first > now;
+  if (postponed_.size() == left_ && isNoneDue) {
+    for (const auto& postponed : postponed_) {
+      numbers.push_back(postponed.second);
+    }
+    std::sort(numbers.begin(), numbers.end());
+  }
+  return numbers;
 }
 
 }  // namespace vela

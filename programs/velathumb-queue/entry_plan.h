@@ -4,7 +4,9 @@
 #include <chrono>
 #include <cstddef>
 #include <optional>
+#include <set>
 #include <string>
+#include <utility>
 #include <vector>
 
 namespace vela {
@@ -21,7 +23,8 @@ EntryTarget TargetOf(const std::string& entry);
 /// Returns whether both include a common directory.
 bool DoOverlap(const EntryTarget& a, const EntryTarget& b);
 
-/// Hands out entries in their order, never two that overlap at the same time.
+/// Hands out entries in their order, never two that overlap at the same time. Entries that were
+/// started before come after those that were not.
 class EntryPlan {
  public:
   using Clock = std::chrono::steady_clock;
@@ -32,37 +35,47 @@ class EntryPlan {
   /// is in progress; it is then in progress. Nothing when there is none at the moment.
   std::optional<size_t> Start(Clock::time_point now);
 
-  /// Postpones an entry that was in progress until `time`.
+  /// Postpones an entry that is not done until `time`.
   void Postpone(size_t number, Clock::time_point time);
 
-  /// Marks an entry that was in progress as done.
+  /// Marks an entry as done.
   void Finish(size_t number);
 
   const std::string& Entry(size_t number) const { return items_[number].entry; }
-  bool IsFinished() const { return first_ == items_.size(); }
+  bool IsFinished() const { return left_ == 0; }
 
-  /// Returns when the first pending entry may start, nothing when none is pending.
+  /// Returns when the first pending entry may start, a time in the past when one may start now.
+  /// Nothing when all wait for entries in progress.
   std::optional<Clock::time_point> NextStart() const;
 
+  /// Returns the entries that are postponed, in their order, when no other ones are left; nothing
+  /// when there are other ones.
+  std::vector<size_t> OnlyPostponed(Clock::time_point now) const;
+
  private:
-  enum class State { kPending, kInProgress, kDone };
+  enum class State { kReady, kWaiting, kPostponed, kInProgress, kDone };
   struct Item {
     std::string entry;
-    State state = State::kPending;
+    State state = State::kReady;
+    int starts = 0;
     Clock::time_point notBefore;
     std::optional<EntryTarget> target;
-  };
-  struct Range {
-    size_t begin;
-    size_t end;
+    std::vector<size_t> waiting;  ///< while in progress: entries that overlap with this one
   };
 
-  Range Window() const;
-  bool OverlapsWithProgress(Item& item);
+  /// The number of starts and that of the entry: the lowest is the next.
+  using Rank = std::pair<int, size_t>;
+
+  void WakePostponed(Clock::time_point now);
+  void MakeReady(const std::vector<size_t>& numbers);
+  void Leave(size_t number);
+  Item* FindOverlapping(const EntryTarget& target);
 
   std::vector<Item> items_;
+  std::vector<Rank> ready_;  // the next one at the end
+  std::set<std::pair<Clock::time_point, size_t>> postponed_;
   std::vector<size_t> inProgress_;
-  size_t first_ = 0;  // all entries before it are done
+  size_t left_;
 };
 
 }  // namespace vela

@@ -13,6 +13,7 @@
 #include "platform/vlibc.h"
 #include "posix/file_descriptor.h"
 #include "posix/file_lock.h"
+#include "posix/files.h"
 #include "posix/service_log.h"
 #include "queue_run.h"
 #include "storage/creation_queue.h"
@@ -35,6 +36,7 @@ int ToExitStatus(RunEnd end) {
     case RunEnd::kStopped:
       return kEntriesLeft;
     case RunEnd::kFailed:
+    case RunEnd::kNotRecorded:
       break;
   }
   return kError;
@@ -54,7 +56,7 @@ bool CheckAdditions(std::vector<std::string>& entries) {
 }
 
 /// Returns false when an entry cannot be appended, which is logged.
-bool AppendEntries(const std::vector<std::string>& entries) {
+bool AddToQueue(const std::vector<std::string>& entries) {
   for (const std::string& entry : entries) {
     if (WriteIndexQueue(entry.c_str(), kPhotoQueue.file) != 0) {
       WriteLog(LogLevel::kError, "cannot append to " + std::string(kPhotoQueue.file) + ": " + entry,
@@ -63,6 +65,25 @@ bool AppendEntries(const std::vector<std::string>& entries) {
     }
   }
   return true;
+}
+
+/// Returns false when the entries cannot be added, which is logged.
+bool AppendEntries(const std::vector<std::string>& entries) {
+  if (entries.empty()) {
+    return true;
+  }
+  if (!AddToQueue(entries)) {
+    return false;
+  }
+  // The runner may have taken the queue meanwhile.
+  int error = SyncFile(kPhotoQueue.file);
+  if (error == 0 || error == ENOENT) {
+    error = SyncDirectoryOf(kPhotoQueue.file);
+  }
+  if (error != 0) {
+    WriteLog(LogLevel::kError, std::string("cannot write to the disk: ") + kPhotoQueue.file, error);
+  }
+  return error == 0;
 }
 
 int RunAlone(RunSettings& settings) {

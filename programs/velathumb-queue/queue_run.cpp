@@ -4,18 +4,18 @@
 #include <cerrno>
 #include <chrono>
 #include <functional>
-#include <map>
-#include <optional>
 #include <string>
+#include <unordered_map>
 #include <unordered_set>
+#include <vector>
 
+#include "batch.h"
 #include "conversion_pause.h"
 #include "entry_check.h"
-#include "entry_plan.h"
-#include "posix/child_process.h"
 #include "posix/event_wait.h"
 #include "posix/service_log.h"
 #include "progress_totals.h"
+#include "storage/unfinished_directories.h"
 #include "taken_queue.h"
 
 namespace vela {
@@ -25,208 +25,27 @@ namespace {
 using std::chrono::milliseconds;
 using Clock = EntryPlan::Clock;
 
-/// How long an entry is postponed while its directory is locked by another velathumb.
-constexpr std::chrono::seconds kLockedDirectoryPause(2);
-/// How long it is postponed after its velathumb was killed or failed, times the number of tries.
-constexpr milliseconds kRetryPause(200);
 /// Interval of the attempts to lock a file of the queue that is locked.
 constexpr milliseconds kLockedFilePause(200);
-/// After so many failed tries an entry is deferred: it probably causes the failures.
-constexpr int kMaxTries = 25;
 /// velathumb queues a directory again when there is more to make in it: twice, for a photo that
 /// succeeds. One that is queued more often is deferred.
 constexpr int kMaxRounds = 16;
 
-/// Starts velathumb for one entry. It ends with this process, however that ends: an orphan would
-/// keep its directory locked. Must be called from the main thread. Returns 0 and stores the process
-/// id, or an errno value.
-int StartVelathumb(const VelathumbCommand& command, std::string entry, pid_t& pid) {
-  std::string path = command.path;
-  std::string profileFile = command.profileFile;
-  char* const arguments[] = {path.data(), profileFile.data(), entry.data(), nullptr};
-  return StartAttachedChild(path.c_str(), arguments, pid);
-}
-
-/// Processes one taken queue.
-class Batch {
- public:
-  Batch(const RunSettings& settings, TakenQueue& taken, EventWait& events, PauseGate& gate)
-      : settings_(settings), taken_(taken), events_(events), gate_(gate), plan_(taken.Entries()) {}
-
-  /// Returns kEmpty when all entries are done or deferred.
-  RunEnd Run();
-
-  /// Returns how many entries were deferred to a later run.
-  int DeferredCount() const { return deferred_; }
-
- private:
-  void StartEntries();
-  bool StartEntry(size_t number);
-  void ReapChildren();
-  void HandleEnd(size_t number, int status);
-  void HandleSuccess(size_t number);
-  void Retry(size_t number);
-  void Defer(size_t number, const std::string& reason);
-  void Finish(size_t number);
-  void StopChildren();
-  std::optional<milliseconds> WaitTime() const;
-
-  const RunSettings& settings_;
-  TakenQueue& taken_;
-  EventWait& events_;
-  PauseGate& gate_;
-  EntryPlan plan_;
-  std::map<pid_t, size_t> children_;
-  std::map<size_t, int> tries_;
-  int deferred_ = 0;
-  bool hasFailed_ = false;
-};
-
-bool Batch::StartEntry(size_t number) {
-  const std::string& entry = plan_.Entry(number);
-  const std::string obstacle = FindObstacle(entry);
-  if (!obstacle.empty()) {
-    Defer(number, obstacle);
-    return !hasFailed_;
+/// Returns whether the cause of an errno value may pass without an administrator, such as a full
+/// volume.
+bool CanPass(int error) {
+  switch (error) {
+    case ENOSPC:
+    case EDQUOT:
+    case EIO:
+    case EROFS:
+    case ENOMEM:
+    case EMFILE:
+    case ENFILE:
+      return true;
+    default:
+      return false;
   }
-  if (IsLockedElsewhere(TargetOf(entry))) {
-    plan_.Postpone(number, Clock::now() + kLockedDirectoryPause);
-    return true;
-  }
-  pid_t child = 0;
-  const int error = StartVelathumb(settings_.velathumb, entry, child);
-  if (error != 0) {
-    WriteLog(LogLevel::kError, "cannot start " + settings_.velathumb.path, error);
-    plan_.Postpone(number, Clock::now());
-    hasFailed_ = true;
-    return false;
-  }
-  children_.emplace(child, number);
-  return true;
-}
-
-void Batch::StartEntries() {
-  while (static_cast<int>(children_.size()) < settings_.jobs && gate_.MayStart()) {
-    const auto number = plan_.Start(Clock::now());
-    if (!number || !StartEntry(*number)) {
-      return;
-    }
-  }
-}
-
-void Batch::Defer(size_t number, const std::string& reason) {
-  const std::string& entry = plan_.Entry(number);
-  WriteLog(LogLevel::kWarning, "deferred to a later run, " + reason + ": " + entry);
-  const int error = taken_.Defer(entry);
-  if (error != 0) {
-    // Neither done nor saved: the taken queue must stay.
-    WriteLog(LogLevel::kError, "cannot defer an entry", error);
-    plan_.Postpone(number, Clock::now());
-    hasFailed_ = true;
-    return;
-  }
-  ++deferred_;
-  tries_.erase(number);
-  plan_.Finish(number);
-}
-
-void Batch::Finish(size_t number) {
-  const int error = taken_.MarkDone(plan_.Entry(number));
-  if (error != 0) {
-    // The only effect is that a later run repeats the entry.
-    WriteLog(LogLevel::kWarning, "cannot record that an entry is done", error);
-  }
-  tries_.erase(number);
-  plan_.Finish(number);
-}
-
-void Batch::Retry(size_t number) {
-  const int tries = ++tries_[number];
-  if (tries < kMaxTries) {
-    plan_.Postpone(number, Clock::now() + tries * kRetryPause);
-    return;
-  }
-  Defer(number, "velathumb did not complete in any try");
-}
-
-/// velathumb exits with 0 also when it skipped a directory or stopped in it.
-void Batch::HandleSuccess(size_t number) {
-  const std::string& entry = plan_.Entry(number);
-  const std::string obstacle = FindObstacle(entry);
-  if (!obstacle.empty()) {
-    Defer(number, obstacle);
-  } else if (IsLockedElsewhere(TargetOf(entry))) {
-    plan_.Postpone(number, Clock::now() + kLockedDirectoryPause);
-  } else {
-    Finish(number);
-  }
-}
-
-void Batch::HandleEnd(size_t number, int status) {
-  if (HasSucceeded(status)) {
-    HandleSuccess(number);
-    return;
-  }
-  if (!events_.IsStopping()) {
-    WriteLog(LogLevel::kWarning,
-             "velathumb did not complete, trying again: " + plan_.Entry(number));
-  }
-  Retry(number);
-}
-
-void Batch::ReapChildren() {
-  for (auto child = children_.begin(); child != children_.end();) {
-    const auto [pid, number] = *child;
-    const std::optional<int> status = ReapEndedChild(pid);
-    if (!status) {
-      ++child;
-      continue;
-    }
-    child = children_.erase(child);
-    HandleEnd(number, *status);
-  }
-  ReapInheritedChildren([this](pid_t pid) { return children_.count(pid) != 0; });
-}
-
-void Batch::StopChildren() {
-  for (const auto& child : children_) {
-    TerminateChild(child.first);
-  }
-  while (!children_.empty()) {
-    events_.Wait(milliseconds(1000));
-    ReapChildren();
-  }
-}
-
-std::optional<milliseconds> Batch::WaitTime() const {
-  std::optional<Clock::time_point> wake = gate_.NextCheck();
-  const bool hasFreeJob = static_cast<int>(children_.size()) < settings_.jobs;
-  if (!wake && hasFreeJob) {
-    wake = plan_.NextStart();
-  }
-  if (!wake) {
-    return std::nullopt;
-  }
-  // An entry that waits only for another one needs no time limit: the end of that one wakes the
-  // runner.
-  const auto left = std::chrono::ceil<milliseconds>(*wake - Clock::now());
-  return left > milliseconds(0) ? left : milliseconds(children_.empty() ? 0 : 1000);
-}
-
-RunEnd Batch::Run() {
-  while (!plan_.IsFinished() && !events_.IsStopping() && !hasFailed_) {
-    StartEntries();
-    if (plan_.IsFinished() || hasFailed_) {
-      break;
-    }
-    events_.Wait(WaitTime());
-    ReapChildren();
-  }
-  StopChildren();
-  if (hasFailed_) {
-    return RunEnd::kFailed;
-  }
-  return plan_.IsFinished() ? RunEnd::kEmpty : RunEnd::kStopped;
 }
 
 /// Processes one queue after the other.
@@ -244,22 +63,30 @@ class QueueRun {
   bool WaitUntilAllowed();
   void SetTotals(TakenQueue::Outcome outcome);
   bool RecordSeen();
-  RunEnd DeferAll();
+  std::vector<std::string> FindEndless();
+  RunEnd DeferEndless(const std::vector<std::string>& entries);
   int RetryWhileLocked(const std::function<int()>& act);
   RunEnd FinishTaken();
-  bool RequeueDeferred();
+  int RequeueDeferred();
   void WaitForEntries();
+  void QueueUnfinished();
+  bool WaitAfterFailure(RunEnd end);
+  RunEnd EndWhenIdle();
 
   const RunSettings& settings_;
   TakenQueue taken_;
   ProgressTotals totals_;
   EventWait events_;
   PauseGate gate_;
-  bool isIdle_ = true;                    // no entry was in progress before
-  bool hasDeferred_ = false;              // entries are left for a later run
-  std::unordered_set<std::string> seen_;  // entries since the queue was last empty
-  int rounds_ = 0;                        // in a row with only entries seen before
+  EntryHistories histories_;
+  bool isIdle_ = true;                            // no entry was in progress before
+  bool hasHandedBack_ = false;                    // in the last round
+  bool hasDeferred_ = false;                      // entries are left for a later run
+  std::unordered_set<std::string> seen_;          // entries since the queue was last empty
+  std::unordered_map<std::string, int> repeats_;  // rounds in a row with only entries seen before
   Clock::time_point lastRequeue_;
+  bool hasRequeued_ = false;  // the last attempt has succeeded
+  int failures_ = 0;          // in a row, of reading or writing a file of the queue
 };
 
 /// Records the taken entries. Returns whether all of them were recorded before.
@@ -309,7 +136,7 @@ RunEnd QueueRun::FinishTaken() {
     return RunEnd::kStopped;
   }
   WriteLog(LogLevel::kError, "cannot remove the finished queue", error);
-  return RunEnd::kFailed;
+  return RunEnd::kNotRecorded;
 }
 
 RunEnd QueueRun::ProcessTaken(TakenQueue::Outcome outcome) {
@@ -321,46 +148,107 @@ RunEnd QueueRun::ProcessTaken(TakenQueue::Outcome outcome) {
     return RunEnd::kStopped;
   }
   SetTotals(outcome);
-  Batch batch(settings_, taken_, events_, gate_);
+  Batch batch(settings_, taken_, events_, gate_, histories_);
   const RunEnd end = batch.Run();
+  hasHandedBack_ = batch.HasHandedBack();
   hasDeferred_ = hasDeferred_ || batch.DeferredCount() > 0;
   return end == RunEnd::kEmpty ? FinishTaken() : end;
 }
 
-RunEnd QueueRun::DeferAll() {
+/// Counts the rounds in a row in which each entry was taken, as long as no new one is among them.
+/// Returns the entries that were taken too often.
+std::vector<std::string> QueueRun::FindEndless() {
+  std::vector<std::string> endless;
+  if (!RecordSeen()) {
+    repeats_.clear();
+    return endless;
+  }
+  // That postponed entries were put back into the queue does not mean that they were processed.
+  if (hasHandedBack_) {
+    return endless;
+  }
+  for (const std::string& entry : taken_.Entries()) {
+    if (++repeats_[entry] > kMaxRounds) {
+      endless.push_back(entry);
+    }
+  }
+  return endless;
+}
+
+/// The next round processes the others.
+RunEnd QueueRun::DeferEndless(const std::vector<std::string>& entries) {
+  const int error = taken_.Defer(entries);
+  if (error != 0) {
+    WriteLog(LogLevel::kError, "cannot defer an entry", error);
+    return RunEnd::kNotRecorded;
+  }
   WriteLog(LogLevel::kWarning,
            "the same entries are queued again and again, deferred to a later run");
   hasDeferred_ = true;
-  for (const std::string& entry : taken_.Entries()) {
-    const int error = taken_.Defer(entry);
-    if (error != 0) {
-      WriteLog(LogLevel::kError, "cannot defer an entry", error);
-      return RunEnd::kFailed;
-    }
+  for (const std::string& entry : entries) {
+    repeats_.erase(entry);
   }
-  return FinishTaken();
+  return entries.size() == taken_.Entries().size() ? FinishTaken() : RunEnd::kEmpty;
 }
 
-/// Returns false when that failed, which is logged.
-bool QueueRun::RequeueDeferred() {
-  lastRequeue_ = Clock::now();
+/// Returns 0 also when a signal ended the wait, or an errno value, which is logged.
+int QueueRun::RequeueDeferred() {
   const int error = RetryWhileLocked([this] { return taken_.RequeueDeferred(); });
-  if (error != 0 && error != EWOULDBLOCK) {
-    WriteLog(LogLevel::kError, "cannot put deferred entries back into the queue", error);
+  lastRequeue_ = Clock::now();
+  hasRequeued_ = error == 0 || error == EWOULDBLOCK;
+  if (hasRequeued_) {
+    return 0;
   }
-  return error == 0 || error == EWOULDBLOCK;
+  WriteLog(LogLevel::kError, "cannot put deferred entries back into the queue", error);
+  return error;
 }
 
 void QueueRun::WaitForEntries() {
   // The watch reports every new queue; the limit is for file systems that report nothing.
   constexpr milliseconds kLongestWait = std::chrono::minutes(1);
-  constexpr std::chrono::hours kRequeueInterval(1);
+  constexpr milliseconds kRequeueInterval = std::chrono::hours(1);
   isIdle_ = true;
-  rounds_ = 0;
+  repeats_.clear();
   seen_.clear();
+  histories_.clear();
   events_.Wait(kLongestWait);
-  if (Clock::now() - lastRequeue_ >= kRequeueInterval) {
+  if (Clock::now() - lastRequeue_ >= (hasRequeued_ ? kRequeueInterval : kLongestWait)) {
     RequeueDeferred();
+  }
+}
+
+/// Waits, longer each time, when `end` is a failure that can pass and the runner is to keep
+/// running: a full volume of the queue must not end a service. Returns whether to continue.
+bool QueueRun::WaitAfterFailure(RunEnd end) {
+  constexpr int kDoublings = 6;
+  if (end != RunEnd::kNotRecorded || !settings_.follow || !CanPass(taken_.LastError())) {
+    return false;
+  }
+  const std::chrono::seconds pause(1 << std::min(failures_, kDoublings));
+  ++failures_;
+  WriteLog(LogLevel::kInfo, "trying again in " + std::to_string(pause.count()) +
+                                (pause.count() == 1 ? " second" : " seconds"));
+  for (const auto resume = Clock::now() + pause; Clock::now() < resume && !events_.IsStopping();) {
+    events_.Wait(std::chrono::ceil<milliseconds>(resume - Clock::now()));
+  }
+  return true;
+}
+
+/// Queues the directories that a velathumb could not queue, also one that this runner has not
+/// started. Other notes concern only the velathumb that made them.
+void QueueRun::QueueUnfinished() {
+  std::unordered_set<std::string> lost;
+  TakeUnfinishedDirectories([&](const UnfinishedDirectory& note) {
+    const bool isLost =
+        note.reason == UnfinishedReason::kNotQueued && note.path.find('\n') == std::string::npos;
+    if (isLost) {
+      lost.insert(note.path);
+    }
+    return !isLost;
+  });
+  if (!lost.empty() && taken_.AddToQueue({lost.begin(), lost.end()}) == 0) {
+    TakeUnfinishedDirectories(
+        [&](const UnfinishedDirectory& note) { return lost.count(note.path) != 0; });
   }
 }
 
@@ -369,10 +257,11 @@ RunEnd QueueRun::RunRound(bool& isIdle) {
   if (!IsProfileUsable(settings_.velathumb.profileFile)) {
     return RunEnd::kFailed;
   }
+  QueueUnfinished();
   const TakenQueue::Outcome outcome = taken_.Take();
   switch (outcome) {
     case TakenQueue::Outcome::kFailed:
-      return RunEnd::kFailed;
+      return RunEnd::kNotRecorded;
     case TakenQueue::Outcome::kBusy:
       events_.Wait(kLockedFilePause);
       return RunEnd::kEmpty;
@@ -383,19 +272,34 @@ RunEnd QueueRun::RunRound(bool& isIdle) {
     case TakenQueue::Outcome::kTaken:
       break;
   }
-  rounds_ = RecordSeen() ? rounds_ + 1 : 0;
-  return rounds_ > kMaxRounds ? DeferAll() : ProcessTaken(outcome);
+  const std::vector<std::string> endless = FindEndless();
+  return endless.empty() ? ProcessTaken(outcome) : DeferEndless(endless);
+}
+
+RunEnd QueueRun::EndWhenIdle() {
+  if (!hasRequeued_) {
+    return RunEnd::kFailed;
+  }
+  return hasDeferred_ ? RunEnd::kDeferred : RunEnd::kEmpty;
 }
 
 RunEnd QueueRun::RunRounds() {
   while (!events_.IsStopping()) {
     bool isIdle = false;
     const RunEnd end = RunRound(isIdle);
-    if (end != RunEnd::kEmpty) {
+    if (end != RunEnd::kEmpty && !WaitAfterFailure(end)) {
       return end;
     }
+    if (end != RunEnd::kEmpty) {
+      continue;
+    }
+    failures_ = 0;
+    // Processing the queue may have made room for them.
+    if (isIdle && !hasRequeued_ && !settings_.follow && RequeueDeferred() == 0) {
+      continue;
+    }
     if (isIdle && !settings_.follow) {
-      return hasDeferred_ ? RunEnd::kDeferred : RunEnd::kEmpty;
+      return EndWhenIdle();
     }
     if (isIdle) {
       WaitForEntries();
@@ -410,7 +314,9 @@ RunEnd QueueRun::Run() {
     WriteLog(LogLevel::kError, "cannot watch the queue", error);
     return RunEnd::kFailed;
   }
-  return RequeueDeferred() ? RunRounds() : RunEnd::kFailed;
+  ExpectUnfinishedDirectories();
+  const int requeueError = RequeueDeferred();
+  return requeueError == 0 || CanPass(requeueError) ? RunRounds() : RunEnd::kFailed;
 }
 
 }  // namespace

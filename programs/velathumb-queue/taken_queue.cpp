@@ -2,18 +2,17 @@
 
 #include <algorithm>
 #include <cerrno>
-#include <cstdio>
 #include <cstring>
 #include <ctime>
 #include <filesystem>
 #include <fstream>
+#include <optional>
 #include <system_error>
 
 #include "platform/system_rules.h"
 #include "platform/velaindex.h"
 #include "platform/vlibc.h"
 #include "posix/file_lock.h"
-#include "posix/files.h"
 #include "posix/service_log.h"
 #include "storage/creation_queue.h"
 
@@ -49,9 +48,12 @@ uintmax_t SizeOf(const std::string& path) {
   return error ? 0 : size;
 }
 
-bool Exists(const std::string& path) {
-  std::error_code error;
-  return std::filesystem::exists(path, error);
+int ZeroIfMissing(int error) {
+  return error == ENOENT ? 0 : error;
+}
+
+bool IsSameState(const FileStatus& a, const FileStatus& b) {
+  return a.identity == b.identity && a.size == b.size;
 }
 
 }  // namespace
@@ -86,11 +88,10 @@ int TakenQueue::MoveQueue() {
   if (queue.size == 0) {
     return RemoveEmptyQueue(queue.modified);
   }
-  return std::rename(paths_.queue.c_str(), paths_.taken.c_str()) == 0 ? 0 : errno;
+  return RenameToNewName(paths_.queue, paths_.taken);
 }
 
-std::unordered_set<std::string> TakenQueue::ReadJournal() {
-  std::unordered_set<std::string> done;
+int TakenQueue::ReadJournal(std::unordered_set<std::string>& done) const {
   std::ifstream journal(paths_.journal, std::ios::binary);
   uintmax_t completeSize = 0;
   for (std::string line; std::getline(journal, line) && !journal.eof();) {
@@ -99,30 +100,50 @@ std::unordered_set<std::string> TakenQueue::ReadJournal() {
   }
   // A last line without a newline was cut off when it was written, and would be joined with the
   // line that is appended next.
+  std::error_code error;
   if (SizeOf(paths_.journal) > completeSize) {
-    std::error_code error;
     std::filesystem::resize_file(paths_.journal, completeSize, error);
   }
-  return done;
+  return error.value();
 }
 
-bool TakenQueue::ReadEntries() {
+int TakenQueue::ReadEntries() {
   entries_.clear();
-  std::unordered_set<std::string> known = ReadJournal();
+  recordError_ = 0;
+  syncedQueue_.reset();
+  std::unordered_set<std::string> known;
+  const int error = ReadJournal(known);
+  if (error != 0) {
+    return error;
+  }
   readSize_ = SizeOf(paths_.taken);
   const QueueRead read = ForEachQueueEntry(paths_.taken.c_str(), [&](const std::string& entry) {
     if (!entry.empty() && known.insert(KeyOf(entry)).second) {
       entries_.push_back(entry);
     }
   });
-  return read == QueueRead::kComplete;
+  return read == QueueRead::kComplete ? 0 : errno;
+}
+
+/// A failure to examine the file must not be taken for its absence: the next queue would replace
+/// it.
+int TakenQueue::FindTaken(bool& isFound) const {
+  isFound = ExamineFile(paths_.taken).has_value();
+  return isFound ? 0 : ZeroIfMissing(errno);
+}
+
+/// A journal without taken entries is left over from the queue before. It must be gone for good
+/// before it could be taken for that of the next queue.
+int TakenQueue::RemoveOldJournal() const {
+  const int error = RemoveFile(paths_.journal);
+  return error == 0 ? SyncDirectoryOf(paths_.journal) : ZeroIfMissing(error);
 }
 
 TakenQueue::Outcome TakenQueue::Take() {
-  const bool isResumed = Exists(paths_.taken);
-  if (!isResumed) {
-    // A journal without taken entries is left over from the queue before.
-    int error = RemoveFileIfPresent(paths_.journal);
+  bool isResumed = false;
+  int error = FindTaken(isResumed);
+  if (error == 0 && !isResumed) {
+    error = RemoveOldJournal();
     if (error == 0) {
       error = MoveQueue();
     }
@@ -132,46 +153,139 @@ TakenQueue::Outcome TakenQueue::Take() {
     if (error == EWOULDBLOCK) {
       return Outcome::kBusy;
     }
-    if (error != 0) {
-      WriteLog(LogLevel::kError, "cannot take " + paths_.queue, error);
-      return Outcome::kFailed;
-    }
   }
-  if (!ReadEntries()) {
-    WriteLog(LogLevel::kError, "cannot read " + paths_.taken, errno);
+  if (error != 0) {
+    WriteLog(LogLevel::kError, "cannot take " + paths_.queue, Remember(error));
+    return Outcome::kFailed;
+  }
+  error = ReadEntries();
+  if (error != 0) {
+    WriteLog(LogLevel::kError, "cannot read " + paths_.taken, Remember(error));
     return Outcome::kFailed;
   }
   return isResumed ? Outcome::kResumed : Outcome::kTaken;
 }
 
-int TakenQueue::MarkDone(const std::string& entry) {
-  return AppendLine(paths_.journal, entry);
+bool TakenQueue::HasNewEntries() const {
+  return SizeOf(paths_.queue) > 0;
 }
 
-int TakenQueue::Defer(const std::string& entry) {
-  // In this order: after a crash in between the entry exists twice instead of not at all.
-  const int error = AppendLine(paths_.later, entry);
-  return error != 0 ? error : MarkDone(entry);
-}
-
-int TakenQueue::RequeueDeferred() {
-  // Appending would wait for the lock, whatever its kind.
-  if (LockedFile queue; LockFileAt(paths_.queue, queuePatience_, queue) == EWOULDBLOCK) {
-    return EWOULDBLOCK;
+int TakenQueue::Remember(int error) {
+  if (error != 0 && error != EWOULDBLOCK) {
+    lastError_ = error;
   }
-  int error = 0;
+  return error;
+}
+
+/// After a power failure, the note that an entry is done must not exist without what velathumb has
+/// added to the queue for it.
+int TakenQueue::SyncQueue() {
+  const std::optional<FileStatus> status = ExamineFile(paths_.queue);
+  if (!status) {
+    return ZeroIfMissing(errno);
+  }
+  if (syncedQueue_ && IsSameState(*syncedQueue_, *status)) {
+    return 0;
+  }
+  int error = SyncFile(paths_.queue);
+  if (error == 0) {
+    error = SyncDirectoryOf(paths_.queue);
+  }
+  if (error == 0) {
+    syncedQueue_ = status;
+  }
+  return error;
+}
+
+int TakenQueue::RecordDone(const std::string& entry) {
+  const int error = SyncQueue();
+  return error != 0 ? error : AppendLine(paths_.journal, entry);
+}
+
+int TakenQueue::MarkDone(const std::string& entry) {
+  // A line after one that could not be written completely would be joined with it.
+  if (recordError_ == 0) {
+    recordError_ = RecordDone(entry);
+  }
+  return Remember(recordError_);
+}
+
+int TakenQueue::Defer(const std::vector<std::string>& entries) {
+  // In this order: after a crash in between the entries exist twice instead of not at all.
+  int error = AppendDurably(paths_.later, entries);
+  for (const std::string& entry : entries) {
+    if (error == 0) {
+      error = MarkDone(entry);
+    }
+  }
+  return Remember(error);
+}
+
+int TakenQueue::AddToQueue(const std::vector<std::string>& entries) {
+  // The lock is waited for elsewhere, so that a signal can end the wait.
+  LockedFile queue;
+  int error = LockFileAt(paths_.queue, queuePatience_, queue);
+  if (error == 0) {
+    return Remember(AppendDurably(paths_.queue, entries));
+  }
+  if (error != ENOENT) {
+    return Remember(error);
+  }
+  for (const std::string& entry : entries) {
+    if (WriteIndexQueue(entry.c_str(), paths_.queue.c_str()) != 0) {
+      return Remember(VLIBCErrGet());
+    }
+  }
+  error = SyncFile(paths_.queue);
+  return Remember(error != 0 ? error : SyncDirectoryOf(paths_.queue));
+}
+
+/// Puts the deferred entries into the queue, which exists. Their file stays.
+int TakenQueue::CopyDeferred() {
+  std::vector<std::string> entries;
   const QueueRead read = ForEachQueueEntry(paths_.later.c_str(), [&](const std::string& entry) {
-    if (!entry.empty() && error == 0 && WriteIndexQueue(entry.c_str(), paths_.queue.c_str()) != 0) {
-      error = VLIBCErrGet();
+    if (!entry.empty()) {
+      entries.push_back(entry);
     }
   });
   if (read != QueueRead::kComplete) {
-    return errno == ENOENT ? 0 : errno;
+    return errno;
   }
-  return error != 0 ? error : RemoveFileIfPresent(paths_.later);
+  return AddToQueue(entries);
 }
 
-int TakenQueue::Finish() {
+int TakenQueue::RequeueDeferred() {
+  const std::optional<FileStatus> later = ExamineFile(paths_.later);
+  if (!later) {
+    return Remember(ZeroIfMissing(errno));
+  }
+  if (!later->isRegular) {
+    return Remember(EINVAL);
+  }
+  // Renaming needs no space on the volume.
+  int error = RenameToNewName(paths_.later, paths_.queue);
+  if (error != EEXIST) {
+    return Remember(error);
+  }
+  error = CopyDeferred();
+  return Remember(error != 0 ? error : RemoveFileIfPresent(paths_.later));
+}
+
+/// Returns 0 when everything that was recorded and queued is on the disk.
+int TakenQueue::SyncRecords() const {
+  for (const std::string& file : {paths_.queue, paths_.later, paths_.journal}) {
+    const int error = ZeroIfMissing(SyncFile(file));
+    if (error != 0) {
+      return error;
+    }
+  }
+  return SyncDirectoryOf(paths_.taken);
+}
+
+int TakenQueue::RemoveTaken() {
+  if (recordError_ != 0) {
+    return recordError_;
+  }
   LockedFile taken;
   int error = LockFileAt(paths_.taken, takenPatience_, taken);
   if (error != 0 && error != ENOENT) {
@@ -181,9 +295,17 @@ int TakenQueue::Finish() {
   if (error == 0 && static_cast<uintmax_t>(taken.size) != readSize_) {
     return 0;
   }
+  error = SyncRecords();
+  if (error != 0) {
+    return error;
+  }
   entries_.clear();
   error = RemoveFileIfPresent(paths_.taken);
   return error != 0 ? error : RemoveFileIfPresent(paths_.journal);
+}
+
+int TakenQueue::Finish() {
+  return Remember(RemoveTaken());
 }
 
 }  // namespace vela

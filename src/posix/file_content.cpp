@@ -80,6 +80,10 @@ int Rewind(int fd) {
   return lseek(fd, 0, SEEK_SET) < 0 ? errno : 0;
 }
 
+int SetFileSize(int fd, int64_t size) {
+  return ftruncate(fd, static_cast<off_t>(size)) == 0 ? 0 : errno;
+}
+
 int ReadToEnd(int fd, std::string& content) {
   try {
     return AppendToEnd(fd, content);

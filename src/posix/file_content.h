@@ -18,6 +18,9 @@ std::string ReadAt(int fd, int64_t offset, size_t size);
 /// Moves the position to the beginning. Returns 0 or an errno value, ESPIPE for a pipe.
 int Rewind(int fd);
 
+/// Sets the size of the open file `fd` to `size` bytes. Returns 0 or an errno value.
+int SetFileSize(int fd, int64_t size);
+
 /// Appends everything from the present position of `fd` to its end to `content`. Returns 0 or an
 /// errno value.
 int ReadToEnd(int fd, std::string& content);

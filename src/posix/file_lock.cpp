@@ -14,6 +14,7 @@
 
 #include "posix/file_version.h"
 #include "posix/files.h"
+#include "posix/folder.h"
 
 namespace vela {
 
@@ -304,8 +305,8 @@ int LockFileAt(const std::string& path, LockPatience& patience, LockedFile& lock
 }
 
 bool IsLocked(const std::string& path) {
-  const FileDescriptor file = OpenForReading(path);
-  return file.IsOpen() && flock(file.Get(), LOCK_SH | LOCK_NB) != 0 && errno == EWOULDBLOCK;
+  const FileDescriptor directory = FolderEntry(path).Open(O_RDONLY | O_DIRECTORY);
+  return directory.IsOpen() && TryLockExclusively(directory.Get()) == EWOULDBLOCK;
 }
 
 FileDescriptor TakeProcessLock(const std::string& path, bool wait) {

@@ -99,8 +99,9 @@ struct LockedFile {
 /// regular file, ENOENT also when the file was renamed or removed before it was locked.
 int LockFileAt(const std::string& path, LockPatience& patience, LockedFile& locked);
 
-/// Returns true when another process holds an exclusive lock on the file or directory `path`; false
-/// when it cannot be opened.
+/// Returns true when another process holds a lock of any kind on the directory `path`, so that no
+/// exclusive one can be taken; false when it cannot be opened. Follows only links that can be
+/// trusted (posix/folder.h), never waits.
 bool IsLocked(const std::string& path);
 
 /// Opens the lock file `path`, created for its owner only when missing, and takes a lock that no

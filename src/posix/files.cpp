@@ -6,9 +6,8 @@
 
 #include <cerrno>
 
-#include "posix/folder.h"
-
 #include "posix/file_content.h"
+#include "posix/folder.h"
 
 namespace vela {
 
@@ -16,6 +15,19 @@ namespace {
 
 int ErrnoUnless(bool succeeded) {
   return succeeded ? 0 : errno;
+}
+
+FileDescriptor OpenForAppending(const std::string& path) {
+  const int flags = O_RDWR | O_CREAT | O_APPEND | O_NONBLOCK | O_NOCTTY | O_CLOEXEC;
+  return FileDescriptor(open(path.c_str(), flags, 0644));
+}
+
+int SyncDescriptor(int fd) {
+  if (fsync(fd) == 0) {
+    return 0;
+  }
+  const bool isUnsupported = errno == EINVAL || errno == ENOSYS || errno == EOPNOTSUPP;
+  return isUnsupported ? 0 : errno;
 }
 
 }  // namespace
@@ -43,6 +55,12 @@ std::optional<FileStatus> ExamineFile(const char* path) {
 bool IsRegularFile(const std::string& path) {
   const std::optional<FileStatus> status = ExamineFile(path);
   return status && status->isRegular;
+}
+
+bool IsPrivateFile(int fd) {
+  struct stat status = {};
+  return fstat(fd, &status) == 0 && S_ISREG(status.st_mode) && status.st_nlink == 1 &&
+         status.st_uid == geteuid() && (status.st_mode & 077) == 0;
 }
 
 int IdentifyDirectory(const std::string& path, FileIdentity& identity) {
@@ -95,25 +113,59 @@ int RemoveFileIfPresent(const std::string& path) {
   return error == ENOENT ? 0 : error;
 }
 
+int RenameToNewName(const std::string& from, const std::string& to) {
+  if (renameat2(AT_FDCWD, from.c_str(), AT_FDCWD, to.c_str(), RENAME_NOREPLACE) == 0) {
+    return 0;
+  }
+  if (errno != EINVAL && errno != ENOSYS) {
+    return errno;
+  }
+  // The file system does not support that flag.
+  if (link(from.c_str(), to.c_str()) != 0) {
+    return errno;
+  }
+  return ErrnoUnless(unlink(from.c_str()) == 0);
+}
+
 int AppendLine(const std::string& path, const std::string& text) {
-  const int flags = O_RDWR | O_CREAT | O_APPEND | O_NONBLOCK | O_NOCTTY | O_CLOEXEC;
-  FileDescriptor file(open(path.c_str(), flags, 0644));
+  FileDescriptor file = OpenForAppending(path);
   if (!file.IsOpen()) {
     return errno;
   }
   const int error = AppendWhole(file.Get(), text + '\n');
-  return error != 0 || file.Close() ? error : errno;
+  return error != 0 ? error : ErrnoUnless(file.Close());
 }
 
-int SyncNameOf(const std::string& path) {
-  const std::string name = path.substr(0, path.rfind('/') + 1);
-  const FileDescriptor directory = OpenForReading(name.empty() ? "." : name);
-  if (!directory.IsOpen()) {
-    // A user may be allowed to create files there, but not to read the directory.
-    return errno == EACCES ? 0 : errno;
+int AppendDurably(const std::string& path, const std::vector<std::string>& lines) {
+  FileDescriptor file = OpenForAppending(path);
+  if (!file.IsOpen()) {
+    return errno;
   }
-  // EINVAL: the file system has nothing to wait for.
-  return fsync(directory.Get()) == 0 || errno == EINVAL ? 0 : errno;
+  std::string text = LacksFinalNewline(file.Get()) ? "\n" : "";
+  for (const std::string& line : lines) {
+    text += line + '\n';
+  }
+  int error = AppendWhole(file.Get(), text);
+  if (error == 0) {
+    error = SyncDescriptor(file.Get());
+  }
+  // Some file systems report only here that the data does not fit.
+  if (!file.Close() && error == 0) {
+    error = errno;
+  }
+  return error != 0 ? error : SyncDirectoryOf(path);
+}
+
+int SyncFile(const std::string& path) {
+  const FileDescriptor file = OpenForReading(path);
+  return file.IsOpen() ? SyncDescriptor(file.Get()) : errno;
+}
+
+int SyncDirectoryOf(const std::string& path) {
+  const std::string directory = path.substr(0, path.rfind('/') + 1);
+  const int error = SyncFile(directory.empty() ? std::string(".") : directory);
+  // A user may be allowed to create files there, but not to read the directory.
+  return error == EACCES ? 0 : error;
 }
 
 }  // namespace vela

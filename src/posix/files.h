@@ -4,6 +4,7 @@
 #include <cstdint>
 #include <optional>
 #include <string>
+#include <vector>
 
 #include "posix/file_descriptor.h"
 
@@ -48,6 +49,10 @@ inline std::optional<FileStatus> ExamineFile(const std::string& path) {
 /// Returns true when a regular file is at `path`, symbolic links followed.
 bool IsRegularFile(const std::string& path);
 
+/// Returns true when the open file `fd` is a regular file with one name that belongs to the
+/// effective user and that nobody else may open.
+bool IsPrivateFile(int fd);
+
 /// Stores the identity of the directory `path`. Returns 0 or an errno value, ENOTDIR when it is not
 /// a directory.
 int IdentifyDirectory(const std::string& path, FileIdentity& identity);
@@ -83,12 +88,24 @@ int RemoveFile(const std::string& path);
 /// Removes the file at `path` as RemoveFile does. Returns 0 also when it does not exist.
 int RemoveFileIfPresent(const std::string& path);
 
+/// Renames a file to a name that no file has. Returns 0 or an errno value, EEXIST when `to` exists.
+int RenameToNewName(const std::string& from, const std::string& to);
+
 /// Appends `text` and a newline to the file `path`, created with mode 0644 when missing. A line
-/// that does not fit on the volume is removed again. Returns 0 or an errno value.
+/// that does not fit on the volume is removed again. Returns 0 or an errno value. The line is not
+/// yet on the disk.
 int AppendLine(const std::string& path, const std::string& text);
 
-/// Waits until the name of the file `path`, in its directory, is on the disk. Returns 0, also when
-/// the directory may not be read or its file system has nothing to wait for, or an errno value.
-int SyncNameOf(const std::string& path);
+/// Appends the lines, each with its newline, as AppendLine does: all or none. They begin on a new
+/// line of the file, and are on the disk when this returns 0.
+int AppendDurably(const std::string& path, const std::vector<std::string>& lines);
+
+/// Writes the content of the file or directory `path` to the disk. Returns 0, also when its file
+/// system cannot do that for this kind of file, or an errno value.
+int SyncFile(const std::string& path);
+
+/// Does the same with the directory of `path`: new, renamed and removed names in it. Returns 0 also
+/// when the user may not read the directory.
+int SyncDirectoryOf(const std::string& path);
 
 }  // namespace vela

@@ -14,6 +14,7 @@
 #include <vector>
 
 #include "posix/file_version.h"
+#include "posix/identity.h"
 
 namespace vela {
 
@@ -74,7 +75,7 @@ FileDescriptor LinkFollower::Follow(int at, const FileDescriptor& link, const st
     return Failed(error);
   }
   FileDescriptor file = Open(at, target, flags);
-  if (!file.IsOpen() || status.st_uid == 0 || status.st_uid == geteuid()) {
+  if (!file.IsOpen() || status.st_uid == 0 || status.st_uid == FileUser()) {
     return file;
   }
   struct stat found = {};
@@ -262,7 +263,7 @@ bool IsInHeldFolder(const std::string& path) {
 }
 
 bool IsOwnFile(const struct stat& status) {
-  const bool isOwner = status.st_uid == geteuid() || status.st_uid == t_creator;
+  const bool isOwner = status.st_uid == FileUser() || status.st_uid == t_creator;
   return S_ISREG(status.st_mode) && status.st_nlink == 1 && isOwner;
 }
 

@@ -4,8 +4,9 @@
 // by a symbolic link between two system calls. Everything here therefore works on descriptors: a
 // folder is opened once, and its entries are reached through it by their names.
 //
-// A symbolic link is followed only when it is trusted: its owner is root, this process's effective
-// user, or the owner of what it leads to. Otherwise the calls below fail with ELOOP.
+// A symbolic link is followed only when it is trusted: its owner is root, the user with whose
+// rights this process accesses files, or the owner of what it leads to. Otherwise the calls below
+// fail with ELOOP.
 #pragma once
 
 #include <dirent.h>

@@ -5,6 +5,8 @@
 
 #include <cstdint>
 #include <initializer_list>
+#include <optional>
+#include <vector>
 
 namespace vela {
 
@@ -17,6 +19,26 @@ enum class ProcessState {
 
 /// Returns the state of the process `pid`, kGone for a number that no process can have.
 ProcessState StateOfProcess(long pid);
+
+/// Identifies a process for good: its id may be used again.
+struct ProcessIdentity {
+  pid_t pid = 0;
+  uint64_t startTime = 0;  ///< clock ticks since the start of the system
+};
+
+constexpr bool operator<(const ProcessIdentity& a, const ProcessIdentity& b) {
+  return a.pid != b.pid ? a.pid < b.pid : a.startTime < b.startTime;
+}
+
+/// What a process and its descendants have done until now.
+struct ProcessActivity {
+  uint64_t cpuTime = 0;  ///< clock ticks; includes children that have ended
+  uint64_t written = 0;  ///< bytes passed to write calls; 0 when that cannot be read
+  std::vector<ProcessIdentity> descendants;  ///< those that have not ended
+};
+
+/// Returns the activity of the process `pid`, nothing when it does not exist or cannot be examined.
+std::optional<ProcessActivity> ActivityOf(pid_t pid);
 
 /// Opens /dev/null for each standard descriptor that is closed, so that no file opened later gets
 /// its number.

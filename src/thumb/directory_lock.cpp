@@ -17,6 +17,7 @@ DirectoryLock::DirectoryLock(const std::string& path) {
   }
   if (TryLockExclusively(directory.Get()) != 0) {
     LogError(kProgramLogSource, 849, "Failed to lock " + path);
+    isRefused_ = true;
     return;
   }
   descriptor_ = std::move(directory);

@@ -18,8 +18,12 @@ class DirectoryLock {
 
   bool IsHeld() const { return descriptor_.IsOpen(); }
 
+  /// Returns whether the directory could be opened, but not locked.
+  bool IsRefused() const { return isRefused_; }
+
  private:
   FileDescriptor descriptor_;
+  bool isRefused_ = false;
 };
 
 }  // namespace vela

@@ -15,6 +15,7 @@
 #include "storage/file_helpers.h"
 #include "storage/log_source.h"
 #include "storage/photo_folder.h"
+#include "storage/unfinished_directories.h"
 #include "thumb/directory_lock.h"
 #include "thumb/photo_pass.h"
 
@@ -64,6 +65,7 @@ void QueueDirectory(const std::string& dir) {
   const OwnIdentity own;
   if (WriteIndexQueue(dir.c_str(), kPhotoQueue.file) != 0) {
     LogError(kProgramLogSource, 1112, "Failed to write [" + dir + "] to thumb queue");
+    NoteUnfinishedDirectory(dir, UnfinishedReason::kNotQueued);
   }
 }
 
@@ -97,6 +99,10 @@ void CreateDirectoryThumbs(const DirectoryJob& job) {
   {
     const HeldFolder root(metadataRoot);
     const DirectoryLock lock(metadataRoot);
+    if (lock.IsRefused()) {
+      const OwnIdentity own;
+      NoteUnfinishedDirectory(job.path, UnfinishedReason::kLocked);
+    }
     if (!lock.IsHeld()) {
       return;
     }

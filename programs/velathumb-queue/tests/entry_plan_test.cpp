@@ -132,5 +132,50 @@ TEST_F(EntryPlanTest, ManyEntriesThatOverlapAreAllHandedOut) {
   EXPECT_TRUE(plan.IsFinished());
 }
 
+TEST_F(EntryPlanTest, PostponedEntriesHideNoOther) {
+  constexpr size_t kCount = 3000;
+  std::vector<std::string> entries;
+  for (size_t i = 0; i <= kCount; ++i) {
+    entries.push_back('/' + std::to_string(i));
+  }
+  EntryPlan plan(entries);
+  for (size_t i = 0; i < kCount; ++i) {
+    ASSERT_THAT(plan.Start(now_), Optional(i));
+    plan.Postpone(i, now_ + seconds(60));
+  }
+  EXPECT_THAT(plan.Start(now_), Optional(kCount));
+}
+
+TEST_F(EntryPlanTest, EntriesThatOverlapHideNoOther) {
+  std::vector<std::string> entries(3000, "/same");
+  entries.emplace_back("/other");
+  EntryPlan plan(entries);
+  EXPECT_THAT(plan.Start(now_), Optional(0U));
+  EXPECT_THAT(plan.Start(now_), Optional(3000U));
+}
+
+TEST_F(EntryPlanTest, ARepeatedEntryComesAfterThoseNotStartedYet) {
+  EntryPlan plan({"/a", "/b", "/c"});
+  EXPECT_THAT(plan.Start(now_), Optional(0U));
+  plan.Postpone(0, now_);
+  for (const size_t number : {1U, 2U, 0U}) {
+    EXPECT_THAT(plan.Start(now_), Optional(number));
+    plan.Finish(number);
+  }
+  EXPECT_TRUE(plan.IsFinished());
+}
+
+TEST_F(EntryPlanTest, ReportsThePostponedEntriesWhenNoOthersAreLeft) {
+  EntryPlan plan({"/a", "/b", "/c"});
+  plan.Postpone(2, now_ + seconds(1));
+  plan.Postpone(0, now_ + seconds(2));
+  EXPECT_THAT(plan.OnlyPostponed(now_), IsEmpty());
+  EXPECT_THAT(plan.Start(now_), Optional(1U));
+  EXPECT_THAT(plan.OnlyPostponed(now_), IsEmpty());
+  plan.Finish(1);
+  EXPECT_THAT(plan.OnlyPostponed(now_), ElementsAre(0U, 2U));
+  EXPECT_THAT(plan.OnlyPostponed(now_ + seconds(1)), IsEmpty());
+}
+
 }  // namespace
 }  // namespace vela_test

@@ -1,4 +1,6 @@
 // The entries velathumb is started for, and their order.
+#include <algorithm>
+
 #include "queue_fixture.h"
 #include "support/profile_file.h"
 
@@ -110,6 +112,17 @@ TEST_F(QueueRunTest, EntriesThatAreQueuedAgainAndAgainAreDeferred) {
   velathumb_.Stub().Plan(StubPlan());
   EXPECT_EQ(velathumb_.Run().exitCode, 0);
   ExpectQueueDone();
+}
+
+TEST_F(QueueRunTest, AnEntryThatIsQueuedAgainAndAgainDefersNoOther) {
+  velathumb_.Stub().PlanWhen("/tmp/a", StubPlan().WriteFile(kQueueFile, "/tmp/a\n"));
+  // The other one comes when the first one would be deferred the next time.
+  velathumb_.Stub().PlanCall(18, StubPlan().WriteFile(kQueueFile, "/tmp/a\n/tmp/b\n"));
+  Enqueue({"/tmp/a", "/tmp/b"});
+  EXPECT_EQ(velathumb_.Run().exitCode, 1);
+  const std::vector<std::string> entries = velathumb_.Entries();
+  EXPECT_EQ(std::count(entries.begin(), entries.end(), "/tmp/b"), 2);
+  EXPECT_EQ(ReadFile(kLaterFile), "/tmp/a\n");
 }
 
 }  // namespace

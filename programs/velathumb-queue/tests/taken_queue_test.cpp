@@ -253,8 +253,8 @@ TEST_F(TakenQueueTest, AQueueWithItsGuardHeldIsNeverTaken) {
 TEST_F(TakenQueueTest, ADeferredEntryIsPutBack) {
   AppendToQueue({"/a", "/b", "/c"});
   ASSERT_EQ(taken_.Take(), Outcome::kTaken);
-  EXPECT_EQ(taken_.Defer("/c"), 0);
-  EXPECT_EQ(taken_.Defer("/a"), 0);
+  EXPECT_EQ(taken_.Defer({"/c"}), 0);
+  EXPECT_EQ(taken_.Defer({"/a"}), 0);
   EXPECT_EQ(ReadFile(kLaterFile), "/c\n/a\n");
   ExpectTake(Outcome::kResumed, {"/b"});
   EXPECT_EQ(taken_.Finish(), 0);
@@ -271,7 +271,7 @@ TEST_F(TakenQueueTest, WithoutDeferredEntriesNothingIsPutBack) {
 TEST_F(TakenQueueTest, AnEntryThatCannotBeDeferredIsNotMarkedAsDone) {
   TakeNewEntry();
   MakeDirectories(kLaterFile);
-  EXPECT_EQ(taken_.Defer("/a"), EISDIR);
+  EXPECT_EQ(taken_.Defer({"/a"}), EISDIR);
   EXPECT_FALSE(Exists(kJournalFile));
 }
 

@@ -26,7 +26,7 @@ constexpr int kFlags = O_RDWR | O_APPEND | O_CLOEXEC | O_NONBLOCK | O_NOCTTY;
 /// Gives a new queue its mode, whatever the umask. Its name is on the disk before the first entry:
 /// those who append to it later only wait for their entry. Returns 0 or an errno value.
 int FinishNewQueue(const char* path, int fd) {
-  return fchmod(fd, kQueueMode) == 0 ? vela::SyncNameOf(path) : errno;
+  return fchmod(fd, kQueueMode) == 0 ? vela::SyncDirectoryOf(path) : errno;
 }
 
 /// Opens the queue file, created when missing. Returns 0 or an errno value.
