@@ -21,6 +21,7 @@
 #include "header/header_reader.h"
 #include "posix/folder.h"
 #include "posix/identity.h"
+#include "posix/local_socket.h"
 #include "support/files.h"
 #include "support/images.h"
 #include "support/other_user.h"
@@ -142,6 +143,19 @@ TEST_F(HostileReader, ThatIsMissingIsLoggedOnce) {
   }
   EXPECT_THAT(ErrorLines(), testing::ElementsAre("libexec/velathumb/header-reader cannot be "
                                                  "started: No such file or directory"));
+}
+
+TEST(MessageSockets, AreNotWaitedForWithoutALimit) {
+  const MessageSockets sockets = ConnectMessageSockets();
+  ASSERT_EQ(LimitReceiving(sockets.other.Get(), seconds(1)), 0);
+  char byte = 0;
+  size_t got = 0;
+  FileDescriptor file;
+  EXPECT_EQ(ReceiveDescriptor(sockets.other.Get(), &byte, 1, got, file), EAGAIN);
+  EXPECT_EQ(SendDescriptor(sockets.own.Get(), "x", sockets.own.Get()), 0);
+  EXPECT_EQ(ReceiveDescriptor(sockets.other.Get(), &byte, 1, got, file), 0);
+  EXPECT_TRUE(file.IsOpen());
+  EXPECT_EQ(byte, 'x');
 }
 
 class HeaderReader : public SandboxTest {
