@@ -1,6 +1,7 @@
 // Pixel sizes of photos, from their headers.
 #include <sys/resource.h>
 
+#include "header/header_reader.h"
 #include "platform/platform_fixture.h"
 #include "support/build_paths.h"
 #include "support/images.h"
@@ -39,7 +40,10 @@ JpegRecipe WideRecipe() {
   return recipe;
 }
 
-class ImageSize : public SandboxTest {};
+class ImageSize : public SandboxTest {
+ protected:
+  void TearDown() override { vela::EndHeaderReader(); }
+};
 
 TEST_F(ImageSize, OfEveryKindThatImageMagickWrites) {
   for (const std::string extension :
