@@ -144,13 +144,25 @@ TEST_F(ImageSize, OfBitmapsByTheirHeader) {
 }
 
 TEST_F(ImageSize, OfAHugePictureCostsNoMemory) {
-  BitmapSize(20000, 10000);  // not counted: the library's one-time initialisation
+  BitmapSize(20000, 10000);  // not counted: the first question
   rusage before = {};
   getrusage(RUSAGE_SELF, &before);
   EXPECT_EQ(BitmapSize(20000, 10000), "20000x10000");
   rusage after = {};
   getrusage(RUSAGE_SELF, &after);
   EXPECT_LT(after.ru_maxrss - before.ru_maxrss, 1024) << "KiB more";
+}
+
+TEST_F(ImageSize, OfAHugePictureCostsTheReaderNoMemory) {
+  constexpr long kPixelsKib = 20000L * 10000 * 3 / 1024;
+  InOwnProcess([] {
+    EXPECT_EQ(BitmapSize(20000, 10000), "20000x10000");
+    vela::EndHeaderReader();
+    rusage reader = {};
+    getrusage(RUSAGE_CHILDREN, &reader);
+    EXPECT_GT(reader.ru_maxrss, 0);
+    EXPECT_LT(reader.ru_maxrss, kPixelsKib / 4);
+  });
 }
 
 TEST_F(ImageSize, OfPixmapsAsRawPhotosAreDecodedTo) {
