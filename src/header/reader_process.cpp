@@ -11,6 +11,7 @@
 
 #include "posix/child_process.h"
 #include "posix/deadline.h"
+#include "posix/identity.h"
 #include "posix/local_socket.h"
 #include "posix/log.h"
 
@@ -105,6 +106,8 @@ bool ReaderProcess::Start() {
   if (program_.empty()) {
     program_ = FindProgram();
   }
+  // It survives the work for a user, who could otherwise trace it.
+  const OwnIdentity own;
   MessageSockets sockets = ConnectMessageSockets();
   const int error =
       sockets.own.IsOpen() ? StartProgram(program_, sockets.other.Get(), pid_) : errno;
