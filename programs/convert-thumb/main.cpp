@@ -19,6 +19,7 @@
 #include "process/failure_report.h"
 #include "process/resource_limits.h"
 #include "process/source_file.h"
+#include "process/trusted_path.h"
 #include "process/unfinished_outputs.h"
 #include "process/write_signals.h"
 #include "thumbnails/thumbnails.h"
@@ -38,7 +39,7 @@ int LeaveToImageMagick(const CommandLine& line, size_t memoryLimit) {
 }
 
 int Convert(const ConversionPlan& plan, const CommandLine& line, size_t memoryLimit) {
-  const FileDescriptor file = OpenForReading(plan.source);
+  const FileDescriptor file = OpenTrusted(plan.source);
   if (!file.IsOpen()) {
     ReportFailure("cannot open %s: %s", plan.source.c_str(), std::strerror(errno));
     return kFailed;
@@ -51,7 +52,7 @@ int Convert(const ConversionPlan& plan, const CommandLine& line, size_t memoryLi
     return LeaveToImageMagick(line, memoryLimit);
   }
   ConfineToThisProgram();
-  return MakeThumbnails(*reader, plan, memoryLimit) ? kDone : kFailed;
+  return MakeThumbnails(*reader, plan, memoryLimit) && SyncOutputs() ? kDone : kFailed;
 }
 
 int Turn(const TurnPlan& plan, const CommandLine& line, size_t memoryLimit) {
@@ -93,7 +94,7 @@ int RunMain(int argc, char** argv) {
     ReportFailure("%s", error.what());
   }
   if (status != kDone) {
-    RemoveRegisteredOutputs();
+    RemoveOutputs();
     PrintFailure();
   }
   return status;

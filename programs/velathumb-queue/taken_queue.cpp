@@ -74,10 +74,12 @@ int TakenQueue::RemoveEmptyQueue(time_t modified) const {
 }
 
 int TakenQueue::MoveQueue() {
-  // A process that appends holds this lock and then checks that the file is still the queue:
-  // after the renaming no entry is written to it.
+  // A process that appends holds these locks and then checks that the file is still the queue:
+  // after the renaming no entry is written to it. The lock on the file itself is given up when
+  // others keep it; a program that uses only that one may then append to the taken file, which
+  // Finish notices.
   LockedFile queue;
-  const int error = LockFileAt(paths_.queue, queue);
+  const int error = LockFileAt(paths_.queue, queuePatience_, queue);
   if (error != 0) {
     return error;
   }
@@ -154,7 +156,7 @@ int TakenQueue::Defer(const std::string& entry) {
 
 int TakenQueue::RequeueDeferred() {
   // Appending would wait for the lock, whatever its kind.
-  if (LockedFile queue; LockFileAt(paths_.queue, queue) == EWOULDBLOCK) {
+  if (LockedFile queue; LockFileAt(paths_.queue, queuePatience_, queue) == EWOULDBLOCK) {
     return EWOULDBLOCK;
   }
   int error = 0;
@@ -171,7 +173,7 @@ int TakenQueue::RequeueDeferred() {
 
 int TakenQueue::Finish() {
   LockedFile taken;
-  int error = LockFileAt(paths_.taken, taken);
+  int error = LockFileAt(paths_.taken, takenPatience_, taken);
   if (error != 0 && error != ENOENT) {
     return error;
   }

@@ -8,6 +8,8 @@
 #include <unordered_set>
 #include <vector>
 
+#include "posix/file_lock.h"
+
 namespace vela {
 
 /// The queue and the files beside it.
@@ -66,6 +68,8 @@ class TakenQueue {
   const QueuePaths paths_;
   std::vector<std::string> entries_;
   uintmax_t readSize_ = 0;
+  LockPatience queuePatience_;
+  LockPatience takenPatience_;
 };
 
 }  // namespace vela

@@ -2,8 +2,6 @@
 
 #include <cerrno>
 #include <ctime>
-#include <filesystem>
-#include <system_error>
 
 #include "html_style.h"
 #include "html_tile.h"
@@ -13,29 +11,6 @@
 namespace vela {
 
 namespace {
-
-std::string DirectoryOf(const std::string& path) {
-  const size_t slash = path.rfind('/');
-  return slash == std::string::npos ? "." : path.substr(0, slash + 1);
-}
-
-/// Returns the file that a link leads to, which is replaced instead of the link.
-std::string ResolvedTarget(const std::string& path) {
-  std::error_code error;
-  const auto target = std::filesystem::canonical(path, error);
-  return error ? path : target.string();
-}
-
-/// Returns an errno value when `path` is something other than a regular file: a device, above all,
-/// must not be replaced by a file.
-int ErrorOfTarget(const std::string& path) {
-  std::error_code error;
-  const auto target = std::filesystem::status(path, error);
-  if (!std::filesystem::exists(target) || std::filesystem::is_regular_file(target)) {
-    return 0;
-  }
-  return std::filesystem::is_directory(target) ? EISDIR : EEXIST;
-}
 
 std::string Span(const std::string& text) {
   return "<span>" + text + "</span>";
@@ -139,10 +114,9 @@ constexpr const char* kPageEnd =
 }  // namespace
 
 HtmlPage::HtmlPage(const std::string& path)
-    : path_(ResolvedTarget(path)),
-      error_(ErrorOfTarget(path_)),
-      body_(DirectoryOf(path_), NewFile::Kind::kScratch),
-      photos_(DirectoryOf(path_), NewFile::Kind::kScratch) {}
+    : place_(path),
+      body_(place_, NewFile::Kind::kScratch),
+      photos_(place_, NewFile::Kind::kScratch) {}
 
 HtmlPage::~HtmlPage() = default;
 
@@ -160,7 +134,7 @@ void HtmlPage::Do(const Step& step) {
 }
 
 int HtmlPage::Error() const {
-  for (const int error : {error_, body_.Error(), photos_.Error()}) {
+  for (const int error : {place_.Error(), error_, body_.Error(), photos_.Error()}) {
     if (error != 0) {
       return error;
     }
@@ -202,12 +176,12 @@ void HtmlPage::TakeTotals(const StatusTotals& totals) {
 
 int HtmlPage::Finish() {
   Do([&] {
-    NewFile page(DirectoryOf(path_), NewFile::Kind::kResult);
+    NewFile page(place_, NewFile::Kind::kResult);
     page.Append(PageHead());
     page.Append(PageHeader(totals_, shares_));
     page.AppendAllOf(body_);
     page.Append(kPageEnd);
-    error_ = page.MoveTo(path_);
+    error_ = page.MoveToPlace();
   });
   return Error();
 }

@@ -14,8 +14,8 @@ namespace vela {
 /// than one thumbnail in memory.
 class HtmlPage : public StatusSink {
  public:
-  /// `path` is a new file, a file to replace, or a symbolic link to one. Anything else there (a
-  /// directory, a device) is kept and makes Finish fail.
+  /// `path` is a new file, a file to replace, or a symbolic link to one, see FilePlace. Anything
+  /// else there (a directory, a device) is kept and makes Finish fail.
   explicit HtmlPage(const std::string& path);
   /// Removes what was written of an unfinished page.
   ~HtmlPage() override;
@@ -36,8 +36,8 @@ class HtmlPage : public StatusSink {
   template <typename Step>
   void Do(const Step& step);
 
-  const std::string path_;
-  int error_;  // apart from the errors of its files
+  const FilePlace place_;
+  int error_ = 0;  // apart from the errors of its place and files
   NewFile body_;
   NewFile photos_;  // of the current directory, until its counts are known
   ThumbShares directoryShares_;

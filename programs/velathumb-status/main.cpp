@@ -19,6 +19,7 @@
 #include "progress_report.h"
 #include "progress_watch.h"
 #include "queue_report.h"
+#include "security_report.h"
 #include "status_scan.h"
 #include "text_encoding.h"
 #include "text_report.h"
@@ -81,6 +82,7 @@ class StatusRun {
   void ReportQueues();
   void ReportProgress();
   void ReportResumeTime();
+  void ReportSecurity();
   void AddPageError(int error);
   void AddError(const std::string& path, const std::string& message);
   void AddWork(bool hasWork) { hasWork_ = hasWork_ || hasWork; }
@@ -167,6 +169,15 @@ void StatusRun::ReportResumeTime() {
   }
 }
 
+void StatusRun::ReportSecurity() {
+  const SecurityState state = ReadSecurityState();
+  if (options_.json) {
+    json_.Member("security", DescribeSecurity(state));
+  } else {
+    WriteSecurityText(std::cout, state);
+  }
+}
+
 void StatusRun::Watch() {
   AddWork(WatchProgress(std::cout, IsOutputTerminal(), options_.json));
 }
@@ -184,6 +195,9 @@ void StatusRun::Report() {
   }
   if (options_.resumeTime) {
     ReportResumeTime();
+  }
+  if (options_.security) {
+    ReportSecurity();
   }
   if (options_.json) {
     json_.Member("errors", errors_);

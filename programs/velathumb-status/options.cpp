@@ -40,10 +40,12 @@ void AddOptions(CLI::App& app, Options& options) {
   app.add_flag("--progress", options.progress, "show the counters of conversion progress");
   auto* resumeTime =
       app.add_flag("--resume-time", options.resumeTime, "show until when conversion is paused");
+  auto* security = app.add_flag("--security", options.security, "show how the tools are confined");
   app.add_flag("-w,--watch", options.watch, "follow the progress until no velathumb is running")
       ->excludes(directories)
       ->excludes(queue)
-      ->excludes(resumeTime);
+      ->excludes(resumeTime)
+      ->excludes(security);
   app.add_flag("-j,--json", options.json, "write JSON");
 }
 
@@ -51,9 +53,9 @@ void AddOptions(CLI::App& app, Options& options) {
 /// an empty text.
 std::string FindContradiction(const Options& options) {
   const bool hasQuery = !options.directories.empty() || options.queue || options.progress ||
-                        options.watch || options.resumeTime;
+                        options.watch || options.resumeTime || options.security;
   if (!hasQuery) {
-    return "give a directory, --queue, --progress, --watch or --resume-time";
+    return "give a directory, --queue, --progress, --watch, --resume-time or --security";
   }
   if (options.checkVideos && options.directories.empty() && !options.queue) {
     return "--check-videos needs a directory or --queue";

@@ -18,6 +18,7 @@ struct Options {
   bool progress = false;
   bool watch = false;
   bool resumeTime = false;
+  bool security = false;  ///< show how the tools are confined
   bool json = false;
   std::string htmlFile;  ///< empty: no page
 };

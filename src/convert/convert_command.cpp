@@ -2,7 +2,7 @@
 
 #include "platform/velaindex.h"
 #include "platform/velautils.h"
-#include "posix/files.h"
+#include "posix/folder.h"
 #include "posix/truncated_text.h"
 
 using namespace vela;

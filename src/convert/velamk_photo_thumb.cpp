@@ -1,6 +1,7 @@
 #include "convert/velamk_photo_thumb.h"
 
 #include <algorithm>
+#include <cerrno>
 #include <cstring>
 #include <ctime>
 
@@ -8,7 +9,10 @@
 #include "platform/velaindex.h"
 #include "platform/velautils.h"
 #include "platform/vlibc.h"
+#include "posix/file_content.h"
+#include "posix/file_descriptor.h"
 #include "posix/files.h"
+#include "posix/folder.h"
 #include "posix/log.h"
 #include "posix/truncated_text.h"
 
@@ -43,7 +47,7 @@ void AddCommand(VELAUtils::ProcessRunner& runner, const PhotoConvertJob& job,
 
 void RemoveTempOutputs(const PhotoConvertJob& job) {
   for (const PhotoThumbSetting& setting : job.settings) {
-    RemoveFile(setting.tempPath);
+    RemoveEntry(setting.tempPath);
   }
 }
 
@@ -53,27 +57,56 @@ bool IsSourceChanged(const VLIBCFileStatus& source, int64_t oldBlocks, int64_t o
   return source.size != oldSize && source.blocks != oldBlocks;
 }
 
-/// Returns the size of the thumbnail in bytes, 0 when it cannot be examined.
-int64_t ThumbSize(const std::string& destPath) {
-  const auto status = ExamineFile(destPath);
-  return status ? status->size : 0;
+/// The output while it is moved into place. The descriptor keeps it apart from whatever other users
+/// put under its names.
+class Output {
+ public:
+  explicit Output(const PhotoThumbSetting& setting)
+      : temp_(setting.tempPath), dest_(setting.destPath), file_(temp_.OpenOwn()) {}
+
+  /// Gives the file its mode, stores it on the disk and renames it. Returns 0 or an errno value;
+  /// `modeError` receives that of setting the mode, which is no failure.
+  int Publish(int& modeError) const;
+
+  /// Returns its size in bytes, 0 when the thumbnail is another file.
+  int64_t Size() const { return dest_.IsFile(file_.Get()) ? SizeOfFile(file_.Get()) : 0; }
+
+  void RemoveTemp() const { temp_.Remove(); }
+  void RemoveThumb() const { dest_.Remove(); }
+
+ private:
+  FolderEntry temp_;
+  FolderEntry dest_;
+  FileDescriptor file_;
+};
+
+int Output::Publish(int& modeError) const {
+  if (!file_.IsOpen()) {
+    return EPERM;
+  }
+  modeError = SetFileMode(file_.Get(), kThumbMode);
+  // A name on the disk must not outlive the data in a power failure.
+  const int error = SyncFile(file_.Get());
+  return error != 0 ? error : temp_.RenameTo(dest_);
 }
 
 /// Moves one output into place. Returns false, and removes the output, when it is unusable.
 bool CommitOutput(const PhotoThumbSetting& setting, const VLIBCFileStatus& source, time_t now) {
-  const std::string& temp = setting.tempPath;
   const std::string& dest = setting.destPath;
-  if (RenameFile(temp, dest) != 0) {
-    LogError(kLogSource, 430, "[Error] rename: " + temp + ", " + dest);
-    RemoveFile(temp);
+  const Output output(setting);
+  int modeError = 0;
+  if (output.Publish(modeError) != 0) {
+    LogError(kLogSource, 430, "[Error] rename: " + setting.tempPath + ", " + dest);
+    output.RemoveTemp();
     return false;
   }
-  if (const int error = SetFileMode(dest, kThumbMode); error != 0) {
-    LogError(kLogSource, 437, "[Error] Failed to chmod [" + dest + "], " + std::strerror(error));
+  if (modeError != 0) {
+    LogError(kLogSource, 437,
+             "[Error] Failed to chmod [" + dest + "], " + std::strerror(modeError));
   }
-  const int64_t size = ThumbSize(dest);
+  const int64_t size = output.Size();
   if (size < kSmallestThumb) {
-    RemoveFile(dest);
+    output.RemoveThumb();
     LogError(
         kLogSource, 441,
         "[Error] file size of dest path: " + std::to_string(static_cast<int>(size)) + ", " + dest);

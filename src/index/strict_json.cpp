@@ -99,6 +99,25 @@ bool HasExtensions(std::string_view text) {
   return false;
 }
 
+/// Returns true when objects and lists contain each other deeper than kJsonLevelsMax. For text that
+/// is not valid JSON, the answer is an upper bound of what a parser can see before it notices.
+bool IsTooDeep(std::string_view text) {
+  int level = 0;
+  for (size_t at = 0; at < text.size(); ++at) {
+    const char c = text[at];
+    if (c == '"') {
+      at = EndOfString(text, at) - 1;
+    } else if (c == '{' || c == '[') {
+      if (++level > kJsonLevelsMax) {
+        return true;
+      }
+    } else if ((c == '}' || c == ']') && level > 0) {
+      --level;
+    }
+  }
+  return false;
+}
+
 }  // namespace
 
 std::string ToJsonText(const Json::Value& value) {
@@ -109,7 +128,7 @@ std::string ToJsonText(const Json::Value& value) {
 bool ReadJsonObject(std::string_view text, DuplicateKeys duplicates, Json::Value& object) {
   static const Json::CharReaderBuilder lenient = MakeReaderBuilder(DuplicateKeys::kLastWins);
   static const Json::CharReaderBuilder strict = MakeReaderBuilder(DuplicateKeys::kRejected);
-  if (HasExtensions(text)) {
+  if (IsTooDeep(text) || HasExtensions(text)) {
     return false;
   }
   const Json::CharReaderBuilder& builder =
@@ -121,7 +140,7 @@ bool ReadJsonObject(std::string_view text, DuplicateKeys duplicates, Json::Value
   } catch (const std::bad_alloc&) {
     throw;
   } catch (const std::exception&) {
-    // For example nested more deeply than JsonCpp allows.
+    // JsonCpp also throws where it could return an error, for example at its own limit of depth.
     return false;
   }
 }

@@ -23,6 +23,17 @@ inline constexpr uint64_t kLeastFreeSpace = uint64_t{1} << 30;
 /// Marks an argument or a queue entry as a directory tree.
 inline constexpr char kTreePrefix[] = "R:";
 
+/// The tools that are not confined: a file that only root can change, with the absolute path of a
+/// program on each line. It exists only if an administrator has made it.
+inline constexpr char kUnconfinedToolsFile[] = "/usr/vela/etc/unconfined-tools";
+
+/// Bytes of that file at most; a longer one is ignored.
+inline constexpr uint64_t kUnconfinedToolsSize = 65536;
+
+/// Bytes of memory that a tool without a limit of its own may use, and of a file that it may write.
+inline constexpr uint64_t kToolMemory = uint64_t{2} << 30;
+inline constexpr uint64_t kToolFileSize = uint64_t{4} << 30;
+
 /// Number of size classes of thumbnails.
 inline constexpr int kThumbSizeCount = 6;
 

@@ -16,6 +16,7 @@
 #include <memory>
 #include <new>
 #include <string>
+#include <vector>
 
 #include "posix/child_status_keeper.h"
 #include "posix/deadline.h"
@@ -35,11 +36,16 @@ constexpr size_t kChildStackSize = 64 * 1024;
 /// For a child to run its program.
 constexpr std::chrono::seconds kStartLimit{10};
 
+/// The environment of every confined child.
+constexpr const char* kEnvironment[] = {"PATH=/usr/sbin:/usr/bin:/sbin:/bin", "LC_ALL=C", "HOME=/"};
+
 /// The child's task, in memory that it shares with its parent until the program runs.
 struct ChildPlan {
   const char* program;
   char* const* arguments;
-  const ChildStreams* streams;  ///< null for a child that keeps those of its parent
+  const ChildStreams* streams;             ///< null for a child that keeps those of its parent
+  const PreparedConfinement* confinement;  ///< null for a child that is not confined
+  char* const* environment;
   pid_t parent;
   char commandName[kCommandNameSize];
   int error;
@@ -89,12 +95,7 @@ bool SetStreams(const ChildStreams& streams) {
   if (dup2(input, STDIN_FILENO) < 0 || dup2(output, STDOUT_FILENO) < 0) {
     return false;
   }
-  if (dup2(error, STDERR_FILENO) < 0) {
-    return false;
-  }
-  // Also descriptors that this program has inherited itself.
-  closefrom(kFirstOtherDescriptor);
-  return true;
+  return dup2(error, STDERR_FILENO) >= 0;
 }
 
 bool EndWithParent(pid_t parent) {
@@ -135,10 +136,18 @@ int BecomeProgram(const ChildPlan& plan) {
   if (!isAttached && !SetStreams(*plan.streams)) {
     return errno;
   }
+  const int error = plan.confinement == nullptr ? 0 : plan.confinement->Enter();
+  if (error != 0) {
+    return error;
+  }
+  if (!isAttached) {
+    // Also descriptors that this program has inherited itself.
+    closefrom(kFirstOtherDescriptor);
+  }
   if (!UnblockSignals()) {
     return errno;
   }
-  execve(plan.program, plan.arguments, environ);
+  execve(plan.program, plan.arguments, plan.environment);
   return errno;
 }
 
@@ -148,11 +157,22 @@ int RunChild(void* data) {
   _exit(127);
 }
 
-ChildPlan MakePlan(const char* program, char* const arguments[], const ChildStreams* streams) {
-  ChildPlan plan{program, arguments, streams, getpid(), {}, 0};
-  const char* slash = strrchr(program, '/');
-  strncpy(plan.commandName, slash == nullptr ? program : slash + 1, kCommandNameSize - 1);
-  return plan;
+void SetCommandName(ChildPlan& plan) {
+  const char* slash = strrchr(plan.program, '/');
+  strncpy(plan.commandName, slash == nullptr ? plan.program : slash + 1, kCommandNameSize - 1);
+}
+
+/// Returns pointers to the environment of a confined child, ended by a null pointer.
+std::vector<char*> MakeEnvironment(const Confinement& confinement) {
+  std::vector<char*> environment;
+  for (const char* const variable : kEnvironment) {
+    environment.push_back(const_cast<char*>(variable));
+  }
+  for (const std::string& variable : confinement.environment) {
+    environment.push_back(const_cast<char*>(variable.c_str()));
+  }
+  environment.push_back(nullptr);
+  return environment;
 }
 
 /// Waits until the kernel clears `isSharing`, which it does when the child stops sharing its
@@ -243,11 +263,11 @@ bool HasEnded(pid_t pid) {
   return result != 0 || info.si_pid == pid;
 }
 
-int StartPlanned(const char* program, char* const arguments[], const ChildStreams* streams,
-                 pid_t& pid) {
+int StartPlanned(ChildPlan& plan, pid_t& pid) {
   // A signal handler that ends the children must not run before this one's process id is known.
   const SignalBlock noSignals;
-  ChildPlan plan = MakePlan(program, arguments, streams);
+  SetCommandName(plan);
+  plan.parent = getpid();
   KeepChildStatus();
   const pid_t child = CloneChild(plan);
   if (child < 0) {
@@ -266,12 +286,20 @@ int StartPlanned(const char* program, char* const arguments[], const ChildStream
 }  // namespace
 
 int StartChild(const char* program, char* const arguments[], const ChildStreams& streams,
-               pid_t& pid) {
-  return StartPlanned(program, arguments, &streams, pid);
+               const Confinement& confinement, pid_t& pid) {
+  PreparedConfinement prepared;
+  const int error = prepared.Prepare(confinement);
+  if (error != 0) {
+    return error;
+  }
+  const std::vector<char*> environment = MakeEnvironment(confinement);
+  ChildPlan plan = {program, arguments, &streams, &prepared, environment.data(), 0, {}, 0};
+  return StartPlanned(plan, pid);
 }
 
 int StartAttachedChild(const char* program, char* const arguments[], pid_t& pid) {
-  return StartPlanned(program, arguments, nullptr, pid);
+  ChildPlan plan = {program, arguments, nullptr, nullptr, environ, 0, {}, 0};
+  return StartPlanned(plan, pid);
 }
 
 void AwaitChild(pid_t pid) {
@@ -329,6 +357,12 @@ void ReapInheritedChildren(const std::function<bool(pid_t)>& isOwn) {
 
 void TerminateChild(pid_t pid) {
   kill(pid, SIGTERM);
+}
+
+void KillChild(pid_t pid) {
+  if (!HasEnded(pid)) {
+    kill(pid, SIGKILL);
+  }
 }
 
 bool HasSucceeded(int waitStatus) {

@@ -7,6 +7,8 @@
 #include <functional>
 #include <optional>
 
+#include "posix/confinement.h"
+
 namespace vela {
 
 /// Where a child's output goes; -1 means /dev/null.
@@ -19,13 +21,15 @@ struct ChildStreams {
 /// child reads /dev/null, has no descriptors besides the two outputs, default signal handling, its
 /// own process group and, from the start, the command name of the program. It runs as the user with
 /// whose rights the calling thread accesses files (see identity.h) and gets SIGTERM when that
-/// thread ends before it. Returns 0 and stores the process id once the program itself runs, or
-/// returns an errno value. The child must be handed to ReapChild.
+/// thread ends before it. It inherits no environment: it gets PATH, LC_ALL, HOME and the variables
+/// of `confinement`, which it enters before the program runs. Returns 0 and stores the process id
+/// once the program itself runs, or returns an errno value. The child must be handed to ReapChild.
 int StartChild(const char* program, char* const arguments[], const ChildStreams& streams,
-               pid_t& pid);
+               const Confinement& confinement, pid_t& pid);
 
 /// Starts a child that remains part of the calling program: it keeps the caller's standard streams,
-/// inheritable descriptors, ignored signals and process group. Otherwise as StartChild.
+/// inheritable descriptors, ignored signals, process group and environment, and is not confined.
+/// Otherwise as StartChild.
 int StartAttachedChild(const char* program, char* const arguments[], pid_t& pid);
 
 /// Waits until the child has ended; its process id is not reused before ReapChild.
@@ -52,6 +56,9 @@ void ReapInheritedChildren(const std::function<bool(pid_t)>& isOwn);
 
 /// Sends SIGTERM to the child alone, not to its descendants.
 void TerminateChild(pid_t pid);
+
+/// Kills the child alone, unless it has ended.
+void KillChild(pid_t pid);
 
 /// Returns whether a wait status is that of a program that exited with 0.
 bool HasSucceeded(int waitStatus);

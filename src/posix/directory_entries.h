@@ -4,14 +4,18 @@
 #include <dirent.h>
 
 #include <memory>
+#include <string>
+
+#include "posix/folder.h"
 
 namespace vela {
 
-/// An open directory, closed with the object.
+/// An open directory, closed with the object. Of the links in its path only those that can be
+/// trusted are followed (posix/folder.h).
 class DirectoryEntries {
  public:
   DirectoryEntries() = default;
-  explicit DirectoryEntries(const char* dir) : stream_(opendir(dir)) {}
+  explicit DirectoryEntries(const std::string& dir) : stream_(OpenDirectoryStream(dir)) {}
 
   bool IsOpen() const { return stream_ != nullptr; }
 

@@ -1,6 +1,7 @@
 #include "posix/file_content.h"
 
 #include <fcntl.h>
+#include <sys/mman.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
@@ -17,6 +18,7 @@ namespace vela {
 namespace {
 
 constexpr size_t kChunkSize = 16384;
+constexpr mode_t kWritableByOthers = S_IWGRP | S_IWOTH;
 
 int AppendToEnd(int fd, std::string& content) {
   char chunk[kChunkSize];
@@ -28,6 +30,16 @@ int AppendToEnd(int fd, std::string& content) {
     }
     content.append(chunk, got);
   }
+}
+
+/// Returns the content of a regular file; empty for one of more than `limit` bytes and on errors.
+std::string ReadSmall(const FileDescriptor& file, const struct stat& status, size_t limit) {
+  if (!S_ISREG(status.st_mode) || static_cast<uint64_t>(status.st_size) > limit) {
+    return {};
+  }
+  const auto size = static_cast<size_t>(status.st_size);
+  std::string content = ReadAt(file.Get(), 0, size);
+  return content.size() == size ? content : std::string();
 }
 
 }  // namespace
@@ -92,12 +104,35 @@ std::string ReadSmallFile(const std::string& path, size_t limit) {
   if (!file.IsOpen() || fstat(file.Get(), &status) != 0) {
     return {};
   }
-  if (!S_ISREG(status.st_mode) || static_cast<uint64_t>(status.st_size) > limit) {
+  return ReadSmall(file, status, limit);
+}
+
+std::string ReadSystemFile(const std::string& path, size_t limit) {
+  const FileDescriptor file = OpenForReading(path);
+  struct stat status = {};
+  if (!file.IsOpen() || fstat(file.Get(), &status) != 0) {
     return {};
   }
-  const auto size = static_cast<size_t>(status.st_size);
-  std::string content = ReadAt(file.Get(), 0, size);
-  return content.size() == size ? content : std::string();
+  const bool isProtected = status.st_uid == 0 && (status.st_mode & kWritableByOthers) == 0;
+  return isProtected ? ReadSmall(file, status, limit) : std::string();
+}
+
+unsigned char* FileMapping::Map(int fd, size_t size) {
+  Unmap();
+  void* const memory = mmap(nullptr, size, PROT_READ, MAP_PRIVATE, fd, 0);
+  if (memory == MAP_FAILED) {
+    return nullptr;
+  }
+  memory_ = memory;
+  size_ = size;
+  return static_cast<unsigned char*>(memory);
+}
+
+void FileMapping::Unmap() {
+  if (memory_ != nullptr) {
+    munmap(memory_, size_);
+    memory_ = nullptr;
+  }
 }
 
 int WriteAll(int fd, std::string_view content) {
@@ -106,6 +141,48 @@ int WriteAll(int fd, std::string_view content) {
     if (written >= 0) {
       content.remove_prefix(static_cast<size_t>(written));
     } else if (errno != EINTR) {
+      return errno;
+    }
+  }
+  return 0;
+}
+
+int AppendWhole(int fd, std::string_view text) {
+  ssize_t written = -1;
+  do {
+    written = write(fd, text.data(), text.size());
+  } while (written < 0 && errno == EINTR);
+  if (written == static_cast<ssize_t>(text.size())) {
+    return 0;
+  }
+  if (written < 0) {
+    return errno;
+  }
+  // A part of a line would be read as another one. What others have appended behind it stays.
+  const off_t end = lseek(fd, 0, SEEK_CUR);
+  struct stat status = {};
+  if (end < written || fstat(fd, &status) != 0 || status.st_size != end) {
+    return ENOSPC;
+  }
+  return ftruncate(fd, end - written) == 0 ? ENOSPC : errno;
+}
+
+bool LacksFinalNewline(int fd) {
+  struct stat status = {};
+  if (fstat(fd, &status) == 0 && status.st_size == 0) {
+    return false;
+  }
+  return ReadAt(fd, status.st_size - 1, 1) != "\n";
+}
+
+int FlushFile(int fd) {
+  const int copy = fcntl(fd, F_DUPFD_CLOEXEC, 0);
+  return copy >= 0 && close(copy) == 0 ? 0 : errno;
+}
+
+int SyncFile(int fd) {
+  while (fdatasync(fd) != 0) {
+    if (errno != EINTR) {
       return errno;
     }
   }

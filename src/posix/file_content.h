@@ -31,7 +31,47 @@ int ReadFile(const char* path, std::string& content);
 /// writer.
 std::string ReadSmallFile(const std::string& path, size_t limit);
 
+/// Returns the content of the regular file `path` if only root can change it: root owns it and it
+/// is not writable for its group or others. Empty otherwise, for a file of more than `limit` bytes,
+/// and on errors. Never waits for a pipe's writer.
+std::string ReadSystemFile(const std::string& path, size_t limit);
+
+/// The content of a file as memory that cannot be written to. Where the file has become shorter
+/// since, reading it ends the process.
+class FileMapping {
+ public:
+  FileMapping() = default;
+  FileMapping(const FileMapping&) = delete;
+  FileMapping& operator=(const FileMapping&) = delete;
+  ~FileMapping() { Unmap(); }
+
+  /// Maps the first `size` bytes of the file instead of what is mapped. Returns null, with errno
+  /// set, on failure, also for size 0.
+  unsigned char* Map(int fd, size_t size);
+  void Unmap();
+
+ private:
+  void* memory_ = nullptr;
+  size_t size_ = 0;
+};
+
 /// Writes all of `content` to `fd`. Returns 0 or an errno value.
 int WriteAll(int fd, std::string_view content);
+
+/// Appends `text` to `fd`, which was opened with O_APPEND and for reading, in one write: completely
+/// or not at all, unless the remains of a failed write cannot be removed. Returns 0 or an errno
+/// value.
+int AppendWhole(int fd, std::string_view text);
+
+/// Returns true when the file is not empty and its last line has no newline at its end, or when
+/// that is unknown.
+bool LacksFinalNewline(int fd);
+
+/// Returns an error that was only noticed after the writing, as some file systems do when a file is
+/// closed: 0 or an errno value.
+int FlushFile(int fd);
+
+/// Waits until the content of the file is on the disk. Returns 0 or an errno value.
+int SyncFile(int fd);
 
 }  // namespace vela

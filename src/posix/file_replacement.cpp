@@ -18,6 +18,10 @@ namespace {
 
 constexpr mode_t kNewFileMode = 0644;
 constexpr mode_t kPermissionBits = 07777;
+constexpr mode_t kBitsOfOthers = 077;
+
+/// A writer that was killed leaves its file; more of them are the work of another process.
+constexpr int kOpenTries = 100;
 
 /// The new file while it is written, next to its target and under the same name for all writers, so
 /// that the next writer finds and removes one left by a killed writer. Its lock shows whether its
@@ -45,6 +49,7 @@ class ScratchFile {
 
  private:
   int OpenOnce(bool& isReady);
+  int Remove() const { return unlink(Path()) == 0 || errno == ENOENT ? 0 : errno; }
 
   std::string path_;
   FileDescriptor file_;
@@ -53,13 +58,13 @@ class ScratchFile {
 
 int ScratchFile::Open() {
   bool isReady = false;
-  while (!isReady) {
+  for (int i = 0; i < kOpenTries && !isReady; ++i) {
     const int error = OpenOnce(isReady);
     if (error != 0) {
       return error;
     }
   }
-  return 0;
+  return isReady ? 0 : EBUSY;
 }
 
 int ScratchFile::OpenOnce(bool& isReady) {
@@ -68,12 +73,21 @@ int ScratchFile::OpenOnce(bool& isReady) {
   if (!file.IsOpen()) {
     return errno;
   }
-  const int error = LockExclusively(file.Get());
+  struct stat own;
+  if (fstat(file.Get(), &own) != 0) {
+    return errno;
+  }
+  if (!S_ISREG(own.st_mode)) {
+    return EEXIST;
+  }
+  // No writer of this user has made it, or it was complete except for its name. Other users can
+  // have locked it.
+  const bool isPrivate = own.st_uid == geteuid() && (own.st_mode & kBitsOfOthers) == 0;
+  const int error = LockExclusively(file.Get(), kForeignLockLimit);
   if (error != 0) {
-    return error;
+    return error == EWOULDBLOCK && !isPrivate ? Remove() : error;
   }
 
-  struct stat own;
   struct stat named;
   if (fstat(file.Get(), &own) != 0) {
     return errno;
@@ -84,16 +98,20 @@ int ScratchFile::OpenOnce(bool& isReady) {
   if (!IsSameFile(own, named)) {
     return 0;
   }
-  if (!S_ISREG(own.st_mode)) {
-    return EEXIST;
-  }
-  if (own.st_size != 0 || own.st_nlink != 1) {
-    return unlink(Path()) == 0 ? 0 : errno;
+  if (!isPrivate || own.st_size != 0 || own.st_nlink != 1) {
+    return Remove();
   }
   file_ = std::move(file);
   status_ = own;
   isReady = true;
   return 0;
+}
+
+/// Also returns what some file systems report only when a file is closed, such as an exceeded
+/// quota. The file itself stays open, because closing it would release its lock.
+int WriteCompletely(int fd, std::string_view content) {
+  const int error = WriteAll(fd, content);
+  return error != 0 ? error : FlushFile(fd);
 }
 
 /// Renames unless `to` exists. Returns 0 or an errno value.
@@ -119,12 +137,12 @@ int CreateAtomically(const std::string& path, std::string_view content) {
   if (error != 0) {
     return error;
   }
-  if (fchmod(scratch.Fd(), kNewFileMode) != 0) {
-    return errno;
-  }
-  error = WriteAll(scratch.Fd(), content);
+  error = WriteCompletely(scratch.Fd(), content);
   if (error != 0) {
     return error;
+  }
+  if (fchmod(scratch.Fd(), kNewFileMode) != 0) {
+    return errno;
   }
   error = RenameToFreeName(scratch.Path(), path.c_str());
   if (error == 0) {
@@ -139,6 +157,10 @@ int ReplaceAtomically(const std::string& path, std::string_view content, const s
   if (error != 0) {
     return error;
   }
+  error = WriteCompletely(scratch.Fd(), content);
+  if (error != 0) {
+    return error;
+  }
   const struct stat& own = scratch.Status();
   const bool isOwnerDifferent = own.st_uid != old.st_uid || own.st_gid != old.st_gid;
   if (isOwnerDifferent && fchown(scratch.Fd(), old.st_uid, old.st_gid) != 0) {
@@ -146,10 +168,6 @@ int ReplaceAtomically(const std::string& path, std::string_view content, const s
   }
   if (fchmod(scratch.Fd(), old.st_mode & kPermissionBits) != 0) {
     return errno;
-  }
-  error = WriteAll(scratch.Fd(), content);
-  if (error != 0) {
-    return error;
   }
   // No fsync: losing the last change in a power failure costs less than waiting for the disk at
   // every change.

@@ -5,8 +5,10 @@
 #include <unistd.h>
 
 #include <cerrno>
-#include <cstdio>
-#include <cstdlib>
+
+#include "posix/folder.h"
+
+#include "posix/file_content.h"
 
 namespace vela {
 
@@ -22,9 +24,15 @@ bool IsRegularFileMode(uint32_t mode) {
   return S_ISREG(mode);
 }
 
+bool IsDirectoryMode(uint32_t mode) {
+  return S_ISDIR(mode);
+}
+
 std::optional<FileStatus> ExamineFile(const char* path) {
   struct stat status = {};
-  if (stat(path, &status) != 0) {
+  const int error = path == nullptr ? EFAULT : ReadStatus(path, status);
+  if (error != 0) {
+    errno = error;
     return std::nullopt;
   }
   return FileStatus{S_ISREG(status.st_mode), S_ISDIR(status.st_mode),
@@ -59,21 +67,23 @@ FileDescriptor OpenForReading(const std::string& path) {
   return FileDescriptor(open(path.c_str(), O_RDONLY | O_NONBLOCK | O_NOCTTY | O_CLOEXEC));
 }
 
-FileDescriptor CreateEmptyFile(const std::string& path, unsigned mode) {
-  const int flags = O_WRONLY | O_CREAT | O_TRUNC | O_NONBLOCK | O_NOCTTY | O_CLOEXEC;
-  return FileDescriptor(open(path.c_str(), flags, mode));
+bool IsProgramToTrust(const std::string& path) {
+  struct stat self = {};
+  struct stat program = {};
+  if (stat("/proc/self/exe", &self) != 0 || lstat(path.c_str(), &program) != 0) {
+    return false;
+  }
+  const bool isOurs = program.st_uid == 0 || program.st_uid == self.st_uid;
+  return S_ISREG(program.st_mode) && isOurs && (program.st_mode & S_IWOTH) == 0;
 }
 
-int CreateDirectory(const std::string& path, unsigned mode) {
-  return ErrnoUnless(mkdir(path.c_str(), mode) == 0);
+int SetFileMode(int fd, unsigned mode) {
+  return ErrnoUnless(fchmod(fd, mode) == 0);
 }
 
-int SetFileMode(const std::string& path, unsigned mode) {
-  return ErrnoUnless(chmod(path.c_str(), mode) == 0);
-}
-
-int RenameFile(const std::string& from, const std::string& to) {
-  return ErrnoUnless(std::rename(from.c_str(), to.c_str()) == 0);
+int64_t SizeOfFile(int fd) {
+  struct stat status = {};
+  return fstat(fd, &status) == 0 ? int64_t{status.st_size} : 0;
 }
 
 int RemoveFile(const std::string& path) {
@@ -86,31 +96,24 @@ int RemoveFileIfPresent(const std::string& path) {
 }
 
 int AppendLine(const std::string& path, const std::string& text) {
-  const int flags = O_WRONLY | O_CREAT | O_APPEND | O_NOCTTY | O_CLOEXEC;
-  const FileDescriptor file(open(path.c_str(), flags, 0644));
+  const int flags = O_RDWR | O_CREAT | O_APPEND | O_NONBLOCK | O_NOCTTY | O_CLOEXEC;
+  FileDescriptor file(open(path.c_str(), flags, 0644));
   if (!file.IsOpen()) {
     return errno;
   }
-  const off_t end = lseek(file.Get(), 0, SEEK_END);
-  const std::string line = text + '\n';
-  const ssize_t written = write(file.Get(), line.data(), line.size());
-  if (written < 0) {
-    return errno;
-  }
-  if (written == static_cast<ssize_t>(line.size())) {
-    return 0;
-  }
-  return ftruncate(file.Get(), end) == 0 ? ENOSPC : errno;
+  const int error = AppendWhole(file.Get(), text + '\n');
+  return error != 0 || file.Close() ? error : errno;
 }
 
-std::string FindUnusedPath(const std::string& nameTemplate) {
-  std::string path = nameTemplate;
-  const FileDescriptor file(mkostemp(path.data(), O_CLOEXEC));
-  if (!file.IsOpen()) {
-    return {};
+int SyncNameOf(const std::string& path) {
+  const std::string name = path.substr(0, path.rfind('/') + 1);
+  const FileDescriptor directory = OpenForReading(name.empty() ? "." : name);
+  if (!directory.IsOpen()) {
+    // A user may be allowed to create files there, but not to read the directory.
+    return errno == EACCES ? 0 : errno;
   }
-  unlink(path.c_str());
-  return path;
+  // EINVAL: the file system has nothing to wait for.
+  return fsync(directory.Get()) == 0 || errno == EINVAL ? 0 : errno;
 }
 
 }  // namespace vela

@@ -34,9 +34,12 @@ struct FileStatus {
 
 /// Returns true when the file mode `mode`, with its type bits, is that of a regular file.
 bool IsRegularFileMode(uint32_t mode);
+/// The same for a directory.
+bool IsDirectoryMode(uint32_t mode);
 
-/// Examines the file at `path`, symbolic links followed. Returns nothing, with errno set, on
-/// failure, also for a null path.
+/// Examines the file at `path`, symbolic links followed; in a folder that is held open, only those
+/// that can be trusted (posix/folder.h). Returns nothing, with errno set, on failure, also for a
+/// null path.
 std::optional<FileStatus> ExamineFile(const char* path);
 inline std::optional<FileStatus> ExamineFile(const std::string& path) {
   return ExamineFile(path.c_str());
@@ -63,19 +66,15 @@ int CheckAccess(const std::string& path, FileAccess access);
 /// no open descriptor, with errno set, on failure.
 FileDescriptor OpenForReading(const std::string& path);
 
-/// Creates the empty file `path` with these permission bits, or truncates the existing one, and
-/// opens it for writing; never waits for the reader of a pipe. Returns no open descriptor, with
-/// errno set, on failure.
-FileDescriptor CreateEmptyFile(const std::string& path, unsigned mode);
+/// Returns whether a regular file is at `path` that belongs to root or to the owner of the running
+/// program and that others cannot change.
+bool IsProgramToTrust(const std::string& path);
 
-/// Creates the directory `path` with these permission bits. Returns 0 or an errno value.
-int CreateDirectory(const std::string& path, unsigned mode);
+/// Sets the permission bits of the open file `fd`. Returns 0 or an errno value.
+int SetFileMode(int fd, unsigned mode);
 
-/// Sets the permission bits of the file at `path`. Returns 0 or an errno value.
-int SetFileMode(const std::string& path, unsigned mode);
-
-/// Renames a file, replacing any existing file. Returns 0 or an errno value.
-int RenameFile(const std::string& from, const std::string& to);
+/// Returns the size of the open file `fd` in bytes, 0 when it cannot be examined.
+int64_t SizeOfFile(int fd);
 
 /// Removes the file at `path`, a symbolic link itself and not its target. Returns 0 or an errno
 /// value.
@@ -88,8 +87,8 @@ int RemoveFileIfPresent(const std::string& path);
 /// that does not fit on the volume is removed again. Returns 0 or an errno value.
 int AppendLine(const std::string& path, const std::string& text);
 
-/// Replaces the X's at the end of `nameTemplate` so that no file has the resulting path. Returns an
-/// empty string when no file can be created there.
-std::string FindUnusedPath(const std::string& nameTemplate);
+/// Waits until the name of the file `path`, in its directory, is on the disk. Returns 0, also when
+/// the directory may not be read or its file system has nothing to wait for, or an errno value.
+int SyncNameOf(const std::string& path);
 
 }  // namespace vela

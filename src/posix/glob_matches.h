@@ -8,12 +8,11 @@
 namespace vela {
 
 /// Expands a shell pattern; contains no paths when nothing matches or the expansion fails. The
-/// paths are sorted and live as long as the object.
+/// paths are sorted and live as long as the object. Directories are opened, and links followed, as
+/// posix/folder.h describes.
 class GlobMatches {
  public:
-  explicit GlobMatches(const std::string& pattern) {
-    found_ = glob(pattern.c_str(), 0, nullptr, &matches_) == 0;
-  }
+  explicit GlobMatches(const std::string& pattern);
   ~GlobMatches() { globfree(&matches_); }
   GlobMatches(const GlobMatches&) = delete;
   GlobMatches& operator=(const GlobMatches&) = delete;

@@ -2,6 +2,7 @@
 
 #include <fcntl.h>
 #include <poll.h>
+#include <sys/stat.h>
 #include <sys/time.h>
 #include <sys/un.h>
 #include <unistd.h>
@@ -32,6 +33,45 @@ int ConnectTo(int socket, const sockaddr_un& address) {
   const auto* generic = reinterpret_cast<const sockaddr*>(&address);
   return connect(socket, generic, sizeof(address)) == 0 ? 0 : errno;
 }
+
+/// A message of one part, with room for one descriptor.
+class DescriptorMessage {
+ public:
+  DescriptorMessage(void* bytes, size_t size) : part_{bytes, size} {
+    header_.msg_iov = &part_;
+    header_.msg_iovlen = 1;
+    header_.msg_control = control_;
+    header_.msg_controllen = sizeof control_;
+  }
+  DescriptorMessage(const DescriptorMessage&) = delete;
+  DescriptorMessage& operator=(const DescriptorMessage&) = delete;
+
+  msghdr* Header() { return &header_; }
+
+  void Attach(int fd) {
+    cmsghdr* const item = CMSG_FIRSTHDR(&header_);
+    item->cmsg_level = SOL_SOCKET;
+    item->cmsg_type = SCM_RIGHTS;
+    item->cmsg_len = CMSG_LEN(sizeof fd);
+    std::memcpy(CMSG_DATA(item), &fd, sizeof fd);
+  }
+
+  /// Returns the descriptor that has come with the message.
+  FileDescriptor Detach() {
+    const cmsghdr* const item = CMSG_FIRSTHDR(&header_);
+    int fd = -1;
+    if (item != nullptr && item->cmsg_level == SOL_SOCKET && item->cmsg_type == SCM_RIGHTS &&
+        item->cmsg_len == CMSG_LEN(sizeof fd)) {
+      std::memcpy(&fd, CMSG_DATA(item), sizeof fd);
+    }
+    return FileDescriptor(fd);
+  }
+
+ private:
+  iovec part_;
+  msghdr header_ = {};
+  alignas(cmsghdr) char control_[CMSG_SPACE(sizeof(int))] = {};
+};
 
 bool IsOver(const Deadline& deadline) {
   return deadline.Left() == std::chrono::nanoseconds::zero();
@@ -70,6 +110,41 @@ int ConnectBlocking(int socket, const sockaddr_un& address, const Deadline& dead
   return SetBlocking(socket, false) ? 0 : errno;
 }
 
+int ConnectWithin(int socket, const std::string& path, const Deadline& deadline) {
+  sockaddr_un address;
+  if (!MakeAddress(path, address)) {
+    return ENAMETOOLONG;
+  }
+  const int error = ConnectTo(socket, address);
+  const bool isQueueFull = error == EAGAIN || error == EINTR;
+  return isQueueFull ? ConnectBlocking(socket, address, deadline) : error;
+}
+
+bool IsTrusted(uid_t user) {
+  return user == 0 || user == geteuid();
+}
+
+/// Opens the file at the path without using it. Returns 0 or an errno value.
+int OpenPlace(const char* path, int links, FileDescriptor& place, struct stat& status) {
+  place.Reset(open(path, O_PATH | O_CLOEXEC | links));
+  return place.IsOpen() && fstat(place.Get(), &status) == 0 ? 0 : errno;
+}
+
+/// Finds the socket of a trusted user. It is examined before the connection is made: a listener
+/// that accepts nothing would keep the client waiting without saying who it is. Returns 0 or an
+/// errno value, ECONNREFUSED when anything else is at the path.
+int FindTrustedSocket(const char* path, FileDescriptor& place) {
+  struct stat status = {};
+  int error = OpenPlace(path, O_NOFOLLOW, place, status);
+  if (error == 0 && S_ISLNK(status.st_mode) && IsTrusted(status.st_uid)) {
+    error = OpenPlace(path, 0, place, status);
+  }
+  if (error != 0) {
+    return error;
+  }
+  return S_ISSOCK(status.st_mode) && IsTrusted(status.st_uid) ? 0 : ECONNREFUSED;
+}
+
 }  // namespace
 
 FileDescriptor MakeLocalSocket() {
@@ -86,20 +161,29 @@ int ConnectNow(int socket, std::string_view path) {
 }
 
 int OpenConnection(const char* path, const Deadline& deadline, FileDescriptor& connection) {
-  sockaddr_un address;
-  if (!MakeAddress(path, address)) {
+  if (!FitsLocalAddress(path)) {
     return ENAMETOOLONG;
   }
-  if (access(path, F_OK) != 0) {
-    return errno;
+  FileDescriptor place;
+  int error = FindTrustedSocket(path, place);
+  if (error != 0) {
+    return error;
   }
   connection = MakeLocalSocket();
   if (!connection.IsOpen()) {
     return errno;
   }
-  const int error = ConnectTo(connection.Get(), address);
-  const bool isQueueFull = error == EAGAIN || error == EINTR;
-  return isQueueFull ? ConnectBlocking(connection.Get(), address, deadline) : error;
+  // The socket that was examined, whatever is at the path now.
+  error = ConnectWithin(connection.Get(), "/proc/self/fd/" + std::to_string(place.Get()), deadline);
+  if (error == ENOENT) {
+    error = ConnectWithin(connection.Get(), path, deadline);  // without a /proc
+  }
+  const std::optional<ucred> peer = error == 0 ? PeerOf(connection.Get()) : std::nullopt;
+  if (peer && IsTrusted(peer->uid)) {
+    return 0;
+  }
+  connection.Reset();
+  return error != 0 ? error : ECONNREFUSED;
 }
 
 int BindLocal(int socket, std::string_view path) {
@@ -167,6 +251,43 @@ int ReceiveSome(int socket, char* buffer, size_t size, const Deadline& deadline,
     }
     if (error != EAGAIN) {
       return error;
+    }
+  }
+}
+
+MessageSockets ConnectMessageSockets() {
+  int ends[2] = {-1, -1};
+  if (socketpair(AF_UNIX, SOCK_SEQPACKET | SOCK_CLOEXEC, 0, ends) != 0) {
+    return {};
+  }
+  return {FileDescriptor(ends[0]), FileDescriptor(ends[1])};
+}
+
+int SendDescriptor(int socket, std::string_view message, int fd) {
+  std::string bytes(message);
+  DescriptorMessage packed(bytes.data(), bytes.size());
+  packed.Attach(fd);
+  for (;;) {
+    if (sendmsg(socket, packed.Header(), MSG_NOSIGNAL | MSG_DONTWAIT) >= 0) {
+      return 0;
+    }
+    if (errno != EINTR) {
+      return errno;
+    }
+  }
+}
+
+int ReceiveDescriptor(int socket, char* buffer, size_t size, size_t& got, FileDescriptor& fd) {
+  for (;;) {
+    DescriptorMessage packed(buffer, size);
+    const ssize_t count = recvmsg(socket, packed.Header(), MSG_CMSG_CLOEXEC);
+    if (count >= 0) {
+      got = static_cast<size_t>(count);
+      fd = packed.Detach();
+      return 0;
+    }
+    if (errno != EINTR) {
+      return errno;
     }
   }
 }

@@ -23,8 +23,11 @@ bool FitsLocalAddress(std::string_view path);
 /// Connects without waiting. Returns EAGAIN when the listener's queue is full.
 int ConnectNow(int socket, std::string_view path);
 
-/// Creates a socket and connects it, waiting until the deadline when the listener's queue is full.
-/// Creates no socket when nothing exists at the path. Returns ETIMEDOUT when the queue stays full.
+/// Creates a socket and connects it to a listener of root or of this process's user, waiting until
+/// the deadline when the listener's queue is full. Creates no socket when nothing exists at the
+/// path. Returns ETIMEDOUT when the queue stays full, ECONNREFUSED when nothing listens, when
+/// something other than a socket is at the path, and when the socket, the process behind it or a
+/// symbolic link to it is another user's.
 int OpenConnection(const char* path, const Deadline& deadline, FileDescriptor& connection);
 
 /// Binds the socket to the path.
@@ -48,6 +51,22 @@ int ReceiveNow(int socket, char* buffer, size_t size, size_t& got);
 /// The same, but waits until something arrives. Returns ETIMEDOUT when nothing does before the
 /// deadline.
 int ReceiveSome(int socket, char* buffer, size_t size, const Deadline& deadline, size_t& got);
+
+/// Two connected sockets for messages; the other end receives each as a whole.
+struct MessageSockets {
+  FileDescriptor own;
+  FileDescriptor other;
+};
+
+/// Connects two new sockets. On failure, neither is open and errno is set.
+MessageSockets ConnectMessageSockets();
+
+/// Sends a message with a copy of the descriptor `fd`, without waiting.
+int SendDescriptor(int socket, std::string_view message, int fd);
+
+/// Waits for a message; `got` is 0 at the end of the connection. `fd` is open only if a descriptor
+/// came with the message.
+int ReceiveDescriptor(int socket, char* buffer, size_t size, size_t& got, FileDescriptor& fd);
 
 /// Signals the end of the data to the other end, which can still send.
 void EndSending(int socket);

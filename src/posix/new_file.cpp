@@ -2,10 +2,15 @@
 
 #include <errno.h>
 #include <fcntl.h>
+#include <limits.h>
+#include <stdio.h>
+#include <sys/stat.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <atomic>
-#include <cstdio>
+#include <tuple>
+#include <utility>
 
 #include "posix/file_content.h"
 
@@ -16,44 +21,208 @@ namespace {
 constexpr mode_t kNewFileMode = 0666;
 constexpr size_t kBufferSize = 64 * 1024;
 
+constexpr int kLinksMax = 40;
+
 /// Short and independent of the final name, which may be as long as names can be.
-std::string NextName(const std::string& directory) {
+std::string NextName() {
   static std::atomic<unsigned> count{0};
-  return directory + "/." + program_invocation_short_name + '.' + std::to_string(getpid()) + '.' +
+  return std::string(".") + program_invocation_short_name + '.' + std::to_string(getpid()) + '.' +
          std::to_string(count++);
+}
+
+/// Returns true for the errors of a link that is not followed or whose target does not exist.
+bool LeadsNowhere(int error) {
+  return error == EACCES || error == ENOENT || error == ENOTDIR || error == ELOOP ||
+         error == ENAMETOOLONG;
+}
+
+/// Returns the part of the path before its last component, and that component.
+std::pair<std::string, std::string> SplitPath(const std::string& path) {
+  const size_t begin = path.rfind('/') + 1;  // 0 without a slash
+  return {path.substr(0, begin), path.substr(begin)};
+}
+
+/// Follows a path component by component, through descriptors that nobody can redirect.
+class PathWalk {
+ public:
+  /// `at` is the directory where relative paths begin, none for the working directory. `links`
+  /// counts the links followed.
+  PathWalk(FileDescriptor& at, int& links) : at_(at), links_(links) {}
+
+  /// Moves `at` to what `path` names. Returns 0 or an errno value; `at` is then somewhere on the
+  /// way.
+  int Follow(const std::string& path);
+
+ private:
+  int Step(const std::string& component);
+  int StepThroughLink(const FileDescriptor& link, const struct stat& status);
+
+  FileDescriptor& at_;
+  int& links_;
+};
+
+/// Reads the link that is open without being followed. Returns 0 or an errno value.
+int ReadLink(int link, std::string& target) {
+  target.resize(PATH_MAX);
+  const ssize_t length = readlinkat(link, "", target.data(), target.size());
+  if (length < 0) {
+    return errno;
+  }
+  target.resize(static_cast<size_t>(length));
+  return target.size() < PATH_MAX ? 0 : ENAMETOOLONG;
+}
+
+/// Opens a directory entry without using it, a link itself. Returns 0 or an errno value.
+int OpenEntry(int directory, const std::string& name, FileDescriptor& entry, struct stat& status) {
+  entry.Reset(openat(directory, name.c_str(), O_PATH | O_NOFOLLOW | O_CLOEXEC));
+  return entry.IsOpen() && fstat(entry.Get(), &status) == 0 ? 0 : errno;
+}
+
+int PathWalk::Follow(const std::string& path) {
+  const bool isAbsolute = !path.empty() && path.front() == '/';
+  if (isAbsolute || !at_.IsOpen()) {
+    at_.Reset(open(isAbsolute ? "/" : ".", O_PATH | O_DIRECTORY | O_CLOEXEC));
+  }
+  if (!at_.IsOpen()) {
+    return errno;
+  }
+  for (size_t begin = 0; begin < path.size();) {
+    const size_t end = std::min(path.find('/', begin), path.size());
+    const int error = end > begin ? Step(path.substr(begin, end - begin)) : 0;
+    if (error != 0) {
+      return error;
+    }
+    begin = end + 1;
+  }
+  return 0;
+}
+
+int PathWalk::Step(const std::string& component) {
+  FileDescriptor entry;
+  struct stat status = {};
+  const int error = OpenEntry(at_.Get(), component, entry, status);
+  if (error != 0) {
+    return error;
+  }
+  if (S_ISLNK(status.st_mode)) {
+    return StepThroughLink(entry, status);
+  }
+  at_ = std::move(entry);
+  return 0;
+}
+
+int PathWalk::StepThroughLink(const FileDescriptor& link, const struct stat& status) {
+  std::string path;
+  int error = ++links_ > kLinksMax ? ELOOP : ReadLink(link.Get(), path);
+  if (error == 0) {
+    error = Follow(path);
+  }
+  struct stat target = {};
+  if (error == 0 && fstat(at_.Get(), &target) != 0) {
+    error = errno;
+  }
+  if (error != 0) {
+    return error;
+  }
+  const uid_t owner = status.st_uid;
+  return owner == 0 || owner == geteuid() || owner == target.st_uid ? 0 : EACCES;
+}
+
+FileDescriptor CopyOf(const FileDescriptor& descriptor) {
+  return FileDescriptor(fcntl(descriptor.Get(), F_DUPFD_CLOEXEC, 0));
 }
 
 }  // namespace
 
-NewFile::NewFile(const std::string& directory, Kind kind) {
+FilePlace::FilePlace(const std::string& path) : error_(Find(path)) {}
+
+int FilePlace::Find(const std::string& path) {
+  if (path.empty()) {
+    return ENOENT;
+  }
+  std::string parent;
+  std::tie(parent, name_) = SplitPath(path);
+  int error = PathWalk(directory_, links_).Follow(parent);
+  if (error != 0 || name_.empty()) {
+    return error != 0 ? error : EISDIR;
+  }
+  error = FollowLinksAtEnd();
+  return error != 0 ? error : ErrorOfFile();
+}
+
+int FilePlace::FollowLinksAtEnd() {
+  for (;;) {
+    FileDescriptor entry;
+    struct stat status = {};
+    int error = OpenEntry(directory_.Get(), name_, entry, status);
+    if (error != 0 || !S_ISLNK(status.st_mode)) {
+      return error == ENOENT ? 0 : error;
+    }
+    FileDescriptor target = CopyOf(directory_);
+    error = PathWalk(target, links_).Follow(name_);
+    if (LeadsNowhere(error)) {
+      return 0;
+    }
+    std::string path;
+    if (error == 0) {
+      error = ReadLink(entry.Get(), path);
+    }
+    std::string parent;
+    std::tie(parent, name_) = SplitPath(path);
+    if (error == 0) {
+      error = name_.empty() ? EISDIR : PathWalk(directory_, links_).Follow(parent);
+    }
+    if (error != 0) {
+      return error;
+    }
+  }
+}
+
+int FilePlace::ErrorOfFile() const {
+  struct stat named = {};
+  if (fstatat(directory_.Get(), name_.c_str(), &named, AT_SYMLINK_NOFOLLOW) != 0) {
+    return errno == ENOENT ? 0 : errno;
+  }
+  if (S_ISDIR(named.st_mode)) {
+    return EISDIR;
+  }
+  // A link of the kernel leads somewhere although its text names no file, such as that of a pipe.
+  const bool isFreeLink =
+      S_ISLNK(named.st_mode) && fstatat(directory_.Get(), name_.c_str(), &named, 0) != 0;
+  return isFreeLink || S_ISREG(named.st_mode) ? 0 : EEXIST;
+}
+
+NewFile::NewFile(const FilePlace& place, Kind kind) : place_(place) {
   buffer_.reserve(kBufferSize);
-  Open(directory, kind);
+  Open(kind);
 }
 
 NewFile::~NewFile() {
   if (!name_.empty()) {
-    unlink(name_.c_str());
+    unlinkat(place_.directory_.Get(), name_.c_str(), 0);
   }
 }
 
-void NewFile::Open(const std::string& directory, Kind kind) {
+void NewFile::Open(Kind kind) {
   if (kind == Kind::kResult) {
-    OpenNamed(directory);
+    OpenNamed();
     return;
   }
-  file_.Reset(open(directory.c_str(), O_TMPFILE | O_RDWR | O_CLOEXEC, 0600));
+  const int directory = place_.directory_.Get();
+  file_.Reset(openat(directory, ".", O_TMPFILE | O_RDWR | O_CLOEXEC, 0600));
   // Not every file system supports files without a name.
-  if (!file_.IsOpen() && OpenNamed(directory) && unlink(name_.c_str()) == 0) {
+  if (!file_.IsOpen() && OpenNamed() && unlinkat(directory, name_.c_str(), 0) == 0) {
     name_.clear();
   }
 }
 
 /// A name may exist already, left behind by a killed process with the same id.
-bool NewFile::OpenNamed(const std::string& directory) {
+bool NewFile::OpenNamed() {
   constexpr int kTries = 100;
+  constexpr int kFlags = O_CREAT | O_EXCL | O_NOFOLLOW | O_RDWR | O_CLOEXEC;
   for (int i = 0; i < kTries && !file_.IsOpen() && (i == 0 || errno == EEXIST); ++i) {
-    name_ = NextName(directory);
-    file_.Reset(open(name_.c_str(), O_CREAT | O_EXCL | O_RDWR | O_CLOEXEC, kNewFileMode));
+    name_ = NextName();
+    file_.Reset(openat(place_.directory_.Get(), name_.c_str(), kFlags, kNewFileMode));
   }
   Remember(file_.IsOpen());
   if (!file_.IsOpen()) {
@@ -116,14 +285,25 @@ void NewFile::Clear() {
   }
 }
 
-int NewFile::MoveTo(const std::string& path) {
+/// A user may be allowed to create files in the directory, but not to read it; and a file system
+/// may have nothing to wait for.
+bool NewFile::SyncDirectory() const {
+  const FileDescriptor directory(
+      openat(place_.directory_.Get(), ".", O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+  return directory.IsOpen() ? fsync(directory.Get()) == 0 || errno == EINVAL : errno == EACCES;
+}
+
+int NewFile::MoveToPlace() {
   Flush();
   if (error_ != 0) {
     return error_;
   }
-  Remember(fsync(file_.Get()) == 0 && std::rename(name_.c_str(), path.c_str()) == 0);
+  const int directory = place_.directory_.Get();
+  Remember(fsync(file_.Get()) == 0 &&
+           renameat(directory, name_.c_str(), directory, place_.name_.c_str()) == 0);
   if (error_ == 0) {
     name_.clear();
+    Remember(SyncDirectory());
   }
   return error_;
 }

@@ -17,6 +17,7 @@
 
 #include "posix/file_descriptor.h"
 #include "posix/files.h"
+#include "posix/folder.h"
 
 namespace vela {
 
@@ -98,34 +99,6 @@ bool LeadsNowhere(int error) {
     default:
       return false;
   }
-}
-
-/// Opens the directory that the link `name` leads to. Its owner and its target are those of the
-/// same link, even when the name is given to another one meanwhile. Returns no open descriptor,
-/// with errno set, on failure: ELOOP when the link is not trusted.
-FileDescriptor OpenTrustedLink(int folder, const char* name) {
-  const FileDescriptor link = OpenAt(folder, name, O_PATH | O_NOFOLLOW | O_CLOEXEC);
-  struct stat linkStatus = {};
-  char target[PATH_MAX];
-  if (!link.IsOpen() || fstat(link.Get(), &linkStatus) != 0) {
-    return {};
-  }
-  const ssize_t length = readlinkat(link.Get(), "", target, sizeof target - 1);
-  if (length < 0) {
-    return {};
-  }
-  target[length] = '\0';
-  FileDescriptor directory = OpenAt(folder, target, kOpenFlags);
-  struct stat status = {};
-  if (!directory.IsOpen() || fstat(directory.Get(), &status) != 0) {
-    return {};
-  }
-  const uid_t owner = linkStatus.st_uid;
-  if (owner != 0 && owner != geteuid() && owner != status.st_uid) {
-    errno = ELOOP;
-    return {};
-  }
-  return directory;
 }
 
 /// A directory that the walk has entered.
@@ -212,8 +185,8 @@ int TreeWalk::ReportUnopened(int error, const FileIdentity& found) {
 /// Opens a directory, for which others are closed when there are too many.
 FileDescriptor TreeWalk::Open(int folder, const char* name, bool isLinked) {
   for (;;) {
-    FileDescriptor directory =
-        isLinked ? OpenTrustedLink(folder, name) : OpenAt(folder, name, kOpenFlags | O_NOFOLLOW);
+    FileDescriptor directory = isLinked ? OpenTrusted(folder, name, kOpenFlags)
+                                        : OpenAt(folder, name, kOpenFlags | O_NOFOLLOW);
     const bool isShort = !directory.IsOpen() && (errno == EMFILE || errno == ENFILE);
     if (!isShort || !CloseOne()) {
       return directory;

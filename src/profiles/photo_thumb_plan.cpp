@@ -3,6 +3,7 @@
 #include "convert/velamk_photo_thumb.h"
 #include "platform/velaindex.h"
 #include "posix/files.h"
+#include "posix/folder.h"
 #include "storage/fail_marker.h"
 #include "storage/file_helpers.h"
 
@@ -12,13 +13,14 @@ namespace {
 
 constexpr unsigned kMarkerMode = 0777;
 
-bool StatFile(const std::string& path, struct stat& out) {
-  return stat(path.c_str(), &out) == 0;
+/// Returns true for a file whose content can be read without waiting for another program.
+bool IsReadable(const struct stat& status) {
+  return IsRegularFileMode(status.st_mode) || IsDirectoryMode(status.st_mode);
 }
 
 void RemoveWithMarker(const std::string& thumbPath) {
-  RemoveFile(thumbPath);
-  RemoveFile(FailMarkerPath(thumbPath));
+  RemoveEntry(thumbPath);
+  RemoveEntry(FailMarkerPath(thumbPath));
 }
 
 /// Copies the image options of the profile.
@@ -91,7 +93,7 @@ int FindExistingThumb(const ThumbnailProfile& profile, const std::string& eaDir,
                       std::string& foundPath, struct stat& foundStat) {
   for (const std::string& name : {profile.thumbName(), profile.filename()}) {
     const std::string path = eaDir + "/" + name;
-    if (StatFile(path, foundStat)) {
+    if (ReadStatus(path, foundStat) == 0 && IsReadable(foundStat)) {
       foundPath = path;
       return 1;
     }
@@ -104,7 +106,8 @@ int IsThumbUpToDate(const ThumbnailProfile& profile, const std::string& srcPath,
   std::string thumbPath;
   struct stat thumb = {};
   struct stat source = {};
-  if (FindExistingThumb(profile, eaDir, thumbPath, thumb) == 0 || !StatFile(srcPath, source)) {
+  if (FindExistingThumb(profile, eaDir, thumbPath, thumb) == 0 ||
+      ReadStatus(srcPath, source) != 0) {
     return 0;
   }
   return thumb.st_mtim.tv_sec >= source.st_mtim.tv_sec && thumb.st_size > 0 ? 1 : 0;
@@ -118,7 +121,7 @@ void RemoveThumbAndFailMarker(const ThumbnailProfile& profile, const std::string
 void CreateThumbFailMarker(const ThumbnailProfile& profile, const std::string& eaDir) {
   RemoveThumbAndFailMarker(profile, eaDir);
   const std::string marker = FailMarkerPath(eaDir + "/" + profile.thumbName());
-  CreateEmptyFile(marker, kMarkerMode);
+  FolderEntry(marker).Create(kMarkerMode);
 }
 
 namespace vela {

@@ -1,11 +1,9 @@
 #include "source/orientation.h"
 
-#include <libexif/exif-data.h>
-
 #include <cstdlib>
 #include <cstring>
-#include <memory>
 
+#include "header/header_reader.h"
 #include "platform/velaindex.h"
 #include "platform/vlibc.h"
 #include "posix/log.h"
@@ -20,10 +18,6 @@ constexpr char kExiftoolPath[] = "/usr/vela/bin/exiftool";
 constexpr char kRotationTag[] = "Rotation";
 constexpr char kUprightText[] = "top - left";
 
-struct ExifDataUnref {
-  void operator()(ExifData* data) const { exif_data_unref(data); }
-};
-
 /// Some builds of the library spell the upright orientation differently.
 std::string CanonicalText(const char* text) {
   return std::strcmp(text, "Top-left") == 0 ? kUprightText : text;
@@ -32,20 +26,15 @@ std::string CanonicalText(const char* text) {
 /// Returns the library's text for the orientation of an image, empty when it has none or no
 /// EXIF data; the latter is logged.
 std::string ReadOrientationText(const std::string& path) {
-  const std::unique_ptr<ExifData, ExifDataUnref> data(exif_data_new_from_file(path.c_str()));
-  if (data == nullptr) {
+  std::optional<std::string> text = ReadExifOrientation(path);
+  if (!text) {
     LogError(kProgramLogSource, 696,
              std::string(kProgramLogSource) + " (696) File not readable or no EXIF data in file " +
                  path + ".\n");
     return {};
   }
-  char text[128] = "";
-  ExifEntry* entry = exif_content_get_entry(data->ifd[EXIF_IFD_0], EXIF_TAG_ORIENTATION);
-  if (entry != nullptr) {
-    exif_entry_get_value(entry, text, sizeof text);
-    StringTrim(text);
-  }
-  return CanonicalText(text);
+  StringTrim(text->data());
+  return CanonicalText(text->c_str());
 }
 
 /// Returns the value of the raw photo's rotation tag, empty when it has none.

@@ -12,9 +12,11 @@
 #include "platform/vlibc.h"
 #include "posix/descriptor_copy.h"
 #include "posix/files.h"
+#include "posix/folder.h"
 #include "posix/log.h"
 #include "profiles/thumbnail_profile.h"
 #include "source/orientation.h"
+#include "source/raw_limit.h"
 #include "source/tool_output.h"
 #include "storage/log_source.h"
 
@@ -99,13 +101,13 @@ std::string Decode(const DirectoryJob& job, const std::string& rawPath,
     TurnPreview(rawPath, previewPath);
     return previewPath;
   }
-  RemoveFile(previewPath);
+  RemoveEntry(previewPath);
   const std::string ppmPath = thumbDir + "/RAW_TEMP.ppm";
-  if (DcrawToFile(rawPath, ppmPath, "-w")) {
+  if (IsWithinRawLimit(rawPath) && DcrawToFile(rawPath, ppmPath, "-w")) {
     return ppmPath;
   }
   LogError(kProgramLogSource, 660, "Failed to convert raw " + rawPath + " to pnm");
-  RemoveFile(ppmPath);
+  RemoveEntry(ppmPath);
   return {};
 }
 
@@ -141,7 +143,7 @@ bool DcrawToFile(const std::string& rawPath, const std::string& outPath, const c
                 kDcrawPath, option);
     return false;
   }
-  const FileDescriptor file = CreateEmptyFile(outPath, kDecodedCopyMode);
+  const FileDescriptor file = FolderEntry(outPath).CreateAnew(kDecodedCopyMode);
   if (!file.IsOpen()) {
     const int error = errno;
     LogError(kProgramLogSource, 574,
@@ -166,7 +168,7 @@ std::string ConvertRawToJpeg(const DirectoryJob& job, const std::string& rawPath
   }
   const auto after = ExamineFile(rawPath);
   if (!after || after->blocks != before->blocks) {
-    RemoveFile(result);
+    RemoveEntry(result);
     return {};
   }
   return result;

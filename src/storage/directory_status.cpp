@@ -1,7 +1,9 @@
 #include "storage/directory_status.h"
 
+#include "platform/system_rules.h"
 #include "platform/velaindex.h"
 #include "posix/directory_entries.h"
+#include "posix/folder.h"
 #include "posix/log.h"
 #include "posix/truncated_text.h"
 #include "storage/log_source.h"
@@ -30,6 +32,8 @@ bool ForEachPhotoStatus(const char* dir, const PhotoStatusVisitor& visit) {
     LogError(kStatusLogSource, 153, "[Error] opendir: " + LogText(dir));
     return false;
   }
+  const HeldFolder directory(dir);
+  const HeldFolder metadataRoot(JoinPath(dir, kMetadataDirName));
   const int32_t sizeMap = DirectorySizeMap(dir);
   while (const char* name = entries.NextName()) {
     if (EntryNameShouldIndex(name) != 1) {

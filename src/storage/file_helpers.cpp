@@ -2,7 +2,7 @@
 
 #include <cerrno>
 
-#include "posix/files.h"
+#include "posix/folder.h"
 #include "posix/glob_matches.h"
 #include "posix/log.h"
 #include "storage/log_source.h"
@@ -16,11 +16,15 @@ constexpr unsigned kDirectoryMode = 0777;
 }  // namespace
 
 int checkCreateDir(const std::string& path) {
-  const auto status = ExamineFile(path);
-  if (status && status->isDirectory) {
+  if (IsFolderHeld(path)) {
     return 1;
   }
-  const int error = CreateDirectory(path, kDirectoryMode);
+  const FolderEntry directory(path);
+  struct stat status = {};
+  if (directory.Examine(status) == 0 && IsDirectoryMode(status.st_mode)) {
+    return 1;
+  }
+  const int error = directory.CreateDirectory(kDirectoryMode);
   if (error == 0 || error == EEXIST) {
     return 1;
   }
@@ -35,7 +39,7 @@ int checkCreateDir(const std::string& path) {
 int RemoveFilesByPattern(const std::string& pattern) {
   int result = 0;
   for (const char* path : GlobMatches(pattern)) {
-    if (RemoveFile(path) != 0) {
+    if (RemoveEntry(path) != 0) {
       result = -1;
     }
   }

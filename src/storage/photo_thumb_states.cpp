@@ -5,6 +5,7 @@
 #include <string>
 
 #include "platform/velaindex.h"
+#include "posix/folder.h"
 #include "posix/log.h"
 #include "posix/truncated_text.h"
 #include "storage/log_source.h"
@@ -83,6 +84,7 @@ PhotoThumbStates ReadPhotoThumbStates(const char* path, int32_t sizeMap) {
     return photo;
   }
   photo.lookup = PhotoLookup::kDone;
+  const HeldFolder folder(eaDir);
   PhotoThumbs thumbs(path, eaDir);
   for (const EAThumbInfo& row : rgEAThumbInfo) {
     if (IsThumbInSizeMap(row.name, sizeMap) != 0) {

@@ -3,14 +3,14 @@
 #include <utility>
 
 #include "posix/file_lock.h"
-#include "posix/files.h"
+#include "posix/folder.h"
 #include "posix/log.h"
 #include "storage/log_source.h"
 
 namespace vela {
 
 DirectoryLock::DirectoryLock(const std::string& path) {
-  FileDescriptor directory = OpenForReading(path);
+  FileDescriptor directory = OpenEntry(path);
   if (!directory.IsOpen()) {
     LogError(kProgramLogSource, 844, "Failed to open " + path);
     return;

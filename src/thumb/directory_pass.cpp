@@ -8,11 +8,13 @@
 #include "platform/velaindex.h"
 #include "posix/directory_entries.h"
 #include "posix/files.h"
+#include "posix/folder.h"
 #include "posix/identity.h"
 #include "posix/log.h"
 #include "storage/creation_queue.h"
 #include "storage/file_helpers.h"
 #include "storage/log_source.h"
+#include "storage/photo_folder.h"
 #include "thumb/directory_lock.h"
 #include "thumb/photo_pass.h"
 
@@ -44,16 +46,16 @@ bool IsPhotoFile(const std::string& path) {
 bool MakePhotos(const DirectoryJob& job, const std::string& metadataRoot,
                 const std::vector<std::string>& names, time_t passStart) {
   bool queue = false;
+  bool isStopped = false;
   for (const std::string& name : names) {
-    switch (PhotoPass(job, metadataRoot, name, passStart).Run()) {
-      case PhotoEnd::kNextPhoto:
-        break;
-      case PhotoEnd::kNextPhotoQueue:
-        queue = true;
-        break;
-      case PhotoEnd::kStopPass:
-        return queue;
+    if (isStopped) {
+      // What an interrupted run has left may be what fills the volume.
+      RemoveLeftovers(metadataRoot + "/" + name);
+      continue;
     }
+    const PhotoEnd end = PhotoPass(job, metadataRoot, name, passStart).Run();
+    queue = queue || end == PhotoEnd::kNextPhotoQueue;
+    isStopped = end == PhotoEnd::kStopPass;
   }
   return queue;
 }
@@ -69,7 +71,7 @@ void QueueDirectory(const std::string& dir) {
 
 std::vector<std::string> ListDirectoryPhotos(const std::string& dir) {
   std::vector<std::string> names;
-  DirectoryEntries entries(dir.c_str());
+  DirectoryEntries entries(dir);
   if (!entries.IsOpen()) {
     LogError(kProgramLogSource, 404, "[Error] opendir: " + dir);
     return names;
@@ -84,6 +86,7 @@ std::vector<std::string> ListDirectoryPhotos(const std::string& dir) {
 }
 
 void CreateDirectoryThumbs(const DirectoryJob& job) {
+  const HeldFolder directory(job.path);
   const std::string metadataRoot = job.path + "/" + kMetadataDirName;
   const std::vector<std::string> names = ListDirectoryPhotos(job.path);
   const time_t passStart = std::time(nullptr);
@@ -92,6 +95,7 @@ void CreateDirectoryThumbs(const DirectoryJob& job) {
   }
   bool queue = false;
   {
+    const HeldFolder root(metadataRoot);
     const DirectoryLock lock(metadataRoot);
     if (!lock.IsHeld()) {
       return;

@@ -1,6 +1,7 @@
 #include "thumb/phase_status.h"
 
 #include "convert/photo_convert_job.h"
+#include "posix/folder.h"
 #include "profiles/photo_thumb_plan.h"
 #include "profiles/thumbnail_profile.h"
 
@@ -10,7 +11,7 @@ bool IsPhaseThumbOutdated(const DirectoryJob& job, int phase, const std::string&
                           const std::string& metadataDir) {
   const int count = GetProfileCount(job.profiles, phase);
   struct stat photo = {};
-  if (stat(photoPath.c_str(), &photo) != 0) {
+  if (ReadStatus(photoPath, photo) != 0) {
     return false;
   }
   for (int i = 0; i < count; ++i) {

@@ -1,11 +1,13 @@
 #include "thumb/photo_pass.h"
 
+#include <cerrno>
+
 #include "convert/photo_times.h"
 #include "ipc/velamk_ipc.h"
 #include "platform/system_rules.h"
 #include "platform/velaindex.h"
 #include "posix/files.h"
-#include "posix/glob_matches.h"
+#include "posix/folder.h"
 #include "posix/log.h"
 #include "profiles/photo_thumb_plan.h"
 #include "profiles/thumbnail_profile.h"
@@ -14,6 +16,7 @@
 #include "source/rotation_check.h"
 #include "storage/file_helpers.h"
 #include "storage/log_source.h"
+#include "storage/photo_folder.h"
 #include "storage/velamk_thumb_status.h"
 #include "thumb/index_registration.h"
 #include "thumb/phase_status.h"
@@ -44,10 +47,20 @@ PhotoEnd PhotoPass::Run() {
   if (VLIBCFileStat(photo_.c_str(), kPhotoStatusOptions, &status_) != 0) {
     return PhotoEnd::kNextPhoto;
   }
+  const HeldFolder existing(metadataDir_);
   if (checkCreateDir(metadataDir_) == 0) {
     return PhotoEnd::kNextPhoto;
   }
-  RemoveOldMarkers();
+  const HeldFolder folder(metadataDir_);
+  if (folder.Error() == ELOOP) {
+    LogError("velathumb: not following a link of another user: " + metadataDir_);
+    return PhotoEnd::kNextPhoto;
+  }
+  return Process();
+}
+
+PhotoEnd PhotoPass::Process() {
+  CleanFolder();
   if (!NeedsThumbs()) {
     return Report();
   }
@@ -76,8 +89,8 @@ PhotoEnd PhotoPass::Run() {
   return phase_ == 1 ? MakePhase1() : MakePhase2();
 }
 
-void PhotoPass::RemoveOldMarkers() const {
-  if (RemoveFilesByPattern(EscapePattern(metadataDir_) + "/*.fail") == -1) {
+void PhotoPass::CleanFolder() const {
+  if (!CleanPhotoFolder(metadataDir_)) {
     AppLogError(kErrorPriority, "%s:%d Failed to remove files by pattern [%s/*.fail]",
                 kProgramLogSource, 880, metadataDir_.c_str());
   }
@@ -140,7 +153,7 @@ int PhotoPass::MakePhase(int phase, int rotation) const {
 bool PhotoPass::MakePhase0() {
   const int result = MakePhase(0, rotation_);
   if (decoded_) {
-    RemoveFile(source_);
+    RemoveEntry(source_);
   }
   const int thumbs = GetProfileCount(job_.profiles, 0);
   if (result == -1) {

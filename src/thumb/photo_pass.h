@@ -28,7 +28,8 @@ class PhotoPass {
   PhotoEnd Run();
 
  private:
-  void RemoveOldMarkers() const;
+  PhotoEnd Process();
+  void CleanFolder() const;
   bool NeedsThumbs() const;
   bool IsVolumeNearlyFull() const;
   bool ChoosePhase();

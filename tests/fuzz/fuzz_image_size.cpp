@@ -2,15 +2,22 @@
 
 #include <cstdlib>
 
+#include "answer.h"
+#include "image_size.h"
 #include "input_file.h"
-#include "platform/velaindex.h"
+
+using namespace vela;
+
+extern "C" int LLVMFuzzerInitialize(int* /*count*/, char*** /*arguments*/) {
+  InitializeImageLibrary();
+  return 0;
+}
 
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
   const InputFile file(data, size);
-  uint32_t width = 0;
-  uint32_t height = 0;
-  const bool isRead = VELAIndexImgResGet(file.Path().c_str(), &width, &height) == 0;
-  if (isRead != (width != 0) || isRead != (height != 0)) {
+  const HeaderAnswer answer = Answer({HeaderTopic::kImageSize}, file.Descriptor());
+  const bool isRead = answer.isRead != 0;
+  if (isRead != (answer.width != 0) || isRead != (answer.height != 0)) {
     std::abort();
   }
   return 0;

@@ -7,11 +7,7 @@
 
 InputFile::InputFile(const uint8_t* data, size_t size)
     : descriptor_(memfd_create("input", MFD_CLOEXEC)) {
-  if (descriptor_ < 0 || write(descriptor_, data, size) != static_cast<ssize_t>(size)) {
+  if (!descriptor_.IsOpen() || write(descriptor_.Get(), data, size) != static_cast<ssize_t>(size)) {
     std::abort();
   }
-}
-
-InputFile::~InputFile() {
-  close(descriptor_);
 }

@@ -144,7 +144,7 @@ TEST_F(BrokenExchange, UnusualRepliesThatAreValid) {
   ExpectAllSucceedWith(DaemonReply::Bytes(reply + "\n[garbage"));
   ExpectAllSucceedWith(DaemonReply::BytesThenSilence(reply + "\n"));
   ExpectAllSucceedWith(DaemonReply::Line("{\"success\":true,\"version\":3,\"text\":\"" +
-                                         std::string(1 << 20, 'x') + "\"}"));
+                                         std::string(1000000, 'x') + "\"}"));
 }
 
 TEST_F(BrokenExchange, ASlowDaemonIsWaitedFor) {

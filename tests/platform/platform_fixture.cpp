@@ -49,6 +49,13 @@ int RunForked(const std::function<int()>& call) {
   return Join(Fork(call));
 }
 
+int RunWithin(int seconds, const std::function<int()>& call) {
+  return RunForked([&] {
+    alarm(static_cast<unsigned>(seconds));  // its signal ends the process
+    return call();
+  });
+}
+
 int RunInterrupted(const std::function<int()>& call) {
   return RunForked([&] {
     struct sigaction action = {};

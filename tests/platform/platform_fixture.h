@@ -33,6 +33,9 @@ int Join(pid_t pid);
 /// Fork and Join.
 int RunForked(const std::function<int()>& call);
 
+/// RunForked with a time limit in seconds, after which the process is killed.
+int RunWithin(int seconds, const std::function<int()>& call);
+
 /// RunForked with a signal handler that interrupts the call every 2 ms.
 int RunInterrupted(const std::function<int()>& call);
 

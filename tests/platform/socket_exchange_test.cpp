@@ -1,17 +1,21 @@
 // The exchange of one JSON line in each direction over a local socket.
 #include <json/reader.h>
 #include <json/value.h>
+#include <sys/resource.h>
 #include <sys/socket.h>
 #include <sys/un.h>
+
+#include <csignal>
 
 #include "platform/platform_fixture.h"
 #include "support/daemon_peer.h"
 #include "support/descriptor.h"
+#include "support/privileges.h"
 
 namespace vela_test {
 namespace {
 
-constexpr size_t kReplyMax = 16 * 1024 * 1024;
+constexpr size_t kReplyMax = 1024 * 1024;
 
 Json::Value Request() {
   Json::Value packet(Json::objectValue);
@@ -105,12 +109,13 @@ TEST_F(SocketExchange, TakesEveryByteOfAReply) {
 
 TEST_F(SocketExchange, TakesLargeRequestsAndReplies) {
   const std::string large(3 * 1024 * 1024, 'x');
+  const std::string text(1000 * 1000, 'y');
   DaemonPeer daemon;
-  daemon.AnswerNext(DaemonReply::Line("{\"text\":\"" + large + "\"}"));
+  daemon.AnswerNext(DaemonReply::Line("{\"text\":\"" + text + "\"}"));
   Json::Value packet(Json::objectValue);
   packet["path"] = large + "1";
   EXPECT_EQ(Exchange(packet), 0);
-  EXPECT_EQ(packet["text"].asString(), large);
+  EXPECT_EQ(packet["text"].asString(), text);
   ASSERT_EQ(daemon.Requests().size(), 1U);
   EXPECT_EQ(daemon.Requests()[0].bytes, "{\"path\":\"" + large + "1\"}\n");
 }
@@ -210,6 +215,76 @@ TEST_F(SocketExchange, FailsForLargerReplies) {
   ExpectFailure(EMSGSIZE, 60);
   daemon.AnswerNext(DaemonReply::BytesThenSilence(std::string(kReplyMax + 100000, ' ')));
   ExpectFailure(EMSGSIZE, 60);
+}
+
+/// Lists in lists, `levels` of them counting the object around.
+std::string NestedReply(int levels) {
+  const auto lists = static_cast<size_t>(levels - 1);
+  return "{\"a\":" + std::string(lists, '[') + std::string(lists, ']') + "}";
+}
+
+TEST_F(SocketExchange, TakesRepliesUpToTheLimitOfDepth) {
+  DaemonPeer daemon;
+  daemon.AnswerNext(DaemonReply::Line(NestedReply(64)));
+  EXPECT_TRUE(Reply()["a"].isArray());
+  // Only what contains each other counts, and not what a text contains.
+  std::string many = "{\"a\":[";
+  for (int i = 0; i < 100; ++i) {
+    many += "[{}],";
+  }
+  daemon.AnswerNext(DaemonReply::Line(many + "\"" + std::string(100, '[') + "\\\"{{\"]}"));
+  EXPECT_EQ(Reply()["a"].size(), 101U);
+}
+
+TEST_F(SocketExchange, RefusesDeeperReplies) {
+  std::string objects;
+  for (int i = 0; i < 65; ++i) {
+    objects += "{\"a\":";
+  }
+  objects += "1" + std::string(65, '}');
+  DaemonPeer daemon;
+  for (const std::string& reply : {NestedReply(65), NestedReply(500), objects}) {
+    daemon.AnswerNext(DaemonReply::Line(reply));
+    ExpectFailure(EPROTO);
+  }
+}
+
+TEST_F(SocketExchange, RefusesALargeReplyWithLittleMemory) {
+  std::string values = "{\"a\":[";
+  while (values.size() < 16 * 1024 * 1024) {
+    values += "[],";
+  }
+  DaemonPeer daemon;
+  daemon.AnswerNext(DaemonReply::Line(values + "[]]}"));
+  const auto peakKilobytes = [] {
+    rusage usage = {};
+    getrusage(RUSAGE_SELF, &usage);
+    return usage.ru_maxrss;
+  };
+  const int result = RunForked([&] {
+    const long before = peakKilobytes();
+    Json::Value packet = Request();
+    const bool isRefused = Exchange(packet) == -1 && VLIBCErrGet() == EMSGSIZE;
+    return isRefused && peakKilobytes() - before < 8 * 1024 ? 0 : 1;
+  });
+  EXPECT_EQ(result, 0);
+}
+
+TEST_F(SocketExchange, TakesABoundedAmountOfMemoryForAnyReply) {
+  std::string values = "{\"a\":[";
+  while (values.size() < kReplyMax - 10) {
+    values += "[],";
+  }
+  DaemonPeer daemon;
+  daemon.AnswerNext(DaemonReply::Line(values + "[]]}"));
+  const int result = RunForked([&] {
+    Json::Value packet = Request();
+    Exchange(packet);
+    rusage usage = {};
+    getrusage(RUSAGE_SELF, &usage);
+    return usage.ru_maxrss < 256 * 1024 ? 0 : 1;
+  });
+  EXPECT_EQ(result, 0);
 }
 
 TEST_F(SocketExchange, FailsWithoutDaemon) {
@@ -426,6 +501,109 @@ TEST_F(SocketExchange, LeavesNoDescriptorOpen) {
       AutoSendRecvPacket("/tmp", -1, packet, 1);
     }
   });
+}
+
+/// What a listener does with connections.
+enum class Listener { kSilent, kFullQueue, kAnswering };
+
+/// A process of user 1 (of user 0 when there is no other) that listens at `path`.
+class ListenerOfAnotherUser {
+ public:
+  ListenerOfAnotherUser(const std::string& path, Listener kind) {
+    process_ = Fork([&] {
+      if (HasOtherUsers() && (setgid(1) != 0 || setuid(1) != 0)) {
+        return 1;
+      }
+      Listen(path, kind);
+      return 0;
+    });
+    EXPECT_TRUE(WaitUntilExists("/tmp/listening"));
+  }
+  ListenerOfAnotherUser(const ListenerOfAnotherUser&) = delete;
+  ListenerOfAnotherUser& operator=(const ListenerOfAnotherUser&) = delete;
+  ~ListenerOfAnotherUser() {
+    kill(process_, SIGKILL);
+    Join(process_);
+    RemoveTree("/tmp/listening");
+  }
+
+ private:
+  static void Listen(const std::string& path, Listener kind) {
+    sockaddr_un address = {};
+    address.sun_family = AF_UNIX;
+    path.copy(address.sun_path, sizeof(address.sun_path) - 1);
+    const auto* generic = reinterpret_cast<const sockaddr*>(&address);
+    const vela_test::Descriptor server(MakeSocket());
+    umask(0);
+    if (bind(server.Get(), generic, sizeof(address)) != 0 ||
+        listen(server.Get(), kind == Listener::kFullQueue ? 0 : 5) != 0) {
+      return;
+    }
+    const vela_test::Descriptor client(MakeSocket());
+    if (kind == Listener::kFullQueue) {
+      connect(client.Get(), generic, sizeof(address));
+    }
+    WriteFile("/tmp/listening", "");
+    while (kind == Listener::kAnswering) {
+      const vela_test::Descriptor connection(accept4(server.Get(), nullptr, nullptr, SOCK_CLOEXEC));
+      constexpr char kReply[] = "{\"success\":true,\"result\":true,\"version\":1}\n";
+      send(connection.Get(), kReply, sizeof(kReply) - 1, MSG_NOSIGNAL);
+    }
+    pause();
+  }
+
+  pid_t process_ = 0;
+};
+
+/// In a sandbox with one user the listeners are its own, and are believed.
+void ExpectRefusedAtOnce(Listener kind) {
+  const Stopwatch watch;
+  if (HasOtherUsers()) {
+    ExpectFailure(ECONNREFUSED, 10);
+    EXPECT_LT(watch.Seconds(), 1.0);
+  } else if (kind == Listener::kAnswering) {
+    EXPECT_EQ(Reply()["version"].asInt(), 1);
+  }
+}
+
+TEST_F(SocketExchange, RefusesAListenerOfAnotherUserAtOnce) {
+  ASSERT_EQ(chmod("/tmp", 01777), 0);
+  for (const Listener kind : {Listener::kSilent, Listener::kFullQueue, Listener::kAnswering}) {
+    SCOPED_TRACE(static_cast<int>(kind));
+    const ListenerOfAnotherUser listener(kDaemonSocket, kind);
+    ExpectRefusedAtOnce(kind);
+    RemoveTree(kDaemonSocket);
+  }
+}
+
+TEST_F(SocketExchange, RefusesAListenerOfAnotherUserWhoseSocketSeemsToBeRoots) {
+  ASSERT_EQ(chmod("/tmp", 01777), 0);
+  const ListenerOfAnotherUser listener(kDaemonSocket, Listener::kAnswering);
+  ASSERT_EQ(chown(kDaemonSocket, 0, 0), 0);
+  ExpectRefusedAtOnce(Listener::kAnswering);
+}
+
+TEST_F(SocketExchange, FollowsALinkOfTheUserButNotOfAnother) {
+  DaemonPeer daemon("/tmp/elsewhere");
+  ASSERT_EQ(symlink("/tmp/elsewhere", kDaemonSocket), 0);
+  daemon.SetIndexVersion(3);
+  EXPECT_EQ(Reply()["version"].asInt(), 3);
+  if (HasOtherUsers()) {
+    ASSERT_EQ(lchown(kDaemonSocket, 1, 1), 0);
+    ExpectFailure(ECONNREFUSED);
+    EXPECT_EQ(daemon.Requests().size(), 1U);
+  }
+}
+
+TEST_F(SocketExchange, WaitsForNothingThatIsNoSocket) {
+  ASSERT_EQ(mkfifo(kDaemonSocket, 0666), 0);
+  ExpectFailure(ECONNREFUSED);
+  RemoveTree(kDaemonSocket);
+  ASSERT_EQ(symlink(kDaemonSocket, kDaemonSocket), 0);
+  ExpectFailure(ELOOP);
+  RemoveTree(kDaemonSocket);
+  ASSERT_EQ(symlink("/tmp/absent", kDaemonSocket), 0);
+  ExpectFailure(ENOENT);
 }
 
 }  // namespace

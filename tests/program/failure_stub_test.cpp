@@ -1,10 +1,12 @@
 // The results of a failed conversion: markers, counts and reports.
 #include <signal.h>
 #include <sys/stat.h>
+#include <sys/syscall.h>
 #include <unistd.h>
 
 #include "program/stub_program_test.h"
 #include "support/mounts.h"
+#include "support/seccomp_fail.h"
 
 namespace vela_test {
 namespace {
@@ -223,6 +225,15 @@ TEST_F(Failure, OtherThumbnailsDoNotTakeThePlaceOfTheReference) {
   WriteProfileFile(kProfiles, {Profile("B", 640, 1), Profile("S", 120, 2)});
   PutThumbs(kPhoto, {"XL", "M"});
   ExpectSkipped(RunWithDaemon());
+}
+
+TEST_F(Failure, OfSettingAModeIsLoggedOnly) {
+  RunWithDaemon({kPhotos}, WithSteps({SeccompFail({SYS_fchmod}, EPERM)}));
+  EXPECT_EQ(MetadataOf(kPhoto),
+            Strings({"VELAPHOTO_THUMB_B.jpg", "VELAPHOTO_THUMB_M.jpg", "VELAPHOTO_THUMB_XL.jpg"}));
+  EXPECT_THAT(ErrorLines(),
+              ::testing::Contains("velamk_photo_thumb:437 [Error] Failed to chmod [" +
+                                  Thumb(kPhoto, "XL") + "], Operation not permitted"));
 }
 
 }  // namespace

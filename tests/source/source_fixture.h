@@ -11,6 +11,7 @@
 #include <string>
 #include <vector>
 
+#include "header/header_reader.h"
 #include "profiles/directory_job.h"
 #include "profiles/thumbnail_profile.h"
 #include "support/files.h"
@@ -72,6 +73,7 @@ class SourceTest : public SandboxTest {
 
   /// Fails if a child was not waited for.
   void TearDown() override {
+    vela::EndHeaderReader();
     EXPECT_EQ(waitpid(-1, nullptr, WNOHANG), -1) << "a child was left";
     EXPECT_EQ(errno, ECHILD);
   }

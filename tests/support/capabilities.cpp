@@ -7,6 +7,7 @@
 #include <unistd.h>
 
 #include <cerrno>
+#include <fstream>
 
 #include "support/environment_failure.h"
 #include "support/privileges.h"

@@ -4,6 +4,8 @@
 
 #include <cstdint>
 
+#include "support/users.h"
+
 namespace vela_test {
 
 /// As long as the object exists the calling thread has no capabilities, so that permission bits

@@ -8,6 +8,7 @@
 #include <algorithm>
 #include <cstdlib>
 #include <map>
+#include <sstream>
 
 #include "support/build_paths.h"
 #include "support/environment_failure.h"
@@ -42,6 +43,21 @@ void InstallLink(const std::string& target, const std::string& path) {
   if (symlink(target.c_str(), path.c_str()) != 0) {
     EnvironmentFailureWithErrno("cannot make " + path);
   }
+}
+
+constexpr const char* kUnconfinedTools = "/usr/vela/etc/unconfined-tools";
+
+/// Adds or removes the tool's line in the list of those that run unconfined: a stub writes its
+/// record and whatever its plan says.
+void SetUnconfined(const std::string& path, bool isUnconfined) {
+  std::istringstream old(Exists(kUnconfinedTools) ? ReadFile(kUnconfinedTools) : "");
+  std::string list;
+  for (std::string line; std::getline(old, line);) {
+    list += line == path ? "" : line + "\n";
+  }
+  MakeDirectories("/usr/vela/etc");
+  WriteFile(kUnconfinedTools, isUnconfined ? list + path + "\n" : list);
+  chmod(kUnconfinedTools, 0644);
 }
 
 Record ParseRecord(const std::string& text) {
@@ -132,6 +148,7 @@ StubTool::StubTool(const std::string& path) : tool_(BaseName(path)) {
   chmod((directory + "/calls").c_str(), 0666);  // the stub may run as another user
   Plan(StubPlan::Normal());
   InstallLink(StubToolPath(), path);
+  SetUnconfined(path, true);
 }
 
 void StubTool::Plan(const StubPlan& plan) const {
@@ -193,10 +210,12 @@ void InstallRealConverter() {
   InstallLink(IsOwnConverterReal() ? OwnConverterPath()
                                    : SourceDirectory() + "/programs/convert-thumb/convert-thumb.sh",
               kConverterPath);
+  SetUnconfined(kConverterPath, false);
 }
 
 void InstallRealExiftool() {
   InstallLink("/usr/bin/exiftool", kExiftoolPath);
+  SetUnconfined(kExiftoolPath, false);
 }
 
 void InstallRealTools() {

@@ -33,4 +33,15 @@ std::string DirectoryOf(const std::string& path) {
   return slash == 0 ? "/" : path.substr(0, slash);
 }
 
+std::string WithoutDoubledPercents(const std::string& text) {
+  std::string plain;
+  for (size_t i = 0; i < text.size(); ++i) {
+    plain += text[i];
+    if (text[i] == '%' && i + 1 < text.size() && text[i + 1] == '%') {
+      ++i;
+    }
+  }
+  return plain;
+}
+
 }  // namespace vela

@@ -15,4 +15,7 @@ std::string_view ExtensionOf(std::string_view path);
 /// Returns the directory of the file at `path`, "." when the path does not name one.
 std::string DirectoryOf(const std::string& path);
 
+/// Returns the text with each "%%" replaced by "%".
+std::string WithoutDoubledPercents(const std::string& text);
+
 }  // namespace vela

@@ -10,17 +10,6 @@ namespace {
 
 constexpr char kNullDevice[] = "/dev/null";
 
-std::string WithoutDoubledPercents(const std::string& text) {
-  std::string plain;
-  for (size_t i = 0; i < text.size(); ++i) {
-    plain += text[i];
-    if (text[i] == '%' && i + 1 < text.size() && text[i + 1] == '%') {
-      ++i;
-    }
-  }
-  return plain;
-}
-
 void AddUnique(std::vector<std::string>& list, const std::string& text) {
   if (std::find(list.begin(), list.end(), text) == list.end()) {
     list.push_back(text);
@@ -29,7 +18,6 @@ void AddUnique(std::vector<std::string>& list, const std::string& text) {
 
 void AddOutput(WritablePaths& paths, const std::string& path) {
   AddUnique(paths.directories, DirectoryOf(path));
-  paths.files.push_back(path);
 }
 
 void AddOutputArgument(WritablePaths& paths, const std::string& argument) {

@@ -2,11 +2,11 @@
 #pragma once
 
 #include "command_line/command_line.h"
-#include "process/landlock.h"
+#include "posix/landlock.h"
 
 namespace vela {
 
-/// Returns the outputs with their directories, the directory for temporary files and /dev/null. The
+/// Returns the directories of the outputs, the directory for temporary files and /dev/null. The
 /// paths need not exist.
 WritablePaths FindWritablePaths(const CommandLine& line);
 

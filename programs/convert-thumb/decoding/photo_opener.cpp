@@ -4,9 +4,9 @@
 
 #include "command_line/file_name.h"
 #include "decoding/jpeg_reader.h"
-#include "decoding/photo_format.h"
 #include "decoding/pnm_reader.h"
 #include "decoding/vips_reader.h"
+#include "picture/photo_format.h"
 
 namespace vela {
 
@@ -15,6 +15,22 @@ namespace {
 bool HasTiffExtension(const std::string& path) {
   const std::string_view extension = ExtensionOf(path);
   return EqualsIgnoringCase(extension, "tif") || EqualsIgnoringCase(extension, "tiff");
+}
+
+bool IsReadByVips(PhotoFormat format, const std::string& path) {
+  switch (format) {
+    case PhotoFormat::kTiff:
+      // Many camera raw formats are based on TIFF, with a tiny preview as the first page.
+      return HasTiffExtension(path);
+    case PhotoFormat::kPng:
+    case PhotoFormat::kGif:
+    case PhotoFormat::kWebp:
+    case PhotoFormat::kHeif:
+    case PhotoFormat::kJpeg2000:
+      return true;
+    default:
+      return false;
+  }
 }
 
 std::unique_ptr<PhotoReader> MakeReader(int descriptor, const ConversionPlan& plan,
@@ -26,9 +42,7 @@ std::unique_ptr<PhotoReader> MakeReader(int descriptor, const ConversionPlan& pl
   if (format == PhotoFormat::kPnm) {
     return std::make_unique<PnmReader>(descriptor, plan.firstPageOnly);
   }
-  // Many camera raw formats are based on TIFF, with a tiny preview as the first page.
-  if (format == PhotoFormat::kUnknown ||
-      (format == PhotoFormat::kTiff && !HasTiffExtension(plan.source))) {
+  if (!IsReadByVips(format, plan.source)) {
     return nullptr;
   }
   return std::make_unique<VipsReader>(VipsSourceFile{descriptor, format, plan.firstPageOnly},

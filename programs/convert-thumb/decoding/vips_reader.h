@@ -5,8 +5,8 @@
 #include <cstdint>
 #include <memory>
 
-#include "decoding/photo_format.h"
 #include "decoding/photo_reader.h"
+#include "picture/photo_format.h"
 
 namespace vela {
 

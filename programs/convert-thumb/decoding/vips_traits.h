@@ -1,9 +1,9 @@
 // Properties of a picture that libvips reports.
 #pragma once
 
-#include "decoding/photo_format.h"
 #include "decoding/pixel_rows.h"
 #include "decoding/vips_library.h"
+#include "picture/photo_format.h"
 #include "picture/photo_traits.h"
 
 namespace vela {

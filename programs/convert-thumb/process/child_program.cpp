@@ -52,21 +52,29 @@ void ForwardSignals() {
   }
 }
 
-[[noreturn]] void ExecuteProgram(const char* program, char* const* arguments, pid_t parent,
-                                 const sigset_t& mask) {
+[[noreturn]] void Execute(const std::vector<const char*>& programs, char* const* arguments,
+                          pid_t parent, const sigset_t& mask) {
   prctl(PR_SET_PDEATHSIG, SIGKILL);
   // The parent may have ended before that call.
   if (getppid() == parent) {
     sigprocmask(SIG_SETMASK, &mask, nullptr);
-    execv(program, arguments);
-    ReportFailure("%s: %s", program, std::strerror(errno));
+    for (const char* const program : programs) {
+      execv(program, arguments);
+    }
+    ReportFailure("%s: %s", programs.back(), std::strerror(errno));
     IgnoreWriteSignals();
     PrintFailure();
   }
   _exit(kFailed);
 }
 
-[[noreturn]] void ExitAs(int waitStatus) {
+[[noreturn]] void ExitAs(int waitStatus, const std::function<bool(bool)>& finish) {
+  const bool succeeded = WIFEXITED(waitStatus) && WEXITSTATUS(waitStatus) == 0;
+  if (!finish(succeeded) && succeeded) {
+    IgnoreWriteSignals();
+    PrintFailure();
+    _exit(kFailed);
+  }
   if (WIFEXITED(waitStatus)) {
     _exit(WEXITSTATUS(waitStatus));
   }
@@ -104,7 +112,8 @@ void ReplaceProcess(const char* program, char* const* arguments) {
   execv(program, arguments);
 }
 
-void RunInChildAndExit(const char* program, char* const* arguments) {
+void RunInChildAndExit(const std::vector<const char*>& programs, char* const* arguments,
+                       const std::function<bool(bool)>& finish) {
   const pid_t self = getpid();
   const sigset_t forwarded = ForwardedSignals();
   sigset_t mask;
@@ -113,7 +122,7 @@ void RunInChildAndExit(const char* program, char* const* arguments) {
   ResetChildSignal();
   const pid_t child = fork();
   if (child == 0) {
-    ExecuteProgram(program, arguments, self, mask);
+    Execute(programs, arguments, self, mask);
   }
   if (child > 0) {
     g_child = child;
@@ -126,7 +135,7 @@ void RunInChildAndExit(const char* program, char* const* arguments) {
     return;
   }
   if (const std::optional<int> status = WaitForExit(child)) {
-    ExitAs(*status);
+    ExitAs(*status, finish);
   }
 }
 

@@ -1,8 +1,7 @@
 #include "process/confinement.h"
 
-#include "process/landlock.h"
-#include "process/resource_limits.h"
-#include "process/system_calls.h"
+#include "posix/confinement.h"
+#include "posix/system_call_filter.h"
 
 namespace vela {
 

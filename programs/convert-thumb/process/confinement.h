@@ -1,7 +1,7 @@
 // Drops privileges that the process does not need, before it reads a photo.
 #pragma once
 
-#include "process/landlock.h"
+#include "posix/landlock.h"
 
 namespace vela {
 

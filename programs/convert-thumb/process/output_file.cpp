@@ -2,6 +2,7 @@
 
 #include <fcntl.h>
 #include <sys/stat.h>
+#include <sys/sysmacros.h>
 #include <sys/xattr.h>
 #include <unistd.h>
 
@@ -34,15 +35,15 @@ bool CanBeReplaced(const FileDescriptor& file, const struct stat& status) {
          status.st_gid == getegid() && !HasExtendedAttributes(file);
 }
 
-/// In the same directory as `path`, for renaming. Short, however long the name of `path` is.
-std::string ScratchName(const std::string& path) {
-  return path.substr(0, path.rfind('/') + 1) + "VELAPHOTO.tmp." + std::to_string(getpid());
+/// For renaming. Short, however long the name of the file is.
+std::string ScratchName() {
+  return "VELAPHOTO.tmp." + std::to_string(getpid());
 }
 
 /// Creates a new file with exactly these permissions.
-FileDescriptor CreateFile(const std::string& path, mode_t mode) {
+FileDescriptor CreateFile(const FileDescriptor& directory, const std::string& name, mode_t mode) {
   const mode_t mask = umask(0);
-  FileDescriptor file(open(path.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, mode));
+  FileDescriptor file = CreateOutput(directory, name, mode);
   umask(mask);
   return file;
 }
@@ -56,74 +57,120 @@ bool HasAttributes(const FileDescriptor& file, const FileAttributes& attributes)
 }
 
 /// After a power failure, the name must not refer to a file whose content was never stored.
-bool WriteDurably(FileDescriptor& file, const unsigned char* bytes, size_t size) {
-  return Write(file, bytes, size) && fdatasync(file.Get()) == 0 && file.Close();
+bool WriteDurably(const FileDescriptor& file, const unsigned char* bytes, size_t size) {
+  return Write(file, bytes, size) && fdatasync(file.Get()) == 0;
 }
 
-Replacement ReplaceThrough(const std::string& scratch, const std::string& path,
-                           const unsigned char* bytes, size_t size, const FileAttributes& former) {
-  FileDescriptor file = CreateFile(scratch, former.mode & 07777U);
-  if (!file.IsOpen()) {
-    return errno == EACCES ? Replacement::kImpossible : Replacement::kFailed;
-  }
-  if (!HasAttributes(file, former)) {
+/// Renames the scratch file to the file's name.
+bool MoveInto(const Place& place, const std::string& scratch) {
+  return renameat(place.directory.Get(), scratch.c_str(), place.directory.Get(),
+                  place.name.c_str()) == 0;
+}
+
+Replacement FillAndMove(const FileDescriptor& file, const std::string& scratch,
+                        const ReplaceableFile& former, const unsigned char* bytes, size_t size) {
+  if (!HasAttributes(file, former.attributes)) {
     return Replacement::kImpossible;
   }
-  return WriteDurably(file, bytes, size) && std::rename(scratch.c_str(), path.c_str()) == 0
-             ? Replacement::kDone
-             : Replacement::kFailed;
+  return WriteDurably(file, bytes, size) && MoveInto(former.place, scratch) ? Replacement::kDone
+                                                                            : Replacement::kFailed;
 }
 
-/// An output that is open for writing.
-struct OpenOutput {
-  FileDescriptor file;
-  bool isDevice = false;
-};
+bool IsOwnFile(const struct stat& status) {
+  return S_ISREG(status.st_mode) && status.st_nlink == 1 && status.st_uid == geteuid();
+}
 
-/// Opens regular files and character devices only. Does not wait for the reader of a pipe.
-OpenOutput OpenForWriting(const std::string& path) {
-  FileDescriptor file(
-      open(path.c_str(), O_WRONLY | O_CREAT | O_TRUNC | O_CLOEXEC | O_NOCTTY | O_NONBLOCK, 0666));
+/// Makes room for a new file. Returns false, with errno set, when something is there that must not
+/// be replaced.
+bool RemoveFormer(const Place& place) {
   struct stat status;
-  const bool isAccepted = file.IsOpen() && fstat(file.Get(), &status) == 0 &&
-                          (S_ISREG(status.st_mode) || S_ISCHR(status.st_mode)) &&
-                          fcntl(file.Get(), F_SETFL, 0) == 0;
+  if (fstatat(place.directory.Get(), place.name.c_str(), &status, AT_SYMLINK_NOFOLLOW) != 0) {
+    return errno == ENOENT;
+  }
+  if (!IsOwnFile(status)) {
+    errno = EEXIST;
+    return false;
+  }
+  return unlinkat(place.directory.Get(), place.name.c_str(), 0) == 0;
+}
+
+bool IsNullDevice(const struct stat& status) {
+  return S_ISCHR(status.st_mode) && status.st_rdev == makedev(1, 3);
+}
+
+/// Opens an existing character device that may be written to. A device that others have put there
+/// could be any device of the machine; only the null device is always harmless.
+FileDescriptor OpenDevice(const Place& place) {
+  // Without side effects, whatever is there.
+  const FileDescriptor file(openat(place.directory.Get(), place.name.c_str(), O_PATH | O_CLOEXEC));
+  struct stat status;
+  const bool isAccepted =
+      file.IsOpen() && fstat(file.Get(), &status) == 0 &&
+      (IsNullDevice(status) || (S_ISCHR(status.st_mode) && IsPrivate(place.directory)));
   if (!isAccepted) {
     return {};
   }
-  return {std::move(file), S_ISCHR(status.st_mode)};
+  const std::string path = "/proc/self/fd/" + std::to_string(file.Get());
+  return FileDescriptor(open(path.c_str(), O_WRONLY | O_CLOEXEC | O_NOCTTY));
 }
 
 }  // namespace
 
+OpenOutput OpenForWriting(const std::string& path) {
+  const std::optional<Place> place = FindPlace(path);
+  if (!place) {
+    return {};
+  }
+  FileDescriptor device = OpenDevice(*place);
+  if (device.IsOpen()) {
+    return {std::move(device), true};
+  }
+  if (!RemoveFormer(*place)) {
+    return {};
+  }
+  return {CreateOutput(place->directory, place->name, 0666), false};
+}
+
 bool WriteOutputFile(const std::string& path, const unsigned char* bytes, size_t size) {
-  if (!RegisterOutput(path)) {
-    return false;
-  }
-  OpenOutput output = OpenForWriting(path);
+  const OpenOutput output = OpenForWriting(path);
   if (!output.file.IsOpen()) {
-    UnregisterOutput(path);
     return false;
   }
-  const bool written = Write(output.file, bytes, size);
-  if (output.file.Close() && written) {
+  if (Write(output.file, bytes, size)) {
     return true;
   }
   if (!output.isDevice) {
-    unlink(path.c_str());
+    RemoveOutput(output.file);
   }
   return false;
 }
 
+bool MayBeOverwritten(const std::string& path, const FileDescriptor& file) {
+  const std::optional<Place> place = FindPlace(path);
+  struct stat opened;
+  struct stat named;
+  if (!place || fstat(file.Get(), &opened) != 0 ||
+      fstatat(place->directory.Get(), place->name.c_str(), &named, AT_SYMLINK_NOFOLLOW) != 0) {
+    return false;
+  }
+  const bool isSame = opened.st_dev == named.st_dev && opened.st_ino == named.st_ino;
+  return (isSame && IsOwnFile(opened)) || IsPrivate(place->directory);
+}
+
 std::optional<ReplaceableFile> ReadReplaceableFile(const std::string& path, size_t limit) {
-  const FileDescriptor file(
-      open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NOCTTY | O_NONBLOCK | O_NOFOLLOW));
+  std::optional<Place> place = FindPlace(path);
+  if (!place) {
+    return std::nullopt;
+  }
+  const FileDescriptor file(openat(place->directory.Get(), place->name.c_str(),
+                                   O_RDONLY | O_CLOEXEC | O_NOCTTY | O_NONBLOCK | O_NOFOLLOW));
   struct stat status;
   if (!file.IsOpen() || fstat(file.Get(), &status) != 0 || !CanBeReplaced(file, status) ||
       static_cast<size_t>(status.st_size) > limit) {
     return std::nullopt;
   }
   ReplaceableFile content;
+  content.place = std::move(*place);
   content.attributes = {status.st_uid, status.st_gid, status.st_mode};
   content.bytes.resize(static_cast<size_t>(status.st_size));
   if (!ReadExactly(file.Get(), content.bytes.data(), content.bytes.size())) {
@@ -132,18 +179,21 @@ std::optional<ReplaceableFile> ReadReplaceableFile(const std::string& path, size
   return content;
 }
 
-Replacement ReplaceFile(const std::string& path, const unsigned char* bytes, size_t size,
-                        const FileAttributes& former) {
-  const std::string scratch = ScratchName(path);
+Replacement ReplaceFile(const ReplaceableFile& former, const unsigned char* bytes, size_t size) {
+  const std::string scratch = ScratchName();
   // A killed process with the same process id may have left one.
-  unlink(scratch.c_str());
-  RegisterOutput(scratch);
-  const Replacement result = ReplaceThrough(scratch, path, bytes, size, former);
-  const int error = errno;
-  if (result != Replacement::kDone) {
-    unlink(scratch.c_str());
+  unlinkat(former.place.directory.Get(), scratch.c_str(), 0);
+  const FileDescriptor file =
+      CreateFile(former.place.directory, scratch, former.attributes.mode & 07777U);
+  if (!file.IsOpen()) {
+    return errno == EACCES ? Replacement::kImpossible : Replacement::kFailed;
   }
-  errno = error;
+  const Replacement result = FillAndMove(file, scratch, former, bytes, size);
+  if (result != Replacement::kDone) {
+    const int error = errno;
+    RemoveOutput(file);
+    errno = error;
+  }
   return result;
 }
 

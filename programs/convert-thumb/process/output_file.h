@@ -6,12 +6,32 @@
 #include <string>
 #include <vector>
 
+#include "posix/file_descriptor.h"
+#include "process/trusted_path.h"
+
 namespace vela {
 
-/// Writes the whole file: a new one, with mode 0666 reduced by the file creation mask, or over an
-/// existing one or a character device. Returns false when some bytes may not have been written or
-/// `path` is any other kind of file; the incomplete file is removed. May be called by any thread.
+/// An output that is open for writing.
+struct OpenOutput {
+  FileDescriptor file;    ///< not open when the output is refused; errno is set then
+  bool isDevice = false;  ///< not a file of this run
+};
+
+/// Opens an output: a new file with mode 0666 reduced by the file creation mask. An existing file
+/// is replaced if it is a regular file of the effective user with a single name. Also accepted are
+/// the null device, by any name, and another character device in a directory that nobody else can
+/// change. Everything else is refused: symbolic links, pipes, files of other users or with several
+/// names. May be called by any thread.
+OpenOutput OpenForWriting(const std::string& path);
+
+/// Writes the whole file, as opened by OpenForWriting. Returns false when it is refused or some
+/// bytes may not have been written; the incomplete file is removed. May be called by any thread.
 bool WriteOutputFile(const std::string& path, const unsigned char* bytes, size_t size);
+
+/// Returns true when another program may write to `file`, the open file at `path`: a regular file
+/// of the effective user with a single name and not behind a symbolic link, or any file whose name
+/// is in a directory that nobody else can change.
+bool MayBeOverwritten(const std::string& path, const FileDescriptor& file);
 
 /// The attributes that a replacement shares with the file that it replaces.
 struct FileAttributes {
@@ -22,6 +42,7 @@ struct FileAttributes {
 
 /// A file that ReplaceFile can replace.
 struct ReplaceableFile {
+  Place place;
   FileAttributes attributes;
   std::vector<unsigned char> bytes;
 };
@@ -38,9 +59,8 @@ enum class Replacement {
   kImpossible,  ///< no new file with the same attributes can be created there
 };
 
-/// Atomically replaces the file at `path` with a new one that has the attributes `former` and no
-/// others. The old file is unchanged unless the result is kDone. Called while there is one thread.
-Replacement ReplaceFile(const std::string& path, const unsigned char* bytes, size_t size,
-                        const FileAttributes& former);
+/// Atomically replaces the file with a new one that has the same attributes and no others. The old
+/// file is unchanged unless the result is kDone. Called while there is one thread.
+Replacement ReplaceFile(const ReplaceableFile& former, const unsigned char* bytes, size_t size);
 
 }  // namespace vela

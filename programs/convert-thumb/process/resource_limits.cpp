@@ -1,7 +1,5 @@
 #include "process/resource_limits.h"
 
-#include <sys/resource.h>
-
 #include <algorithm>
 #include <charconv>
 #include <cstdio>
@@ -12,16 +10,12 @@
 
 #include "platform/system_rules.h"
 #include "platform/vlibc.h"
+#include "posix/confinement.h"
 #include "process/worker_threads.h"
 
 namespace vela {
 
 namespace {
-
-/// From SIGXCPU until the kernel kills the process.
-constexpr rlim_t kGraceSeconds = 5;
-/// The only size that also keeps crash handlers, which read core dumps from a pipe, from being run.
-constexpr rlim_t kNoCoreDump = 1;
 
 constexpr char kKey[] = "convert_memory_limit";
 constexpr size_t kDefaultLimit = CONVERT_THUMB_MEMORY_LIMIT;
@@ -56,27 +50,11 @@ std::optional<size_t> ParseSize(std::string_view text) {
   return number << *doublings;
 }
 
-void Lower(int resource, rlim_t soft, rlim_t hard) {
-  const auto kind = static_cast<__rlimit_resource>(resource);
-  rlimit limit = {};
-  if (getrlimit(kind, &limit) != 0) {
-    return;
-  }
-  limit.rlim_max = std::min(limit.rlim_max, hard);
-  limit.rlim_cur = std::min({limit.rlim_cur, limit.rlim_max, soft});
-  setrlimit(kind, &limit);
-}
-
-void LimitMemory(size_t memoryLimit) {
-// A sanitizer reserves many times the memory of any limit.
-#if !defined(CONVERT_THUMB_SANITIZED)
+/// Returns the memory limit of the process.
+size_t ProcessMemoryLimit(size_t memoryLimit) {
   const size_t besides = kBaseMemory + kStackMemory * ProcessorCount();
   const size_t most = std::numeric_limits<size_t>::max() - besides;
-  const rlim_t limit = std::min(memoryLimit, most) + besides;
-  Lower(RLIMIT_DATA, limit, limit);
-#else
-  static_cast<void>(memoryLimit);
-#endif
+  return std::min(memoryLimit, most) + besides;
 }
 
 }  // namespace
@@ -95,17 +73,10 @@ size_t ConversionMemoryLimit() {
 }
 
 void LimitResources(size_t memoryLimit) {
-  LimitMemory(memoryLimit);
-  Lower(RLIMIT_CPU, kMaxProcessorSeconds, kMaxProcessorSeconds + kGraceSeconds);
-}
-
-void DisableCoreDumps() {
-  rlimit limit = {};
-  getrlimit(RLIMIT_CORE, &limit);
-  limit.rlim_max = std::min(limit.rlim_max, kNoCoreDump);
-  // A limit of 0 is raised, because it would not keep crash handlers from being run.
-  limit.rlim_cur = limit.rlim_max;
-  setrlimit(RLIMIT_CORE, &limit);
+  ResourceLimits limits;
+  limits.memory = ProcessMemoryLimit(memoryLimit);
+  limits.processorSeconds = kMaxProcessorSeconds;
+  LowerLimits(limits);
 }
 
 }  // namespace vela

@@ -25,7 +25,4 @@ size_t ConversionMemoryLimit();
 /// Existing lower limits stay.
 void LimitResources(size_t memoryLimit);
 
-/// Makes sure that a crash leaves no core dump, neither as a file nor with a crash handler.
-void DisableCoreDumps();
-
 }  // namespace vela

@@ -35,13 +35,8 @@ FileType TypeOf(int descriptor) {
   return fstat(descriptor, &status) == 0 ? TypeOf(status) : FileType::kNone;
 }
 
-FileDescriptor OpenForProgram(const std::string& path) {
-  FileDescriptor file(
-      open(path.c_str(), O_RDONLY | O_NOCTTY | O_NONBLOCK));  // NOLINT: inherited on purpose
-  if (file.IsOpen() && fcntl(file.Get(), F_SETFL, 0) != 0) {
-    file.Reset();
-  }
-  return file;
+bool PassToPrograms(const FileDescriptor& file) {
+  return fcntl(file.Get(), F_SETFD, 0) == 0;
 }
 
 FileDescriptor Duplicate(int descriptor) {

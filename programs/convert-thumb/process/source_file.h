@@ -24,9 +24,9 @@ enum class FileType {
 FileType TypeOf(const std::string& path);
 FileType TypeOf(int descriptor);
 
-/// Opens a file as OpenForReading does, for a descriptor that is passed to another program: reads
-/// through it wait for data as usual.
-FileDescriptor OpenForProgram(const std::string& path);
+/// Lets programs that this process starts inherit the descriptor. Returns false, with errno set, on
+/// failure.
+bool PassToPrograms(const FileDescriptor& file);
 
 /// Returns a second descriptor of the same open file; not open, with errno set, on failure.
 FileDescriptor Duplicate(int descriptor);

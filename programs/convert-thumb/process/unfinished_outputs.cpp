@@ -1,12 +1,18 @@
 #include "process/unfinished_outputs.h"
 
+#include <fcntl.h>
+#include <sys/stat.h>
 #include <unistd.h>
 
 #include <atomic>
+#include <cerrno>
 #include <csignal>
 #include <cstring>
+#include <ctime>
+#include <memory>
 
-#include "process/source_file.h"
+#include "posix/signal_block.h"
+#include "process/failure_report.h"
 
 namespace vela {
 
@@ -15,17 +21,21 @@ namespace {
 constexpr int kFailed = 1;
 
 /// An entry of a list that a signal handler can read at any time: entries are never removed.
-struct RegisteredOutput {
-  explicit RegisteredOutput(const std::string& name) : path(name) {}
-
-  const std::string path;
-  std::atomic<bool> isDropped{false};
-  RegisteredOutput* next = nullptr;
+struct Output {
+  FileDescriptor directory;
+  std::string name;
+  /// Keeps the number of the file from being used again.
+  FileDescriptor file;
+  struct stat status = {};
+  Output* next = nullptr;
 };
-std::atomic<RegisteredOutput*> g_outputs{nullptr};
-static_assert(std::atomic<RegisteredOutput*>::is_always_lock_free);
+std::atomic<Output*> g_outputs{nullptr};
+static_assert(std::atomic<Output*>::is_always_lock_free);
 std::atomic<bool> g_isEnding{false};
 static_assert(std::atomic<bool>::is_always_lock_free);
+/// Files that may exist already but are not in the list yet.
+std::atomic<int> g_beingCreated{0};
+static_assert(std::atomic<int>::is_always_lock_free);
 
 struct FatalSignal {
   int number;
@@ -43,46 +53,109 @@ void Print(const char* message) {
   static_cast<void>(written);  // there is no other place to report it
 }
 
+bool IsSameFile(const struct stat& a, const struct stat& b) {
+  return a.st_dev == b.st_dev && a.st_ino == b.st_ino;
+}
+
+/// The name is examined and removed in two steps, but whoever can exchange the file in between can
+/// also remove it.
+void Remove(const Output& output) {
+  struct stat present;
+  if (fstatat(output.directory.Get(), output.name.c_str(), &present, AT_SYMLINK_NOFOLLOW) == 0 &&
+      IsSameFile(present, output.status)) {
+    unlinkat(output.directory.Get(), output.name.c_str(), 0);
+  }
+}
+
+void AddToList(Output* output) {
+  output->next = g_outputs;
+  while (!g_outputs.compare_exchange_weak(output->next, output)) {
+  }
+}
+
+/// Other threads may be about to add a file. The wait is limited in case that file system hangs.
+void WaitForNewOutputs() {
+  constexpr timespec kMillisecond = {0, 1000000};
+  constexpr int kMostWaits = 1000;
+  for (int waits = 0; g_beingCreated > 0 && waits < kMostWaits; ++waits) {
+    nanosleep(&kMillisecond, nullptr);
+  }
+}
+
 void EndOnSignal(int number) {
-  RemoveRegisteredOutputs();
+  RemoveOutputs();
   for (const FatalSignal& fatal : kFatalSignals) {
     if (fatal.number == number) {
       Print(fatal.message);
     }
   }
-  // Another thread may have been about to create one.
-  RemoveRegisteredOutputs();
   _exit(kFailed);
+}
+
+/// Creates the file of an output whose directory and name are set.
+FileDescriptor Create(Output& output, unsigned mode) {
+  if (g_isEnding) {
+    errno = ECANCELED;
+    return {};
+  }
+  FileDescriptor file(openat(output.directory.Get(), output.name.c_str(),
+                             O_RDWR | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC, mode));
+  if (file.IsOpen()) {
+    output.file.Reset(fcntl(file.Get(), F_DUPFD_CLOEXEC, 0));
+  }
+  return file;
 }
 
 }  // namespace
 
-bool RegisterOutput(const std::string& path) {
-  auto* const output = new RegisteredOutput(path);
-  output->next = g_outputs;
-  while (!g_outputs.compare_exchange_weak(output->next, output)) {
+FileDescriptor CreateOutput(const FileDescriptor& directory, const std::string& name,
+                            unsigned mode) {
+  auto output = std::make_unique<Output>();
+  output->directory.Reset(fcntl(directory.Get(), F_DUPFD_CLOEXEC, 0));
+  output->name = name;
+  // A handler in this thread would wait for this function.
+  const SignalBlock block;
+  // Counted before the check: either this call sees that the run is ending, or the removal waits.
+  ++g_beingCreated;
+  FileDescriptor file = Create(*output, mode);
+  if (file.IsOpen() && fstat(file.Get(), &output->status) == 0) {
+    AddToList(output.release());
   }
-  // Checked after the registration: either this call sees that the run is ending, or the removal
-  // sees the new entry.
-  return !g_isEnding;
+  --g_beingCreated;
+  return file;
 }
 
-void UnregisterOutput(const std::string& path) {
-  for (RegisteredOutput* output = g_outputs; output != nullptr; output = output->next) {
-    if (!output->isDropped && output->path == path) {
-      output->isDropped = true;
-      return;
+void RemoveOutput(const FileDescriptor& output) {
+  struct stat status;
+  if (fstat(output.Get(), &status) != 0) {
+    return;
+  }
+  for (const Output* entry = g_outputs; entry != nullptr; entry = entry->next) {
+    if (IsSameFile(entry->status, status)) {
+      Remove(*entry);
     }
   }
 }
 
-void RemoveRegisteredOutputs() {
+bool SyncOutputs() {
+  // Lets the disk work on all of them at the same time.
+  for (const Output* output = g_outputs; output != nullptr; output = output->next) {
+    sync_file_range(output->file.Get(), 0, 0, SYNC_FILE_RANGE_WRITE);
+  }
+  for (const Output* output = g_outputs; output != nullptr; output = output->next) {
+    if (fdatasync(output->file.Get()) != 0) {
+      ReportFailure("cannot write %s: %s", output->name.c_str(), std::strerror(errno));
+      return false;
+    }
+  }
+  return true;
+}
+
+void RemoveOutputs() {
   g_isEnding = true;
-  for (const RegisteredOutput* output = g_outputs; output != nullptr; output = output->next) {
-    // Devices are kept.
-    if (!output->isDropped && TypeOf(output->path) == FileType::kRegular) {
-      unlink(output->path.c_str());
-    }
+  WaitForNewOutputs();
+  for (const Output* output = g_outputs; output != nullptr; output = output->next) {
+    Remove(*output);
   }
 }
 

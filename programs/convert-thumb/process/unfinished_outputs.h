@@ -1,24 +1,34 @@
-// Removes the outputs of a run that fails.
+// The files that a run creates; removed when it fails.
 #pragma once
 
 #include <string>
 
+#include "posix/file_descriptor.h"
+
 namespace vela {
 
-/// Records that this run is about to create the file. Returns false when the run is already ending
-/// and the file must not be created. May be called by any thread.
-bool RegisterOutput(const std::string& path);
+/// Creates a file in a directory, where it must not exist yet, also not as a symbolic link, with
+/// these permission bits reduced by the file creation mask, and opens it for writing. Records it as
+/// an output of this run. No open descriptor, with errno set, on failure, or when the run is
+/// already ending. May be called by any thread.
+FileDescriptor CreateOutput(const FileDescriptor& directory, const std::string& name,
+                            unsigned mode);
 
-/// Drops the latest record of this path because the file could not be opened: an existing file of
-/// that name does not belong to this run. May be called by any thread.
-void UnregisterOutput(const std::string& path);
+/// Removes this output because it is incomplete, unless its name refers to another file by now. May
+/// be called by any thread.
+void RemoveOutput(const FileDescriptor& output);
 
-/// Removes the registered regular files. From then on the run counts as ending.
-void RemoveRegisteredOutputs();
+/// Waits until the content of all outputs is on the disk. Returns false, after a call of
+/// ReportFailure, when that fails.
+bool SyncOutputs();
+
+/// Removes all outputs, except those whose names refer to other files by now. From then on the run
+/// counts as ending.
+void RemoveOutputs();
 
 /// From now on, signals after which the run cannot continue (out of memory in a library, a source
-/// that shrinks while it is being read, processor time used up) remove the registered files, print
-/// one line to standard error and end the process with status 1.
+/// that shrinks while it is being read, processor time used up) remove the outputs, print one line
+/// to standard error and end the process with status 1.
 void CleanUpOnFatalSignals();
 
 }  // namespace vela

@@ -24,6 +24,7 @@
 #include <system_error>
 #include <thread>
 
+#include "command_line/writable_paths.h"
 #include "converter_fixture.h"
 #include "process/confinement.h"
 #include "support/seccomp_fail.h"
@@ -129,11 +130,16 @@ TEST_F(Confinement, ReadsEverywhere) {
   EXPECT_EQ(Confined([] { return ErrorOfOpening("/etc", O_RDONLY | O_DIRECTORY); }), 0);
 }
 
-TEST_F(Confinement, ChangesTheFileBehindAnOutputThatIsALink) {
-  ASSERT_EQ(symlink("/tmp/outside/file", "/tmp/inside/link"), 0);
-  EXPECT_EQ(Confined([] { return ErrorOfOpening("/tmp/inside/link", O_WRONLY | O_TRUNC); }), 0);
-  EXPECT_EQ(ReadFile("/tmp/outside/file"), "");
-  EXPECT_EQ(Confined([] { return ErrorOf(unlink("/tmp/outside/file")); }), ErrorOutside());
+TEST_F(Confinement, RefusesTheFileBehindAnOutputThatIsALink) {
+  const std::string photo = MakePhoto("a.jpg", 300, 200);
+  ASSERT_EQ(symlink("/tmp/outside/file", "/tmp/inside/link.jpg"), 0);
+  const CommandLine line{photo, directory_, {{{}, "/tmp/inside/link.jpg"}}};
+  const WritablePaths paths = FindWritablePaths(ParseCommandLine(line.Arguments()));
+  EXPECT_EQ(InChild([&paths] {
+              Confine(paths);
+              return ErrorOfOpening("/tmp/inside/link.jpg", O_WRONLY | O_TRUNC);
+            }),
+            ErrorOutside());
 }
 
 TEST_F(Confinement, DoesNotOpenADirectoryThatAnOutputNames) {
@@ -344,7 +350,7 @@ TEST_F(Confinement, AppliesToImageMagick) {
       {"-define", "registry:temporary-path=" + directory_, source, "-write", directory_ + "/o.png",
        "-set", "filename:a", "/tmp/outside/new", "%[filename:a].png"},
       options);
-  EXPECT_TRUE(Exists(directory_ + "/o.png"));
+  EXPECT_TRUE(Exists(directory_ + "/o.png")) << result.err;
   if (ErrorOutside() != 0) {
     EXPECT_EQ(result.exitCode, 1);
     EXPECT_FALSE(Exists("/tmp/outside/new.png"));

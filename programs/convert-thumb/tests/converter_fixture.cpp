@@ -1,6 +1,7 @@
 #include "converter_fixture.h"
 
 #include <fcntl.h>
+#include <sys/stat.h>
 #include <unistd.h>
 
 #include <cerrno>
@@ -87,6 +88,7 @@ WithoutImageMagick::~WithoutImageMagick() {
 void ConverterTest::SetUp() {
   SandboxTest::SetUp();
   MakeDirectories(directory_);
+  ASSERT_EQ(chmod(directory_.c_str(), 0755), 0);
 }
 
 std::string ConverterTest::MakePhoto(const std::string& name, int width, int height,

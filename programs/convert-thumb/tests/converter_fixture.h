@@ -56,7 +56,7 @@ void ExpectSuccess(const ProgramResult& result);
 
 class ConverterTest : public SandboxTest {
  protected:
-  /// Directory of sources and outputs.
+  /// Directory of sources and outputs. Nobody else can change it.
   const std::string directory_ = "/tmp/converter";
   void SetUp() override;
 

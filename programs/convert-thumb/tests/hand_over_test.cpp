@@ -48,6 +48,35 @@ class HandOver : public ConverterTest {
     EXPECT_EQ(HandedParameters(), arguments);
   }
 
+  /// Expects that the stub got these arguments, except that "*" after a colon stands for the
+  /// name of a descriptor.
+  void ExpectHanded(const std::vector<std::string>& arguments) const {
+    const std::vector<std::string> handed = HandedParameters();
+    ASSERT_EQ(handed.size(), arguments.size());
+    for (size_t i = 0; i < handed.size(); ++i) {
+      const size_t star = arguments[i].find(":*");
+      if (star == std::string::npos) {
+        EXPECT_EQ(handed[i], arguments[i]) << i;
+      } else {
+        EXPECT_THAT(handed[i], StartsWith(arguments[i].substr(0, star) + ":/proc/self/fd/")) << i;
+        EXPECT_THAT(handed[i], EndsWith(arguments[i].substr(star + 2))) << i;
+      }
+    }
+  }
+
+  /// The files behind the descriptors above 2 that ImageMagick got.
+  std::vector<std::string> HandedFiles() const {
+    std::vector<std::string> files;
+    for (const StubCall& call : stub_->Calls()) {
+      for (const OpenDescriptor& descriptor : call.descriptors) {
+        if (descriptor.number > 2) {
+          files.push_back(descriptor.target);
+        }
+      }
+    }
+    return files;
+  }
+
   std::unique_ptr<StubTool> stub_;
 };
 
@@ -83,7 +112,7 @@ TEST_F(HandOver, LeavesImageMagickItsSignals) {
 
 TEST_F(HandOver, PassesSourcesThatAreNotFilesUnchanged) {
   InstallStub();
-  ExpectHandedUnchanged({"-size", "10x10", "gradient:red-blue", "/tmp/b.png"});
+  ExpectHandedUnchanged({"-size", "10x10", "gradient:red-blue", directory_ + "/b.png"});
 }
 
 TEST_F(HandOver, RefusesAMissingPhotoWithAnOddName) {
@@ -98,7 +127,9 @@ TEST_F(HandOver, PassesOtherFormats) {
   InstallStub();
   const std::string image = MakeImage(directory_ + "/a.bmp");
   const CommandLine line{image + "[0]", kStubDirectory, {{{}, directory_ + "/o.jpg"}}};
-  ExpectHandedUnchanged(line.Arguments());
+  RunConverter(line.Arguments());
+  const CommandLine handed{"BMP:*[0]", kStubDirectory, {{{}, "jpg:*"}}};
+  ExpectHanded(handed.Arguments());
 }
 
 TEST_F(HandOver, PassesCmykPhotosThatAreNotConverted) {
@@ -108,38 +139,45 @@ TEST_F(HandOver, PassesCmykPhotosThatAreNotConverted) {
   const std::string photo = MakeJpeg(directory_ + "/a.jpg", recipe);
   ThumbOptions options;
   options.convertToSrgb = false;
-  const CommandLine line{photo, "", {{options, directory_ + "/o.jpg"}}};
-  ExpectHandedUnchanged(line.Arguments());
+  const CommandLine line{photo, kStubDirectory, {{options, directory_ + "/o.jpg"}}};
+  RunConverter(line.Arguments());
+  const CommandLine handed{"JPEG:*", kStubDirectory, {{options, "jpg:*"}}};
+  ExpectHanded(handed.Arguments());
 }
 
-TEST_F(HandOver, PassesADescriptorWhenTheSourcesNameWouldBeMisread) {
+TEST_F(HandOver, PassesAllOutputs) {
+  InstallStub();
+  const std::string image = MakeImage(directory_ + "/a.bmp");
+  CommandLine line{image, kStubDirectory, {}};
+  CommandLine handed{"BMP:*", kStubDirectory, {}};
+  for (const char* extension : {"jpg", "jpeg", "JPG"}) {
+    line.outputs.push_back({{}, directory_ + "/o." + extension});
+    handed.outputs.push_back({{}, std::string(extension) + ":*"});
+  }
+  RunConverter(line.Arguments());
+  ExpectHanded(handed.Arguments());
+  EXPECT_THAT(HandedFiles(), UnorderedElementsAre(image, directory_ + "/o.jpg",
+                                                  directory_ + "/o.jpeg", directory_ + "/o.JPG"));
+}
+
+TEST_F(HandOver, PassesADescriptorWhateverTheSourcesName) {
   InstallStub();
   const std::string source = directory_ + "/a[*]%d:.bmp";
   CopyFile(MakeImage(directory_ + "/a.bmp"), source);
   const CommandLine line{source + "[0]", kStubDirectory, {{{}, directory_ + "/o.jpg"}}};
-  RunConverter(line.Arguments(), Recorded());
-  const std::vector<std::string> handed = HandedParameters();
-  ASSERT_THAT(handed, SizeIs(line.Arguments().size()));
-  EXPECT_THAT(handed[2], StartsWith("/proc/self/fd/"));
-  EXPECT_THAT(handed[2], EndsWith("[0]"));
-  bool isOpen = false;
-  const StubCall call = stub_->Calls().front();
-  for (const OpenDescriptor& descriptor : call.descriptors) {
-    isOpen = isOpen || descriptor.target == source;
-  }
-  EXPECT_TRUE(isOpen);
+  RunConverter(line.Arguments());
+  const CommandLine handed{"BMP:*[0]", kStubDirectory, {{{}, "jpg:*"}}};
+  ExpectHanded(handed.Arguments());
+  EXPECT_THAT(HandedFiles(), Contains(source));
 }
 
 TEST_F(HandOver, PassesNoOtherDescriptor) {
   InstallStub();
   const std::string image = MakeImage(directory_ + "/a.bmp");
-  const CommandLine line{image, "", {{{}, directory_ + "/o.jpg"}}};
-  RunConverter(line.Arguments(), Recorded());
+  const CommandLine line{image, kStubDirectory, {{{}, directory_ + "/o.jpg"}}};
+  RunConverter(line.Arguments());
   ASSERT_THAT(stub_->Calls(), SizeIs(1));
-  const StubCall call = stub_->Calls().front();
-  for (const OpenDescriptor& descriptor : call.descriptors) {
-    EXPECT_LE(descriptor.number, 2) << descriptor.target;
-  }
+  EXPECT_THAT(HandedFiles(), UnorderedElementsAre(image, directory_ + "/o.jpg"));
 }
 
 TEST_F(HandOver, FailsWithoutImageMagick) {

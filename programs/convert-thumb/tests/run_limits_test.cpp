@@ -141,13 +141,11 @@ TEST_F(RunLimits, EndCleanly) {
     const std::string one = directory_ + "/one.jpg";
     const std::string two = directory_ + "/two.jpg";
     const std::string other = directory_ + "/other.jpg";
-    for (const std::string& path : {one, two, other}) {
-      WriteFile(path, "part");
-    }
+    WriteFile(other, "part");
     EXPECT_EQ(StatusOf([&] {
                 CleanUpOnFatalSignals();
-                std::thread([&] { RegisterOutput(one); }).join();
-                RegisterOutput(two);
+                std::thread([&] { OpenForWriting(one); }).join();
+                OpenForWriting(two);
                 raise(signal);
                 return 0;
               }),
@@ -182,7 +180,7 @@ TEST_F(RunLimits, AllowNoNewOutputOnceTheRunIsEnding) {
   const std::string path = directory_ + "/late.jpg";
   const unsigned char byte = 0;
   EXPECT_EQ(StatusOf([&] {
-              RemoveRegisteredOutputs();
+              RemoveOutputs();
               return WriteOutputFile(path, &byte, 1) ? 1 : 0;
             }),
             0);
@@ -190,23 +188,30 @@ TEST_F(RunLimits, AllowNoNewOutputOnceTheRunIsEnding) {
 }
 
 TEST_F(RunLimits, RemoveOnlyFilesOfTheRun) {
-  const std::string forgotten = directory_ + "/forgotten.jpg";
-  WriteFile(forgotten, "content");
-  const std::string pipe = directory_ + "/pipe.jpg";
+  const std::string refused = directory_ + "/refused.jpg";
   const std::string device = directory_ + "/device.jpg";
+  const std::string exchanged = directory_ + "/exchanged.jpg";
+  const std::string pipe = directory_ + "/pipe.jpg";
+  WriteFile(directory_ + "/other.jpg", "content");
+  ASSERT_EQ(link((directory_ + "/other.jpg").c_str(), refused.c_str()), 0);
   ASSERT_EQ(mkfifo(pipe.c_str(), 0600), 0);
   ASSERT_EQ(symlink("/dev/null", device.c_str()), 0);
   EXPECT_EQ(StatusOf([&] {
-              for (const std::string& path : {forgotten, pipe, device}) {
-                RegisterOutput(path);
+              for (const std::string& path : {refused, pipe, device, exchanged}) {
+                OpenForWriting(path);
               }
-              UnregisterOutput(forgotten);
-              RemoveRegisteredOutputs();
+              WriteFile(directory_ + "/new.jpg", "content");
+              if (rename((directory_ + "/new.jpg").c_str(), exchanged.c_str()) != 0) {
+                return 1;
+              }
+              RemoveOutputs();
               return 0;
             }),
             0);
   EXPECT_EQ(ListDirectory(directory_),
-            (std::vector<std::string>{"device.jpg", "forgotten.jpg", "pipe.jpg"}));
+            (std::vector<std::string>{"device.jpg", "exchanged.jpg", "other.jpg", "pipe.jpg",
+                                      "refused.jpg"}));
+  EXPECT_EQ(ReadFile(exchanged), "content");
 }
 
 TEST_F(RunLimits, DoNotLetAPipeBlockTheRun) {

@@ -102,7 +102,7 @@ FileTurn TurnJpegFile(const std::string& path, int quarterTurns, size_t memoryLi
   if (!transformer.Fits(file->bytes, memoryLimit) || !transformer.Turn(file->bytes, quarterTurns)) {
     return FileTurn::kImpossible;
   }
-  switch (ReplaceFile(path, transformer.Turned(), transformer.Size(), file->attributes)) {
+  switch (ReplaceFile(*file, transformer.Turned(), transformer.Size())) {
     case Replacement::kDone:
       return FileTurn::kDone;
     case Replacement::kImpossible:

@@ -1,5 +1,8 @@
 // Several instances of velathumb at the same time.
 #include <fcntl.h>
+#include <signal.h>
+#include <sys/stat.h>
+#include <sys/wait.h>
 #include <unistd.h>
 
 #include <algorithm>
@@ -176,6 +179,127 @@ TEST_F(JobsTest, ARunnerThatWaitsForARemovedLockFileWaitsForTheNewOne) {
   ASSERT_EQ(fcntl(made.Get(), F_SETLK, &whole), 0);
   ExpectSuccess(second);
   EXPECT_THAT(velathumb_.Entries(), SizeIs(2));
+}
+
+constexpr const char* kRunnerLock = "/run/velathumb-queue.lock";
+
+/// A process with a lock on the whole lock file, which anybody who can read the file can take when
+/// it is a read lock.
+class LockHolder {
+ public:
+  explicit LockHolder(short type) {
+    const Descriptor file(open(kRunnerLock, O_RDWR | O_CREAT | O_CLOEXEC, 0644));
+    EXPECT_EQ(chmod(kRunnerLock, 0644), 0);
+    process_ = fork();
+    if (process_ == 0) {
+      struct flock whole = {};
+      whole.l_type = type;
+      whole.l_whence = SEEK_SET;
+      const bool isLocked = fcntl(file.Get(), F_SETLK, &whole) == 0;
+      WriteFile(isLocked ? "/tmp/locked" : "/tmp/not-locked", "");
+      pause();
+      _exit(0);
+    }
+    EXPECT_TRUE(WaitUntilExists("/tmp/locked"));
+  }
+  LockHolder(const LockHolder&) = delete;
+  LockHolder& operator=(const LockHolder&) = delete;
+  ~LockHolder() { End(); }
+
+  void End() {
+    if (process_ > 0) {
+      kill(process_, SIGKILL);
+      waitpid(process_, nullptr, 0);
+      process_ = 0;
+    }
+  }
+
+ private:
+  pid_t process_ = 0;
+};
+
+TEST_F(JobsTest, TheLockFileIsPrivate) {
+  Program runner = StartAndHold({"/tmp/a"});
+  EXPECT_EQ(ModeOf(kRunnerLock), 0600);
+  Release();
+  ExpectSuccess(runner);
+}
+
+TEST_F(JobsTest, AReadLockOnALockFileOfAnEarlierVersionStopsNoRunner) {
+  for (const std::vector<std::string>& arguments :
+       {std::vector<std::string>{}, std::vector<std::string>{"--wait"}}) {
+    const LockHolder reader(F_RDLCK);
+    Enqueue({"/tmp/a"});
+    Program runner = velathumb_.Start(arguments);
+    ExpectSuccess(runner);
+    EXPECT_EQ(ModeOf(kRunnerLock), 0600);
+    EXPECT_THAT(ListDirectory("/run"), ElementsAre("velathumb-queue.lock"));
+    RemoveTree(kRunnerLock);
+    RemoveTree("/tmp/locked");
+  }
+}
+
+TEST_F(JobsTest, ARunnerOfAnEarlierVersionIsNoticedAndWaitedFor) {
+  LockHolder earlier(F_WRLCK);
+  Enqueue({"/tmp/a"});
+  const ProgramResult second = velathumb_.Run();
+  EXPECT_EQ(second.exitCode, 1);
+  EXPECT_EQ(second.err, "velathumb-queue: another velathumb-queue is already running\n");
+  Program waiting = velathumb_.Start({"--wait"});
+  EXPECT_FALSE(waiting.Wait(milliseconds(300)));
+  EXPECT_EQ(ModeOf(kRunnerLock), 0644);
+  earlier.End();
+  ExpectSuccess(waiting);
+  EXPECT_EQ(ModeOf(kRunnerLock), 0600);
+}
+
+TEST_F(JobsTest, OneOfTheRunnersThatReplaceALockFileRuns) {
+  const LockHolder reader(F_RDLCK);
+  velathumb_.Stub().Plan(StubPlan().Sleep(20));
+  Enqueue({"/tmp/a", "/tmp/b", "/tmp/c"});
+  std::vector<Program> runners;
+  for (int i = 0; i < 6; ++i) {
+    runners.push_back(velathumb_.Start({"--wait"}));
+  }
+  for (Program& runner : runners) {
+    ExpectEnd(runner, 0);
+  }
+  ExpectQueueDone();
+  EXPECT_EQ(MostAtOnce(velathumb_.Stub().Calls()), 1);
+  EXPECT_THAT(velathumb_.Entries(), ElementsAre("/tmp/a", "/tmp/b", "/tmp/c"));
+}
+
+TEST_F(JobsTest, ALockFileThatIsNotTheRunnersOwnIsRefused) {
+  WriteFile("/run/precious", "precious");
+  ASSERT_EQ(chmod("/run/precious", 0600), 0);
+  const std::pair<std::function<int()>, const char*> places[] = {
+      {[] { return mkfifo(kRunnerLock, 0644); }, "Invalid argument"},
+      {[] { return symlink("/run/precious", kRunnerLock); }, "Too many levels of symbolic links"},
+      {[] { return symlink("/run/new", kRunnerLock); }, "Too many levels of symbolic links"},
+      {[] { return link("/run/precious", kRunnerLock); }, "Too many links"}};
+  Enqueue({"/tmp/a"});
+  for (const auto& [put, message] : places) {
+    ASSERT_EQ(put(), 0);
+    Program runner = velathumb_.Start({"--wait"});
+    const auto result = runner.Wait(seconds(10));
+    ASSERT_TRUE(result) << message;
+    EXPECT_EQ(result->exitCode, 2);
+    EXPECT_EQ(result->err, "velathumb-queue: cannot lock /var/run/velathumb-queue.lock: " +
+                               std::string(message) + "\n");
+    ASSERT_EQ(unlink(kRunnerLock), 0);
+  }
+  EXPECT_EQ(ReadFile("/run/precious"), "precious");
+  EXPECT_FALSE(Exists("/run/new"));
+  EXPECT_THAT(velathumb_.Entries(), IsEmpty());
+}
+
+TEST_F(JobsTest, ReadersThatLockTheQueueFilesDoNotStopARun) {
+  Enqueue({"/tmp/a"});
+  const Descriptor queue = HoldLock(kQueueFile, O_RDONLY);
+  MakeDirectories("/tmp/b");
+  Program runner = velathumb_.Start({"--add", "/tmp/b"});
+  ExpectSuccess(runner);
+  EXPECT_THAT(velathumb_.Entries(), ElementsAre("/tmp/a", "/tmp/b"));
 }
 
 }  // namespace

@@ -20,6 +20,8 @@ using namespace vela;
 namespace vela_test {
 namespace {
 
+constexpr const char* kQueueGuard = "/run/velathumb-lock.thumb_create.queue";
+
 using namespace ::testing;
 using Outcome = TakenQueue::Outcome;
 
@@ -198,6 +200,54 @@ TEST_F(TakenQueueTest, ALockedTakenFileIsKept) {
   held.Close();
   EXPECT_EQ(taken_.Finish(), 0);
   EXPECT_THAT(ListDirectory("/var/spool"), IsEmpty());
+}
+
+/// Calls `act` while it finds the file locked, at most 10 s. Returns its last result.
+template <typename Result>
+Result RepeatWhile(Result locked, const std::function<Result()>& act) {
+  const auto end = std::chrono::steady_clock::now() + std::chrono::seconds(10);
+  Result result = act();
+  while (result == locked && std::chrono::steady_clock::now() < end) {
+    usleep(10000);
+    result = act();
+  }
+  return result;
+}
+
+TEST_F(TakenQueueTest, AQueueThatAReaderKeepsLockedIsTaken) {
+  WriteFile(kQueueFile, "/a\n");
+  const Descriptor held = HoldLock(kQueueFile, O_RDONLY);
+  EXPECT_EQ(RepeatWhile<Outcome>(Outcome::kBusy, [&] { return taken_.Take(); }), Outcome::kTaken);
+  EXPECT_THAT(taken_.Entries(), ElementsAre("/a"));
+}
+
+TEST_F(TakenQueueTest, ATakenFileThatAReaderKeepsLockedIsRemoved) {
+  TakeNewEntry();
+  EXPECT_EQ(taken_.MarkDone("/a"), 0);
+  const Descriptor held = HoldLock(kTakenFile, O_RDONLY);
+  EXPECT_EQ(RepeatWhile<int>(EWOULDBLOCK, [&] { return taken_.Finish(); }), 0);
+  EXPECT_THAT(ListDirectory("/var/spool"), IsEmpty());
+}
+
+TEST_F(TakenQueueTest, EntriesArePutBackIntoAQueueThatAReaderKeepsLocked) {
+  WriteFile(kLaterFile, "/b\n/c\n");
+  WriteFile(kQueueFile, "/a\n");
+  const Descriptor held = HoldLock(kQueueFile, O_RDONLY);
+  EXPECT_EQ(RepeatWhile<int>(EWOULDBLOCK, [&] { return taken_.RequeueDeferred(); }), 0);
+  EXPECT_EQ(ReadFile(kQueueFile), "/a\n/b\n/c\n");
+}
+
+TEST_F(TakenQueueTest, AQueueWithItsGuardHeldIsNeverTaken) {
+  WriteFile(kQueueFile, "/a\n");
+  const Descriptor reader = HoldLock(kQueueFile, O_RDONLY);
+  WriteFile(kQueueGuard, "");
+  ASSERT_EQ(chmod(kQueueGuard, 0600), 0);
+  const Descriptor held = HoldLock(kQueueGuard, O_RDONLY);
+  for (int i = 0; i < 300; ++i) {
+    ASSERT_EQ(taken_.Take(), Outcome::kBusy);
+    usleep(10000);
+  }
+  EXPECT_TRUE(Exists(kQueueFile));
 }
 
 TEST_F(TakenQueueTest, ADeferredEntryIsPutBack) {

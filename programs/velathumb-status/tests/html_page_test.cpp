@@ -19,6 +19,7 @@
 #include "html_counts.h"
 #include "html_page_photos.h"
 #include "smallest_thumb.h"
+#include "support/descriptor.h"
 #include "support/files.h"
 #include "support/mounts.h"
 #include "support/privileges.h"
@@ -545,11 +546,134 @@ TEST_F(HtmlPageTest, ALinkIsKeptAndItsTargetIsReplaced) {
   EXPECT_THAT(ListDirectory(kPageDirectory), ElementsAre("second", "status.html"));
 }
 
+/// A directory of user 1, in which root writes the page. Tests of links that root must not follow
+/// end early in a sandbox with one user.
+class HtmlPageOfAnotherUser : public HtmlPageTest {
+ protected:
+  static constexpr const char* kPrecious = "/tmp/root/precious";
+
+  void SetUp() override {
+    HtmlPageTest::SetUp();
+    WriteFile(kPrecious, "precious");
+    MakeDirectories(kPageDirectory);
+    GiveAway(kPageDirectory);
+  }
+
+  /// A sandbox with one user has nobody to give it to; there, links are all its own.
+  static void GiveAway(const char* path) {
+    if (HasOtherUsers()) {
+      ASSERT_EQ(lchown(path, 1, 1), 0);
+    }
+  }
+
+  static void PutLink(const char* target, const char* path) {
+    ASSERT_EQ(symlink(target, path), 0);
+    GiveAway(path);
+  }
+
+  static void ExpectRootsFilesUntouched() {
+    EXPECT_EQ(ReadFile(kPrecious), "precious");
+    EXPECT_THAT(ListDirectory("/tmp/root"), ElementsAre("precious"));
+  }
+};
+
+TEST_F(HtmlPageOfAnotherUser, ALinkToAFileOfRootIsReplacedInsteadOfTheFile) {
+  if (!HasOtherUsers()) {
+    return;
+  }
+  PutLink(kPrecious, kPage);
+  EXPECT_THAT(PageOfPhotos({CompletePhoto("a.jpg")}), StartsWith("<!DOCTYPE html>"));
+  EXPECT_FALSE(IsLink(kPage));
+  ExpectRootsFilesUntouched();
+}
+
+TEST_F(HtmlPageOfAnotherUser, ALinkToANewFileOfRootIsReplaced) {
+  PutLink("/tmp/root/new", kPage);
+  PageOfPhotos({CompletePhoto("a.jpg")});
+  EXPECT_FALSE(IsLink(kPage));
+  ExpectRootsFilesUntouched();
+}
+
+TEST_F(HtmlPageOfAnotherUser, ALinkThroughALinkOfRootIsReplaced) {
+  if (!HasOtherUsers()) {
+    return;
+  }
+  ASSERT_EQ(symlink(kPrecious, "/tmp/second"), 0);
+  PutLink("/tmp/second", kPage);
+  PageOfPhotos({CompletePhoto("a.jpg")});
+  EXPECT_FALSE(IsLink(kPage));
+  EXPECT_TRUE(IsLink("/tmp/second"));
+  ExpectRootsFilesUntouched();
+}
+
+TEST_F(HtmlPageOfAnotherUser, ALinkToADirectoryOfRootIsNotFollowed) {
+  if (!HasOtherUsers()) {
+    return;
+  }
+  PutLink("/tmp/root", "/tmp/page/sub");
+  for (const char* path : {"/tmp/page/sub/precious", "/tmp/page/sub/new"}) {
+    HtmlPage page(path);
+    Report(page, {{"/a", false, {CompletePhoto("a.jpg")}}});
+    EXPECT_EQ(page.Finish(), EACCES);
+  }
+  ExpectRootsFilesUntouched();
+}
+
+TEST_F(HtmlPageOfAnotherUser, ADirectoryThatIsReplacedByALinkMeanwhileLeadsNowhere) {
+  MakeDirectories("/tmp/page/sub");
+  GiveAway("/tmp/page/sub");
+  HtmlPage page("/tmp/page/sub/precious");
+  Report(page, {{"/a", false, {CompletePhoto("a.jpg")}}});
+  ASSERT_EQ(rename("/tmp/page/sub", "/tmp/page/moved"), 0);
+  PutLink("/tmp/root", "/tmp/page/sub");
+  EXPECT_EQ(page.Finish(), 0);
+  EXPECT_THAT(ReadFile("/tmp/page/moved/precious"), StartsWith("<!DOCTYPE html>"));
+  ExpectRootsFilesUntouched();
+}
+
+TEST_F(HtmlPageOfAnotherUser, TheirLinkToTheirOwnFileIsKeptAndTheFileReplaced) {
+  WriteFile("/tmp/theirs/page.html", "old");
+  GiveAway("/tmp/theirs/page.html");
+  PutLink("/tmp/theirs/page.html", kPage);
+  PageOfPhotos({CompletePhoto("a.jpg")});
+  EXPECT_TRUE(IsLink(kPage));
+  EXPECT_THAT(ReadFile("/tmp/theirs/page.html"), StartsWith("<!DOCTYPE html>"));
+}
+
 TEST_F(HtmlPageTest, ADanglingLinkIsReplaced) {
   MakeDirectories(kPageDirectory);
   ASSERT_EQ(symlink("/tmp/nowhere", kPage), 0);
   EXPECT_THAT(PageOfPhotos({CompletePhoto("a.jpg")}), StartsWith("<!DOCTYPE html>"));
   EXPECT_FALSE(Exists("/tmp/nowhere"));
+}
+
+TEST_F(HtmlPageTest, ALinkToItselfIsReplaced) {
+  MakeDirectories(kPageDirectory);
+  ASSERT_EQ(symlink(kPage, kPage), 0);
+  EXPECT_THAT(PageOfPhotos({CompletePhoto("a.jpg")}), StartsWith("<!DOCTYPE html>"));
+  EXPECT_FALSE(IsLink(kPage));
+}
+
+TEST_F(HtmlPageTest, ALinkToADirectoryOnTheWayIsFollowed) {
+  MakeDirectories("/tmp/page/real/sub");
+  ASSERT_EQ(symlink("real/../real", "/tmp/page/link"), 0);
+  HtmlPage page("/tmp/page/./link//sub/../status.html");
+  Report(page, {});
+  EXPECT_EQ(page.Finish(), 0);
+  EXPECT_THAT(ListDirectory("/tmp/page/real"), ElementsAre("status.html", "sub"));
+}
+
+TEST_F(HtmlPageTest, APipeAtTheEndOfALinkIsKept) {
+  int ends[2];
+  ASSERT_EQ(pipe2(ends, O_CLOEXEC), 0);
+  const Descriptor reader(ends[0]);
+  const Descriptor writer(ends[1]);
+  MakeDirectories(kPageDirectory);
+  ASSERT_EQ(symlink(("/proc/self/fd/" + std::to_string(ends[1])).c_str(), kPage), 0);
+  HtmlPage page(kPage);
+  Report(page, {});
+  EXPECT_EQ(page.Finish(), EEXIST);
+  EXPECT_TRUE(IsLink(kPage));
 }
 
 TEST_F(HtmlPageTest, ARelativePathRefersToTheWorkingDirectory) {

@@ -5,6 +5,7 @@
 
 #include "platform/standalone/last_error.h"
 #include "platform/vlibc.h"
+#include "posix/folder.h"
 
 namespace {
 
@@ -31,6 +32,20 @@ timespec ToSystemTime(const VLIBCTime& time, bool isSet) {
   return {static_cast<time_t>(time.seconds), static_cast<long>(time.nanoseconds)};
 }
 
+/// Sets the times of a directory or of a file that is this user's own: in a directory that others
+/// can change, the path may lead to a file of theirs. Returns 0 or an errno value.
+int SetTimes(const char* path, const timespec (&times)[2]) {
+  const vela::FileDescriptor file = vela::FolderEntry(path).Open(O_PATH);
+  struct stat status;
+  if (!file.IsOpen() || fstat(file.Get(), &status) != 0) {
+    return errno;
+  }
+  if (!S_ISDIR(status.st_mode) && !vela::IsOwnFile(status)) {
+    return EPERM;
+  }
+  return utimensat(file.Get(), "", times, AT_EMPTY_PATH) == 0 ? 0 : errno;
+}
+
 }  // namespace
 
 int VLIBCFileStat(const char* path, int /*options*/, VLIBCFileStatus* out) {
@@ -38,8 +53,8 @@ int VLIBCFileStat(const char* path, int /*options*/, VLIBCFileStatus* out) {
     return Fail(EINVAL);
   }
   struct stat status;
-  if (stat(path, &status) != 0) {
-    return Fail(errno);
+  if (const int error = vela::ReadStatus(path, status); error != 0) {
+    return Fail(error);
   }
   out->mode = status.st_mode;
   out->size = status.st_size;
@@ -64,5 +79,6 @@ int VLIBCFileUTime(const char* path, int options, const VLIBCFileTimes* times) {
   }
   const timespec pair[2] = {ToSystemTime(times->access, setAccess),
                             ToSystemTime(times->modification, setModification)};
-  return utimensat(AT_FDCWD, path, pair, 0) == 0 ? 0 : Fail(errno);
+  const int error = SetTimes(path, pair);
+  return error == 0 ? 0 : Fail(error);
 }

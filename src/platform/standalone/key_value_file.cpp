@@ -55,6 +55,22 @@ int CreateWithValue(std::string& path, const char* key, const char* value, Attem
   return 0;
 }
 
+/// Changes `path`, when it is a link, to the file that the link leads to. Returns 0 or an errno
+/// value, also for anything but a regular file or none.
+int FindFile(std::string& path) {
+  struct stat named;
+  if (lstat(path.c_str(), &named) != 0) {
+    return errno == ENOENT ? 0 : errno;
+  }
+  if (S_ISLNK(named.st_mode)) {
+    return FollowLink(path);
+  }
+  if (S_ISDIR(named.st_mode)) {
+    return EISDIR;
+  }
+  return S_ISREG(named.st_mode) ? 0 : EINVAL;
+}
+
 /// With the lock held, checks whether the locked file is still the one at `path`. When `path` is a
 /// link, changes it to the link's target, because that is the file to replace.
 int CheckIdentity(std::string& path, const struct stat& locked, Attempt& attempt) {
@@ -74,21 +90,28 @@ int CheckIdentity(std::string& path, const struct stat& locked, Attempt& attempt
 
 int TrySetValue(std::string& path, const char* key, const char* value, Attempt& attempt) {
   attempt = Attempt::kDone;
+  int error = FindFile(path);
+  vela::FileGuard guard;
+  if (error == 0) {
+    error = guard.Take(path);
+  }
+  if (error != 0) {
+    return error;
+  }
   const FileDescriptor file(open(path.c_str(), O_RDWR | O_CLOEXEC | O_NONBLOCK | O_NOCTTY));
   if (!file.IsOpen()) {
     return errno == ENOENT ? CreateWithValue(path, key, value, attempt) : errno;
   }
-  int error = vela::LockExclusively(file.Get());
-  if (error != 0) {
-    return error;
-  }
-
   struct stat locked;
   if (fstat(file.Get(), &locked) != 0) {
     return errno;
   }
   if (!S_ISREG(locked.st_mode)) {
     return EINVAL;
+  }
+  error = guard.LockToo(file.Get());
+  if (error != 0) {
+    return error;
   }
   error = CheckIdentity(path, locked, attempt);
   if (error != 0 || attempt == Attempt::kRetry) {

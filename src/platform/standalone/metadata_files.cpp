@@ -14,6 +14,7 @@
 #include "platform/system_rules.h"
 #include "platform/velaindex.h"
 #include "posix/files.h"
+#include "posix/folder.h"
 
 namespace {
 
@@ -68,20 +69,16 @@ bool ExamineRegularFile(const DerivedPath& path, EAFileStatus& out) {
   return true;
 }
 
-/// Returns whether any file has the name, even a dangling link.
-bool Exists(const DerivedPath& path) {
-  struct stat status;
-  return lstat(path.Get(), &status) == 0;
-}
-
 /// Returns 0 when no file has the name any more, otherwise an errno value.
 int Remove(const DerivedPath& path) {
-  if (!path.IsValid() || unlink(path.Get()) == 0 || errno == ENOENT) {
+  if (!path.IsValid()) {
     return 0;
   }
-  const int error = errno;
+  const vela::FolderEntry entry(path.Get());
+  const int error = entry.Remove();
+  struct stat status;
   // A read-only volume, for example, also reports an error for a file that does not exist.
-  return Exists(path) ? error : 0;
+  return error == 0 || error == ENOENT || entry.ExamineLink(status) != 0 ? 0 : error;
 }
 
 }  // namespace

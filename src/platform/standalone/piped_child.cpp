@@ -13,6 +13,7 @@
 
 #include "platform/standalone/last_error.h"
 #include "platform/standalone/settings.h"
+#include "platform/standalone/tool_confinement.h"
 #include "platform/vlibc.h"
 #include "posix/child_process.h"
 #include "posix/child_watchdog.h"
@@ -87,7 +88,9 @@ int Open(const char* program, std::vector<char*>& arguments, bool joinError, Pip
   FileDescriptor readEnd(ends[0]);
   FileDescriptor writeEnd(ends[1]);
   const vela::ChildStreams streams{writeEnd.Get(), joinError ? writeEnd.Get() : -1};
-  int error = vela::StartChild(program, arguments.data(), streams, child.pid);
+  const vela::Confinement confinement =
+      vela::ConfinementOfTool(program, arguments.data(), vela::CurrentSettings().toolTimeout);
+  int error = vela::StartChild(program, arguments.data(), streams, confinement, child.pid);
   if (error != 0) {
     return error;
   }

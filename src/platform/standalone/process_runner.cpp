@@ -11,6 +11,7 @@
 
 #include "platform/standalone/last_error.h"
 #include "platform/standalone/settings.h"
+#include "platform/standalone/tool_confinement.h"
 #include "platform/velautils.h"
 #include "posix/child_process.h"
 #include "posix/signal_block.h"
@@ -63,6 +64,15 @@ int ResultOf(int status) {
   return WIFEXITED(status) ? WEXITSTATUS(status) : kEndedBySignal + WTERMSIG(status);
 }
 
+/// Starts the tool, confined. Returns 0 or an errno value.
+int StartTool(std::string& program, Arguments& arguments, bool keepOutput, pid_t& pid) {
+  const std::vector<char*> pointers = MakeVector(program, arguments);
+  const vela::Confinement confinement = vela::ConfinementOfTool(
+      program.c_str(), pointers.data(), vela::CurrentSettings().toolTimeout);
+  return vela::StartChild(program.c_str(), pointers.data(), StreamsFor(keepOutput), confinement,
+                          pid);
+}
+
 /// Waits for the child's end, at most for the time limit of tools, and returns the result of the
 /// run.
 int Finish(pid_t pid, const std::string& program) {
@@ -79,8 +89,7 @@ int Finish(pid_t pid, const std::string& program) {
 void RunInThread(std::string program, Arguments arguments, bool keepOutput,
                  std::promise<int> started) {
   pid_t pid = -1;
-  const int error = vela::StartChild(program.c_str(), MakeVector(program, arguments).data(),
-                                     StreamsFor(keepOutput), pid);
+  const int error = StartTool(program, arguments, keepOutput, pid);
   started.set_value(error);
   if (error == 0) {
     Finish(pid, program);
@@ -117,10 +126,8 @@ void ProcessRunner::addArguments(const char* a1, const char* a2, const char* a3,
 
 int ProcessRunner::run(bool wait, bool keepOutput) {
   pid_t pid = -1;
-  const int error =
-      wait ? vela::StartChild(program_.c_str(), MakeVector(program_, arguments_).data(),
-                              StreamsFor(keepOutput), pid)
-           : StartInBackground(program_, arguments_, keepOutput);
+  const int error = wait ? StartTool(program_, arguments_, keepOutput, pid)
+                         : StartInBackground(program_, arguments_, keepOutput);
   if (error != 0) {
     vela::SetLastError(error);
     return kNotStarted;

@@ -9,9 +9,11 @@
 
 #include "platform/standalone/last_error.h"
 #include "platform/velaindex.h"
+#include "posix/file_content.h"
 #include "posix/file_descriptor.h"
 #include "posix/file_lock.h"
 #include "posix/file_version.h"
+#include "posix/files.h"
 
 namespace {
 
@@ -21,8 +23,13 @@ using vela::FileDescriptor;
 constexpr mode_t kQueueMode = 0644;
 constexpr int kFlags = O_RDWR | O_APPEND | O_CLOEXEC | O_NONBLOCK | O_NOCTTY;
 
-/// Opens the queue file. Creates it when it is missing, with its mode whatever the umask. Returns 0
-/// or an errno value.
+/// Gives a new queue its mode, whatever the umask. Its name is on the disk before the first entry:
+/// those who append to it later only wait for their entry. Returns 0 or an errno value.
+int FinishNewQueue(const char* path, int fd) {
+  return fchmod(fd, kQueueMode) == 0 ? vela::SyncNameOf(path) : errno;
+}
+
+/// Opens the queue file, created when missing. Returns 0 or an errno value.
 int OpenQueue(const char* path, FileDescriptor& file) {
   for (;;) {
     file.Reset(open(path, kFlags));
@@ -34,7 +41,7 @@ int OpenQueue(const char* path, FileDescriptor& file) {
     }
     file.Reset(open(path, kFlags | O_CREAT | O_EXCL, kQueueMode));
     if (file.IsOpen()) {
-      return fchmod(file.Get(), kQueueMode) == 0 ? 0 : errno;
+      return FinishNewQueue(path, file.Get());
     }
     if (errno != EEXIST) {
       return errno;
@@ -50,8 +57,8 @@ int OpenQueue(const char* path, FileDescriptor& file) {
 
 /// A locked queue file.
 struct Queue {
+  vela::FileGuard guard;
   FileDescriptor file;
-  struct stat status;
 };
 
 /// Returns 0 or an errno value. Sets `isCurrent` unless the file was renamed or removed before it
@@ -61,47 +68,41 @@ int LockQueue(const char* path, Queue& queue, bool& isCurrent) {
   if (error != 0) {
     return error;
   }
-  error = vela::LockExclusively(queue.file.Get());
-  if (error != 0) {
-    return error;
-  }
-  if (fstat(queue.file.Get(), &queue.status) != 0) {
+  struct stat status;
+  if (fstat(queue.file.Get(), &status) != 0) {
     return errno;
   }
-  if (!S_ISREG(queue.status.st_mode)) {
+  if (!S_ISREG(status.st_mode)) {
     return EINVAL;
+  }
+  error = queue.guard.LockToo(queue.file.Get());
+  if (error != 0) {
+    return error;
   }
   struct stat named;
   if (stat(path, &named) != 0) {
     return errno == ENOENT ? 0 : errno;
   }
-  isCurrent = vela::IsSameFile(queue.status, named);
+  isCurrent = vela::IsSameFile(status, named);
   return 0;
 }
 
-bool LacksFinalNewline(const Queue& queue) {
-  if (queue.status.st_size == 0) {
-    return false;
+/// Returns 0 or an errno value.
+int AppendLine(const char* path, const std::string& line) {
+  Queue queue;
+  int error = queue.guard.Take(path);
+  for (bool isCurrent = false; error == 0 && !isCurrent;) {
+    error = LockQueue(path, queue, isCurrent);
   }
-  char last = '\n';
-  const ssize_t got = pread(queue.file.Get(), &last, 1, queue.status.st_size - 1);
-  return got == 1 && last != '\n';
-}
-
-/// Appends the text completely or not at all. Returns 0 or an errno value.
-int AppendAtomically(const Queue& queue, const std::string& text) {
-  ssize_t written;
-  do {
-    written = write(queue.file.Get(), text.data(), text.size());
-  } while (written < 0 && errno == EINTR);
-  if (written == static_cast<ssize_t>(text.size())) {
-    return 0;
+  if (error != 0) {
+    return error;
   }
-  if (written < 0) {
-    return errno;
-  }
-  // A part of a line would be read as another path.
-  return ftruncate(queue.file.Get(), queue.status.st_size) == 0 ? ENOSPC : errno;
+  const char* start = vela::LacksFinalNewline(queue.file.Get()) ? "\n" : "";
+  error = vela::AppendWhole(queue.file.Get(), start + line + '\n');
+  // Others need not wait for the disk.
+  queue.guard.Release();
+  vela::Unlock(queue.file.Get());
+  return error != 0 ? error : vela::SyncFile(queue.file.Get());
 }
 
 }  // namespace
@@ -113,16 +114,6 @@ int WriteIndexQueue(const char* path, const char* queueFile) {
   if (strchr(path, '\n') != nullptr) {
     return Fail(EINVAL);
   }
-  Queue queue;
-  for (bool isCurrent = false; !isCurrent;) {
-    const int error = LockQueue(queueFile, queue, isCurrent);
-    if (error != 0) {
-      return Fail(error);
-    }
-  }
-  std::string line(LacksFinalNewline(queue) ? "\n" : "");
-  line += path;
-  line += '\n';
-  const int error = AppendAtomically(queue, line);
+  const int error = AppendLine(queueFile, path);
   return error == 0 ? 0 : Fail(error);
 }

@@ -20,7 +20,7 @@ namespace {
 using vela::Deadline;
 using vela::FileDescriptor;
 
-constexpr size_t kReplyMax = 16 * 1024 * 1024;
+constexpr size_t kReplyMax = 1024 * 1024;
 constexpr size_t kChunkSize = 16384;
 
 /// Receives up to the newline or the end of the connection. Returns 0 or an errno value.

@@ -1,9 +1,7 @@
-#include "platform/standalone/ppm_size.h"
+#include "ppm_size.h"
 
 #include <csetjmp>
 #include <cstdio>
-#include <memory>
-#include <mutex>
 
 extern "C" {
 #include <netpbm/ppm.h>
@@ -13,12 +11,9 @@ namespace vela {
 
 namespace {
 
-struct CloseFile {
-  void operator()(FILE* file) const { fclose(file); }
-};
-
 /// Netpbm also reads related formats, and leaks memory when some of them are damaged.
 bool IsBinaryPixmap(FILE* file) {
+  std::rewind(file);
   char magic[2] = "";
   const bool isPixmap =
       fread(magic, 1, sizeof(magic), file) == sizeof(magic) && magic[0] == 'P' && magic[1] == '6';
@@ -46,12 +41,8 @@ bool ReadHeader(FILE* file, int& width, int& height) {
 
 }  // namespace
 
-PixelSize ReadPpmSize(const char* path) {
-  // The settings of Netpbm are global.
-  static std::mutex mutex;
-  const std::lock_guard<std::mutex> lock(mutex);
-  const std::unique_ptr<FILE, CloseFile> file(fopen(path, "rbe"));
-  if (!file || !IsBinaryPixmap(file.get())) {
+PixelSize ReadPpmSize(FILE* file) {
+  if (!IsBinaryPixmap(file)) {
     return {};
   }
   pm_init("velathumb", 0);
@@ -59,7 +50,7 @@ PixelSize ReadPpmSize(const char* path) {
   pm_setusererrormsgfn(IgnoreMessage);
   int width = 0;
   int height = 0;
-  if (!ReadHeader(file.get(), width, height)) {
+  if (!ReadHeader(file, width, height)) {
     return {};
   }
   return {width, height};

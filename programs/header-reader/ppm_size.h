@@ -2,6 +2,7 @@
 #pragma once
 
 #include <cstdint>
+#include <cstdio>
 
 namespace vela {
 
@@ -11,7 +12,7 @@ struct PixelSize {
   int64_t height = 0;
 };
 
-/// Reads the header of the file at `path`; returns an empty size when it is not a portable pixmap.
-PixelSize ReadPpmSize(const char* path);
+/// Reads the header of `file`; returns an empty size when it is not a portable pixmap.
+PixelSize ReadPpmSize(FILE* file);
 
 }  // namespace vela

@@ -1,0 +1,255 @@
+// What the tools can do, whatever they are made to do by a photo: other programs take their places.
+#include "platform/standalone/tool_confinement.h"
+
+#include <sys/stat.h>
+
+#include <algorithm>
+#include <cstdio>
+#include <cstdlib>
+#include <sstream>
+#include <thread>
+
+#include "platform/tool_fixture.h"
+#include "posix/landlock.h"
+
+namespace vela_test {
+namespace {
+
+using ::testing::ElementsAre;
+using ::testing::HasSubstr;
+using ::testing::Not;
+
+constexpr char kPhoto[] = "/tmp/photos/a.jpg";
+constexpr char kOther[] = "/tmp/photos/b.jpg";
+constexpr char kSecret[] = "/tmp/private/secret.jpg";
+constexpr char kList[] = "/usr/vela/etc/unconfined-tools";
+
+bool HasLandlock() {
+  return vela::LandlockVersion() >= 1;
+}
+
+/// Runs a tool and returns its output; "not started" when it cannot be started.
+template <typename... Arguments>
+std::string OutputOf(const char* tool, Arguments... arguments) {
+  FILE* const stream = VLIBCPopen(tool, "r", arguments..., nullptr);
+  if (stream == nullptr) {
+    return "not started";
+  }
+  std::string output;
+  char chunk[4096];
+  for (size_t got = 0; (got = fread(chunk, 1, sizeof chunk, stream)) > 0;) {
+    output.append(chunk, got);
+  }
+  VLIBCPclose(stream);
+  return output;
+}
+
+void InstallProgram(const std::string& path, const std::string& content) {
+  RemoveTree(path);
+  WriteFile(path, content);
+  chmod(path.c_str(), 0755);
+}
+
+class ToolConfinement : public SandboxTest {
+ protected:
+  void SetUp() override {
+    SandboxTest::SetUp();
+    WriteFile(kPhoto, "photo ");
+    WriteFile(kOther, "other ");
+    WriteFile(kSecret, "secret ");
+    MakeDirectories("/tmp/out");
+    MakeDirectories("/tmp/turned");
+  }
+
+  /// A tool that prints the files in its arguments.
+  static void InstallPrinter(const char* path) { InstallProgram(path, ReadFile("/usr/bin/cat")); }
+
+  static std::string UnlessLandlock(const std::string& output) {
+    return HasLandlock() ? "" : output;
+  }
+};
+
+TEST_F(ToolConfinement, DcrawReadsOnlyItsPhoto) {
+  InstallPrinter(kDcrawPath);
+  EXPECT_EQ(OutputOf(kDcrawPath, kSecret, kOther, kPhoto),
+            UnlessLandlock("secret other ") + "photo ");
+}
+
+TEST_F(ToolConfinement, ExiftoolReadsOnlyItsPhoto) {
+  InstallPrinter(kExiftoolPath);
+  EXPECT_EQ(OutputOf(kExiftoolPath, kSecret, kOther, kPhoto),
+            UnlessLandlock("secret other ") + "photo ");
+}
+
+TEST_F(ToolConfinement, CompareReadsOnlyItsTwoImages) {
+  InstallPrinter(kComparePath);
+  EXPECT_EQ(OutputOf(kComparePath, kSecret, kPhoto, kOther, "null:"),
+            UnlessLandlock("secret ") + "photo other ");
+}
+
+TEST_F(ToolConfinement, NoToolReadsThePasswordsOrRunsPrograms) {
+  for (const char* tool : {kDcrawPath, kExiftoolPath, kComparePath}) {
+    InstallPrinter(tool);
+    for (const char* file : {"/etc/passwd", "/etc/shadow", "/usr/bin/id", "/proc/1/environ"}) {
+      if (HasLandlock()) {
+        EXPECT_EQ(OutputOf(tool, file, kPhoto, kPhoto, "null:").find_first_not_of("photo "),
+                  std::string::npos)
+            << tool << " " << file;
+      }
+    }
+  }
+}
+
+/// A converter that tries to write to and to read files, and prints those that it could.
+constexpr char kGreedyConverter[] = R"(#!/bin/sh
+for file in /tmp/out/x /tmp/turned/x /tmp/photos/x /tmp/private/x /tmp/x; do
+  { true >"$file"; } 2>/dev/null && echo "wrote $file"
+done
+for file in /tmp/photos/a.jpg /tmp/photos/b.jpg /tmp/private/secret.jpg; do
+  text=
+  { read -r text <"$file" || [ -n "$text" ]; } 2>/dev/null && echo "read $file"
+done
+echo "scratch $MAGICK_TEMPORARY_PATH"
+)";
+
+Strings Lines(const std::string& text) {
+  Strings lines;
+  std::istringstream in(text);
+  for (std::string line; std::getline(in, line);) {
+    lines.push_back(line);
+  }
+  return lines;
+}
+
+TEST_F(ToolConfinement, ConverterReadsItsPhotoAndWritesOnlyInTheDirectoriesOfItsOutputs) {
+  if (!HasLandlock()) {
+    return;
+  }
+  InstallProgram(kConverterPath, kGreedyConverter);
+  EXPECT_THAT(Lines(OutputOf(kConverterPath, "-define", "registry:temporary-path=/tmp/out", kPhoto,
+                             "-thumbnail", "1x1", "-write", "/tmp/turned/a.jpg", "/tmp/out/b.jpg")),
+              ElementsAre("wrote /tmp/out/x", "wrote /tmp/turned/x", std::string("read ") + kPhoto,
+                          "scratch "));
+  EXPECT_THAT(
+      Lines(OutputOf(kConverterPath, std::string(kOther).append("[0]").c_str(), "-thumbnail", "1x1",
+                     "/tmp/turned/b.jpg")),
+      ElementsAre("wrote /tmp/turned/x", std::string("read ") + kOther, "scratch /tmp/turned"));
+}
+
+TEST_F(ToolConfinement, ConverterThatTurnsAPictureWritesOnlyInItsDirectory) {
+  if (!HasLandlock()) {
+    return;
+  }
+  InstallProgram(kConverterPath, kGreedyConverter);
+  CopyFile(kPhoto, "/tmp/turned/raw.jpg");
+  EXPECT_THAT(Lines(OutputOf(kConverterPath, "-rotate", "90", "/tmp/turned/raw.jpg",
+                             "/tmp/turned/raw.jpg")),
+              ElementsAre("wrote /tmp/turned/x", "scratch /tmp/turned"));
+}
+
+TEST_F(ToolConfinement, ConverterFindsADirectoryWithPercentSigns) {
+  InstallProgram(kConverterPath, "#!/bin/sh\necho >'/tmp/50%/%%/x' && echo wrote\n");
+  MakeDirectories("/tmp/50%/%%");
+  EXPECT_EQ(OutputOf(kConverterPath, kPhoto, "/tmp/50%%/%%%%/a.jpg"), "wrote\n");
+}
+
+TEST_F(ToolConfinement, ToolsInheritNoEnvironment) {
+  setenv("SECRET_TOKEN", "secret", 1);
+  setenv("LD_LIBRARY_PATH", "/tmp", 1);
+  InstallProgram(kConverterPath, "#!/bin/sh\nexport -p\n");
+  const std::string variables = OutputOf(kConverterPath, kPhoto, "/tmp/out/a.jpg");
+  unsetenv("SECRET_TOKEN");
+  unsetenv("LD_LIBRARY_PATH");
+  EXPECT_THAT(
+      Lines(variables),
+      ElementsAre("export HOME='/'", "export LC_ALL='C'", "export MAGICK_TEMPORARY_PATH='/tmp/out'",
+                  "export PATH='/usr/sbin:/usr/bin:/sbin:/bin'", "export PWD='/'"));
+}
+
+/// The limits as a shell prints them, in blocks and kilobytes.
+constexpr char kPrintLimits[] =
+    "#!/bin/sh\nulimit -t\nulimit -f\nulimit -d\nulimit -c\n"
+    "while read -r line; do case $line in NoNewPrivs*|Seccomp:*) echo $line;; esac; done "
+    "</proc/self/status\n";
+
+TEST_F(ToolConfinement, EveryProgramHasLimits) {
+  WriteFile("/etc/velainfo.conf", "tool_timeout=\"7\"\n");
+  InstallProgram("/usr/vela/bin/any", kPrintLimits);
+  const Strings lines = Lines(OutputOf("/usr/vela/bin/any"));
+  ASSERT_EQ(lines.size(), 6U);
+  const unsigned processors = std::max(1U, std::thread::hardware_concurrency());
+  EXPECT_EQ(lines[0], std::to_string(8 * processors)) << "processor time";
+  EXPECT_EQ(lines[1], "8388608") << "512-byte blocks of a file";
+#ifndef __SANITIZE_ADDRESS__
+  EXPECT_EQ(lines[2], "2097152") << "kilobytes of memory";
+#endif
+  EXPECT_EQ(lines[3], "0") << "blocks of a core dump";
+  EXPECT_EQ(lines[4], "NoNewPrivs: 1");
+  EXPECT_EQ(lines[5], "Seccomp: 2");
+}
+
+TEST_F(ToolConfinement, HasNoTimeLimitWithoutThatOfTheRun) {
+  WriteFile("/etc/velainfo.conf", "tool_timeout=\"0\"\n");
+  InstallProgram("/usr/vela/bin/any", kPrintLimits);
+  EXPECT_EQ(Lines(OutputOf("/usr/vela/bin/any")).at(0), "unlimited");
+}
+
+class UnconfinedTools : public ToolConfinement {
+ protected:
+  void SetUp() override {
+    ToolConfinement::SetUp();
+    InstallPrinter(kDcrawPath);
+  }
+
+  static bool IsConfinedWith(const std::string& list, mode_t mode = 0644, uid_t owner = 0) {
+    WriteFile(kList, list);
+    EXPECT_EQ(chmod(kList, mode), 0);
+    EXPECT_EQ(chown(kList, owner, 0), 0);
+    return OutputOf(kDcrawPath, kSecret, kPhoto) == "photo ";
+  }
+};
+
+TEST_F(UnconfinedTools, AreThoseWhosePathIsALine) {
+  if (!HasLandlock()) {
+    return;
+  }
+  EXPECT_FALSE(IsConfinedWith("/usr/bin/dcraw\n"));
+  EXPECT_FALSE(IsConfinedWith("# our own\n\n/usr/bin/other\n/usr/bin/dcraw"));
+  for (const char* list : {"", "\n", "dcraw\n", "# /usr/bin/dcraw\n", "/usr/bin/dcraw2\n",
+                           "/usr/bin/\n", " /usr/bin/dcraw\n", "/usr/bin/other\n"}) {
+    EXPECT_TRUE(IsConfinedWith(list)) << list;
+  }
+}
+
+TEST_F(UnconfinedTools, AreNotNamedByAFileThatOthersCanChange) {
+  if (!HasLandlock()) {
+    return;
+  }
+  EXPECT_FALSE(IsConfinedWith("/usr/bin/dcraw\n", 0600));
+  for (const mode_t mode : {0664, 0646, 0666}) {
+    EXPECT_TRUE(IsConfinedWith("/usr/bin/dcraw\n", mode)) << mode;
+  }
+}
+
+TEST_F(UnconfinedTools, AreNotNamedByAnotherUsersFile) {
+  WriteFile(kList, "");
+  if (!HasLandlock() || chown(kList, 1, 0) != 0) {
+    return;
+  }
+  EXPECT_TRUE(IsConfinedWith("/usr/bin/dcraw\n", 0644, 1));
+  EXPECT_FALSE(IsConfinedWith("/usr/bin/dcraw\n", 0644, 0));
+}
+
+TEST_F(UnconfinedTools, HaveLimitsAndNoEnvironmentAndGainNoPrivileges) {
+  setenv("SECRET_TOKEN", "secret", 1);
+  InstallProgram("/usr/vela/bin/any", std::string(kPrintLimits) + "export -p\n");
+  WriteFile(kList, "/usr/vela/bin/any\n");
+  const std::string output = OutputOf("/usr/vela/bin/any");
+  unsetenv("SECRET_TOKEN");
+  EXPECT_THAT(output, HasSubstr("8388608\n"));
+  EXPECT_THAT(output, HasSubstr("NoNewPrivs: 1\nSeccomp: 0\n"));
+  EXPECT_THAT(output, Not(HasSubstr("SECRET_TOKEN")));
+}
+
+}  // namespace
+}  // namespace vela_test
