@@ -113,6 +113,7 @@ bool ReaderProcess::Start() {
       sockets.own.IsOpen() ? StartProgram(program_, sockets.other.Get(), pid_) : errno;
   if (error == 0) {
     socket_ = std::move(sockets.own);
+    runsAs_ = FileUser();
     parent_ = getpid();
     return true;
   }
@@ -149,10 +150,13 @@ void ReaderProcess::AbandonInherited() {
   parent_ = 0;
 }
 
-/// A file that has taken over the process could give wrong answers about the files that follow.
-/// Those of other users are therefore read by a new process.
+/// A file that has taken over the process could give wrong answers about the files that follow, and
+/// so could the user as whom it runs. Those of other users are therefore read by a new process.
 void ReaderProcess::KeepUsersApart(const OpenedFile& file) {
-  if (file.owner == geteuid()) {
+  if (socket_.IsOpen() && runsAs_ != FileUser()) {
+    Stop();
+  }
+  if (file.owner == FileUser()) {
     return;
   }
   if (user_ && *user_ != file.owner) {

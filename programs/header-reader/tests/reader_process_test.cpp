@@ -28,6 +28,7 @@
 #include "support/sandbox.h"
 #include "support/stub_tool.h"
 #include "support/system_log.h"
+#include "support/users.h"
 
 using namespace vela;
 
@@ -133,6 +134,24 @@ TEST_F(HostileReader, ReadsFilesOfOneUserOnly) {
   EXPECT_NE(second, first);
   EXPECT_NE(second, 0);
   EXPECT_NE(Ask("answer", 1000), second);
+}
+
+TEST_F(HostileReader, WorksForOneIdentityOnly) {
+  if (!HasOtherUsers()) {
+    return;  // there is one identity
+  }
+  const pid_t own = Ask("answer");
+  {
+    const AssumedIdentity identity({1000, 1000, {}});
+    ASSERT_EQ(identity.Error(), 0);
+    const auto answer = process_.Ask(HeaderTopic::kImageSize, Opened("/tmp/command"));
+    // Without an answer, the program is not accessible to other users here.
+    EXPECT_TRUE(!answer || static_cast<pid_t>(answer->width) != own);
+    EXPECT_THAT(ProcessesCalled("hostile_reader"), testing::Not(testing::Contains(own)));
+    ClearLog();
+  }
+  EXPECT_NE(Ask("answer"), 0);
+  EXPECT_THAT(ProcessesCalled("hostile_reader"), testing::SizeIs(1));
 }
 
 TEST_F(HostileReader, ThatIsMissingIsLoggedOnce) {
