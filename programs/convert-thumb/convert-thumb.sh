@@ -39,7 +39,11 @@ is_misread() {
 }
 
 # By the first bytes: JPEG, PNG, GIF, BMP, TIFF, PSD, PBM to PAM, WebP, JPEG 2000, HEIC and AVIF.
+# TGA has no signature.
 is_photo() { # FILE
+  case $1 in
+    *.tga | *.TGA) return 0 ;;
+  esac
   case $(od -An -v -tx1 -N12 -- "$1" | tr -d ' \n') in
     ffd8* | 89504e470d0a1a0a* | 4749463837* | 4749463839* | 424d* | 4241* | 38425053*) return 0 ;;
     49492a00* | 4d4d002a* | 49492b00* | 4d4d002b* | 503[1-7]*) return 0 ;;

@@ -44,19 +44,39 @@ constexpr uint32_t kArchitecture = 0;
 
 /// Reading descriptors, answering, memory, time, and the end.
 constexpr long kAllowedCalls[] = {
-    SYS_read,         SYS_readv,        SYS_pread64,
-    SYS_lseek,        SYS_recvmsg,      SYS_write,
-    SYS_close,        SYS_dup,          SYS_brk,
-    SYS_munmap,       SYS_mremap,       SYS_madvise,
-    SYS_futex,        SYS_getrandom,    SYS_clock_gettime,
-    SYS_gettimeofday, SYS_rt_sigreturn, SYS_rt_sigprocmask,
-    SYS_exit,         SYS_exit_group,   SYS_restart_syscall,
+    SYS_read,
+    SYS_readv,
+    SYS_pread64,
+    SYS_lseek,
+    SYS_recvmsg,
+    SYS_write,
+    SYS_close,
+    SYS_dup,
+    SYS_brk,
+    SYS_munmap,
+    SYS_mremap,
+    SYS_madvise,
+    SYS_futex,
+    SYS_getrandom,
+    SYS_clock_gettime,
+    SYS_gettimeofday,
+    SYS_rt_sigreturn,
+    SYS_rt_sigprocmask,
+    SYS_exit,
+    SYS_exit_group,
+    SYS_restart_syscall,
 #if defined(SYS_time)
     SYS_time,
 #endif
 #if defined(VELA_SANITIZED)
-    SYS_gettid,       SYS_getpid,       SYS_sched_yield,
-    SYS_sigaltstack,  SYS_rt_sigaction, SYS_prctl,
+    // The sanitizers examine memory through a pipe.
+    SYS_pipe2,
+    SYS_gettid,
+    SYS_getpid,
+    SYS_sched_yield,
+    SYS_sigaltstack,
+    SYS_rt_sigaction,
+    SYS_prctl,
     SYS_tgkill,
 #endif
 };

@@ -3,6 +3,7 @@
 // Answers questions about image files whose descriptors it gets through its standard output, a
 // socket. It is started by other programs, not by users.
 
+#include <chrono>
 #include <ctime>
 
 #include "answer.h"
@@ -20,6 +21,9 @@ namespace {
 /// leaks nor the time of harmless files make it fail.
 constexpr int kMaxQuestions = 1000;
 constexpr std::clock_t kMaxProcessorTime = std::clock_t{2} * CLOCKS_PER_SEC;
+
+/// A program that is observed for its progress does not appear to be waiting for this process.
+constexpr std::chrono::seconds kMaxIdleTime(60);
 
 /// Returns false when there are no more questions.
 bool AnswerQuestion() {
@@ -40,7 +44,7 @@ bool AnswerQuestion() {
 
 int main() {
   InitializeImageLibrary();
-  if (EnterConfinement() != 0) {
+  if (LimitReceiving(kQuestionSocket, kMaxIdleTime) != 0 || EnterConfinement() != 0) {
     return 1;
   }
   for (int i = 0; i < kMaxQuestions && std::clock() < kMaxProcessorTime; ++i) {

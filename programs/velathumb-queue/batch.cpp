@@ -36,6 +36,7 @@ std::vector<std::string> TakeNotesAbout(const EntryTarget& target) {
     return note.path.empty() || DoOverlap(target, TargetOf(note.path));
   });
   std::vector<std::string> directories;
+  directories.reserve(notes.size());
   for (const UnfinishedDirectory& note : notes) {
     directories.push_back(note.path);
   }

@@ -69,6 +69,8 @@ class QueueRun {
   RunEnd FinishTaken();
   int RequeueDeferred();
   void WaitForEntries();
+  void Follow(bool isIdle);
+  bool RequeueAfterAll();
   void QueueUnfinished();
   bool WaitAfterFailure(RunEnd end);
   RunEnd EndWhenIdle();
@@ -206,13 +208,22 @@ int QueueRun::RequeueDeferred() {
 void QueueRun::WaitForEntries() {
   // The watch reports every new queue; the limit is for file systems that report nothing.
   constexpr milliseconds kLongestWait = std::chrono::minutes(1);
-  constexpr milliseconds kRequeueInterval = std::chrono::hours(1);
   isIdle_ = true;
   repeats_.clear();
   seen_.clear();
   histories_.clear();
   events_.Wait(kLongestWait);
-  if (Clock::now() - lastRequeue_ >= (hasRequeued_ ? kRequeueInterval : kLongestWait)) {
+}
+
+/// Waits for new entries when there are none. Puts deferred ones back every hour, or a minute after
+/// that has failed, also when the runner is never idle.
+void QueueRun::Follow(bool isIdle) {
+  constexpr std::chrono::minutes kInterval(60);
+  constexpr std::chrono::minutes kRetryInterval(1);
+  if (isIdle) {
+    WaitForEntries();
+  }
+  if (Clock::now() - lastRequeue_ >= (hasRequeued_ ? kInterval : kRetryInterval)) {
     RequeueDeferred();
   }
 }
@@ -283,26 +294,27 @@ RunEnd QueueRun::EndWhenIdle() {
   return hasDeferred_ ? RunEnd::kDeferred : RunEnd::kEmpty;
 }
 
+/// Puts deferred entries back that could not be put back before: processing the queue may have made
+/// room for them.
+bool QueueRun::RequeueAfterAll() {
+  return !hasRequeued_ && RequeueDeferred() == 0;
+}
+
 RunEnd QueueRun::RunRounds() {
   while (!events_.IsStopping()) {
     bool isIdle = false;
     const RunEnd end = RunRound(isIdle);
-    if (end != RunEnd::kEmpty && !WaitAfterFailure(end)) {
-      return end;
-    }
     if (end != RunEnd::kEmpty) {
+      if (!WaitAfterFailure(end)) {
+        return end;
+      }
       continue;
     }
     failures_ = 0;
-    // Processing the queue may have made room for them.
-    if (isIdle && !hasRequeued_ && !settings_.follow && RequeueDeferred() == 0) {
-      continue;
-    }
-    if (isIdle && !settings_.follow) {
+    if (settings_.follow) {
+      Follow(isIdle);
+    } else if (isIdle && !RequeueAfterAll()) {
       return EndWhenIdle();
-    }
-    if (isIdle) {
-      WaitForEntries();
     }
   }
   return RunEnd::kStopped;

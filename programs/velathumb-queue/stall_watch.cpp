@@ -79,7 +79,9 @@ bool StallWatch::HasProgressed(Clock::time_point now) {
     return true;  // unknown, or it has just ended
   }
   const bool isToolRunning = IsToolRunning(*activity, now);
-  const bool isActive = activity->cpuTime != last_.cpuTime || activity->written != last_.written;
+  // On a busy machine, a process may wait for a processor for long.
+  const bool isActive = activity->isRunning || activity->cpuTime != last_.cpuTime ||
+                        activity->written != last_.written;
   last_ = std::move(*activity);
   return isActive || isToolRunning;
 }

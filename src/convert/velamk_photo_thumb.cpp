@@ -86,7 +86,7 @@ int Output::Publish(int& modeError) const {
   }
   modeError = SetFileMode(file_.Get(), kThumbMode);
   // A name on the disk must not outlive the data in a power failure.
-  const int error = SyncFile(file_.Get());
+  const int error = SyncData(file_.Get());
   return error != 0 ? error : temp_.RenameTo(dest_);
 }
 

@@ -11,6 +11,7 @@
 
 #include "posix/child_process.h"
 #include "posix/deadline.h"
+#include "posix/identity.h"
 #include "posix/local_socket.h"
 #include "posix/log.h"
 
@@ -105,11 +106,14 @@ bool ReaderProcess::Start() {
   if (program_.empty()) {
     program_ = FindProgram();
   }
+  // It survives the work for a user, who could otherwise trace it.
+  const OwnIdentity own;
   MessageSockets sockets = ConnectMessageSockets();
   const int error =
       sockets.own.IsOpen() ? StartProgram(program_, sockets.other.Get(), pid_) : errno;
   if (error == 0) {
     socket_ = std::move(sockets.own);
+    runsAs_ = FileUser();
     parent_ = getpid();
     return true;
   }
@@ -146,10 +150,13 @@ void ReaderProcess::AbandonInherited() {
   parent_ = 0;
 }
 
-/// A file that has taken over the process could give wrong answers about the files that follow.
-/// Those of other users are therefore read by a new process.
+/// A file that has taken over the process could give wrong answers about the files that follow, and
+/// so could the user as whom it runs. Those of other users are therefore read by a new process.
 void ReaderProcess::KeepUsersApart(const OpenedFile& file) {
-  if (file.owner == geteuid()) {
+  if (socket_.IsOpen() && runsAs_ != FileUser()) {
+    Stop();
+  }
+  if (file.owner == FileUser()) {
     return;
   }
   if (user_ && *user_ != file.owner) {

@@ -55,6 +55,7 @@ class ReaderProcess {
   FileDescriptor socket_;
   pid_t pid_ = 0;
   pid_t parent_ = 0;              // the process that has started it
+  uint32_t runsAs_ = 0;           // the user of the process
   std::optional<uint32_t> user_;  // whose files it has read
   std::vector<pid_t> ending_;     // killed, but not gone yet
   bool hasLoggedFailure_ = false;

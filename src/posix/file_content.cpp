@@ -43,6 +43,18 @@ std::string ReadSmall(const FileDescriptor& file, const struct stat& status, siz
   return content.size() == size ? content : std::string();
 }
 
+int RepeatSync(int (*sync)(int), int fd) {
+  while (sync(fd) != 0) {
+    if (errno == EINVAL || errno == ENOSYS || errno == EOPNOTSUPP) {
+      return 0;
+    }
+    if (errno != EINTR) {
+      return errno;
+    }
+  }
+  return 0;
+}
+
 }  // namespace
 
 int ReadChunk(int fd, char* chunk, size_t size, size_t& got) {
@@ -152,23 +164,27 @@ int WriteAll(int fd, std::string_view content) {
 }
 
 int AppendWhole(int fd, std::string_view text) {
-  ssize_t written = -1;
-  do {
-    written = write(fd, text.data(), text.size());
-  } while (written < 0 && errno == EINTR);
-  if (written == static_cast<ssize_t>(text.size())) {
-    return 0;
+  std::string_view rest = text;
+  int error = 0;
+  while (error == 0 && !rest.empty()) {
+    const ssize_t written = write(fd, rest.data(), rest.size());
+    if (written >= 0) {
+      rest.remove_prefix(static_cast<size_t>(written));
+    } else if (errno != EINTR) {
+      error = errno;
+    }
   }
-  if (written < 0) {
-    return errno;
+  if (error == 0 || rest.size() == text.size()) {
+    return error;
   }
   // A part of a line would be read as another one. What others have appended behind it stays.
+  const auto done = static_cast<off_t>(text.size() - rest.size());
   const off_t end = lseek(fd, 0, SEEK_CUR);
   struct stat status = {};
-  if (end < written || fstat(fd, &status) != 0 || status.st_size != end) {
-    return ENOSPC;
+  if (end < done || fstat(fd, &status) != 0 || status.st_size != end) {
+    return error;
   }
-  return ftruncate(fd, end - written) == 0 ? ENOSPC : errno;
+  return ftruncate(fd, end - done) == 0 ? error : errno;
 }
 
 bool LacksFinalNewline(int fd) {
@@ -184,13 +200,12 @@ int FlushFile(int fd) {
   return copy >= 0 && close(copy) == 0 ? 0 : errno;
 }
 
-int SyncFile(int fd) {
-  while (fdatasync(fd) != 0) {
-    if (errno != EINTR) {
-      return errno;
-    }
-  }
-  return 0;
+int SyncOpenFile(int fd) {
+  return RepeatSync(fsync, fd);
+}
+
+int SyncData(int fd) {
+  return RepeatSync(fdatasync, fd);
 }
 
 }  // namespace vela

@@ -61,9 +61,9 @@ class FileMapping {
 /// Writes all of `content` to `fd`. Returns 0 or an errno value.
 int WriteAll(int fd, std::string_view content);
 
-/// Appends `text` to `fd`, which was opened with O_APPEND and for reading, in one write: completely
-/// or not at all, unless the remains of a failed write cannot be removed. Returns 0 or an errno
-/// value.
+/// Appends `text` to `fd`, which was opened with O_APPEND and for reading, in one write unless that
+/// is cut short: completely or not at all, unless the remains of a failed write cannot be removed.
+/// Returns 0 or an errno value.
 int AppendWhole(int fd, std::string_view text);
 
 /// Returns true when the file is not empty and its last line has no newline at its end, or when
@@ -74,7 +74,11 @@ bool LacksFinalNewline(int fd);
 /// closed: 0 or an errno value.
 int FlushFile(int fd);
 
-/// Waits until the content of the file is on the disk. Returns 0 or an errno value.
-int SyncFile(int fd);
+/// Waits until the content of the open file or directory is on the disk. Returns 0, also when its
+/// file system cannot do that for this kind of file, or an errno value.
+int SyncOpenFile(int fd);
+
+/// Does the same with what is needed to read the content again, but not the times of the file.
+int SyncData(int fd);
 
 }  // namespace vela

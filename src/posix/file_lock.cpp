@@ -182,6 +182,33 @@ int LockDespiteOthers(int fd) {
   return error;
 }
 
+/// Locks the file itself, its guard being taken. Returns as LockFileAt does.
+int LockGuarded(const std::string& path, LockPatience& patience, LockedFile& locked) {
+  locked.file = OpenForReading(path);
+  struct stat status = {};
+  if (!locked.file.IsOpen() || fstat(locked.file.Get(), &status) != 0) {
+    return errno;
+  }
+  if (!S_ISREG(status.st_mode)) {
+    return EINVAL;
+  }
+  const int error = TryLockExclusively(locked.file.Get());
+  if (error == 0) {
+    patience.Renew();
+  } else if (error != EWOULDBLOCK || !patience.IsExhausted() || !locked.guard.IsHeld()) {
+    return error;
+  }
+  if (!IsAtPath(locked.file.Get(), path, Links::kFollowed)) {
+    return ENOENT;
+  }
+  if (fstat(locked.file.Get(), &status) != 0) {
+    return errno;
+  }
+  locked.size = status.st_size;
+  locked.modified = status.st_mtime;
+  return 0;
+}
+
 }  // namespace
 
 int LockExclusively(int fd, milliseconds limit) {
@@ -276,32 +303,15 @@ int LockFileAt(const std::string& path, LockPatience& patience, LockedFile& lock
   if (stat(path.c_str(), &status) != 0) {
     return errno;
   }
-  if (const int error = locked.guard.TryToTake(path); error != 0) {
-    return error;
-  }
-  FileDescriptor file = OpenForReading(path);
-  if (!file.IsOpen() || fstat(file.Get(), &status) != 0) {
-    return errno;
-  }
-  if (!S_ISREG(status.st_mode)) {
-    return EINVAL;
-  }
-  const int error = TryLockExclusively(file.Get());
+  int error = locked.guard.TryToTake(path);
   if (error == 0) {
-    patience.Renew();
-  } else if (error != EWOULDBLOCK || !patience.IsExhausted() || !locked.guard.IsHeld()) {
-    return error;
+    error = LockGuarded(path, patience, locked);
   }
-  if (!IsAtPath(file.Get(), path, Links::kFollowed)) {
-    return ENOENT;
+  if (error != 0) {
+    locked.file.Reset();
+    locked.guard.Release();
   }
-  if (fstat(file.Get(), &status) != 0) {
-    return errno;
-  }
-  locked.file = std::move(file);
-  locked.size = status.st_size;
-  locked.modified = status.st_mtime;
-  return 0;
+  return error;
 }
 
 bool IsLocked(const std::string& path) {

@@ -17,17 +17,15 @@ int ErrnoUnless(bool succeeded) {
   return succeeded ? 0 : errno;
 }
 
-FileDescriptor OpenForAppending(const std::string& path) {
+/// Opens or creates a regular file. Returns 0 or an errno value.
+int OpenForAppending(const std::string& path, FileDescriptor& file) {
   const int flags = O_RDWR | O_CREAT | O_APPEND | O_NONBLOCK | O_NOCTTY | O_CLOEXEC;
-  return FileDescriptor(open(path.c_str(), flags, 0644));
-}
-
-int SyncDescriptor(int fd) {
-  if (fsync(fd) == 0) {
-    return 0;
+  file.Reset(open(path.c_str(), flags, 0644));
+  struct stat status = {};
+  if (!file.IsOpen() || fstat(file.Get(), &status) != 0) {
+    return errno;
   }
-  const bool isUnsupported = errno == EINVAL || errno == ENOSYS || errno == EOPNOTSUPP;
-  return isUnsupported ? 0 : errno;
+  return S_ISREG(status.st_mode) ? 0 : EINVAL;
 }
 
 }  // namespace
@@ -128,26 +126,27 @@ int RenameToNewName(const std::string& from, const std::string& to) {
 }
 
 int AppendLine(const std::string& path, const std::string& text) {
-  FileDescriptor file = OpenForAppending(path);
-  if (!file.IsOpen()) {
-    return errno;
+  FileDescriptor file;
+  int error = OpenForAppending(path, file);
+  if (error == 0) {
+    error = AppendWhole(file.Get(), text + '\n');
   }
-  const int error = AppendWhole(file.Get(), text + '\n');
   return error != 0 ? error : ErrnoUnless(file.Close());
 }
 
 int AppendDurably(const std::string& path, const std::vector<std::string>& lines) {
-  FileDescriptor file = OpenForAppending(path);
-  if (!file.IsOpen()) {
-    return errno;
+  FileDescriptor file;
+  int error = OpenForAppending(path, file);
+  if (error != 0) {
+    return error;
   }
   std::string text = LacksFinalNewline(file.Get()) ? "\n" : "";
   for (const std::string& line : lines) {
     text += line + '\n';
   }
-  int error = AppendWhole(file.Get(), text);
+  error = AppendWhole(file.Get(), text);
   if (error == 0) {
-    error = SyncDescriptor(file.Get());
+    error = SyncOpenFile(file.Get());
   }
   // Some file systems report only here that the data does not fit.
   if (!file.Close() && error == 0) {
@@ -158,7 +157,7 @@ int AppendDurably(const std::string& path, const std::vector<std::string>& lines
 
 int SyncFile(const std::string& path) {
   const FileDescriptor file = OpenForReading(path);
-  return file.IsOpen() ? SyncDescriptor(file.Get()) : errno;
+  return file.IsOpen() ? SyncOpenFile(file.Get()) : errno;
 }
 
 int SyncDirectoryOf(const std::string& path) {

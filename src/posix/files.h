@@ -92,8 +92,8 @@ int RemoveFileIfPresent(const std::string& path);
 int RenameToNewName(const std::string& from, const std::string& to);
 
 /// Appends `text` and a newline to the file `path`, created with mode 0644 when missing. A line
-/// that does not fit on the volume is removed again. Returns 0 or an errno value. The line is not
-/// yet on the disk.
+/// that does not fit on the volume is removed again. Returns 0 or an errno value, EINVAL for
+/// anything but a regular file. The line is not yet on the disk.
 int AppendLine(const std::string& path, const std::string& text);
 
 /// Appends the lines, each with its newline, as AppendLine does: all or none. They begin on a new

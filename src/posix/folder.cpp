@@ -29,7 +29,11 @@ constexpr int kMaxLinks = 40;
 
 /// A file system may give files another owner than the user that created them, such as network and
 /// memory card file systems.
-thread_local uid_t t_creator = static_cast<uid_t>(-1);
+struct Creator {
+  uid_t user = static_cast<uid_t>(-1);   ///< created a file
+  uid_t owner = static_cast<uid_t>(-1);  ///< of that file
+};
+thread_local Creator t_creator;
 
 FileDescriptor Failed(int error) {
   errno = error;
@@ -263,7 +267,9 @@ bool IsInHeldFolder(const std::string& path) {
 }
 
 bool IsOwnFile(const struct stat& status) {
-  const bool isOwner = status.st_uid == FileUser() || status.st_uid == t_creator;
+  const uid_t user = FileUser();
+  const bool isCreator = user == t_creator.user && status.st_uid == t_creator.owner;
+  const bool isOwner = status.st_uid == user || isCreator;
   return S_ISREG(status.st_mode) && status.st_nlink == 1 && isOwner;
 }
 
@@ -412,7 +418,7 @@ std::string FindUnusedPath(const std::string& nameTemplate) {
     }
     struct stat status = {};
     if (vela::Examine(file.Get(), status) == 0) {
-      t_creator = status.st_uid;
+      t_creator = {FileUser(), status.st_uid};
     }
     entry.Remove();
     return path;

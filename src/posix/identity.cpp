@@ -1,6 +1,5 @@
 #include "posix/identity.h"
 
-#include <fcntl.h>
 #include <grp.h>
 #include <linux/capability.h>
 #include <pwd.h>
@@ -14,7 +13,7 @@
 #include <cerrno>
 #include <cstdlib>
 
-#include "posix/file_descriptor.h"
+#include "posix/folder.h"
 #include "posix/log.h"
 
 namespace vela {
@@ -199,9 +198,9 @@ int Assume(const Identity& identity) {
 }  // namespace
 
 std::optional<Identity> OwnerOf(const std::string& path) {
-  const FileDescriptor directory(open(path.c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC));
   struct stat status = {};
-  if (!directory.IsOpen() || fstat(directory.Get(), &status) != 0) {
+  if (const int error = FolderEntry(path).Examine(status); error != 0 || !S_ISDIR(status.st_mode)) {
+    errno = error == 0 ? ENOTDIR : error;
     return std::nullopt;
   }
   return Identity{status.st_uid, status.st_gid, {}};

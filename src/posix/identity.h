@@ -21,8 +21,9 @@ struct Identity {
   std::vector<gid_t> groups;  ///< supplementary groups
 };
 
-/// Returns the user and group that own the directory `path`, links followed, without supplementary
-/// groups. Nothing, with errno set, when it cannot be opened.
+/// Returns the user and group that own the directory `path`, without supplementary groups; trusted
+/// links are followed, and a directory that is held open is examined itself (see folder.h).
+/// Nothing, with errno set, on failure.
 std::optional<Identity> OwnerOf(const std::string& path);
 
 /// Returns the identity that the user of `owner` has after a login: the account's group and its

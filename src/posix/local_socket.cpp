@@ -277,6 +277,12 @@ int SendDescriptor(int socket, std::string_view message, int fd) {
   }
 }
 
+int LimitReceiving(int socket, std::chrono::seconds limit) {
+  timeval time = {};
+  time.tv_sec = static_cast<time_t>(limit.count());
+  return setsockopt(socket, SOL_SOCKET, SO_RCVTIMEO, &time, sizeof time) == 0 ? 0 : errno;
+}
+
 int ReceiveDescriptor(int socket, char* buffer, size_t size, size_t& got, FileDescriptor& fd) {
   for (;;) {
     DescriptorMessage packed(buffer, size);

@@ -4,6 +4,7 @@
 
 #include <sys/socket.h>
 
+#include <chrono>
 #include <cstddef>
 #include <optional>
 #include <string>
@@ -63,6 +64,9 @@ MessageSockets ConnectMessageSockets();
 
 /// Sends a message with a copy of the descriptor `fd`, without waiting.
 int SendDescriptor(int socket, std::string_view message, int fd);
+
+/// Limits how long a blocking receive on this socket waits; it then returns EAGAIN.
+int LimitReceiving(int socket, std::chrono::seconds limit);
 
 /// Waits for a message; `got` is 0 at the end of the connection. `fd` is open only if a descriptor
 /// came with the message.

@@ -150,27 +150,38 @@ int FilePlace::Find(const std::string& path) {
   return error != 0 ? error : ErrorOfFile();
 }
 
+/// Moves to the directory and the name in `link`, which was found at this place. Returns 0 or an
+/// errno value.
+int FilePlace::MoveAlong(const FileDescriptor& link) {
+  std::string path;
+  int error = ReadLink(link.Get(), path);
+  if (error != 0) {
+    return error;
+  }
+  std::string parent;
+  std::tie(parent, name_) = SplitPath(path);
+  error = PathWalk(directory_, links_).Follow(parent);
+  return error == 0 && name_.empty() ? EISDIR : error;
+}
+
 int FilePlace::FollowLinksAtEnd() {
   for (;;) {
     FileDescriptor entry;
     struct stat status = {};
     int error = OpenEntry(directory_.Get(), name_, entry, status);
+    if (error == ENOENT) {
+      return 0;
+    }
     if (error != 0 || !S_ISLNK(status.st_mode)) {
-      return error == ENOENT ? 0 : error;
+      return error;
     }
     FileDescriptor target = CopyOf(directory_);
     error = PathWalk(target, links_).Follow(name_);
     if (LeadsNowhere(error)) {
       return 0;
     }
-    std::string path;
     if (error == 0) {
-      error = ReadLink(entry.Get(), path);
-    }
-    std::string parent;
-    std::tie(parent, name_) = SplitPath(path);
-    if (error == 0) {
-      error = name_.empty() ? EISDIR : PathWalk(directory_, links_).Follow(parent);
+      error = MoveAlong(entry);
     }
     if (error != 0) {
       return error;

@@ -27,6 +27,7 @@ class FilePlace {
 
   int Find(const std::string& path);
   int FollowLinksAtEnd();
+  int MoveAlong(const FileDescriptor& link);
   int ErrorOfFile() const;
 
   FileDescriptor directory_;

@@ -26,6 +26,7 @@ namespace {
 struct ProcessEntry {
   ProcessIdentity identity;
   pid_t parent = 0;
+  bool isRunning = false;
   bool hasEnded = false;
   uint64_t cpuTime = 0;
 };
@@ -56,6 +57,7 @@ std::optional<ProcessEntry> ExamineProcess(pid_t pid) {
   if (count != kFields) {
     return std::nullopt;
   }
+  entry.isRunning = state == 'R';
   entry.hasEnded = state == 'Z' || state == 'X';
   entry.cpuTime = times[0] + times[1] + times[2] + times[3];
   return entry;
@@ -87,6 +89,7 @@ std::multimap<pid_t, ProcessEntry> ListProcesses() {
 }
 
 void Add(const ProcessEntry& process, ProcessActivity& activity) {
+  activity.isRunning = activity.isRunning || process.isRunning;
   activity.cpuTime += process.cpuTime;
   activity.written += WrittenBytes(process.identity.pid);
 }

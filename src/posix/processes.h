@@ -32,8 +32,9 @@ constexpr bool operator<(const ProcessIdentity& a, const ProcessIdentity& b) {
 
 /// What a process and its descendants have done until now.
 struct ProcessActivity {
-  uint64_t cpuTime = 0;  ///< clock ticks; includes children that have ended
-  uint64_t written = 0;  ///< bytes passed to write calls; 0 when that cannot be read
+  bool isRunning = false;  ///< one of them is running, or waits only for a processor
+  uint64_t cpuTime = 0;    ///< clock ticks; includes children that have ended
+  uint64_t written = 0;    ///< bytes passed to write calls; 0 when that cannot be read
   std::vector<ProcessIdentity> descendants;  ///< those that have not ended
 };
 

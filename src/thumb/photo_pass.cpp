@@ -53,7 +53,7 @@ PhotoEnd PhotoPass::Run() {
   }
   const HeldFolder folder(metadataDir_);
   if (folder.Error() == ELOOP) {
-    LogError("velathumb: not following a link of another user: " + metadataDir_);
+    LogError("not following a link of another user: " + metadataDir_);
     return PhotoEnd::kNextPhoto;
   }
   return Process();

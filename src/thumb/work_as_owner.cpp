@@ -31,6 +31,7 @@ WorkAsOwner::WorkAsOwner(const std::string& dir) {
   if (!IsWanted()) {
     return;
   }
+  folder_.emplace(dir);
   const std::optional<Identity> owner = OwnerOf(dir);
   if (!owner || owner->user == 0) {
     return;

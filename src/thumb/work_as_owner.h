@@ -4,6 +4,7 @@
 #include <optional>
 #include <string>
 
+#include "posix/folder.h"
 #include "posix/identity.h"
 
 namespace vela {
@@ -17,6 +18,8 @@ class WorkAsOwner {
   explicit WorkAsOwner(const std::string& dir);
 
  private:
+  /// From before its owner is determined: the path may lead elsewhere later.
+  std::optional<HeldFolder> folder_;
   std::optional<AssumedIdentity> identity_;
 };
 

@@ -16,6 +16,7 @@ const char* const kLeftovers[] = {"VELAPHOTO.tmp.aBcDeF",
                                   "Temp_180.jpg",
                                   "Temp_270.jpg",
                                   "RAW_TEMP.ppm",
+                                  "magick-aBcDeFgHiJkLmNoP",
                                   "VELAPHOTO_THUMB_RAW.jpg"};
 
 /// Files of others, whatever they resemble.
@@ -41,13 +42,15 @@ class Leftovers : public HostileTest {
 }  // namespace
 
 TEST_F(Leftovers, AreRemovedBesideCompleteThumbnails) {
+  const auto thumbs = ThumbsBelow(kPhotos);
   for (const std::string& folder : Folders()) {
     for (const char* name : kLeftovers) {
       WriteFile(folder + "/" + name, "half");
     }
   }
-  ExpectNothingLeftToMake();
+  Make();
   EXPECT_EQ(ListTree(kPhotos), complete_);
+  EXPECT_EQ(ThumbsBelow(kPhotos), thumbs);
 }
 
 TEST_F(Leftovers, AreRemovedBeforeThumbnailsAreMade) {

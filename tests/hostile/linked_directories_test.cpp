@@ -11,14 +11,17 @@ namespace {
 /// The place that the program works in by a link.
 struct Place {
   const char* description;
-  std::string link;    ///< the path of the link
-  std::string target;  ///< a directory of the victim that looks alike
+  std::string link;     ///< the path of the link
+  std::string target;   ///< a directory of the victim that looks alike
+  std::string message;  ///< the log line about the link
 };
 
 std::vector<Place> PlacesOf(const std::string& directory) {
-  return {
-      {"metadata directory", directory + "/@eaDir", kVictimMetadata},
-      {"folder of a photo", directory + "/@eaDir/a.jpg", std::string(kVictimMetadata) + "/a.jpg"}};
+  const std::string root = directory + "/@eaDir";
+  const std::string folder = root + "/a.jpg";
+  return {{"metadata directory", root, kVictimMetadata, "velathumb:844 Failed to open " + root},
+          {"folder of a photo", folder, std::string(kVictimMetadata) + "/a.jpg",
+           "not following a link of another user: " + folder}};
 }
 
 class LinkedDirectories : public HostileTest {
@@ -64,6 +67,7 @@ TEST_F(LinkedDirectories, ToDirectoriesOfOthersAreNotFollowed) {
     MakePhotosOf(kAttacker, InPhotos("d"), place.link);
     ActAs(kAttacker, [&] { return Link(place.target, place.link); });
     RunInTime({InPhotos("d")});
+    EXPECT_THAT(TakeErrorLines(), ::testing::Contains(place.message));
     ExpectVictimUnchanged();
   }
 }

@@ -17,12 +17,12 @@ struct Row : NamedCase {
 };
 
 const Row kRows[] = {
-    {{"ErrorsOfTheRunner"}, {CallScope::kProgram, FaultKind::kErrors, 20}},
-    {{"ErrorsOfVelathumb"}, {CallScope::kTools, FaultKind::kErrors, 25}},
-    {{"KillsOfTheRunner"}, {CallScope::kProgram, FaultKind::kKills, 20}},
-    {{"KillsOfVelathumb"}, {CallScope::kTools, FaultKind::kKills, 8}},
-    {{"FullAtACallOfTheRunner"}, {CallScope::kProgram, FaultKind::kIncidents, 25}},
-    {{"FullAtACallOfVelathumb"}, {CallScope::kTools, FaultKind::kIncidents, 15}},
+    {{"ErrorsOfTheRunner"}, {CallScope::kProgram, FaultKind::kErrors, 12}},
+    {{"ErrorsOfVelathumb"}, {CallScope::kTools, FaultKind::kErrors, 8}},
+    {{"KillsOfTheRunner"}, {CallScope::kProgram, FaultKind::kKills, 12}},
+    {{"KillsOfVelathumb"}, {CallScope::kTools, FaultKind::kKills, 5}},
+    {{"FullAtACallOfTheRunner"}, {CallScope::kProgram, FaultKind::kIncidents, 8}},
+    {{"FullAtACallOfVelathumb"}, {CallScope::kTools, FaultKind::kIncidents, 6}},
 };
 
 }  // namespace

@@ -157,7 +157,7 @@ TEST_F(Races, OutputNameOfTheCommandLineTaken) {
 TEST_F(Races, FailureMarkerTakenBeforeItIsMade) {
   constexpr int kBrokenPhotos = 12;
   const auto makeBroken = [](const std::string& path) { WriteFile(path, "\xff\xd8\xff broken"); };
-  Repeat(Rounds(3), [&](const Trap& trap) {
+  Repeat(Rounds(2), [&](const Trap& trap) {
     Strings markers;
     for (const std::string& folder : FreshPhotos(kBrokenPhotos, makeBroken)) {
       for (const Kind& kind : kinds_) {

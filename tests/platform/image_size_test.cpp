@@ -1,6 +1,7 @@
 // Pixel sizes of photos, from their headers.
 #include <sys/resource.h>
 
+#include "header/header_reader.h"
 #include "platform/platform_fixture.h"
 #include "support/build_paths.h"
 #include "support/images.h"
@@ -39,7 +40,10 @@ JpegRecipe WideRecipe() {
   return recipe;
 }
 
-class ImageSize : public SandboxTest {};
+class ImageSize : public SandboxTest {
+ protected:
+  void TearDown() override { vela::EndHeaderReader(); }
+};
 
 TEST_F(ImageSize, OfEveryKindThatImageMagickWrites) {
   for (const std::string extension :
@@ -140,13 +144,25 @@ TEST_F(ImageSize, OfBitmapsByTheirHeader) {
 }
 
 TEST_F(ImageSize, OfAHugePictureCostsNoMemory) {
-  BitmapSize(20000, 10000);  // not counted: the library's one-time initialisation
+  BitmapSize(20000, 10000);  // not counted: the first question
   rusage before = {};
   getrusage(RUSAGE_SELF, &before);
   EXPECT_EQ(BitmapSize(20000, 10000), "20000x10000");
   rusage after = {};
   getrusage(RUSAGE_SELF, &after);
   EXPECT_LT(after.ru_maxrss - before.ru_maxrss, 1024) << "KiB more";
+}
+
+TEST_F(ImageSize, OfAHugePictureCostsTheReaderNoMemory) {
+  constexpr long kPixelsKib = 20000L * 10000 * 3 / 1024;
+  InOwnProcess([] {
+    EXPECT_EQ(BitmapSize(20000, 10000), "20000x10000");
+    vela::EndHeaderReader();
+    rusage reader = {};
+    getrusage(RUSAGE_CHILDREN, &reader);
+    EXPECT_GT(reader.ru_maxrss, 0);
+    EXPECT_LT(reader.ru_maxrss, kPixelsKib / 4);
+  });
 }
 
 TEST_F(ImageSize, OfPixmapsAsRawPhotosAreDecodedTo) {

@@ -1,4 +1,5 @@
 // Pixel sizes of media files, photos and videos.
+#include "header/header_reader.h"
 #include "platform/video_fixture.h"
 
 namespace vela_test {
@@ -25,7 +26,10 @@ std::string MakeVideo(const std::string& path, const std::string& size = "320x18
   return path;
 }
 
-class MediaResolution : public SandboxTest {};
+class MediaResolution : public SandboxTest {
+ protected:
+  void TearDown() override { vela::EndHeaderReader(); }
+};
 
 TEST_F(MediaResolution, OfPhotos) {
   EXPECT_EQ(SizeOf(MakeImage("/tmp/a.jpg", 123, 45)), "123x45");

@@ -2,6 +2,7 @@
 #include <fcntl.h>
 #include <sys/file.h>
 #include <sys/resource.h>
+#include <sys/syscall.h>
 
 #include <csignal>
 #include <map>
@@ -9,6 +10,7 @@
 #include "platform/platform_fixture.h"
 #include "support/mounts.h"
 #include "support/privileges.h"
+#include "support/seccomp_fail.h"
 
 namespace vela_test {
 namespace {
@@ -89,6 +91,47 @@ TEST_F(QueueFile, FailsOnAFullVolume) {
   EXPECT_EQ(WriteIndexQueue("/photo/b", queue.c_str()), -1);
   EXPECT_EQ(VLIBCErrGet(), ENOSPC);
   EXPECT_EQ(ReadFile(queue), content + "\n");
+}
+
+/// Makes one call while these system calls fail with EIO. Returns the error it reports, 0 without
+/// one.
+int ErrorWithout(const std::vector<int>& calls) {
+  return RunForked([&] {
+    EXPECT_EQ(SeccompFail(calls, EIO)(), 0);
+    return Append() == 0 ? 0 : VLIBCErrGet();
+  });
+}
+
+TEST_F(QueueFile, ReportsAnEntryThatMayNotBeOnTheDisk) {
+  WriteFile(kQueue, "");
+  EXPECT_EQ(ErrorWithout({SYS_fdatasync}), EIO);
+}
+
+TEST_F(QueueFile, HoldsNoEntryBeforeItsNewNameIsOnTheDisk) {
+  EXPECT_EQ(ErrorWithout({SYS_fsync}), EIO);
+  EXPECT_EQ(ReadFile(kQueue), "");
+  EXPECT_EQ(Append(), 0);
+  EXPECT_EQ(ReadFile(kQueue), "/photo/a\n");
+}
+
+TEST_F(QueueFile, NeedsTheDirectoryOnlyForANewFile) {
+  WriteFile(kQueue, "");
+  EXPECT_EQ(ErrorWithout({SYS_fsync}), 0);
+  EXPECT_EQ(ReadFile(kQueue), "/photo/a\n");
+}
+
+TEST_F(QueueFile, BeginsANewLineAfterAPartThatCouldNotBeRemoved) {
+  WriteFile(kQueue, "/photo/x\n");
+  InOwnProcess([] {
+    signal(SIGXFSZ, SIG_IGN);
+    const rlimit limit{12, 12};
+    setrlimit(RLIMIT_FSIZE, &limit);
+    EXPECT_EQ(SeccompFail({SYS_ftruncate}, EIO)(), 0);
+    EXPECT_EQ(WriteIndexQueue("/photo/b", kQueue), -1);
+  });
+  EXPECT_EQ(ReadFile(kQueue), "/photo/x\n/ph");
+  EXPECT_EQ(Append(), 0);
+  EXPECT_EQ(ReadFile(kQueue), "/photo/x\n/ph\n/photo/a\n");
 }
 
 TEST_F(QueueFile, WaitsForTheLock) {

@@ -162,7 +162,7 @@ std::string UsersOfChild() {
   char command[] = "grep '^Uid' /proc/self/status > /tmp/users";
   char* const arguments[] = {shell, option, command, nullptr};
   pid_t pid = 0;
-  EXPECT_EQ(StartChild("/bin/sh", arguments, {}, pid), 0);
+  EXPECT_EQ(StartChild("/bin/sh", arguments, {}, {}, pid), 0);
   EXPECT_TRUE(HasSucceeded(ReapChild(pid)));
   const std::string text = ReadFile("/tmp/users");
   RemoveTree("/tmp/users");
@@ -213,7 +213,7 @@ TEST_F(IdentityTest, AUserWhoStopsAChildAtItsStartDoesNotStopItsParent) {
     char program[] = "/bin/true";
     char* const arguments[] = {program, nullptr};
     pid_t pid = 0;
-    result = StartChild(program, arguments, {}, pid);
+    result = StartChild(program, arguments, {}, {}, pid);
     if (result == 0) {
       kill(pid, SIGKILL);
       ReapChild(pid);

@@ -78,6 +78,13 @@ TEST_F(ProcessActivityTest, OfAWaitingProcessDoesNotChange) {
   EXPECT_THAT(after.descendants, IsEmpty());
 }
 
+TEST_F(ProcessActivityTest, ShowsWhetherAProcessIsRunning) {
+  EXPECT_TRUE(ActivityOf(getpid())->isRunning);
+  const WaitingChild child([] {});
+  usleep(100000);
+  EXPECT_FALSE(child.Activity().isRunning);
+}
+
 TEST_F(ProcessActivityTest, CountsCpuTime) {
   const WaitingChild child(UseProcessor);
   EXPECT_GE(child.Activity().cpuTime, 5U);

@@ -1,5 +1,9 @@
 // The queue of directories that need a later run.
+#include <fcntl.h>
+#include <sys/file.h>
+
 #include "program/stub_program_test.h"
+#include "support/descriptor.h"
 #include "support/mounts.h"
 
 namespace vela_test {
@@ -98,6 +102,28 @@ TEST_F(Queueing, ReadOnlySpoolDirectoryIsLoggedThroughout) {
   EXPECT_THAT(ErrorLines(),
               ElementsAre(progress, progress,
                           "velathumb:1112 Failed to write [/tmp/photos] to thumb queue"));
+}
+
+/// Opens the file as any user can, and locks it.
+Descriptor LockAsReader(const char* path) {
+  Descriptor file(open(path, O_RDONLY | O_CLOEXEC));
+  EXPECT_EQ(flock(file.Get(), LOCK_SH), 0) << path;
+  return file;
+}
+
+TEST_F(Queueing, ReadersThatLockTheFilesOfTheSpoolDirectoryDoNotStopIt) {
+  constexpr const char* kCounters = "/var/spool/conv_progress_photo";
+  MakePhoto(InPhotos("a.jpg"));
+  WriteFile(kCounters, "completed_thumb=\"5\"\n");
+  WriteFile(kQueue, "/somewhere/else\n");
+  const Descriptor counters = LockAsReader(kCounters);
+  const Descriptor queue = LockAsReader(kQueue);
+  ProgramOptions options;
+  options.timeLimit = std::chrono::seconds(30);
+  EXPECT_SUCCESS(Run({kPhotos}, options));
+  EXPECT_EQ(ReadFile(kQueue), "/somewhere/else\n/tmp/photos\n");
+  EXPECT_NE(ReadFile(kCounters), "completed_thumb=\"5\"\n");
+  EXPECT_THAT(ListDirectory("/run"), IsEmpty());
 }
 
 }  // namespace

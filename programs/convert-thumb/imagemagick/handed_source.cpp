@@ -32,8 +32,11 @@ bool CanStayMissing(const std::string& argument) {
 /// is not known. Camera raw files look like TIFFs, but only their preview would be read.
 std::string ChooseCoder(const std::string& file, const FileDescriptor& source) {
   const PhotoFormat format = FormatOf(source.Get());
-  const bool isRaw =
-      format == PhotoFormat::kTiff && BlVELAIndexIsRawImage(std::string(ExtensionOf(file)).c_str());
+  const std::string extension(ExtensionOf(file));
+  if (format == PhotoFormat::kUnknown && EqualsIgnoringCase(extension, "tga")) {
+    return "TGA:";  // its files have no signature
+  }
+  const bool isRaw = format == PhotoFormat::kTiff && BlVELAIndexIsRawImage(extension.c_str());
   std::string prefix = isRaw ? "" : CoderPrefix(format);
   if (prefix.empty()) {
     ReportFailure("%s: not a photo in a known format", file.c_str());

@@ -11,9 +11,11 @@
 #include "imagemagick/handed_source.h"
 #include "imagemagick/image_magick_limits.h"
 #include "imagemagick/image_magick_policy.h"
+#include "posix/landlock.h"
 #include "process/child_program.h"
 #include "process/failure_report.h"
 #include "process/source_file.h"
+#include "process/trusted_path.h"
 #include "process/unfinished_outputs.h"
 #include "process/write_signals.h"
 
@@ -46,6 +48,12 @@ bool Hand(const CommandLine& line, HandedLine& handed) {
   return HandSource(line, handed) && HandOutputs(line, handed) && PassDescriptors(handed);
 }
 
+/// ImageMagick creates its temporary files and opens them again later, by their names: others must
+/// not be able to replace them by links, or the links must not lead anywhere else.
+bool CanUseFilesIn(const std::string& directory) {
+  return LandlockVersion() > 0 || ProtectsOwnFiles(directory);
+}
+
 std::vector<char*> ArgumentVector(std::string& argumentZero, std::vector<std::string>& arguments) {
   std::vector<char*> vector = {argumentZero.data()};
   for (std::string& argument : arguments) {
@@ -72,6 +80,9 @@ void HandOver(const CommandLine& line, size_t memoryLimit) {
     return;
   }
   LimitImageMagick(memoryLimit);
+  if (!CanUseFilesIn(line.scratchDirectory)) {
+    KeepImageMagickFromUsingFiles();
+  }
   std::string argumentZero = kArgumentZero;
   std::vector<char*> vector = ArgumentVector(argumentZero, handed.arguments);
   RestoreWriteSignals();

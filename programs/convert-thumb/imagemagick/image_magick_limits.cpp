@@ -14,6 +14,8 @@ constexpr char kMemoryLimitVariable[] = "MAGICK_MEMORY_LIMIT";
 /// written in pieces, which takes five times as long.
 constexpr char kMapLimitVariable[] = "MAGICK_MAP_LIMIT";
 
+constexpr char kDiskLimitVariable[] = "MAGICK_DISK_LIMIT";
+
 /// Parses a size such as "64MiB"; negative if the text is not a number.
 double Bytes(const char* text) {
   constexpr char kPrefixes[] = "kmgt";
@@ -49,6 +51,11 @@ void LimitTo(size_t limit, const char* variable) {
 void LimitImageMagick(size_t memoryLimit) {
   LimitTo(memoryLimit / 2, kMemoryLimitVariable);
   LimitTo(memoryLimit, kMapLimitVariable);
+}
+
+void KeepImageMagickFromUsingFiles() {
+  LimitTo(0, kMapLimitVariable);
+  LimitTo(0, kDiskLimitVariable);
 }
 
 }  // namespace vela

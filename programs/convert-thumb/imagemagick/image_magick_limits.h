@@ -9,4 +9,7 @@ namespace vela {
 /// out of memory, well before it uses `memoryLimit` bytes. Existing lower limits stay.
 void LimitImageMagick(size_t memoryLimit);
 
+/// Sets limits in the environment that make ImageMagick fail instead of keeping a picture in files.
+void KeepImageMagickFromUsingFiles();
+
 }  // namespace vela

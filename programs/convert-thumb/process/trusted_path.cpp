@@ -43,6 +43,25 @@ bool ProtectsOwnNames(const struct stat& directory) {
          ((directory.st_mode & (S_IWGRP | S_IWOTH)) == 0 || (directory.st_mode & S_ISVTX) != 0);
 }
 
+/// Returns true when others cannot exchange names of root or us in the directory, nor one of the
+/// directories above it.
+bool IsProtected(const FileDescriptor& directory) {
+  FileDescriptor current(openat(directory.Get(), ".", kDirectory | O_CLOEXEC));
+  struct stat status;
+  while (current.IsOpen() && fstat(current.Get(), &status) == 0 && ProtectsOwnNames(status)) {
+    FileDescriptor above(openat(current.Get(), "..", kDirectory | O_CLOEXEC));
+    struct stat aboveStatus;
+    if (!above.IsOpen() || fstat(above.Get(), &aboveStatus) != 0) {
+      return false;
+    }
+    if (IsSameFile(status, aboveStatus)) {
+      return true;
+    }
+    current = std::move(above);
+  }
+  return false;
+}
+
 }  // namespace
 
 std::optional<Place> FindPlace(const std::string& path) {
@@ -66,24 +85,12 @@ FileDescriptor OpenSource(const std::string& path) {
 bool IsPrivate(const FileDescriptor& directory) {
   struct stat status;
   return fstat(directory.Get(), &status) == 0 && (status.st_mode & (S_IWGRP | S_IWOTH)) == 0 &&
-         ProtectsOwnFiles(directory);
+         IsProtected(directory);
 }
 
-bool ProtectsOwnFiles(const FileDescriptor& directory) {
-  FileDescriptor current(openat(directory.Get(), ".", kDirectory | O_CLOEXEC));
-  struct stat status;
-  while (current.IsOpen() && fstat(current.Get(), &status) == 0 && ProtectsOwnNames(status)) {
-    FileDescriptor above(openat(current.Get(), "..", kDirectory | O_CLOEXEC));
-    struct stat aboveStatus;
-    if (!above.IsOpen() || fstat(above.Get(), &aboveStatus) != 0) {
-      return false;
-    }
-    if (IsSameFile(status, aboveStatus)) {
-      return true;
-    }
-    current = std::move(above);
-  }
-  return false;
+bool ProtectsOwnFiles(const std::string& path) {
+  const FileDescriptor directory = OpenTrusted(AT_FDCWD, path.c_str(), kDirectory);
+  return directory.IsOpen() && IsProtected(directory);
 }
 
 }  // namespace vela

@@ -27,8 +27,8 @@ FileDescriptor OpenSource(const std::string& path);
 /// directory or exchange a directory above it.
 bool IsPrivate(const FileDescriptor& directory);
 
-/// Returns true when nobody but root and the effective user can replace files of theirs in this
-/// directory, although others may perhaps create files there, as in /tmp.
-bool ProtectsOwnFiles(const FileDescriptor& directory);
+/// Returns true when nobody but root and the effective user can replace files of theirs in the
+/// directory at `path`, although others may perhaps create files there, as in /tmp.
+bool ProtectsOwnFiles(const std::string& path);
 
 }  // namespace vela

@@ -4,6 +4,8 @@
 
 #include "converter_fixture.h"
 #include "support/build_paths.h"
+#include "support/missing_library.h"
+#include "support/stub_tool.h"
 
 namespace vela_test {
 namespace {
@@ -249,11 +251,15 @@ TEST_F(Formats, DamagedTiffIsNotReportedByItsLibrary) {
 }
 
 TEST_F(Formats, LibvipsLeavesTheEnvironmentToImageMagick) {
+  const std::string source = MakePicture("linear.png", 300, 200, {"-set", "gamma", "1"});
+  // The converter can run only ImageMagick, so a shell has to take its place.
+  RemoveTool(kImageMagick);
+  CopyFile("/bin/sh", kImageMagick);
+  ASSERT_EQ(chmod(kImageMagick, 0755), 0);
   const std::string tool = "/usr/vela/lib/convert-thumb";
   MakeDirectories("/usr/vela/lib");
-  WriteFile(tool, "#!/bin/sh\necho \"VIPSHOME is ${VIPSHOME-unset}\"\n");
+  WriteFile(tool, std::string("#!") + kImageMagick + "\necho \"VIPSHOME is ${VIPSHOME-unset}\"\n");
   ASSERT_EQ(chmod(tool.c_str(), 0755), 0);
-  const std::string source = MakePicture("linear.png", 300, 200, {"-set", "gamma", "1"});
   const std::vector<std::string> arguments = Line(source, {ThumbOptions()}, "ours").Arguments();
   ProgramOptions options;
   EXPECT_EQ(RunConverter(arguments, options).out, "VIPSHOME is unset\n");
@@ -354,16 +360,13 @@ TEST_F(Formats, OnlyHeifLoadsAModuleOfLibvips) {
 
 TEST_F(Formats, HandsOverWithoutLibvips) {
   const std::string source = MakePicture("a.png", 300, 200);
-  MakeDirectories("/tmp/broken");
-  WriteFile("/tmp/broken/libvips.so.42", "");
-  ProgramOptions options;
-  options.addedEnvironment = {"LD_LIBRARY_PATH=/tmp/broken"};
+  const MissingLibrary missing("libvips");
   const std::vector<std::string> arguments = Line(source, {ThumbOptions()}, "ours").Arguments();
-  const ProgramResult result = RunConverter(arguments, options);
+  const ProgramResult result = RunConverter(arguments);
   EXPECT_EQ(result.exitCode, 0);
   EXPECT_EQ(result.err, "");
   const WithoutImageMagick without;
-  EXPECT_EQ(RunConverter(arguments, options).exitCode, 1);
+  EXPECT_EQ(RunConverter(arguments).exitCode, 1);
 }
 
 }  // namespace

@@ -5,14 +5,17 @@
 #include <poll.h>
 #include <sys/inotify.h>
 #include <sys/stat.h>
+#include <sys/syscall.h>
 #include <unistd.h>
 
 #include <atomic>
+#include <cerrno>
 #include <chrono>
 #include <thread>
 
 #include "converter_fixture.h"
 #include "posix/file_descriptor.h"
+#include "support/seccomp_fail.h"
 
 using namespace vela;
 
@@ -160,6 +163,23 @@ TEST_F(HostileOutputs, OnlyTheNullDeviceIsAcceptedBehindLinks) {
   for (const std::string& photo : photos) {
     ExpectRefused(photo);
   }
+}
+
+/// Without Landlock, links in place of ImageMagick's temporary files could lead anywhere.
+TEST_F(HostileOutputs, WithoutLandlockThereAreNoTemporaryFilesInASharedDirectory) {
+  // Larger than the part of the limit for pictures in memory.
+  SetMemoryLimit("8M");
+  const std::string photo = MakePicture("large.bmp", 1600, 1200);
+  ProgramOptions withoutLandlock;
+  withoutLandlock.beforeExec = {SeccompFail({SYS_landlock_create_ruleset}, ENOSYS)};
+  const auto statusWith = [&](const std::string& scratch, const ProgramOptions& options) {
+    const CommandLine line{photo, scratch, {{{}, directory_ + "/o.jpg"}}};
+    return RunConverter(line.Arguments(), options).exitCode;
+  };
+  EXPECT_EQ(statusWith(directory_, withoutLandlock), 0);
+  EXPECT_EQ(statusWith("/tmp", withoutLandlock), 0);
+  EXPECT_EQ(statusWith(shared_, withoutLandlock), 1);
+  EXPECT_EQ(statusWith(shared_, ProgramOptions()), 0);
 }
 
 /// Puts a link under the name of each file that is created or removed in a directory, as fast as

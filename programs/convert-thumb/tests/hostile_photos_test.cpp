@@ -107,6 +107,17 @@ TEST_F(HostilePhotos, AreReadByTheirContentWhateverTheirNames) {
   }
 }
 
+TEST_F(HostilePhotos, OnlyTgaIsReadByItsName) {
+  ExpectSuccess(ConvertPhoto(MakePicture("a.tga", 30, 20)));
+  RemoveTree(outputs_ + "/o.jpg");
+  for (const Document& document : kDocuments) {
+    const std::string photo = directory_ + "/a.tga";
+    WriteFile(photo, document.text);
+    EXPECT_EQ(ConvertPhoto(photo).exitCode, 1) << document.kind;
+    EXPECT_THAT(ListDirectory(outputs_), IsEmpty()) << document.kind;
+  }
+}
+
 TEST_F(HostilePhotos, LinksOfOthersToPrivatePhotosAreRefused) {
   const std::string photo = directory_ + "/a.jpg";
   ASSERT_EQ(symlink(kPrivate, photo.c_str()), 0);

@@ -3,7 +3,7 @@
 #include <unistd.h>
 
 #include "converter_fixture.h"
-#include "support/stub_files.h"
+#include "support/build_paths.h"
 #include "support/stub_tool.h"
 
 namespace vela_test {
@@ -91,6 +91,52 @@ TEST_F(ImageMagickPolicy, IsRequired) {
   EXPECT_EQ(result.err, std::string("convert-thumb: ") + kPolicies +
                             "/policy.xml: No such file or directory, so ImageMagick is not used\n");
   EXPECT_FALSE(Exists(output_));
+}
+
+/// The alternative converter, a script that only calls ImageMagick.
+class WrapperScript : public ConverterTest {
+ protected:
+  void SetUp() override {
+    ConverterTest::SetUp();
+    MakeDirectories("/usr/vela/lib");
+    ASSERT_EQ(symlink(kImageMagick, "/usr/vela/lib/convert-thumb"), 0);
+  }
+
+  static ProgramResult RunScript(const std::vector<std::string>& arguments) {
+    return RunProgram(SourceDirectory() + "/programs/convert-thumb/convert-thumb.sh", arguments);
+  }
+};
+
+TEST_F(WrapperScript, ConvertsPhotosOfEveryFormat) {
+  for (const char* name : {"a.jpg", "a.png", "a.gif", "a.bmp", "a.tif", "a.psd", "a.webp", "a.heic",
+                           "a.avif", "a.jp2", "a.ppm", "pgm:a.pgm"}) {
+    const CommandLine line{MakePicture(name, 60, 40) + "[0]",
+                           directory_,
+                           {{{}, directory_ + "/one.jpg"}, {{}, directory_ + "/two.jpg"}}};
+    const ProgramResult result = RunScript(line.Arguments());
+    EXPECT_EQ(result.exitCode, 0) << name << result.err;
+    EXPECT_TRUE(IsWholeJpeg(directory_ + "/two.jpg")) << name;
+    RemoveTree(directory_ + "/one.jpg");
+    RemoveTree(directory_ + "/two.jpg");
+  }
+}
+
+TEST_F(WrapperScript, RefusesEverythingElse) {
+  const std::string photo = directory_ + "/a.jpg";
+  for (const char* content : {"<svg width='20' height='10'/>", "viewbox 0 0 9 9\n", "a line\n", "",
+                              "id=MagickCache\n", "%!PS\n"}) {
+    WriteFile(photo, content);
+    const CommandLine line{photo + "[0]", directory_, {{{}, directory_ + "/o.jpg"}}};
+    const ProgramResult result = RunScript(line.Arguments());
+    EXPECT_EQ(result.exitCode, 1) << content;
+    EXPECT_EQ(result.err, "convert-thumb: not a photo in a known format: " + photo + "\n");
+    EXPECT_FALSE(Exists(directory_ + "/o.jpg")) << content;
+  }
+}
+
+TEST_F(WrapperScript, UsesThePolicy) {
+  EXPECT_NE(RunScript({"label:text", directory_ + "/o.png"}).exitCode, 0);
+  EXPECT_FALSE(Exists(directory_ + "/o.png"));
 }
 
 }  // namespace

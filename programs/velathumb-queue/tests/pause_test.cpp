@@ -93,8 +93,8 @@ TEST_F(PauseTest, ARunningVelathumbContinues) {
   Program runner = velathumb_.Start();
   ASSERT_TRUE(velathumb_.WaitForStarts(1));
   daemon.Answer(kSwitch, SwitchedOff(true));
-  // The answer that conversion is enabled is valid for a second.
-  std::this_thread::sleep_for(std::chrono::milliseconds(1100));
+  // The answer that conversion is enabled is valid for a second, and longer when it came slowly.
+  std::this_thread::sleep_for(std::chrono::milliseconds(2500));
   Release();
   EXPECT_TRUE(WaitUntilExists("/tmp/came"));
   std::this_thread::sleep_for(std::chrono::milliseconds(500));

@@ -2,10 +2,14 @@
 #include <sys/syscall.h>
 #include <unistd.h>
 
+#include <atomic>
 #include <cerrno>
+#include <random>
+#include <thread>
 
 #include "queue_fixture.h"
 #include "support/mounts.h"
+#include "support/profile_file.h"
 #include "support/seccomp_fail.h"
 #include "taken_queue.h"
 
@@ -86,6 +90,63 @@ TEST_F(SpoolFaultTest, ARecordThatExceedsTheQuotaKeepsTheQueue) {
   EXPECT_THAT(result.err, HasSubstr("cannot record that an entry is done: Disk quota exceeded\n"));
   EXPECT_EQ(ReadFile(kTakenFile), entry + '\n');
   ExpectRun({entry, entry});
+}
+
+/// Fills and frees the volume of the queue at random times until it is destroyed.
+class ChangingVolume {
+ public:
+  ChangingVolume(SmallVolume& volume, unsigned seed)
+      : volume_(volume), thread_([this, seed] { Change(seed); }) {}
+  ~ChangingVolume() {
+    isOver_ = true;
+    thread_.join();
+    volume_.SetAvailable(kRoom);
+  }
+  ChangingVolume(const ChangingVolume&) = delete;
+  ChangingVolume& operator=(const ChangingVolume&) = delete;
+
+  static constexpr uint64_t kRoom = 1 << 20;
+
+ private:
+  void Change(unsigned seed) {
+    std::mt19937 random(seed);
+    std::uniform_int_distribution<int> pause(1, 30);
+    for (bool isFull = true; !isOver_; isFull = !isFull) {
+      volume_.SetAvailable(isFull ? 0 : kRoom);
+      std::this_thread::sleep_for(milliseconds(pause(random)));
+    }
+  }
+
+  SmallVolume& volume_;
+  std::atomic<bool> isOver_ = false;
+  std::thread thread_;
+};
+
+TEST_F(SpoolFaultTest, AVolumeThatIsFullAtRandomTimesLosesNoThumbnail) {
+  constexpr int kDirectories = 8;
+  constexpr unsigned kTrials = 10;
+  const StubTool converter(kConverterPath);
+  WriteProfileFile(kProfiles, UsualProfiles());
+  WriteFile("/etc/velainfo.conf", "");
+  WriteFile("/var/spool/used", "x");
+  for (unsigned trial = 1; trial <= kTrials; ++trial) {
+    SCOPED_TRACE(trial);
+    RemoveTree("/tmp/p");
+    for (int i = 0; i < kDirectories; ++i) {
+      MakePhoto("/tmp/p/" + std::to_string(i) + "/a.jpg");
+      AppendToQueue({"/tmp/p/" + std::to_string(i)});
+    }
+    {
+      const ChangingVolume changing(spool_, trial);
+      for (int run = 0; run < 5; ++run) {
+        EXPECT_THAT(RunRunner().exitCode, AnyOf(0, 2));
+      }
+    }
+    EXPECT_EQ(RunRunner().exitCode, 0);
+    for (int i = 0; i < kDirectories; ++i) {
+      EXPECT_THAT(ListDirectory("/tmp/p/" + std::to_string(i) + "/@eaDir/a.jpg"), SizeIs(4)) << i;
+    }
+  }
 }
 
 struct SyncFault {

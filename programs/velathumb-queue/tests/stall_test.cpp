@@ -26,14 +26,14 @@ class StallTest : public QueueTest {
     WriteFile("/etc/velainfo.conf", "photo_thumb_size_map=\"1\"\n" + settings);
   }
 
-  StallTest() { SetLimits("stall_timeout=\"1\"\n"); }
+  StallTest() { SetLimits("stall_timeout=\"2\"\n"); }
 
   /// Fails the test unless /tmp/a is deferred, /tmp/b is done and the run does not last too long.
   static void ExpectFirstIsDeferred(const ProgramResult& result) {
     EXPECT_EQ(result.exitCode, 1);
     EXPECT_EQ(ReadFile(kLaterFile), "/tmp/a\n");
     EXPECT_FALSE(Exists(kTakenFile));
-    EXPECT_THAT(result.err, HasSubstr("deferred to a later run, velathumb made no progress for 1 "
+    EXPECT_THAT(result.err, HasSubstr("deferred to a later run, velathumb made no progress for 2 "
                                       "seconds: /tmp/a\n"));
     EXPECT_LT(result.wallTime, seconds(30));
   }
@@ -71,22 +71,22 @@ TEST_F(StallTest, AVelathumbThatCannotBeKilledDoesNotHoldUpTheQueue) {
 }
 
 TEST_F(StallTest, AToolThatDoesNothingBeyondItsOwnLimitIsNoProgress) {
-  SetLimits("stall_timeout=\"1\"\ntool_timeout=\"1\"\n");
+  SetLimits("stall_timeout=\"2\"\ntool_timeout=\"1\"\n");
   RunAndExpectFirstIsDeferred(StubPlan().Run("/bin/sleep", {"100"}));
 }
 
 TEST_F(StallTest, AnIdleToolIsProgressWithinItsOwnLimit) {
-  ExpectIsNotEnded(StubPlan().Run("/bin/sleep", {"4"}));
+  ExpectIsNotEnded(StubPlan().Run("/bin/sleep", {"5"}));
 }
 
 TEST_F(StallTest, WithoutALimitAnIdleVelathumbIsNotEnded) {
   SetLimits("stall_timeout=\"0\"\n");
-  ExpectIsNotEnded(StubPlan().Sleep(4000));
+  ExpectIsNotEnded(StubPlan().Sleep(5000));
 }
 
 TEST_F(StallTest, ByDefaultAnIdleVelathumbIsNotEndedSoon) {
   SetLimits("");
-  ExpectIsNotEnded(StubPlan().Sleep(4000));
+  ExpectIsNotEnded(StubPlan().Sleep(5000));
 }
 
 TEST_F(StallTest, AVelathumbThatCalculatesLongerThanTheLimitIsNotEnded) {
@@ -94,7 +94,7 @@ TEST_F(StallTest, AVelathumbThatCalculatesLongerThanTheLimitIsNotEnded) {
   WriteFile(busy,
             "#!/bin/sh\n"
             "now() { read -r time rest </proc/uptime; time=${time%.*}; }\n"
-            "now; end=$((time + 4))\n"
+            "now; end=$((time + 6))\n"
             "while [ $time -lt $end ]; do now; done\n"
             ": >/tmp/finished\n");
   ASSERT_EQ(chmod(busy.c_str(), 0755), 0);
@@ -167,6 +167,17 @@ TEST_F(StallWatchTest, BeginsAnewAfterProgress) {
   EXPECT_EQ(watch.Check(now_), Action::kNone);
   activity_->cpuTime = 1;
   EXPECT_EQ(NextAction(watch), std::pair(Action::kTerminate, seconds(930)));
+}
+
+TEST_F(StallWatchTest, CountsWaitingForAProcessorAsProgress) {
+  StallWatch watch = Watch({seconds(900), seconds(600)});
+  activity_->isRunning = true;
+  for (int i = 0; i < 100; ++i) {
+    now_ += seconds(30);
+    EXPECT_EQ(watch.Check(now_), Action::kNone);
+  }
+  activity_->isRunning = false;
+  EXPECT_EQ(NextAction(watch), std::pair(Action::kTerminate, seconds(900)));
 }
 
 TEST_F(StallWatchTest, CountsWritesAsProgress) {

@@ -102,7 +102,7 @@ int AppendLine(const char* path, const std::string& line) {
   // Others need not wait for the disk.
   queue.guard.Release();
   vela::Unlock(queue.file.Get());
-  return error != 0 ? error : vela::SyncFile(queue.file.Get());
+  return error != 0 ? error : vela::SyncData(queue.file.Get());
 }
 
 }  // namespace
