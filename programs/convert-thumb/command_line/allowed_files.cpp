@@ -1,6 +1,7 @@
 #include "command_line/allowed_files.h"
 
 #include <algorithm>
+#include <iterator>
 #include <string>
 #include <vector>
 
@@ -11,30 +12,9 @@ namespace vela {
 
 namespace {
 
-/// Directories of shared libraries. The dynamic loader, which starts ImageMagick, is among them.
-constexpr const char* kLibraries[] = {"/lib",       "/lib32",     "/lib64",        "/usr/lib",
-                                      "/usr/lib32", "/usr/lib64", "/usr/local/lib"};
 constexpr const char* kImageMagick[] = {"/usr/vela/lib/convert-thumb", "/usr/bin/convert-im6.q16"};
-
-/// What libraries and ImageMagick read.
-constexpr const char* kData[] = {"/etc/ImageMagick-6",
-                                 "/etc/ld.so.cache",
-                                 "/etc/ld.so.preload",
-                                 "/etc/localtime",
-                                 "/usr/share/ImageMagick-6",
-                                 "/usr/share/color",
-                                 "/usr/share/locale",
-                                 "/usr/share/zoneinfo",
-                                 "/usr/vela/share/imagemagick",
-                                 "/dev/random",
-                                 "/dev/urandom",
-                                 "/sys/devices/system/cpu",
-#if defined(CONVERT_THUMB_SANITIZED)
-                                 "/proc",
-#endif
-                                 "/dev/zero"};
-
-constexpr char kNullDevice[] = "/dev/null";
+constexpr const char* kImageMagickData[] = {"/etc/ImageMagick-6", "/usr/share/ImageMagick-6",
+                                            "/usr/share/color", "/usr/vela/share/imagemagick"};
 
 void AddUnique(std::vector<std::string>& list, const std::string& text) {
   if (std::find(list.begin(), list.end(), text) == list.end()) {
@@ -63,11 +43,9 @@ void AddOutputArgument(AllowedFiles& files, const std::string& argument) {
 }  // namespace
 
 AllowedFiles FindAllowedFiles(const CommandLine& line) {
-  AllowedFiles files;
-  files.programs.assign(std::begin(kLibraries), std::end(kLibraries));
+  AllowedFiles files = FilesOfEveryProgram();
   files.programs.insert(files.programs.end(), std::begin(kImageMagick), std::end(kImageMagick));
-  files.data.assign(std::begin(kData), std::end(kData));
-  files.devices = {kNullDevice};
+  files.data.insert(files.data.end(), std::begin(kImageMagickData), std::end(kImageMagickData));
   files.inputs = {line.sourceFile};
   files.outputs = {line.scratchDirectory};
   for (const size_t index : line.outputIndices) {
