@@ -62,6 +62,14 @@ if is_misread; then
   exit 1
 fi
 photo=${source%'[0]'}
+# The policy refuses names that begin with a pipe sign, which could also be commands.
+for argument do
+  shift
+  case $argument in
+    '|'*) argument=./$argument ;;
+  esac
+  set -- "$@" "$argument"
+done
 if [ -f "$photo" ] && ! is_photo "$photo"; then
   echo "convert-thumb: not a photo in a known format: $photo" >&2
   exit 1

@@ -7,7 +7,7 @@
 
 namespace vela {
 
-CopyResult CopyDescriptor(int from, int to) {
+CopyResult CopyDescriptor(int from, int to, int64_t limit) {
   char buffer[4096];
   CopyResult result;
   for (;;) {
@@ -18,6 +18,11 @@ CopyResult CopyDescriptor(int from, int to) {
     if (count < 0) {
       result.end = CopyEnd::kReadFailed;
       result.error = errno;
+      return result;
+    }
+    if (count > limit - result.total) {
+      result.end = CopyEnd::kWriteFailed;
+      result.error = EFBIG;
       return result;
     }
     const ssize_t written = write(to, buffer, static_cast<size_t>(count));

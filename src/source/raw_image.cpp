@@ -7,6 +7,7 @@
 #include <limits>
 
 #include "convert/photo_convert_job.h"
+#include "platform/system_rules.h"
 #include "platform/velaindex.h"
 #include "platform/velautils.h"
 #include "platform/vlibc.h"
@@ -150,7 +151,7 @@ bool DcrawToFile(const std::string& rawPath, const std::string& outPath, const c
              "fopen failed, path=" + outPath + ", errno=" + std::to_string(error));
     return false;
   }
-  const CopyResult copy = CopyDescriptor(output.Descriptor(), file.Get());
+  const CopyResult copy = CopyDescriptor(output.Descriptor(), file.Get(), kToolFileSize);
   LogIncompleteCopy(copy, rawPath, outPath);
   return copy.end == CopyEnd::kComplete && copy.total > 0;
 }

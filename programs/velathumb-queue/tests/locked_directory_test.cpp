@@ -11,6 +11,7 @@
 #include "support/build_paths.h"
 #include "support/mounts.h"
 #include "support/profile_file.h"
+#include "support/users.h"
 
 using namespace vela;
 
@@ -136,11 +137,15 @@ TEST(PostponementTest, GrowsAndEndsAfterAWhile) {
 
 using LockProbeTest = QueueSandboxTest;
 
-TEST_F(LockProbeTest, DoesNotFollowALinkInPlaceOfTheMetadataDirectory) {
+TEST_F(LockProbeTest, FollowsTheLinksThatVelathumbFollows) {
   const Descriptor held = LockDirectory("/tmp/elsewhere", LOCK_EX);
   MakeDirectories("/tmp/p");
   ASSERT_EQ(symlink("/tmp/elsewhere", "/tmp/p/@eaDir"), 0);
-  EXPECT_THAT(FindLockedDirectories({"/tmp/p", false}), IsEmpty());
+  EXPECT_THAT(FindLockedDirectories({"/tmp/p", false}), ElementsAre("/tmp/p"));
+  if (HasOtherUsers()) {
+    ASSERT_EQ(lchown("/tmp/p/@eaDir", 1, 1), 0);
+    EXPECT_THAT(FindLockedDirectories({"/tmp/p", false}), IsEmpty());
+  }
 }
 
 TEST_F(LockProbeTest, LeavesNoLock) {
