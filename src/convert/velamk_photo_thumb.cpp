@@ -68,11 +68,17 @@ class Output {
   /// `modeError` receives that of setting the mode, which is no failure.
   int Publish(int& modeError) const;
 
-  /// Returns its size in bytes, 0 when the thumbnail is another file.
-  int64_t Size() const { return dest_.IsFile(file_.Get()) ? SizeOfFile(file_.Get()) : 0; }
+  /// Returns its size in bytes, 0 when it cannot be examined.
+  int64_t Size() const { return SizeOfFile(file_.Get()); }
 
   void RemoveTemp() const { temp_.Remove(); }
-  void RemoveThumb() const { dest_.Remove(); }
+
+  /// Another service may have replaced the thumbnail meanwhile; that one stays.
+  void RemoveThumb() const {
+    if (dest_.IsFile(file_.Get())) {
+      dest_.Remove();
+    }
+  }
 
  private:
   FolderEntry temp_;

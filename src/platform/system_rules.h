@@ -32,6 +32,8 @@ inline constexpr uint64_t kUnconfinedToolsSize = 65536;
 
 /// Bytes of memory that a tool without a limit of its own may use, and of a file that it may write.
 inline constexpr uint64_t kToolMemory = uint64_t{2} << 30;
+/// The same for dcraw, which needs about ten bytes for each pixel of the largest photo.
+inline constexpr uint64_t kRawDecoderMemory = uint64_t{6} << 30;
 inline constexpr uint64_t kToolFileSize = uint64_t{4} << 30;
 
 /// Number of size classes of thumbnails.

@@ -329,6 +329,10 @@ void KillOverdueChild(pid_t pid, const char* program, std::chrono::seconds limit
   kill(-pid, SIGKILL);
 }
 
+void KillGroup(pid_t pid) {
+  kill(-pid, SIGKILL);
+}
+
 int ReapChild(pid_t pid) {
   int status = -1;
   pid_t reaped;

@@ -42,6 +42,10 @@ bool AwaitChildFor(pid_t pid, std::chrono::seconds limit);
 /// child that has ended, kills only the process group and logs nothing.
 void KillOverdueChild(pid_t pid, const char* program, std::chrono::seconds limit);
 
+/// Kills what an ended child has left running in its process group. Must be called before the child
+/// is reaped: until then the group is not another one.
+void KillGroup(pid_t pid);
+
 /// Waits for the child and reaps it. Returns its wait status, or -1 when another part of the
 /// process has reaped it.
 int ReapChild(pid_t pid);

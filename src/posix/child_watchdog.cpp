@@ -1,5 +1,7 @@
 #include "posix/child_watchdog.h"
 
+#include <sys/socket.h>
+
 #include <system_error>
 
 #include "posix/child_process.h"
@@ -8,11 +10,13 @@
 
 namespace vela {
 
-bool ChildWatchdog::Start(pid_t pid, const char* program, std::chrono::seconds limit) {
+bool ChildWatchdog::Start(pid_t pid, const char* program, std::chrono::seconds limit,
+                          int connection) {
   // The thread inherits the block, so signals are delivered to the program's other threads.
   const SignalBlock noSignals;
   try {
-    thread_ = std::thread(&ChildWatchdog::Watch, this, pid, std::string(program), limit);
+    thread_ =
+        std::thread(&ChildWatchdog::Watch, this, pid, std::string(program), limit, connection);
     return true;
   } catch (const std::system_error&) {
     return false;
@@ -31,12 +35,14 @@ void ChildWatchdog::Stop() {
   thread_.join();
 }
 
-void ChildWatchdog::Watch(pid_t pid, const std::string& program, std::chrono::seconds limit) {
+void ChildWatchdog::Watch(pid_t pid, const std::string& program, std::chrono::seconds limit,
+                          int connection) {
   const Deadline deadline(limit);
   std::unique_lock<std::mutex> lock(mutex_);
   const bool isStopped = wakeUp_.wait_until(lock, deadline.End(), [this] { return isStopped_; });
   if (!isStopped) {
     KillOverdueChild(pid, program.c_str(), limit);
+    shutdown(connection, SHUT_RDWR);
   }
 }
 

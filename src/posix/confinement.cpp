@@ -1,5 +1,7 @@
 #include "posix/confinement.h"
 
+#include <linux/capability.h>
+#include <sys/prctl.h>
 #include <sys/resource.h>
 
 #include <algorithm>
@@ -38,6 +40,17 @@ int UnlessUnsupported(int error) {
   const bool isUnsupported =
       error == ENOSYS || error == EOPNOTSUPP || error == EINVAL || error == EPERM;
   return isUnsupported ? 0 : error;
+}
+
+/// A program of root that is started later has no other rights than to reach files in spite of
+/// their permissions. Fails for other users, who have no rights to give up.
+void LimitCapabilities() {
+  for (unsigned long right = 0; prctl(PR_CAPBSET_READ, right) >= 0; ++right) {
+    const bool isKept = right == CAP_DAC_OVERRIDE || right == CAP_DAC_READ_SEARCH;
+    if (!isKept && prctl(PR_CAPBSET_DROP, right) != 0) {
+      return;
+    }
+  }
 }
 
 }  // namespace
@@ -79,6 +92,9 @@ int PreparedConfinement::Prepare(const Confinement& confinement) {
 }
 
 int PreparedConfinement::Enter() const {
+  if (blocksSystemCalls_) {
+    LimitCapabilities();
+  }
   int error = UnlessUnsupported(RefuseNewPrivileges());
   LowerLimits(limits_);
   DisableCoreDumps();

@@ -21,8 +21,8 @@ struct CopyResult {
   int64_t written = 0;  ///< bytes of that chunk that were written
 };
 
-/// Copies everything from descriptor `from` to descriptor `to`, starting at their current positions.
-/// More than `limit` bytes are a failed write with the error EFBIG.
+/// Copies everything from descriptor `from` to descriptor `to`, starting at their current
+/// positions. More than `limit` bytes are a failed write with the error EFBIG.
 CopyResult CopyDescriptor(int from, int to, int64_t limit);
 
 }  // namespace vela

@@ -26,9 +26,11 @@ using Clock = std::chrono::steady_clock;
 /// Guards are held for the time of a small change; only a process that hangs exceeds this.
 constexpr milliseconds kGuardLimit = std::chrono::minutes(1);
 
-/// After a wait in vain, files that others keep locked are not waited for during this time, or each
-/// of thousands of changes would wait.
+/// After a wait in vain, files that others keep locked are waited for only briefly during this
+/// time, or each of thousands of changes would wait.
 constexpr milliseconds kImpatience = std::chrono::minutes(1);
+/// Others that respect the lock hold it for a moment only.
+constexpr milliseconds kImpatientLimit(50);
 
 /// Only root can write to the directory, and it is not on the volume of the guarded files, which
 /// may be full.
@@ -170,7 +172,7 @@ std::atomic<Clock::rep> impatientUntil{Clock::time_point::min().time_since_epoch
 
 milliseconds ForeignLockLimit() {
   const auto now = Clock::now().time_since_epoch().count();
-  return now < impatientUntil ? milliseconds(0) : kForeignLockLimit;
+  return now < impatientUntil ? kImpatientLimit : kForeignLockLimit;
 }
 
 /// Waits while others hold the lock, but not each time.

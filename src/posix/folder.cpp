@@ -32,6 +32,8 @@ constexpr int kMaxLinks = 40;
 struct Creator {
   uid_t user = static_cast<uid_t>(-1);   ///< created a file
   uid_t owner = static_cast<uid_t>(-1);  ///< of that file
+  dev_t device = 0;
+  int64_t seconds = 0;  ///< when it was created
 };
 thread_local Creator t_creator;
 
@@ -53,6 +55,12 @@ int ReadLink(int fd, std::string& target) {
   }
   target.assign(text, static_cast<size_t>(length));
   return length == sizeof text ? ENAMETOOLONG : 0;
+}
+
+/// Opens the file that `found` has located.
+FileDescriptor OpenFound(const FileDescriptor& found, int flags) {
+  const std::string name = "/proc/self/fd/" + std::to_string(found.Get());
+  return FileDescriptor(open(name.c_str(), flags | kNeverWait));
 }
 
 /// Opens paths component by component, for those with links in them.
@@ -78,15 +86,21 @@ FileDescriptor LinkFollower::Follow(int at, const FileDescriptor& link, const st
   if (const int error = ReadLink(link.Get(), target); error != 0) {
     return Failed(error);
   }
-  FileDescriptor file = Open(at, target, flags);
-  if (!file.IsOpen() || status.st_uid == 0 || status.st_uid == FileUser()) {
+  // Opening some files has effects of its own, so the target is found first.
+  FileDescriptor file = Open(at, target, kPathOnly | (flags & O_DIRECTORY));
+  struct stat found = {};
+  if (!file.IsOpen()) {
     return file;
   }
-  struct stat found = {};
   if (const int error = Examine(file.Get(), found); error != 0) {
     return Failed(error);
   }
-  return found.st_uid == status.st_uid ? std::move(file) : Failed(ELOOP);
+  const bool isTrusted =
+      status.st_uid == 0 || status.st_uid == FileUser() || status.st_uid == found.st_uid;
+  if (!isTrusted) {
+    return Failed(ELOOP);
+  }
+  return (flags & O_PATH) != 0 ? std::move(file) : OpenFound(file, flags);
 }
 
 FileDescriptor LinkFollower::OpenComponent(int at, const std::string& name, int flags) {
@@ -237,6 +251,17 @@ int Reopen(const FileDescriptor& located, FileDescriptor& out) {
   return out.IsOpen() ? 0 : errno;
 }
 
+/// Creates the file exclusively and remembers who owns it.
+FileDescriptor CreateIn(int folder, const char* name, unsigned mode) {
+  const int flags = O_RDWR | O_CREAT | O_EXCL | O_NOFOLLOW | kNeverWait;
+  FileDescriptor file(openat(folder, name, flags, mode));
+  struct stat status = {};
+  if (file.IsOpen() && Examine(file.Get(), status) == 0) {
+    t_creator = {FileUser(), status.st_uid, status.st_dev, status.st_ctim.tv_sec};
+  }
+  return file;
+}
+
 }  // namespace
 
 HeldFolder::HeldFolder(const std::string& path) {
@@ -264,6 +289,27 @@ bool IsFolderHeld(const std::string& path) {
 
 bool IsInHeldFolder(const std::string& path) {
   return FindHeld(Split(path).folder) >= 0 || IsFolderHeld(path);
+}
+
+bool IsInPlace(const std::string& path) {
+  const int held = FindHeld(path);
+  struct stat open = {};
+  struct stat named = {};
+  return held < 0 ||
+         (Examine(held, open) == 0 && stat(path.c_str(), &named) == 0 && IsSameFile(open, named));
+}
+
+bool IsOwnFileIn(int folder, const struct stat& status) {
+  if (IsOwnFile(status) || !S_ISREG(status.st_mode) || status.st_nlink != 1) {
+    return IsOwnFile(status);
+  }
+  std::string name = "VELAPHOTO.tmp.XXXXXX";
+  const FileDescriptor probe =
+      Randomize(name, 6) ? CreateIn(folder, name.c_str(), 0600) : FileDescriptor();
+  if (probe.IsOpen()) {
+    unlinkat(folder, name.c_str(), 0);
+  }
+  return IsOwnFile(status);
 }
 
 bool IsOwnFile(const struct stat& status) {
@@ -315,6 +361,23 @@ FileDescriptor FolderEntry::Open(int flags) const {
   return error_ != 0 ? Failed(error_) : OpenTrusted(folder_, Name(), flags);
 }
 
+namespace {
+
+/// Returns false for a file that is older than the last one that was created in its file system:
+/// another user may have moved an existing file of this user here.
+bool IsNew(int fd, const struct stat& status) {
+  struct statx birth = {};
+  if (status.st_dev != t_creator.device || statx(fd, "", AT_EMPTY_PATH, STATX_BTIME, &birth) != 0 ||
+      (birth.stx_mask & STATX_BTIME) == 0) {
+    return true;
+  }
+  // Some file systems store times in steps of two seconds.
+  constexpr int64_t kSlack = 2;
+  return birth.stx_btime.tv_sec + kSlack >= t_creator.seconds;
+}
+
+}  // namespace
+
 FileDescriptor FolderEntry::OpenOwn() const {
   FileDescriptor file = Open(O_RDONLY | O_NOFOLLOW);
   struct stat status = {};
@@ -324,15 +387,14 @@ FileDescriptor FolderEntry::OpenOwn() const {
   if (const int error = vela::Examine(file.Get(), status); error != 0) {
     return Failed(error);
   }
-  return IsOwnFile(status) ? std::move(file) : Failed(EPERM);
+  return IsOwnFile(status) && IsNew(file.Get(), status) ? std::move(file) : Failed(EPERM);
 }
 
 FileDescriptor FolderEntry::Create(unsigned mode) const {
   if (error_ != 0) {
     return Failed(error_);
   }
-  const int flags = O_RDWR | O_CREAT | O_EXCL | O_NOFOLLOW | kNeverWait;
-  return FileDescriptor(openat(folder_, Name(), flags, mode));
+  return CreateIn(folder_, Name(), mode);
 }
 
 FileDescriptor FolderEntry::CreateAnew(unsigned mode) const {
@@ -415,10 +477,6 @@ std::string FindUnusedPath(const std::string& nameTemplate) {
     const FileDescriptor file = entry.Create(0600);
     if (!file.IsOpen()) {
       continue;
-    }
-    struct stat status = {};
-    if (vela::Examine(file.Get(), status) == 0) {
-      t_creator = {FileUser(), status.st_uid};
     }
     entry.Remove();
     return path;

@@ -52,9 +52,17 @@ bool IsFolderHeld(const std::string& path);
 /// Returns true when `path` is that of an entry of a folder that is held open, or of the folder.
 bool IsInHeldFolder(const std::string& path);
 
+/// Returns false when the directory that is held open for `path` is no longer the one at that path,
+/// because it, or a directory above it, has been renamed or removed; true when none is held.
+bool IsInPlace(const std::string& path);
+
 /// Returns true for a regular file with a single name that a program of this user has created: no
 /// other user can lose anything by a change of it.
 bool IsOwnFile(const struct stat& status);
+
+/// Does the same for a file in the open directory `folder`. On file systems that give all files an
+/// owner of their own, creates and removes a file there to find out which.
+bool IsOwnFileIn(int folder, const struct stat& status);
 
 /// One name in a directory, which need not exist. Functions that return an int return 0 or an errno
 /// value; when the directory cannot be opened, all of them fail.
@@ -73,9 +81,10 @@ class FolderEntry {
   /// set, on failure.
   FileDescriptor Open(int flags) const;
 
-  /// Opens a file for reading that only this user can have put there: a regular file with a single
-  /// name, owned by this user, not reached by a link. Returns no open descriptor, with errno set
-  /// (EPERM for any other file), on failure.
+  /// Opens a file for reading that a program of this user has made: a regular file with a single
+  /// name, owned by this user, not reached by a link, and not older than what this process has last
+  /// created there. Returns no open descriptor, with errno set (EPERM for any other file), on
+  /// failure.
   FileDescriptor OpenOwn() const;
 
   /// Creates the file, which must not exist, with exactly these permission bits, and opens it for

@@ -96,9 +96,20 @@ class RulesetBuilder {
     }
   }
 
-  void AddUserPaths(const std::vector<std::string>& paths, uint64_t access) {
+  /// Other files than regular ones are left out: a tool would wait for the writer of a pipe.
+  void AddInputs(const std::vector<std::string>& paths, uint64_t access) {
     for (const std::string& path : paths) {
-      Add(FolderEntry(path).Open(O_PATH), access);
+      const FileDescriptor file = FolderEntry(path).Open(O_PATH);
+      struct stat status = {};
+      if (!file.IsOpen() || fstat(file.Get(), &status) != 0 || S_ISREG(status.st_mode)) {
+        Add(file, access);
+      }
+    }
+  }
+
+  void AddOutputs(const std::vector<std::string>& paths, uint64_t access) {
+    for (const std::string& path : paths) {
+      Add(FolderEntry(path).Open(O_PATH | O_DIRECTORY), access);
     }
   }
 
@@ -185,8 +196,8 @@ int MakeLandlockRuleset(const AllowedFiles& files, FileDescriptor& ruleset) {
   builder.AddSystemPaths({"/proc"}, kRead);
 #endif
   builder.AddSystemPaths(files.devices, kRead | ChangeFile(version) | kDeviceControl);
-  builder.AddUserPaths(files.inputs, kRead);
-  builder.AddUserPaths(files.outputs, kRead | ChangeFile(version) | kChangeDirectory);
+  builder.AddInputs(files.inputs, kRead);
+  builder.AddOutputs(files.outputs, kRead | ChangeFile(version) | kChangeDirectory);
   ruleset = std::move(made);
   return builder.Error();
 }

@@ -62,6 +62,17 @@ struct Entry {
   FileIdentity identity;
 };
 
+/// Examines a name with the call that all kernels have. Returns 0 or an errno value.
+int ExamineSimply(int folder, const char* name, int flags, Entry& entry) {
+  struct stat status = {};
+  if (Repeat([&] { return fstatat(folder, name, &status, flags | AT_NO_AUTOMOUNT); }) != 0) {
+    return errno;
+  }
+  entry.mode = status.st_mode;
+  entry.identity = {status.st_dev, status.st_ino};
+  return 0;
+}
+
 /// Examines a name without asking the file system again for what is known about it: one that is
 /// mounted there and does not answer must not stop a walk that does not enter it. Returns 0 or an
 /// errno value.
@@ -70,7 +81,9 @@ int Examine(int folder, const char* name, int flags, Entry& entry) {
   const int allFlags = flags | AT_NO_AUTOMOUNT | AT_STATX_DONT_SYNC;
   const unsigned mask = STATX_TYPE | STATX_INO;
   if (Repeat([&] { return statx(folder, name, allFlags, mask, &status); }) != 0) {
-    return errno;
+    // Older kernels and some containers do not have the call.
+    const bool isRefused = errno == ENOSYS || errno == EPERM || errno == EINVAL;
+    return isRefused ? ExamineSimply(folder, name, flags, entry) : errno;
   }
   entry.mode = status.stx_mode;
   entry.identity = {makedev(status.stx_dev_major, status.stx_dev_minor), status.stx_ino};

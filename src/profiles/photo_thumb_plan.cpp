@@ -128,7 +128,8 @@ namespace vela {
 
 int CreatePhaseFailMarkers(const DirectoryJob& dirJob, int phaseIndex, const std::string& eaDir) {
   const int count = GetProfileCount(dirJob.profiles, phaseIndex);
-  for (int i = 0; i < count; ++i) {
+  // When the directory has been renamed, the photo has not failed: the tools did not find it.
+  for (int i = 0; i < count && IsInPlace(dirJob.path); ++i) {
     CreateThumbFailMarker(*GetProfileAt(dirJob.profiles, i, phaseIndex), eaDir);
   }
   return count;

@@ -29,7 +29,7 @@ void RunDirectoryJob(const std::string& dirPath, const std::string& profileFileP
     return;
   }
   const WorkAsOwner owner(dirPath);
-  if (IndexIsPathSupportEAWrite(dirPath.c_str()) == 0) {
+  if (!owner.MayWork() || IndexIsPathSupportEAWrite(dirPath.c_str()) == 0) {
     return;
   }
   if (!ReadProfiles(profiles, profileFilePath, dirPath)) {

@@ -44,6 +44,10 @@ PhotoPass::PhotoPass(const DirectoryJob& job, const std::string& metadataRoot,
       source_(photo_) {}
 
 PhotoEnd PhotoPass::Run() {
+  // The tools would look for the photo under a path that now leads elsewhere.
+  if (!IsInPlace(job_.path)) {
+    return PhotoEnd::kNextPhoto;
+  }
   if (VLIBCFileStat(photo_.c_str(), kPhotoStatusOptions, &status_) != 0) {
     return PhotoEnd::kNextPhoto;
   }

@@ -33,6 +33,7 @@ WorkAsOwner::WorkAsOwner(const std::string& dir) {
   }
   folder_.emplace(dir);
   const std::optional<Identity> owner = OwnerOf(dir);
+  mayWork_ = folder_->Error() == 0 && owner;
   if (!owner || owner->user == 0) {
     return;
   }

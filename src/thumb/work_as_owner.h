@@ -17,10 +17,14 @@ class WorkAsOwner {
  public:
   explicit WorkAsOwner(const std::string& dir);
 
+  /// Returns false when the owner cannot be determined: as root, velathumb must not work there.
+  bool MayWork() const { return mayWork_; }
+
  private:
   /// From before its owner is determined: the path may lead elsewhere later.
   std::optional<HeldFolder> folder_;
   std::optional<AssumedIdentity> identity_;
+  bool mayWork_ = true;
 };
 
 }  // namespace vela

@@ -135,7 +135,7 @@ TEST_F(PipedChild, HasTheThreeStandardDescriptorsOnly) {
   close(high);
   const auto descriptors = OnlyCall().descriptors;
   ASSERT_EQ(descriptors.size(), 3U);
-  const char* const targets[] = {"/dev/null", "pipe:", "/dev/null"};
+  const char* const targets[] = {"/dev/null", "socket:", "/dev/null"};
   for (int number = 0; number < 3; ++number) {
     EXPECT_EQ(descriptors[number].number, number);
     EXPECT_THAT(descriptors[number].target, testing::StartsWith(targets[number]));

@@ -6,7 +6,10 @@
 #include <unistd.h>
 
 #include <cerrno>
+#include <chrono>
+#include <ctime>
 #include <string>
+#include <thread>
 
 #include "support/files.h"
 #include "support/quiet_test.h"
@@ -149,6 +152,38 @@ TEST_F(Folder, OnlyFilesThatNobodyElseHasPlantedAreItsOwn) {
        {"foreign", "two_names", "second_name", "link", "directory", "pipe", "absent"}) {
     EXPECT_FALSE(FolderEntry(In(name)).OpenOwn().IsOpen()) << name;
   }
+}
+
+TEST_F(Folder, FilesFromBeforeAreNotItsOwn) {
+  WriteFile(In("private"), "precious");
+  struct stat old = {};
+  ASSERT_EQ(stat(In("private").c_str(), &old), 0);
+  // Until the times of files differ enough.
+  while (std::time(nullptr) < old.st_ctime + 4) {
+    std::this_thread::sleep_for(std::chrono::milliseconds(50));
+  }
+  EXPECT_TRUE(FolderEntry(In("private")).OpenOwn().IsOpen());
+  const std::string name = FindUnusedPath(In("output.XXXXXX"));
+  ASSERT_EQ(rename(In("private").c_str(), name.c_str()), 0);
+  EXPECT_FALSE(FolderEntry(name).OpenOwn().IsOpen());
+  WriteFile(In("new"), "output");
+  EXPECT_TRUE(FolderEntry(In("new")).OpenOwn().IsOpen());
+}
+
+TEST_F(Folder, ATargetIsNotOpenedBeforeItsLinkIsTrusted) {
+  MakeLink("/dev/full", In("link"), kUser);
+  EXPECT_FALSE(FolderEntry(In("link")).Open(O_RDONLY).IsOpen());
+  EXPECT_EQ(errno, ELOOP);
+}
+
+TEST_F(Folder, IsInPlaceUntilItIsRenamed) {
+  const HeldFolder held(kTop);
+  EXPECT_TRUE(IsInPlace(kTop));
+  ASSERT_EQ(rename(kTop, "/tmp/moved"), 0);
+  EXPECT_FALSE(IsInPlace(kTop));
+  MakeDirectories(kTop);
+  EXPECT_FALSE(IsInPlace(kTop));
+  EXPECT_TRUE(IsInPlace("/tmp/moved")) << "not held under this path";
 }
 
 TEST_F(Folder, StaysTheSameWhileItIsHeld) {

@@ -227,6 +227,17 @@ TEST_F(Failure, OtherThumbnailsDoNotTakeThePlaceOfTheReference) {
   ExpectSkipped(RunWithDaemon());
 }
 
+/// The photos of a directory that is renamed in the middle of a run have not failed.
+TEST_F(Failure, OfARenamedDirectoryLeavesNoMarkers) {
+  PutThumbs(kPhoto, {"XL", "M", "B"});
+  Converter().PlanCall(1, StubPlan().Run("/bin/mv", {kPhotos, "/tmp/moved"}).Exit(1));
+  RunWithDaemon();
+  EXPECT_THAT(ListTree("/tmp/moved/@eaDir"),
+              ::testing::Contains(::testing::HasSubstr("THUMB_XL.jpg")));
+  EXPECT_THAT(ListTree("/tmp/moved/@eaDir"),
+              ::testing::Not(::testing::Contains(::testing::HasSubstr(".fail"))));
+}
+
 TEST_F(Failure, OfSettingAModeIsLoggedOnly) {
   RunWithDaemon({kPhotos}, WithSteps({SeccompFail({SYS_fchmod}, EPERM)}));
   EXPECT_EQ(MetadataOf(kPhoto),

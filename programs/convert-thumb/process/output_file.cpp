@@ -84,7 +84,7 @@ bool RemoveFormer(const Place& place) {
   if (fstatat(place.directory.Get(), place.name.c_str(), &status, AT_SYMLINK_NOFOLLOW) != 0) {
     return errno == ENOENT;
   }
-  if (!IsOwnFile(status)) {
+  if (!IsOwnFileIn(place.directory.Get(), status)) {
     errno = EEXIST;
     return false;
   }
@@ -156,7 +156,7 @@ bool MayBeOverwritten(const std::string& path, const FileDescriptor& file) {
     return false;
   }
   const bool isSame = opened.st_dev == named.st_dev && opened.st_ino == named.st_ino;
-  return (isSame && IsOwnFile(opened)) || IsPrivate(place->directory);
+  return (isSame && IsOwnFileIn(place->directory.Get(), opened)) || IsPrivate(place->directory);
 }
 
 std::optional<ReplaceableFile> ReadReplaceableFile(const std::string& path, size_t limit) {

@@ -2,6 +2,7 @@
 #include <sys/stat.h>
 
 #include <cerrno>
+#include <string>
 
 #include "platform/standalone/last_error.h"
 #include "platform/vlibc.h"
@@ -43,7 +44,15 @@ int SetTimes(const char* path, const timespec (&times)[2]) {
   if (!S_ISDIR(status.st_mode) && !vela::IsOwnFile(status)) {
     return EPERM;
   }
-  return utimensat(file.Get(), "", times, AT_EMPTY_PATH) == 0 ? 0 : errno;
+  if (utimensat(file.Get(), "", times, AT_EMPTY_PATH) == 0) {
+    return 0;
+  }
+  if (errno != EINVAL) {
+    return errno;
+  }
+  // Kernels before 5.8 cannot do that.
+  const std::string name = "/proc/self/fd/" + std::to_string(file.Get());
+  return utimensat(AT_FDCWD, name.c_str(), times, 0) == 0 ? 0 : errno;
 }
 
 }  // namespace

@@ -1,4 +1,5 @@
 #include <fcntl.h>
+#include <sys/socket.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
@@ -27,6 +28,7 @@ using vela::FileDescriptor;
 /// A child and the stream of its output.
 struct PipedChild {
   FILE* stream = nullptr;
+  FileDescriptor connection;  ///< that of the stream, once more
   pid_t pid = -1;
   std::unique_ptr<ChildWatchdog> watchdog;
 };
@@ -76,17 +78,23 @@ int Watch(PipedChild& child, const char* program) {
     return 0;
   }
   child.watchdog = std::make_unique<ChildWatchdog>();
-  return child.watchdog->Start(child.pid, program, limit) ? 0 : EAGAIN;
+  return child.watchdog->Start(child.pid, program, limit, child.connection.Get()) ? 0 : EAGAIN;
 }
 
-/// Starts the program with its output in a pipe. Returns 0 or an errno value.
+/// Starts the program with its output in a socket. Unlike a pipe, a socket cannot be opened under
+/// /proc by other processes of the child's user, and reading from it can be ended. Returns 0 or an
+/// errno value.
 int Open(const char* program, std::vector<char*>& arguments, bool joinError, PipedChild& child) {
   int ends[2];
-  if (pipe2(ends, O_CLOEXEC) != 0) {
+  if (socketpair(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0, ends) != 0) {
     return errno;
   }
   FileDescriptor readEnd(ends[0]);
   FileDescriptor writeEnd(ends[1]);
+  child.connection.Reset(fcntl(readEnd.Get(), F_DUPFD_CLOEXEC, 0));
+  if (!child.connection.IsOpen()) {
+    return errno;
+  }
   const vela::ChildStreams streams{writeEnd.Get(), joinError ? writeEnd.Get() : -1};
   const vela::Confinement confinement =
       vela::ConfinementOfTool(program, arguments.data(), vela::CurrentSettings().toolTimeout);
@@ -147,11 +155,13 @@ int VLIBCPclose(FILE* stream) {
   }
   // A child that is still writing gets SIGPIPE. One that ignores it runs to its end or its time
   // limit.
+  shutdown(child.connection.Get(), SHUT_RDWR);
   fclose(stream);
   vela::AwaitChild(child.pid);
   if (child.watchdog) {
     child.watchdog->Stop();
   }
+  vela::KillGroup(child.pid);
   const int status = vela::ReapChild(child.pid);
   if (status == -1) {
     return vela::Fail(ECHILD);

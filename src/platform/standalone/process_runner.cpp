@@ -80,6 +80,8 @@ int Finish(pid_t pid, const std::string& program) {
   if (limit.count() != 0 && !vela::AwaitChildFor(pid, limit)) {
     vela::KillOverdueChild(pid, program.c_str(), limit);
   }
+  vela::AwaitChild(pid);
+  vela::KillGroup(pid);
   return ResultOf(vela::ReapChild(pid));
 }
 

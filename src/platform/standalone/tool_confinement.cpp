@@ -137,14 +137,14 @@ void AllowCompare(const Arguments& arguments, Confinement& confinement) {
 struct Tool {
   std::string_view name;
   void (*allow)(const Arguments& arguments, Confinement& confinement);
-  bool limitsItsMemory;  ///< it sets a limit of its own before it reads its input
+  uint64_t memory;  ///< bytes; none for one that sets a limit of its own before it reads its input
   bool hasThreads;
 };
 
-constexpr Tool kTools[] = {{"convert-thumb", AllowConverter, true, true},
-                           {"dcraw", AllowDcraw, false, false},
-                           {"exiftool", AllowExiftool, false, false},
-                           {"compare", AllowCompare, false, true}};
+constexpr Tool kTools[] = {{"convert-thumb", AllowConverter, ResourceLimits::kNone, true},
+                           {"dcraw", AllowDcraw, kRawDecoderMemory, false},
+                           {"exiftool", AllowExiftool, kToolMemory, false},
+                           {"compare", AllowCompare, kToolMemory, true}};
 
 const Tool* FindTool(std::string_view program) {
   const std::string_view name = program.substr(program.rfind('/') + 1);
@@ -185,9 +185,7 @@ Confinement ConfinementOfTool(const char* program, char* const arguments[],
   Confinement confinement;
   confinement.limits.fileSize = kToolFileSize;
   confinement.limits.processorSeconds = ProcessorSeconds(tool, timeLimit);
-  if (tool == nullptr || !tool->limitsItsMemory) {
-    confinement.limits.memory = kToolMemory;
-  }
+  confinement.limits.memory = tool == nullptr ? kToolMemory : tool->memory;
   if (IsUnconfined(program)) {
     confinement.blocksSystemCalls = false;
     return confinement;
