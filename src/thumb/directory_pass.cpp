@@ -43,6 +43,17 @@ bool IsPhotoFile(const std::string& path) {
   return status->isRegular;
 }
 
+/// Removes what an interrupted run has left in the folders of photos that no longer exist.
+void CleanOtherFolders(const std::string& metadataRoot, const std::vector<std::string>& names) {
+  DirectoryEntries entries(metadataRoot);
+  while (const char* name = entries.IsOpen() ? entries.NextName() : nullptr) {
+    const bool isFolder = std::strcmp(name, ".") != 0 && std::strcmp(name, "..") != 0;
+    if (isFolder && !std::binary_search(names.begin(), names.end(), name)) {
+      RemoveLeftovers(metadataRoot + "/" + name);
+    }
+  }
+}
+
 /// Processes the photos one after the other. Returns true when the directory needs a later run.
 bool MakePhotos(const DirectoryJob& job, const std::string& metadataRoot,
                 const std::vector<std::string>& names, time_t passStart) {
@@ -106,6 +117,7 @@ void CreateDirectoryThumbs(const DirectoryJob& job) {
     if (!lock.IsHeld()) {
       return;
     }
+    CleanOtherFolders(metadataRoot, names);
     queue = MakePhotos(job, metadataRoot, names, passStart);
   }
   if (queue) {

@@ -120,8 +120,13 @@ class ConfinedProcess : public SandboxTest {
 
 TEST_F(ConfinedProcess, ReadsItsInputAndNoOtherFile) {
   EXPECT_EQ(ErrorOfReading(kInput), 0);
-  for (const char* path : {kSecret, "/tmp/other", "/tmp/in", "/etc/passwd", "/proc/1/status", "/",
-                           "/usr/share", "/run"}) {
+  for (const char* path : {
+         kSecret, "/tmp/other", "/tmp/in", "/etc/passwd", "/", "/usr/share", "/run",
+// A sanitizer reads its own process's memory map.
+#if !defined(__SANITIZE_ADDRESS__)
+             "/proc/1/status"
+#endif
+       }) {
     EXPECT_EQ(InChild([path] { return ErrorOfOpening(path); }), 0) << path;
     EXPECT_EQ(ErrorOfReading(path), ErrorOutside()) << path;
   }

@@ -238,6 +238,17 @@ TEST_F(Failure, OfARenamedDirectoryLeavesNoMarkers) {
               ::testing::Not(::testing::Contains(::testing::HasSubstr(".fail"))));
 }
 
+TEST_F(Failure, OfAnEarlierRunLeavesNothingForPhotosThatAreGone) {
+  for (const char* name : {"VELAPHOTO.tmp.aBc123.jpg", "RAW_TEMP.ppm", "Temp_90.jpg"}) {
+    WriteFile(MetadataDirOf(InPhotos("gone.jpg")) + "/" + name, "");
+  }
+  WriteFile(MetadataDirOf(InPhotos("gone.jpg")) + "/VELAPHOTO_THUMB_S.jpg", "thumb");
+  WriteFile(MetadataDirOf(InPhotos("gone.mp4")) + "/VELAPHOTO_FILM_H.mp4", "video");
+  EXPECT_SUCCESS(Run());
+  EXPECT_EQ(MetadataOf(InPhotos("gone.jpg")), Strings({"VELAPHOTO_THUMB_S.jpg"}));
+  EXPECT_EQ(MetadataOf(InPhotos("gone.mp4")), Strings({"VELAPHOTO_FILM_H.mp4"}));
+}
+
 TEST_F(Failure, OfSettingAModeIsLoggedOnly) {
   RunWithDaemon({kPhotos}, WithSteps({SeccompFail({SYS_fchmod}, EPERM)}));
   EXPECT_EQ(MetadataOf(kPhoto),

@@ -198,9 +198,9 @@ TEST_F(HeaderConfinement, HasNoPrivileges) {
 
 TEST_F(HeaderConfinement, HasLittleMemory) {
   if (kIsSanitized) return;  // its shadow memory exceeds every limit
-  const size_t size = size_t{600} << 20;
-  const auto isMapped = [size] {
-    return mmap(nullptr, size, PROT_READ | PROT_WRITE, MAP_PRIVATE | MAP_ANONYMOUS, -1, 0) !=
+  const auto isMapped = [] {
+    constexpr size_t kSize = size_t{600} << 20;
+    return mmap(nullptr, kSize, PROT_READ | PROT_WRITE, MAP_PRIVATE | MAP_ANONYMOUS, -1, 0) !=
                    MAP_FAILED
                ? 1
                : 0;
