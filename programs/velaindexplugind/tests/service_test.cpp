@@ -11,8 +11,8 @@
 #include <functional>
 
 #include "index_daemon.h"
-#include "support/users.h"
 #include "support/privileges.h"
+#include "support/users.h"
 
 namespace vela_test {
 namespace {
