@@ -19,12 +19,6 @@ Json::Value MakeRequest(const char* command) {
   return packet;
 }
 
-Json::Value MakePathRequest(const char* command, const char* path) {
-  Json::Value packet = MakeRequest(command);
-  packet["path"] = path == nullptr ? "" : path;
-  return packet;
-}
-
 /// Returns a member of the reply, null when it is missing.
 Json::Value Member(const Json::Value& packet, const char* name) {
   return packet.isObject() ? packet[name] : Json::Value();
@@ -52,6 +46,17 @@ bool Exchange(Json::Value& packet, int line) {
   return false;
 }
 
+/// Does the same for a request about `path`; without one there is nothing to ask, which is a
+/// failure.
+bool ExchangeAbout(const char* path, Json::Value& packet, int line) {
+  if (path == nullptr) {
+    LogError(kLogSource, line, "fail");
+    return false;
+  }
+  packet["path"] = path;
+  return Exchange(packet, line);
+}
+
 bool QuerySwitch(const char* command, int line) {
   Json::Value packet = MakeRequest(command);
   return Exchange(packet, line) && ToBool(Member(packet, "result"));
@@ -60,9 +65,9 @@ bool QuerySwitch(const char* command, int line) {
 }  // namespace
 
 int GetMediaFromPluginDB(int type, const char* path, VELA_MEDIA_INFO& out) {
-  Json::Value packet = MakePathRequest("GET_MEDIA_FROM_PLUGIN_DB", path);
+  Json::Value packet = MakeRequest("GET_MEDIA_FROM_PLUGIN_DB");
   packet["type"] = type;
-  if (!Exchange(packet, 30)) {
+  if (!ExchangeAbout(path, packet, 30)) {
     return -1;
   }
   Json::Value media = Member(packet, "media");
@@ -74,8 +79,8 @@ int GetMediaFromPluginDB(int type, const char* path, VELA_MEDIA_INFO& out) {
 }
 
 int GetIndexVersion(const char* path) {
-  Json::Value packet = MakePathRequest("GET_INDEX_VERSION", path);
-  return Exchange(packet, 57) ? ToInt(Member(packet, "version")) : -1;
+  Json::Value packet = MakeRequest("GET_INDEX_VERSION");
+  return ExchangeAbout(path, packet, 57) ? ToInt(Member(packet, "version")) : -1;
 }
 
 bool IsDisableConvertVideo() {
@@ -87,11 +92,11 @@ bool IsDisableConvertPhoto() {
 }
 
 void PostPhotoConvert(const char* path) {
-  Json::Value packet = MakePathRequest("POST_PHOTO_CONVERT", path);
-  Exchange(packet, 137);
+  Json::Value packet = MakeRequest("POST_PHOTO_CONVERT");
+  ExchangeAbout(path, packet, 137);
 }
 
 void PostVideoConvert(const char* path) {
-  Json::Value packet = MakePathRequest("POST_VIDEO_CONVERT", path);
-  Exchange(packet, 157);
+  Json::Value packet = MakeRequest("POST_VIDEO_CONVERT");
+  ExchangeAbout(path, packet, 157);
 }
