@@ -12,6 +12,7 @@ namespace {
 using namespace ::testing;
 
 constexpr char kPolicies[] = "/usr/vela/share/imagemagick";
+constexpr const char* kConfiguration = vela::kImageMagickConfiguration;
 constexpr char kAllowEverything[] =
     "<policymap>\n<policy domain=\"coder\" rights=\"read|write\" pattern=\"*\"/>\n"
     "<policy domain=\"delegate\" rights=\"read|write|execute\" pattern=\"*\"/>\n"
@@ -57,9 +58,9 @@ TEST_F(ImageMagickPolicy, AllowsOnlyPhotos) {
 }
 
 TEST_F(ImageMagickPolicy, IsNotLoosenedByThatOfTheSystem) {
-  RemoveTree("/etc/ImageMagick-6");
-  MakeDirectories("/etc/ImageMagick-6");
-  WriteFile("/etc/ImageMagick-6/policy.xml", kAllowEverything);
+  RemoveTree(kConfiguration);
+  MakeDirectories(kConfiguration);
+  WriteFile(std::string(kConfiguration) + "/policy.xml", kAllowEverything);
   ExpectOnlyPhotos();
 }
 
@@ -75,9 +76,9 @@ TEST_F(ImageMagickPolicy, IsNotLoosenedByTheEnvironment) {
 
 TEST_F(ImageMagickPolicy, MayBeTightenedByThatOfTheSystem) {
   const std::string photo = MakeImage(directory_ + "/a.bmp", 30, 20);
-  RemoveTree("/etc/ImageMagick-6");
-  MakeDirectories("/etc/ImageMagick-6");
-  WriteFile("/etc/ImageMagick-6/policy.xml",
+  RemoveTree(kConfiguration);
+  MakeDirectories(kConfiguration);
+  WriteFile(std::string(kConfiguration) + "/policy.xml",
             "<policymap>\n<policy domain=\"coder\" rights=\"none\" pattern=\"BMP\"/>\n"
             "</policymap>\n");
   EXPECT_FALSE(IsAllowed({photo}));
