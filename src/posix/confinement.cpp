@@ -71,6 +71,11 @@ void LowerLimits(const ResourceLimits& limits) {
   Lower(RLIMIT_FSIZE, Limit(limits.fileSize), Limit(limits.fileSize));
 }
 
+bool IsMemoryLimitedBelow(uint64_t bytes) {
+  rlimit limit = {};
+  return getrlimit(RLIMIT_DATA, &limit) == 0 && limit.rlim_cur < Limit(bytes);
+}
+
 void DisableCoreDumps() {
   rlimit limit = {};
   getrlimit(RLIMIT_CORE, &limit);

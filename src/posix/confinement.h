@@ -25,6 +25,10 @@ struct ResourceLimits {
 /// Only makes system calls.
 void LowerLimits(const ResourceLimits& limits);
 
+/// Returns true when this process may use less than that many bytes of memory that is not part of a
+/// file.
+bool IsMemoryLimitedBelow(uint64_t bytes);
+
 /// Makes sure that a crash leaves no core dump, neither as a file nor with a crash handler. Only
 /// makes system calls.
 void DisableCoreDumps();

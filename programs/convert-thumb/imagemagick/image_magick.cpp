@@ -11,6 +11,7 @@
 #include "imagemagick/handed_source.h"
 #include "imagemagick/image_magick_limits.h"
 #include "imagemagick/image_magick_policy.h"
+#include "platform/installed_names.h"
 #include "posix/landlock.h"
 #include "process/child_program.h"
 #include "process/failure_report.h"
@@ -23,10 +24,9 @@ namespace vela {
 
 namespace {
 
-/// A link to kProgram. Processes are found by the name of their program, so it must be the
-/// converter's name.
+/// A link to kImageMagickProgram. Processes are found by the name of their program, so it must be
+/// the converter's name.
 constexpr char kLink[] = "/usr/vela/lib/convert-thumb";
-constexpr char kProgram[] = "/usr/bin/convert-im6.q16";
 constexpr char kArgumentZero[] = "convert-thumb";
 
 bool PassDescriptors(const HandedLine& handed) {
@@ -89,10 +89,10 @@ void HandOver(const CommandLine& line, size_t memoryLimit) {
   if (handed.outputs.empty()) {
     ReplaceProcess(kLink, vector.data());
   }
-  RunInChildAndExit({kLink, kProgram}, vector.data(),
+  RunInChildAndExit({kLink, kImageMagickProgram}, vector.data(),
                     [&handed](bool succeeded) { return Finish(handed, succeeded); });
   IgnoreWriteSignals();
-  ReportFailure("%s: %s", kProgram, std::strerror(errno));
+  ReportFailure("%s: %s", kImageMagickProgram, std::strerror(errno));
 }
 
 }  // namespace vela

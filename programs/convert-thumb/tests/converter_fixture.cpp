@@ -5,6 +5,7 @@
 #include <unistd.h>
 
 #include <cerrno>
+#include <cmath>
 #include <csignal>
 #include <cstdio>
 #include <cstdlib>
@@ -15,6 +16,24 @@ namespace vela_test {
 namespace {
 
 constexpr char kHiddenImageMagick[] = "/usr/bin/away";
+
+/// Returns the root mean square error of two pictures of the same size, 1 for black and white. What
+/// the program prints for "PSNR" depends on its version.
+double RelativeError(const std::string& one, const std::string& other) {
+  const ProgramResult result =
+      RunProgram("/usr/bin/compare", {"-metric", "RMSE", one, other, "null:"});
+  const size_t parenthesis = result.err.find('(');
+  if (parenthesis == std::string::npos) {
+    ADD_FAILURE() << result.err;
+    return 1;
+  }
+  return std::strtod(result.err.c_str() + parenthesis + 1, nullptr);
+}
+
+double Decibels(double error) {
+  constexpr double kSame = 1000;
+  return error > 0 ? -20 * std::log10(error) : kSame;
+}
 
 std::string OutputPath(const std::string& prefix, size_t place) {
   return prefix + std::to_string(place) + ".jpg";
@@ -35,13 +54,7 @@ Likeness Compare(const std::string& one, const std::string& other) {
   if (!likeness.sameSize) {
     return likeness;
   }
-  const ProgramResult result =
-      RunProgram("/usr/bin/compare-im6.q16", {"-metric", "PSNR", one, other, "null:"});
-  if (result.err.compare(0, 3, "inf") == 0) {
-    likeness.decibels = 1000;
-  } else {
-    likeness.decibels = std::strtod(result.err.c_str(), nullptr);
-  }
+  likeness.decibels = Decibels(RelativeError(one, other));
   return likeness;
 }
 

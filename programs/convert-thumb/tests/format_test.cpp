@@ -33,9 +33,8 @@ class Formats : public ConverterTest {
   }
 
   std::string DensityOf(const std::string& name) const {
-    return RunProgram(
-               "/usr/bin/identify-im6.q16",
-               {"-format", "%[fx:resolution.x]x%[fx:resolution.y] %U", directory_ + "/" + name})
+    return RunProgram("/usr/bin/identify", {"-format", "%[fx:resolution.x]x%[fx:resolution.y] %U",
+                                            directory_ + "/" + name})
         .out;
   }
 

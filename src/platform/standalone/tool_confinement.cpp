@@ -6,6 +6,7 @@
 #include <thread>
 #include <vector>
 
+#include "platform/installed_names.h"
 #include "platform/system_rules.h"
 #include "posix/file_content.h"
 
@@ -20,7 +21,7 @@ constexpr char kScratchVariable[] = "MAGICK_TEMPORARY_PATH=";
 constexpr char kFirstPage[] = "[0]";
 
 /// The configuration of ImageMagick, with the policy that limits it to photos.
-constexpr const char* kImageMagickData[] = {"/etc/ImageMagick-6", "/usr/share/ImageMagick-6",
+constexpr const char* kImageMagickData[] = {kImageMagickConfiguration, kImageMagickShared,
                                             "/usr/share/color", "/usr/vela/share/imagemagick"};
 
 /// Makes ImageMagick read that policy, before and after the system's.
@@ -29,9 +30,8 @@ constexpr const char* kImageMagickPolicy[] = {"MAGICK_CONFIGURE_PATH=/usr/vela/s
 
 /// ImageMagick, which the converter runs when it does not support a photo, and what a converter
 /// that is a script runs.
-constexpr const char* kConverterPrograms[] = {"/usr/vela/lib/convert-thumb",
-                                              "/usr/bin/convert-im6.q16", "/bin/sh", "/usr/bin/od",
-                                              "/usr/bin/tr"};
+constexpr const char* kConverterPrograms[] = {"/usr/vela/lib/convert-thumb", kImageMagickProgram,
+                                              "/bin/sh", "/usr/bin/od", "/usr/bin/tr"};
 
 constexpr const char* kPerlPrograms[] = {"/usr/bin/perl"};
 constexpr const char* kPerlData[] = {"/usr/share/perl", "/usr/share/perl5", "/etc/perl",
