@@ -3,15 +3,12 @@
 #include <cstdint>
 #include <cstring>
 #include <filesystem>
-#include <functional>
 #include <system_error>
 
 #include "platform/system_rules.h"
 #include "platform/velaindex.h"
 #include "platform/vlibc.h"
 #include "posix/file_lock.h"
-#include "posix/service_log.h"
-#include "profiles/thumbnail_profile.h"
 #include "storage/creation_queue.h"
 #include "storage/directory_tree.h"
 
@@ -31,16 +28,18 @@ bool IsDirectoryLocked(const std::string& directory) {
   return IsLocked(directory + "/" + kMetadataDirName);
 }
 
-void ForEachDirectory(const EntryTarget& target, const std::function<void(const char*)>& visit) {
+void ForEachDirectory(const EntryTarget& target, const std::function<void(const char*)>& visit,
+                      const std::function<bool()>& shouldStop = nullptr) {
   if (!target.isTree) {
     visit(target.directory.c_str());
     return;
   }
-  ForEachIndexedDirectory(target.directory.c_str(), [&](const char* path, bool isReadable) {
+  const auto visitReadable = [&](const char* path, bool isReadable) {
     if (isReadable) {
       visit(path);
     }
-  });
+  };
+  ForEachIndexedDirectory(target.directory.c_str(), visitReadable, shouldStop);
 }
 
 }  // namespace
@@ -81,25 +80,16 @@ std::vector<std::string> ListDirectories(const EntryTarget& target) {
   return directories;
 }
 
-std::vector<std::string> FindLockedDirectories(const EntryTarget& target) {
+std::vector<std::string> FindLockedDirectories(const EntryTarget& target,
+                                               const std::function<bool()>& shouldStop) {
   std::vector<std::string> locked;
-  ForEachDirectory(target, [&](const char* path) {
+  const auto examine = [&](const char* path) {
     if (IsDirectoryLocked(path)) {
       locked.emplace_back(path);
     }
-  });
+  };
+  ForEachDirectory(target, examine, shouldStop);
   return locked;
-}
-
-bool IsProfileUsable(const std::string& profileFile) {
-  ThumbnailProfileList profiles;
-  if (IsFileExist(profileFile.c_str()) != 0 &&
-      ParseThumbnailProfiles(profiles, profileFile, "/") != 0 &&
-      GetProfileCount(profiles, kAllPhases) > 0) {
-    return true;
-  }
-  WriteLog(LogLevel::kError, "no profile file, or no thumbnail in it: " + profileFile);
-  return false;
 }
 
 }  // namespace vela

@@ -2,6 +2,7 @@
 // exit status 0.
 #pragma once
 
+#include <functional>
 #include <string>
 #include <vector>
 
@@ -18,14 +19,11 @@ std::string CheckAddition(std::string& entry);
 std::string FindObstacle(const std::string& entry);
 
 /// Returns the directories of the entry that velathumb would skip, because another process holds a
-/// lock on their metadata directory.
-std::vector<std::string> FindLockedDirectories(const EntryTarget& target);
+/// lock on their metadata directory. Ends early when `shouldStop` returns true.
+std::vector<std::string> FindLockedDirectories(const EntryTarget& target,
+                                               const std::function<bool()>& shouldStop = nullptr);
 
 /// Returns the directories of the entry that velathumb would process.
 std::vector<std::string> ListDirectories(const EntryTarget& target);
-
-/// Returns whether velathumb can read the profile file and it defines a thumbnail; logs when not.
-/// Without a usable profile velathumb skips every directory, and each entry would count as done.
-bool IsProfileUsable(const std::string& profileFile);
 
 }  // namespace vela

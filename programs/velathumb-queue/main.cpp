@@ -2,11 +2,14 @@
 //
 // Processes the photo queue.
 
+#include <sysexits.h>
+
 #include <cerrno>
 #include <string>
 #include <vector>
 
 #include "cli/command_line.h"
+#include "configuration.h"
 #include "entry_check.h"
 #include "options.h"
 #include "platform/velaindex.h"
@@ -25,6 +28,8 @@ namespace {
 constexpr int kEmpty = 0;
 constexpr int kEntriesLeft = 1;
 constexpr int kError = 2;
+/// Nothing but a change of the configuration helps: systemd need not start the program again.
+constexpr int kMisconfigured = EX_CONFIG;
 
 constexpr char kLockFile[] = "/var/run/velathumb-queue.lock";
 
@@ -35,6 +40,8 @@ int ToExitStatus(RunEnd end) {
     case RunEnd::kDeferred:
     case RunEnd::kStopped:
       return kEntriesLeft;
+    case RunEnd::kMisconfigured:
+      return kMisconfigured;
     case RunEnd::kFailed:
     case RunEnd::kNotRecorded:
       break;
@@ -89,6 +96,9 @@ bool AppendEntries(const std::vector<std::string>& entries) {
 int RunAlone(RunSettings& settings) {
   if (!CheckAdditions(settings.additions) || !AppendEntries(settings.additions)) {
     return kError;
+  }
+  if (!IsCommandUsable(settings.velathumb)) {
+    return kMisconfigured;
   }
   const FileDescriptor lock = TakeProcessLock(kLockFile, settings.wait);
   if (lock.IsOpen()) {

@@ -6,8 +6,7 @@
 #include <string>
 #include <system_error>
 
-#include "posix/files.h"
-#include "posix/service_log.h"
+#include "configuration.h"
 
 namespace vela {
 
@@ -17,7 +16,8 @@ constexpr ProgramText kProgramText = {
     "velathumb-queue",
     "Processes the queue of directories that need thumbnails: runs velathumb for each entry.",
     "Exit status: 0 the queue is empty, 1 entries are left for a later run: stopped by a signal,\n"
-    "entries that cannot be processed now, or another velathumb-queue is running; 2 error."};
+    "entries that cannot be processed now, or another velathumb-queue is running; 2 error;\n"
+    "78 velathumb cannot be started, or its profile cannot be used."};
 
 void AddOptions(CLI::App& app, RunSettings& settings) {
   app.add_flag("-f,--follow", settings.follow, "keep running and wait for new entries");
@@ -43,42 +43,27 @@ void AddOptions(CLI::App& app, RunSettings& settings) {
                "thumbnails and converted videos of these videos");
 }
 
-/// Returns whether the file has the access that velathumb needs; otherwise that is logged.
-bool IsUsable(const std::string& file, FileAccess access) {
-  const int error = CheckAccess(file, access);
-  if (error != 0) {
-    WriteLog(LogLevel::kError, file, error);
-  }
-  return error == 0;
-}
-
 /// Returns the directory that this program was installed into.
 std::filesystem::path OwnDirectory() {
   std::error_code error;
   return std::filesystem::read_symlink("/proc/self/exe", error).parent_path();
 }
 
-/// Returns the velathumb and the profile file that were installed together with this program.
+/// Returns the velathumb that was installed together with this program, and the profile file for
+/// it.
 VelathumbCommand InstalledVelathumb() {
   const std::filesystem::path programs = OwnDirectory();
   const auto profiles = programs.parent_path() / "share/velathumb/thumb-profiles.conf";
-  return {(programs / "velathumb").string(), profiles.string()};
+  return {(programs / "velathumb").string(),
+          DefaultProfileFile(kLocalProfileFile, profiles.string())};
 }
 
 }  // namespace
 
 ParseOutcome ParseOptions(int argc, char** argv, RunSettings& settings) {
   settings.velathumb = InstalledVelathumb();
-  const ParseOutcome outcome = ParseCommandLine(kProgramText, ArgumentsOf(argc, argv),
-                                                [&](CLI::App& app) { AddOptions(app, settings); });
-  if (outcome != ParseOutcome::kRun) {
-    return outcome;
-  }
-  // velathumb silently ignores a missing profile, and every entry would count as done.
-  return IsUsable(settings.velathumb.path, FileAccess::kExecute) &&
-                 IsUsable(settings.velathumb.profileFile, FileAccess::kRead)
-             ? ParseOutcome::kRun
-             : ParseOutcome::kUsageError;
+  return ParseCommandLine(kProgramText, ArgumentsOf(argc, argv),
+                          [&](CLI::App& app) { AddOptions(app, settings); });
 }
 
 }  // namespace vela

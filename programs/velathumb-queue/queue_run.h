@@ -24,11 +24,12 @@ struct RunSettings {
 
 /// How a run ended.
 enum class RunEnd {
-  kEmpty,       ///< the queue is empty
-  kDeferred,    ///< only entries that could not be processed are left
-  kStopped,     ///< by a signal; entries may be left for the next run
-  kFailed,      ///< the reason is logged; entries may be left for the next run
-  kNotRecorded  ///< the same, because a file of the queue cannot be read or written
+  kEmpty,         ///< the queue is empty
+  kDeferred,      ///< only entries that could not be processed are left
+  kStopped,       ///< by a signal; entries may be left for the next run
+  kFailed,        ///< the reason is logged; entries may be left for the next run
+  kNotRecorded,   ///< the same, because a file of the queue cannot be read or written
+  kMisconfigured  ///< the same, because velathumb would do nothing with this profile
 };
 
 /// Processes the queue until it is empty, or with `follow` until a signal is received.

@@ -111,7 +111,7 @@ TEST_F(LaterTest, AProfileThatBecomesUnusableEndsAFollowingRunnerBeforeItTakes) 
   EXPECT_FALSE(runner.Wait(milliseconds(200)));
   WriteFile(kProfiles, "[thumb_s\n");
   Enqueue({"/tmp/a"});
-  ExpectEnd(runner, 2);
+  ExpectEnd(runner, 78);
   EXPECT_EQ(ReadFile(kQueueFile), "/tmp/a\n");
   EXPECT_THAT(velathumb_.Entries(), IsEmpty());
 }
