@@ -15,7 +15,8 @@ namespace {
 constexpr ProgramText kProgramText = {
     "velathumb-queue",
     "Processes the queue of directories that need thumbnails: runs velathumb for each entry.",
-    "Exit status: 0 the queue is empty, 1 entries are left for a later run: stopped by a signal,\n"
+    "Exit status: 0 the queue is empty, or the entries were queued for a service, 1 entries are "
+    "left for a later run: stopped by a signal,\n"
     "entries that cannot be processed now, or another velathumb-queue is running; 2 error;\n"
     "78 velathumb cannot be started, or its profile cannot be used."};
 
@@ -26,10 +27,12 @@ void AddOptions(CLI::App& app, RunSettings& settings) {
       ->type_name("N")
       ->check(CLI::Range(1, 256));
   app.add_option("-a,--add", settings.additions,
-                 "append ENTRY to the queue first: a directory, or R: and a directory; may be "
-                 "repeated")
+                 "append ENTRY to the queue: a directory, or R: and a directory; may be repeated; "
+                 "the work is left to the service, if there is one")
       ->type_name("ENTRY")
       ->allow_extra_args(false);
+  app.add_flag("--now", settings.now, "with --add: process the queue here, also with a service");
+  app.add_flag("--queue-only", settings.queueOnly, "with --add: do not process the queue");
   app.add_option("-p,--profile", settings.velathumb.profileFile, "profile file for velathumb")
       ->type_name("FILE")
       ->capture_default_str();
@@ -41,6 +44,17 @@ void AddOptions(CLI::App& app, RunSettings& settings) {
   app.add_flag("--check-videos", settings.checkVideos,
                "count the videos in the video queue for the progress totals; this REMOVES bad "
                "thumbnails and converted videos of these videos");
+}
+
+/// Returns why the options contradict each other, empty when they do not.
+std::string FindConflict(const RunSettings& settings) {
+  if (settings.queueOnly && settings.additions.empty()) {
+    return "--queue-only needs --add";
+  }
+  if (settings.queueOnly && (settings.now || settings.wait || settings.follow)) {
+    return "--queue-only excludes --now, --wait and --follow";
+  }
+  return {};
 }
 
 /// Returns the directory that this program was installed into.
@@ -62,8 +76,10 @@ VelathumbCommand InstalledVelathumb() {
 
 ParseOutcome ParseOptions(int argc, char** argv, RunSettings& settings) {
   settings.velathumb = InstalledVelathumb();
-  return ParseCommandLine(kProgramText, ArgumentsOf(argc, argv),
-                          [&](CLI::App& app) { AddOptions(app, settings); });
+  const auto findConflict = [&](const CLI::App&) { return FindConflict(settings); };
+  return ParseCommandLine(
+      kProgramText, ArgumentsOf(argc, argv), [&](CLI::App& app) { AddOptions(app, settings); },
+      findConflict);
 }
 
 }  // namespace vela

@@ -18,6 +18,8 @@ struct RunSettings {
   int jobs = 1;                        ///< velathumb processes at a time
   bool follow = false;                 ///< keep running and wait for new entries
   bool wait = false;                   ///< wait for the end of another runner
+  bool now = false;                    ///< process the additions here, also with a service
+  bool queueOnly = false;              ///< leave the additions to others
   bool checkVideos = false;            ///< count the queued videos for the totals
   std::vector<std::string> additions;  ///< entries to append to the queue first
 };

@@ -36,7 +36,8 @@ TEST_F(OptionsTest, HelpListsEveryOption) {
     EXPECT_THAT(result.out,
                 AllOf(HasSubstr("--follow"), HasSubstr("--jobs"), HasSubstr("--profile"),
                       HasSubstr("--velathumb"), HasSubstr("--check-videos"), HasSubstr("--add"),
-                      HasSubstr("--version"), HasSubstr("--wait"), HasSubstr("Exit status")));
+                      HasSubstr("--version"), HasSubstr("--wait"), HasSubstr("--now"),
+                      HasSubstr("--queue-only"), HasSubstr("Exit status")));
   }
 }
 
@@ -52,6 +53,8 @@ TEST_F(OptionsTest, InvalidArgumentsAreRefused) {
       {QueueArguments(kProfiles, {"/tmp/a"}), "/tmp/a"},
       {QueueArguments(kProfiles, {"--jobs", "0"}), "--jobs"},
       {QueueArguments(kProfiles, {"--jobs", "many"}), "--jobs"},
+      {QueueArguments(kProfiles, {"--queue-only"}), "--queue-only needs --add"},
+      {QueueArguments(kProfiles, {"--add", "/tmp/a", "--queue-only", "--now"}), "excludes --now"},
       {QueueArguments(kProfiles, {"--add", "/tmp/a\n/tmp/b"}),
        "cannot add /tmp/a\\n/tmp/b: an entry cannot contain a newline\n"},
   };
@@ -69,15 +72,6 @@ TEST_F(OptionsTest, EntriesCanBeAddedToTheQueue) {
             0);
   EXPECT_THAT(velathumb_.Entries(), ElementsAre("/tmp/a", "R:/tmp/b", "/tmp/-c d"));
   ExpectQueueDone();
-}
-
-TEST_F(OptionsTest, EntriesAreAddedForARunningRunner) {
-  Program runner = StartAndHold({"/tmp/a"});
-  MakeEntryDirectories({"/tmp/b"});
-  EXPECT_EQ(velathumb_.Run({"--add", "/tmp/b"}).exitCode, 1);
-  Release();
-  EXPECT_TRUE(runner.Wait());
-  EXPECT_THAT(velathumb_.Entries(), ElementsAre("/tmp/a", "/tmp/b"));
 }
 
 TEST_F(OptionsTest, AnEntryIsAddedWithItsWholePath) {
