@@ -111,7 +111,7 @@ bool Batch::StartEntry(size_t number) {
   }
   const EntryTarget target = TargetOf(entry);
   std::vector<std::string> locked =
-      FindLockedDirectories(target, [this] { return events_.MustStop(); });
+      FindSkippedDirectories(target, [this] { return events_.MustStop(); }).locked;
   if (events_.MustStop()) {
     plan_.Postpone(number, Clock::now());
     return false;
@@ -156,6 +156,30 @@ void Batch::Defer(size_t number, const std::string& reason) {
   WriteLog(LogLevel::kWarning, "deferred to a later run, " + reason + ": " + entry);
   ++deferred_;
   End(number);
+}
+
+/// Saves parts of a tree for a later run, which need not repeat the rest. Returns false when the
+/// entry itself was deferred or must stay.
+bool Batch::DeferReadOnlyParts(size_t number, const std::vector<std::string>& entries) {
+  if (entries.empty()) {
+    return true;
+  }
+  if (!AreEntries(entries)) {
+    Defer(number, "a part of it is mounted read-only");
+    return false;
+  }
+  const int error = taken_.Defer(entries);
+  if (error != 0) {
+    WriteLog(LogLevel::kError, "cannot defer a part of a tree", error);
+    FailToRecord(number);
+    return false;
+  }
+  for (const std::string& entry : entries) {
+    WriteLog(LogLevel::kWarning,
+             "deferred to a later run, its volume is mounted read-only: " + entry);
+    ++deferred_;
+  }
+  return true;
 }
 
 void Batch::Finish(size_t number) {
@@ -264,12 +288,16 @@ void Batch::HandleSuccess(const Child& child) {
     return;
   }
   const EntryTarget target = TargetOf(entry);
-  std::vector<std::string> unfinished =
-      FindLockedDirectories(target, [this] { return events_.MustStop(); });
+  SkippedDirectories skipped =
+      FindSkippedDirectories(target, [this] { return events_.MustStop(); });
   if (target.isTree && events_.MustStop()) {
     plan_.Postpone(child.number, Clock::now());
     return;
   }
+  if (!DeferReadOnlyParts(child.number, skipped.readOnly)) {
+    return;
+  }
+  std::vector<std::string>& unfinished = skipped.locked;
   Merge(unfinished, child.locked);
   Merge(unfinished, TakeNotesAbout(target));
   if (unfinished.empty()) {

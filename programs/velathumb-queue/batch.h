@@ -75,6 +75,7 @@ class Batch {
   void GiveUp(size_t number, const std::string& reason);
   bool Split(size_t number, const std::string& reason);
   void Defer(size_t number, const std::string& reason);
+  bool DeferReadOnlyParts(size_t number, const std::vector<std::string>& entries);
   void Finish(size_t number);
   void End(size_t number);
   void FailToRecord(size_t number);

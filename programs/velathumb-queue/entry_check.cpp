@@ -1,5 +1,6 @@
 #include "entry_check.h"
 
+#include <cerrno>
 #include <cstdint>
 #include <cstring>
 #include <filesystem>
@@ -9,6 +10,7 @@
 #include "platform/velaindex.h"
 #include "platform/vlibc.h"
 #include "posix/file_lock.h"
+#include "posix/files.h"
 #include "storage/creation_queue.h"
 #include "storage/directory_tree.h"
 
@@ -22,6 +24,21 @@ std::string FindTreeFault(const std::string& path) {
   }
   const std::string name = path.substr(path.rfind('/') + 1);
   return EntryNameShouldIndex(name.c_str()) == 1 ? "" : "velathumb skips a tree of this name";
+}
+
+bool IsReadOnly(const std::string& directory) {
+  return CheckAccess(directory, FileAccess::kWrite) == EROFS;
+}
+
+/// Adds the entry for a directory that is mounted read-only, and for what is below it. Directories
+/// come before those below them; the path of a tree cannot contain a colon.
+void AddReadOnly(const std::string& directory, std::vector<std::string>& entries) {
+  const EntryTarget target{directory, false};
+  if (!entries.empty() && DoOverlap(TargetOf(entries.back()), target)) {
+    return;
+  }
+  const bool canBeTree = directory.find(':') == std::string::npos;
+  entries.push_back(canBeTree ? kTreePrefix + directory : directory);
 }
 
 bool IsDirectoryLocked(const std::string& directory) {
@@ -71,6 +88,9 @@ std::string FindObstacle(const std::string& entry) {
   if (IsDirExist(directory.c_str()) == 0) {
     return "there is no such directory";
   }
+  if (IsReadOnly(directory)) {
+    return "its volume is mounted read-only";
+  }
   return VLIBGetFsAvailSize(directory.c_str()) < kLeastFreeSpace ? "its volume is nearly full" : "";
 }
 
@@ -80,16 +100,18 @@ std::vector<std::string> ListDirectories(const EntryTarget& target) {
   return directories;
 }
 
-std::vector<std::string> FindLockedDirectories(const EntryTarget& target,
-                                               const std::function<bool()>& shouldStop) {
-  std::vector<std::string> locked;
+SkippedDirectories FindSkippedDirectories(const EntryTarget& target,
+                                          const std::function<bool()>& shouldStop) {
+  SkippedDirectories skipped;
   const auto examine = [&](const char* path) {
-    if (IsDirectoryLocked(path)) {
-      locked.emplace_back(path);
+    if (IsReadOnly(path)) {
+      AddReadOnly(path, skipped.readOnly);
+    } else if (IsDirectoryLocked(path)) {
+      skipped.locked.emplace_back(path);
     }
   };
   ForEachDirectory(target, examine, shouldStop);
-  return locked;
+  return skipped;
 }
 
 }  // namespace vela
