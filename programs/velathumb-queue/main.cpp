@@ -6,6 +6,7 @@
 #include <string>
 #include <vector>
 
+#include "checks/configuration_check.h"
 #include "cli/command_line.h"
 #include "entry_check.h"
 #include "options.h"
@@ -92,6 +93,7 @@ int RunAlone(RunSettings& settings) {
   }
   const FileDescriptor lock = TakeProcessLock(kLockFile, settings.wait);
   if (lock.IsOpen()) {
+    LogFindings(settings.velathumb.profileFile);
     return ToExitStatus(RunQueue(settings));
   }
   if (errno == EAGAIN || errno == EACCES) {

@@ -131,8 +131,10 @@ TEST_F(OptionsTest, AProfileWithoutAThumbnailKeepsTheQueue) {
   WriteFile("/tmp/empty.conf", "; nothing\n");
   MakeDirectories("/tmp/directory");
   for (const std::string profile : {"/tmp/invalid.conf", "/tmp/empty.conf", "/tmp/directory"}) {
-    EXPECT_EQ(Refusal(QueueArguments(profile)),
-              "velathumb-queue: no profile file, or no thumbnail in it: " + profile + "\n");
+    EXPECT_THAT(Refusal(QueueArguments(profile)),
+                AllOf(StartsWith("velathumb-queue: " + profile), HasSubstr(": error: "),
+                      EndsWith("\nvelathumb-queue: no profile file, or no thumbnail in it: " +
+                               profile + "\n")));
     RemoveTree(kQueueFile);
   }
 }
