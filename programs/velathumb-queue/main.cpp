@@ -9,6 +9,7 @@
 #include <utility>
 
 #include "additions.h"
+#include "checks/configuration_check.h"
 #include "cli/command_line.h"
 #include "configuration.h"
 #include "options.h"
@@ -100,7 +101,11 @@ int ProcessQueue(const RunSettings& settings, FileDescriptor lock) {
   if (!lock.IsOpen()) {
     lock = TakeProcessLock(kLockFile, settings.wait);
   }
-  return lock.IsOpen() ? ToExitStatus(RunQueue(settings)) : EndWithoutLock(settings, errno);
+  if (!lock.IsOpen()) {
+    return EndWithoutLock(settings, errno);
+  }
+  LogFindings(settings.velathumb.profileFile);
+  return ToExitStatus(RunQueue(settings));
 }
 
 int AddAndProcess(const RunSettings& settings) {

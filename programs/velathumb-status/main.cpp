@@ -12,6 +12,7 @@
 #include <vector>
 
 #include "cli/command_line.h"
+#include "configuration_report.h"
 #include "html_page.h"
 #include "json_report.h"
 #include "options.h"
@@ -83,6 +84,7 @@ class StatusRun {
   void ReportProgress();
   void ReportResumeTime();
   void ReportSecurity();
+  void ReportConfiguration();
   void AddPageError(int error);
   void AddError(const std::string& path, const std::string& message);
   void AddWork(bool hasWork) { hasWork_ = hasWork_ || hasWork; }
@@ -178,6 +180,19 @@ void StatusRun::ReportSecurity() {
   }
 }
 
+void StatusRun::ReportConfiguration() {
+  const ConfigurationState state = CheckConfiguration(options_.profileFile);
+  for (const UncheckedFile& unchecked : state.result.unchecked) {
+    AddError(unchecked.file, std::strerror(unchecked.error));
+  }
+  AddWork(!state.result.findings.empty());
+  if (options_.json) {
+    json_.Member("configuration", DescribeConfiguration(state));
+  } else {
+    WriteConfigurationText(std::cout, state);
+  }
+}
+
 void StatusRun::Watch() {
   AddWork(WatchProgress(std::cout, IsOutputTerminal(), options_.json));
 }
@@ -198,6 +213,9 @@ void StatusRun::Report() {
   }
   if (options_.security) {
     ReportSecurity();
+  }
+  if (options_.checkConfig) {
+    ReportConfiguration();
   }
   if (options_.json) {
     json_.Member("errors", errors_);

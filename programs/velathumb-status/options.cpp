@@ -41,11 +41,18 @@ void AddOptions(CLI::App& app, Options& options) {
   auto* resumeTime =
       app.add_flag("--resume-time", options.resumeTime, "show until when conversion is paused");
   auto* security = app.add_flag("--security", options.security, "show how the tools are confined");
+  auto* checkConfig = app.add_option("--check-config", options.profileFile,
+                                     "check the settings and the profile file, by default that of "
+                                     "the services")
+                          ->type_name("PROFILE")
+                          ->expected(0, 1)
+                          ->excludes(directories);
   app.add_flag("-w,--watch", options.watch, "follow the progress until no velathumb is running")
       ->excludes(directories)
       ->excludes(queue)
       ->excludes(resumeTime)
-      ->excludes(security);
+      ->excludes(security)
+      ->excludes(checkConfig);
   app.add_flag("-j,--json", options.json, "write JSON");
 }
 
@@ -53,9 +60,11 @@ void AddOptions(CLI::App& app, Options& options) {
 /// an empty text.
 std::string FindContradiction(const Options& options) {
   const bool hasQuery = !options.directories.empty() || options.queue || options.progress ||
-                        options.watch || options.resumeTime || options.security;
+                        options.watch || options.resumeTime || options.security ||
+                        options.checkConfig;
   if (!hasQuery) {
-    return "give a directory, --queue, --progress, --watch, --resume-time or --security";
+    return "give a directory, --queue, --progress, --watch, --resume-time, --security or "
+           "--check-config";
   }
   if (options.checkVideos && options.directories.empty() && !options.queue) {
     return "--check-videos needs a directory or --queue";
@@ -81,7 +90,10 @@ ParseOutcome ParseOptions(int argc, char** argv, Options& options) {
   return ParseCommandLine(
       kProgramText, LiteralArguments(ArgumentsOf(argc, argv)),
       [&](CLI::App& app) { AddOptions(app, options); },
-      [&](const CLI::App&) { return FindContradiction(options); });
+      [&](const CLI::App& app) {
+        options.checkConfig = app.count("--check-config") > 0;
+        return FindContradiction(options);
+      });
 }
 
 }  // namespace vela

@@ -19,6 +19,8 @@ struct Options {
   bool watch = false;
   bool resumeTime = false;
   bool security = false;  ///< show how the tools are confined
+  bool checkConfig = false;
+  std::string profileFile;  ///< for checkConfig; empty: the one that the services use
   bool json = false;
   std::string htmlFile;  ///< empty: no page
 };

@@ -7,6 +7,7 @@
 
 #include "command_line/file_name.h"
 #include "command_line/option_values.h"
+#include "configuration/profile_values.h"
 
 namespace vela {
 
@@ -82,7 +83,7 @@ class OutputOptions {
       return TakeBox(value);
     }
     if (option == "-quality") {
-      plan_.quality = ParseWholeNumber(value, 1, 100).value_or(0);
+      plan_.quality = ParseWholeNumber(value, kMinQuality, kMaxQuality).value_or(0);
       return plan_.quality != 0;
     }
     if (option == "+profile") {

@@ -3,6 +3,7 @@
 
 #include <sys/stat.h>
 
+#include "checks/configuration_check.h"
 #include "queue_fixture.h"
 #include "support/profile_file.h"
 
@@ -117,12 +118,28 @@ TEST_F(ConfigurationTest, AnEntryIsRepeatedOnceWhenTheProfileHasChangedMeanwhile
 }
 
 TEST_F(ConfigurationTest, TheProfileOfTheAdministratorGoesFirst) {
-  const auto choose = [] { return vela::DefaultProfileFile("/tmp/etc.conf", "/tmp/share.conf"); };
+  const auto choose = [] { return vela::ChooseProfileFile("/tmp/etc.conf", "/tmp/share.conf"); };
   EXPECT_EQ(choose(), "/tmp/share.conf");
   WriteFile("/tmp/etc.conf", "");
   EXPECT_EQ(choose(), "/tmp/etc.conf");
   ASSERT_EQ(chmod("/tmp/etc.conf", 0), 0);
   EXPECT_EQ(choose(), "/tmp/etc.conf");
+}
+
+TEST_F(ConfigurationTest, MistakesAreLoggedAtTheStart) {
+  WriteFile("/etc/velainfo.conf", "photo_thumb_size_map=\"1\"\nstall_timeout=soon\n");
+  WriteFile(kProfiles, ReadFile(kProfiles) + "qualty=90\nunsharp=foo\n");
+  EXPECT_THAT(RunRunner().err,
+              StartsWith("velathumb-queue: /etc/velainfo.conf:2: warning: stall_timeout is not a "
+                         "number of seconds, or 0 for no limit: \"soon\"; 900 is used\n"
+                         "velathumb-queue: /tmp/profiles.conf:6: warning: there is no key "
+                         "\"qualty\"; did you mean quality?\n"
+                         "velathumb-queue: /tmp/profiles.conf:7: error: unsharp is not "));
+}
+
+TEST_F(ConfigurationTest, IsNotMentionedWithoutAMistake) {
+  WriteFile("/etc/velainfo.conf", "photo_thumb_size_map=\"1\"\n");
+  EXPECT_THAT(RunRunner().err, Not(HasSubstr(".conf")));
 }
 
 }  // namespace
