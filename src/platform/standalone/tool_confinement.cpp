@@ -8,6 +8,8 @@
 
 #include "platform/system_rules.h"
 #include "posix/file_content.h"
+#include "posix/file_descriptor.h"
+#include "posix/files.h"
 
 namespace vela {
 
@@ -139,12 +141,14 @@ struct Tool {
   void (*allow)(const Arguments& arguments, Confinement& confinement);
   uint64_t memory;  ///< bytes; none for one that sets a limit of its own before it reads its input
   bool hasThreads;
+  /// Connects to the system log, and gives up making sockets itself before it reads its input.
+  bool logsFailures;
 };
 
-constexpr Tool kTools[] = {{"convert-thumb", AllowConverter, ResourceLimits::kNone, true},
-                           {"dcraw", AllowDcraw, kRawDecoderMemory, false},
-                           {"exiftool", AllowExiftool, kToolMemory, false},
-                           {"compare", AllowCompare, kToolMemory, true}};
+constexpr Tool kTools[] = {{"convert-thumb", AllowConverter, ResourceLimits::kNone, true, true},
+                           {"dcraw", AllowDcraw, kRawDecoderMemory, false, false},
+                           {"exiftool", AllowExiftool, kToolMemory, false, false},
+                           {"compare", AllowCompare, kToolMemory, true, false}};
 
 const Tool* FindTool(std::string_view program) {
   const std::string_view name = program.substr(program.rfind('/') + 1);
@@ -162,6 +166,15 @@ uint64_t ProcessorSeconds(const Tool* tool, std::chrono::seconds timeLimit) {
   const bool hasThreads = tool == nullptr || tool->hasThreads;
   const uint64_t processors = hasThreads ? std::max(1U, std::thread::hardware_concurrency()) : 1U;
   return (static_cast<uint64_t>(timeLimit.count()) + 1) * processors;
+}
+
+/// A script in place of a program does not confine what it runs.
+bool IsScript(const char* program) {
+  char beginning[2] = "";
+  size_t got = 0;
+  const FileDescriptor file = OpenForReading(program);
+  return file.IsOpen() && ReadChunk(file.Get(), beginning, sizeof beginning, got) == 0 &&
+         std::string_view(beginning, got) == "#!";
 }
 
 bool IsUnconfined(std::string_view program) {
@@ -196,6 +209,9 @@ Confinement ConfinementOfTool(const char* program, char* const arguments[],
   Arguments list;
   for (char* const* argument = arguments; *argument != nullptr; ++argument) {
     list.emplace_back(*argument);
+  }
+  if (tool->logsFailures && !IsScript(program)) {
+    confinement.sockets = SocketUse::kLocalDatagrams;
   }
   confinement.files = FilesOfEveryProgram();
   confinement.files->programs.emplace_back(program);
