@@ -125,7 +125,7 @@ bool AreOutputsWritten(const HandedLine& handed) {
 void RemoveHandedOutputs(const HandedLine& handed) {
   RemoveOutputs();
   for (const Place& output : handed.namedOutputs) {
-    RemoveFile(output);
+    RemoveRegular(output);
   }
 }
 

@@ -99,7 +99,7 @@ bool IsAbsent(const Place& place) {
          errno == ENOENT;
 }
 
-void RemoveFile(const Place& place) {
+void RemoveRegular(const Place& place) {
   struct stat status;
   if (fstatat(place.directory.Get(), place.name.c_str(), &status, AT_SYMLINK_NOFOLLOW) == 0 &&
       S_ISREG(status.st_mode)) {

@@ -35,6 +35,6 @@ bool ProtectsOwnFiles(const std::string& path);
 bool IsAbsent(const Place& place);
 
 /// Removes a regular file at the place.
-void RemoveFile(const Place& place);
+void RemoveRegular(const Place& place);
 
 }  // namespace vela

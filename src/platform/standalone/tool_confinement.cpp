@@ -8,8 +8,6 @@
 
 #include "platform/system_rules.h"
 #include "posix/file_content.h"
-#include "posix/file_descriptor.h"
-#include "posix/files.h"
 
 namespace vela {
 
@@ -168,15 +166,6 @@ uint64_t ProcessorSeconds(const Tool* tool, std::chrono::seconds timeLimit) {
   return (static_cast<uint64_t>(timeLimit.count()) + 1) * processors;
 }
 
-/// A script in place of a program does not confine what it runs.
-bool IsScript(const char* program) {
-  char beginning[2] = "";
-  size_t got = 0;
-  const FileDescriptor file = OpenForReading(program);
-  return file.IsOpen() && ReadChunk(file.Get(), beginning, sizeof beginning, got) == 0 &&
-         std::string_view(beginning, got) == "#!";
-}
-
 bool IsUnconfined(std::string_view program) {
   const std::string list = ReadSystemFile(kUnconfinedToolsFile, kUnconfinedToolsSize);
   std::string_view rest = list;
@@ -210,7 +199,8 @@ Confinement ConfinementOfTool(const char* program, char* const arguments[],
   for (char* const* argument = arguments; *argument != nullptr; ++argument) {
     list.emplace_back(*argument);
   }
-  if (tool->logsFailures && !IsScript(program)) {
+  // A script in place of the program does not confine what it runs.
+  if (tool->logsFailures && !BeginsWith(program, "#!")) {
     confinement.sockets = SocketUse::kLocalDatagrams;
   }
   confinement.files = FilesOfEveryProgram();
