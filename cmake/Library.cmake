@@ -6,7 +6,7 @@ if(VELA_SANITIZE)
   return()
 endif()
 
-set(parts velathumb_library velaplatform velaheader velaposix)
+set(parts velathumb_library velaplatform velaconfiguration velaheader velaposix)
 if(VELA_PLATFORM STREQUAL "standalone")
   list(APPEND parts velaindex)
   set(VELA_LIBRARY_NEEDS jsoncpp inih sqlite3 pthread ${CMAKE_DL_LIBS})

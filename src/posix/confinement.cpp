@@ -8,7 +8,6 @@
 #include <cerrno>
 
 #include "posix/folder.h"
-#include "posix/system_call_filter.h"
 
 namespace vela {
 
@@ -88,8 +87,9 @@ void DisableCoreDumps() {
 int PreparedConfinement::Prepare(const Confinement& confinement) {
   limits_ = confinement.limits;
   blocksSystemCalls_ = confinement.blocksSystemCalls;
+  sockets_ = confinement.sockets;
   if (blocksSystemCalls_) {
-    PrepareSystemCallFilter();
+    PrepareSystemCallFilter(sockets_);
   }
   ruleset_.Reset();
   return confinement.files ? UnlessUnsupported(MakeLandlockRuleset(*confinement.files, ruleset_))
@@ -107,7 +107,7 @@ int PreparedConfinement::Enter() const {
     error = UnlessUnsupported(EnterLandlockRuleset(ruleset_.Get()));
   }
   if (error == 0 && blocksSystemCalls_) {
-    error = UnlessUnsupported(BlockUnneededSystemCalls());
+    error = UnlessUnsupported(BlockUnneededSystemCalls(sockets_));
   }
   return error;
 }

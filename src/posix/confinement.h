@@ -9,6 +9,7 @@
 
 #include "posix/file_descriptor.h"
 #include "posix/landlock.h"
+#include "posix/system_call_filter.h"
 
 namespace vela {
 
@@ -47,7 +48,8 @@ ConfinementSupport FindConfinementSupport();
 /// The restrictions of a process.
 struct Confinement {
   ResourceLimits limits;
-  bool blocksSystemCalls = true;      ///< those of BlockUnneededSystemCalls
+  bool blocksSystemCalls = true;  ///< those of BlockUnneededSystemCalls
+  SocketUse sockets = SocketUse::kNone;
   std::optional<AllowedFiles> files;  ///< nothing: all files
   /// Variables of a program that is started, as "NAME=value", besides those that every program has.
   std::vector<std::string> environment;
@@ -70,6 +72,7 @@ class PreparedConfinement {
  private:
   ResourceLimits limits_;
   bool blocksSystemCalls_ = false;
+  SocketUse sockets_ = SocketUse::kNone;
   FileDescriptor ruleset_;
 };
 

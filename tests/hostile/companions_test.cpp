@@ -25,7 +25,7 @@ class Companions : public HostileTest {
   }
 
   static Program StartRunner() {
-    return StartProgram(HostPath(VELATHUMB_QUEUE_FILE),
+    return StartProgram(BuiltPath(VELATHUMB_QUEUE_FILE),
                         {"--velathumb", VelathumbPath(), "--profile", kProfiles, "--follow"});
   }
 
@@ -89,17 +89,17 @@ TEST_F(Companions, StatusPageIsNotWrittenThroughALink) {
   if (CanDistinguishOwners()) {
     ActAs(kAttacker, [&] { return Link(kPrivateText, page); });
     const ProgramResult linked =
-        RunProgram(HostPath(VELATHUMB_STATUS_FILE), {"--html", page, InPhotos("d")}, options);
+        RunProgram(BuiltPath(VELATHUMB_STATUS_FILE), {"--html", page, InPhotos("d")}, options);
     EXPECT_FALSE(linked.timedOut);
     ExpectVictimUnchanged();
     RemoveTree(page);
   }
   ActAs(kAttacker, [&] { return Fifo(page); });
   const ProgramResult piped =
-      RunProgram(HostPath(VELATHUMB_STATUS_FILE), {"--html", page, InPhotos("d")}, options);
+      RunProgram(BuiltPath(VELATHUMB_STATUS_FILE), {"--html", page, InPhotos("d")}, options);
   EXPECT_FALSE(piped.timedOut);
   // An ordinary page is written as always.
-  RunProgram(HostPath(VELATHUMB_STATUS_FILE), {"--html", "/tmp/page.html", InPhotos("d")}, options);
+  RunProgram(BuiltPath(VELATHUMB_STATUS_FILE), {"--html", "/tmp/page.html", InPhotos("d")}, options);
   EXPECT_GT(FileSize("/tmp/page.html"), 0);
 }
 

@@ -42,7 +42,7 @@ std::string OutputPath(const std::string& prefix, size_t place) {
 }  // namespace
 
 std::string ConvertThumbPath() {
-  return HostPath(CONVERT_THUMB_FILE);
+  return BuiltPath(CONVERT_THUMB_FILE);
 }
 
 Likeness Compare(const std::string& one, const std::string& other) {

@@ -104,7 +104,7 @@ class HostileReader : public SandboxTest {
   }
 
   std::optional<HeaderAnswer> answer_;
-  ReaderProcess process_{HostPath(HOSTILE_READER_FILE), seconds(1)};
+  ReaderProcess process_{BuiltPath(HOSTILE_READER_FILE), seconds(1)};
 };
 
 TEST_F(HostileReader, AnswersManyQuestions) {

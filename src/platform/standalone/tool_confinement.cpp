@@ -139,12 +139,14 @@ struct Tool {
   void (*allow)(const Arguments& arguments, Confinement& confinement);
   uint64_t memory;  ///< bytes; none for one that sets a limit of its own before it reads its input
   bool hasThreads;
+  /// Connects to the system log, and gives up making sockets itself before it reads its input.
+  bool logsFailures;
 };
 
-constexpr Tool kTools[] = {{"convert-thumb", AllowConverter, ResourceLimits::kNone, true},
-                           {"dcraw", AllowDcraw, kRawDecoderMemory, false},
-                           {"exiftool", AllowExiftool, kToolMemory, false},
-                           {"compare", AllowCompare, kToolMemory, true}};
+constexpr Tool kTools[] = {{"convert-thumb", AllowConverter, ResourceLimits::kNone, true, true},
+                           {"dcraw", AllowDcraw, kRawDecoderMemory, false, false},
+                           {"exiftool", AllowExiftool, kToolMemory, false, false},
+                           {"compare", AllowCompare, kToolMemory, true, false}};
 
 const Tool* FindTool(std::string_view program) {
   const std::string_view name = program.substr(program.rfind('/') + 1);
@@ -196,6 +198,10 @@ Confinement ConfinementOfTool(const char* program, char* const arguments[],
   Arguments list;
   for (char* const* argument = arguments; *argument != nullptr; ++argument) {
     list.emplace_back(*argument);
+  }
+  // A script in place of the program does not confine what it runs.
+  if (tool->logsFailures && !BeginsWith(program, "#!")) {
+    confinement.sockets = SocketUse::kLocalDatagrams;
   }
   confinement.files = FilesOfEveryProgram();
   confinement.files->programs.emplace_back(program);
