@@ -2,10 +2,12 @@
 
 #include <algorithm>
 #include <cerrno>
+#include <cstdlib>
 #include <utility>
 
 #include "configuration.h"
 #include "entry_check.h"
+#include "ipc/absent_daemon.h"
 #include "posix/service_log.h"
 #include "storage/unfinished_directories.h"
 
@@ -29,6 +31,16 @@ int StartProcess(const VelathumbCommand& command, std::string entry, pid_t& pid)
   std::string profileFile = command.profileFile;
   char* const arguments[] = {path.data(), profileFile.data(), entry.data(), nullptr};
   return StartAttachedChild(path.c_str(), arguments, pid);
+}
+
+/// Tells the velathumb that is started next whether the index daemon is known to be absent: it then
+/// need not log that for each photo.
+void TellAboutDaemon(bool isAbsent) {
+  if (isAbsent) {
+    setenv(kAbsentDaemonVariable, "1", 1);
+  } else {
+    unsetenv(kAbsentDaemonVariable);
+  }
 }
 
 /// Removes and returns what velathumb has noted about the directories of the entry.
@@ -89,6 +101,7 @@ Batch::Batch(const RunSettings& settings, TakenQueue& taken, EventWait& events, 
 bool Batch::StartVelathumb(size_t number, std::vector<std::string> locked) {
   FileVersion profile;
   profile.Read(settings_.velathumb.profileFile.c_str());
+  TellAboutDaemon(gate_.IsDaemonAbsent());
   pid_t pid = 0;
   const int error = StartProcess(settings_.velathumb, plan_.Entry(number), pid);
   if (error != 0) {

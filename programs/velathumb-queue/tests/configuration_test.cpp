@@ -4,7 +4,7 @@
 #include <sys/stat.h>
 
 #include "queue_fixture.h"
-#include "support/profile_file.h"
+#include "support/daemon_peer.h"
 
 namespace vela_test {
 namespace {
@@ -91,6 +91,7 @@ TEST_F(ConfigurationTest, AVelathumbThatCannotBeStartedKeepsTheQueue) {
 }
 
 TEST_F(ConfigurationTest, AnEntryWhoseProfileHasBecomeUnusableIsNotDone) {
+  const DaemonPeer daemon;
   EXPECT_EQ(EndOfRun(StubPlan().WriteFile(kProfiles, "[thumb_s\n")),
             "velathumb-queue: took 2 entries\n"
             "velathumb-queue: cannot parse the profile /tmp/profiles.conf\n");
