@@ -5,7 +5,7 @@
 #include <cstdlib>
 #include <utility>
 
-#include "configuration.h"
+#include "command_check.h"
 #include "entry_check.h"
 #include "ipc/absent_daemon.h"
 #include "posix/service_log.h"
@@ -83,12 +83,13 @@ std::optional<std::chrono::seconds> PostponementFor(int count) {
 }
 
 Batch::Batch(const RunSettings& settings, TakenQueue& taken, EventWait& events, PauseGate& gate,
-             EntryHistories& histories)
+             EntryHistories& histories, const ProgressLine& progress)
     : settings_(settings),
       taken_(taken),
       events_(events),
       gate_(gate),
       histories_(histories),
+      progress_(progress),
       plan_(taken.Entries()) {
   for (size_t number = 0; number < taken.Entries().size(); ++number) {
     const auto history = histories_.find(plan_.Entry(number));
@@ -441,13 +442,25 @@ std::optional<Batch::Clock::time_point> Batch::NextWake() const {
 
 std::optional<milliseconds> Batch::WaitTime() const {
   // New entries are not reported by every file system.
-  constexpr milliseconds kLongestWait = std::chrono::minutes(1);
+  constexpr milliseconds kUsualLimit = std::chrono::minutes(1);
+  const bool isShown = progress_.IsShown() && !children_.empty();
+  const milliseconds limit = isShown ? ProgressLine::kInterval : kUsualLimit;
   const auto wake = NextWake();
   if (!wake) {
-    return std::nullopt;
+    return isShown ? std::make_optional(limit) : std::nullopt;
   }
   const auto left = std::chrono::ceil<milliseconds>(*wake - Clock::now());
-  return std::clamp(left, milliseconds(0), kLongestWait);
+  return std::clamp(left, milliseconds(0), limit);
+}
+
+/// Of several velathumbs, shows the directory of the one with the lowest number.
+void Batch::ShowProgress() const {
+  if (children_.empty()) {
+    progress_.Hide();
+    return;
+  }
+  const auto& first = *children_.begin();
+  progress_.Update(first.first, plan_.Entry(first.second.number));
 }
 
 RunEnd Batch::Run() {
@@ -459,6 +472,7 @@ RunEnd Batch::Run() {
     if (plan_.IsFinished() || failure_) {
       break;
     }
+    ShowProgress();
     events_.Wait(WaitTime());
     ReapChildren();
     CheckProgress();

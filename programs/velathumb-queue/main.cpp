@@ -10,7 +10,7 @@
 
 #include "additions.h"
 #include "cli/command_line.h"
-#include "configuration.h"
+#include "command_check.h"
 #include "options.h"
 #include "posix/file_descriptor.h"
 #include "posix/file_lock.h"

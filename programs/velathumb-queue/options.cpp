@@ -6,7 +6,7 @@
 #include <string>
 #include <system_error>
 
-#include "configuration.h"
+#include "command_check.h"
 
 namespace vela {
 
