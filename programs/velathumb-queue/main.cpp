@@ -11,7 +11,7 @@
 #include "additions.h"
 #include "checks/configuration_check.h"
 #include "cli/command_line.h"
-#include "configuration.h"
+#include "command_check.h"
 #include "options.h"
 #include "posix/file_descriptor.h"
 #include "posix/file_lock.h"

@@ -2,7 +2,12 @@
 
 #include <json/value.h>
 
+#include <cerrno>
+#include <cstdlib>
+
+#include "ipc/absent_daemon.h"
 #include "platform/velaindex.h"
+#include "platform/vlibc.h"
 #include "posix/identity.h"
 #include "posix/log.h"
 
@@ -34,15 +39,24 @@ int ToInt(const Json::Value& value) {
   return value.isConvertibleTo(Json::intValue) ? value.asInt() : 0;
 }
 
+/// Returns whether a request has failed, with this platform error, only because nobody listens, and
+/// that has been logged before.
+bool IsAbsenceKnown(int error) {
+  const bool isAbsent = error == ENOENT || error == ECONNREFUSED;
+  return isAbsent && std::getenv(kAbsentDaemonVariable) != nullptr;
+}
+
 /// Replaces the request by the daemon's reply. Returns true when the daemon succeeded; a failure is
-/// logged with the operation's `line`.
+/// logged with the operation's `line`, unless it is known that there is no daemon.
 bool Exchange(Json::Value& packet, int line) {
   const OwnIdentity own;
-  AutoSendRecvPacket(PluginDaemonSocketPath, -1, packet, kExchangeSeconds);
+  const int result = AutoSendRecvPacket(PluginDaemonSocketPath, -1, packet, kExchangeSeconds);
   if (ToBool(Member(packet, "success"))) {
     return true;
   }
-  LogError(kLogSource, line, "fail");
+  if (result == 0 || !IsAbsenceKnown(VLIBCErrGet())) {
+    LogError(kLogSource, line, "fail");
+  }
   return false;
 }
 

@@ -1,4 +1,4 @@
-#include "configuration.h"
+#include "command_check.h"
 
 #include <cstring>
 
