@@ -7,12 +7,12 @@ namespace {
 
 using namespace ::testing;
 
-using Configuration = QueueTest;
+using Findings = QueueTest;
 
 constexpr const char* kSettings = "/etc/velainfo.conf";
 constexpr const char* kRightSettings = "photo_thumb_size_map=\"1\"\n";
 
-TEST_F(Configuration, MistakesAreLoggedAtTheStart) {
+TEST_F(Findings, AreLoggedAtTheStart) {
   WriteFile(kSettings, std::string(kRightSettings) + "stall_timeout=soon\n");
   WriteFile(kProfiles, ReadFile(kProfiles) + "qualty=90\nunsharp=foo\n");
   EXPECT_THAT(RunRunner().err,
@@ -23,7 +23,7 @@ TEST_F(Configuration, MistakesAreLoggedAtTheStart) {
                          "velathumb-queue: /tmp/profiles.conf:7: error: unsharp is not "));
 }
 
-TEST_F(Configuration, IsNotMentionedWithoutAMistake) {
+TEST_F(Findings, AreMissingWithoutAMistake) {
   WriteFile(kSettings, kRightSettings);
   EXPECT_THAT(RunRunner().err, Not(HasSubstr(".conf")));
 }
