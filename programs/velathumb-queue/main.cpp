@@ -27,7 +27,7 @@ constexpr int kEmpty = 0;
 constexpr int kEntriesLeft = 1;
 constexpr int kError = 2;
 
-constexpr char kLockFile[] = "/var/run/velathumb-queue.lock";
+constexpr const char* kLockFile = kQueueRunnerLock;
 
 int ToExitStatus(RunEnd end) {
   switch (end) {
