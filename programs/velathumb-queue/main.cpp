@@ -31,7 +31,7 @@ constexpr int kError = 2;
 /// Nothing but a change of the configuration helps: systemd need not start the program again.
 constexpr int kMisconfigured = EX_CONFIG;
 
-constexpr char kLockFile[] = "/var/run/velathumb-queue.lock";
+constexpr const char* kLockFile = kQueueRunnerLock;
 
 /// How long systemd is waited for. A machine on which it does not answer is in trouble anyway.
 constexpr std::chrono::seconds kServiceLimit(2);

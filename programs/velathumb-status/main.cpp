@@ -192,7 +192,7 @@ void StatusRun::ReportResumeTime() {
   if (options_.json) {
     json_.Member("resume", DescribeResume(state));
   } else {
-    WriteResumeText(std::cout, state);
+    std::cout << ResumeText(state) << '\n';
   }
 }
 

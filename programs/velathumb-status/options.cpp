@@ -56,7 +56,8 @@ void AddOptions(CLI::App& app, Options& options) {
                           ->type_name("PROFILE")
                           ->expected(0, 1)
                           ->excludes(directories);
-  app.add_flag("-w,--watch", options.watch, "follow the progress until no velathumb is running")
+  app.add_flag("-w,--watch", options.watch,
+               "follow the progress until nothing is running or queued")
       ->excludes(directories)
       ->excludes(queue)
       ->excludes(resumeTime)

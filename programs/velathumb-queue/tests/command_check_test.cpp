@@ -127,21 +127,5 @@ TEST_F(CommandCheckTest, TheProfileOfTheAdministratorGoesFirst) {
   EXPECT_EQ(choose(), "/tmp/etc.conf");
 }
 
-TEST_F(CommandCheckTest, MistakesAreLoggedAtTheStart) {
-  WriteFile("/etc/velainfo.conf", "photo_thumb_size_map=\"1\"\nstall_timeout=soon\n");
-  WriteFile(kProfiles, ReadFile(kProfiles) + "qualty=90\nunsharp=foo\n");
-  EXPECT_THAT(RunRunner().err,
-              StartsWith("velathumb-queue: /etc/velainfo.conf:2: warning: stall_timeout is not a "
-                         "number of seconds, or 0 for no limit: \"soon\"; 900 is used\n"
-                         "velathumb-queue: /tmp/profiles.conf:6: warning: there is no key "
-                         "\"qualty\"; did you mean quality?\n"
-                         "velathumb-queue: /tmp/profiles.conf:7: error: unsharp is not "));
-}
-
-TEST_F(CommandCheckTest, IsNotMentionedWithoutAMistake) {
-  WriteFile("/etc/velainfo.conf", "photo_thumb_size_map=\"1\"\n");
-  EXPECT_THAT(RunRunner().err, Not(HasSubstr(".conf")));
-}
-
 }  // namespace
 }  // namespace vela_test
