@@ -76,6 +76,10 @@ std::string AbsolutePath(const std::string& path) {
              : path;
 }
 
+void PrintLine() {
+  std::fprintf(stderr, "convert-thumb: %s\n", g_line);
+}
+
 /// Appends as much of `text` as fits into a buffer of kMaxLine bytes that holds `length` of them.
 void Append(char* buffer, size_t& length, std::string_view text) {
   const size_t count = std::min(text.size(), kMaxLine - length);
@@ -88,7 +92,9 @@ void Append(char* buffer, size_t& length, std::string_view text) {
 void LogFailuresOf(const std::string& source) {
   std::string name = EscapeControls(PhotoName(AbsolutePath(source)), InvalidBytes::kKeep);
   name = std::string(kPrefix) + (name.empty() ? "" : name + ": ");
-  g_log = new FailureLog{LogConnection(), name, source + ": "};
+  std::string reportedSource = source + ": ";
+  std::replace_if(reportedSource.begin(), reportedSource.end(), IsControl, ' ');
+  g_log = new FailureLog{LogConnection(), name, reportedSource};
 }
 
 void ReportFailure(const char* format, ...) {
@@ -105,14 +111,20 @@ void ReportFailure(const char* format, ...) {
 
 void PrintFailure() {
   if (g_isLineComplete) {
-    LogFailure();
-    std::fprintf(stderr, "convert-thumb: %s\n", g_line);
+    if (g_log != nullptr) {
+      LogFailure();
+    }
+    PrintLine();
   }
 }
 
 void LogFailure() {
   const FailureLog* const log = g_log;
-  if (log == nullptr || !g_isLineComplete) {
+  if (!g_isLineComplete) {
+    return;
+  }
+  if (log == nullptr) {
+    PrintLine();
     return;
   }
   try {

@@ -19,7 +19,7 @@ void LogFailuresOf(const std::string& source);
 /// after all other work of a failed run, because writing to standard error may block.
 void PrintFailure();
 
-/// Logs the stored line, if any, without printing it.
+/// Logs the stored line, if any, without printing it; prints it if this run is not logged.
 void LogFailure();
 
 /// Prints the program's name and `message` to standard error and logs it, instead of the stored

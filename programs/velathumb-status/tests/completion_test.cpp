@@ -75,7 +75,7 @@ std::vector<std::string> OptionsOfTheHelp() {
 
 TEST_F(Completion, ProposesAllOptionsOfTheHelp) {
   const std::vector<std::string> options = OptionsOfTheHelp();
-  EXPECT_EQ(options.size(), 18U);
+  EXPECT_EQ(options.size(), 21U);
   EXPECT_THAT(options, IsSupersetOf({"-p", "--photos", "--html", "-w"}));
   EXPECT_THAT(Complete({"-"}), UnorderedElementsAreArray(options));
 }
