@@ -79,14 +79,20 @@ std::string WithoutName(std::string_view line, std::string photo) {
 }
 
 /// Returns the last line of the converter itself, without its name, or else the first line.
+/// ImageMagick may run under the same name; its lines end with a place in its sources.
 std::string_view MainLine(std::string_view output) {
   constexpr std::string_view kPrefix = "convert-thumb: ";
+  constexpr std::string_view kSource = " @ error/";
   std::string_view first;
   std::string_view last;
   while (!output.empty()) {
-    const std::string_view line = TakeLine(output);
+    std::string_view line = TakeLine(output);
+    const bool isNamed = line.substr(0, kPrefix.size()) == kPrefix;
+    line.remove_prefix(isNamed ? kPrefix.size() : 0);
+    const size_t source = line.rfind(kSource);
+    line = line.substr(0, source);
     first = first.empty() ? line : first;
-    last = line.substr(0, kPrefix.size()) == kPrefix ? line.substr(kPrefix.size()) : last;
+    last = isNamed && source == std::string_view::npos ? line : last;
   }
   return last.empty() ? first : last;
 }
