@@ -27,6 +27,11 @@ constexpr uint32_t kLargestSide = 1280;
 constexpr char kSizeHint[] = "jpeg:size=1280x1280";
 constexpr char kBox[] = "1280x1280>";
 
+/// A picture of more pixels may not fit into the memory that the converter allows ImageMagick.
+constexpr uint64_t kLargePhoto = 16'000'000;
+/// In place of a directory for temporary files: none can be created.
+constexpr char kNoDirectory[] = "/dev/null";
+
 /// Longer reasons are cut.
 constexpr size_t kLongestReason = 500;
 /// Of what a tool prints, so much is kept.
@@ -74,14 +79,20 @@ std::string WithoutName(std::string_view line, std::string photo) {
 }
 
 /// Returns the last line of the converter itself, without its name, or else the first line.
+/// ImageMagick may run under the same name; its lines end with a place in its sources.
 std::string_view MainLine(std::string_view output) {
   constexpr std::string_view kPrefix = "convert-thumb: ";
+  constexpr std::string_view kSource = " @ error/";
   std::string_view first;
   std::string_view last;
   while (!output.empty()) {
-    const std::string_view line = TakeLine(output);
+    std::string_view line = TakeLine(output);
+    const bool isNamed = line.substr(0, kPrefix.size()) == kPrefix;
+    line.remove_prefix(isNamed ? kPrefix.size() : 0);
+    const size_t source = line.rfind(kSource);
+    line = line.substr(0, source);
     first = first.empty() ? line : first;
-    last = line.substr(0, kPrefix.size()) == kPrefix ? line.substr(kPrefix.size()) : last;
+    last = isNamed && source == std::string_view::npos ? line : last;
   }
   return last.empty() ? first : last;
 }
@@ -99,8 +110,9 @@ std::string ReasonOfConverter(const std::string& source, const std::string& scra
   }
   const ToolEnd end = AwaitTool(stream);
   if (end.status == 0) {
-    return "it can be converted now: the cause has gone or is in the profile; the system log has "
-           "the reason of then";
+    return "it can be converted now: the cause is gone, or it is in the profile; the system log "
+           "has "
+           "the reason that it had then";
   }
   const std::string_view line = MainLine(end.output);
   return line.empty() ? NoMessage(kConvertToolPath) : WithoutName(line, source);
@@ -152,22 +164,33 @@ std::string FindLargestThumb(const PhotoReport& photo) {
   return largest;
 }
 
-std::string Examine(const PhotoReport& photo) {
-  const std::string directory = photo.path.substr(0, photo.path.rfind('/'));
-  const WorkAsOwner owner(directory);
-  if (!owner.MayWork()) {
-    return "the owner of its directory is unknown";
-  }
+bool IsLarge(const std::string& photo) {
+  uint32_t width = 0;
+  uint32_t height = 0;
+  return VELAIndexImgResGet(photo.c_str(), &width, &height) == 0 &&
+         uint64_t{width} * height > kLargePhoto;
+}
+
+/// Examines a photo for which files may have to be created.
+std::string ExamineWithFiles(const std::string& photo, bool isRaw) {
   const ScratchDirectory scratch;
   if (scratch.Path().empty()) {
     return "unknown, because no file can be created in /tmp";
   }
-  if (const std::string thumb = FindLargestThumb(photo); !thumb.empty()) {
-    return "its largest thumbnail: " + ReasonOfConverter(thumb, scratch.Path());
+  return isRaw ? ReasonOfRaw(photo, scratch.Path()) : ReasonOfConverter(photo, scratch.Path());
+}
+
+std::string Examine(const PhotoReport& photo) {
+  const WorkAsOwner owner(photo.path.substr(0, photo.path.rfind('/')));
+  if (!owner.MayWork()) {
+    return "the owner of its directory is unknown";
   }
-  return BlVELAIndexIsRawImage(VELAIndexExtGet(photo.path.c_str()))
-             ? ReasonOfRaw(photo.path, scratch.Path())
-             : ReasonOfConverter(photo.path, scratch.Path());
+  if (const std::string thumb = FindLargestThumb(photo); !thumb.empty()) {
+    return "its largest thumbnail: " + ReasonOfConverter(thumb, kNoDirectory);
+  }
+  const bool isRaw = BlVELAIndexIsRawImage(VELAIndexExtGet(photo.path.c_str()));
+  return isRaw || IsLarge(photo.path) ? ExamineWithFiles(photo.path, isRaw)
+                                      : ReasonOfConverter(photo.path, kNoDirectory);
 }
 
 }  // namespace

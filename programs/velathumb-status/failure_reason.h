@@ -9,9 +9,9 @@
 namespace vela {
 
 /// Tries to convert a photo, confined as in velathumb, and discards the result. Uses the photo's
-/// largest thumbnail instead if there is one: the others are made from it. Nothing is changed; the
-/// tools' temporary files are in a private directory in /tmp. Returns the reason of the failure in
-/// one line of unchecked text, or a line that says that there is none.
+/// largest thumbnail instead if there is one: the others are made from it. Nothing is changed; what
+/// a raw or a large photo needs files for is in a private directory in /tmp for the time. Returns
+/// the reason of the failure in one line of unchecked text, or a line that says that there is none.
 std::string FindFailureReason(const PhotoReport& photo);
 
 /// Adds the reasons to failed photos on their way to another sink.

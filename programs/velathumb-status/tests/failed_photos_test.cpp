@@ -171,6 +171,12 @@ TEST_F(FailedPhotos, HaveOneLineOfTheConverterAtMost500BytesLong) {
   EXPECT_EQ(Reason(), "first");
   converter.Plan(StubPlan().PrintError("odd\nconvert-thumb: own\nodd\n").Exit(1));
   EXPECT_EQ(Reason(), "own");
+  // ImageMagick alone, under the converter's name.
+  converter.Plan(StubPlan()
+                     .PrintError("convert-thumb: bad @ error/bmp.c/A/1.\n"
+                                 "convert-thumb: none @ error/convert.c/B/2.\n")
+                     .Exit(1));
+  EXPECT_EQ(Reason(), "bad");
   converter.Plan(StubPlan().PrintErrorRepeated("0123456789", 100000).Exit(1));
   EXPECT_EQ(Reason().size(), 500U);
 }
