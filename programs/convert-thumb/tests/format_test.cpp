@@ -149,8 +149,9 @@ TEST_F(Formats, HeifOfACameraKeepsItsProfile) {
     return;
   }
   const std::string photo = media + "/phone_12mp.heic";
-  ASSERT_EQ(RunProgram(kImageMagick, Line(photo, UsualOutputs(), "theirs").Arguments()).exitCode,
-            0);
+  ASSERT_EQ(
+      RunProgram(kImageMagick, ReferenceArguments(Line(photo, UsualOutputs(), "theirs"))).exitCode,
+      0);
   const WithoutImageMagick without;
   ExpectSuccess(Convert(photo, UsualOutputs()));
   for (const char* place : {"0.jpg", "1.jpg", "2.jpg", "3.jpg"}) {
