@@ -12,6 +12,7 @@
 #include <thread>
 
 #include "support/files.h"
+#include "support/other_user.h"
 #include "support/quiet_test.h"
 #include "support/users.h"
 
@@ -203,6 +204,7 @@ TEST_F(Folder, StaysTheSameWhileItIsHeld) {
   if (!HasOtherUsers()) {
     return;  // every file belongs to the only user
   }
+  LiftProtectionOfTmp();
   MakeFileOf(0, "/tmp/elsewhere/file");
   WriteFile(In("file"), "held");
   {

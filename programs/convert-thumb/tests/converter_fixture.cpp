@@ -80,8 +80,12 @@ PixelCounts Scaled(const PixelCounts& from, const ThumbOptions& options) {
   return {side(from.width), side(from.height)};
 }
 
+std::string SizeText(int width, int height) {
+  return std::to_string(width) + "x" + std::to_string(height);
+}
+
 std::string ExactSize(int width, int height) {
-  return std::to_string(width) + "x" + std::to_string(height) + "!";
+  return SizeText(width, height) + "!";
 }
 
 /// "-thumbnail" of ImageMagick 6 in other words; it leaves an opaque alpha channel behind.
@@ -102,8 +106,28 @@ std::vector<std::string> ScalingTo(const PixelCounts& to, const PixelCounts& fro
   return words;
 }
 
+/// ImageMagick's drawing of one picture takes longer than its conversion. A larger one repeats it.
+constexpr int kLargestDrawing = 2000;
+constexpr int kRepetitions = 4;  // in each direction
+
 std::string OutputPath(const std::string& prefix, size_t place) {
   return prefix + std::to_string(place) + ".jpg";
+}
+
+/// ImageMagick's arguments that draw a picture.
+std::vector<std::string> Drawing(int width, int height) {
+  const bool isRepeated = std::max(width, height) > kLargestDrawing;
+  const int parts = isRepeated ? kRepetitions : 1;
+  std::vector<std::string> arguments = {
+      "-seed", "20", "-size", SizeText(width / parts, height / parts), "plasma:sienna-steelblue"};
+  if (isRepeated) {
+    const std::string whole = SizeText(width, height);
+    for (const char* argument :
+         {"-write", "mpr:tile", "+delete", "-size", whole.c_str(), "tile:mpr:tile"}) {
+      arguments.emplace_back(argument);
+    }
+  }
+  return arguments;
 }
 
 }  // namespace
@@ -206,8 +230,7 @@ std::string ConverterTest::MakePicture(const std::string& name, int width, int h
   const size_t colon = name.find(':');
   const std::string prefix = colon == std::string::npos ? "" : name.substr(0, colon + 1);
   const std::string path = directory_ + "/" + name.substr(prefix.size());
-  const std::string size = std::to_string(width) + "x" + std::to_string(height);
-  std::vector<std::string> arguments = {"-seed", "20", "-size", size, "plasma:sienna-steelblue"};
+  std::vector<std::string> arguments = Drawing(width, height);
   arguments.insert(arguments.end(), options.begin(), options.end());
   arguments.push_back(prefix + path);
   const ProgramResult made = RunProgram(kImageMagick, arguments);
