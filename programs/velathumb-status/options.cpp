@@ -28,6 +28,15 @@ void AddOptions(CLI::App& app, Options& options) {
       ->needs(directories);
   app.add_flag("-r,--recursive", options.recursive, "include everything below the directories")
       ->needs(directories);
+  auto* failed = app.add_flag(
+      "--failed", options.failed,
+      "list the failed photos of the directories, or of the current one, with their sizes, the "
+      "time and the reason, for which the converter is run again");
+  auto* json = app.add_flag("-j,--json", options.json, "write JSON");
+  app.add_flag("-0,--null", options.nulTerminated,
+               "with --failed, write only the paths, each followed by a null byte")
+      ->needs(failed)
+      ->excludes(json);
   app.add_flag("--check-videos", options.checkVideos,
                "check videos too, with the index service; this REMOVES thumbnails of videos that "
                "are outdated or have the wrong orientation, and the Flash or MPEG-4 conversion of "
@@ -53,8 +62,8 @@ void AddOptions(CLI::App& app, Options& options) {
       ->excludes(queue)
       ->excludes(resumeTime)
       ->excludes(security)
-      ->excludes(checkConfig);
-  app.add_flag("-j,--json", options.json, "write JSON");
+      ->excludes(checkConfig)
+      ->excludes(failed);
 }
 
 /// Returns an error message when options that are valid one by one contradict each other, otherwise
@@ -62,9 +71,9 @@ void AddOptions(CLI::App& app, Options& options) {
 std::string FindContradiction(const Options& options) {
   const bool hasQuery = !options.directories.empty() || options.queue || options.progress ||
                         options.watch || options.resumeTime || options.security ||
-                        options.checkConfig;
+                        options.checkConfig || options.failed;
   if (!hasQuery) {
-    return "give a directory, --queue, --progress, --watch, --resume-time, --security or "
+    return "give a directory, --failed, --queue, --progress, --watch, --resume-time, --security or "
            "--check-config";
   }
   if (options.checkVideos && options.directories.empty() && !options.queue) {

@@ -21,13 +21,15 @@ LogLevel LevelOf(Severity severity) {
 
 }  // namespace
 
+std::string ChooseProfileFile(const std::string& local, const std::string& installed) {
+  return IsFileExist(local.c_str()) != 0 ? local : installed;
+}
+
 std::string DefaultProfileFile() {
-  if (IsFileExist(kAdministratorsProfile) != 0) {
-    return kAdministratorsProfile;
-  }
   std::error_code error;
   const auto program = std::filesystem::read_symlink("/proc/self/exe", error);
-  return (program.parent_path().parent_path() / kInstalledProfile).string();
+  return ChooseProfileFile(kAdministratorsProfile,
+                           (program.parent_path().parent_path() / kInstalledProfile).string());
 }
 
 std::string FindingText(const Finding& finding) {

@@ -14,6 +14,10 @@ CheckResult CheckSettings();
 /// Checks the profile file `path`, with the sizes that the settings ask for.
 CheckResult CheckProfile(const std::string& path);
 
+/// Returns the profile file that is used unless another one is given: `local` if anything is there,
+/// even when it cannot be read, otherwise `installed`.
+std::string ChooseProfileFile(const std::string& local, const std::string& installed);
+
 /// Returns the profile file that the services use when none is given: that of the administrator
 /// in /etc, otherwise the one that was installed beside this program.
 std::string DefaultProfileFile();

@@ -63,7 +63,7 @@ Machine::Machine() {
 }
 
 void Machine::StartDaemon() {
-  daemon_ = StartProgram(HostPath(VELAINDEXPLUGIND_FILE), {});
+  daemon_ = StartProgram(BuiltPath(VELAINDEXPLUGIND_FILE), {});
   const auto end = std::chrono::steady_clock::now() + seconds(10);
   while (!IsAnswering()) {
     ASSERT_LT(std::chrono::steady_clock::now(), end) << daemon_->Error();
@@ -73,7 +73,7 @@ void Machine::StartDaemon() {
 
 void Machine::KillAndRestartDaemon() {
   ExpectKilled(&daemon_, "the daemon");
-  daemon_ = StartProgram(HostPath(VELAINDEXPLUGIND_FILE), {});
+  daemon_ = StartProgram(BuiltPath(VELAINDEXPLUGIND_FILE), {});
 }
 
 void Machine::ReloadDaemon() {
@@ -86,8 +86,7 @@ std::optional<ProgramResult> Machine::StopDaemon() {
 }
 
 void Machine::StartFollowingRunner() {
-  runner_ =
-      StartProgram(HostPath(VELATHUMB_QUEUE_FILE), RunnerArguments({"--follow", "--jobs", "2"}));
+  runner_ = StartRunner({"--follow", "--jobs", "2"});
 }
 
 void Machine::KillRunner() {
@@ -113,8 +112,12 @@ bool Machine::KillVelathumb() {
   return !processes.empty() && kill(processes.front(), SIGKILL) == 0;
 }
 
+Program Machine::StartRunner(const std::vector<std::string>& more) {
+  return StartProgram(BuiltPath(VELATHUMB_QUEUE_FILE), RunnerArguments(more));
+}
+
 ProgramResult Machine::RunRunner(const std::vector<std::string>& more) {
-  return RunProgram(HostPath(VELATHUMB_QUEUE_FILE), RunnerArguments(more));
+  return RunProgram(BuiltPath(VELATHUMB_QUEUE_FILE), RunnerArguments(more));
 }
 
 bool Machine::HasQueue() {

@@ -285,6 +285,12 @@ std::string FindScratchDirectory(const std::vector<std::string>& arguments) {
 
 }  // namespace
 
+bool IsDiscarded(const CommandLine& line) {
+  return !line.outputIndices.empty() &&
+         std::all_of(line.outputIndices.begin(), line.outputIndices.end(),
+                     [&](size_t index) { return line.arguments[index] == kDiscardedOutput; });
+}
+
 std::string SourceFile(const std::string& argument) {
   const size_t suffix = sizeof kFirstPage - 1;
   if (argument.size() > suffix &&

@@ -56,6 +56,9 @@ std::optional<int> ParseQuarterTurns(const std::string& text) {
 }
 
 std::optional<std::string> ParseOutputPath(const std::string& text) {
+  if (text == kDiscardedOutput) {
+    return text.substr(text.find('/'));
+  }
   std::string path;
   for (size_t i = 0; i < text.size(); ++i) {
     if (text[i] == '%') {

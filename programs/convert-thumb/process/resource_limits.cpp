@@ -47,4 +47,8 @@ void LimitResources(size_t memoryLimit) {
   LowerLimits(limits);
 }
 
+bool HasMemoryForThreads(size_t memoryLimit) {
+  return !IsMemoryLimitedBelow(ProcessMemoryLimit(memoryLimit));
+}
+
 }  // namespace vela

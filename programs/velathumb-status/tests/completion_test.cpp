@@ -75,7 +75,7 @@ std::vector<std::string> OptionsOfTheHelp() {
 
 TEST_F(Completion, ProposesAllOptionsOfTheHelp) {
   const std::vector<std::string> options = OptionsOfTheHelp();
-  EXPECT_EQ(options.size(), 19U);
+  EXPECT_EQ(options.size(), 22U);
   EXPECT_THAT(options, IsSupersetOf({"-p", "--photos", "--html", "-w"}));
   EXPECT_THAT(Complete({"-"}), UnorderedElementsAreArray(options));
 }

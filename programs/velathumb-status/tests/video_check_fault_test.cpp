@@ -103,7 +103,7 @@ TEST_F(VideoCheckFault, OtherReportsNeedNoVideoLibrary) {
 
 /// The results that a new process gets for the videos, see video_probe.
 std::string Probe(const std::vector<std::string>& files) {
-  const ProgramResult result = RunProgram(HostPath(VIDEO_PROBE_FILE), files);
+  const ProgramResult result = RunProgram(BuiltPath(VIDEO_PROBE_FILE), files);
   EXPECT_EQ(result.exitCode, 0) << result.err;
   return result.out;
 }

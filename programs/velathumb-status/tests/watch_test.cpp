@@ -13,7 +13,7 @@
 #include "running_conversion.h"
 #include "status_fixture.h"
 #include "support/descriptor.h"
-#include "terminal.h"
+#include "support/terminal.h"
 
 using namespace vela;
 
