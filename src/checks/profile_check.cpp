@@ -276,6 +276,16 @@ void ProfileCheck::Check(const ProfileText& profile) {
   }
 }
 
+void CheckText(const std::string& text, FindingList& findings) {
+  if (text.size() > kLargestSectionText) {
+    findings.Add(0, Severity::kError,
+                 "is larger than " + std::to_string(kLargestSectionText) +
+                     " bytes; the whole file is rejected");
+    return;
+  }
+  ProfileCheck(findings).Check(ReadProfileText(text, findings));
+}
+
 }  // namespace
 
 CheckResult CheckProfile(const std::string& path) {
@@ -285,7 +295,7 @@ CheckResult CheckProfile(const std::string& path) {
   FindingList findings(path);
   switch (ReadCheckedFile(path, text, error)) {
     case FileRead::kDone:
-      ProfileCheck(findings).Check(ReadProfileText(text, findings));
+      CheckText(text, findings);
       break;
     case FileRead::kFaulty:
       findings.Add(0, Severity::kError,

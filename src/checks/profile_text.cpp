@@ -1,6 +1,7 @@
 #include "checks/profile_text.h"
 
 #include <algorithm>
+#include <unordered_map>
 
 #include "checks/similar_name.h"
 #include "configuration/profile_values.h"
@@ -48,7 +49,8 @@ class ProfileReader {
   FindingList& findings_;
   ProfileText profile_;
   Place place_ = Place::kNoSection;
-  size_t current_ = 0;  // of the sections
+  size_t current_ = 0;                                    // of the sections
+  std::unordered_map<std::string_view, size_t> numbers_;  // of the sections by name, in the text
 };
 
 void ProfileReader::ReadLine(std::string_view line, int64_t number) {
@@ -80,16 +82,15 @@ void ProfileReader::BeginSection(std::string_view name, int64_t number) {
   }
   place_ = Place::kThumbSection;
   auto& sections = profile_.sections;
-  const auto known =
-      std::find_if(sections.begin(), sections.end(),
-                   [name](const ProfileSection& section) { return section.name == name; });
-  current_ = static_cast<size_t>(known - sections.begin());
-  if (known == sections.end()) {
+  const auto [known, isNew] = numbers_.emplace(name, sections.size());
+  current_ = known->second;
+  if (isNew) {
     sections.push_back({std::string(name), number, {}});
     return;
   }
   findings_.Warn(number, "the section " + Quoted(name) + " is already in line " +
-                             std::to_string(known->line) + "; both define one thumbnail");
+                             std::to_string(sections[current_].line) +
+                             "; both define one thumbnail");
 }
 
 void ProfileReader::ReadPair(const SectionLine& line, int64_t number) {

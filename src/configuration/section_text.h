@@ -1,10 +1,14 @@
 // The text of configuration files with sections: `[section]`, `key = value`, comments.
 #pragma once
 
+#include <cstddef>
 #include <optional>
 #include <string_view>
 
 namespace vela {
+
+/// A larger file is rejected, bytes.
+inline constexpr size_t kLargestSectionText = size_t{64} << 20;
 
 /// A line of such a file. Names and values are without the white space around them.
 struct SectionLine {

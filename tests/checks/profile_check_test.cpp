@@ -2,6 +2,7 @@
 #include <sys/stat.h>
 
 #include <cerrno>
+#include <chrono>
 
 #include "check_fixture.h"
 #include "support/build_paths.h"
@@ -199,6 +200,22 @@ TEST_F(ProfileCheckTest, AFileThatMayNotBeReadIsNotChecked) {
   EXPECT_THAT(result.findings, IsEmpty());
   ASSERT_THAT(result.unchecked, SizeIs(1));
   EXPECT_EQ(result.unchecked[0].error, EACCES);
+}
+
+TEST_F(ProfileCheckTest, AFileThatIsTooLargeIsAnError) {
+  WriteFileOfSize(kProfile, (size_t{64} << 20) + 1);
+  EXPECT_THAT(LinesOf(CheckProfile(kProfile)),
+              ElementsAre(" error: is larger than 67108864 bytes; the whole file is rejected"));
+}
+
+TEST_F(ProfileCheckTest, ManySectionsTakeNoLongerThanTheirNumber) {
+  std::string text = Reference();
+  for (int i = 0; i < 300000; ++i) {
+    text += "[thumb" + std::to_string(i) + "]\n";
+  }
+  const auto start = std::chrono::steady_clock::now();
+  EXPECT_THAT(Check(text), SizeIs(1001));
+  EXPECT_LT(std::chrono::steady_clock::now() - start, std::chrono::seconds(20));
 }
 
 TEST_F(ProfileCheckTest, AFifoIsNotWaitedFor) {

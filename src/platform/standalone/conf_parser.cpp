@@ -24,8 +24,6 @@ struct Section {
   std::map<std::string, std::string> values;
 };
 
-constexpr size_t kFileSizeMax = 64 * 1024 * 1024;
-
 /// By default inih also accepts values that continue in the next line and comments after values,
 /// and limits the length of lines.
 void SetDialect() {
@@ -179,7 +177,7 @@ bool ConfParser::loadFromFile(const std::string& path) {
     return false;
   }
   std::vector<Section> sections;
-  if (text.size() > kFileSizeMax || !Parse(text, sections)) {
+  if (text.size() > vela::kLargestSectionText || !Parse(text, sections)) {
     vela::SetLastError(EINVAL);
     return false;
   }
