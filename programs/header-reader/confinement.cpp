@@ -32,7 +32,7 @@ constexpr uid_t kNobody = 65534;
 constexpr uint64_t kMaxMemory = uint64_t{512} << 20;
 constexpr uint64_t kMaxProcessorSeconds = 10;
 constexpr rlim_t kMaxDescriptors = 8;
-constexpr rlim_t kMaxStack = rlim_t{8} << 20;
+[[maybe_unused]] constexpr rlim_t kMaxStack = rlim_t{8} << 20;
 
 #if defined(__x86_64__)
 constexpr uint32_t kArchitecture = AUDIT_ARCH_X86_64;
