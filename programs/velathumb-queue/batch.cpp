@@ -4,6 +4,7 @@
 #include <cerrno>
 #include <utility>
 
+#include "configuration.h"
 #include "entry_check.h"
 #include "posix/service_log.h"
 #include "storage/unfinished_directories.h"
@@ -86,6 +87,8 @@ Batch::Batch(const RunSettings& settings, TakenQueue& taken, EventWait& events, 
 }
 
 bool Batch::StartVelathumb(size_t number, std::vector<std::string> locked) {
+  FileVersion profile;
+  profile.Read(settings_.velathumb.profileFile.c_str());
   pid_t pid = 0;
   const int error = StartProcess(settings_.velathumb, plan_.Entry(number), pid);
   if (error != 0) {
@@ -95,7 +98,7 @@ bool Batch::StartVelathumb(size_t number, std::vector<std::string> locked) {
     return false;
   }
   StallWatch watch(ReadStallLimits(), Clock::now(), [pid] { return ActivityOf(pid); });
-  children_.emplace(pid, Child{number, std::move(locked), std::move(watch)});
+  children_.emplace(pid, Child{number, std::move(locked), profile, std::move(watch)});
   return true;
 }
 
@@ -107,7 +110,12 @@ bool Batch::StartEntry(size_t number) {
     return !failure_;
   }
   const EntryTarget target = TargetOf(entry);
-  std::vector<std::string> locked = FindLockedDirectories(target);
+  std::vector<std::string> locked =
+      FindSkippedDirectories(target, [this] { return events_.MustStop(); }).locked;
+  if (events_.MustStop()) {
+    plan_.Postpone(number, Clock::now());
+    return false;
+  }
   // The rest of a tree need not wait for one directory.
   if (!target.isTree && !locked.empty()) {
     PostponeUnfinished(number);
@@ -148,6 +156,30 @@ void Batch::Defer(size_t number, const std::string& reason) {
   WriteLog(LogLevel::kWarning, "deferred to a later run, " + reason + ": " + entry);
   ++deferred_;
   End(number);
+}
+
+/// Saves parts of a tree for a later run, which need not repeat the rest. Returns false when the
+/// entry itself was deferred or must stay.
+bool Batch::DeferReadOnlyParts(size_t number, const std::vector<std::string>& entries) {
+  if (entries.empty()) {
+    return true;
+  }
+  if (!AreEntries(entries)) {
+    Defer(number, "a part of it is mounted read-only");
+    return false;
+  }
+  const int error = taken_.Defer(entries);
+  if (error != 0) {
+    WriteLog(LogLevel::kError, "cannot defer a part of a tree", error);
+    FailToRecord(number);
+    return false;
+  }
+  for (const std::string& entry : entries) {
+    WriteLog(LogLevel::kWarning,
+             "deferred to a later run, its volume is mounted read-only: " + entry);
+    ++deferred_;
+  }
+  return true;
 }
 
 void Batch::Finish(size_t number) {
@@ -227,8 +259,28 @@ void Batch::HandleUnfinished(size_t number, const std::vector<std::string>& dire
   }
 }
 
+/// Returns false, having postponed the entry, when velathumb may have found a profile with which it
+/// skips directories, for instance one that was just being written.
+bool Batch::WasProfileUsable(const Child& child) {
+  const std::string& file = settings_.velathumb.profileFile;
+  FileVersion profile;
+  profile.Read(file.c_str());
+  // The first fault is the only one that is logged.
+  if (failure_ == RunEnd::kMisconfigured || !IsProfileUsable(file)) {
+    failure_ = RunEnd::kMisconfigured;
+  } else if (profile == child.profile ||
+             std::exchange(histories_[plan_.Entry(child.number)].hasSeenNewProfile, true)) {
+    return true;
+  }
+  plan_.Postpone(child.number, Clock::now());
+  return false;
+}
+
 /// velathumb exits with 0 also when it skipped a directory or stopped in it.
 void Batch::HandleSuccess(const Child& child) {
+  if (!WasProfileUsable(child)) {
+    return;
+  }
   const std::string& entry = plan_.Entry(child.number);
   const std::string obstacle = FindObstacle(entry);
   if (!obstacle.empty()) {
@@ -236,7 +288,16 @@ void Batch::HandleSuccess(const Child& child) {
     return;
   }
   const EntryTarget target = TargetOf(entry);
-  std::vector<std::string> unfinished = FindLockedDirectories(target);
+  SkippedDirectories skipped =
+      FindSkippedDirectories(target, [this] { return events_.MustStop(); });
+  if (target.isTree && events_.MustStop()) {
+    plan_.Postpone(child.number, Clock::now());
+    return;
+  }
+  if (!DeferReadOnlyParts(child.number, skipped.readOnly)) {
+    return;
+  }
+  std::vector<std::string>& unfinished = skipped.locked;
   Merge(unfinished, child.locked);
   Merge(unfinished, TakeNotesAbout(target));
   if (unfinished.empty()) {

@@ -10,8 +10,8 @@
 #include <vector>
 
 #include "batch.h"
+#include "configuration.h"
 #include "conversion_pause.h"
-#include "entry_check.h"
 #include "posix/event_wait.h"
 #include "posix/service_log.h"
 #include "progress_totals.h"
@@ -112,10 +112,7 @@ void QueueRun::SetTotals(TakenQueue::Outcome outcome) {
     totals_.Reset();
   }
   isIdle_ = false;
-  totals_.Set(taken_.Entries(), [this] {
-    events_.Wait(milliseconds(0));
-    return events_.IsStopping();
-  });
+  totals_.Set(taken_.Entries(), [this] { return events_.MustStop(); });
 }
 
 /// Repeats `act` while it finds a file locked. Returns its last result: EWOULDBLOCK when a signal
@@ -266,7 +263,7 @@ void QueueRun::QueueUnfinished() {
 /// Takes the pending entries and processes them. Sets `isIdle` when there are none.
 RunEnd QueueRun::RunRound(bool& isIdle) {
   if (!IsProfileUsable(settings_.velathumb.profileFile)) {
-    return RunEnd::kFailed;
+    return RunEnd::kMisconfigured;
   }
   QueueUnfinished();
   const TakenQueue::Outcome outcome = taken_.Take();

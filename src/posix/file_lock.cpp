@@ -137,7 +137,7 @@ int TryProcessLock(const std::string& path, bool wait, FileDescriptor& file, boo
   }
   // Whoever can only read the file can hold a read lock, but only its owner a write lock.
   if (!LockForProcess(file.Get(), isPrivate ? F_WRLCK : F_RDLCK, wait)) {
-    return errno;
+    return errno == EACCES ? EAGAIN : errno;
   }
   if (!IsAtPath(file.Get(), path, Links::kNotFollowed)) {
     return 0;
