@@ -3,6 +3,7 @@
 #include <fcntl.h>
 #include <grp.h>
 #include <linux/audit.h>
+#include <linux/capability.h>
 #include <linux/filter.h>
 #include <linux/seccomp.h>
 #include <signal.h>
@@ -186,6 +187,13 @@ void GiveUpIdentity() {
   setresuid(geteuid(), geteuid(), geteuid());
 }
 
+/// Root without the right to change its identity would keep them.
+void GiveUpCapabilities() {
+  __user_cap_header_struct header = {_LINUX_CAPABILITY_VERSION_3, 0};
+  const __user_cap_data_struct none[2] = {};
+  syscall(SYS_capset, &header, none);
+}
+
 void Limit(__rlimit_resource resource, rlim_t value) {
   rlimit limit = {};
   if (getrlimit(resource, &limit) == 0 && limit.rlim_max > value) {
@@ -212,6 +220,7 @@ int EnterConfinement() {
   int error = UnlessUnsupported(RefuseNewPrivileges());
   LimitResources();
   GiveUpIdentity();
+  GiveUpCapabilities();
   // A change of the identity cancels this.
   prctl(PR_SET_PDEATHSIG, SIGKILL);
   if (error == 0) {
