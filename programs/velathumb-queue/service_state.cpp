@@ -159,13 +159,14 @@ ServiceText DescribeService(const ServiceState& state) {
   if (state.isRunning) {
     return {false, kRunningText};
   }
+  // Also after a failure.
+  if (state.isWatching) {
+    return {false, "velathumb-queue.service does the work"};
+  }
   if (state.hasFailed) {
     return {true,
             "but velathumb-queue.service has failed: systemctl status velathumb-queue.service "
-            "tells why, systemctl restart velathumb-queue.path starts it again"};
-  }
-  if (state.isWatching) {
-    return {false, "velathumb-queue.service does the work"};
+            "tells why, systemctl start velathumb-queue.service starts it again"};
   }
   if (state.isScheduled) {
     return {false,

@@ -169,14 +169,17 @@ const ServiceCase kServices[] = {
      {{}, {kPath}},
      "the service is enabled, but has not been started: systemctl start velathumb-queue.path "
      "velathumb-queue.timer"},
-    {{"Failed"},
+    {{"WatchingAfterAFailure"},
      {{{kService, "failed"}, {kPath, "active"}}, {kPath}},
+     "velathumb-queue.service does the work"},
+    {{"Failed"},
+     {{{kService, "failed"}}, {kPath}},
      "but velathumb-queue.service has failed: systemctl status velathumb-queue.service tells why, "
-     "systemctl restart velathumb-queue.path starts it again"},
+     "systemctl start velathumb-queue.service starts it again"},
     {{"PathFailed"},
      {{{kPath, "failed"}}, {kPath}},
      "but velathumb-queue.service has failed: systemctl status velathumb-queue.service tells why, "
-     "systemctl restart velathumb-queue.path starts it again"},
+     "systemctl start velathumb-queue.service starts it again"},
 };
 INSTANTIATE_TEST_SUITE_P(States, ServiceTest, ValuesIn(kServices), CaseName());
 
