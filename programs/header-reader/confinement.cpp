@@ -3,6 +3,7 @@
 #include <fcntl.h>
 #include <grp.h>
 #include <linux/audit.h>
+#include <linux/capability.h>
 #include <linux/filter.h>
 #include <linux/seccomp.h>
 #include <signal.h>
@@ -32,7 +33,7 @@ constexpr uid_t kNobody = 65534;
 constexpr uint64_t kMaxMemory = uint64_t{512} << 20;
 constexpr uint64_t kMaxProcessorSeconds = 10;
 constexpr rlim_t kMaxDescriptors = 8;
-constexpr rlim_t kMaxStack = rlim_t{8} << 20;
+[[maybe_unused]] constexpr rlim_t kMaxStack = rlim_t{8} << 20;
 
 #if defined(__x86_64__)
 constexpr uint32_t kArchitecture = AUDIT_ARCH_X86_64;
@@ -186,6 +187,13 @@ void GiveUpIdentity() {
   setresuid(geteuid(), geteuid(), geteuid());
 }
 
+/// Root without the right to change its identity would keep them.
+void GiveUpCapabilities() {
+  __user_cap_header_struct header = {_LINUX_CAPABILITY_VERSION_3, 0};
+  const __user_cap_data_struct none[2] = {};
+  syscall(SYS_capset, &header, none);
+}
+
 void Limit(__rlimit_resource resource, rlim_t value) {
   rlimit limit = {};
   if (getrlimit(resource, &limit) == 0 && limit.rlim_max > value) {
@@ -212,6 +220,7 @@ int EnterConfinement() {
   int error = UnlessUnsupported(RefuseNewPrivileges());
   LimitResources();
   GiveUpIdentity();
+  GiveUpCapabilities();
   // A change of the identity cancels this.
   prctl(PR_SET_PDEATHSIG, SIGKILL);
   if (error == 0) {

@@ -1,8 +1,6 @@
 // The main function of every test program.
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
-#include <limits.h>
-#include <unistd.h>
 
 #include <filesystem>
 #include <string>
@@ -29,14 +27,6 @@ bool OnlyPrintsInformation(const std::vector<std::string>& arguments) {
   return false;
 }
 
-std::string AbsolutePath(const std::string& path) {
-  if (StartsWith(path, "/")) {
-    return path;
-  }
-  char directory[PATH_MAX];
-  return getcwd(directory, sizeof directory) == nullptr ? path : directory + ("/" + path);
-}
-
 /// Changes the path of a result file on the command line (xml:path or json:path) to its directory
 /// in the sandbox; returns the original directory, empty when no result file is requested.
 std::string RedirectResultFile(std::vector<std::string>* arguments) {
@@ -45,12 +35,12 @@ std::string RedirectResultFile(std::vector<std::string>* arguments) {
     if (!StartsWith(argument, kOutputOption) || colon == std::string::npos) {
       continue;
     }
-    const std::string path = AbsolutePath(argument.substr(colon + 1));
-    const size_t slash = path.rfind('/');
+    const std::filesystem::path path = "." / std::filesystem::path(argument.substr(colon + 1));
     std::error_code error;  // a failure is detected when the directory is mounted
-    std::filesystem::create_directories(path.substr(0, slash + 1), error);
-    argument = argument.substr(0, colon + 1) + vela_test::kWritablePlace + path.substr(slash);
-    return path.substr(0, slash + 1);
+    std::filesystem::create_directories(path.parent_path(), error);
+    argument =
+        argument.substr(0, colon + 1) + vela_test::kWritablePlace + "/" + path.filename().string();
+    return path.parent_path();
   }
   return "";
 }

@@ -4,6 +4,7 @@
 
 #include <fcntl.h>
 #include <gmock/gmock.h>
+#include <linux/capability.h>
 #include <sys/mman.h>
 #include <sys/prctl.h>
 #include <sys/ptrace.h>
@@ -21,6 +22,7 @@
 #include <string>
 #include <vector>
 
+#include "support/capabilities.h"
 #include "support/files.h"
 #include "support/sandbox.h"
 
@@ -142,13 +144,15 @@ TEST_F(HeaderConfinement, ReadsOpenFiles) {
 }
 
 /// The value of a line of the process's status after it has been confined; empty when it never is.
-std::string ConfinedStatus(const std::string& name) {
+std::string ConfinedStatus(
+    const std::string& name, void (*before)() = [] {}) {
   int ends[2] = {-1, -1};
   EXPECT_EQ(pipe2(ends, O_CLOEXEC), 0);
   const pid_t child = fork();
   if (child == 0) {
     close(ends[1]);
     char byte = 0;
+    before();
     _exit(vela::EnterConfinement() != 0 || read(ends[0], &byte, 1) != 0 ? 1 : 0);
   }
   close(ends[0]);
@@ -191,9 +195,21 @@ TEST_F(HeaderConfinement, HasNoPrivileges) {
     EXPECT_EQ(ConfinedStatus("Uid"), "\t65534\t65534\t65534\t65534");
     EXPECT_EQ(ConfinedStatus("Gid"), "\t65534\t65534\t65534\t65534");
     EXPECT_THAT(ConfinedStatus("Groups"), testing::Not(testing::ContainsRegex("[0-9]")));
-    EXPECT_EQ(ConfinedStatus("CapEff"), "\t0000000000000000");
-    EXPECT_EQ(ConfinedStatus("CapPrm"), "\t0000000000000000");
   }
+  EXPECT_EQ(ConfinedStatus("CapEff"), "\t0000000000000000");
+  EXPECT_EQ(ConfinedStatus("CapPrm"), "\t0000000000000000");
+}
+
+/// As in a service that does not have it.
+void GiveUpTheRightToChangeIdentity() {
+  bool ok = false;
+  SetEffectiveCapabilities(EffectiveCapabilities(&ok) & ~(uint64_t{1} << CAP_SETUID));
+}
+
+TEST_F(HeaderConfinement, KeepsNoPrivilegesWhenItCannotChangeItsIdentity) {
+  EXPECT_EQ(ConfinedStatus("Uid", GiveUpTheRightToChangeIdentity), "\t0\t0\t0\t0");
+  EXPECT_EQ(ConfinedStatus("CapEff", GiveUpTheRightToChangeIdentity), "\t0000000000000000");
+  EXPECT_EQ(ConfinedStatus("CapPrm", GiveUpTheRightToChangeIdentity), "\t0000000000000000");
 }
 
 TEST_F(HeaderConfinement, HasLittleMemory) {

@@ -78,6 +78,18 @@ TEST_F(SandboxEntry, ResultFileIsWrittenOutside) {
   EXPECT_THAT(ReadFile("/tmp/results/new/probe.xml"), HasSubstr("name=\"Passes\""));
 }
 
+TEST_F(SandboxEntry, ResultFileIsWrittenBelowTheWorkingDirectory) {
+  MakeDirectories("/tmp/work");
+  ProgramOptions options;
+  options.workingDirectory = "/tmp/work";
+  for (const char* file : {"probe.xml", "results/probe.xml"}) {
+    std::vector<std::string> arguments = Arguments("Passes");
+    arguments.push_back(std::string("--gtest_output=xml:") + file);
+    EXPECT_EQ(RunProbe(arguments, options).exitCode, 0) << file;
+    EXPECT_THAT(ReadFile(std::string("/tmp/work/") + file), HasSubstr("name=\"Passes\""));
+  }
+}
+
 TEST_F(SandboxEntry, EverythingEndsWithTheProgram) {
   const size_t before = ProcessCount();
   Program program = StartProgram(BuiltPath(PROBE_FILE), Arguments("Sleeps"));

@@ -1,0 +1,144 @@
+# What the cases of tests/installed/cases are made of. Sourced there; runs inside the machine.
+# shellcheck shell=bash
+
+readonly SHARE=/run/share
+readonly QUEUE=/var/spool/thumb_create.queue
+readonly SIZES=(S SM M B L XL)
+readonly RUNNER=velathumb-queue.service
+readonly DAEMON=velaindexplugind.service
+
+# --- results --------------------------------------------------------------------------------------
+
+failures=0
+
+fails() { # MESSAGE
+  printf '    FAILED: %s\n' "$1"
+  failures=$((failures + 1))
+}
+
+expect() { # WHAT COMMAND [ARGUMENT]...
+  "${@:2}" || fails "$1"
+}
+
+refuse() { # WHAT COMMAND [ARGUMENT]...
+  ! "${@:2}" || fails "$1"
+}
+
+expect_equal() { # WHAT ACTUAL EXPECTED
+  [[ $2 == "$3" ]] || fails "$1 is '$2', not '$3'"
+}
+
+# Fails when the event does not happen in time.
+wait_for() { # SECONDS WHAT COMMAND [ARGUMENT]...
+  local end=$((SECONDS + $1 + 1))
+  until "${@:3}"; do
+    if ((SECONDS >= end)); then
+      fails "not within $1 s: $2"
+      return 0
+    fi
+    sleep 0.05
+  done
+}
+
+# Fails when the command fails or takes a second or more.
+within_a_second() { # WHAT COMMAND [ARGUMENT]...
+  local start=${EPOCHREALTIME/./} took
+  "${@:2}" || fails "$1 failed"
+  took=$((${EPOCHREALTIME/./} - start))
+  printf '    %s took %d ms\n' "$1" $((took / 1000))
+  ((took < 1000000)) || fails "$1 took a second or more"
+}
+
+run_case() { # NAME
+  local before=$failures start=$SECONDS
+  printf '%s\n' "${1//_/ }"
+  JOURNAL_START=$(journalctl -n 0 --show-cursor | sed -n 's/^-- cursor: //p')
+  "$1"
+  if ((failures > before)); then
+    printf '    the journal meanwhile:\n'
+    journal -u 'vela*' -u "$RUNNER" -u "$DAEMON" | tail -n 40 | sed 's/^/      /'
+  fi
+  printf '    %d s\n' $((SECONDS - start))
+}
+
+# --- services -------------------------------------------------------------------------------------
+
+# Prints the messages since the case began.
+journal() { # [OPTION]...
+  journalctl -q --after-cursor="$JOURNAL_START" -o cat "$@"
+}
+
+journal_has() { # UNIT TEXT
+  grep -qF -- "$2" < <(journal -u "$1")
+}
+
+property() { # UNIT NAME
+  systemctl show -p "$2" --value "$1"
+}
+
+has_state() { # UNIT STATE
+  [[ $(property "$1" ActiveState) == "$2" ]]
+}
+
+# Prints the names of the processes of the services and of their tools.
+processes_left() {
+  cat /proc/[0-9]*/comm 2>/dev/null | grep -E '^(vela|convert|dcraw|header-reader)' || true
+}
+
+main_process() { # UNIT
+  property "$1" MainPID
+}
+
+# --- photos and the queue -------------------------------------------------------------------------
+
+add() { # ENTRY
+  velathumb-queue --queue-only --add "$1" >/dev/null 2>&1 || fails "cannot queue $1"
+}
+
+is_idle() {
+  [[ ! -e $QUEUE && ! -e $QUEUE.tmp ]] && has_state "$RUNNER" inactive
+}
+
+count() { # DIRECTORY NAME
+  find "$1" -path '*/@eaDir/*' -name "$2" -type f 2>/dev/null | wc -l
+}
+
+thumbs() { # DIRECTORY
+  count "$1" 'VELAPHOTO_THUMB_*.jpg'
+}
+
+has_thumbs() { # DIRECTORY NUMBER
+  (($(thumbs "$1") >= $2))
+}
+
+# Copies one photo under several names.
+make_tree() { # DIRECTORY NUMBER
+  local i
+  mkdir -p "$1"
+  for ((i = 0; i < $2; ++i)); do
+    cp "$SHARE/photos/camera.jpg" "$1/photo $i.jpg"
+  done
+}
+
+# Prints the photos of a tree that lack a thumbnail.
+incomplete_photos() { # DIRECTORY
+  local photo
+  find "$1" -type f ! -path '*/@eaDir/*' | while IFS= read -r photo; do
+    (($(thumbs "${photo%/*}/@eaDir/${photo##*/}") == ${#SIZES[@]})) || echo "$photo"
+  done
+}
+
+# Fails unless all photos of a directory have all thumbnails and nothing else is beside them.
+expect_complete() { # DIRECTORY PHOTOS
+  expect_equal "photos of $1 that lack a thumbnail" "$(incomplete_photos "$1")" ""
+  expect_equal "the number of thumbnails below $1" "$(thumbs "$1")" $(($2 * ${#SIZES[@]}))
+  expect_equal "the number of other files below $1" \
+    "$(find "$1" -path '*/@eaDir/*' -type f ! -name 'VELAPHOTO_THUMB_*.jpg' | wc -l)" 0
+}
+
+# Processes a tree to its end.
+process() { # DIRECTORY PHOTOS
+  add "R:$1"
+  wait_for 60 "all thumbnails of $1" has_thumbs "$1" $(($2 * ${#SIZES[@]}))
+  wait_for 20 "the end of the run" is_idle
+}
