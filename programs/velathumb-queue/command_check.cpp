@@ -1,7 +1,9 @@
 #include "command_check.h"
 
 #include <cstring>
+#include <string>
 
+#include "checks/configuration_check.h"
 #include "posix/files.h"
 #include "posix/service_log.h"
 #include "profiles/thumbnail_profile.h"
@@ -9,6 +11,16 @@
 namespace vela {
 
 namespace {
+
+/// Returns where the profile file has its first error, and which; empty when that is unknown.
+std::string FirstErrorIn(const std::string& profileFile) {
+  for (const Finding& finding : CheckProfile(profileFile).findings) {
+    if (finding.severity == Severity::kError && finding.line != 0) {
+      return ": line " + std::to_string(finding.line) + ": " + finding.message;
+    }
+  }
+  return {};
+}
 
 /// Returns why velathumb would make no thumbnail with this profile file, empty when it would.
 std::string FindProfileFault(const std::string& profileFile) {
@@ -18,7 +30,7 @@ std::string FindProfileFault(const std::string& profileFile) {
   }
   ThumbnailProfileList profiles;
   if (ParseThumbnailProfiles(profiles, profileFile, "/") == 0) {
-    return "cannot parse the profile " + profileFile;
+    return "cannot parse the profile " + profileFile + FirstErrorIn(profileFile);
   }
   if (GetProfileCount(profiles, kAllPhases) == 0) {
     return "the profile " + profileFile +

@@ -64,7 +64,7 @@ void LogAdditions(LogLevel level, const RunSettings& settings, const std::string
 }
 
 bool IsOtherRunning() {
-  return !TakeProcessLock(kLockFile, false).IsOpen() && errno == EAGAIN;
+  return StateOfProcessLock(kLockFile) == ProcessLockState::kHeld;
 }
 
 /// Returns whether a service does the work, which is logged.

@@ -55,7 +55,9 @@ TEST_F(CommandCheckTest, AProfileThatCannotBeUsedKeepsTheQueue) {
   const std::pair<std::string, std::string> cases[] = {
       {"/tmp/none.conf", "cannot read the profile /tmp/none.conf: No such file or directory"},
       {"/tmp/a\x1b.conf", "cannot read the profile /tmp/a\\x1b.conf: No such file or directory"},
-      {"/tmp/invalid.conf", "cannot parse the profile /tmp/invalid.conf"},
+      {"/tmp/invalid.conf",
+       "cannot parse the profile /tmp/invalid.conf: line 1: a section is a name in brackets, alone "
+       "in its line: \"[thumb_s\"; the whole file is rejected"},
       {"/tmp/directory", "cannot parse the profile /tmp/directory"},
       {"/tmp/empty.conf",
        "the profile /tmp/empty.conf defines no thumbnail, or photo_thumb_size_map excludes all of "
@@ -95,7 +97,8 @@ TEST_F(CommandCheckTest, AnEntryWhoseProfileHasBecomeUnusableIsNotDone) {
   const DaemonPeer daemon;
   EXPECT_EQ(EndOfRun(StubPlan().WriteFile(kProfiles, "[thumb_s\n")),
             "velathumb-queue: took 2 entries\n"
-            "velathumb-queue: cannot parse the profile /tmp/profiles.conf\n");
+            "velathumb-queue: cannot parse the profile /tmp/profiles.conf: line 1: a section is a "
+            "name in brackets, alone in its line: \"[thumb_s\"; the whole file is rejected\n");
   EXPECT_THAT(velathumb_.Entries(), ElementsAre("/tmp/a"));
 }
 
