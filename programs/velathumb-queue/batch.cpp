@@ -2,9 +2,12 @@
 
 #include <algorithm>
 #include <cerrno>
+#include <cstdlib>
 #include <utility>
 
+#include "command_check.h"
 #include "entry_check.h"
+#include "ipc/absent_daemon.h"
 #include "posix/service_log.h"
 #include "storage/unfinished_directories.h"
 
@@ -28,6 +31,16 @@ int StartProcess(const VelathumbCommand& command, std::string entry, pid_t& pid)
   std::string profileFile = command.profileFile;
   char* const arguments[] = {path.data(), profileFile.data(), entry.data(), nullptr};
   return StartAttachedChild(path.c_str(), arguments, pid);
+}
+
+/// Tells the velathumb that is started next whether the index daemon is known to be absent: it then
+/// need not log that for each photo.
+void TellAboutDaemon(bool isAbsent) {
+  if (isAbsent) {
+    setenv(kAbsentDaemonVariable, "1", 1);
+  } else {
+    unsetenv(kAbsentDaemonVariable);
+  }
 }
 
 /// Removes and returns what velathumb has noted about the directories of the entry.
@@ -70,12 +83,13 @@ std::optional<std::chrono::seconds> PostponementFor(int count) {
 }
 
 Batch::Batch(const RunSettings& settings, TakenQueue& taken, EventWait& events, PauseGate& gate,
-             EntryHistories& histories)
+             EntryHistories& histories, const ProgressLine& progress)
     : settings_(settings),
       taken_(taken),
       events_(events),
       gate_(gate),
       histories_(histories),
+      progress_(progress),
       plan_(taken.Entries()) {
   for (size_t number = 0; number < taken.Entries().size(); ++number) {
     const auto history = histories_.find(plan_.Entry(number));
@@ -86,6 +100,9 @@ Batch::Batch(const RunSettings& settings, TakenQueue& taken, EventWait& events, 
 }
 
 bool Batch::StartVelathumb(size_t number, std::vector<std::string> locked) {
+  FileVersion profile;
+  profile.Read(settings_.velathumb.profileFile.c_str());
+  TellAboutDaemon(gate_.IsDaemonAbsent());
   pid_t pid = 0;
   const int error = StartProcess(settings_.velathumb, plan_.Entry(number), pid);
   if (error != 0) {
@@ -95,7 +112,7 @@ bool Batch::StartVelathumb(size_t number, std::vector<std::string> locked) {
     return false;
   }
   StallWatch watch(ReadStallLimits(), Clock::now(), [pid] { return ActivityOf(pid); });
-  children_.emplace(pid, Child{number, std::move(locked), std::move(watch)});
+  children_.emplace(pid, Child{number, std::move(locked), profile, std::move(watch)});
   return true;
 }
 
@@ -107,7 +124,12 @@ bool Batch::StartEntry(size_t number) {
     return !failure_;
   }
   const EntryTarget target = TargetOf(entry);
-  std::vector<std::string> locked = FindLockedDirectories(target);
+  std::vector<std::string> locked =
+      FindSkippedDirectories(target, [this] { return events_.MustStop(); }).locked;
+  if (events_.MustStop()) {
+    plan_.Postpone(number, Clock::now());
+    return false;
+  }
   // The rest of a tree need not wait for one directory.
   if (!target.isTree && !locked.empty()) {
     PostponeUnfinished(number);
@@ -148,6 +170,30 @@ void Batch::Defer(size_t number, const std::string& reason) {
   WriteLog(LogLevel::kWarning, "deferred to a later run, " + reason + ": " + entry);
   ++deferred_;
   End(number);
+}
+
+/// Saves parts of a tree for a later run, which need not repeat the rest. Returns false when the
+/// entry itself was deferred or must stay.
+bool Batch::DeferReadOnlyParts(size_t number, const std::vector<std::string>& entries) {
+  if (entries.empty()) {
+    return true;
+  }
+  if (!AreEntries(entries)) {
+    Defer(number, "a part of it is mounted read-only");
+    return false;
+  }
+  const int error = taken_.Defer(entries);
+  if (error != 0) {
+    WriteLog(LogLevel::kError, "cannot defer a part of a tree", error);
+    FailToRecord(number);
+    return false;
+  }
+  for (const std::string& entry : entries) {
+    WriteLog(LogLevel::kWarning,
+             "deferred to a later run, its volume is mounted read-only: " + entry);
+    ++deferred_;
+  }
+  return true;
 }
 
 void Batch::Finish(size_t number) {
@@ -227,8 +273,28 @@ void Batch::HandleUnfinished(size_t number, const std::vector<std::string>& dire
   }
 }
 
+/// Returns false, having postponed the entry, when velathumb may have found a profile with which it
+/// skips directories, for instance one that was just being written.
+bool Batch::WasProfileUsable(const Child& child) {
+  const std::string& file = settings_.velathumb.profileFile;
+  FileVersion profile;
+  profile.Read(file.c_str());
+  // The first fault is the only one that is logged.
+  if (failure_ == RunEnd::kMisconfigured || !IsProfileUsable(file)) {
+    failure_ = RunEnd::kMisconfigured;
+  } else if (profile == child.profile ||
+             std::exchange(histories_[plan_.Entry(child.number)].hasSeenNewProfile, true)) {
+    return true;
+  }
+  plan_.Postpone(child.number, Clock::now());
+  return false;
+}
+
 /// velathumb exits with 0 also when it skipped a directory or stopped in it.
 void Batch::HandleSuccess(const Child& child) {
+  if (!WasProfileUsable(child)) {
+    return;
+  }
   const std::string& entry = plan_.Entry(child.number);
   const std::string obstacle = FindObstacle(entry);
   if (!obstacle.empty()) {
@@ -236,7 +302,16 @@ void Batch::HandleSuccess(const Child& child) {
     return;
   }
   const EntryTarget target = TargetOf(entry);
-  std::vector<std::string> unfinished = FindLockedDirectories(target);
+  SkippedDirectories skipped =
+      FindSkippedDirectories(target, [this] { return events_.MustStop(); });
+  if (target.isTree && events_.MustStop()) {
+    plan_.Postpone(child.number, Clock::now());
+    return;
+  }
+  if (!DeferReadOnlyParts(child.number, skipped.readOnly)) {
+    return;
+  }
+  std::vector<std::string>& unfinished = skipped.locked;
   Merge(unfinished, child.locked);
   Merge(unfinished, TakeNotesAbout(target));
   if (unfinished.empty()) {
@@ -367,13 +442,25 @@ std::optional<Batch::Clock::time_point> Batch::NextWake() const {
 
 std::optional<milliseconds> Batch::WaitTime() const {
   // New entries are not reported by every file system.
-  constexpr milliseconds kLongestWait = std::chrono::minutes(1);
+  constexpr milliseconds kUsualLimit = std::chrono::minutes(1);
+  const bool isShown = progress_.IsShown() && !children_.empty();
+  const milliseconds limit = isShown ? ProgressLine::kInterval : kUsualLimit;
   const auto wake = NextWake();
   if (!wake) {
-    return std::nullopt;
+    return isShown ? std::make_optional(limit) : std::nullopt;
   }
   const auto left = std::chrono::ceil<milliseconds>(*wake - Clock::now());
-  return std::clamp(left, milliseconds(0), kLongestWait);
+  return std::clamp(left, milliseconds(0), limit);
+}
+
+/// Of several velathumbs, shows the directory of the one with the lowest number.
+void Batch::ShowProgress() const {
+  if (children_.empty()) {
+    progress_.Hide();
+    return;
+  }
+  const auto& first = *children_.begin();
+  progress_.Update(first.first, plan_.Entry(first.second.number));
 }
 
 RunEnd Batch::Run() {
@@ -385,6 +472,7 @@ RunEnd Batch::Run() {
     if (plan_.IsFinished() || failure_) {
       break;
     }
+    ShowProgress();
     events_.Wait(WaitTime());
     ReapChildren();
     CheckProgress();

@@ -12,6 +12,8 @@
 #include "entry_plan.h"
 #include "posix/child_process.h"
 #include "posix/event_wait.h"
+#include "posix/file_version.h"
+#include "progress_line.h"
 #include "queue_run.h"
 #include "stall_watch.h"
 #include "taken_queue.h"
@@ -23,6 +25,7 @@ struct EntryHistory {
   int tries = 0;          ///< in which velathumb was killed or failed
   int postponements = 0;  ///< because velathumb could not process the directory
   EntryPlan::Clock::time_point notBefore;
+  bool hasSeenNewProfile = false;  ///< the profile has changed while velathumb was running
 };
 
 /// By entry. It outlives a batch, because entries can be put back into the queue.
@@ -36,7 +39,7 @@ std::optional<std::chrono::seconds> PostponementFor(int count);
 class Batch {
  public:
   Batch(const RunSettings& settings, TakenQueue& taken, EventWait& events, PauseGate& gate,
-        EntryHistories& histories);
+        EntryHistories& histories, const ProgressLine& progress);
 
   /// Returns kEmpty when all entries are done, deferred or back in the queue.
   RunEnd Run();
@@ -54,6 +57,7 @@ class Batch {
   struct Child {
     size_t number;
     std::vector<std::string> locked;  ///< directories of its entry that were locked at its start
+    FileVersion profile;              ///< at its start
     StallWatch watch;
   };
 
@@ -63,6 +67,7 @@ class Batch {
   void ReapChildren();
   void HandleEnd(const Child& child, int status);
   void HandleSuccess(const Child& child);
+  bool WasProfileUsable(const Child& child);
   void HandleUnfinished(size_t number, const std::vector<std::string>& directories);
   void CheckProgress();
   bool DoCheck(pid_t pid, Child& child);
@@ -71,11 +76,13 @@ class Batch {
   void GiveUp(size_t number, const std::string& reason);
   bool Split(size_t number, const std::string& reason);
   void Defer(size_t number, const std::string& reason);
+  bool DeferReadOnlyParts(size_t number, const std::vector<std::string>& entries);
   void Finish(size_t number);
   void End(size_t number);
   void FailToRecord(size_t number);
   void HandBack();
   void StopChildren();
+  void ShowProgress() const;
   std::optional<Clock::time_point> NextWake() const;
   std::optional<std::chrono::milliseconds> WaitTime() const;
 
@@ -84,6 +91,7 @@ class Batch {
   EventWait& events_;
   PauseGate& gate_;
   EntryHistories& histories_;
+  const ProgressLine& progress_;
   EntryPlan plan_;
   std::map<pid_t, Child> children_;
   int deferred_ = 0;

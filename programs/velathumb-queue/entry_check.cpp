@@ -1,17 +1,16 @@
 #include "entry_check.h"
 
+#include <cerrno>
 #include <cstdint>
 #include <cstring>
 #include <filesystem>
-#include <functional>
 #include <system_error>
 
 #include "platform/system_rules.h"
 #include "platform/velaindex.h"
 #include "platform/vlibc.h"
 #include "posix/file_lock.h"
-#include "posix/service_log.h"
-#include "profiles/thumbnail_profile.h"
+#include "posix/files.h"
 #include "storage/creation_queue.h"
 #include "storage/directory_tree.h"
 
@@ -27,20 +26,37 @@ std::string FindTreeFault(const std::string& path) {
   return EntryNameShouldIndex(name.c_str()) == 1 ? "" : "velathumb skips a tree of this name";
 }
 
+bool IsReadOnly(const std::string& directory) {
+  return CheckAccess(directory, FileAccess::kWrite) == EROFS;
+}
+
+/// Adds the entry for a directory that is mounted read-only, and for what is below it. Directories
+/// come before those below them; the path of a tree cannot contain a colon.
+void AddReadOnly(const std::string& directory, std::vector<std::string>& entries) {
+  const EntryTarget target{directory, false};
+  if (!entries.empty() && DoOverlap(TargetOf(entries.back()), target)) {
+    return;
+  }
+  const bool canBeTree = directory.find(':') == std::string::npos;
+  entries.push_back(canBeTree ? kTreePrefix + directory : directory);
+}
+
 bool IsDirectoryLocked(const std::string& directory) {
   return IsLocked(directory + "/" + kMetadataDirName);
 }
 
-void ForEachDirectory(const EntryTarget& target, const std::function<void(const char*)>& visit) {
+void ForEachDirectory(const EntryTarget& target, const std::function<void(const char*)>& visit,
+                      const std::function<bool()>& shouldStop = nullptr) {
   if (!target.isTree) {
     visit(target.directory.c_str());
     return;
   }
-  ForEachIndexedDirectory(target.directory.c_str(), [&](const char* path, bool isReadable) {
+  const auto visitReadable = [&](const char* path, bool isReadable) {
     if (isReadable) {
       visit(path);
     }
-  });
+  };
+  ForEachIndexedDirectory(target.directory.c_str(), visitReadable, shouldStop);
 }
 
 }  // namespace
@@ -72,6 +88,9 @@ std::string FindObstacle(const std::string& entry) {
   if (IsDirExist(directory.c_str()) == 0) {
     return "there is no such directory";
   }
+  if (IsReadOnly(directory)) {
+    return "its volume is mounted read-only";
+  }
   return VLIBGetFsAvailSize(directory.c_str()) < kLeastFreeSpace ? "its volume is nearly full" : "";
 }
 
@@ -81,25 +100,18 @@ std::vector<std::string> ListDirectories(const EntryTarget& target) {
   return directories;
 }
 
-std::vector<std::string> FindLockedDirectories(const EntryTarget& target) {
-  std::vector<std::string> locked;
-  ForEachDirectory(target, [&](const char* path) {
-    if (IsDirectoryLocked(path)) {
-      locked.emplace_back(path);
+SkippedDirectories FindSkippedDirectories(const EntryTarget& target,
+                                          const std::function<bool()>& shouldStop) {
+  SkippedDirectories skipped;
+  const auto examine = [&](const char* path) {
+    if (IsReadOnly(path)) {
+      AddReadOnly(path, skipped.readOnly);
+    } else if (IsDirectoryLocked(path)) {
+      skipped.locked.emplace_back(path);
     }
-  });
-  return locked;
-}
-
-bool IsProfileUsable(const std::string& profileFile) {
-  ThumbnailProfileList profiles;
-  if (IsFileExist(profileFile.c_str()) != 0 &&
-      ParseThumbnailProfiles(profiles, profileFile, "/") != 0 &&
-      GetProfileCount(profiles, kAllPhases) > 0) {
-    return true;
-  }
-  WriteLog(LogLevel::kError, "no profile file, or no thumbnail in it: " + profileFile);
-  return false;
+  };
+  ForEachDirectory(target, examine, shouldStop);
+  return skipped;
 }
 
 }  // namespace vela

@@ -2,6 +2,7 @@
 // exit status 0.
 #pragma once
 
+#include <functional>
 #include <string>
 #include <vector>
 
@@ -14,18 +15,22 @@ namespace vela {
 std::string CheckAddition(std::string& entry);
 
 /// Returns why the entry cannot be processed now, empty when it can: its directory must exist, and
-/// its volume have enough free space.
+/// its volume be writable and have enough free space.
 std::string FindObstacle(const std::string& entry);
 
-/// Returns the directories of the entry that velathumb would skip, because another process holds a
-/// lock on their metadata directory.
-std::vector<std::string> FindLockedDirectories(const EntryTarget& target);
+/// The directories of an entry that velathumb would skip.
+struct SkippedDirectories {
+  /// Another process holds a lock on their metadata directory.
+  std::vector<std::string> locked;
+  /// On a part of the tree that is mounted read-only: an entry for each part.
+  std::vector<std::string> readOnly;
+};
+
+/// Searches the directories of the entry. Ends early when `shouldStop` returns true.
+SkippedDirectories FindSkippedDirectories(const EntryTarget& target,
+                                          const std::function<bool()>& shouldStop = nullptr);
 
 /// Returns the directories of the entry that velathumb would process.
 std::vector<std::string> ListDirectories(const EntryTarget& target);
-
-/// Returns whether velathumb can read the profile file and it defines a thumbnail; logs when not.
-/// Without a usable profile velathumb skips every directory, and each entry would count as done.
-bool IsProfileUsable(const std::string& profileFile);
 
 }  // namespace vela

@@ -1,40 +1,50 @@
 // velathumb-queue [OPTION]...
 //
-// Processes the photo queue.
+// Processes the photo queue, or adds entries to it for the service that does.
+
+#include <sysexits.h>
 
 #include <cerrno>
 #include <string>
-#include <vector>
+#include <utility>
 
+#include "additions.h"
+#include "checks/configuration_check.h"
 #include "cli/command_line.h"
-#include "entry_check.h"
+#include "command_check.h"
 #include "options.h"
-#include "platform/velaindex.h"
-#include "platform/vlibc.h"
 #include "posix/file_descriptor.h"
 #include "posix/file_lock.h"
-#include "posix/files.h"
 #include "posix/service_log.h"
 #include "queue_run.h"
+#include "service_state.h"
 #include "storage/creation_queue.h"
 
 namespace vela {
 
 namespace {
 
-constexpr int kEmpty = 0;
+/// The queue is empty, or the entries were left to another runner.
+constexpr int kDone = 0;
 constexpr int kEntriesLeft = 1;
 constexpr int kError = 2;
+/// Nothing but a change of the configuration helps: systemd need not start the program again.
+constexpr int kMisconfigured = EX_CONFIG;
 
-constexpr char kLockFile[] = "/var/run/velathumb-queue.lock";
+constexpr const char* kLockFile = kQueueRunnerLock;
+
+/// How long systemd is waited for. A machine on which it does not answer is in trouble anyway.
+constexpr std::chrono::seconds kServiceLimit(2);
 
 int ToExitStatus(RunEnd end) {
   switch (end) {
     case RunEnd::kEmpty:
-      return kEmpty;
+      return kDone;
     case RunEnd::kDeferred:
     case RunEnd::kStopped:
       return kEntriesLeft;
+    case RunEnd::kMisconfigured:
+      return kMisconfigured;
     case RunEnd::kFailed:
     case RunEnd::kNotRecorded:
       break;
@@ -42,64 +52,84 @@ int ToExitStatus(RunEnd end) {
   return kError;
 }
 
-/// Makes the paths of the entries absolute. Returns false when one cannot be added, which is
-/// logged.
-bool CheckAdditions(std::vector<std::string>& entries) {
-  for (std::string& entry : entries) {
-    const std::string fault = CheckAddition(entry);
-    if (!fault.empty()) {
-      WriteLog(LogLevel::kError, "cannot add " + entry + ": " + fault);
-      return false;
-    }
-  }
-  return true;
+/// Returns whether the entries that were added are processed here even if a service could do that.
+bool WantsWorkHere(const RunSettings& settings) {
+  return settings.now || settings.wait || settings.follow;
 }
 
-/// Returns false when an entry cannot be appended, which is logged.
-bool AddToQueue(const std::vector<std::string>& entries) {
-  for (const std::string& entry : entries) {
-    if (WriteIndexQueue(entry.c_str(), kPhotoQueue.file) != 0) {
-      WriteLog(LogLevel::kError, "cannot append to " + std::string(kPhotoQueue.file) + ": " + entry,
-               VLIBCErrGet());
-      return false;
-    }
-  }
-  return true;
+/// Says who processes the entries that were added.
+void LogAdditions(LogLevel level, const RunSettings& settings, const std::string& worker) {
+  const std::string end = worker.empty() ? "" : "; " + worker;
+  WriteLog(level, DescribeAdditions(settings.additions) + end);
 }
 
-/// Returns false when the entries cannot be added, which is logged.
-bool AppendEntries(const std::vector<std::string>& entries) {
-  if (entries.empty()) {
-    return true;
-  }
-  if (!AddToQueue(entries)) {
+bool IsOtherRunning() {
+  return !TakeProcessLock(kLockFile, false).IsOpen() && errno == EAGAIN;
+}
+
+/// Returns whether a service does the work, which is logged.
+bool LeaveToService(const RunSettings& settings) {
+  const ServiceState state = AskForService(kServiceLimit);
+  if (!HasService(state)) {
     return false;
   }
-  // The runner may have taken the queue meanwhile.
-  int error = SyncFile(kPhotoQueue.file);
-  if (error == 0 || error == ENOENT) {
-    error = SyncDirectoryOf(kPhotoQueue.file);
+  const ServiceText service = DescribeService(state);
+  if (service.needsAction && IsOtherRunning()) {
+    LogAdditions(LogLevel::kInfo, settings, kRunningText);
+    return true;
   }
-  if (error != 0) {
-    WriteLog(LogLevel::kError, std::string("cannot write to the disk: ") + kPhotoQueue.file, error);
-  }
-  return error == 0;
+  LogAdditions(service.needsAction ? LogLevel::kWarning : LogLevel::kInfo, settings, service.text);
+  return true;
 }
 
-int RunAlone(RunSettings& settings) {
-  if (!CheckAdditions(settings.additions) || !AppendEntries(settings.additions)) {
+/// The end of a program that cannot take the lock, for the reason `error`.
+int EndWithoutLock(const RunSettings& settings, int error) {
+  if (error == EAGAIN) {
+    WriteLog(LogLevel::kInfo, settings.additions.empty()
+                                  ? "another velathumb-queue is already running"
+                                  : kRunningText);
+    return settings.additions.empty() || WantsWorkHere(settings) ? kEntriesLeft : kDone;
+  }
+  WriteLog(LogLevel::kError, DescribeRefusal("lock " + std::string(kLockFile), error));
+  return kError;
+}
+
+int ProcessQueue(const RunSettings& settings, FileDescriptor lock) {
+  if (!IsCommandUsable(settings.velathumb)) {
+    return kMisconfigured;
+  }
+  if (!lock.IsOpen()) {
+    lock = TakeProcessLock(kLockFile, settings.wait);
+  }
+  if (!lock.IsOpen()) {
+    return EndWithoutLock(settings, errno);
+  }
+  LogFindings(settings.velathumb.profileFile);
+  return ToExitStatus(RunQueue(settings));
+}
+
+int AddAndProcess(const RunSettings& settings) {
+  // Before the entries are in the queue: then systemd starts the service, which must not be faster.
+  FileDescriptor lock;
+  if (WantsWorkHere(settings)) {
+    lock = TakeProcessLock(kLockFile, false);
+  }
+  if (!AppendEntries(settings.additions)) {
     return kError;
   }
-  const FileDescriptor lock = TakeProcessLock(kLockFile, settings.wait);
-  if (lock.IsOpen()) {
-    return ToExitStatus(RunQueue(settings));
+  if (!settings.queueOnly && !WantsWorkHere(settings) && LeaveToService(settings)) {
+    return kDone;
   }
-  if (errno == EAGAIN || errno == EACCES) {
-    WriteLog(LogLevel::kInfo, "another velathumb-queue is already running");
-    return kEntriesLeft;
+  LogAdditions(LogLevel::kInfo, settings, "");
+  return settings.queueOnly ? kDone : ProcessQueue(settings, std::move(lock));
+}
+
+int Run(RunSettings& settings) {
+  if (!CheckAdditions(settings.additions)) {
+    return kError;
   }
-  WriteLog(LogLevel::kError, std::string("cannot lock ") + kLockFile, errno);
-  return kError;
+  return settings.additions.empty() ? ProcessQueue(settings, FileDescriptor())
+                                    : AddAndProcess(settings);
 }
 
 }  // namespace
@@ -107,5 +137,5 @@ int RunAlone(RunSettings& settings) {
 }  // namespace vela
 
 int main(int argc, char** argv) {
-  return vela::RunProgram(argc, argv, vela::ParseOptions, vela::RunAlone, vela::kError);
+  return vela::RunProgram(argc, argv, vela::ParseOptions, vela::Run, vela::kError);
 }

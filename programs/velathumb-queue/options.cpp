@@ -6,8 +6,7 @@
 #include <string>
 #include <system_error>
 
-#include "posix/files.h"
-#include "posix/service_log.h"
+#include "checks/configuration_check.h"
 
 namespace vela {
 
@@ -16,8 +15,10 @@ namespace {
 constexpr ProgramText kProgramText = {
     "velathumb-queue",
     "Processes the queue of directories that need thumbnails: runs velathumb for each entry.",
-    "Exit status: 0 the queue is empty, 1 entries are left for a later run: stopped by a signal,\n"
-    "entries that cannot be processed now, or another velathumb-queue is running; 2 error."};
+    "Exit status: 0 the queue is empty, or the entries were queued for a service, 1 entries are "
+    "left for a later run: stopped by a signal,\n"
+    "entries that cannot be processed now, or another velathumb-queue is running; 2 error;\n"
+    "78 velathumb cannot be started, or its profile cannot be used."};
 
 void AddOptions(CLI::App& app, RunSettings& settings) {
   app.add_flag("-f,--follow", settings.follow, "keep running and wait for new entries");
@@ -26,10 +27,12 @@ void AddOptions(CLI::App& app, RunSettings& settings) {
       ->type_name("N")
       ->check(CLI::Range(1, 256));
   app.add_option("-a,--add", settings.additions,
-                 "append ENTRY to the queue first: a directory, or R: and a directory; may be "
-                 "repeated")
+                 "append ENTRY to the queue: a directory, or R: and a directory; may be repeated; "
+                 "the work is left to the service, if there is one")
       ->type_name("ENTRY")
       ->allow_extra_args(false);
+  app.add_flag("--now", settings.now, "with --add: process the queue here, also with a service");
+  app.add_flag("--queue-only", settings.queueOnly, "with --add: do not process the queue");
   app.add_option("-p,--profile", settings.velathumb.profileFile, "profile file for velathumb")
       ->type_name("FILE")
       ->capture_default_str();
@@ -43,42 +46,33 @@ void AddOptions(CLI::App& app, RunSettings& settings) {
                "thumbnails and converted videos of these videos");
 }
 
-/// Returns whether the file has the access that velathumb needs; otherwise that is logged.
-bool IsUsable(const std::string& file, FileAccess access) {
-  const int error = CheckAccess(file, access);
-  if (error != 0) {
-    WriteLog(LogLevel::kError, file, error);
+/// Returns why the options contradict each other, empty when they do not.
+std::string FindConflict(const RunSettings& settings) {
+  if (settings.queueOnly && settings.additions.empty()) {
+    return "--queue-only needs --add";
   }
-  return error == 0;
+  if (settings.queueOnly && (settings.now || settings.wait || settings.follow)) {
+    return "--queue-only excludes --now, --wait and --follow";
+  }
+  return {};
 }
 
-/// Returns the directory that this program was installed into.
-std::filesystem::path OwnDirectory() {
-  std::error_code error;
-  return std::filesystem::read_symlink("/proc/self/exe", error).parent_path();
-}
-
-/// Returns the velathumb and the profile file that were installed together with this program.
+/// Returns the velathumb that was installed together with this program, and the profile file for
+/// it.
 VelathumbCommand InstalledVelathumb() {
-  const std::filesystem::path programs = OwnDirectory();
-  const auto profiles = programs.parent_path() / "share/velathumb/thumb-profiles.conf";
-  return {(programs / "velathumb").string(), profiles.string()};
+  std::error_code error;
+  const auto program = std::filesystem::read_symlink("/proc/self/exe", error);
+  return {(program.parent_path() / "velathumb").string(), DefaultProfileFile()};
 }
 
 }  // namespace
 
 ParseOutcome ParseOptions(int argc, char** argv, RunSettings& settings) {
   settings.velathumb = InstalledVelathumb();
-  const ParseOutcome outcome = ParseCommandLine(kProgramText, ArgumentsOf(argc, argv),
-                                                [&](CLI::App& app) { AddOptions(app, settings); });
-  if (outcome != ParseOutcome::kRun) {
-    return outcome;
-  }
-  // velathumb silently ignores a missing profile, and every entry would count as done.
-  return IsUsable(settings.velathumb.path, FileAccess::kExecute) &&
-                 IsUsable(settings.velathumb.profileFile, FileAccess::kRead)
-             ? ParseOutcome::kRun
-             : ParseOutcome::kUsageError;
+  const auto findConflict = [&](const CLI::App&) { return FindConflict(settings); };
+  return ParseCommandLine(
+      kProgramText, ArgumentsOf(argc, argv), [&](CLI::App& app) { AddOptions(app, settings); },
+      findConflict);
 }
 
 }  // namespace vela

@@ -63,13 +63,14 @@ int CountFailures(const std::string& path, const PhotoThumbStates& thumbs) {
 
 }  // namespace
 
-void ProgressTotals::CountDirectory(const char* path, Sums& sums) const {
+void ProgressTotals::CountDirectory(const char* path, const StopCheck& shouldStop,
+                                    Sums& sums) const {
   FileIdentity directory;
   if (IdentifyDirectory(path, directory) != 0 || !sums.directories.insert(directory).second) {
     return;
   }
   const bool wasCounted = counted_.count(directory) != 0;
-  ForEachPhotoStatus(path, [&](const std::string& photo, const PhotoThumbStates& thumbs) {
+  const auto count = [&](const std::string& photo, const PhotoThumbStates& thumbs) {
     const int missing = thumbs.Missing();
     if (missing == 0) {
       return;
@@ -79,21 +80,23 @@ void ProgressTotals::CountDirectory(const char* path, Sums& sums) const {
     const int failures = wasCounted ? CountFailures(photo, thumbs) : 0;
     sums.failedPhotos += failures > 0 ? 1 : 0;
     sums.failedThumbs += failures;
-  });
+  };
+  ForEachPhotoStatus(path, count, shouldStop);
 }
 
 void ProgressTotals::CountEntry(const std::string& entry, const StopCheck& shouldStop,
                                 Sums& sums) const {
   const EntryTarget target = TargetOf(entry);
   if (!target.isTree) {
-    CountDirectory(target.directory.c_str(), sums);
+    CountDirectory(target.directory.c_str(), shouldStop, sums);
     return;
   }
-  ForEachIndexedDirectory(target.directory.c_str(), [&](const char* path, bool isReadable) {
-    if (isReadable && !shouldStop()) {
-      CountDirectory(path, sums);
+  const auto count = [&](const char* path, bool isReadable) {
+    if (isReadable) {
+      CountDirectory(path, shouldStop, sums);
     }
-  });
+  };
+  ForEachIndexedDirectory(target.directory.c_str(), count, shouldStop);
 }
 
 void ProgressTotals::Reset() {

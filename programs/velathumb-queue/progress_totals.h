@@ -31,7 +31,7 @@ class ProgressTotals {
   struct Sums;
 
   void CountEntry(const std::string& entry, const StopCheck& shouldStop, Sums& sums) const;
-  void CountDirectory(const char* path, Sums& sums) const;
+  void CountDirectory(const char* path, const StopCheck& shouldStop, Sums& sums) const;
 
   const bool countVideos_;
   std::set<FileIdentity> counted_;  // directories in earlier queues of this run

@@ -10,10 +10,11 @@
 #include <vector>
 
 #include "batch.h"
+#include "command_check.h"
 #include "conversion_pause.h"
-#include "entry_check.h"
 #include "posix/event_wait.h"
 #include "posix/service_log.h"
+#include "progress_line.h"
 #include "progress_totals.h"
 #include "storage/unfinished_directories.h"
 #include "taken_queue.h"
@@ -81,6 +82,7 @@ class QueueRun {
   EventWait events_;
   PauseGate gate_;
   EntryHistories histories_;
+  ProgressLine progress_;
   bool isIdle_ = true;                            // no entry was in progress before
   bool hasHandedBack_ = false;                    // in the last round
   bool hasDeferred_ = false;                      // entries are left for a later run
@@ -112,10 +114,7 @@ void QueueRun::SetTotals(TakenQueue::Outcome outcome) {
     totals_.Reset();
   }
   isIdle_ = false;
-  totals_.Set(taken_.Entries(), [this] {
-    events_.Wait(milliseconds(0));
-    return events_.IsStopping();
-  });
+  totals_.Set(taken_.Entries(), [this] { return events_.MustStop(); });
 }
 
 /// Repeats `act` while it finds a file locked. Returns its last result: EWOULDBLOCK when a signal
@@ -150,7 +149,7 @@ RunEnd QueueRun::ProcessTaken(TakenQueue::Outcome outcome) {
     return RunEnd::kStopped;
   }
   SetTotals(outcome);
-  Batch batch(settings_, taken_, events_, gate_, histories_);
+  Batch batch(settings_, taken_, events_, gate_, histories_, progress_);
   const RunEnd end = batch.Run();
   hasHandedBack_ = batch.HasHandedBack();
   hasDeferred_ = hasDeferred_ || batch.DeferredCount() > 0;
@@ -209,6 +208,7 @@ void QueueRun::WaitForEntries() {
   // The watch reports every new queue; the limit is for file systems that report nothing.
   constexpr milliseconds kLongestWait = std::chrono::minutes(1);
   isIdle_ = true;
+  progress_.Hide();
   repeats_.clear();
   seen_.clear();
   histories_.clear();
@@ -266,7 +266,7 @@ void QueueRun::QueueUnfinished() {
 /// Takes the pending entries and processes them. Sets `isIdle` when there are none.
 RunEnd QueueRun::RunRound(bool& isIdle) {
   if (!IsProfileUsable(settings_.velathumb.profileFile)) {
-    return RunEnd::kFailed;
+    return RunEnd::kMisconfigured;
   }
   QueueUnfinished();
   const TakenQueue::Outcome outcome = taken_.Take();

@@ -53,6 +53,14 @@ void EventWait::ReadSignals() {
   }
 }
 
+bool EventWait::MustStop() const {
+  sigset_t pending;
+  if (isStopping_ || sigpending(&pending) != 0) {
+    return isStopping_;
+  }
+  return sigismember(&pending, SIGTERM) == 1 || sigismember(&pending, SIGINT) == 1;
+}
+
 void EventWait::DiscardChanges() {
   alignas(inotify_event) char events[4096];
   while (read(changes_.Get(), events, sizeof events) > 0) {

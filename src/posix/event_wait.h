@@ -26,8 +26,12 @@ class EventWait {
   /// the caller has to check for the other events.
   void Wait(std::optional<std::chrono::milliseconds> timeout);
 
-  /// Returns whether SIGTERM or SIGINT was received.
+  /// Returns whether a Wait has received SIGTERM or SIGINT.
   bool IsStopping() const { return isStopping_; }
+
+  /// Returns the same also when the signal has come since the last Wait. Takes no event away from
+  /// the next one, so that long work can ask in between.
+  bool MustStop() const;
 
  private:
   void ReadSignals();

@@ -137,7 +137,7 @@ int TryProcessLock(const std::string& path, bool wait, FileDescriptor& file, boo
   }
   // Whoever can only read the file can hold a read lock, but only its owner a write lock.
   if (!LockForProcess(file.Get(), isPrivate ? F_WRLCK : F_RDLCK, wait)) {
-    return errno;
+    return errno == EACCES ? EAGAIN : errno;
   }
   if (!IsAtPath(file.Get(), path, Links::kNotFollowed)) {
     return 0;
@@ -319,6 +319,21 @@ int LockFileAt(const std::string& path, LockPatience& patience, LockedFile& lock
 bool IsLocked(const std::string& path) {
   const FileDescriptor directory = FolderEntry(path).Open(O_RDONLY | O_DIRECTORY);
   return directory.IsOpen() && TryLockExclusively(directory.Get()) == EWOULDBLOCK;
+}
+
+ProcessLockState StateOfProcessLock(const std::string& path) {
+  constexpr int kFlags = O_RDONLY | O_NOFOLLOW | O_NONBLOCK | O_NOCTTY | O_CLOEXEC;
+  const FileDescriptor file(open(path.c_str(), kFlags));
+  if (!file.IsOpen()) {
+    return errno == EACCES || errno == EPERM ? ProcessLockState::kUnknown : ProcessLockState::kFree;
+  }
+  struct flock whole = {};
+  whole.l_type = F_WRLCK;
+  whole.l_whence = SEEK_SET;
+  if (fcntl(file.Get(), F_GETLK, &whole) != 0) {
+    return ProcessLockState::kUnknown;
+  }
+  return whole.l_type == F_UNLCK ? ProcessLockState::kFree : ProcessLockState::kHeld;
 }
 
 FileDescriptor TakeProcessLock(const std::string& path, bool wait) {

@@ -107,9 +107,20 @@ bool IsLocked(const std::string& path);
 /// Opens the lock file `path`, created for its owner only when missing, and takes a lock that no
 /// child inherits: it is released when this process ends. With `wait`, waits for the current
 /// holder. A file that other users can open, as earlier versions created it, is replaced: their
-/// locks do not count. Returns the open file, or none with errno set: EAGAIN or EACCES when another
-/// process of this user has the lock, otherwise also when something other than a regular file of
-/// this user is at `path`.
+/// locks do not count. Returns the open file, or none with errno set: EAGAIN when another process
+/// of this user has the lock, EACCES or EPERM when this user may not open the file, otherwise also
+/// when something other than a regular file of this user is at `path`.
 FileDescriptor TakeProcessLock(const std::string& path, bool wait);
+
+/// Whether a process holds the lock of TakeProcessLock.
+enum class ProcessLockState {
+  kFree,
+  kHeld,
+  kUnknown,  ///< this user may not open the lock file
+};
+
+/// Returns the state of the lock at `path`. Neither creates the file nor takes a lock, so that
+/// nobody who takes the lock at that moment is refused.
+ProcessLockState StateOfProcessLock(const std::string& path);
 
 }  // namespace vela

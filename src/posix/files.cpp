@@ -70,8 +70,20 @@ int IdentifyDirectory(const std::string& path, FileIdentity& identity) {
   return status->isDirectory ? 0 : ENOTDIR;
 }
 
+int ModeOf(FileAccess access) {
+  switch (access) {
+    case FileAccess::kRead:
+      return R_OK;
+    case FileAccess::kWrite:
+      return W_OK;
+    case FileAccess::kExecute:
+      break;
+  }
+  return X_OK;
+}
+
 int CheckAccess(const std::string& path, FileAccess access) {
-  const int mode = access == FileAccess::kRead ? R_OK : X_OK;
+  const int mode = ModeOf(access);
   if (faccessat(AT_FDCWD, path.c_str(), mode, AT_EACCESS) == 0) {
     return 0;
   }

@@ -60,6 +60,7 @@ int IdentifyDirectory(const std::string& path, FileIdentity& identity);
 /// Kinds of access to a file.
 enum class FileAccess {
   kRead,
+  kWrite,    ///< for a directory: change the names in it
   kExecute,  ///< for a directory: look up names in it
 };
 

@@ -23,7 +23,8 @@ int32_t DirectorySizeMap(const char* dir) {
 
 namespace vela {
 
-bool ForEachPhotoStatus(const char* dir, const PhotoStatusVisitor& visit) {
+bool ForEachPhotoStatus(const char* dir, const PhotoStatusVisitor& visit,
+                        const std::function<bool()>& shouldStop) {
   if (IsDirExist(dir) == 0) {
     return false;
   }
@@ -36,6 +37,9 @@ bool ForEachPhotoStatus(const char* dir, const PhotoStatusVisitor& visit) {
   const HeldFolder metadataRoot(JoinPath(dir, kMetadataDirName));
   const int32_t sizeMap = DirectorySizeMap(dir);
   while (const char* name = entries.NextName()) {
+    if (shouldStop && shouldStop()) {
+      break;
+    }
     if (EntryNameShouldIndex(name) != 1) {
       continue;
     }

@@ -266,5 +266,24 @@ TEST_F(Folder, LeavesNoDescriptor) {
   EXPECT_EQ(ListDirectory("/proc/self/fd").size(), before);
 }
 
+TEST_F(Folder, ScratchDirectoryIsPrivateAndGoesWithItsFiles) {
+  std::string path;
+  {
+    const ScratchDirectory scratch;
+    path = scratch.Path();
+    ASSERT_EQ(path.find("/tmp/velathumb."), 0U);
+    struct stat status = {};
+    ASSERT_EQ(lstat(path.c_str(), &status), 0);
+    EXPECT_EQ(status.st_mode, S_IFDIR | 0700U);
+    WriteFile(In("kept"), "content");
+    WriteFile(path + "/file", "content");
+    ASSERT_EQ(symlink(In("kept").c_str(), (path + "/link").c_str()), 0);
+    const ScratchDirectory other;
+    EXPECT_NE(other.Path(), path);
+  }
+  EXPECT_FALSE(Exists(path));
+  EXPECT_TRUE(Exists(In("kept")));
+}
+
 }  // namespace
 }  // namespace vela_test

@@ -86,8 +86,7 @@ std::optional<ProgramResult> Machine::StopDaemon() {
 }
 
 void Machine::StartFollowingRunner() {
-  runner_ =
-      StartProgram(BuiltPath(VELATHUMB_QUEUE_FILE), RunnerArguments({"--follow", "--jobs", "2"}));
+  runner_ = StartRunner({"--follow", "--jobs", "2"});
 }
 
 void Machine::KillRunner() {
@@ -111,6 +110,10 @@ std::vector<pid_t> Machine::Velathumbs() {
 bool Machine::KillVelathumb() {
   const std::vector<pid_t> processes = Velathumbs();
   return !processes.empty() && kill(processes.front(), SIGKILL) == 0;
+}
+
+Program Machine::StartRunner(const std::vector<std::string>& more) {
+  return StartProgram(BuiltPath(VELATHUMB_QUEUE_FILE), RunnerArguments(more));
 }
 
 ProgramResult Machine::RunRunner(const std::vector<std::string>& more) {

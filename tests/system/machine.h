@@ -36,6 +36,9 @@ class Machine {
   static bool KillVelathumb();
   static std::vector<pid_t> Velathumbs();
 
+  /// Starts a runner that ends when the queue is empty.
+  static Program StartRunner(const std::vector<std::string>& more = {});
+
   /// Runs a runner until the queue is empty, one job at a time.
   static ProgramResult RunRunner(const std::vector<std::string>& more = {});
 

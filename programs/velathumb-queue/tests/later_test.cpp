@@ -74,6 +74,65 @@ TEST_F(LaterTest, AVolumeThatBecomesNearlyFullIsRepeated) {
   ExpectRun({"/tmp/small", "/tmp/small"});
 }
 
+TEST_F(LaterTest, AReadOnlyVolumeIsDeferredUntilItIsWritable) {
+  MakeDirectories("/tmp/disc");
+  Enqueue({"/tmp/disc/a", "R:/tmp/disc/tree", "/tmp/a"});
+  {
+    const ReadOnlyMount disc("/tmp/disc");
+    EXPECT_THAT(ExpectRunDefers({"/tmp/disc/a", "R:/tmp/disc/tree"}),
+                AllOf(HasSubstr("velathumb-queue: deferred to a later run, its volume is mounted "
+                                "read-only: /tmp/disc/a\n"),
+                      HasSubstr("velathumb-queue: deferred to a later run, its volume is mounted "
+                                "read-only: R:/tmp/disc/tree\n")));
+  }
+  EXPECT_THAT(velathumb_.Entries(), ElementsAre("/tmp/a"));
+  ExpectRun({"/tmp/a", "/tmp/disc/a", "R:/tmp/disc/tree"});
+}
+
+/// A file system can also be made read-only because of an error.
+TEST_F(LaterTest, AVolumeThatBecomesReadOnlyIsDeferred) {
+  velathumb_.Stub().PlanCall(1, StubPlan().CreateFile("/tmp/here").WaitForFile("/tmp/go"));
+  Enqueue({"/tmp/disc"});
+  Program runner = velathumb_.Start();
+  ASSERT_TRUE(WaitUntilExists("/tmp/here"));
+  {
+    const ReadOnlyMount disc("/tmp/disc");
+    Release();
+    ExpectEnd(runner, 1);
+    ExpectDeferred({"/tmp/disc"});
+  }
+  ExpectRun({"/tmp/disc", "/tmp/disc"});
+}
+
+TEST_F(LaterTest, OfATreeOnlyThePartsThatAreReadOnlyAreDeferred) {
+  for (const char* directory : {"/tmp/t/a/below", "/tmp/t/b:c/below", "/tmp/t/d"}) {
+    MakeDirectories(directory);
+  }
+  Enqueue({"R:/tmp/t"});
+  {
+    const ReadOnlyMount a("/tmp/t/a");
+    const ReadOnlyMount b("/tmp/t/b:c");
+    EXPECT_EQ(velathumb_.Run().exitCode, 1);
+  }
+  const std::string later = ReadFile(kLaterFile);
+  EXPECT_THAT(later, AnyOf(Lines({"R:/tmp/t/a", "/tmp/t/b:c", "/tmp/t/b:c/below"}),
+                           Lines({"/tmp/t/b:c", "/tmp/t/b:c/below", "R:/tmp/t/a"})));
+  EXPECT_EQ(velathumb_.Run().exitCode, 0);
+  EXPECT_THAT(velathumb_.Entries(),
+              UnorderedElementsAre("R:/tmp/t", "R:/tmp/t/a", "/tmp/t/b:c", "/tmp/t/b:c/below"));
+  ExpectQueueDone();
+}
+
+TEST_F(LaterTest, ATreeWithAReadOnlyPartThatCannotBeAnEntryIsDeferredAsAWhole) {
+  MakeDirectories("/tmp/t/a\nb");
+  Enqueue({"R:/tmp/t"});
+  {
+    const ReadOnlyMount part("/tmp/t/a\nb");
+    ExpectRunDefers({"R:/tmp/t"});
+  }
+  ExpectRun({"R:/tmp/t", "R:/tmp/t"});
+}
+
 /// Takes a minute: the pauses between the tries become longer and longer.
 TEST_F(LaterTest, AnEntryWhoseVelathumbIsKilledEachTimeIsDeferred) {
   velathumb_.Stub().PlanWhen("/tmp/a", StubPlan().DieBySignal(SIGKILL));
@@ -111,7 +170,7 @@ TEST_F(LaterTest, AProfileThatBecomesUnusableEndsAFollowingRunnerBeforeItTakes) 
   EXPECT_FALSE(runner.Wait(milliseconds(200)));
   WriteFile(kProfiles, "[thumb_s\n");
   Enqueue({"/tmp/a"});
-  ExpectEnd(runner, 2);
+  ExpectEnd(runner, 78);
   EXPECT_EQ(ReadFile(kQueueFile), "/tmp/a\n");
   EXPECT_THAT(velathumb_.Entries(), IsEmpty());
 }

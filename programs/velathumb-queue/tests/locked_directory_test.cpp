@@ -113,7 +113,8 @@ TEST_P(LockedDirectoryTest, IsDeferredToALaterRunInTheEnd) {
   EventWait events;
   PauseGate gate;
   EntryHistories histories = {{"/tmp/p", {0, 10, {}}}};
-  Batch batch(settings, taken, events, gate, histories);
+  const ProgressLine progress;
+  Batch batch(settings, taken, events, gate, histories, progress);
   EXPECT_EQ(batch.Run(), RunEnd::kEmpty);
   EXPECT_EQ(batch.DeferredCount(), 1);
   EXPECT_EQ(ReadFile(kLaterFile), "/tmp/p\n");
@@ -141,16 +142,16 @@ TEST_F(LockProbeTest, FollowsTheLinksThatVelathumbFollows) {
   const Descriptor held = LockDirectory("/tmp/elsewhere", LOCK_EX);
   MakeDirectories("/tmp/p");
   ASSERT_EQ(symlink("/tmp/elsewhere", "/tmp/p/@eaDir"), 0);
-  EXPECT_THAT(FindLockedDirectories({"/tmp/p", false}), ElementsAre("/tmp/p"));
+  EXPECT_THAT(FindSkippedDirectories({"/tmp/p", false}).locked, ElementsAre("/tmp/p"));
   if (HasOtherUsers()) {
     ASSERT_EQ(lchown("/tmp/p/@eaDir", 1, 1), 0);
-    EXPECT_THAT(FindLockedDirectories({"/tmp/p", false}), IsEmpty());
+    EXPECT_THAT(FindSkippedDirectories({"/tmp/p", false}).locked, IsEmpty());
   }
 }
 
 TEST_F(LockProbeTest, LeavesNoLock) {
   MakeDirectories("/tmp/p/@eaDir");
-  EXPECT_THAT(FindLockedDirectories({"/tmp/p", false}), IsEmpty());
+  EXPECT_THAT(FindSkippedDirectories({"/tmp/p", false}).locked, IsEmpty());
   LockDirectory("/tmp/p/@eaDir", LOCK_EX | LOCK_NB);
 }
 

@@ -6,6 +6,7 @@
 #include <cerrno>
 
 #include "queue_fixture.h"
+#include "support/daemon_peer.h"
 #include "support/descriptor.h"
 
 namespace vela_test {
@@ -15,12 +16,12 @@ using namespace ::testing;
 
 class OptionsTest : public QueueTest {
  protected:
-  /// Fails the test unless the runner refuses the arguments and keeps the queue. Returns the
-  /// message.
-  static std::string Refusal(const std::vector<std::string>& arguments) {
+  /// Fails the test unless the runner refuses the arguments, ends with this status and keeps the
+  /// queue. Returns the message.
+  static std::string Refusal(const std::vector<std::string>& arguments, int exitCode = 2) {
     Enqueue({"/tmp/a"});
     const ProgramResult result = RunProgram(QueueProgramPath(), arguments);
-    EXPECT_EQ(result.exitCode, 2);
+    EXPECT_EQ(result.exitCode, exitCode);
     EXPECT_EQ(result.out, "");
     EXPECT_EQ(ReadFile(kQueueFile), "/tmp/a\n");
     EXPECT_FALSE(Exists(kTakenFile));
@@ -36,7 +37,8 @@ TEST_F(OptionsTest, HelpListsEveryOption) {
     EXPECT_THAT(result.out,
                 AllOf(HasSubstr("--follow"), HasSubstr("--jobs"), HasSubstr("--profile"),
                       HasSubstr("--velathumb"), HasSubstr("--check-videos"), HasSubstr("--add"),
-                      HasSubstr("--version"), HasSubstr("--wait"), HasSubstr("Exit status")));
+                      HasSubstr("--version"), HasSubstr("--wait"), HasSubstr("--now"),
+                      HasSubstr("--queue-only"), HasSubstr("Exit status")));
   }
 }
 
@@ -52,8 +54,8 @@ TEST_F(OptionsTest, InvalidArgumentsAreRefused) {
       {QueueArguments(kProfiles, {"/tmp/a"}), "/tmp/a"},
       {QueueArguments(kProfiles, {"--jobs", "0"}), "--jobs"},
       {QueueArguments(kProfiles, {"--jobs", "many"}), "--jobs"},
-      {QueueArguments("/tmp/none.conf"),
-       "velathumb-queue: /tmp/none.conf: No such file or directory\n"},
+      {QueueArguments(kProfiles, {"--queue-only"}), "--queue-only needs --add"},
+      {QueueArguments(kProfiles, {"--add", "/tmp/a", "--queue-only", "--now"}), "excludes --now"},
       {QueueArguments(kProfiles, {"--add", "/tmp/a\n/tmp/b"}),
        "cannot add /tmp/a\\n/tmp/b: an entry cannot contain a newline\n"},
   };
@@ -64,13 +66,6 @@ TEST_F(OptionsTest, InvalidArgumentsAreRefused) {
   }
 }
 
-TEST_F(OptionsTest, AVelathumbThatIsNotExecutableIsRefused) {
-  WriteFile("/tmp/text", "");
-  ASSERT_EQ(chmod("/tmp/text", 0644), 0);
-  EXPECT_EQ(Refusal({"--velathumb", "/tmp/text", "--profile", kProfiles}),
-            "velathumb-queue: /tmp/text: Permission denied\n");
-}
-
 TEST_F(OptionsTest, EntriesCanBeAddedToTheQueue) {
   Enqueue({"/tmp/a"});
   MakeEntryDirectories({"/tmp/b", "/tmp/-c d"});
@@ -78,15 +73,6 @@ TEST_F(OptionsTest, EntriesCanBeAddedToTheQueue) {
             0);
   EXPECT_THAT(velathumb_.Entries(), ElementsAre("/tmp/a", "R:/tmp/b", "/tmp/-c d"));
   ExpectQueueDone();
-}
-
-TEST_F(OptionsTest, EntriesAreAddedForARunningRunner) {
-  Program runner = StartAndHold({"/tmp/a"});
-  MakeEntryDirectories({"/tmp/b"});
-  EXPECT_EQ(velathumb_.Run({"--add", "/tmp/b"}).exitCode, 1);
-  Release();
-  EXPECT_TRUE(runner.Wait());
-  EXPECT_THAT(velathumb_.Entries(), ElementsAre("/tmp/a", "/tmp/b"));
 }
 
 TEST_F(OptionsTest, AnEntryIsAddedWithItsWholePath) {
@@ -126,17 +112,6 @@ TEST_F(OptionsTest, ARefusedEntryKeepsOthersFromBeingAdded) {
   Refusal(QueueArguments(kProfiles, {"--add", "/tmp/b", "--add", "/tmp/none"}));
 }
 
-TEST_F(OptionsTest, AProfileWithoutAThumbnailKeepsTheQueue) {
-  WriteFile("/tmp/invalid.conf", "[thumb_s\nsize=120\n");
-  WriteFile("/tmp/empty.conf", "; nothing\n");
-  MakeDirectories("/tmp/directory");
-  for (const std::string profile : {"/tmp/invalid.conf", "/tmp/empty.conf", "/tmp/directory"}) {
-    EXPECT_EQ(Refusal(QueueArguments(profile)),
-              "velathumb-queue: no profile file, or no thumbnail in it: " + profile + "\n");
-    RemoveTree(kQueueFile);
-  }
-}
-
 TEST_F(OptionsTest, AFifoInPlaceOfTheQueueIsAnError) {
   ASSERT_EQ(mkfifo(kQueueFile, 0644), 0);
   Program runner = velathumb_.Start();
@@ -162,6 +137,7 @@ TEST_F(OptionsTest, ATakenFileThatIsADirectoryIsAnError) {
 /// number of that file plus `offset`. Returns the content of the file.
 std::string ErrorWithJournalStream(ino_t offset) {
   const RecordingVelathumb velathumb;
+  const DaemonPeer daemon;
   Enqueue({"/tmp/a"});
   const Descriptor error(open("/tmp/err", O_RDWR | O_CREAT | O_TRUNC | O_CLOEXEC, 0644));
   struct stat status = {};
@@ -183,6 +159,7 @@ TEST_F(OptionsTest, LinesForAFileHaveNoLevelWhenTheJournalIsThatOfAParent) {
 }
 
 TEST_F(OptionsTest, ControlCharactersOfAnEntryAreEscaped) {
+  const DaemonPeer daemon;
   velathumb_.Stub().PlanCall(1, StubPlan().Exit(1));
   Enqueue({"/tmp/\x1b[2J\r"});
   EXPECT_EQ(velathumb_.Run().err,

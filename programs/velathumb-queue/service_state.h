@@ -1,0 +1,38 @@
+// Whether a service processes the queue.
+#pragma once
+
+#include <chrono>
+#include <string>
+
+namespace vela {
+
+/// The states of the service's units. The default is that of a machine without the service.
+struct ServiceState {
+  bool isRunning = false;    ///< velathumb-queue.service runs or is being started
+  bool hasFailed = false;    ///< its last run, or the path unit, has failed
+  bool isWatching = false;   ///< velathumb-queue.path starts it when there is a queue
+  bool isScheduled = false;  ///< velathumb-queue.timer starts it from time to time
+  bool isEnabled = false;    ///< one of the units is started at boot
+};
+
+/// Returns whether the work is to be left to the service: it runs, or an administrator wants it to.
+bool HasService(const ServiceState& state);
+
+/// How urgent it is that the user reads about the service.
+struct ServiceText {
+  bool needsAction = false;  ///< the user has to do something before the work is done
+  std::string text;
+};
+
+/// Who does the work while a runner is running, as the end of a sentence.
+inline constexpr char kRunningText[] = "the running velathumb-queue does the work";
+
+/// Returns who does the work, and what the user has to do when that is not certain, as the end of a
+/// sentence. Only for a state with a service.
+ServiceText DescribeService(const ServiceState& state);
+
+/// Asks systemd for the states of the units, for at most `limit`. A machine that does not run
+/// systemd, or one that does not answer, has no service.
+ServiceState AskForService(std::chrono::seconds limit);
+
+}  // namespace vela
