@@ -44,8 +44,9 @@ class PinnedDaemon {
  public:
   PinnedDaemon()
       : program_(vela_test::StartProgram(
-            "/usr/bin/taskset", {"-c", std::to_string(kDaemonProcessor), BuiltPath(VELAINDEXPLUGIND),
-                                 "--database", kScratch + "/index/index.db"})) {
+            "/usr/bin/taskset",
+            {"-c", std::to_string(kDaemonProcessor), BuiltPath(VELAINDEXPLUGIND), "--database",
+             kScratch + "/index/index.db"})) {
     Json::Value packet;
     for (int tries = 0; tries < 1000; ++tries) {
       packet = Json::Value(Json::objectValue);

@@ -125,7 +125,7 @@ TEST_F(Companions, ListOfFailedPhotosFollowsNoLinkOfOthersWaitsForNoPipeAndHasOn
   ProgramOptions options;
   options.timeLimit = kSoon;
   const ProgramResult result =
-      RunProgram(HostPath(VELATHUMB_STATUS_FILE), {"--failed", InPhotos("d")}, options);
+      RunProgram(BuiltPath(VELATHUMB_STATUS_FILE), {"--failed", InPhotos("d")}, options);
   EXPECT_FALSE(result.timedOut);
   EXPECT_EQ(std::count(result.out.begin(), result.out.end(), '\n'), 3) << result.out;
   EXPECT_EQ(result.out.find('\x1b'), std::string::npos);
