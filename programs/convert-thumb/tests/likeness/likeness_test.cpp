@@ -45,10 +45,10 @@ class Likeness : public ConverterTest, public ::testing::WithParamInterface<Like
     Runs runs;
     runs.ourDirectory = directory_ + "/ours_" + vector;
     runs.theirDirectory = directory_ + "/theirs_" + vector;
-    const ProgramResult ours = RunProgram(
-        ConvertThumbPath(), LineWithOutputsIn(runs.ourDirectory, path, vector).Arguments());
-    const ProgramResult theirs = RunProgram(
-        kImageMagick, ReferenceArguments(LineWithOutputsIn(runs.theirDirectory, path, vector)));
+    const CommandLine line = LineWithOutputsIn(runs.ourDirectory, path, vector);
+    const ProgramResult ours = RunProgram(ConvertThumbPath(), line.Arguments());
+    const ProgramResult theirs = RunReference(LineWithOutputsIn(runs.theirDirectory, path, vector),
+                                              line.outputs.front().path);
     runs.ourExit = ours.exitCode;
     runs.theirExit = theirs.exitCode;
     runs.messages = "ours: " + ours.err + "\ntheirs: " + theirs.err;
