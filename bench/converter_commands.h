@@ -4,11 +4,13 @@
 #include <string>
 #include <vector>
 
+#include "platform/installed_names.h"
+
 namespace vela_bench {
 
 using Command = std::vector<std::string>;
 
-constexpr char kImageMagick[] = "/usr/bin/convert-im6.q16";
+constexpr const char* kImageMagick = vela::kImageMagickProgram;
 
 /// Makes six sharpened outputs of a photo in `directory` in one run, with the options that
 /// velathumb uses. `program`: path of the converter or of ImageMagick.

@@ -30,7 +30,7 @@ namespace vela_bench {
 
 namespace {
 
-using vela_test::HostPath;
+using vela_test::BuiltPath;
 
 const std::string kScratch = vela_test::kWritablePlace;
 
@@ -44,7 +44,7 @@ class PinnedDaemon {
  public:
   PinnedDaemon()
       : program_(vela_test::StartProgram(
-            "/usr/bin/taskset", {"-c", std::to_string(kDaemonProcessor), HostPath(VELAINDEXPLUGIND),
+            "/usr/bin/taskset", {"-c", std::to_string(kDaemonProcessor), BuiltPath(VELAINDEXPLUGIND),
                                  "--database", kScratch + "/index/index.db"})) {
     Json::Value packet;
     for (int tries = 0; tries < 1000; ++tries) {

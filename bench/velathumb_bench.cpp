@@ -23,7 +23,7 @@ namespace vela_bench {
 
 namespace {
 
-using vela_test::HostPath;
+using vela_test::BuiltPath;
 
 const std::string kScratch = vela_test::kWritablePlace;
 
@@ -76,7 +76,7 @@ void MeasureConversion() {
         return TimedRun(subject);
       },
       [&] {
-        return TimedRun({HostPath(FLOOR_COMMANDS), "/tmp/commands"});
+        return TimedRun({BuiltPath(FLOOR_COMMANDS), "/tmp/commands"});
       });
   Report("conversion, a photo", cost.subject, cost.floor, kPhotos, "(target 1.02)");
   vela_test::RemoveTree(directory);
@@ -91,7 +91,7 @@ void MeasureNothingToDo() {
   MakeThumbFiles(directory, kPhotos);
   const std::vector<std::string> subject = {vela_test::VelathumbPath(), WriteSixSizes(), directory};
   const auto runSubject = [&] { return TimedRun(subject); };
-  const auto runFloor = [&] { return TimedRun({HostPath(FLOOR_STATUS), directory}); };
+  const auto runFloor = [&] { return TimedRun({BuiltPath(FLOOR_STATUS), directory}); };
   const CostPair alone = FastestOf(5, runSubject, runFloor);
   Report("nothing to do, no daemon, a photo", alone.subject, alone.floor, kPhotos, "(target 2.00)");
   {
@@ -179,7 +179,7 @@ void WriteLongQueue(int lines) {
 
 /// Runs the status scan of a tree; `peak` receives its peak memory in MiB.
 Cost RunScan(const std::string& root, double& peak) {
-  return TimedRun({HostPath(VELATHUMB_STATUS), "--recursive", root},
+  return TimedRun({BuiltPath(VELATHUMB_STATUS), "--recursive", root},
                   [&peak](int pid) { peak = std::max(peak, MemoryOf(pid).peak); });
 }
 

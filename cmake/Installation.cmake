@@ -1,12 +1,5 @@
 # What is installed besides the programs and the library. See also cmake/InstallForPrefix.cmake.
 
-find_program(VELA_IMAGEMAGICK NAMES convert-im7.q16 convert-im6.q16 convert PATHS /usr/bin
-             NO_DEFAULT_PATH DOC "ImageMagick's convert, for what the converter does not know")
-if(NOT VELA_IMAGEMAGICK)
-  set(VELA_IMAGEMAGICK /usr/bin/convert CACHE FILEPATH "ImageMagick's convert" FORCE)
-endif()
-set(VELA_EXIFTOOL /usr/bin/exiftool CACHE FILEPATH "exiftool")
-
 # Installs a symbolic link; its target need not exist yet.
 function(vela_install_link path target)
   get_filename_component(folder ${path} DIRECTORY)
@@ -18,8 +11,8 @@ function(vela_install_link path target)
 endfunction()
 
 # The link has the converter's name, so that the process keeps it when ImageMagick takes over.
-vela_install_link(${VELA_TOOLS_DIR}/lib/convert-thumb ${VELA_IMAGEMAGICK})
-vela_install_link(${VELA_TOOLS_DIR}/bin/exiftool ${VELA_EXIFTOOL})
+vela_install_link(${VELA_TOOLS_DIR}/lib/convert-thumb ${VELA_IMAGEMAGICK_PROGRAM})
+vela_install_link(${VELA_TOOLS_DIR}/bin/exiftool /usr/bin/exiftool)
 install(DIRECTORY ${PROJECT_SOURCE_DIR}/config/imagemagick DESTINATION ${VELA_TOOLS_DIR}/share)
 
 # Manual pages by section, of the programs that are installed.

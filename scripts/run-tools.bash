@@ -30,7 +30,7 @@ build() {
 # Prints the path of ImageMagick's program; PATH may contain another program named convert.
 imagemagick_convert() {
   local candidate
-  for candidate in /usr/bin/convert-im6.q16 /usr/bin/convert; do
+  for candidate in /usr/bin/convert-im7.q16 /usr/bin/convert-im6.q16 /usr/bin/convert; do
     if [[ -x $candidate ]]; then
       echo "$candidate"
       return

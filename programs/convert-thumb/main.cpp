@@ -90,6 +90,9 @@ int RunMain(int argc, char** argv) {
   try {
     const CommandLine line =
         ParseCommandLine(std::vector<std::string>(argv + (argc > 0 ? 1 : 0), argv + argc));
+    if (!IsDiscarded(line)) {
+      LogFailuresOf(line.sourceFile);
+    }
     IgnoreWriteSignals();
     CleanUpOnFatalSignals();
     const size_t memoryLimit = ConversionMemoryLimit();

@@ -3,12 +3,11 @@
 #include <algorithm>
 #include <cstdlib>
 #include <exception>
-#include <exiv2/exiv2.hpp>
-#include <exiv2/webpimage.hpp>
 #include <iterator>
 #include <limits>
 #include <memory>
 
+#include "exiv2_library.h"
 #include "ppm_size.h"
 #include "stream_io.h"
 
@@ -16,25 +15,14 @@ namespace vela {
 
 namespace {
 
-// Exiv2 returns pointers of a type that C++17 no longer has.
-#pragma GCC diagnostic push
-#pragma GCC diagnostic ignored "-Wdeprecated-declarations"
-
-/// Returns null when Exiv2 does not know the format.
-std::unique_ptr<Exiv2::Image> OpenImage(FILE* file) {
-  Exiv2::BasicIo::AutoPtr input(new StreamIo(file));
-  return std::unique_ptr<Exiv2::Image>(Exiv2::ImageFactory::open(input).release());
-}
-
-#pragma GCC diagnostic pop
-
 /// Exiv2 also reads formats other than photos, some of them completely and slowly.
-bool IsPhotoType(int imageType) {
-  namespace type = Exiv2::ImageType;
-  constexpr int kPhotoTypes[] = {type::jpeg, type::png, type::gif,  type::bmp, type::tiff,
-                                 type::webp, type::psd, type::bmff, type::arw, type::cr2,
-                                 type::crw,  type::dng, type::mrw,  type::nef, type::orf,
-                                 type::pef,  type::raf, type::rw2,  type::sr2, type::srw};
+bool IsPhotoType(Exiv2ImageType imageType) {
+  constexpr Exiv2ImageType kPhotoTypes[] = {
+      Exiv2::ImageType::jpeg, Exiv2::ImageType::png,  Exiv2::ImageType::gif, Exiv2::ImageType::bmp,
+      Exiv2::ImageType::tiff, Exiv2::ImageType::webp, Exiv2::ImageType::psd, Exiv2::ImageType::bmff,
+      Exiv2::ImageType::arw,  Exiv2::ImageType::cr2,  Exiv2::ImageType::crw, Exiv2::ImageType::dng,
+      Exiv2::ImageType::mrw,  Exiv2::ImageType::nef,  Exiv2::ImageType::orf, Exiv2::ImageType::pef,
+      Exiv2::ImageType::raf,  Exiv2::ImageType::rw2,  Exiv2::ImageType::sr2, Exiv2::ImageType::srw};
   return std::find(std::begin(kPhotoTypes), std::end(kPhotoTypes), imageType) !=
          std::end(kPhotoTypes);
 }
@@ -50,7 +38,7 @@ void ReadHeader(Exiv2::Image& image) {
 
 /// Returns an empty size when none can be read.
 PixelSize ReadPixelSize(FILE* file) {
-  const std::unique_ptr<Exiv2::Image> image = OpenImage(file);
+  const std::unique_ptr<Exiv2::Image> image = OpenExiv2Image(std::make_unique<StreamIo>(file));
   if (!image) {
     return ReadPpmSize(file);
   }
@@ -58,7 +46,7 @@ PixelSize ReadPixelSize(FILE* file) {
     return {};
   }
   ReadHeader(*image);
-  const PixelSize size{image->pixelWidth(), image->pixelHeight()};
+  const PixelSize size{SignedPixels(image->pixelWidth()), SignedPixels(image->pixelHeight())};
   // A negative height means that the rows of a bitmap are stored from top to bottom.
   const bool isBitmap = image->imageType() == Exiv2::ImageType::bmp;
   return isBitmap ? PixelSize{size.width, std::abs(size.height)} : size;
@@ -72,7 +60,7 @@ bool IsPixelCount(int64_t count) {
 
 void InitializeImageLibrary() {
   Exiv2::LogMsg::setLevel(Exiv2::LogMsg::mute);
-  Exiv2::enableBMFF(true);
+  EnableExiv2Bmff();
   Exiv2::XmpParser::initialize();
 }
 

@@ -37,11 +37,11 @@ int StreamIo::close() {
   return 0;
 }
 
-long StreamIo::write(const Exiv2::byte* /*data*/, long /*size*/) {
+Exiv2Size StreamIo::write(const Exiv2::byte* /*data*/, Exiv2Size /*size*/) {
   return 0;
 }
 
-long StreamIo::write(Exiv2::BasicIo& /*source*/) {
+Exiv2Size StreamIo::write(Exiv2::BasicIo& /*source*/) {
   return 0;
 }
 
@@ -49,17 +49,20 @@ int StreamIo::putb(Exiv2::byte /*data*/) {
   return EOF;
 }
 
-Exiv2::DataBuf StreamIo::read(long size) {
-  if (size < 0 || static_cast<size_t>(size) > size_) {
-    throw Exiv2::Error(Exiv2::kerInvalidMalloc);
+Exiv2::DataBuf StreamIo::read(Exiv2Size size) {
+  if (static_cast<size_t>(size) > size_) {  // as any negative size is
+    throw Exiv2::Error(Exiv2::ErrorCode::kerInvalidMalloc);
   }
   Exiv2::DataBuf data(size);
-  data.size_ = read(data.pData_, size);
+  Shorten(data, read(BytesOf(data), size));
   return data;
 }
 
-long StreamIo::read(Exiv2::byte* buffer, long size) {
-  return size < 0 ? 0 : static_cast<long>(std::fread(buffer, 1, static_cast<size_t>(size), file_));
+Exiv2Size StreamIo::read(Exiv2::byte* buffer, Exiv2Size size) {
+  if (static_cast<Exiv2Offset>(size) < 0) {
+    return 0;
+  }
+  return static_cast<Exiv2Size>(std::fread(buffer, 1, static_cast<size_t>(size), file_));
 }
 
 int StreamIo::getb() {
@@ -67,17 +70,17 @@ int StreamIo::getb() {
 }
 
 void StreamIo::transfer(Exiv2::BasicIo& /*source*/) {
-  throw Exiv2::Error(Exiv2::kerErrorMessage, "not writable");
+  throw Exiv2::Error(Exiv2::ErrorCode::kerErrorMessage, "not writable");
 }
 
-int StreamIo::seek(long offset, Position position) {
+int StreamIo::seek(Exiv2Offset offset, Position position) {
   return std::fseek(file_, offset, Origin(position));
 }
 
 Exiv2::byte* StreamIo::mmap(bool isWriteable) {
   Exiv2::byte* const memory = isWriteable ? nullptr : mapping_.Map(fileno(file_), size_);
   if (memory == nullptr) {
-    throw Exiv2::Error(Exiv2::kerErrorMessage, "not mappable");
+    throw Exiv2::Error(Exiv2::ErrorCode::kerErrorMessage, "not mappable");
   }
   return memory;
 }
@@ -87,8 +90,8 @@ int StreamIo::munmap() {
   return 0;
 }
 
-long StreamIo::tell() const {
-  return std::ftell(file_);
+Exiv2Size StreamIo::tell() const {
+  return static_cast<Exiv2Size>(std::ftell(file_));
 }
 
 size_t StreamIo::size() const {
@@ -107,8 +110,10 @@ bool StreamIo::eof() const {
   return std::feof(file_) != 0;
 }
 
-std::string StreamIo::path() const {
-  return "";
+Exiv2Path StreamIo::path() const noexcept {
+  return path_;
 }
+
+void StreamIo::populateFakeData() {}  // for files in a network only
 
 }  // namespace vela

@@ -2,9 +2,9 @@
 #pragma once
 
 #include <cstdio>
-#include <exiv2/exiv2.hpp>
 #include <string>
 
+#include "exiv2_library.h"
 #include "posix/file_content.h"
 
 namespace vela {
@@ -16,25 +16,27 @@ class StreamIo : public Exiv2::BasicIo {
 
   int open() override;
   int close() override;
-  long write(const Exiv2::byte* data, long size) override;
-  long write(Exiv2::BasicIo& source) override;
+  Exiv2Size write(const Exiv2::byte* data, Exiv2Size size) override;
+  Exiv2Size write(Exiv2::BasicIo& source) override;
   int putb(Exiv2::byte data) override;
-  Exiv2::DataBuf read(long size) override;
-  long read(Exiv2::byte* buffer, long size) override;
+  Exiv2::DataBuf read(Exiv2Size size) override;
+  Exiv2Size read(Exiv2::byte* buffer, Exiv2Size size) override;
   int getb() override;
   void transfer(Exiv2::BasicIo& source) override;
-  int seek(long offset, Position position) override;
+  int seek(Exiv2Offset offset, Position position) override;
   Exiv2::byte* mmap(bool isWriteable) override;
   int munmap() override;
-  long tell() const override;
+  Exiv2Size tell() const override;
   size_t size() const override;
   bool isopen() const override;
   int error() const override;
   bool eof() const override;
-  std::string path() const override;
+  Exiv2Path path() const noexcept override;
+  void populateFakeData() override;
 
  private:
   FILE* file_;
+  const std::string path_;
   size_t size_ = 0;  // of the file, at first
   bool isOpen_ = false;
   FileMapping mapping_;

@@ -5,7 +5,7 @@
 #include <optional>
 #include <string_view>
 
-#include "whole_number.h"
+#include "configuration/whole_number.h"
 
 namespace vela {
 

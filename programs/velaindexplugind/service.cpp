@@ -12,6 +12,7 @@
 #include <optional>
 #include <string>
 
+#include "checks/configuration_check.h"
 #include "event_source.h"
 #include "index_store.h"
 #include "index_writer.h"
@@ -138,13 +139,21 @@ std::string Service::OpenSocket() {
   return socket_.Make(PluginDaemonSocketPath, group_);
 }
 
-void Service::LoadSettings(const char* event) {
-  std::string warning;
-  const Settings settings = ReadSettings(warning);
-  server_->SetSettings(settings);
-  if (!warning.empty()) {
-    LogLine(LogLevel::kWarning, event).Add("problem", warning).Write();
+void LogFaultsOfSettings(const char* event) {
+  for (const Finding& finding : FindingsForLog(CheckSettings())) {
+    LogLine line(LogLevel::kWarning, event);
+    line.Add("file", finding.file);
+    if (finding.line != 0) {
+      line.Add("line", finding.line);
+    }
+    line.Add("problem", finding.message).Write();
   }
+}
+
+void Service::LoadSettings(const char* event) {
+  const Settings settings = ReadSettings();
+  server_->SetSettings(settings);
+  LogFaultsOfSettings(event);
   LogLine(LogLevel::kInfo, event)
       .Add("index_version", settings.indexVersion)
       .Add("disable_convert_photo", settings.isPhotoConvertDisabled ? "yes" : "no")

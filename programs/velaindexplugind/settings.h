@@ -2,7 +2,6 @@
 #pragma once
 
 #include <cstdint>
-#include <string>
 
 namespace vela {
 
@@ -13,8 +12,7 @@ struct Settings {
   bool isVideoConvertDisabled = false;
 };
 
-/// Reads the settings file. `warning` receives the reason why a default is used instead of a value
-/// or of the file, empty when there is none.
-Settings ReadSettings(std::string& warning);
+/// Reads the settings file.
+Settings ReadSettings();
 
 }  // namespace vela

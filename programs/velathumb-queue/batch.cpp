@@ -2,10 +2,12 @@
 
 #include <algorithm>
 #include <cerrno>
+#include <cstdlib>
 #include <utility>
 
-#include "configuration.h"
+#include "command_check.h"
 #include "entry_check.h"
+#include "ipc/absent_daemon.h"
 #include "posix/service_log.h"
 #include "storage/unfinished_directories.h"
 
@@ -29,6 +31,16 @@ int StartProcess(const VelathumbCommand& command, std::string entry, pid_t& pid)
   std::string profileFile = command.profileFile;
   char* const arguments[] = {path.data(), profileFile.data(), entry.data(), nullptr};
   return StartAttachedChild(path.c_str(), arguments, pid);
+}
+
+/// Tells the velathumb that is started next whether the index daemon is known to be absent: it then
+/// need not log that for each photo.
+void TellAboutDaemon(bool isAbsent) {
+  if (isAbsent) {
+    setenv(kAbsentDaemonVariable, "1", 1);
+  } else {
+    unsetenv(kAbsentDaemonVariable);
+  }
 }
 
 /// Removes and returns what velathumb has noted about the directories of the entry.
@@ -71,12 +83,13 @@ std::optional<std::chrono::seconds> PostponementFor(int count) {
 }
 
 Batch::Batch(const RunSettings& settings, TakenQueue& taken, EventWait& events, PauseGate& gate,
-             EntryHistories& histories)
+             EntryHistories& histories, const ProgressLine& progress)
     : settings_(settings),
       taken_(taken),
       events_(events),
       gate_(gate),
       histories_(histories),
+      progress_(progress),
       plan_(taken.Entries()) {
   for (size_t number = 0; number < taken.Entries().size(); ++number) {
     const auto history = histories_.find(plan_.Entry(number));
@@ -89,6 +102,7 @@ Batch::Batch(const RunSettings& settings, TakenQueue& taken, EventWait& events, 
 bool Batch::StartVelathumb(size_t number, std::vector<std::string> locked) {
   FileVersion profile;
   profile.Read(settings_.velathumb.profileFile.c_str());
+  TellAboutDaemon(gate_.IsDaemonAbsent());
   pid_t pid = 0;
   const int error = StartProcess(settings_.velathumb, plan_.Entry(number), pid);
   if (error != 0) {
@@ -428,13 +442,25 @@ std::optional<Batch::Clock::time_point> Batch::NextWake() const {
 
 std::optional<milliseconds> Batch::WaitTime() const {
   // New entries are not reported by every file system.
-  constexpr milliseconds kLongestWait = std::chrono::minutes(1);
+  constexpr milliseconds kUsualLimit = std::chrono::minutes(1);
+  const bool isShown = progress_.IsShown() && !children_.empty();
+  const milliseconds limit = isShown ? ProgressLine::kInterval : kUsualLimit;
   const auto wake = NextWake();
   if (!wake) {
-    return std::nullopt;
+    return isShown ? std::make_optional(limit) : std::nullopt;
   }
   const auto left = std::chrono::ceil<milliseconds>(*wake - Clock::now());
-  return std::clamp(left, milliseconds(0), kLongestWait);
+  return std::clamp(left, milliseconds(0), limit);
+}
+
+/// Of several velathumbs, shows the directory of the one with the lowest number.
+void Batch::ShowProgress() const {
+  if (children_.empty()) {
+    progress_.Hide();
+    return;
+  }
+  const auto& first = *children_.begin();
+  progress_.Update(first.first, plan_.Entry(first.second.number));
 }
 
 RunEnd Batch::Run() {
@@ -446,6 +472,7 @@ RunEnd Batch::Run() {
     if (plan_.IsFinished() || failure_) {
       break;
     }
+    ShowProgress();
     events_.Wait(WaitTime());
     ReapChildren();
     CheckProgress();

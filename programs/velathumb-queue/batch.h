@@ -13,6 +13,7 @@
 #include "posix/child_process.h"
 #include "posix/event_wait.h"
 #include "posix/file_version.h"
+#include "progress_line.h"
 #include "queue_run.h"
 #include "stall_watch.h"
 #include "taken_queue.h"
@@ -38,7 +39,7 @@ std::optional<std::chrono::seconds> PostponementFor(int count);
 class Batch {
  public:
   Batch(const RunSettings& settings, TakenQueue& taken, EventWait& events, PauseGate& gate,
-        EntryHistories& histories);
+        EntryHistories& histories, const ProgressLine& progress);
 
   /// Returns kEmpty when all entries are done, deferred or back in the queue.
   RunEnd Run();
@@ -81,6 +82,7 @@ class Batch {
   void FailToRecord(size_t number);
   void HandBack();
   void StopChildren();
+  void ShowProgress() const;
   std::optional<Clock::time_point> NextWake() const;
   std::optional<std::chrono::milliseconds> WaitTime() const;
 
@@ -89,6 +91,7 @@ class Batch {
   EventWait& events_;
   PauseGate& gate_;
   EntryHistories& histories_;
+  const ProgressLine& progress_;
   EntryPlan plan_;
   std::map<pid_t, Child> children_;
   int deferred_ = 0;

@@ -3,9 +3,11 @@
 #include <json/value.h>
 
 #include <algorithm>
+#include <cerrno>
 
 #include "ipc/velamk_ipc.h"
 #include "platform/velaindex.h"
+#include "platform/vlibc.h"
 #include "posix/service_log.h"
 #include "progress/resume_state.h"
 
@@ -24,24 +26,41 @@ std::chrono::seconds TimeToNextCheck() {
   return std::clamp(TimeUntilResume(), std::chrono::seconds(1), kLongestWait);
 }
 
+/// Returns whether a request has failed, with this platform error, because nobody listens.
+bool IsNobodyListening(int error) {
+  return error == ENOENT || error == ECONNREFUSED;
+}
+
 bool IsTrue(const Json::Value& packet, const char* name) {
   const Json::Value value = packet.isObject() ? packet[name] : Json::Value();
   return value.isConvertibleTo(Json::booleanValue) && value.asBool();
 }
 
+}  // namespace
+
 /// Sends the request of IsDisableConvertPhoto, but does not wait half an hour for a daemon that
 /// does not answer, because the runner handles no signals meanwhile.
-bool IsSwitchedOff() {
+bool PauseGate::IsSwitchedOff() {
   constexpr int kAnswerTimeout = 3;  // seconds
   Json::Value packet(Json::objectValue);
   packet["command"] = "IS_DISABLE_CONVERT_PHOTO";
-  AutoSendRecvPacket(PluginDaemonSocketPath, -1, packet, kAnswerTimeout);
+  const int result = AutoSendRecvPacket(PluginDaemonSocketPath, -1, packet, kAnswerTimeout);
+  NoteAbsence(result != 0 && IsNobodyListening(VLIBCErrGet()));
   return IsTrue(packet, "success") && IsTrue(packet, "result");
 }
 
-}  // namespace
+void PauseGate::NoteAbsence(bool isAbsent) {
+  if (isAbsent && !isDaemonAbsent_) {
+    WriteLog(LogLevel::kWarning, std::string("no index daemon listens at ") +
+                                     PluginDaemonSocketPath +
+                                     ": photos are processed, but not reported to it");
+  } else if (!isAbsent && isDaemonAbsent_) {
+    WriteLog(LogLevel::kInfo, "an index daemon listens again");
+  }
+  isDaemonAbsent_ = isAbsent;
+}
 
-std::optional<ConversionPause> FindConversionPause() {
+std::optional<ConversionPause> PauseGate::FindPause() {
   if (IsPausedByResumeTime()) {
     return ConversionPause{"the resume time is not reached", TimeToNextCheck()};
   }
@@ -59,7 +78,7 @@ bool PauseGate::MayStart() {
   if (start < allowedUntil_) {
     return true;
   }
-  const auto pause = FindConversionPause();
+  const auto pause = FindPause();
   const auto now = Clock::now();
   if (!pause) {
     // A slow answer is valid for longer, or the runner would spend its time on requests.

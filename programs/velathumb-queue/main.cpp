@@ -9,8 +9,9 @@
 #include <utility>
 
 #include "additions.h"
+#include "checks/configuration_check.h"
 #include "cli/command_line.h"
-#include "configuration.h"
+#include "command_check.h"
 #include "options.h"
 #include "posix/file_descriptor.h"
 #include "posix/file_lock.h"
@@ -30,7 +31,7 @@ constexpr int kError = 2;
 /// Nothing but a change of the configuration helps: systemd need not start the program again.
 constexpr int kMisconfigured = EX_CONFIG;
 
-constexpr char kLockFile[] = "/var/run/velathumb-queue.lock";
+constexpr const char* kLockFile = kQueueRunnerLock;
 
 /// How long systemd is waited for. A machine on which it does not answer is in trouble anyway.
 constexpr std::chrono::seconds kServiceLimit(2);
@@ -100,7 +101,11 @@ int ProcessQueue(const RunSettings& settings, FileDescriptor lock) {
   if (!lock.IsOpen()) {
     lock = TakeProcessLock(kLockFile, settings.wait);
   }
-  return lock.IsOpen() ? ToExitStatus(RunQueue(settings)) : EndWithoutLock(settings, errno);
+  if (!lock.IsOpen()) {
+    return EndWithoutLock(settings, errno);
+  }
+  LogFindings(settings.velathumb.profileFile);
+  return ToExitStatus(RunQueue(settings));
 }
 
 int AddAndProcess(const RunSettings& settings) {

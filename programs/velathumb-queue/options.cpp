@@ -6,7 +6,7 @@
 #include <string>
 #include <system_error>
 
-#include "configuration.h"
+#include "checks/configuration_check.h"
 
 namespace vela {
 
@@ -57,19 +57,12 @@ std::string FindConflict(const RunSettings& settings) {
   return {};
 }
 
-/// Returns the directory that this program was installed into.
-std::filesystem::path OwnDirectory() {
-  std::error_code error;
-  return std::filesystem::read_symlink("/proc/self/exe", error).parent_path();
-}
-
 /// Returns the velathumb that was installed together with this program, and the profile file for
 /// it.
 VelathumbCommand InstalledVelathumb() {
-  const std::filesystem::path programs = OwnDirectory();
-  const auto profiles = programs.parent_path() / "share/velathumb/thumb-profiles.conf";
-  return {(programs / "velathumb").string(),
-          DefaultProfileFile(kLocalProfileFile, profiles.string())};
+  std::error_code error;
+  const auto program = std::filesystem::read_symlink("/proc/self/exe", error);
+  return {(program.parent_path() / "velathumb").string(), DefaultProfileFile()};
 }
 
 }  // namespace

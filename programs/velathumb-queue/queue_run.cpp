@@ -10,10 +10,11 @@
 #include <vector>
 
 #include "batch.h"
-#include "configuration.h"
+#include "command_check.h"
 #include "conversion_pause.h"
 #include "posix/event_wait.h"
 #include "posix/service_log.h"
+#include "progress_line.h"
 #include "progress_totals.h"
 #include "storage/unfinished_directories.h"
 #include "taken_queue.h"
@@ -81,6 +82,7 @@ class QueueRun {
   EventWait events_;
   PauseGate gate_;
   EntryHistories histories_;
+  ProgressLine progress_;
   bool isIdle_ = true;                            // no entry was in progress before
   bool hasHandedBack_ = false;                    // in the last round
   bool hasDeferred_ = false;                      // entries are left for a later run
@@ -147,7 +149,7 @@ RunEnd QueueRun::ProcessTaken(TakenQueue::Outcome outcome) {
     return RunEnd::kStopped;
   }
   SetTotals(outcome);
-  Batch batch(settings_, taken_, events_, gate_, histories_);
+  Batch batch(settings_, taken_, events_, gate_, histories_, progress_);
   const RunEnd end = batch.Run();
   hasHandedBack_ = batch.HasHandedBack();
   hasDeferred_ = hasDeferred_ || batch.DeferredCount() > 0;
@@ -206,6 +208,7 @@ void QueueRun::WaitForEntries() {
   // The watch reports every new queue; the limit is for file systems that report nothing.
   constexpr milliseconds kLongestWait = std::chrono::minutes(1);
   isIdle_ = true;
+  progress_.Hide();
   repeats_.clear();
   seen_.clear();
   histories_.clear();

@@ -1,13 +1,10 @@
 #include "stall_watch.h"
 
 #include <algorithm>
-#include <charconv>
-#include <cstdint>
-#include <cstring>
-#include <limits>
-#include <system_error>
 #include <utility>
 
+#include "configuration/setting_values.h"
+#include "configuration/settings.h"
 #include "platform/system_rules.h"
 #include "platform/vlibc.h"
 
@@ -24,14 +21,7 @@ void ReadSeconds(const char* key, std::chrono::seconds& seconds) {
   if (VLIBCFileGetKeyValue(kSettingsFile, key, text, sizeof text, 0) <= 0) {
     return;
   }
-  const char* end = text + std::strlen(text);
-  uint32_t number = 0;
-  const auto [stop, error] = std::from_chars(text, end, number);
-  if (stop != end || error == std::errc::invalid_argument) {
-    return;
-  }
-  const bool isTooLarge = error == std::errc::result_out_of_range;
-  seconds = std::chrono::seconds(isTooLarge ? std::numeric_limits<uint32_t>::max() : number);
+  seconds = ParseSeconds(text).value_or(seconds);
 }
 
 /// Often enough to notice that the limit is reached a tenth too late at most.
@@ -44,8 +34,8 @@ StallWatch::Clock::duration IntervalFor(std::chrono::seconds limit) {
 
 StallLimits ReadStallLimits() {
   StallLimits limits;
-  ReadSeconds("stall_timeout", limits.stall);
-  ReadSeconds("tool_timeout", limits.tool);
+  ReadSeconds(kStallTimeoutKey, limits.stall);
+  ReadSeconds(kToolTimeoutKey, limits.tool);
   return limits;
 }
 

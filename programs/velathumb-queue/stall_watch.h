@@ -6,14 +6,15 @@
 #include <map>
 #include <optional>
 
+#include "configuration/settings.h"
 #include "posix/processes.h"
 
 namespace vela {
 
 /// How long a velathumb may make no progress.
 struct StallLimits {
-  std::chrono::seconds stall{900};  ///< setting stall_timeout, 0: without limit
-  std::chrono::seconds tool{600};   ///< setting tool_timeout, 0: without limit
+  std::chrono::seconds stall = kDefaultStallTimeout;  ///< 0: without limit
+  std::chrono::seconds tool = kDefaultToolTimeout;    ///< 0: without limit
 };
 
 /// Returns the limits in the settings of the machine.

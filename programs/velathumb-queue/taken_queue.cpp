@@ -59,8 +59,7 @@ bool IsSameState(const FileStatus& a, const FileStatus& b) {
 }  // namespace
 
 QueuePaths PhotoQueuePaths() {
-  return {kPhotoQueue.file, kPhotoQueue.tempFile, std::string(kPhotoQueue.file) + ".done",
-          std::string(kPhotoQueue.file) + ".later"};
+  return {kPhotoQueue.file, kPhotoQueue.tempFile, kDonePhotosFile, kDeferredPhotosFile};
 }
 
 int TakenQueue::RemoveEmptyQueue(time_t modified) const {

@@ -51,13 +51,12 @@ std::string Note(const std::string& html) {
 }
 
 std::string UnconvertibleNote(const PhotoReport& photo) {
-  std::optional<time_t> since;
-  for (const auto& failure : photo.failures) {
-    if (failure && (!since || *failure < *since)) {
-      since = failure;
-    }
-  }
-  return Note("The photo could not be converted, since " + TimeElement(since.value_or(0)));
+  return Note("The photo could not be converted, since " +
+              TimeElement(photo.FirstFailure().value_or(0)));
+}
+
+std::string ReasonNote(const PhotoReport& photo) {
+  return photo.reason.empty() ? std::string() : Note("Reason: " + ToHtml(photo.reason));
 }
 
 /// Returns a note for each time at which sizes failed: those that failed together share a note.
@@ -90,9 +89,10 @@ std::string Notes(const PhotoReport& photo, const std::string& thumb) {
     return Note("The photo could not be looked up");
   }
   if (IsUnconvertible(photo, thumb)) {
-    return UnconvertibleNote(photo);
+    return UnconvertibleNote(photo) + ReasonNote(photo);
   }
-  return FailureNotes(photo) + StateNote(photo, ThumbState::kMissing, "Missing") +
+  return FailureNotes(photo) + ReasonNote(photo) +
+         StateNote(photo, ThumbState::kMissing, "Missing") +
          StateNote(photo, ThumbState::kOutdated, "Outdated");
 }
 

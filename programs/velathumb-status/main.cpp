@@ -12,6 +12,9 @@
 #include <vector>
 
 #include "cli/command_line.h"
+#include "configuration_report.h"
+#include "failure_list.h"
+#include "failure_reason.h"
 #include "html_page.h"
 #include "json_report.h"
 #include "options.h"
@@ -79,10 +82,13 @@ class StatusRun {
   void Report();
   bool CanCheckVideos();
   void ReportDirectories();
+  std::unique_ptr<StatusSink> MakeReport();
+  void Scan(HtmlPage* page);
   void ReportQueues();
   void ReportProgress();
   void ReportResumeTime();
   void ReportSecurity();
+  void ReportConfiguration();
   void AddPageError(int error);
   void AddError(const std::string& path, const std::string& message);
   void AddWork(bool hasWork) { hasWork_ = hasWork_ || hasWork; }
@@ -121,23 +127,44 @@ void StatusRun::ReportDirectories() {
       return;
     }
   }
-  SinkList sinks;
-  std::unique_ptr<StatusSink> report;
-  if (options_.json) {
-    report = std::make_unique<JsonStatus>(json_, options_.photos);
-  } else {
-    report = std::make_unique<TextReport>(std::cout, options_.photos);
-  }
-  sinks.Append(report.get());
-  if (page != nullptr) {
-    sinks.Append(page.get());
-  }
-  ScanStatus(options_.directories, {options_.recursive, options_.checkVideos}, sinks,
-             ErrorHandler());
-  AddWork(sinks.HasWork());
+  Scan(page.get());
   if (page != nullptr && page->Finish() != 0) {
     AddPageError(page->Error());
   }
+}
+
+std::unique_ptr<StatusSink> StatusRun::MakeReport() {
+  if (options_.json) {
+    return std::make_unique<JsonStatus>(json_, options_.photos);
+  }
+  if (options_.nulTerminated) {
+    return std::make_unique<FailurePaths>(std::cout);
+  }
+  if (options_.failed) {
+    return std::make_unique<FailureLines>(std::cout);
+  }
+  return std::make_unique<TextReport>(std::cout, options_.photos);
+}
+
+void StatusRun::Scan(HtmlPage* page) {
+  const std::unique_ptr<StatusSink> report = MakeReport();
+  FailureValues failures;
+  SinkList sinks;
+  sinks.Append(report.get());
+  if (options_.failed && options_.json) {
+    sinks.Append(&failures);
+  }
+  if (page != nullptr) {
+    sinks.Append(page);
+  }
+  ReasonFinder finder(sinks);
+  const bool findsReasons = page != nullptr || (options_.failed && !options_.nulTerminated);
+  ScanStatus(options_.directories, {options_.recursive, options_.checkVideos},
+             findsReasons ? static_cast<StatusSink&>(finder) : sinks, ErrorHandler());
+  if (options_.failed && options_.json) {
+    json_.Member("failed", failures.List());
+  }
+  AddWork(sinks.HasWork());
 }
 
 void StatusRun::AddPageError(int error) {
@@ -165,7 +192,7 @@ void StatusRun::ReportResumeTime() {
   if (options_.json) {
     json_.Member("resume", DescribeResume(state));
   } else {
-    WriteResumeText(std::cout, state);
+    std::cout << ResumeText(state) << '\n';
   }
 }
 
@@ -178,12 +205,28 @@ void StatusRun::ReportSecurity() {
   }
 }
 
+void StatusRun::ReportConfiguration() {
+  const ConfigurationState state = CheckConfiguration(options_.profileFile);
+  for (const UncheckedFile& unchecked : state.result.unchecked) {
+    AddError(unchecked.file, std::strerror(unchecked.error));
+  }
+  AddWork(!state.result.findings.empty());
+  if (options_.json) {
+    json_.Member("configuration", DescribeConfiguration(state));
+  } else {
+    WriteConfigurationText(std::cout, state);
+  }
+}
+
 void StatusRun::Watch() {
   AddWork(WatchProgress(std::cout, IsOutputTerminal(), options_.json));
 }
 
 void StatusRun::Report() {
   options_.checkVideos = options_.checkVideos && CanCheckVideos();
+  if (options_.failed && options_.directories.empty()) {
+    options_.directories = {"."};
+  }
   if (!options_.directories.empty()) {
     ReportDirectories();
   }
@@ -198,6 +241,9 @@ void StatusRun::Report() {
   }
   if (options_.security) {
     ReportSecurity();
+  }
+  if (options_.checkConfig) {
+    ReportConfiguration();
   }
   if (options_.json) {
     json_.Member("errors", errors_);

@@ -28,6 +28,15 @@ void AddOptions(CLI::App& app, Options& options) {
       ->needs(directories);
   app.add_flag("-r,--recursive", options.recursive, "include everything below the directories")
       ->needs(directories);
+  auto* failed = app.add_flag(
+      "--failed", options.failed,
+      "list the failed photos of the directories, or of the current one, with their sizes, the "
+      "time and the reason, for which the converter is run again");
+  auto* json = app.add_flag("-j,--json", options.json, "write JSON");
+  app.add_flag("-0,--null", options.nulTerminated,
+               "with --failed, write only the paths, each followed by a null byte")
+      ->needs(failed)
+      ->excludes(json);
   app.add_flag("--check-videos", options.checkVideos,
                "check videos too, with the index service; this REMOVES thumbnails of videos that "
                "are outdated or have the wrong orientation, and the Flash or MPEG-4 conversion of "
@@ -41,21 +50,31 @@ void AddOptions(CLI::App& app, Options& options) {
   auto* resumeTime =
       app.add_flag("--resume-time", options.resumeTime, "show until when conversion is paused");
   auto* security = app.add_flag("--security", options.security, "show how the tools are confined");
-  app.add_flag("-w,--watch", options.watch, "follow the progress until no velathumb is running")
+  auto* checkConfig = app.add_option("--check-config", options.profileFile,
+                                     "check the settings and the profile file, by default that of "
+                                     "the services")
+                          ->type_name("PROFILE")
+                          ->expected(0, 1)
+                          ->excludes(directories);
+  app.add_flag("-w,--watch", options.watch,
+               "follow the progress until nothing is running or queued")
       ->excludes(directories)
       ->excludes(queue)
       ->excludes(resumeTime)
-      ->excludes(security);
-  app.add_flag("-j,--json", options.json, "write JSON");
+      ->excludes(security)
+      ->excludes(checkConfig)
+      ->excludes(failed);
 }
 
 /// Returns an error message when options that are valid one by one contradict each other, otherwise
 /// an empty text.
 std::string FindContradiction(const Options& options) {
   const bool hasQuery = !options.directories.empty() || options.queue || options.progress ||
-                        options.watch || options.resumeTime || options.security;
+                        options.watch || options.resumeTime || options.security ||
+                        options.checkConfig || options.failed;
   if (!hasQuery) {
-    return "give a directory, --queue, --progress, --watch, --resume-time or --security";
+    return "give a directory, --failed, --queue, --progress, --watch, --resume-time, --security or "
+           "--check-config";
   }
   if (options.checkVideos && options.directories.empty() && !options.queue) {
     return "--check-videos needs a directory or --queue";
@@ -81,7 +100,10 @@ ParseOutcome ParseOptions(int argc, char** argv, Options& options) {
   return ParseCommandLine(
       kProgramText, LiteralArguments(ArgumentsOf(argc, argv)),
       [&](CLI::App& app) { AddOptions(app, options); },
-      [&](const CLI::App&) { return FindContradiction(options); });
+      [&](const CLI::App& app) {
+        options.checkConfig = app.count("--check-config") > 0;
+        return FindContradiction(options);
+      });
 }
 
 }  // namespace vela

@@ -18,7 +18,11 @@ struct Options {
   bool progress = false;
   bool watch = false;
   bool resumeTime = false;
-  bool security = false;  ///< show how the tools are confined
+  bool security = false;       ///< show how the tools are confined
+  bool failed = false;         ///< list the failed photos with their reasons
+  bool nulTerminated = false;  ///< only their paths, each followed by a null byte
+  bool checkConfig = false;
+  std::string profileFile;  ///< for checkConfig; empty: the one that the services use
   bool json = false;
   std::string htmlFile;  ///< empty: no page
 };

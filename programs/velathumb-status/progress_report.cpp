@@ -71,15 +71,16 @@ Json::Value DescribeProgress(const ProgressState& state) {
   return object;
 }
 
-void WriteResumeText(std::ostream& out, const ResumeState& state) {
+std::string ResumeText(const ResumeState& state) {
   if (state.isReached) {
-    out << "conversion is not paused\n";
-  } else if (state.resumeTime < 0) {
-    out << "conversion is paused indefinitely (resume time " << state.resumeTime << ")\n";
-  } else {
-    out << "conversion is paused until " << FormatTime(state.resumeTime) << ", for "
-        << state.waitSeconds << " s\n";
+    return "conversion is not paused";
   }
+  if (state.resumeTime < 0) {
+    return "conversion is paused indefinitely (resume time " + std::to_string(state.resumeTime) +
+           ")";
+  }
+  return "conversion is paused until " + FormatTime(state.resumeTime) + ", for " +
+         std::to_string(state.waitSeconds) + " s";
 }
 
 Json::Value DescribeResume(const ResumeState& state) {

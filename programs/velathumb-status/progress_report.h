@@ -4,6 +4,7 @@
 #include <json/value.h>
 
 #include <iosfwd>
+#include <string>
 #include <vector>
 
 #include "progress/progress_summary.h"
@@ -25,7 +26,8 @@ ProgressState ReadProgressState();
 void WriteProgressText(std::ostream& out, const ProgressState& state);
 Json::Value DescribeProgress(const ProgressState& state);
 
-void WriteResumeText(std::ostream& out, const ResumeState& state);
+/// Returns whether and until when conversion is paused, as a line without its newline.
+std::string ResumeText(const ResumeState& state);
 Json::Value DescribeResume(const ResumeState& state);
 
 }  // namespace vela

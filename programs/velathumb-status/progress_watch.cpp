@@ -7,6 +7,7 @@
 #include <string>
 #include <thread>
 
+#include "conversion_state.h"
 #include "index/strict_json.h"
 #include "json_report.h"
 #include "posix/terminal.h"
@@ -26,15 +27,59 @@ void DrawBar(std::ostream& out, const std::string& line, int width) {
   out << '\r' << line.substr(0, static_cast<size_t>(width - 1)) << "\033[K" << std::flush;
 }
 
-Json::Value DescribeState(const ProgressState& state, const FollowedCount& followed,
-                          const ProgressRate& rate) {
-  Json::Value object = DescribeProgress(state);
+const char* ActivityName(Activity activity) {
+  switch (activity) {
+    case Activity::kRunning:
+      return "running";
+    case Activity::kPaused:
+      return "paused";
+    case Activity::kWaiting:
+      return "waiting";
+    case Activity::kEnded:
+      break;
+  }
+  return "ended";
+}
+
+/// Returns what has to change for a new line.
+Json::Value DescribeState(const ConversionState& state) {
+  Json::Value object = DescribeProgress(state.progress);
+  object["activity"] = ActivityName(state.activity);
+  object["resume_time"] = state.activity == Activity::kPaused
+                              ? Json::Value(Json::Int64{state.resume.resumeTime})
+                              : Json::Value();
+  return object;
+}
+
+Json::Value DescribeMoment(const ConversionState& state, const FollowedCount& followed,
+                           const ProgressRate& rate) {
+  Json::Value object = DescribeState(state);
   const auto perSecond = rate.PerSecond();
   const auto left = rate.TimeLeft(followed.count.total);
   object["unit"] = followed.unit;
   object["rate"] = perSecond ? Json::Value(*perSecond) : Json::Value();
   object["seconds_left"] = left ? Json::Value(Json::Int64{left->count()}) : Json::Value();
+  object["seconds_until_resume"] =
+      state.activity == Activity::kPaused && state.resume.resumeTime > 0
+          ? Json::Value(Json::Int64{state.resume.waitSeconds})
+          : Json::Value();
   return object;
+}
+
+/// Returns the line for a terminal of `width` columns. During a pause the counters are those of an
+/// earlier run, and a bar would show it as finished.
+std::string FormatLine(const ConversionState& state, const FollowedCount& followed,
+                       const ProgressRate& rate, int width) {
+  switch (state.activity) {
+    case Activity::kPaused:
+      return ResumeText(state.resume);
+    case Activity::kWaiting:
+      return "the queue has entries, waiting for velathumb-queue";
+    case Activity::kRunning:
+    case Activity::kEnded:
+      break;
+  }
+  return FormatProgressBar(followed, rate, width);
 }
 
 /// Shows one state after the other.
@@ -43,8 +88,8 @@ class ProgressView {
   ProgressView(std::ostream& out, bool isTerminal, bool asJson)
       : out_(out), isTerminal_(isTerminal), asJson_(asJson) {}
 
-  void Show(const ProgressState& state) {
-    const FollowedCount followed = ChooseCount(state.summary);
+  void Show(const ConversionState& state) {
+    const FollowedCount followed = ChooseCount(state.progress.summary);
     if (followed.unit != unit_) {
       // The rate of one counter says nothing about the other.
       rate_ = ProgressRate();
@@ -53,27 +98,33 @@ class ProgressView {
     rate_.Note(ProgressRate::Clock::now(), followed.count.completed);
     if (!asJson_ && isTerminal_) {
       const int width = TerminalWidth();
-      DrawBar(out_, FormatProgressBar(followed, rate_, width), width);
+      DrawBar(out_, FormatLine(state, followed, rate_, width), width);
       return;
     }
-    std::string counts = ToJsonText(DescribeProgress(state));
-    if (counts == lastCounts_) {
+    std::string description = ToJsonText(DescribeState(state));
+    if (description == lastState_) {
       return;
     }
-    lastCounts_ = std::move(counts);
-    out_ << (asJson_ ? ToJsonText(DescribeState(state, followed, rate_))
-                     : FormatProgressBar(followed, rate_, kLineWidth))
-         << std::endl;
+    lastState_ = std::move(description);
+    const std::string line = asJson_ ? ToJsonText(DescribeMoment(state, followed, rate_))
+                                     : FormatLine(state, followed, rate_, kLineWidth);
+    if (line != lastLine_) {
+      out_ << line << std::endl;
+      lastLine_ = line;
+    }
   }
 
-  void End(const ProgressState& state) {
+  void End(const ConversionState& state) {
     if (asJson_) {
       return;
     }
     if (isTerminal_) {
       out_ << '\n';
     }
-    WriteProgressText(out_, state);
+    WriteProgressText(out_, state.progress);
+    if (state.activity == Activity::kPaused) {
+      out_ << ResumeText(state.resume) << '\n';
+    }
   }
 
  private:
@@ -82,22 +133,23 @@ class ProgressView {
   const bool asJson_;
   ProgressRate rate_;
   std::string unit_;
-  std::string lastCounts_;
+  std::string lastState_;
+  std::string lastLine_;
 };
 
 }  // namespace
 
 bool WatchProgress(std::ostream& out, bool isTerminal, bool asJson) {
   ProgressView view(out, isTerminal, asJson);
-  ProgressState state = ReadProgressState();
+  ConversionState state = ReadConversionState();
   view.Show(state);
-  while (!state.instances.empty() && out.good()) {
+  while (state.mayContinue && out.good()) {
     std::this_thread::sleep_for(kInterval);
-    state = ReadProgressState();
+    state = ReadConversionState();
     view.Show(state);
   }
   view.End(state);
-  return state.HasWork();
+  return state.progress.HasWork();
 }
 
 }  // namespace vela

@@ -18,13 +18,15 @@ struct QueueFile {
   const char* kind;
   const char* path;
   bool isVideo;
+  bool isDeferred;
 };
 
-/// The entries that are being processed come first.
-constexpr QueueFile kQueueFiles[] = {{"photo", kPhotoQueue.tempFile, false},
-                                     {"photo", kPhotoQueue.file, false},
-                                     {"video", kVideoQueue.tempFile, true},
-                                     {"video", kVideoQueue.file, true}};
+/// The entries that are being processed come first, those that have to wait longest come last.
+constexpr QueueFile kQueueFiles[] = {{"photo", kPhotoQueue.tempFile, false, false},
+                                     {"photo", kPhotoQueue.file, false, false},
+                                     {"video", kVideoQueue.tempFile, true, false},
+                                     {"video", kVideoQueue.file, true, false},
+                                     {"photo", kDeferredPhotosFile, false, true}};
 
 /// Calls `visit` with each entry of the file, if it exists. Returns their number.
 int64_t ReadQueue(const QueueFile& queue, const ScanErrorHandler& onError,
@@ -48,7 +50,7 @@ int64_t ReadQueue(const QueueFile& queue, const ScanErrorHandler& onError,
 bool WriteQueueText(std::ostream& out, bool checkVideos, const ScanErrorHandler& onError) {
   int64_t all = 0;
   for (const QueueFile& queue : kQueueFiles) {
-    out << queue.kind << " queue " << queue.path << '\n';
+    out << queue.kind << " queue " << queue.path << (queue.isDeferred ? ", deferred" : "") << '\n';
     const int64_t count = ReadQueue(queue, onError, [&out](const std::string& entry) {
       out << "    " << ToPlainLine(entry) << '\n';
     });
@@ -69,6 +71,7 @@ bool WriteQueueJson(JsonReport& report, bool checkVideos, const ScanErrorHandler
     Json::Value object;
     object["kind"] = queue.kind;
     object["file"] = queue.path;
+    object["deferred"] = queue.isDeferred;
     object["videos_needing_work"] =
         checkVideos && queue.isVideo ? Json::Value(CountVideoQueueWork(queue.path)) : Json::Value();
     report.BeginElement(object, "entries");

@@ -13,6 +13,16 @@ int PhotoReport::FailureCount() const {
                                         [](const auto& failure) { return failure.has_value(); }));
 }
 
+std::optional<time_t> PhotoReport::FirstFailure() const {
+  std::optional<time_t> first;
+  for (const auto& failure : failures) {
+    if (failure && (!first || *failure < *first)) {
+      first = failure;
+    }
+  }
+  return first;
+}
+
 void StatusCounts::Add(const PhotoReport& photo) {
   const int missing = photo.thumbs.Missing();
   ++photos;

@@ -19,8 +19,13 @@ struct PhotoReport {
   /// class.
   std::array<std::optional<time_t>, kThumbSizeCount> failures = {};
 
+  std::string reason;  ///< why they could not be made, unchecked text; empty when not examined
+
   /// Returns the file name.
   std::string Name() const;
+
+  /// Returns when a thumbnail could not be made for the first time, nothing without a failure.
+  std::optional<time_t> FirstFailure() const;
 
   /// Returns the number of failure markers.
   int FailureCount() const;

@@ -141,15 +141,17 @@ void StatusScan::ScanTree(const std::string& root) {
     ScanDirectory(root);
     return;
   }
-  bool isEntered = false;
-  const int result =
-      ForEachIndexedDirectory(root.c_str(), [&](const char* path, bool /*isReadable*/) {
-        isEntered = true;
-        ScanDirectory(path);
-      });
+  std::vector<std::string> directories;
+  const int result = ForEachIndexedDirectory(
+      root.c_str(), [&](const char* path, bool /*isReadable*/) { directories.emplace_back(path); });
+  const int error = errno;
+  std::sort(directories.begin(), directories.end());
+  for (const std::string& directory : directories) {
+    ScanDirectory(directory);
+  }
   if (result != 0) {
-    onError_(root, std::string("was not scanned completely: ") + std::strerror(errno));
-  } else if (!isEntered) {
+    onError_(root, std::string("was not scanned completely: ") + std::strerror(error));
+  } else if (directories.empty()) {
     onError_(root, "is skipped in trees because of its name");
   }
 }

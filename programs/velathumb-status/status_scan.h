@@ -19,7 +19,7 @@ struct ScanOptions {
 using ScanErrorHandler = std::function<void(const std::string& path, const std::string& message)>;
 
 /// Scans the directories one after the other, each once however often it is found, and passes the
-/// results to `sink`.
+/// results to `sink`. Those of a tree are sorted by the bytes of their paths.
 void ScanStatus(const std::vector<std::string>& directories, const ScanOptions& options,
                 StatusSink& sink, const ScanErrorHandler& onError);
 

@@ -2,11 +2,11 @@
 
 _velathumb_status() {
   local current=${COMP_WORDS[COMP_CWORD]} previous=${COMP_WORDS[COMP_CWORD - 1]}
-  local options='-p -r -q -w -j -h --photos --recursive --check-videos --html --queue --progress --resume-time
-    --security --watch --json --help --version'
+  local options='-p -r -q -w -j -0 -h --photos --recursive --failed --null --check-videos --html --queue
+    --progress --resume-time --security --check-config --watch --json --help --version'
   compopt -o filenames 2>/dev/null
   # Bash treats the equals sign as a separate word.
-  if [[ $previous == --html || ($previous == '=' && ${COMP_WORDS[COMP_CWORD - 2]} == --html) ]]; then
+  if [[ $previous == @(--html|--check-config) || ($previous == '=' && ${COMP_WORDS[COMP_CWORD - 2]} == --html) ]]; then
     mapfile -t COMPREPLY < <(compgen -f -- "$current")
   elif [[ $current == -* ]]; then
     compopt +o filenames 2>/dev/null

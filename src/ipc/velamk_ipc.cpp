@@ -2,7 +2,12 @@
 
 #include <json/value.h>
 
+#include <cerrno>
+#include <cstdlib>
+
+#include "ipc/absent_daemon.h"
 #include "platform/velaindex.h"
+#include "platform/vlibc.h"
 #include "posix/identity.h"
 #include "posix/log.h"
 
@@ -16,12 +21,6 @@ constexpr int kExchangeSeconds = 1800;
 Json::Value MakeRequest(const char* command) {
   Json::Value packet(Json::objectValue);
   packet["command"] = command;
-  return packet;
-}
-
-Json::Value MakePathRequest(const char* command, const char* path) {
-  Json::Value packet = MakeRequest(command);
-  packet["path"] = path == nullptr ? "" : path;
   return packet;
 }
 
@@ -40,16 +39,36 @@ int ToInt(const Json::Value& value) {
   return value.isConvertibleTo(Json::intValue) ? value.asInt() : 0;
 }
 
+/// Returns whether a request has failed, with this platform error, only because nobody listens, and
+/// that has been logged before.
+bool IsAbsenceKnown(int error) {
+  const bool isAbsent = error == ENOENT || error == ECONNREFUSED;
+  return isAbsent && std::getenv(kAbsentDaemonVariable) != nullptr;
+}
+
 /// Replaces the request by the daemon's reply. Returns true when the daemon succeeded; a failure is
-/// logged with the operation's `line`.
+/// logged with the operation's `line`, unless it is known that there is no daemon.
 bool Exchange(Json::Value& packet, int line) {
   const OwnIdentity own;
-  AutoSendRecvPacket(PluginDaemonSocketPath, -1, packet, kExchangeSeconds);
+  const int result = AutoSendRecvPacket(PluginDaemonSocketPath, -1, packet, kExchangeSeconds);
   if (ToBool(Member(packet, "success"))) {
     return true;
   }
-  LogError(kLogSource, line, "fail");
+  if (result == 0 || !IsAbsenceKnown(VLIBCErrGet())) {
+    LogError(kLogSource, line, "fail");
+  }
   return false;
+}
+
+/// Does the same for a request about `path`; without one there is nothing to ask, which is a
+/// failure.
+bool ExchangeAbout(const char* path, Json::Value& packet, int line) {
+  if (path == nullptr) {
+    LogError(kLogSource, line, "fail");
+    return false;
+  }
+  packet["path"] = path;
+  return Exchange(packet, line);
 }
 
 bool QuerySwitch(const char* command, int line) {
@@ -60,9 +79,9 @@ bool QuerySwitch(const char* command, int line) {
 }  // namespace
 
 int GetMediaFromPluginDB(int type, const char* path, VELA_MEDIA_INFO& out) {
-  Json::Value packet = MakePathRequest("GET_MEDIA_FROM_PLUGIN_DB", path);
+  Json::Value packet = MakeRequest("GET_MEDIA_FROM_PLUGIN_DB");
   packet["type"] = type;
-  if (!Exchange(packet, 30)) {
+  if (!ExchangeAbout(path, packet, 30)) {
     return -1;
   }
   Json::Value media = Member(packet, "media");
@@ -74,8 +93,8 @@ int GetMediaFromPluginDB(int type, const char* path, VELA_MEDIA_INFO& out) {
 }
 
 int GetIndexVersion(const char* path) {
-  Json::Value packet = MakePathRequest("GET_INDEX_VERSION", path);
-  return Exchange(packet, 57) ? ToInt(Member(packet, "version")) : -1;
+  Json::Value packet = MakeRequest("GET_INDEX_VERSION");
+  return ExchangeAbout(path, packet, 57) ? ToInt(Member(packet, "version")) : -1;
 }
 
 bool IsDisableConvertVideo() {
@@ -87,11 +106,11 @@ bool IsDisableConvertPhoto() {
 }
 
 void PostPhotoConvert(const char* path) {
-  Json::Value packet = MakePathRequest("POST_PHOTO_CONVERT", path);
-  Exchange(packet, 137);
+  Json::Value packet = MakeRequest("POST_PHOTO_CONVERT");
+  ExchangeAbout(path, packet, 137);
 }
 
 void PostVideoConvert(const char* path) {
-  Json::Value packet = MakePathRequest("POST_VIDEO_CONVERT", path);
-  Exchange(packet, 157);
+  Json::Value packet = MakeRequest("POST_VIDEO_CONVERT");
+  ExchangeAbout(path, packet, 157);
 }

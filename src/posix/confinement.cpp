@@ -8,7 +8,6 @@
 #include <cerrno>
 
 #include "posix/folder.h"
-#include "posix/system_call_filter.h"
 
 namespace vela {
 
@@ -71,6 +70,11 @@ void LowerLimits(const ResourceLimits& limits) {
   Lower(RLIMIT_FSIZE, Limit(limits.fileSize), Limit(limits.fileSize));
 }
 
+bool IsMemoryLimitedBelow(uint64_t bytes) {
+  rlimit limit = {};
+  return getrlimit(RLIMIT_DATA, &limit) == 0 && limit.rlim_cur < Limit(bytes);
+}
+
 void DisableCoreDumps() {
   rlimit limit = {};
   getrlimit(RLIMIT_CORE, &limit);
@@ -83,8 +87,9 @@ void DisableCoreDumps() {
 int PreparedConfinement::Prepare(const Confinement& confinement) {
   limits_ = confinement.limits;
   blocksSystemCalls_ = confinement.blocksSystemCalls;
+  sockets_ = confinement.sockets;
   if (blocksSystemCalls_) {
-    PrepareSystemCallFilter();
+    PrepareSystemCallFilter(sockets_);
   }
   ruleset_.Reset();
   return confinement.files ? UnlessUnsupported(MakeLandlockRuleset(*confinement.files, ruleset_))
@@ -102,7 +107,7 @@ int PreparedConfinement::Enter() const {
     error = UnlessUnsupported(EnterLandlockRuleset(ruleset_.Get()));
   }
   if (error == 0 && blocksSystemCalls_) {
-    error = UnlessUnsupported(BlockUnneededSystemCalls());
+    error = UnlessUnsupported(BlockUnneededSystemCalls(sockets_));
   }
   return error;
 }

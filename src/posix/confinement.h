@@ -9,6 +9,7 @@
 
 #include "posix/file_descriptor.h"
 #include "posix/landlock.h"
+#include "posix/system_call_filter.h"
 
 namespace vela {
 
@@ -24,6 +25,10 @@ struct ResourceLimits {
 /// Applies the limits to this process and what it starts. Lower limits that exist already stay.
 /// Only makes system calls.
 void LowerLimits(const ResourceLimits& limits);
+
+/// Returns true when this process may use less than that many bytes of memory that is not part of a
+/// file.
+bool IsMemoryLimitedBelow(uint64_t bytes);
 
 /// Makes sure that a crash leaves no core dump, neither as a file nor with a crash handler. Only
 /// makes system calls.
@@ -43,7 +48,8 @@ ConfinementSupport FindConfinementSupport();
 /// The restrictions of a process.
 struct Confinement {
   ResourceLimits limits;
-  bool blocksSystemCalls = true;      ///< those of BlockUnneededSystemCalls
+  bool blocksSystemCalls = true;  ///< those of BlockUnneededSystemCalls
+  SocketUse sockets = SocketUse::kNone;
   std::optional<AllowedFiles> files;  ///< nothing: all files
   /// Variables of a program that is started, as "NAME=value", besides those that every program has.
   std::vector<std::string> environment;
@@ -66,6 +72,7 @@ class PreparedConfinement {
  private:
   ResourceLimits limits_;
   bool blocksSystemCalls_ = false;
+  SocketUse sockets_ = SocketUse::kNone;
   FileDescriptor ruleset_;
 };
 

@@ -123,6 +123,11 @@ std::string ReadSmallFile(const std::string& path, size_t limit) {
   return ReadSmall(file, status, limit);
 }
 
+bool BeginsWith(const std::string& path, std::string_view bytes) {
+  const FileDescriptor file = OpenForReading(path);
+  return file.IsOpen() && ReadAt(file.Get(), 0, bytes.size()) == bytes;
+}
+
 std::string ReadSystemFile(const std::string& path, size_t limit) {
   const FileDescriptor file = OpenForReading(path);
   struct stat status = {};

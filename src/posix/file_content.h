@@ -39,6 +39,9 @@ std::string ReadSmallFile(const std::string& path, size_t limit);
 /// and on errors. Never waits for a pipe's writer.
 std::string ReadSystemFile(const std::string& path, size_t limit);
 
+/// Returns whether the file `path` begins with these bytes; false when it cannot be read.
+bool BeginsWith(const std::string& path, std::string_view bytes);
+
 /// The content of a file as memory that cannot be written to. Where the file has become shorter
 /// since, reading it ends the process.
 class FileMapping {

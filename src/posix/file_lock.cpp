@@ -321,6 +321,21 @@ bool IsLocked(const std::string& path) {
   return directory.IsOpen() && TryLockExclusively(directory.Get()) == EWOULDBLOCK;
 }
 
+ProcessLockState StateOfProcessLock(const std::string& path) {
+  constexpr int kFlags = O_RDONLY | O_NOFOLLOW | O_NONBLOCK | O_NOCTTY | O_CLOEXEC;
+  const FileDescriptor file(open(path.c_str(), kFlags));
+  if (!file.IsOpen()) {
+    return errno == EACCES || errno == EPERM ? ProcessLockState::kUnknown : ProcessLockState::kFree;
+  }
+  struct flock whole = {};
+  whole.l_type = F_WRLCK;
+  whole.l_whence = SEEK_SET;
+  if (fcntl(file.Get(), F_GETLK, &whole) != 0) {
+    return ProcessLockState::kUnknown;
+  }
+  return whole.l_type == F_UNLCK ? ProcessLockState::kFree : ProcessLockState::kHeld;
+}
+
 FileDescriptor TakeProcessLock(const std::string& path, bool wait) {
   FileDescriptor file;
   for (bool isTaken = false; !isTaken;) {

@@ -112,4 +112,15 @@ bool IsLocked(const std::string& path);
 /// when something other than a regular file of this user is at `path`.
 FileDescriptor TakeProcessLock(const std::string& path, bool wait);
 
+/// Whether a process holds the lock of TakeProcessLock.
+enum class ProcessLockState {
+  kFree,
+  kHeld,
+  kUnknown,  ///< this user may not open the lock file
+};
+
+/// Returns the state of the lock at `path`. Neither creates the file nor takes a lock, so that
+/// nobody who takes the lock at that moment is refused.
+ProcessLockState StateOfProcessLock(const std::string& path);
+
 }  // namespace vela

@@ -484,4 +484,22 @@ std::string FindUnusedPath(const std::string& nameTemplate) {
   return {};
 }
 
+ScratchDirectory::ScratchDirectory() {
+  if (mkdtemp(path_.data()) == nullptr) {
+    path_.clear();
+  }
+}
+
+ScratchDirectory::~ScratchDirectory() {
+  DIR* const stream = path_.empty() ? nullptr : opendir(path_.c_str());
+  if (stream == nullptr) {
+    return;
+  }
+  while (const dirent* const entry = readdir(stream)) {
+    unlinkat(dirfd(stream), entry->d_name, 0);
+  }
+  closedir(stream);
+  rmdir(path_.c_str());
+}
+
 }  // namespace vela

@@ -146,4 +146,20 @@ int RemoveEntry(const std::string& path);
 /// empty string when no file can be created there.
 std::string FindUnusedPath(const std::string& nameTemplate);
 
+/// A new directory in /tmp for files of this user's programs, which no other user can enter.
+/// Removed with its files, but not with directories in it, at the end.
+class ScratchDirectory {
+ public:
+  ScratchDirectory();
+  ~ScratchDirectory();
+  ScratchDirectory(const ScratchDirectory&) = delete;
+  ScratchDirectory& operator=(const ScratchDirectory&) = delete;
+
+  /// Returns its path, empty when it could not be created.
+  const std::string& Path() const { return path_; }
+
+ private:
+  std::string path_ = "/tmp/velathumb.XXXXXX";
+};
+
 }  // namespace vela

@@ -10,6 +10,7 @@
 
 #include "posix/escaped_text.h"
 #include "posix/file_content.h"
+#include "posix/terminal.h"
 
 namespace vela {
 
@@ -24,6 +25,15 @@ bool IsConnectedToJournal() {
     return false;
   }
   return stream == std::to_string(status.st_dev) + ':' + std::to_string(status.st_ino);
+}
+
+/// Begins a line in place of the last one.
+constexpr char kEraseLine[] = "\r\033[K";
+
+/// What ShowStatusLine has shown.
+std::string& StatusLine() {
+  static std::string line;
+  return line;
 }
 
 std::string Prefix(LogLevel level) {
@@ -43,11 +53,20 @@ bool IsLogInJournal() {
 void WriteLog(LogLevel level, std::string_view message) {
   const std::string line = Prefix(level) + EscapeControls(message, InvalidBytes::kEscape) + '\n';
   // Usually a single write, so that lines of several threads and processes do not mix.
-  WriteAll(STDERR_FILENO, line);
+  const std::string& status = StatusLine();
+  WriteAll(STDERR_FILENO, status.empty() ? line : kEraseLine + line + status);
 }
 
 void WriteLog(LogLevel level, std::string_view message, int error) {
   WriteLog(level, std::string(message) + ": " + std::strerror(error));
+}
+
+void ShowStatusLine(std::string_view line) {
+  if (line == StatusLine() || !IsErrorTerminal()) {
+    return;
+  }
+  StatusLine() = line;
+  WriteAll(STDERR_FILENO, kEraseLine + StatusLine());
 }
 
 }  // namespace vela

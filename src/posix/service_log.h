@@ -20,4 +20,9 @@ void WriteLog(LogLevel level, std::string_view message);
 /// The same, with the text of the errno value `error` appended.
 void WriteLog(LogLevel level, std::string_view message, int error);
 
+/// Shows `line`, which must fit into a line of the terminal, below all messages on standard error,
+/// in place of the one shown before; an empty line removes it. Does nothing unless standard error
+/// is a terminal. Only for programs with one thread.
+void ShowStatusLine(std::string_view line);
+
 }  // namespace vela

@@ -6,6 +6,7 @@
 #include <sched.h>
 #include <sys/ioctl.h>
 #include <sys/prctl.h>
+#include <sys/socket.h>
 #include <sys/syscall.h>
 #include <unistd.h>
 
@@ -57,10 +58,16 @@ constexpr int kRemovexattrat = 466;
 constexpr int kOpenTreeAttr = 467;
 constexpr int kFileSetattr = 469;
 
-// Some machines have one call for all of them.
-constexpr int kNetwork[] = {SCMP_SYS(socketcall), SCMP_SYS(socket), SCMP_SYS(connect),
-                            SCMP_SYS(bind),       SCMP_SYS(listen), SCMP_SYS(accept),
-                            SCMP_SYS(accept4)};
+// Some machines have one call for all of them. The last two could send a message to a socket that
+// is not the other end of a connection.
+constexpr int kNetwork[] = {SCMP_SYS(socketcall), SCMP_SYS(bind),    SCMP_SYS(listen),
+                            SCMP_SYS(accept),     SCMP_SYS(accept4), SCMP_SYS(sendmsg),
+                            SCMP_SYS(sendmmsg)};
+
+constexpr int kConnecting[] = {SCMP_SYS(socket), SCMP_SYS(connect)};
+
+/// The bits of a socket's type without its flags.
+constexpr uint32_t kSocketTypeMask = 0xf;
 
 constexpr int kOtherProcesses[] = {
 // The leak check of a sanitizer needs this.
@@ -265,9 +272,21 @@ class FilterProgram {
   std::vector<Rule> rules_;
 };
 
-Code MakeFilterOfUnneededCalls() {
-  FilterProgram program;
+void RefuseNetwork(SocketUse sockets, FilterProgram& program) {
   program.Refuse(kNetwork);
+  // With an address of no bytes, a message goes to the other end of the connection.
+  program.RefuseWhen(SCMP_SYS(sendto), {{5, UINT32_MAX, 0, false}});
+  if (sockets == SocketUse::kNone) {
+    program.Refuse(kConnecting);
+    return;
+  }
+  program.RefuseWhen(SCMP_SYS(socket),
+                     {{0, UINT32_MAX, AF_UNIX, false}, {1, kSocketTypeMask, SOCK_DGRAM, false}});
+}
+
+Code MakeFilterOfUnneededCalls(SocketUse sockets) {
+  FilterProgram program;
+  RefuseNetwork(sockets, program);
   program.Refuse(kOtherProcesses);
   program.Refuse(kSystem);
   program.Refuse(kFileAttributes);
@@ -285,8 +304,12 @@ Code MakeFilterOfUnneededCalls() {
 }
 
 /// Never destroyed: threads may still start tools while the program ends.
-const Code& FilterOfUnneededCalls() {
-  static const auto* const filter = new Code(MakeFilterOfUnneededCalls());
+const Code& FilterOfUnneededCalls(SocketUse sockets) {
+  if (sockets == SocketUse::kLocalDatagrams) {
+    static const auto* const filter = new Code(MakeFilterOfUnneededCalls(sockets));
+    return *filter;
+  }
+  static const auto* const filter = new Code(MakeFilterOfUnneededCalls(sockets));
   return *filter;
 }
 
@@ -323,12 +346,12 @@ bool CanBlockSystemCalls() {
   return syscall(SYS_seccomp, SECCOMP_SET_MODE_FILTER, 0, nullptr) < 0 && errno == EFAULT;
 }
 
-void PrepareSystemCallFilter() {
-  FilterOfUnneededCalls();
+void PrepareSystemCallFilter(SocketUse sockets) {
+  FilterOfUnneededCalls(sockets);
 }
 
-int BlockUnneededSystemCalls() {
-  return Activate(FilterOfUnneededCalls());
+int BlockUnneededSystemCalls(SocketUse sockets) {
+  return Activate(FilterOfUnneededCalls(sockets));
 }
 
 void BlockOtherPrograms() {

@@ -1,4 +1,4 @@
-// Standard output as a terminal.
+// Standard output and standard error as terminals.
 #pragma once
 
 namespace vela {
@@ -8,5 +8,11 @@ bool IsOutputTerminal();
 
 /// Returns the number of columns of the terminal on standard output, 80 when it is unknown.
 int TerminalWidth();
+
+/// Returns whether standard error is a terminal on which a line can be replaced.
+bool IsErrorTerminal();
+
+/// Returns the number of columns of the terminal on standard error, 80 when it is unknown.
+int ErrorTerminalWidth();
 
 }  // namespace vela

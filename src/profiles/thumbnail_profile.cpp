@@ -4,6 +4,7 @@
 #include <cstddef>
 #include <utility>
 
+#include "configuration/profile_values.h"
 #include "platform/velaindex.h"
 #include "platform/velautils.h"
 #include "storage/velamk_util.h"
@@ -23,17 +24,17 @@ bool FillsArea(const std::string& thumbName) {
 }
 
 bool IsThumbSection(const std::string& section) {
-  return section.compare(0, 5, "thumb") == 0;
+  return section.compare(0, kThumbSectionPrefix.size(), kThumbSectionPrefix) == 0;
 }
 
 /// Builds the profile of one section; null when the section has no wanted thumbnail.
 std::unique_ptr<const ThumbnailProfile> ReadProfile(const VELAUtils::ConfParser& conf,
                                                     const std::string& section, int32_t sizeMap) {
-  const int size = conf.getInt(section, "size", 120);
-  const int quality = conf.getInt(section, "quality", 80);
-  std::string unsharp = conf.getString(section, "unsharp", "");
-  std::string filename = conf.getString(section, "filename", "");
-  const int phase = conf.getInt(section, "phase", 0);
+  const int size = conf.getInt(section, kSizeKey, kDefaultSize);
+  const int quality = conf.getInt(section, kQualityKey, kDefaultQuality);
+  std::string unsharp = conf.getString(section, kUnsharpKey, "");
+  std::string filename = conf.getString(section, kFilenameKey, "");
+  const int phase = conf.getInt(section, kPhaseKey, kDefaultPhase);
   if (filename.empty() || IsThumbInSizeMap(filename.c_str(), sizeMap) == 0) {
     return nullptr;
   }

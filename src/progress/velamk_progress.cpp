@@ -8,6 +8,7 @@
 #include <limits>
 #include <string>
 
+#include "configuration/settings.h"
 #include "platform/system_rules.h"
 #include "platform/velaindex.h"
 #include "platform/vlibc.h"

@@ -138,6 +138,9 @@ int GetRawImageSize(const std::string& path, uint32_t& width, uint32_t& height) 
 }
 
 bool DcrawToFile(const std::string& rawPath, const std::string& outPath, const char* option) {
+  if (option == nullptr) {
+    return false;
+  }
   const ToolOutput output(VLIBCPopen(kDcrawPath, "r", option, "-c", rawPath.c_str(), nullptr));
   if (!output.IsOpen()) {
     AppLogError(kErrorPriority, "%s:%d VLIBCPopen [%s %s -c] failed", kProgramLogSource, 569,

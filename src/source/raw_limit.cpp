@@ -1,10 +1,9 @@
 #include "source/raw_limit.h"
 
-#include <charconv>
 #include <cstdint>
-#include <cstring>
-#include <system_error>
 
+#include "configuration/settings.h"
+#include "configuration/whole_number.h"
 #include "header/header_reader.h"
 #include "platform/system_rules.h"
 #include "platform/vlibc.h"
@@ -13,21 +12,13 @@ namespace vela {
 
 namespace {
 
-constexpr char kLimitKey[] = "raw_pixel_limit";
-
-/// More than three times what the largest cameras record, and 3 GB in the decoder.
-constexpr uint64_t kDefaultLimit = 500'000'000;
-
 /// Returns the limit in pixels, 0 for none.
 uint64_t RawPixelLimit() {
   char text[32] = "";
-  if (VLIBCFileGetKeyValue(kSettingsFile, kLimitKey, text, sizeof text, 0) <= 0) {
-    return kDefaultLimit;
+  if (VLIBCFileGetKeyValue(kSettingsFile, kRawPixelLimitKey, text, sizeof text, 0) <= 0) {
+    return kDefaultRawPixelLimit;
   }
-  const char* const end = text + std::strlen(text);
-  uint64_t limit = 0;
-  const auto [last, error] = std::from_chars(text, end, limit);
-  return error == std::errc() && last == end ? limit : kDefaultLimit;
+  return ParseWholeNumber<uint64_t>(text).value_or(kDefaultRawPixelLimit);
 }
 
 }  // namespace

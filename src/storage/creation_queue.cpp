@@ -1,6 +1,7 @@
 #include "storage/creation_queue.h"
 
 #include <cstring>
+#include <unordered_set>
 
 #include "platform/system_rules.h"
 #include "platform/vlibc.h"
@@ -14,6 +15,21 @@ namespace {
 
 /// The flags that all callers have always passed to the line search.
 constexpr int kLineSearchFlags = 1028;
+
+/// Returns whether the file has an entry that is not among `done`.
+bool HasEntryBeyond(const char* queueFile, const std::unordered_set<std::string>& done) {
+  LineReader lines(queueFile);
+  while (lines.IsOpen() && lines.Next()) {
+    if (lines.Length() >= kPathBufferSize) {
+      continue;
+    }
+    const std::string entry = lines.WithoutNewline();
+    if (!entry.empty() && done.count(entry) == 0) {
+      return true;
+    }
+  }
+  return false;
+}
 
 }  // namespace
 
@@ -47,6 +63,16 @@ QueueRead ForEachQueueEntry(const char* queueFile,
     }
   }
   return lines.HasFailed() ? QueueRead::kIncomplete : QueueRead::kComplete;
+}
+
+bool HasPhotosToProcess() {
+  // In this order: a runner that starts meanwhile renames the first file to the second one.
+  if (HasEntryBeyond(kPhotoQueue.file, {})) {
+    return true;
+  }
+  std::unordered_set<std::string> done;
+  ForEachQueueEntry(kDonePhotosFile, [&](const std::string& entry) { done.insert(entry); });
+  return HasEntryBeyond(kPhotoQueue.tempFile, done);
 }
 
 }  // namespace vela

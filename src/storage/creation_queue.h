@@ -15,6 +15,13 @@ struct CreationQueue {
 /// Directories whose photos need thumbnails.
 inline constexpr CreationQueue kPhotoQueue = {"/var/spool/thumb_create.queue",
                                               "/var/spool/thumb_create.queue.tmp"};
+/// Those of the directories in process that are done, one per line.
+inline constexpr char kDonePhotosFile[] = "/var/spool/thumb_create.queue.done";
+/// Directories that could not be processed, deferred to a later run.
+inline constexpr char kDeferredPhotosFile[] = "/var/spool/thumb_create.queue.later";
+/// Locked by the one program that processes the photo queue, as long as it runs.
+inline constexpr char kQueueRunnerLock[] = "/var/run/velathumb-queue.lock";
+
 /// Videos that need thumbnails or conversion.
 inline constexpr CreationQueue kVideoQueue = {"/var/spool/flv_create.queue",
                                               "/var/spool/flv_create.queue.tmp"};
@@ -39,5 +46,10 @@ enum class QueueRead {
 /// or more (newline included) are skipped.
 QueueRead ForEachQueueEntry(const char* queueFile,
                             const std::function<void(const std::string&)>& visit);
+
+/// Returns whether the photo queue has entries that a queue runner would process: pending ones, or
+/// ones that a runner has taken and not finished. Deferred ones do not count, nor does a file that
+/// cannot be read.
+bool HasPhotosToProcess();
 
 }  // namespace vela

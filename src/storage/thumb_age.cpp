@@ -27,7 +27,7 @@ bool IsDerivedFileOutdated(const FileStatus& source, int64_t size, int64_t modif
 int IsEAThumbOutdated(const char* path, const char* name) {
   const auto source = ExamineMediaFile(path);
   std::string eaDir;
-  if (!source || !FindMetadataDir(path, 69, eaDir)) {
+  if (!source || name == nullptr || !FindMetadataDir(path, 69, eaDir)) {
     return 0;
   }
   const auto derived = ExamineFile(JoinPath(eaDir, name));

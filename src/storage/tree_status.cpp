@@ -2,6 +2,7 @@
 #include <cstring>
 
 #include "platform/velaindex.h"
+#include "posix/tree_walk.h"
 #include "storage/creation_queue.h"
 #include "storage/velamk_thumb_status.h"
 
@@ -21,7 +22,7 @@ int g_incomplete_thumb_num = 0;
 
 int GetDirThumbStatusRecursive_Callback(const char* path, const struct stat* /*status*/,
                                         int typeFlag, struct FTW* /*walk*/) {
-  if (typeFlag != FTW_D || EntryNameShouldIndex(LastComponent(path)) != 1) {
+  if (path == nullptr || typeFlag != FTW_D || EntryNameShouldIndex(LastComponent(path)) != 1) {
     return FTW_SKIP_SUBTREE;
   }
   if (IsQueued(kPhotoQueue, path)) {
@@ -38,7 +39,7 @@ int GetDirThumbStatusRecursive_Callback(const char* path, const struct stat* /*s
 int GetDirThumbStatusRecursive(const char* dir, int* photosOut, int* thumbsOut) {
   g_incomplete_photo_num = 0;
   g_incomplete_thumb_num = 0;
-  const int result = WalkTree(dir, GetDirThumbStatusRecursive_Callback);
+  const int result = dir == nullptr ? -1 : WalkTree(dir, GetDirThumbStatusRecursive_Callback);
   *photosOut = g_incomplete_photo_num;
   *thumbsOut = g_incomplete_thumb_num;
   return result;

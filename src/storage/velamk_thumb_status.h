@@ -3,7 +3,8 @@
 
 #include <cstdint>
 
-#include "posix/tree_walk.h"
+struct FTW;
+struct stat;
 
 /// Photos with at least one missing thumbnail, and missing thumbnails, counted by the last
 /// GetDirThumbStatusRecursive. One such scan at a time in a process.

@@ -3,6 +3,7 @@
 #include <initializer_list>
 #include <string>
 
+#include "configuration/settings.h"
 #include "ipc/velamk_ipc.h"
 #include "platform/system_rules.h"
 #include "platform/velaindex.h"
@@ -108,7 +109,7 @@ bool BeginCheck(const char* path, const CheckLines& lines, std::string& eaDir) {
 }
 
 bool AreMobileVideosWanted() {
-  return VLIBCFileCheckKeyValue(kSettingsFile, "enable_mobile_video", "yes", 0) != 0;
+  return VLIBCFileCheckKeyValue(kSettingsFile, kMobileVideoKey, kYes, 0) != 0;
 }
 
 }  // namespace

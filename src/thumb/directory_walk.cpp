@@ -5,6 +5,7 @@
 #include "platform/velaindex.h"
 #include "posix/files.h"
 #include "posix/identity.h"
+#include "posix/tree_walk.h"
 #include "profiles/thumbnail_profile.h"
 #include "thumb/directory_pass.h"
 #include "thumb/work_as_owner.h"
@@ -41,7 +42,7 @@ void RunDirectoryJob(const std::string& dirPath, const std::string& profileFileP
 
 int RecursiveDirCallback(const char* path, const struct stat* /*status*/, int typeFlag,
                          struct FTW* walk) {
-  if (typeFlag != FTW_D) {
+  if (path == nullptr || walk == nullptr || typeFlag != FTW_D) {
     return FTW_SKIP_SUBTREE;
   }
   if (EntryNameShouldIndex(path + walk->base) == 0) {

@@ -3,7 +3,8 @@
 
 #include <string>
 
-#include "posix/tree_walk.h"
+struct FTW;
+struct stat;
 
 /// Makes the thumbnails of the directory `dirPath` with the profiles of `profileFilePath`. Skips a
 /// directory or profile file that does not exist and a directory in which no metadata may be

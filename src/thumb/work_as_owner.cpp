@@ -2,6 +2,7 @@
 
 #include <cstring>
 
+#include "configuration/settings.h"
 #include "platform/system_rules.h"
 #include "platform/vlibc.h"
 #include "posix/accounts.h"
@@ -13,7 +14,7 @@ namespace {
 
 bool IsWanted() {
   return EffectiveUser() == 0 &&
-         VLIBCFileCheckKeyValue(kSettingsFile, kWorkAsOwnerKey, "yes", 0) == 1;
+         VLIBCFileCheckKeyValue(kSettingsFile, kWorkAsOwnerKey, kYes, 0) == 1;
 }
 
 void LogOnce(uid_t user, int error) {

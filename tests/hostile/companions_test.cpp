@@ -3,6 +3,8 @@
 #include <sys/file.h>
 #include <unistd.h>
 
+#include <algorithm>
+
 #include "hostile/hostile_test.h"
 #include "platform/velaindex.h"
 #include "support/descriptor.h"
@@ -25,7 +27,7 @@ class Companions : public HostileTest {
   }
 
   static Program StartRunner() {
-    return StartProgram(HostPath(VELATHUMB_QUEUE_FILE),
+    return StartProgram(BuiltPath(VELATHUMB_QUEUE_FILE),
                         {"--velathumb", VelathumbPath(), "--profile", kProfiles, "--follow"});
   }
 
@@ -89,18 +91,47 @@ TEST_F(Companions, StatusPageIsNotWrittenThroughALink) {
   if (CanDistinguishOwners()) {
     ActAs(kAttacker, [&] { return Link(kPrivateText, page); });
     const ProgramResult linked =
-        RunProgram(HostPath(VELATHUMB_STATUS_FILE), {"--html", page, InPhotos("d")}, options);
+        RunProgram(BuiltPath(VELATHUMB_STATUS_FILE), {"--html", page, InPhotos("d")}, options);
     EXPECT_FALSE(linked.timedOut);
     ExpectVictimUnchanged();
     RemoveTree(page);
   }
   ActAs(kAttacker, [&] { return Fifo(page); });
   const ProgramResult piped =
-      RunProgram(HostPath(VELATHUMB_STATUS_FILE), {"--html", page, InPhotos("d")}, options);
+      RunProgram(BuiltPath(VELATHUMB_STATUS_FILE), {"--html", page, InPhotos("d")}, options);
   EXPECT_FALSE(piped.timedOut);
   // An ordinary page is written as always.
-  RunProgram(HostPath(VELATHUMB_STATUS_FILE), {"--html", "/tmp/page.html", InPhotos("d")}, options);
+  RunProgram(BuiltPath(VELATHUMB_STATUS_FILE), {"--html", "/tmp/page.html", InPhotos("d")}, options);
   EXPECT_GT(FileSize("/tmp/page.html"), 0);
+}
+
+TEST_F(Companions, ListOfFailedPhotosFollowsNoLinkOfOthersWaitsForNoPipeAndHasOneLineForEach) {
+  MakeDirectoryOf(kAttacker, InPhotos("d"));
+  const std::string odd = InPhotos("d/a\n\x1b[2J: fine.jpg");
+  const std::string linked = InPhotos("d/b.jpg");
+  const std::string piped = InPhotos("d/c.jpg");
+  for (const std::string& photo : {odd, linked, piped}) {
+    WriteFile(photo, "no photo");
+    GiveTo(kAttacker, photo.c_str());
+    MakeMetadataDir(photo);
+    WriteFile(MetadataDirOf(photo) + "/VELAPHOTO_THUMB_S.fail", "");
+  }
+  const bool hasOwners = CanDistinguishOwners();
+  if (hasOwners) {
+    ActAs(kAttacker,
+          [&] { return Link(kPrivatePhoto, MetadataDirOf(linked) + "/VELAPHOTO_THUMB_XL.jpg"); });
+  }
+  ActAs(kAttacker, [&] { return Fifo(MetadataDirOf(piped) + "/VELAPHOTO_THUMB_XL.jpg"); });
+  ProgramOptions options;
+  options.timeLimit = kSoon;
+  const ProgramResult result =
+      RunProgram(HostPath(VELATHUMB_STATUS_FILE), {"--failed", InPhotos("d")}, options);
+  EXPECT_FALSE(result.timedOut);
+  EXPECT_EQ(std::count(result.out.begin(), result.out.end(), '\n'), 3) << result.out;
+  EXPECT_EQ(result.out.find('\x1b'), std::string::npos);
+  if (hasOwners) {
+    EXPECT_EQ(result.out.find("can be converted"), std::string::npos) << result.out;
+  }
 }
 
 }  // namespace vela_test::hostile

@@ -41,7 +41,7 @@ class QueueFaults : public FaultTrials, public ::testing::WithParamInterface<Row
     }
   }
 
-  std::string Path() const override { return HostPath(VELATHUMB_QUEUE_FILE); }
+  std::string Path() const override { return BuiltPath(VELATHUMB_QUEUE_FILE); }
   Strings Arguments() const override {
     return {"--velathumb", VelathumbPath(), "--profile", kProfiles};
   }

@@ -11,6 +11,7 @@
 
 #include "platform/tool_fixture.h"
 #include "posix/landlock.h"
+#include "support/system_log.h"
 
 namespace vela_test {
 namespace {
@@ -145,6 +146,36 @@ TEST_F(ToolConfinement, ConverterThatTurnsAPictureWritesOnlyInItsDirectory) {
   EXPECT_THAT(Lines(OutputOf(kConverterPath, "-rotate", "90", "/tmp/turned/raw.jpg",
                              "/tmp/turned/raw.jpg")),
               ElementsAre("wrote /tmp/turned/x", "scratch /tmp/turned"));
+}
+
+/// Makes Perl send a line to the system log.
+constexpr char kLogging[] =
+    "use Socket; socket(S, PF_UNIX, SOCK_DGRAM, 0) && connect(S, pack_sockaddr_un('/dev/log')) && "
+    "syswrite(S, '<11>hello')";
+
+void InstallPerl(const std::string& path) {
+  InstallProgram(path, ReadFile("/usr/bin/perl"));
+}
+
+TEST_F(ToolConfinement, ConverterReachesTheSystemLog) {
+  InstallPerl(kConverterPath);
+  OutputOf(kConverterPath, "-e", kLogging);
+  EXPECT_THAT(ErrorLines(), ElementsAre("hello"));
+}
+
+TEST_F(ToolConfinement, NothingThatAConverterScriptRunsReachesTheSystemLog) {
+  InstallPerl("/usr/bin/od");
+  InstallProgram(kConverterPath, "#!/bin/sh\nod -e \"$1; print 'ended'\"\n");
+  EXPECT_EQ(OutputOf(kConverterPath, kLogging), "ended");
+  EXPECT_THAT(ErrorLines(), ElementsAre());
+}
+
+TEST_F(ToolConfinement, NoOtherToolReachesTheSystemLog) {
+  for (const char* tool : {kDcrawPath, kExiftoolPath, kComparePath}) {
+    InstallPerl(tool);
+    OutputOf(tool, "-e", kLogging);
+    EXPECT_THAT(ErrorLines(), ElementsAre()) << tool;
+  }
 }
 
 TEST_F(ToolConfinement, ConverterFindsADirectoryWithPercentSigns) {

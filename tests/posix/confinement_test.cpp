@@ -363,6 +363,20 @@ int ConfinedDespite(const BeforeExec& failures, const Confinement& confinement,
   });
 }
 
+TEST_F(ConfinedProcess, MakesOnlyTheSocketsThatItMay) {
+  confinement_.files = std::nullopt;
+  confinement_.sockets = SocketUse::kLocalDatagrams;
+  const auto confined = [&](const std::function<long()>& call) {
+    return ConfinedDespite([] { return 0; }, confinement_, [&] { return ErrorOf(call()); });
+  };
+  EXPECT_EQ(confined([] { return socket(AF_UNIX, SOCK_DGRAM | SOCK_CLOEXEC, 0); }), 0);
+  EXPECT_EQ(confined([] { return connect(-1, nullptr, 0); }), EBADF);
+  EXPECT_EQ(confined([] { return socket(AF_UNIX, SOCK_STREAM, 0); }), EPERM);
+  EXPECT_EQ(confined([] { return socket(AF_INET, SOCK_DGRAM, 0); }), EPERM);
+  EXPECT_EQ(confined([] { return bind(-1, nullptr, 0); }), EPERM);
+  EXPECT_EQ(confined([] { return sendmsg(-1, nullptr, 0); }), EPERM);
+}
+
 TEST_F(ConfinedProcess, KeepsTheOtherRestrictionsWhereOneIsNotSupported) {
   const auto openSocket = [] { return ErrorOf(socket(AF_UNIX, SOCK_STREAM, 0)); };
   const auto readSecret = [] { return ErrorOfOpening(kSecret); };

@@ -12,6 +12,7 @@
 #include <thread>
 
 #include "support/files.h"
+#include "support/other_user.h"
 #include "support/quiet_test.h"
 #include "support/users.h"
 
@@ -203,6 +204,7 @@ TEST_F(Folder, StaysTheSameWhileItIsHeld) {
   if (!HasOtherUsers()) {
     return;  // every file belongs to the only user
   }
+  LiftProtectionOfTmp();
   MakeFileOf(0, "/tmp/elsewhere/file");
   WriteFile(In("file"), "held");
   {
@@ -262,6 +264,25 @@ TEST_F(Folder, LeavesNoDescriptor) {
     FindUnusedPath(In("name.XXXXXX"));
   }
   EXPECT_EQ(ListDirectory("/proc/self/fd").size(), before);
+}
+
+TEST_F(Folder, ScratchDirectoryIsPrivateAndGoesWithItsFiles) {
+  std::string path;
+  {
+    const ScratchDirectory scratch;
+    path = scratch.Path();
+    ASSERT_EQ(path.find("/tmp/velathumb."), 0U);
+    struct stat status = {};
+    ASSERT_EQ(lstat(path.c_str(), &status), 0);
+    EXPECT_EQ(status.st_mode, S_IFDIR | 0700U);
+    WriteFile(In("kept"), "content");
+    WriteFile(path + "/file", "content");
+    ASSERT_EQ(symlink(In("kept").c_str(), (path + "/link").c_str()), 0);
+    const ScratchDirectory other;
+    EXPECT_NE(other.Path(), path);
+  }
+  EXPECT_FALSE(Exists(path));
+  EXPECT_TRUE(Exists(In("kept")));
 }
 
 }  // namespace

@@ -53,9 +53,10 @@ std::vector<pid_t> RunningConverters(const Program& program) {
 }
 
 /// Whether a converter opens this file itself: the photo and its outputs, libraries, settings and
-/// files that all processes open, and the pipes of a converter that is a script.
+/// files that all processes open, its connection to the system log, and the pipes of a converter
+/// that is a script.
 bool IsTheConvertersOwn(const std::string& target, const Strings& ofTheProgram) {
-  if (target.compare(0, 5, "pipe:") == 0) {
+  if (target.compare(0, 5, "pipe:") == 0 || target.compare(0, 7, "socket:") == 0) {
     return std::find(ofTheProgram.begin(), ofTheProgram.end(), target) == ofTheProgram.end();
   }
   if (target.compare(0, 1, "/") != 0) {

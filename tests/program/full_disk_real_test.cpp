@@ -52,11 +52,16 @@ TEST_F(FullDisk, FullBeforeTheFirstOutput) {
   Make();
   EXPECT_EQ(converter.Calls().size(), 1U);
   EXPECT_TRUE(ThumbsBelow(kPhotos).empty());
-  // The volume is too full to start the next photo.
-  EXPECT_EQ(ErrorLines(),
-            Strings{"velathumb:893 Stopping creating thumbs as the disk space is near "
-                    "full, " +
-                    InPhotos("b.jpg")});
+  // The volume is too full to start the next photo. The converter's own line has a random name in
+  // it, and ImageMagick has none.
+  EXPECT_THAT(ErrorLines(),
+              ::testing::Contains("velathumb:893 Stopping creating thumbs as the disk space is "
+                                  "near full, " +
+                                  InPhotos("b.jpg")));
+  EXPECT_THAT(ErrorLines(),
+              ::testing::Each(::testing::AnyOf(
+                  ::testing::StartsWith("velathumb:893 "),
+                  ::testing::StartsWith("convert-thumb: " + photo + ": cannot write "))));
   // The failure is not permanent: with enough space, everything is made.
   MakeRoom();
   InstallRealConverter();

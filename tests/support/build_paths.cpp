@@ -7,19 +7,19 @@
 namespace vela_test {
 
 std::string VelathumbPath() {
-  return HostPath(VELATHUMB_FILE);
+  return BuiltPath(VELATHUMB_FILE);
 }
 
 std::string StubToolPath() {
-  return HostPath(STUB_TOOL_FILE);
+  return BuiltPath(STUB_TOOL_FILE);
 }
 
 std::string OwnConverterPath() {
-  return HostPath(OWN_CONVERTER_FILE);
+  return BuiltPath(OWN_CONVERTER_FILE);
 }
 
 std::string SourceDirectory() {
-  return HostPath(SOURCE_DIRECTORY);
+  return kSourcePlace;
 }
 
 std::string SharedMediaDirectory() {

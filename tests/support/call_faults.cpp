@@ -147,7 +147,7 @@ bool BeginsWith(const std::string& text, const char* beginning) {
 /// Libraries, programs and the like, whose absence is no fault of the disk with the photos.
 bool BelongsToTheSystem(const std::string& object) {
   for (const char* place : {"/usr/", "/lib", "/bin", "/etc/ld.so", "/proc/", "/sys/", "/dev/",
-                            "/.host/", "/memfd:", "/etc/localtime"}) {
+                            "/.host/", "/.build/", "/.source/", "/memfd:", "/etc/localtime"}) {
     if (BeginsWith(object, place)) {
       return true;
     }

@@ -27,8 +27,12 @@ struct Entry {
   unsigned char type;
 };
 
+/// None without a directory.
 std::vector<Entry> Entries(DIR* directory) {
   std::vector<Entry> entries;
+  if (directory == nullptr) {
+    return entries;
+  }
   while (const dirent* entry = readdir(directory)) {
     const std::string name = entry->d_name;
     if (name != "." && name != "..") {
@@ -52,7 +56,7 @@ Farm::Farm(std::string path, std::set<std::string> own, const std::string& hidde
     EnvironmentFailureWithErrno("cannot make " + path_);
   }
   const DirectoryStream host(opendir(HostPath(path_).c_str()));
-  if (host == nullptr) {
+  if (host == nullptr && errno != ENOENT) {
     EnvironmentFailureWithErrno("cannot read the machine's " + path_);
   }
   for (const Entry& entry : Entries(host.get())) {

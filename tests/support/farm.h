@@ -10,9 +10,9 @@ namespace vela_test {
 
 class Farm {
  public:
-  /// Creates the farm at `path` (absolute; created when missing) from HostPath(path). The names in
-  /// `own` are not linked and never touched by Restore; names that begin with `hidden` are not
-  /// linked either.
+  /// Creates the farm at `path` (absolute; created when missing) from HostPath(path), empty when
+  /// the machine has no such directory. The names in `own` are not linked and never touched by
+  /// Restore; names that begin with `hidden` are not linked either.
   Farm(std::string path, std::set<std::string> own, const std::string& hidden = std::string());
 
   /// Restores the directory to its first state, except for the names in `own`.

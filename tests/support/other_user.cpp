@@ -75,6 +75,12 @@ void GiveTo(uid_t user, const char* path) {
   }
 }
 
+void LiftProtectionOfTmp() {
+  if (chmod("/tmp", 0777) != 0) {
+    EnvironmentFailureWithErrno("cannot change the mode of /tmp");
+  }
+}
+
 UserProcess::UserProcess(uid_t user, const std::function<void()>& action)
     : pid_(StartAs(user, [&action] {
         action();

@@ -18,6 +18,11 @@ constexpr uid_t kAttacker = 12345;
 /// program: an attack that cannot be made proves nothing.
 void ActAs(uid_t user, const std::function<bool()>& action);
 
+/// Makes /tmp an ordinary directory until the next reset of the sandbox. In one where only the
+/// owner of a file may remove it, many kernels refuse to follow links of other users or to open
+/// their pipes and files (fs.protected_symlinks and the like), before the program under test does.
+void LiftProtectionOfTmp();
+
 /// Makes the user the owner of the file, links not followed; does nothing without other users.
 void GiveTo(uid_t user, const char* path);
 

@@ -5,12 +5,12 @@
 #include <stdlib.h>
 #include <sys/mount.h>
 #include <sys/stat.h>
-#include <sys/syscall.h>
 #include <sys/wait.h>
 #include <time.h>
 #include <unistd.h>
 
 #include <cerrno>
+#include <cstring>
 #include <iterator>
 #include <set>
 #include <string>
@@ -20,6 +20,7 @@
 #include "support/environment_failure.h"
 #include "support/farm.h"
 #include "support/namespaces.h"
+#include "support/new_root.h"
 #include "support/private_place.h"
 #include "support/stub_files.h"
 #include "support/system_log.h"
@@ -29,6 +30,7 @@ namespace vela_test {
 namespace {
 
 constexpr const char* kHost = "/.host";
+constexpr const char* kBuildPlace = "/.build";
 
 // Mounted, not linked, so that they have their usual names in /proc/<pid>/fd.
 constexpr const char* kDevices[] = {"null", "zero", "full", "random", "urandom", "tty"};
@@ -51,27 +53,31 @@ void MakeDirectory(const std::string& path) {
   }
 }
 
+void MakeReadOnly(const char* path) {
+  mount_attr attributes{};
+  attributes.attr_set = MOUNT_ATTR_RDONLY;
+  if (mount_setattr(AT_FDCWD, path, AT_RECURSIVE, &attributes, sizeof attributes) != 0) {
+    EnvironmentFailureWithErrno("cannot protect the machine's files from the tests");
+  }
+}
+
 void Bind(const std::string& from, const std::string& to) {
   if (mount(from.c_str(), to.c_str(), nullptr, MS_BIND | MS_REC, nullptr) != 0) {
     EnvironmentFailureWithErrno("cannot show " + from + " at " + to);
   }
 }
 
-/// Makes an empty memory volume the root directory; the machine's own is at kHost then.
-void ReplaceRoot() {
-  if (mount(nullptr, "/", nullptr, MS_REC | MS_PRIVATE, nullptr) != 0) {
-    EnvironmentFailureWithErrno("cannot make the mounts of the sandbox private");
+/// The files of the build are also shown where every user can reach them, wherever the clone is,
+/// and where no private directory hides them.
+std::vector<ShownDirectory> ShownDirectories(const std::string& writableDirectory) {
+  // A sandbox within another one may find them only at their places in that one.
+  std::vector<ShownDirectory> directories = {{kHost, {"/"}},
+                                             {kBuildPlace, {BUILD_DIRECTORY, kBuildPlace}},
+                                             {kSourcePlace, {SOURCE_DIRECTORY, kSourcePlace}}};
+  if (!writableDirectory.empty()) {
+    directories.push_back({kWritablePlace, {writableDirectory}});
   }
-  const std::string newRoot = "/tmp";
-  if (mount("tmpfs", newRoot.c_str(), "tmpfs", MS_NOSUID, "mode=0755,size=64m") != 0) {
-    EnvironmentFailureWithErrno("cannot mount the root directory of the sandbox");
-  }
-  MakeDirectory(newRoot + kHost);
-  if (chdir(newRoot.c_str()) != 0 ||
-      syscall(SYS_pivot_root, newRoot.c_str(), (newRoot + kHost).c_str()) != 0 || chdir("/") != 0) {
-    EnvironmentFailureWithErrno("cannot change the root directory");
-  }
-  State().inside = true;
+  return directories;
 }
 
 void ShowDevices() {
@@ -85,6 +91,16 @@ void ShowDevices() {
   }
 }
 
+/// Where a program looks that does not find it near itself. The path of the test program in /proc
+/// is that outside the sandbox and may not exist inside.
+void LinkHeaderReader() {
+  MakeDirectory("/usr/libexec");
+  const std::string target = std::string(kBuildPlace) + "/libexec/velathumb";
+  if (symlink(target.c_str(), "/usr/libexec/velathumb") != 0) {
+    EnvironmentFailureWithErrno("cannot link the header reader");
+  }
+}
+
 void CreateFarms() {
   std::vector<Farm>& farms = State().farms;
   std::set<std::string> devices = {"shm", "log"};
@@ -93,18 +109,20 @@ void CreateFarms() {
   if (symlink("/run", "/var/run") != 0) {
     EnvironmentFailureWithErrno("cannot make /var/run");
   }
-  for (const char* path : {"/usr", "/usr/vela", "/var/spool", "/dev", "/dev/shm", "/tmp", "/run",
-                           "/proc", kWritablePlace}) {
+  for (const char* path :
+       {"/usr", "/usr/vela", "/var/spool", "/dev", "/dev/shm", "/tmp", "/run", "/proc"}) {
     MakeDirectory(path);
   }
-  farms.emplace_back("/usr", std::set<std::string>{"bin", "vela"});
+  farms.emplace_back("/usr", std::set<std::string>{"bin", "vela", "libexec"});
   farms.emplace_back("/usr/bin", std::set<std::string>{});
+  LinkHeaderReader();
+  farms.emplace_back("/usr/libexec", std::set<std::string>{"velathumb"});
   farms.emplace_back("/etc", std::set<std::string>{}, "velainfo.conf");
   farms.emplace_back("/var", std::set<std::string>{"run", "spool", "lib"});
   farms.emplace_back("/var/lib", std::set<std::string>{}, "velaindex");
   farms.emplace_back("/dev", devices);
   farms.emplace_back("/", std::set<std::string>{"tmp", "run", "var", "usr", "etc", "dev", "proc",
-                                                ".host", ".writable", ".log"});
+                                                ".host", ".build", ".source", ".writable", ".log"});
 }
 
 void MountPrivatePlaces() {
@@ -124,14 +142,6 @@ void FillPrivatePlaces() {
   MakeStubDirectory();
 }
 
-void ProtectHost() {
-  mount_attr attributes{};
-  attributes.attr_set = MOUNT_ATTR_RDONLY;
-  if (mount_setattr(AT_FDCWD, kHost, AT_RECURSIVE, &attributes, sizeof attributes) != 0) {
-    EnvironmentFailureWithErrno("cannot protect the machine's files from the tests");
-  }
-}
-
 void MountProcesses() {
   if (mount("proc", "/proc", "proc", MS_NOSUID | MS_NODEV | MS_NOEXEC, nullptr) != 0) {
     EnvironmentFailureWithErrno("cannot mount /proc of the sandbox");
@@ -140,16 +150,16 @@ void MountProcesses() {
 
 void BuildSandbox(const std::string& writableDirectory) {
   const mode_t mask = umask(0);
-  ReplaceRoot();
+  MoveToNewRoot(ShownDirectories(writableDirectory));
+  State().inside = true;
   CreateFarms();
   ShowDevices();
   MountPrivatePlaces();
   FillPrivatePlaces();
   MountProcesses();
-  if (!writableDirectory.empty()) {
-    Bind(HostPath(writableDirectory), kWritablePlace);
+  for (const char* place : {kHost, kBuildPlace, kSourcePlace}) {
+    MakeReadOnly(place);
   }
-  ProtectHost();
   umask(mask);
 }
 
@@ -216,6 +226,10 @@ void ResetSandbox() {
 
 std::string HostPath(const std::string& path) {
   return State().inside ? kHost + path : path;
+}
+
+std::string BuiltPath(const std::string& path) {
+  return kBuildPlace + path.substr(std::strlen(BUILD_DIRECTORY));
 }
 
 }  // namespace vela_test

@@ -14,8 +14,8 @@ namespace vela_test {
 /// Enters the sandbox; called once, at the start of main, while the process has one thread. Returns
 /// in a child process inside the sandbox (process 2 there, user id 0, working directory /); the
 /// calling process itself waits for that child and ends with its exit status, 128 + n when signal n
-/// ended it. `writableDirectory`, when not empty, is a directory of the machine that stays writable
-/// from inside, at kWritablePlace.
+/// ended it. `writableDirectory`, when not empty, is a directory of the machine, absolute or
+/// relative to the working directory, that stays writable from inside, at kWritablePlace.
 void EnterSandbox(const std::string& writableDirectory = std::string());
 
 /// The path of the writable directory given to EnterSandbox inside the sandbox.
@@ -31,6 +31,13 @@ void ResetSandbox();
 /// The path of the machine's own `path` (absolute) inside the sandbox, also when a private
 /// directory hides it, such as a build directory under /tmp.
 std::string HostPath(const std::string& path);
+
+/// The path, inside the sandbox, of the file that the build makes at `path` (absolute, below the
+/// build directory). Every user can reach it, wherever the clone is.
+std::string BuiltPath(const std::string& path);
+
+/// The top folder of the source tree inside the sandbox, reachable for every user.
+constexpr const char* kSourcePlace = "/.source";
 
 /// Fixture: every test starts with the private places in their first state and an empty log record.
 class SandboxTest : public ::testing::Test {

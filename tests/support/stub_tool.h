@@ -7,13 +7,14 @@
 #include <string>
 #include <vector>
 
+#include "platform/installed_names.h"
 #include "support/stub_plan.h"
 
 namespace vela_test {
 
 constexpr const char* kConverterPath = "/usr/vela/bin/convert-thumb";
 /// ImageMagick's own program, even where another one is called convert.
-constexpr const char* kImageMagickPath = "/usr/bin/convert-im6.q16";
+constexpr const char* kImageMagickPath = vela::kImageMagickProgram;
 constexpr const char* kExiftoolPath = "/usr/vela/bin/exiftool";
 constexpr const char* kDcrawPath = "/usr/bin/dcraw";
 constexpr const char* kComparePath = "/usr/bin/compare";

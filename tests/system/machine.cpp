@@ -63,7 +63,7 @@ Machine::Machine() {
 }
 
 void Machine::StartDaemon() {
-  daemon_ = StartProgram(HostPath(VELAINDEXPLUGIND_FILE), {});
+  daemon_ = StartProgram(BuiltPath(VELAINDEXPLUGIND_FILE), {});
   const auto end = std::chrono::steady_clock::now() + seconds(10);
   while (!IsAnswering()) {
     ASSERT_LT(std::chrono::steady_clock::now(), end) << daemon_->Error();
@@ -73,7 +73,7 @@ void Machine::StartDaemon() {
 
 void Machine::KillAndRestartDaemon() {
   ExpectKilled(&daemon_, "the daemon");
-  daemon_ = StartProgram(HostPath(VELAINDEXPLUGIND_FILE), {});
+  daemon_ = StartProgram(BuiltPath(VELAINDEXPLUGIND_FILE), {});
 }
 
 void Machine::ReloadDaemon() {
@@ -113,11 +113,11 @@ bool Machine::KillVelathumb() {
 }
 
 Program Machine::StartRunner(const std::vector<std::string>& more) {
-  return StartProgram(HostPath(VELATHUMB_QUEUE_FILE), RunnerArguments(more));
+  return StartProgram(BuiltPath(VELATHUMB_QUEUE_FILE), RunnerArguments(more));
 }
 
 ProgramResult Machine::RunRunner(const std::vector<std::string>& more) {
-  return RunProgram(HostPath(VELATHUMB_QUEUE_FILE), RunnerArguments(more));
+  return RunProgram(BuiltPath(VELATHUMB_QUEUE_FILE), RunnerArguments(more));
 }
 
 bool Machine::HasQueue() {

@@ -6,14 +6,15 @@
 #include <vector>
 
 #include "command_line/file_name.h"
+#include "platform/installed_names.h"
 #include "process/output_file.h"
 
 namespace vela {
 
 namespace {
 
-constexpr const char* kImageMagick[] = {"/usr/vela/lib/convert-thumb", "/usr/bin/convert-im6.q16"};
-constexpr const char* kImageMagickData[] = {"/etc/ImageMagick-6", "/usr/share/ImageMagick-6",
+constexpr const char* kImageMagick[] = {"/usr/vela/lib/convert-thumb", kImageMagickProgram};
+constexpr const char* kImageMagickData[] = {kImageMagickConfiguration, kImageMagickShared,
                                             "/usr/share/color", "/usr/vela/share/imagemagick"};
 
 void AddUnique(std::vector<std::string>& list, const std::string& text) {

@@ -7,6 +7,7 @@
 
 #include "command_line/file_name.h"
 #include "command_line/option_values.h"
+#include "configuration/profile_values.h"
 
 namespace vela {
 
@@ -82,7 +83,7 @@ class OutputOptions {
       return TakeBox(value);
     }
     if (option == "-quality") {
-      plan_.quality = ParseWholeNumber(value, 1, 100).value_or(0);
+      plan_.quality = ParseWholeNumber(value, kMinQuality, kMaxQuality).value_or(0);
       return plan_.quality != 0;
     }
     if (option == "+profile") {
@@ -283,6 +284,12 @@ std::string FindScratchDirectory(const std::vector<std::string>& arguments) {
 }
 
 }  // namespace
+
+bool IsDiscarded(const CommandLine& line) {
+  return !line.outputIndices.empty() &&
+         std::all_of(line.outputIndices.begin(), line.outputIndices.end(),
+                     [&](size_t index) { return line.arguments[index] == kDiscardedOutput; });
+}
 
 std::string SourceFile(const std::string& argument) {
   const size_t suffix = sizeof kFirstPage - 1;

@@ -39,6 +39,10 @@ struct CommandLine {
 /// Parses the arguments after the program's name.
 CommandLine ParseCommandLine(std::vector<std::string> arguments);
 
+/// Returns true when all that a run of this line makes is discarded: each output is
+/// kDiscardedOutput. Such a run finds out whether the photo can be converted, and why not.
+bool IsDiscarded(const CommandLine& line);
+
 /// Returns the file that a source argument names: the argument without "[0]" at its end, which
 /// selects the first page.
 std::string SourceFile(const std::string& argument);

@@ -3,56 +3,13 @@
 #include <charconv>
 
 #include "command_line/file_name.h"
+#include "configuration/profile_values.h"
 
 namespace vela {
 
 namespace {
 
-constexpr int kMaxSide = 65535;
 constexpr int kMaxTurn = 360000;
-constexpr double kMaxRadius = 50;
-constexpr double kMaxSigma = 15;
-constexpr double kMinSigma = 0.01;
-constexpr double kMaxAmount = 100;
-
-bool IsDigit(char character) {
-  return character >= '0' && character <= '9';
-}
-
-/// Removes a fraction such as "0.8" or ".8" from the front of `text` and returns it.
-std::optional<double> TakeFraction(std::string& text) {
-  size_t length = 0;
-  while (length < text.size() && (IsDigit(text[length]) || text[length] == '.')) {
-    ++length;
-  }
-  double value = 0;
-  const auto [end, error] =
-      std::from_chars(text.data(), text.data() + length, value, std::chars_format::fixed);
-  if (error != std::errc() || end != text.data() + length) {
-    return std::nullopt;
-  }
-  text.erase(0, length);
-  return value;
-}
-
-/// Removes `mark` and the fraction after it and stores that in `value`; without the mark, `value`
-/// is unchanged.
-bool TakeMarkedFraction(std::string& text, char mark, double& value) {
-  if (text.empty() || text.front() != mark) {
-    return true;
-  }
-  text.erase(0, 1);
-  const std::optional<double> fraction = TakeFraction(text);
-  if (fraction) {
-    value = *fraction;
-  }
-  return fraction.has_value();
-}
-
-bool IsInRange(const UnsharpMask& mask) {
-  return mask.radius <= kMaxRadius && mask.sigma >= kMinSigma && mask.sigma <= kMaxSigma &&
-         mask.amount <= kMaxAmount && mask.threshold <= 1;
-}
 
 bool HasJpegExtension(const std::string& path) {
   const std::string_view extension = ExtensionOf(path);
@@ -90,22 +47,6 @@ std::optional<ThumbnailBox> ParseThumbnailBox(const std::string& text) {
   return ThumbnailBox{*width, *height, flags == ">^"};
 }
 
-std::optional<UnsharpMask> ParseUnsharpMask(const std::string& text) {
-  UnsharpMask mask;
-  std::string rest = text;
-  const std::optional<double> radius = TakeFraction(rest);
-  if (!radius || !TakeMarkedFraction(rest, 'x', mask.sigma) ||
-      !TakeMarkedFraction(rest, '+', mask.amount) ||
-      !TakeMarkedFraction(rest, '+', mask.threshold) || !rest.empty()) {
-    return std::nullopt;
-  }
-  mask.radius = *radius;
-  if (!IsInRange(mask)) {
-    return std::nullopt;
-  }
-  return mask;
-}
-
 std::optional<int> ParseQuarterTurns(const std::string& text) {
   const std::optional<int> degrees = ParseWholeNumber(text, 0, kMaxTurn);
   if (!degrees || *degrees % 90 != 0) {
@@ -115,6 +56,9 @@ std::optional<int> ParseQuarterTurns(const std::string& text) {
 }
 
 std::optional<std::string> ParseOutputPath(const std::string& text) {
+  if (text == kDiscardedOutput) {
+    return text.substr(text.find('/'));
+  }
   std::string path;
   for (size_t i = 0; i < text.size(); ++i) {
     if (text[i] == '%') {

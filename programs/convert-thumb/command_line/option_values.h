@@ -14,14 +14,15 @@ std::optional<int> ParseWholeNumber(const std::string& text, int min, int max);
 /// Parses "WxH>" or "WxH>^", both sides in pixels from 1 to 65535; empty for any other text.
 std::optional<ThumbnailBox> ParseThumbnailBox(const std::string& text);
 
-/// Parses "RADIUS[xSIGMA][+AMOUNT][+THRESHOLD]" in decimal fractions; missing parts have the
-/// defaults of UnsharpMask. Empty for any other text and for values out of the supported range.
-std::optional<UnsharpMask> ParseUnsharpMask(const std::string& text);
-
 /// Parses degrees clockwise and returns quarter turns, 0 to 3; empty unless a multiple of 90.
 std::optional<int> ParseQuarterTurns(const std::string& text);
 
-/// Returns the file name of an output argument, in which "%%" represents a percent sign. Empty when
+/// The output argument that stands for the null device. With the prefix, ImageMagick writes a JPEG
+/// to it as well.
+inline constexpr char kDiscardedOutput[] = "jpg:/dev/null";
+
+/// Returns the file name of an output argument: of kDiscardedOutput the null device, of others the
+/// text, in which "%%" represents a percent sign. Empty when
 /// the text contains any other percent sign or does not name a JPEG file.
 std::optional<std::string> ParseOutputPath(const std::string& text);
 

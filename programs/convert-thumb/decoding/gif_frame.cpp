@@ -1,6 +1,7 @@
 #include "decoding/gif_frame.h"
 
 #include "decoding/file_input.h"
+#include "platform/installed_names.h"
 #include "posix/loaded_library.h"
 
 #include <gif_lib.h>
@@ -27,7 +28,7 @@ class GifLibrary final : private LoadedLibrary {
   decltype(&::DGifGetExtensionNext) getExtensionNext = nullptr;
 
  private:
-  GifLibrary() : LoadedLibrary("libgif.so.7") {
+  GifLibrary() : LoadedLibrary(kGifLibrary) {
     Find("DGifOpen", open);
     Find("DGifCloseFile", close);
     Find("DGifGetRecordType", getRecordType);

@@ -3,6 +3,7 @@
 #include <csetjmp>
 #include <cstdio>
 
+#include "platform/installed_names.h"
 #include "posix/loaded_library.h"
 #include "process/source_file.h"
 
@@ -35,7 +36,7 @@ class NetpbmLibrary final : private LoadedLibrary {
   decltype(&::pnm_readpaminit) readHeader = nullptr;
 
  private:
-  NetpbmLibrary() : LoadedLibrary("libnetpbm.so.11") {
+  NetpbmLibrary() : LoadedLibrary(kNetpbmLibrary) {
     decltype(&::pm_init) initialise = nullptr;
     decltype(&::pm_setusermessagefn) setMessage = nullptr;
     decltype(&::pm_setusererrormsgfn) setErrorMessage = nullptr;

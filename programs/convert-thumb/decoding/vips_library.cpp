@@ -6,11 +6,12 @@
 #include <optional>
 #include <string>
 
+#include "platform/installed_names.h"
+
 namespace vela {
 
 namespace {
 
-constexpr char kLibraryName[] = "libvips.so.42";
 constexpr char kProgramName[] = "convert-thumb";
 /// Where libvips looks for modules; scanning them takes longer than making a thumbnail.
 constexpr char kModulesVariable[] = "VIPSHOME";
@@ -44,7 +45,7 @@ class ModulesHidden {
 
 }  // namespace
 
-VipsLibrary::VipsLibrary() : LoadedLibrary(kLibraryName, Binding::kLazy) {
+VipsLibrary::VipsLibrary() : LoadedLibrary(kVipsLibrary, Binding::kLazy) {
   Find("vips_source_new_from_descriptor", openDescriptor);
   Find("vips_pngload_source", loadPng);
   Find("vips_tiffload_source", loadTiff);

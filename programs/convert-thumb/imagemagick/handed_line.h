@@ -7,6 +7,7 @@
 
 #include "posix/file_descriptor.h"
 #include "process/output_file.h"
+#include "process/trusted_path.h"
 
 namespace vela {
 
@@ -15,6 +16,8 @@ struct HandedLine {
   std::vector<std::string> arguments;
   std::vector<FileDescriptor> inputs;
   std::vector<OpenOutput> outputs;
+  /// Files that do not exist yet and that ImageMagick creates by their names.
+  std::vector<Place> namedOutputs;
 };
 
 /// Returns a name of an open file. It has no special meaning to ImageMagick, leads to the same file

@@ -11,6 +11,7 @@
 #include "process/failure_report.h"
 #include "process/source_file.h"
 #include "process/trusted_path.h"
+#include "process/unfinished_outputs.h"
 
 namespace vela {
 
@@ -38,7 +39,8 @@ bool HandThumbnails(const CommandLine& line, const ConversionPlan& plan, HandedL
   const size_t excess = line.outputIndices.size() - plan.outputs.size();
   for (size_t i = 0; i < plan.outputs.size(); ++i) {
     const std::string& path = plan.outputs[i].path;
-    const std::string prefix = CoderPrefix(std::string(ExtensionOf(path)));
+    std::string prefix = CoderPrefix(std::string(ExtensionOf(path)));
+    prefix = prefix.empty() ? "jpg:" : prefix;  // the null device
     if (!Hand(path, prefix, handed.arguments[line.outputIndices[i + excess]], handed)) {
       return false;
     }
@@ -66,14 +68,23 @@ OutputArgument Split(const std::string& argument) {
                    : OutputArgument{"", argument};
 }
 
+/// Returns true when ImageMagick writes to the file of exactly this name.
+bool IsPlainOutput(const OutputArgument& parts) {
+  const std::string format = parts.prefix.substr(0, parts.prefix.find(':'));
+  return IsPlainName(parts.name) && (format.empty() || !CoderPrefix(format).empty());
+}
+
 bool HandUnknown(std::string& argument, HandedLine& handed) {
   const OutputArgument parts = Split(argument);
   if (parts.name.empty() || argument.front() == '-') {
     return true;  // no file
   }
   const std::string path = WithoutDoubledPercents(parts.name);
-  const std::optional<Place> place = FindPlace(path);
+  std::optional<Place> place = FindPlace(path);
   if (place && IsPrivate(place->directory)) {
+    if (IsPlainOutput(parts) && IsAbsent(*place)) {
+      handed.namedOutputs.push_back(std::move(*place));
+    }
     return true;
   }
   const std::string prefix =
@@ -109,6 +120,13 @@ bool AreOutputsWritten(const HandedLine& handed) {
     }
     return isWritten;
   });
+}
+
+void RemoveHandedOutputs(const HandedLine& handed) {
+  RemoveOutputs();
+  for (const Place& output : handed.namedOutputs) {
+    RemoveRegular(output);
+  }
 }
 
 }  // namespace vela

@@ -12,6 +12,10 @@ namespace vela {
 /// a call of ReportFailure, when an output cannot be created.
 bool HandOutputs(const CommandLine& line, HandedLine& handed);
 
+/// Removes the outputs that were created here, and files that did not exist before and that
+/// ImageMagick has created by their names.
+void RemoveHandedOutputs(const HandedLine& handed);
+
 /// Returns true when every output has been written; otherwise calls ReportFailure.
 bool AreOutputsWritten(const HandedLine& handed);
 

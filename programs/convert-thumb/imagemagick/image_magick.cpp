@@ -10,7 +10,9 @@
 #include "imagemagick/handed_outputs.h"
 #include "imagemagick/handed_source.h"
 #include "imagemagick/image_magick_limits.h"
+#include "imagemagick/image_magick_message.h"
 #include "imagemagick/image_magick_policy.h"
+#include "platform/installed_names.h"
 #include "posix/landlock.h"
 #include "process/child_program.h"
 #include "process/failure_report.h"
@@ -23,10 +25,9 @@ namespace vela {
 
 namespace {
 
-/// A link to kProgram. Processes are found by the name of their program, so it must be the
-/// converter's name.
+/// A link to kImageMagickProgram. Processes are found by the name of their program, so it must be
+/// the converter's name.
 constexpr char kLink[] = "/usr/vela/lib/convert-thumb";
-constexpr char kProgram[] = "/usr/bin/convert-im6.q16";
 constexpr char kArgumentZero[] = "convert-thumb";
 
 bool PassDescriptors(const HandedLine& handed) {
@@ -63,12 +64,26 @@ std::vector<char*> ArgumentVector(std::string& argumentZero, std::vector<std::st
   return vector;
 }
 
+/// Logs why ImageMagick has failed; it has printed that itself.
+void LogFailureOf(const ChildEnd& end) {
+  const std::string message = MainMessage(end.errors);
+  if (end.signal != 0) {
+    ReportFailure("ImageMagick was ended by signal %d: %s", end.signal, strsignal(end.signal));
+  } else {
+    ReportFailure("ImageMagick: %s", message.empty() ? "no message" : message.c_str());
+  }
+  LogFailure();
+}
+
 /// Makes the outputs of ImageMagick complete, or removes them. Returns false on failure.
-bool Finish(const HandedLine& handed, bool succeeded) {
-  if (succeeded && AreOutputsWritten(handed) && SyncOutputs()) {
+bool Finish(const HandedLine& handed, const ChildEnd& end) {
+  if (end.succeeded && AreOutputsWritten(handed) && SyncOutputs()) {
     return true;
   }
-  RemoveOutputs();
+  RemoveHandedOutputs(handed);
+  if (!end.succeeded) {
+    LogFailureOf(end);
+  }
   return false;
 }
 
@@ -86,13 +101,13 @@ void HandOver(const CommandLine& line, size_t memoryLimit) {
   std::string argumentZero = kArgumentZero;
   std::vector<char*> vector = ArgumentVector(argumentZero, handed.arguments);
   RestoreWriteSignals();
-  if (handed.outputs.empty()) {
+  if (handed.outputs.empty() && handed.namedOutputs.empty()) {
     ReplaceProcess(kLink, vector.data());
   }
-  RunInChildAndExit({kLink, kProgram}, vector.data(),
-                    [&handed](bool succeeded) { return Finish(handed, succeeded); });
+  RunInChildAndExit({kLink, kImageMagickProgram}, vector.data(),
+                    [&handed](const ChildEnd& end) { return Finish(handed, end); });
   IgnoreWriteSignals();
-  ReportFailure("%s: %s", kProgram, std::strerror(errno));
+  ReportFailure("%s: %s", kImageMagickProgram, std::strerror(errno));
 }
 
 }  // namespace vela

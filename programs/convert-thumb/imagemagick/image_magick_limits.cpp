@@ -5,6 +5,8 @@
 #include <cstring>
 #include <string>
 
+#include "process/resource_limits.h"
+
 namespace vela {
 
 namespace {
@@ -15,6 +17,9 @@ constexpr char kMemoryLimitVariable[] = "MAGICK_MEMORY_LIMIT";
 constexpr char kMapLimitVariable[] = "MAGICK_MAP_LIMIT";
 
 constexpr char kDiskLimitVariable[] = "MAGICK_DISK_LIMIT";
+
+/// Of the library that starts ImageMagick's threads. It ends the process when it cannot start one.
+constexpr char kThreadLimitVariable[] = "OMP_THREAD_LIMIT";
 
 /// Parses a size such as "64MiB"; negative if the text is not a number.
 double Bytes(const char* text) {
@@ -51,6 +56,9 @@ void LimitTo(size_t limit, const char* variable) {
 void LimitImageMagick(size_t memoryLimit) {
   LimitTo(memoryLimit / 2, kMemoryLimitVariable);
   LimitTo(memoryLimit, kMapLimitVariable);
+  if (!HasMemoryForThreads(memoryLimit)) {
+    setenv(kThreadLimitVariable, "1", 1);
+  }
 }
 
 void KeepImageMagickFromUsingFiles() {

@@ -4,19 +4,12 @@
 #include <cstddef>
 #include <vector>
 
+#include "configuration/profile_values.h"
 #include "picture/picture.h"
 #include "picture/rows.h"
 #include "picture/sample_loops.h"
 
 namespace vela {
-
-/// Parameters of the sharpening.
-struct UnsharpMask {
-  double radius = 0;        ///< pixels; 0: derived from `sigma`
-  double sigma = 1;         ///< pixels, positive
-  double amount = 1;        ///< factor of the difference that is added
-  double threshold = 0.05;  ///< smallest difference that is added, as a share of the full range
-};
 
 /// Adds to every sample its difference from the blurred picture, according to `mask`.
 void Sharpen(Picture& picture, const UnsharpMask& mask);

@@ -1,14 +1,20 @@
 #include "process/child_program.h"
 
+#include <fcntl.h>
 #include <sys/prctl.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <cerrno>
 #include <csignal>
+#include <cstdio>
 #include <cstring>
 #include <optional>
+#include <utility>
 
+#include "posix/file_content.h"
+#include "posix/file_descriptor.h"
 #include "process/failure_report.h"
 #include "process/write_signals.h"
 
@@ -21,7 +27,36 @@ constexpr int kFailed = 1;
 /// Added to a signal number, the exit status that shells report for a program ended by a signal.
 constexpr int kEndedBySignal = 128;
 
+/// Bytes of the child's messages that are kept.
+constexpr size_t kMostErrors = 65536;
+
 volatile pid_t g_child = 0;
+
+/// Two ends of a pipe.
+struct Pipe {
+  FileDescriptor reader;
+  FileDescriptor writer;
+};
+
+/// Neither end is open, and errno is set, on failure.
+Pipe MakePipe() {
+  int ends[2] = {-1, -1};
+  return pipe2(ends, O_CLOEXEC) == 0 ? Pipe{FileDescriptor(ends[0]), FileDescriptor(ends[1])}
+                                     : Pipe{};
+}
+
+/// Passes everything from the pipe on to standard error, until the child has closed it. Returns its
+/// beginning.
+std::string PassErrorsOn(const FileDescriptor& reader) {
+  std::string errors;
+  char chunk[4096];
+  size_t got = 0;
+  while (ReadChunk(reader.Get(), chunk, sizeof chunk, got) == 0 && got > 0) {
+    WriteAll(STDERR_FILENO, {chunk, got});
+    errors.append(chunk, std::min(got, kMostErrors - errors.size()));
+  }
+  return errors;
+}
 
 void ForwardSignal(int signal) {
   const int error = errno;
@@ -53,25 +88,26 @@ void ForwardSignals() {
 }
 
 [[noreturn]] void Execute(const std::vector<const char*>& programs, char* const* arguments,
-                          pid_t parent, const sigset_t& mask) {
+                          pid_t parent, const sigset_t& mask, const FileDescriptor& errors) {
   prctl(PR_SET_PDEATHSIG, SIGKILL);
   // The parent may have ended before that call.
-  if (getppid() == parent) {
+  if (getppid() == parent && dup2(errors.Get(), STDERR_FILENO) >= 0) {
     sigprocmask(SIG_SETMASK, &mask, nullptr);
     for (const char* const program : programs) {
       execv(program, arguments);
     }
-    ReportFailure("%s: %s", programs.back(), std::strerror(errno));
-    IgnoreWriteSignals();
-    PrintFailure();
+    std::fprintf(stderr, "convert-thumb: %s: %s\n", programs.back(), std::strerror(errno));
   }
   _exit(kFailed);
 }
 
-[[noreturn]] void ExitAs(int waitStatus, const std::function<bool(bool)>& finish) {
-  const bool succeeded = WIFEXITED(waitStatus) && WEXITSTATUS(waitStatus) == 0;
-  if (!finish(succeeded) && succeeded) {
-    IgnoreWriteSignals();
+[[noreturn]] void ExitAs(int waitStatus, std::string errors,
+                         const std::function<bool(const ChildEnd&)>& finish) {
+  ChildEnd end;
+  end.succeeded = WIFEXITED(waitStatus) && WEXITSTATUS(waitStatus) == 0;
+  end.signal = WIFSIGNALED(waitStatus) ? WTERMSIG(waitStatus) : 0;
+  end.errors = std::move(errors);
+  if (!finish(end) && end.succeeded) {
     PrintFailure();
     _exit(kFailed);
   }
@@ -113,7 +149,11 @@ void ReplaceProcess(const char* program, char* const* arguments) {
 }
 
 void RunInChildAndExit(const std::vector<const char*>& programs, char* const* arguments,
-                       const std::function<bool(bool)>& finish) {
+                       const std::function<bool(const ChildEnd&)>& finish) {
+  Pipe errors = MakePipe();
+  if (!errors.reader.IsOpen()) {
+    return;
+  }
   const pid_t self = getpid();
   const sigset_t forwarded = ForwardedSignals();
   sigset_t mask;
@@ -122,7 +162,7 @@ void RunInChildAndExit(const std::vector<const char*>& programs, char* const* ar
   ResetChildSignal();
   const pid_t child = fork();
   if (child == 0) {
-    Execute(programs, arguments, self, mask);
+    Execute(programs, arguments, self, mask, errors.writer);
   }
   if (child > 0) {
     g_child = child;
@@ -134,8 +174,12 @@ void RunInChildAndExit(const std::vector<const char*>& programs, char* const* ar
     errno = error;
     return;
   }
+  errors.writer.Reset();
+  // Standard error may be broken, and the outputs must be removed nevertheless.
+  IgnoreWriteSignals();
+  std::string messages = PassErrorsOn(errors.reader);
   if (const std::optional<int> status = WaitForExit(child)) {
-    ExitAs(*status, finish);
+    ExitAs(*status, std::move(messages), finish);
   }
 }
 

@@ -2,6 +2,7 @@
 #pragma once
 
 #include <functional>
+#include <string>
 #include <vector>
 
 namespace vela {
@@ -10,13 +11,21 @@ namespace vela {
 /// on failure, with errno set.
 void ReplaceProcess(const char* program, char* const* arguments);
 
+/// How a child has ended.
+struct ChildEnd {
+  bool succeeded = false;  ///< its exit status is 0
+  int signal = 0;          ///< that ended it; 0: none
+  std::string errors;      ///< the beginning of what it has written to standard error
+};
+
 /// Runs the first of these programs that can be started in a child process and ends this process
-/// with the child's exit status or signal. When the child has ended, calls `finish` with true if
-/// its exit status is 0; if `finish` then returns false, this process prints the failure and ends
-/// with status 1. Forwards SIGTERM, SIGINT, SIGHUP and SIGQUIT to the child, which is killed when
-/// this process dies. Resets SIGCHLD to its default action in both processes. Returns only when no
-/// child could be started or its status cannot be determined, with errno set.
+/// with the child's exit status or signal. What the child writes to standard error is passed on.
+/// When the child has ended, calls `finish`; if its exit status is 0 and `finish` returns false,
+/// this process prints the failure and ends with status 1. Forwards SIGTERM, SIGINT, SIGHUP and
+/// SIGQUIT to the child, which is killed when this process dies. Resets SIGCHLD to its default
+/// action in both processes and ignores the signals of IgnoreWriteSignals in this one. Returns only
+/// when no child could be started or its status cannot be determined, with errno set.
 void RunInChildAndExit(const std::vector<const char*>& programs, char* const* arguments,
-                       const std::function<bool(bool)>& finish);
+                       const std::function<bool(const ChildEnd&)>& finish);
 
 }  // namespace vela

@@ -1,13 +1,12 @@
 #include "process/resource_limits.h"
 
 #include <algorithm>
-#include <charconv>
 #include <cstdio>
 #include <limits>
 #include <optional>
-#include <string_view>
-#include <system_error>
 
+#include "configuration/setting_values.h"
+#include "configuration/settings.h"
 #include "platform/system_rules.h"
 #include "platform/vlibc.h"
 #include "posix/confinement.h"
@@ -16,39 +15,6 @@
 namespace vela {
 
 namespace {
-
-constexpr char kKey[] = "convert_memory_limit";
-constexpr size_t kDefaultLimit = CONVERT_THUMB_MEMORY_LIMIT;
-
-/// Returns how often the suffix of a number doubles it; empty for an unknown suffix.
-std::optional<int> Doublings(std::string_view unit) {
-  constexpr std::string_view kUnits = "kmg";
-  constexpr int kDoublingsEach = 10;
-  if (unit.empty()) {
-    return 0;
-  }
-  const size_t index = kUnits.find(static_cast<char>(unit.front() | 0x20));
-  if (unit.size() > 1 || index == std::string_view::npos) {
-    return std::nullopt;
-  }
-  return kDoublingsEach * static_cast<int>(index + 1);
-}
-
-/// Empty unless the text is a size of at least 1 byte.
-std::optional<size_t> ParseSize(std::string_view text) {
-  const char* const last = text.data() + text.size();
-  size_t number = 0;
-  const auto [end, error] = std::from_chars(text.data(), last, number);
-  if (error != std::errc() || number == 0) {
-    return std::nullopt;
-  }
-  const std::optional<int> doublings =
-      Doublings(std::string_view(end, static_cast<size_t>(last - end)));
-  if (!doublings || number > std::numeric_limits<size_t>::max() >> *doublings) {
-    return std::nullopt;
-  }
-  return number << *doublings;
-}
 
 /// Returns the memory limit of the process.
 size_t ProcessMemoryLimit(size_t memoryLimit) {
@@ -60,16 +26,18 @@ size_t ProcessMemoryLimit(size_t memoryLimit) {
 }  // namespace
 
 size_t ConversionMemoryLimit() {
+  const auto normal = static_cast<size_t>(DefaultConvertMemory());
   char text[64] = "";
-  if (VLIBCFileGetKeyValue(kSettingsFile, kKey, text, sizeof text, 0) <= 0 || *text == '\0') {
-    return kDefaultLimit;
+  if (VLIBCFileGetKeyValue(kSettingsFile, kConvertMemoryKey, text, sizeof text, 0) <= 0 ||
+      *text == '\0') {
+    return normal;
   }
-  const std::optional<size_t> limit = ParseSize(text);
+  const std::optional<size_t> limit = ParseByteCount(text);
   if (!limit) {
     std::fprintf(stderr, "convert-thumb: %s: %s is not a number of bytes, using %zu\n",
-                 kSettingsFile, kKey, kDefaultLimit);
+                 kSettingsFile, kConvertMemoryKey, normal);
   }
-  return limit.value_or(kDefaultLimit);
+  return limit.value_or(normal);
 }
 
 void LimitResources(size_t memoryLimit) {
@@ -77,6 +45,10 @@ void LimitResources(size_t memoryLimit) {
   limits.memory = ProcessMemoryLimit(memoryLimit);
   limits.processorSeconds = kMaxProcessorSeconds;
   LowerLimits(limits);
+}
+
+bool HasMemoryForThreads(size_t memoryLimit) {
+  return !IsMemoryLimitedBelow(ProcessMemoryLimit(memoryLimit));
 }
 
 }  // namespace vela

@@ -25,4 +25,8 @@ size_t ConversionMemoryLimit();
 /// Existing lower limits stay.
 void LimitResources(size_t memoryLimit);
 
+/// Returns true when the memory suffices for the stacks of threads too: false when the limit that
+/// the process was started with is lower than that of LimitResources.
+bool HasMemoryForThreads(size_t memoryLimit);
+
 }  // namespace vela

@@ -93,4 +93,18 @@ bool ProtectsOwnFiles(const std::string& path) {
   return directory.IsOpen() && IsProtected(directory);
 }
 
+bool IsAbsent(const Place& place) {
+  struct stat status;
+  return fstatat(place.directory.Get(), place.name.c_str(), &status, AT_SYMLINK_NOFOLLOW) != 0 &&
+         errno == ENOENT;
+}
+
+void RemoveRegular(const Place& place) {
+  struct stat status;
+  if (fstatat(place.directory.Get(), place.name.c_str(), &status, AT_SYMLINK_NOFOLLOW) == 0 &&
+      S_ISREG(status.st_mode)) {
+    unlinkat(place.directory.Get(), place.name.c_str(), 0);
+  }
+}
+
 }  // namespace vela

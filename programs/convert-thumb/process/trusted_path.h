@@ -31,4 +31,10 @@ bool IsPrivate(const FileDescriptor& directory);
 /// directory at `path`, although others may perhaps create files there, as in /tmp.
 bool ProtectsOwnFiles(const std::string& path);
 
+/// Returns true when there is nothing at the place.
+bool IsAbsent(const Place& place);
+
+/// Removes a regular file at the place.
+void RemoveRegular(const Place& place);
+
 }  // namespace vela

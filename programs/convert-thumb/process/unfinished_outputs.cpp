@@ -42,16 +42,11 @@ struct FatalSignal {
   const char* message;
 };
 constexpr FatalSignal kFatalSignals[] = {
-    {SIGABRT, "convert-thumb: a library aborted, probably because it ran out of memory\n"},
-    {SIGTRAP, "convert-thumb: a library aborted, probably because it ran out of memory\n"},
-    {SIGBUS, "convert-thumb: the photo changed while it was being read\n"},
-    {SIGXCPU, "convert-thumb: the photo takes too much processor time\n"},
+    {SIGABRT, "a library aborted, probably because it ran out of memory"},
+    {SIGTRAP, "a library aborted, probably because it ran out of memory"},
+    {SIGBUS, "the photo changed while it was being read"},
+    {SIGXCPU, "the photo takes too much processor time"},
 };
-
-void Print(const char* message) {
-  const ssize_t written = write(STDERR_FILENO, message, std::strlen(message));
-  static_cast<void>(written);  // there is no other place to report it
-}
 
 bool IsSameFile(const struct stat& a, const struct stat& b) {
   return a.st_dev == b.st_dev && a.st_ino == b.st_ino;
@@ -86,7 +81,7 @@ void EndOnSignal(int number) {
   RemoveOutputs();
   for (const FatalSignal& fatal : kFatalSignals) {
     if (fatal.number == number) {
-      Print(fatal.message);
+      PrintFailureNow(fatal.message);
     }
   }
   _exit(kFailed);

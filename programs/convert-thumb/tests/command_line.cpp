@@ -9,11 +9,14 @@ void Append(Words& line, const Words& more) {
   line.insert(line.end(), more.begin(), more.end());
 }
 
-Words OptionArguments(const ThumbOptions& options) {
-  const std::string box = std::to_string(options.width) + "x" + std::to_string(options.height);
-  Words line = {"-define",    "jpeg:size=" + box,
-                "-thumbnail", box + (options.fill ? ">^" : ">"),
-                "-quality",   std::to_string(options.quality)};
+std::string BoxOf(const ThumbOptions& options) {
+  return std::to_string(options.width) + "x" + std::to_string(options.height);
+}
+
+Words OptionArguments(const ThumbOptions& options, const Words& scaling) {
+  Words line = {"-define", "jpeg:size=" + BoxOf(options)};
+  Append(line, scaling);
+  Append(line, {"-quality", std::to_string(options.quality)});
   if (options.stripProfiles) {
     Append(line, {"+profile", "!icc,*"});
   }
@@ -35,30 +38,40 @@ Words OptionArguments(const ThumbOptions& options) {
   return line;
 }
 
-void AppendFirst(Words& line, const ThumbOutput& output) {
+void AppendFirst(Words& line, const ThumbOutput& output, const Words& scaling) {
   Append(line, {"(", "-clone", "0"});
-  Append(line, OptionArguments(output.options));
+  Append(line, OptionArguments(output.options, scaling));
   Append(line, {"-write", output.path, ")", "-delete", "0"});
 }
 
-void AppendMiddle(Words& line, const ThumbOutput& output) {
+void AppendMiddle(Words& line, const ThumbOutput& output, const Words& scaling) {
   Append(line, {"(", "+clone"});
-  Append(line, OptionArguments(output.options));
+  Append(line, OptionArguments(output.options, scaling));
   Append(line, {"-write", output.path, "+delete", ")"});
 }
 
 }  // namespace
 
 std::vector<std::string> CommandLine::Arguments() const {
+  std::vector<Words> scaling;
+  for (const ThumbOutput& output : outputs) {
+    const ThumbOptions& options = output.options;
+    scaling.push_back({"-thumbnail", BoxOf(options) + (options.fill ? ">^" : ">")});
+  }
+  return Arguments(scaling);
+}
+
+std::vector<std::string> CommandLine::Arguments(
+    const std::vector<std::vector<std::string>>& scaling) const {
   Words line;
   if (!scratchDirectory.empty()) {
     Append(line, {"-define", "registry:temporary-path=" + scratchDirectory});
   }
   Append(line, {source});
   for (size_t i = 0; i + 1 < outputs.size(); ++i) {
-    i == 0 ? AppendFirst(line, outputs[i]) : AppendMiddle(line, outputs[i]);
+    i == 0 ? AppendFirst(line, outputs[i], scaling[i]) : AppendMiddle(line, outputs[i], scaling[i]);
   }
-  Append(line, OptionArguments(outputs.back().options));
+  Append(line, OptionArguments(outputs.back().options, scaling.back()));
   Append(line, {outputs.back().path});
   return line;
 }

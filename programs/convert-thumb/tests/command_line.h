@@ -32,6 +32,9 @@ struct CommandLine {
 
   /// The arguments after argument zero.
   std::vector<std::string> Arguments() const;
+
+  /// The same with other arguments in place of "-thumbnail" and its value: a list for each output.
+  std::vector<std::string> Arguments(const std::vector<std::vector<std::string>>& scaling) const;
 };
 
 }  // namespace vela_test

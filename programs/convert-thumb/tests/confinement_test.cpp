@@ -422,11 +422,12 @@ TEST_F(Confinement, AppliesToImageMagick) {
       {"-define", "registry:temporary-path=" + directory_, source, "-write", directory_ + "/o.png",
        "-set", "filename:a", "/tmp/outside/new", "%[filename:a].png"},
       options);
-  EXPECT_TRUE(Exists(directory_ + "/o.png")) << result.err;
   if (ErrorOutside() != 0) {
     EXPECT_EQ(result.exitCode, 1);
+    EXPECT_THAT(result.err, testing::HasSubstr("unable to open image `/tmp/outside/new.png'"));
     EXPECT_FALSE(Exists("/tmp/outside/new.png"));
   } else {
+    EXPECT_TRUE(Exists(directory_ + "/o.png")) << result.err;
     EXPECT_TRUE(Exists("/tmp/outside/new.png"));
   }
 }

@@ -7,6 +7,7 @@
 #include <vector>
 
 #include "command_line.h"
+#include "platform/installed_names.h"
 #include "support/files.h"
 #include "support/image_checks.h"
 #include "support/images.h"
@@ -19,7 +20,13 @@ namespace vela_test {
 std::string ConvertThumbPath();
 
 /// ImageMagick's own program.
-constexpr const char* kImageMagick = "/usr/bin/convert-im6.q16";
+constexpr const char* kImageMagick = vela::kImageMagickProgram;
+
+/// The arguments with which ImageMagick makes the pictures that the converter should make.
+/// "-thumbnail" of version 7 samples, averages and scales in three steps; version 6 scales in one,
+/// after sampling when the picture becomes much smaller, and so does the converter. Version 7 gets
+/// the arguments for that.
+std::vector<std::string> ReferenceArguments(const CommandLine& line);
 
 /// Starts a program with these signals at their default (SIG_DFL) or ignored (SIG_IGN), regardless
 /// of the test's own.

@@ -33,9 +33,8 @@ class Formats : public ConverterTest {
   }
 
   std::string DensityOf(const std::string& name) const {
-    return RunProgram(
-               "/usr/bin/identify-im6.q16",
-               {"-format", "%[fx:resolution.x]x%[fx:resolution.y] %U", directory_ + "/" + name})
+    return RunProgram("/usr/bin/identify", {"-format", "%[fx:resolution.x]x%[fx:resolution.y] %U",
+                                            directory_ + "/" + name})
         .out;
   }
 
@@ -150,8 +149,9 @@ TEST_F(Formats, HeifOfACameraKeepsItsProfile) {
     return;
   }
   const std::string photo = media + "/phone_12mp.heic";
-  ASSERT_EQ(RunProgram(kImageMagick, Line(photo, UsualOutputs(), "theirs").Arguments()).exitCode,
-            0);
+  ASSERT_EQ(
+      RunProgram(kImageMagick, ReferenceArguments(Line(photo, UsualOutputs(), "theirs"))).exitCode,
+      0);
   const WithoutImageMagick without;
   ExpectSuccess(Convert(photo, UsualOutputs()));
   for (const char* place : {"0.jpg", "1.jpg", "2.jpg", "3.jpg"}) {

@@ -119,7 +119,8 @@ TEST_F(HandOverToChild, FailsWhenTheProgramCannotRun) {
   RemoveTool(kImageMagick);
   const ProgramResult result = RunConverter(arguments_);
   EXPECT_EQ(result.exitCode, 1);
-  EXPECT_EQ(result.err, "convert-thumb: /usr/bin/convert-im6.q16: No such file or directory\n");
+  EXPECT_EQ(result.err,
+            std::string("convert-thumb: ") + kImageMagick + ": No such file or directory\n");
 }
 
 TEST_F(HandOverToChild, FailsWithAStatusWhenStandardErrorIsBroken) {

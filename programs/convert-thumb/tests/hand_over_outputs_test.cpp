@@ -110,6 +110,43 @@ TEST_F(HandOverOutputs, FailWithOneLineWhenTheyArePipes) {
   EXPECT_TRUE(Exists(pipe));
 }
 
+class FailedOutputs : public HandOverOutputs {
+ protected:
+  /// ImageMagick opens the output of this photo before it notices that there are no pixels.
+  std::string MakeDamagedPhoto() const {
+    const std::string photo = MakeJpeg(directory_ + "/damaged.jpg");
+    const std::string bytes = ReadFile(photo);
+    WriteFile(photo, bytes.substr(0, bytes.find("\xff\xda")));
+    return photo;
+  }
+
+  /// Runs a line that only ImageMagick understands.
+  void ExpectFailure(const std::string& output) const {
+    EXPECT_NE(RunConverter({MakeDamagedPhoto(), "-resize", "10x10", output}).exitCode, 0);
+  }
+};
+
+TEST_F(FailedOutputs, AreRemovedWhereNobodyElseCanChangeThem) {
+  for (const char* prefix : {"", "jpg:"}) {
+    ExpectFailure(prefix + directory_ + "/o.jpg");
+    EXPECT_EQ(ListDirectory(directory_), std::vector<std::string>{"damaged.jpg"}) << prefix;
+  }
+}
+
+TEST_F(FailedOutputs, AreRemovedWhereOthersCanChangeThem) {
+  const std::string shared = directory_ + "/shared";
+  MakeDirectories(shared);
+  ASSERT_EQ(chmod(shared.c_str(), 0777), 0);
+  ExpectFailure(shared + "/o.jpg");
+  EXPECT_THAT(ListDirectory(shared), IsEmpty());
+}
+
+TEST_F(FailedOutputs, RemainWhenTheyWereThereBefore) {
+  WriteFile(directory_ + "/o.jpg", "older");
+  ExpectFailure(directory_ + "/o.jpg");
+  EXPECT_TRUE(Exists(directory_ + "/o.jpg"));
+}
+
 TEST_F(HandOverOutputs, KeepTheirMeaningWhereOnlyImageMagickUnderstandsTheLine) {
   const std::string source = MakeSource();
   ProgramOptions options;

@@ -2,6 +2,11 @@
 
 #include <unistd.h>
 
+#include <algorithm>
+#include <cctype>
+#include <set>
+#include <sstream>
+
 #include "converter_fixture.h"
 #include "support/build_paths.h"
 #include "support/stub_tool.h"
@@ -12,6 +17,7 @@ namespace {
 using namespace ::testing;
 
 constexpr char kPolicies[] = "/usr/vela/share/imagemagick";
+constexpr const char* kConfiguration = vela::kImageMagickConfiguration;
 constexpr char kAllowEverything[] =
     "<policymap>\n<policy domain=\"coder\" rights=\"read|write\" pattern=\"*\"/>\n"
     "<policy domain=\"delegate\" rights=\"read|write|execute\" pattern=\"*\"/>\n"
@@ -57,9 +63,9 @@ TEST_F(ImageMagickPolicy, AllowsOnlyPhotos) {
 }
 
 TEST_F(ImageMagickPolicy, IsNotLoosenedByThatOfTheSystem) {
-  RemoveTree("/etc/ImageMagick-6");
-  MakeDirectories("/etc/ImageMagick-6");
-  WriteFile("/etc/ImageMagick-6/policy.xml", kAllowEverything);
+  RemoveTree(kConfiguration);
+  MakeDirectories(kConfiguration);
+  WriteFile(std::string(kConfiguration) + "/policy.xml", kAllowEverything);
   ExpectOnlyPhotos();
 }
 
@@ -73,11 +79,60 @@ TEST_F(ImageMagickPolicy, IsNotLoosenedByTheEnvironment) {
                     "MAGICK_HOME=" + home});
 }
 
+/// The names in the braces of a policy.
+std::set<std::string> NamesIn(const std::string& policy) {
+  std::set<std::string> names;
+  for (size_t start = policy.find('{'); start != std::string::npos;
+       start = policy.find('{', start + 1)) {
+    std::istringstream list(policy.substr(start + 1, policy.find('}', start) - start - 1));
+    for (std::string name; std::getline(list, name, ',');) {
+      names.insert(name);
+    }
+  }
+  return names;
+}
+
+char ToUpper(char letter) {
+  return static_cast<char>(std::toupper(static_cast<unsigned char>(letter)));
+}
+
+/// The formats that the installed version knows, in capitals: names before the module, with or
+/// without an asterisk, in a table with a line of dashes above it.
+std::vector<std::string> KnownFormats() {
+  std::istringstream table(RunProgram(kImageMagick, {"-list", "format"}).out);
+  std::vector<std::string> formats;
+  bool isInTable = false;
+  for (std::string line; std::getline(table, line);) {
+    std::istringstream fields(line);
+    std::string name;
+    std::string module;
+    std::string mode;
+    fields >> name >> module >> mode;
+    isInTable = isInTable || name.compare(0, 3, "---") == 0;
+    if (isInTable && mode.size() == 3 && mode.find_first_not_of("rw-+") == std::string::npos) {
+      std::transform(name.begin(), name.end(), name.begin(), ToUpper);
+      formats.push_back(name.substr(0, name.find('*')));
+    }
+  }
+  return formats;
+}
+
+TEST_F(ImageMagickPolicy, NamesEveryFormatOfTheInstalledVersion) {
+  const std::set<std::string> photos = NamesIn(ReadFile(std::string(kPolicies) + "/policy.xml"));
+  const std::set<std::string> others =
+      NamesIn(ReadFile(std::string(kPolicies) + "/last/ImageMagick/policy.xml"));
+  const std::vector<std::string> formats = KnownFormats();
+  EXPECT_THAT(formats, AllOf(Contains("JPEG"), Contains("MSL"), Contains("YUV")));
+  for (const std::string& format : formats) {
+    EXPECT_EQ(photos.count(format) + others.count(format), 1) << format;
+  }
+}
+
 TEST_F(ImageMagickPolicy, MayBeTightenedByThatOfTheSystem) {
   const std::string photo = MakeImage(directory_ + "/a.bmp", 30, 20);
-  RemoveTree("/etc/ImageMagick-6");
-  MakeDirectories("/etc/ImageMagick-6");
-  WriteFile("/etc/ImageMagick-6/policy.xml",
+  RemoveTree(kConfiguration);
+  MakeDirectories(kConfiguration);
+  WriteFile(std::string(kConfiguration) + "/policy.xml",
             "<policymap>\n<policy domain=\"coder\" rights=\"none\" pattern=\"BMP\"/>\n"
             "</policymap>\n");
   EXPECT_FALSE(IsAllowed({photo}));

@@ -2,6 +2,8 @@
 
 #include <gtest/gtest.h>
 
+#include "configuration/profile_values.h"
+
 using namespace vela;
 
 namespace {

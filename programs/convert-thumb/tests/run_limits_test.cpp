@@ -244,12 +244,19 @@ class ImageMagickLimits : public ConverterTest {
   /// to the converter's. Nothing but ImageMagick can be run, so a program that prints variables has
   /// to take its place.
   static std::string Limits(const std::vector<std::string>& given) {
+    return Variables({"MAGICK_MEMORY_LIMIT", "MAGICK_MAP_LIMIT"}, given).out;
+  }
+
+  static ProgramResult Variables(const std::vector<std::string>& names,
+                                 const std::vector<std::string>& given,
+                                 const std::vector<BeforeExec>& beforeExec = {}) {
     RemoveTool(kImageMagick);
     CopyFile("/usr/bin/printenv", kImageMagick);
     EXPECT_EQ(chmod(kImageMagick, 0755), 0);
     ProgramOptions options;
     options.addedEnvironment = given;
-    return RunConverter({"MAGICK_MEMORY_LIMIT", "MAGICK_MAP_LIMIT"}, options).out;
+    options.beforeExec = beforeExec;
+    return RunConverter(names, options);
   }
 };
 
@@ -266,6 +273,16 @@ TEST_F(ImageMagickLimits, StayWhenTheyAreLower) {
   for (const std::string high : {"1GiB", "1TB", "unlimited", "", "-1", "268435457", "300MB"}) {
     EXPECT_EQ(Limits({"MAGICK_MEMORY_LIMIT=" + high}), "268435456\n536870912\n") << high;
   }
+}
+
+// A thread has a stack of 8 MB.
+TEST_F(ImageMagickLimits, PermitNoThreadsWithLessMemoryThanTheConverterAllows) {
+  const std::vector<std::string> name = {"OMP_THREAD_LIMIT"};
+  EXPECT_EQ(Variables(name, {}).out, "");
+  EXPECT_EQ(Variables(name, {"OMP_THREAD_LIMIT=9"}).out, "9\n");
+  const std::vector<BeforeExec> little = {LimitResource(RLIMIT_DATA, 100 << 20)};
+  EXPECT_EQ(Variables(name, {}, little).out, "1\n");
+  EXPECT_EQ(Variables(name, {"OMP_THREAD_LIMIT=9"}, little).out, "1\n");
 }
 
 }  // namespace

@@ -5,6 +5,7 @@
 #include <optional>
 #include <vector>
 
+#include "platform/installed_names.h"
 #include "posix/loaded_library.h"
 #include "process/failure_report.h"
 #include "process/output_file.h"
@@ -38,7 +39,7 @@ class TurbojpegLibrary final : private LoadedLibrary {
   decltype(&::tjFree) freeBuffer = nullptr;
 
  private:
-  TurbojpegLibrary() : LoadedLibrary("libturbojpeg.so.0") {
+  TurbojpegLibrary() : LoadedLibrary(kTurbojpegLibrary) {
     Find("tjInitTransform", initTransform);
     Find("tjDecompressHeader3", readHeader);
     Find("tjTransform", transform);

@@ -32,7 +32,7 @@ bool WaitUntil(const std::function<bool()>& condition) {
 }  // namespace
 
 std::string IndexDaemonPath() {
-  return HostPath(VELAINDEXPLUGIND_FILE);
+  return BuiltPath(VELAINDEXPLUGIND_FILE);
 }
 
 ProgramResult RunDaemon(const std::vector<std::string>& arguments) {

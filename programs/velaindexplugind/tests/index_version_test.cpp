@@ -37,6 +37,18 @@ TEST_F(IndexVersionTest, IsZeroWhenTheSettingIsNotAWholeNumber) {
   }
 }
 
+TEST_F(IndexVersionTest, MistakesInTheSettingsAreLoggedAtTheStart) {
+  WriteFile(kSettings, "tool_timeout=\"60\"\n\x1b[2J=1\nindex_versoin=\"3\"\n");
+  IndexDaemon daemon;
+  const std::string log = daemon.End(SIGTERM).err;
+  EXPECT_THAT(log, HasSubstr("level=warning event=settings file=/etc/velainfo.conf line=2 "
+                             "problem=\"there is no setting \\\"\\\\x1b[2J\\\"\"\n"));
+  EXPECT_THAT(log, HasSubstr("level=warning event=settings file=/etc/velainfo.conf line=3 "
+                             "problem=\"there is no setting \\\"index_versoin\\\"; did you mean "
+                             "index_version?\"\n"));
+  EXPECT_THAT(log, Not(HasSubstr("line=1 ")));
+}
+
 TEST_F(IndexVersionTest, OfTheNearestDirectoryApplies) {
   WriteFile(kSettings, "index_version=\"7\"\n");
   const IndexDaemon daemon;

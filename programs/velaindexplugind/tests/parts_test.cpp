@@ -6,11 +6,11 @@
 #include <optional>
 #include <string>
 
+#include "configuration/whole_number.h"
 #include "index_store.h"
 #include "request.h"
 #include "request_handler.h"
 #include "request_log.h"
-#include "whole_number.h"
 
 using namespace vela;
 

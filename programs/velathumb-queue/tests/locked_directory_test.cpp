@@ -113,7 +113,8 @@ TEST_P(LockedDirectoryTest, IsDeferredToALaterRunInTheEnd) {
   EventWait events;
   PauseGate gate;
   EntryHistories histories = {{"/tmp/p", {0, 10, {}}}};
-  Batch batch(settings, taken, events, gate, histories);
+  const ProgressLine progress;
+  Batch batch(settings, taken, events, gate, histories, progress);
   EXPECT_EQ(batch.Run(), RunEnd::kEmpty);
   EXPECT_EQ(batch.DeferredCount(), 1);
   EXPECT_EQ(ReadFile(kLaterFile), "/tmp/p\n");

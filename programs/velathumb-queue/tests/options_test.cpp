@@ -6,6 +6,7 @@
 #include <cerrno>
 
 #include "queue_fixture.h"
+#include "support/daemon_peer.h"
 #include "support/descriptor.h"
 
 namespace vela_test {
@@ -136,6 +137,7 @@ TEST_F(OptionsTest, ATakenFileThatIsADirectoryIsAnError) {
 /// number of that file plus `offset`. Returns the content of the file.
 std::string ErrorWithJournalStream(ino_t offset) {
   const RecordingVelathumb velathumb;
+  const DaemonPeer daemon;
   Enqueue({"/tmp/a"});
   const Descriptor error(open("/tmp/err", O_RDWR | O_CREAT | O_TRUNC | O_CLOEXEC, 0644));
   struct stat status = {};
@@ -157,6 +159,7 @@ TEST_F(OptionsTest, LinesForAFileHaveNoLevelWhenTheJournalIsThatOfAParent) {
 }
 
 TEST_F(OptionsTest, ControlCharactersOfAnEntryAreEscaped) {
+  const DaemonPeer daemon;
   velathumb_.Stub().PlanCall(1, StubPlan().Exit(1));
   Enqueue({"/tmp/\x1b[2J\r"});
   EXPECT_EQ(velathumb_.Run().err,

@@ -89,7 +89,7 @@ void ExpectQueueDone() {
 }
 
 std::string QueueProgramPath() {
-  return HostPath(VELATHUMB_QUEUE_FILE);
+  return BuiltPath(VELATHUMB_QUEUE_FILE);
 }
 
 std::vector<std::string> QueueArguments(const std::string& profileFile,

@@ -53,7 +53,7 @@ class Completion : public SandboxTest {
 TEST_F(Completion, ProposesOptionsWithThePrefix) {
   EXPECT_THAT(Complete({"--pr"}), ElementsAre("--progress"));
   EXPECT_THAT(Complete({"--re"}), UnorderedElementsAre("--recursive", "--resume-time"));
-  EXPECT_THAT(Complete({"/tmp", "--ch"}), ElementsAre("--check-videos"));
+  EXPECT_THAT(Complete({"/tmp", "--ch"}), UnorderedElementsAre("--check-videos", "--check-config"));
   EXPECT_THAT(Complete({"--nothing"}), IsEmpty());
 }
 
@@ -75,7 +75,7 @@ std::vector<std::string> OptionsOfTheHelp() {
 
 TEST_F(Completion, ProposesAllOptionsOfTheHelp) {
   const std::vector<std::string> options = OptionsOfTheHelp();
-  EXPECT_EQ(options.size(), 18U);
+  EXPECT_EQ(options.size(), 22U);
   EXPECT_THAT(options, IsSupersetOf({"-p", "--photos", "--html", "-w"}));
   EXPECT_THAT(Complete({"-"}), UnorderedElementsAreArray(options));
 }
@@ -85,6 +85,10 @@ TEST_F(Completion, ProposesDirectoriesOtherwise) {
   EXPECT_THAT(Complete({"--recursive", "ph"}), ElementsAre("photos"));
   EXPECT_THAT(Complete({"page"}), IsEmpty());
   EXPECT_THAT(Complete({"/tmp/here/w"}), ElementsAre("/tmp/here/with space"));
+}
+
+TEST_F(Completion, ProposesFilesForTheProfile) {
+  EXPECT_THAT(Complete({"--check-config", "pa"}), ElementsAre("page.html"));
 }
 
 TEST_F(Completion, ProposesFilesForThePage) {

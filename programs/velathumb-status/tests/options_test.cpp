@@ -18,8 +18,9 @@ TEST_F(CommandLine, HelpNamesEveryOptionAndTheExitStatus) {
   EXPECT_EQ(result.err, "");
   for (const char* text :
        {"-p,--photos", "-r,--recursive", "--check-videos", "--html", "-q,--queue", "--progress",
-        "--resume-time", "--security", "-w,--watch", "-j,--json", "--version", "-h,--help", "DIR",
-        "REMOVES", "Exit status: 0 nothing to do, 1 work outstanding, 2 error."}) {
+        "--resume-time", "--security", "--check-config", "-w,--watch", "-j,--json", "--version",
+        "-h,--help", "DIR", "REMOVES",
+        "Exit status: 0 nothing to do, 1 work outstanding, 2 error."}) {
     EXPECT_THAT(result.out, HasSubstr(text));
   }
   EXPECT_EQ(RunStatus({"-h"}).out, result.out);
@@ -38,7 +39,9 @@ TEST_F(CommandLine, InvalidArgumentsAreReportedOnStandardError) {
     std::vector<std::string> arguments;
     std::string message;
   } cases[] = {
-      {{}, "give a directory, --queue, --progress, --watch, --resume-time or --security"},
+      {{},
+       "give a directory, --queue, --progress, --watch, --resume-time, --security or "
+       "--check-config"},
       {{"--json"}, "give a directory"},
       {{"--unknown", kTop}, "--unknown"},
       {{"-x", kTop}, "-x"},
@@ -53,6 +56,8 @@ TEST_F(CommandLine, InvalidArgumentsAreReportedOnStandardError) {
       {{"--watch", "--queue"}, "--queue excludes --watch"},
       {{"--watch", "--resume-time"}, "--resume-time excludes --watch"},
       {{"--watch", "--security"}, "--security excludes --watch"},
+      {{"--watch", "--check-config"}, "--check-config excludes --watch"},
+      {{"--check-config", "/tmp/a.conf", kTop}, "DIR excludes --check-config"},
       {{"--watch", "--check-videos"}, "--check-videos"},
   };
   for (const auto& [arguments, message] : cases) {

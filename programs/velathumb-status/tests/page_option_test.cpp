@@ -76,7 +76,7 @@ TEST_F(PageOption, OtherReportsAreMadeWithoutARefusedPage) {
   const ProgramResult result = RunStatus({"--html", "/dev/null", "--json", "--queue", kTop});
   EXPECT_EQ(result.exitCode, 2);
   const Json::Value answer = ReadJson(result.out);
-  EXPECT_EQ(answer["queues"].size(), 4U);
+  EXPECT_EQ(answer["queues"].size(), 5U);
   EXPECT_FALSE(answer.isMember("directories"));
 }
 

@@ -12,7 +12,8 @@ namespace {
 using namespace ::testing;
 
 /// The queue files in the order of the report.
-constexpr const char* kFiles[] = {kPhotosInProgress, kPhotoQueue, kVideosInProgress, kVideoQueue};
+constexpr const char* kFiles[] = {kPhotosInProgress, kPhotoQueue, kVideosInProgress, kVideoQueue,
+                                  kDeferredPhotos};
 
 /// One queue of the text report.
 struct QueueText {
@@ -39,8 +40,8 @@ std::vector<QueueText> QueryQueues() {
       queue.entries.pop_back();
     }
   }
-  EXPECT_EQ(queues.size(), 4U);
-  queues.resize(4);
+  EXPECT_EQ(queues.size(), 5U);
+  queues.resize(5);
   return queues;
 }
 
@@ -54,10 +55,11 @@ std::vector<std::string> PathsOf(const Json::Value& queue) {
 
 class QueueListTest : public SandboxTest {};
 
-TEST_F(QueueListTest, ListsTheFourFilesEntriesInProgressFirst) {
+TEST_F(QueueListTest, ListsTheFilesEntriesInProgressFirst) {
   WriteFile(kPhotosInProgress, "/tmp/in work\n");
   WriteFile(kPhotoQueue, "/tmp/waiting\nR:/tmp/tree\n");
   WriteFile(kVideosInProgress, "/tmp/a.mp4\n/tmp/b.mp4\n/tmp/c.mp4\n");
+  WriteFile(kDeferredPhotos, "/tmp/gone\n");
   const ProgramResult result = RunStatus({"--queue"});
   EXPECT_EQ(result.exitCode, 1);
   EXPECT_EQ(result.err, "");
@@ -68,9 +70,10 @@ TEST_F(QueueListTest, ListsTheFourFilesEntriesInProgressFirst) {
        {"/tmp/a.mp4", "/tmp/b.mp4", "/tmp/c.mp4"},
        "3 entries"},
       {"video queue /var/spool/flv_create.queue", {}, "0 entries"},
+      {"photo queue /var/spool/thumb_create.queue.later, deferred", {"/tmp/gone"}, "1 entry"},
   };
   const std::vector<QueueText> queues = QueryQueues();
-  for (size_t i = 0; i < 4; ++i) {
+  for (size_t i = 0; i < queues.size(); ++i) {
     EXPECT_EQ(queues[i].heading, expected[i].heading);
     EXPECT_EQ(queues[i].entries, expected[i].entries);
     EXPECT_EQ(queues[i].count, expected[i].count);
@@ -105,15 +108,17 @@ TEST_F(QueueListTest, OddBytesStayOnOneLine) {
 
 TEST_F(QueueListTest, JsonHasTheDocumentedMembers) {
   WriteFile(kPhotosInProgress, "/tmp/in work\n");
+  WriteFile(kDeferredPhotos, "/tmp/gone\n");
   WriteFile(kVideoQueue, "R:/tmp/films\n/tmp/\"a\\.mp4\n");
   const Json::Value answer = QueryJson({"--queue"});
   EXPECT_THAT(answer.getMemberNames(), UnorderedElementsAre("format", "queues", "errors"));
   const Json::Value queues = answer["queues"];
-  ASSERT_EQ(queues.size(), 4U);
-  const char* kinds[] = {"photo", "photo", "video", "video"};
-  for (Json::ArrayIndex i = 0; i < 4; ++i) {
+  ASSERT_EQ(queues.size(), 5U);
+  const char* kinds[] = {"photo", "photo", "video", "video", "photo"};
+  for (Json::ArrayIndex i = 0; i < queues.size(); ++i) {
     EXPECT_THAT(queues[i].getMemberNames(),
-                UnorderedElementsAre("kind", "file", "videos_needing_work", "entries"));
+                UnorderedElementsAre("kind", "file", "deferred", "videos_needing_work", "entries"));
+    EXPECT_EQ(queues[i]["deferred"], Json::Value(i == 4));
     EXPECT_EQ(queues[i]["file"], Json::Value(kFiles[i]));
     EXPECT_EQ(queues[i]["kind"], Json::Value(kinds[i]));
     EXPECT_EQ(queues[i]["videos_needing_work"], Json::Value());
@@ -121,6 +126,7 @@ TEST_F(QueueListTest, JsonHasTheDocumentedMembers) {
   }
   EXPECT_THAT(PathsOf(queues[0]), ElementsAre("/tmp/in work"));
   EXPECT_THAT(PathsOf(queues[1]), IsEmpty());
+  EXPECT_THAT(PathsOf(queues[4]), ElementsAre("/tmp/gone"));
   EXPECT_THAT(PathsOf(queues[3]), ElementsAre("R:/tmp/films", "/tmp/\"a\\.mp4"));
 }
 

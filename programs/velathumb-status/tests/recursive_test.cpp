@@ -41,9 +41,37 @@ TEST_F(TreeStatusTest, HasALineForEachDirectory) {
   MakePhoto(In("one/deep/b.jpg"));
   MakeDirectories(In("empty"));
   const StatusText answer = Query();
-  EXPECT_THAT(answer.Names(), UnorderedElementsAre(kTop, In("one"), In("one/deep"), In("empty")));
+  EXPECT_THAT(answer.Names(), ElementsAre(kTop, In("empty"), In("one"), In("one/deep")));
   EXPECT_EQ(answer.totals.numbers, (StatusNumbers{4, 4, 0, 24, 0}));
   EXPECT_EQ(answer.totals.name, "in 4 directories");
+}
+
+TEST_F(TreeStatusTest, DirectoriesAreSortedByTheBytesOfTheirPaths) {
+  const std::vector<std::string> names = {"A",   "B b", "a", "a-1",      "a-1/x",
+                                          "a/b", "a0",  "z", "\xc3\xa4", "\xff"};
+  // The order in which they are created is that of many file systems.
+  for (size_t i = 0; i < names.size(); ++i) {
+    MakePhoto(In(names[(i * 7 + 3) % names.size()] + "/p.jpg"));
+  }
+  std::vector<std::string> sorted = {kTop};
+  for (const std::string& name : names) {
+    sorted.push_back(In(name));
+  }
+  EXPECT_EQ(Query().Names(), sorted);
+  std::vector<std::string> json;
+  const Json::Value answer = QueryJson({"-r", kTop});
+  for (const Json::Value& directory : answer["directories"]) {
+    json.push_back(directory.isMember("path_base64") ? In("\xff") : directory["path"].asString());
+  }
+  EXPECT_EQ(json, sorted);
+  RunStatus({"-r", "--html", "/tmp/page.html", kTop});
+  const std::string page = ReadFile("/tmp/page.html");
+  size_t place = 0;
+  for (const std::string& path : sorted) {
+    const std::string shown = path == In("\xff") ? In("\xef\xbf\xbd") : path;
+    place = page.find("\">" + shown + "</bdi>", place);
+    ASSERT_NE(place, std::string::npos) << path;
+  }
 }
 
 TEST_F(TreeStatusTest, ListsADirectoryBeforeWhatIsBelowIt) {

@@ -33,6 +33,8 @@ void RunningConversion::Finish() {
   WriteFile(kGoFile, "");
   const auto result = program_->Wait();
   EXPECT_TRUE(result && result->exitCode == 0);
+  // It has queued the directory for its later phases.
+  RemoveTree("/var/spool/thumb_create.queue");
 }
 
 }  // namespace vela_test

@@ -17,7 +17,7 @@ class RunningConversion {
 
   pid_t Pid() const { return program_->Pid(); }
 
-  /// Lets the converter continue and waits for the end of the run.
+  /// Lets the converter continue and waits for the end of the run; nothing is queued afterwards.
   void Finish();
 
  private:

@@ -18,6 +18,7 @@ namespace vela_test {
 constexpr const char* kTop = "/tmp/photos";
 constexpr const char* kPhotoQueue = "/var/spool/thumb_create.queue";
 constexpr const char* kPhotosInProgress = "/var/spool/thumb_create.queue.tmp";
+constexpr const char* kDeferredPhotos = "/var/spool/thumb_create.queue.later";
 constexpr const char* kVideoQueue = "/var/spool/flv_create.queue";
 constexpr const char* kVideosInProgress = "/var/spool/flv_create.queue.tmp";
 constexpr int kAllSizes = 63;

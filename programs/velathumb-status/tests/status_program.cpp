@@ -60,7 +60,7 @@ Json::CharReaderBuilder StrictReader() {
 }  // namespace
 
 std::string StatusProgramPath() {
-  return HostPath(VELATHUMB_STATUS_FILE);
+  return BuiltPath(VELATHUMB_STATUS_FILE);
 }
 
 ProgramResult RunStatus(const std::vector<std::string>& arguments, const ProgramOptions& options) {

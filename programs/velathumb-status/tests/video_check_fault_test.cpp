@@ -61,7 +61,7 @@ class VideoCheckFault : public SandboxTest {
     const Json::Value answer = ReadJson(result.out);
     EXPECT_EQ(answer["directories"][0]["videos_needing_work"], Json::Value());
     EXPECT_EQ(answer["totals"]["videos_needing_work"], Json::Value());
-    ASSERT_EQ(answer["queues"].size(), 4U);
+    ASSERT_EQ(answer["queues"].size(), 5U);
     EXPECT_EQ(answer["queues"][3]["videos_needing_work"], Json::Value());
     EXPECT_EQ(answer["queues"][3]["entries"].size(), 1U);
     EXPECT_EQ(answer["errors"].size(), 1U);
@@ -103,7 +103,7 @@ TEST_F(VideoCheckFault, OtherReportsNeedNoVideoLibrary) {
 
 /// The results that a new process gets for the videos, see video_probe.
 std::string Probe(const std::vector<std::string>& files) {
-  const ProgramResult result = RunProgram(HostPath(VIDEO_PROBE_FILE), files);
+  const ProgramResult result = RunProgram(BuiltPath(VIDEO_PROBE_FILE), files);
   EXPECT_EQ(result.exitCode, 0) << result.err;
   return result.out;
 }

@@ -13,7 +13,7 @@
 #include "running_conversion.h"
 #include "status_fixture.h"
 #include "support/descriptor.h"
-#include "terminal.h"
+#include "support/terminal.h"
 
 using namespace vela;
 
@@ -169,9 +169,10 @@ TEST_F(Watching, JsonIsOneObjectALine) {
   std::vector<Json::Value> moments;
   for (const std::string& line : LinesOf(result->out)) {
     moments.push_back(ReadJson(line));
-    EXPECT_THAT(moments.back().getMemberNames(),
-                UnorderedElementsAre("photo", "thumb", "video", "instances", "unit", "rate",
-                                     "seconds_left"));
+    EXPECT_THAT(
+        moments.back().getMemberNames(),
+        UnorderedElementsAre("photo", "thumb", "video", "instances", "activity", "unit", "rate",
+                             "seconds_left", "resume_time", "seconds_until_resume"));
     EXPECT_EQ(moments.back()["unit"], Json::Value("thumbnails"));
   }
   ASSERT_GE(moments.size(), 3U);
@@ -183,6 +184,8 @@ TEST_F(Watching, JsonIsOneObjectALine) {
   EXPECT_GT(moments[1]["seconds_left"].asInt64(), 0);
   EXPECT_EQ(moments.back()["thumb"]["completed"], Json::Value(51));
   EXPECT_EQ(moments.back()["instances"], Json::Value(Json::arrayValue));
+  EXPECT_EQ(moments.front()["activity"], Json::Value("running"));
+  EXPECT_EQ(moments.back()["activity"], Json::Value("ended"));
 }
 
 TEST_F(Watching, RedrawsABarOnATerminal) {

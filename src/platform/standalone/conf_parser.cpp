@@ -9,8 +9,9 @@
 #include <mutex>
 #include <string_view>
 
+#include "configuration/section_text.h"
+#include "configuration/text_lines.h"
 #include "platform/standalone/last_error.h"
-#include "platform/standalone/white_space.h"
 #include "platform/velautils.h"
 #include "posix/file_content.h"
 
@@ -22,8 +23,6 @@ struct Section {
   std::string name;
   std::map<std::string, std::string> values;
 };
-
-constexpr size_t kFileSizeMax = 64 * 1024 * 1024;
 
 /// By default inih also accepts values that continue in the next line and comments after values,
 /// and limits the length of lines.
@@ -46,7 +45,7 @@ void SetDialect() {
 class LineFeed {
  public:
   LineFeed(std::string_view text, std::vector<Section>& sections)
-      : text_(text), sections_(sections) {}
+      : lines_(text), sections_(sections) {}
 
   /// The reader for inih, which works like fgets.
   static char* Read(char* buffer, int size, void* feed);
@@ -58,18 +57,12 @@ class LineFeed {
   bool IsValid() const { return isValid_; }
 
  private:
-  static constexpr std::string_view kByteOrderMark = "\xEF\xBB\xBF";
-
   bool PrepareLine();
-  std::string_view TakeLine();
-  bool PrepareText(std::string_view line);
-  bool PrepareSection(std::string_view line);
-  bool PreparePair(std::string_view line);
+  void PrepareSection(std::string_view name);
   char* Copy(char* buffer, size_t size);
 
-  std::string_view text_;
+  vela::TextLines lines_;
   std::vector<Section>& sections_;
-  bool isFirstLine_ = true;
   bool isValid_ = true;
   std::string line_;    // prepared, with its newline
   size_t given_ = 0;    // how much of it inih has read
@@ -97,47 +90,34 @@ char* LineFeed::Copy(char* buffer, size_t size) {
   return buffer;
 }
 
+/// Returns false at the end, and for an invalid line.
 bool LineFeed::PrepareLine() {
-  if (text_.empty() || !isValid_) {
+  if (!isValid_ || !lines_.Next()) {
     return false;
   }
   given_ = 0;
-  isValid_ = PrepareText(vela::Trimmed(TakeLine()));
+  line_ = "\n";
+  const vela::SectionLine line = vela::ParseSectionLine(lines_.Line(), lines_.Number() == 1);
+  switch (line.kind) {
+    case vela::SectionLine::Kind::kBlank:
+      break;
+    case vela::SectionLine::Kind::kSection:
+      PrepareSection(line.name);
+      break;
+    case vela::SectionLine::Kind::kPair:
+      key_ = line.name;
+      line_ = "key=";
+      line_.append(line.value);
+      line_ += '\n';
+      break;
+    case vela::SectionLine::Kind::kInvalid:
+      isValid_ = false;
+      break;
+  }
   return isValid_;
 }
 
-std::string_view LineFeed::TakeLine() {
-  const size_t newline = text_.find('\n');
-  std::string_view line = text_.substr(0, newline);
-  text_.remove_prefix(newline == std::string_view::npos ? text_.size() : newline + 1);
-  const bool hasMark = isFirstLine_ && line.substr(0, kByteOrderMark.size()) == kByteOrderMark;
-  if (hasMark) {
-    line.remove_prefix(kByteOrderMark.size());
-  }
-  isFirstLine_ = false;
-  return line;
-}
-
-/// Returns false for an invalid line.
-bool LineFeed::PrepareText(std::string_view line) {
-  line_ = "\n";
-  if (line.find('\0') != std::string_view::npos) {
-    return false;
-  }
-  if (line.empty() || line.front() == ';' || line.front() == '#') {
-    return true;
-  }
-  return line.front() == '[' ? PrepareSection(line) : PreparePair(line);
-}
-
-bool LineFeed::PrepareSection(std::string_view line) {
-  if (line.find(']') != line.size() - 1) {
-    return false;
-  }
-  const std::string_view name = vela::Trimmed(line.substr(1, line.size() - 2));
-  if (name.empty()) {
-    return false;
-  }
+void LineFeed::PrepareSection(std::string_view name) {
   const auto known = std::find_if(sections_.begin(), sections_.end(),
                                   [&](const Section& section) { return section.name == name; });
   section_ = static_cast<size_t>(known - sections_.begin()) + 1;
@@ -145,22 +125,6 @@ bool LineFeed::PrepareSection(std::string_view line) {
     sections_.push_back({std::string(name), {}});
   }
   line_ = "[" + std::to_string(section_) + "]\n";
-  return true;
-}
-
-bool LineFeed::PreparePair(std::string_view line) {
-  const size_t equals = line.find('=');
-  if (equals == std::string_view::npos) {
-    return false;
-  }
-  key_ = vela::Trimmed(line.substr(0, equals));
-  if (key_.empty()) {
-    return false;
-  }
-  line_ = "key";
-  line_.append(line.substr(equals));
-  line_ += '\n';
-  return true;
 }
 
 int LineFeed::Store(void* feed, const char* section, const char* /*name*/, const char* value) {
@@ -178,24 +142,6 @@ bool Parse(std::string_view text, std::vector<Section>& sections) {
   SetDialect();
   LineFeed feed(text, sections);
   return ini_parse_stream(LineFeed::Read, &feed, LineFeed::Store, &feed) == 0 && feed.IsValid();
-}
-
-int ParseInt(std::string_view text, int defaultValue) {
-  if (!text.empty() && text.front() == '+') {
-    text.remove_prefix(1);
-    if (!text.empty() && text.front() == '-') {
-      return defaultValue;
-    }
-  }
-  int number = 0;
-  const auto [stop, error] = std::from_chars(text.data(), text.data() + text.size(), number);
-  if (error == std::errc::invalid_argument) {
-    return defaultValue;
-  }
-  if (error == std::errc::result_out_of_range) {
-    return text.front() == '-' ? INT_MIN : INT_MAX;
-  }
-  return number;
 }
 
 }  // namespace
@@ -231,7 +177,7 @@ bool ConfParser::loadFromFile(const std::string& path) {
     return false;
   }
   std::vector<Section> sections;
-  if (text.size() > kFileSizeMax || !Parse(text, sections)) {
+  if (text.size() > vela::kLargestSectionText || !Parse(text, sections)) {
     vela::SetLastError(EINVAL);
     return false;
   }
@@ -250,7 +196,11 @@ std::vector<std::string> ConfParser::enumSections() const {
 
 int ConfParser::getInt(const std::string& section, const std::string& key, int defaultValue) const {
   const std::string* value = content_->Find(section, key);
-  return value == nullptr ? defaultValue : ParseInt(*value, defaultValue);
+  if (value == nullptr) {
+    return defaultValue;
+  }
+  const auto integer = vela::ParseLeadingInteger(*value);
+  return integer ? integer->number : defaultValue;
 }
 
 std::string ConfParser::getString(const std::string& section, const std::string& key,

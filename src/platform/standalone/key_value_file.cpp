@@ -6,8 +6,8 @@
 #include <memory>
 #include <string>
 
+#include "configuration/key_value_text.h"
 #include "platform/standalone/bounded_copy.h"
-#include "platform/standalone/key_value_text.h"
 #include "platform/standalone/last_error.h"
 #include "platform/vlibc.h"
 #include "posix/file_content.h"

@@ -1,13 +1,13 @@
 #include "platform/standalone/settings.h"
 
-#include <charconv>
-#include <limits>
 #include <mutex>
 #include <optional>
 #include <string>
 #include <string_view>
 
-#include "platform/standalone/key_value_text.h"
+#include "configuration/key_value_text.h"
+#include "configuration/setting_values.h"
+#include "configuration/settings.h"
 #include "platform/system_rules.h"
 #include "posix/file_content.h"
 #include "posix/file_version.h"
@@ -17,39 +17,18 @@ namespace vela {
 
 namespace {
 
-/// Parses a text of decimal digits only. A number that does not fit becomes the largest one.
-std::optional<uint32_t> ParseNumber(std::string_view text) {
-  uint32_t number = 0;
-  const char* end = text.data() + text.size();
-  const auto [stop, error] = std::from_chars(text.data(), end, number);
-  if (stop != end || error == std::errc::invalid_argument) {
-    return std::nullopt;
-  }
-  if (error == std::errc::result_out_of_range) {
-    return std::numeric_limits<uint32_t>::max();
-  }
-  return number;
-}
-
-std::optional<uint32_t> FindNumber(std::string_view text, std::string_view key) {
+void ReadSizeMap(std::string_view text, const char* key, int32_t& sizeMap) {
   const auto value = FindValue(text, key);
-  return value ? ParseNumber(*value) : std::nullopt;
-}
-
-void ReadSizeMap(std::string_view text, std::string_view key, int32_t& sizeMap) {
-  const auto number = FindNumber(text, key);
-  if (number && *number <= uint32_t{kAllThumbSizes}) {
-    sizeMap = static_cast<int32_t>(*number);
-  }
+  sizeMap = (value ? ParseSizeMap(*value) : std::nullopt).value_or(sizeMap);
 }
 
 Settings ParseSettings(std::string_view text) {
   Settings settings;
-  ReadSizeMap(text, "photo_thumb_size_map", settings.photoThumbSizeMap);
-  ReadSizeMap(text, "video_thumb_size_map", settings.videoThumbSizeMap);
-  if (const auto limit = FindNumber(text, "tool_timeout")) {
-    settings.toolTimeout = std::chrono::seconds(*limit);
-  }
+  ReadSizeMap(text, kPhotoSizeMapKey, settings.photoThumbSizeMap);
+  ReadSizeMap(text, kVideoSizeMapKey, settings.videoThumbSizeMap);
+  const auto limit = FindValue(text, kToolTimeoutKey);
+  settings.toolTimeout =
+      (limit ? ParseSeconds(*limit) : std::nullopt).value_or(settings.toolTimeout);
   return settings;
 }
 

@@ -1,7 +1,7 @@
 #include <cstring>
 #include <string_view>
 
-#include "platform/standalone/white_space.h"
+#include "configuration/white_space.h"
 #include "platform/velaindex.h"
 
 void EscapePercentSign(const char* in, char* out, size_t outSize) {

@@ -6,6 +6,7 @@
 #include <thread>
 #include <vector>
 
+#include "platform/installed_names.h"
 #include "platform/system_rules.h"
 #include "posix/file_content.h"
 
@@ -20,7 +21,7 @@ constexpr char kScratchVariable[] = "MAGICK_TEMPORARY_PATH=";
 constexpr char kFirstPage[] = "[0]";
 
 /// The configuration of ImageMagick, with the policy that limits it to photos.
-constexpr const char* kImageMagickData[] = {"/etc/ImageMagick-6", "/usr/share/ImageMagick-6",
+constexpr const char* kImageMagickData[] = {kImageMagickConfiguration, kImageMagickShared,
                                             "/usr/share/color", "/usr/vela/share/imagemagick"};
 
 /// Makes ImageMagick read that policy, before and after the system's.
@@ -29,9 +30,8 @@ constexpr const char* kImageMagickPolicy[] = {"MAGICK_CONFIGURE_PATH=/usr/vela/s
 
 /// ImageMagick, which the converter runs when it does not support a photo, and what a converter
 /// that is a script runs.
-constexpr const char* kConverterPrograms[] = {"/usr/vela/lib/convert-thumb",
-                                              "/usr/bin/convert-im6.q16", "/bin/sh", "/usr/bin/od",
-                                              "/usr/bin/tr"};
+constexpr const char* kConverterPrograms[] = {"/usr/vela/lib/convert-thumb", kImageMagickProgram,
+                                              "/bin/sh", "/usr/bin/od", "/usr/bin/tr"};
 
 constexpr const char* kPerlPrograms[] = {"/usr/bin/perl"};
 constexpr const char* kPerlData[] = {"/usr/share/perl", "/usr/share/perl5", "/etc/perl",
@@ -139,12 +139,14 @@ struct Tool {
   void (*allow)(const Arguments& arguments, Confinement& confinement);
   uint64_t memory;  ///< bytes; none for one that sets a limit of its own before it reads its input
   bool hasThreads;
+  /// Connects to the system log, and gives up making sockets itself before it reads its input.
+  bool logsFailures;
 };
 
-constexpr Tool kTools[] = {{"convert-thumb", AllowConverter, ResourceLimits::kNone, true},
-                           {"dcraw", AllowDcraw, kRawDecoderMemory, false},
-                           {"exiftool", AllowExiftool, kToolMemory, false},
-                           {"compare", AllowCompare, kToolMemory, true}};
+constexpr Tool kTools[] = {{"convert-thumb", AllowConverter, ResourceLimits::kNone, true, true},
+                           {"dcraw", AllowDcraw, kRawDecoderMemory, false, false},
+                           {"exiftool", AllowExiftool, kToolMemory, false, false},
+                           {"compare", AllowCompare, kToolMemory, true, false}};
 
 const Tool* FindTool(std::string_view program) {
   const std::string_view name = program.substr(program.rfind('/') + 1);
@@ -196,6 +198,10 @@ Confinement ConfinementOfTool(const char* program, char* const arguments[],
   Arguments list;
   for (char* const* argument = arguments; *argument != nullptr; ++argument) {
     list.emplace_back(*argument);
+  }
+  // A script in place of the program does not confine what it runs.
+  if (tool->logsFailures && !BeginsWith(program, "#!")) {
+    confinement.sockets = SocketUse::kLocalDatagrams;
   }
   confinement.files = FilesOfEveryProgram();
   confinement.files->programs.emplace_back(program);

@@ -25,7 +25,7 @@ int32_t RotationOf(const VideoContainer& container) {
   std::array<int32_t, 9> matrix;
   size_t size = 0;
   const uint8_t* data =
-      container.Library().getSideData(container.VideoStream(), AV_PKT_DATA_DISPLAYMATRIX, &size);
+      container.Library().SideDataOf(*container.VideoStream(), AV_PKT_DATA_DISPLAYMATRIX, size);
   if (data == nullptr || size < sizeof matrix) {
     return 0;
   }

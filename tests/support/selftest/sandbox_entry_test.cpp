@@ -6,13 +6,12 @@
 #include <sys/syscall.h>
 
 #include <cerrno>
-#include <chrono>
-#include <thread>
 
 #include "support/files.h"
 #include "support/program.h"
 #include "support/sandbox.h"
 #include "support/seccomp_fail.h"
+#include "support/selftest/process_count.h"
 
 namespace vela_test {
 namespace {
@@ -28,29 +27,13 @@ std::vector<std::string> Arguments(const std::string& test) {
 
 ProgramResult RunProbe(const std::vector<std::string>& arguments,
                        const ProgramOptions& options = ProgramOptions()) {
-  return RunProgram(HostPath(PROBE_FILE), arguments, options);
+  return RunProgram(BuiltPath(PROBE_FILE), arguments, options);
 }
 
 ProgramOptions WithoutNamespaces() {
   ProgramOptions options;
   options.beforeExec = {SeccompFail({SYS_unshare}, EPERM)};
   return options;
-}
-
-size_t ProcessCount() {
-  size_t count = 0;
-  for (const std::string& name : ListDirectory("/proc")) {
-    count += name.find_first_not_of("0123456789") == std::string::npos ? 1 : 0;
-  }
-  return count;
-}
-
-bool AwaitProcessCount(size_t count) {
-  constexpr int kMilliseconds = 10000;
-  for (int i = 0; i < kMilliseconds && ProcessCount() != count; ++i) {
-    std::this_thread::sleep_for(std::chrono::milliseconds(1));
-  }
-  return ProcessCount() == count;
 }
 
 TEST_F(SandboxEntry, ExitStatusIsThatOfTheTests) {
@@ -97,10 +80,8 @@ TEST_F(SandboxEntry, ResultFileIsWrittenOutside) {
 
 TEST_F(SandboxEntry, EverythingEndsWithTheProgram) {
   const size_t before = ProcessCount();
-  // The program, its process 1 and its test process.
-  const size_t meanwhile = before + 3;
-  Program program = StartProgram(HostPath(PROBE_FILE), Arguments("Sleeps"));
-  ASSERT_TRUE(AwaitProcessCount(meanwhile));
+  Program program = StartProgram(BuiltPath(PROBE_FILE), Arguments("Sleeps"));
+  ASSERT_TRUE(AwaitProcessCount(before + kProcessesOfASandbox));
   program.Kill(SIGKILL);
   program.Wait();
   EXPECT_TRUE(AwaitProcessCount(before));

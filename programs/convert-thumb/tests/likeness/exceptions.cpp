@@ -3,6 +3,8 @@
 #include <algorithm>
 #include <array>
 
+#include "platform/installed_names.h"
+
 namespace vela_test {
 namespace {
 
@@ -12,6 +14,7 @@ struct Entry {
   const char* vector;  ///< "": all
   LikenessException kind;
   const char* why;
+  int version = 0;  ///< of ImageMagick; 0: all
 };
 
 constexpr char kPanorama[] =
@@ -22,6 +25,15 @@ constexpr char kWholePicture[] = "the picture is whole; ImageMagick makes no thu
 constexpr char kIgnoredOrientation[] =
     "ImageMagick does not look for the orientation in a WebP; with it the thumbnails are upright";
 
+constexpr char kObservedOrientation[] =
+    "ImageMagick 7 observes the orientation in a PNG; version 6 and the converter do not";
+
+constexpr char kHolesAtEdges[] =
+    "where a GIF is transparent, ImageMagick 7 leaves a pattern of holes at the edges";
+
+constexpr char kBareAlpha[] =
+    "ImageMagick 7 also scales and sharpens what is transparent in another way";
+
 constexpr char kLostProfile[] =
     "ImageMagick loses this photo's colour profile, without which its colours look faded";
 
@@ -29,7 +41,10 @@ constexpr std::array kEntries = {
     Entry{"JPEG", "30000 x 10", "", LikenessException::kSucceeds, kPanorama},
     Entry{"JPEG", "10 x 30000", "", LikenessException::kSucceeds, kPanorama},
     Entry{"Netpbm", "PPM, 20000 x 12", "", LikenessException::kSucceeds, kPanorama},
-    Entry{"WebP", "orientation 6", "", LikenessException::kUpright, kIgnoredOrientation},
+    Entry{"WebP", "orientation 6", "", LikenessException::kUpright, kIgnoredOrientation, 6},
+    Entry{"PNG", "orientation 6", "", LikenessException::kUpright, kObservedOrientation, 7},
+    Entry{"PNG", "grey with alpha", "bare", LikenessException::kOtherPicture, kBareAlpha, 7},
+    Entry{"GIF", "transparent parts", "", LikenessException::kOtherPicture, kHolesAtEdges, 7},
     Entry{"Damaged", "PNG without its end chunk", "", LikenessException::kSucceeds, kWholePicture},
     Entry{"Camera", "phone_12mp.heic", "", LikenessException::kSurroundings, kLostProfile},
 };
@@ -37,7 +52,8 @@ constexpr std::array kEntries = {
 bool IsAbout(const Entry& entry, const std::string& format, const std::string& description,
              const std::string& vector) {
   return format == entry.format && description == entry.description &&
-         (*entry.vector == '\0' || vector == entry.vector);
+         (*entry.vector == '\0' || vector == entry.vector) &&
+         (entry.version == 0 || entry.version == vela::kImageMagickVersion);
 }
 
 }  // namespace

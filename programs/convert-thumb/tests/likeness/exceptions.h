@@ -9,6 +9,7 @@ enum class LikenessException {
   kNone,
   kSucceeds,      ///< ours succeeds, ImageMagick fails
   kFails,         ///< ours fails, ImageMagick succeeds
+  kOtherPicture,  ///< the pictures are of the same size but not alike
   kUpright,       ///< ours is upright, ImageMagick's is not rotated
   kSurroundings,  ///< something other than the pixels differs
 };

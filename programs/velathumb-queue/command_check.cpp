@@ -1,4 +1,4 @@
-#include "configuration.h"
+#include "command_check.h"
 
 #include <cstring>
 
@@ -36,10 +36,6 @@ bool IsFaultless(const std::string& fault) {
 }
 
 }  // namespace
-
-std::string DefaultProfileFile(const std::string& local, const std::string& installed) {
-  return ExamineFile(local) ? local : installed;
-}
 
 bool IsProfileUsable(const std::string& profileFile) {
   return IsFaultless(FindProfileFault(profileFile));

@@ -1,4 +1,4 @@
-#include "terminal.h"
+#include "support/terminal.h"
 
 #include <fcntl.h>
 #include <poll.h>

@@ -1,6 +1,6 @@
-#include "platform/standalone/key_value_text.h"
+#include "configuration/key_value_text.h"
 
-#include "platform/standalone/white_space.h"
+#include "configuration/white_space.h"
 
 namespace vela {
 
@@ -8,53 +8,8 @@ namespace {
 
 constexpr char kCommentMark = '#';
 
-/// A pair as written in a line; both parts without surrounding white space.
-struct WrittenPair {
-  std::string_view key;
-  std::string_view value;  // quotes and escapes included
-};
-
-std::optional<WrittenPair> ReadPair(std::string_view line) {
-  const std::string_view text = Trimmed(line);
-  if (text.empty() || text.front() == kCommentMark) {
-    return std::nullopt;
-  }
-  const size_t equals = text.find('=');
-  if (equals == std::string_view::npos) {
-    return std::nullopt;
-  }
-  return WrittenPair{Trimmed(text.substr(0, equals)), Trimmed(text.substr(equals + 1))};
-}
-
 bool IsEscaped(char c) {
   return c == '"' || c == '\\';
-}
-
-/// Returns the text between the quotes; nothing when the closing quote is missing.
-std::optional<std::string> Unquoted(std::string_view written) {
-  if (written.empty() || written.front() != '"') {
-    return std::nullopt;
-  }
-  std::string value;
-  for (size_t i = 1; i < written.size(); ++i) {
-    const char c = written[i];
-    if (c == '"') {
-      return value;
-    }
-    const bool isEscape = c == '\\' && i + 1 < written.size() && IsEscaped(written[i + 1]);
-    if (isEscape) {
-      ++i;
-    }
-    value += written[i];
-  }
-  return std::nullopt;
-}
-
-std::string Decoded(std::string_view written) {
-  if (auto value = Unquoted(written)) {
-    return *value;
-  }
-  return std::string(written);
 }
 
 std::string MakeLine(std::string_view key, std::string_view value) {
@@ -93,9 +48,9 @@ struct FoundPair {
 std::optional<FoundPair> FindPair(std::string_view text, std::string_view key) {
   for (size_t begin = 0; begin < text.size();) {
     const Line line = LineAt(text, begin);
-    const auto pair = ReadPair(text.substr(line.begin, line.length));
-    if (pair && pair->key == key) {
-      return FoundPair{line, pair->value};
+    const KeyValueLine parsed = ParseKeyValueLine(text.substr(line.begin, line.length));
+    if (parsed.kind == KeyValueLine::Kind::kPair && parsed.key == key) {
+      return FoundPair{line, parsed.written};
     }
     begin = line.next;
   }
@@ -104,12 +59,44 @@ std::optional<FoundPair> FindPair(std::string_view text, std::string_view key) {
 
 }  // namespace
 
+KeyValueLine ParseKeyValueLine(std::string_view line) {
+  const std::string_view text = Trimmed(line);
+  if (text.empty() || text.front() == kCommentMark) {
+    return {};
+  }
+  const size_t equals = text.find('=');
+  if (equals == std::string_view::npos) {
+    return {KeyValueLine::Kind::kInvalid};
+  }
+  return {KeyValueLine::Kind::kPair, Trimmed(text.substr(0, equals)),
+          Trimmed(text.substr(equals + 1))};
+}
+
+DecodedValue DecodeValue(std::string_view written) {
+  if (written.empty() || written.front() != '"') {
+    return {std::string(written)};
+  }
+  DecodedValue value;
+  for (size_t i = 1; i < written.size(); ++i) {
+    if (written[i] == '"') {
+      value.rest = Trimmed(written.substr(i + 1));
+      return value;
+    }
+    const bool isEscape = written[i] == '\\' && i + 1 < written.size() && IsEscaped(written[i + 1]);
+    if (isEscape) {
+      ++i;
+    }
+    value.text += written[i];
+  }
+  return {std::string(written), true};
+}
+
 std::optional<std::string> FindValue(std::string_view text, std::string_view key) {
   const auto found = FindPair(text, key);
   if (!found) {
     return std::nullopt;
   }
-  return Decoded(found->value);
+  return DecodeValue(found->value).text;
 }
 
 std::string WithValue(std::string_view text, std::string_view key, std::string_view value) {

@@ -1,10 +1,11 @@
 // A profile or a velathumb that cannot be used: the runner ends, and no entry is lost.
-#include "configuration.h"
+#include "command_check.h"
 
 #include <sys/stat.h>
 
+#include "checks/configuration_check.h"
 #include "queue_fixture.h"
-#include "support/profile_file.h"
+#include "support/daemon_peer.h"
 
 namespace vela_test {
 namespace {
@@ -14,7 +15,7 @@ using namespace ::testing;
 /// What systemd is told when only a change of the configuration helps.
 constexpr int kMisconfigured = 78;
 
-class ConfigurationTest : public QueueTest {
+class CommandCheckTest : public QueueTest {
  protected:
   /// Fails the test unless the runner ends with the status for a wrong configuration, has started
   /// no velathumb and keeps the queue. Returns its messages.
@@ -46,7 +47,7 @@ class ConfigurationTest : public QueueTest {
   }
 };
 
-TEST_F(ConfigurationTest, AProfileThatCannotBeUsedKeepsTheQueue) {
+TEST_F(CommandCheckTest, AProfileThatCannotBeUsedKeepsTheQueue) {
   WriteFile("/tmp/invalid.conf", "[thumb_s\nsize=120\n");
   WriteFile("/tmp/empty.conf", "; nothing\n");
   WriteFile("/tmp/other.conf", "[thumb_s]\nfilename=VELAPHOTO_THUMB_XL.jpg\nsize=1280\n");
@@ -69,7 +70,7 @@ TEST_F(ConfigurationTest, AProfileThatCannotBeUsedKeepsTheQueue) {
   EXPECT_THAT(velathumb_.Entries(), IsEmpty());
 }
 
-TEST_F(ConfigurationTest, AProfileThatMayNotBeReadKeepsTheQueue) {
+TEST_F(CommandCheckTest, AProfileThatMayNotBeReadKeepsTheQueue) {
   ASSERT_EQ(chmod(kProfiles, 0), 0);
   Enqueue({"/tmp/a"});
   ProgramOptions options;
@@ -81,7 +82,7 @@ TEST_F(ConfigurationTest, AProfileThatMayNotBeReadKeepsTheQueue) {
   EXPECT_EQ(ReadFile(kQueueFile), "/tmp/a\n");
 }
 
-TEST_F(ConfigurationTest, AVelathumbThatCannotBeStartedKeepsTheQueue) {
+TEST_F(CommandCheckTest, AVelathumbThatCannotBeStartedKeepsTheQueue) {
   WriteFile("/tmp/text", "");
   ASSERT_EQ(chmod("/tmp/text", 0644), 0);
   EXPECT_EQ(Refusal("/tmp/text", kProfiles),
@@ -90,25 +91,26 @@ TEST_F(ConfigurationTest, AVelathumbThatCannotBeStartedKeepsTheQueue) {
             "velathumb-queue: cannot run /tmp/none: No such file or directory\n");
 }
 
-TEST_F(ConfigurationTest, AnEntryWhoseProfileHasBecomeUnusableIsNotDone) {
+TEST_F(CommandCheckTest, AnEntryWhoseProfileHasBecomeUnusableIsNotDone) {
+  const DaemonPeer daemon;
   EXPECT_EQ(EndOfRun(StubPlan().WriteFile(kProfiles, "[thumb_s\n")),
             "velathumb-queue: took 2 entries\n"
             "velathumb-queue: cannot parse the profile /tmp/profiles.conf\n");
   EXPECT_THAT(velathumb_.Entries(), ElementsAre("/tmp/a"));
 }
 
-TEST_F(ConfigurationTest, ARunnerThatFollowsTheQueueEndsAsWell) {
+TEST_F(CommandCheckTest, ARunnerThatFollowsTheQueueEndsAsWell) {
   EndOfRun(StubPlan().Remove(kProfiles), {"--follow"});
 }
 
-TEST_F(ConfigurationTest, TheFaultIsLoggedOnceForAllJobs) {
+TEST_F(CommandCheckTest, TheFaultIsLoggedOnceForAllJobs) {
   velathumb_.Stub().PlanWhen("/tmp/b", StubPlan().WaitForFile("/tmp/go"));
   const std::string messages =
       EndOfRun(StubPlan().Remove(kProfiles).CreateFile("/tmp/go"), {"--jobs", "2"});
   EXPECT_EQ(messages.find("cannot read"), messages.rfind("cannot read"));
 }
 
-TEST_F(ConfigurationTest, AnEntryIsRepeatedOnceWhenTheProfileHasChangedMeanwhile) {
+TEST_F(CommandCheckTest, AnEntryIsRepeatedOnceWhenTheProfileHasChangedMeanwhile) {
   // Another valid one: in between it may have been empty.
   const std::string profile = ReadFile(kProfiles) + "\n";
   velathumb_.Stub().PlanWhen("/tmp/a", StubPlan().WriteFile(kProfiles, profile + "; changed\n"));
@@ -116,8 +118,8 @@ TEST_F(ConfigurationTest, AnEntryIsRepeatedOnceWhenTheProfileHasChangedMeanwhile
   ExpectRun({"/tmp/a", "/tmp/b", "/tmp/a"});
 }
 
-TEST_F(ConfigurationTest, TheProfileOfTheAdministratorGoesFirst) {
-  const auto choose = [] { return vela::DefaultProfileFile("/tmp/etc.conf", "/tmp/share.conf"); };
+TEST_F(CommandCheckTest, TheProfileOfTheAdministratorGoesFirst) {
+  const auto choose = [] { return vela::ChooseProfileFile("/tmp/etc.conf", "/tmp/share.conf"); };
   EXPECT_EQ(choose(), "/tmp/share.conf");
   WriteFile("/tmp/etc.conf", "");
   EXPECT_EQ(choose(), "/tmp/etc.conf");

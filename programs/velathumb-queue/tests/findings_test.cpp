@@ -1,0 +1,32 @@
+// Mistakes in the configuration files are logged at the start.
+#include "queue_fixture.h"
+#include "support/profile_file.h"
+
+namespace vela_test {
+namespace {
+
+using namespace ::testing;
+
+using Findings = QueueTest;
+
+constexpr const char* kSettings = "/etc/velainfo.conf";
+constexpr const char* kRightSettings = "photo_thumb_size_map=\"1\"\n";
+
+TEST_F(Findings, AreLoggedAtTheStart) {
+  WriteFile(kSettings, std::string(kRightSettings) + "stall_timeout=soon\n");
+  WriteFile(kProfiles, ReadFile(kProfiles) + "qualty=90\nunsharp=foo\n");
+  EXPECT_THAT(RunRunner().err,
+              StartsWith("velathumb-queue: /etc/velainfo.conf:2: warning: stall_timeout is not a "
+                         "number of seconds, or 0 for no limit: \"soon\"; 900 is used\n"
+                         "velathumb-queue: /tmp/profiles.conf:6: warning: there is no key "
+                         "\"qualty\"; did you mean quality?\n"
+                         "velathumb-queue: /tmp/profiles.conf:7: error: unsharp is not "));
+}
+
+TEST_F(Findings, AreMissingWithoutAMistake) {
+  WriteFile(kSettings, kRightSettings);
+  EXPECT_THAT(RunRunner().err, Not(HasSubstr(".conf")));
+}
+
+}  // namespace
+}  // namespace vela_test

@@ -1,0 +1,11 @@
+// What is known about the plugin daemon before a program asks it.
+#pragma once
+
+namespace vela {
+
+/// Environment variable of a program whose starter has found, and has already logged, that no
+/// daemon listens. The program still sends its requests, in case one has come since, but does not
+/// log each time that nobody listens. Set by the queue runner only.
+inline constexpr char kAbsentDaemonVariable[] = "VELATHUMB_DAEMON_IS_ABSENT";
+
+}  // namespace vela
