@@ -104,7 +104,10 @@ int ProcessQueue(const RunSettings& settings, FileDescriptor lock) {
   if (!lock.IsOpen()) {
     return EndWithoutLock(settings, errno);
   }
-  LogFindings(settings.velathumb.profileFile);
+  if (!LogFindings(settings.velathumb.profileFile)) {
+    WriteLog(LogLevel::kError, "the queue is kept until the errors are corrected");
+    return kMisconfigured;
+  }
   return ToExitStatus(RunQueue(settings));
 }
 

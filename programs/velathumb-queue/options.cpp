@@ -18,7 +18,7 @@ constexpr ProgramText kProgramText = {
     "Exit status: 0 the queue is empty, or the entries were queued for a service, 1 entries are "
     "left for a later run: stopped by a signal,\n"
     "entries that cannot be processed now, or another velathumb-queue is running; 2 error;\n"
-    "78 velathumb cannot be started, or its profile cannot be used."};
+    "78 velathumb cannot be started, or would fail with this profile or these settings."};
 
 void AddOptions(CLI::App& app, RunSettings& settings) {
   app.add_flag("-f,--follow", settings.follow, "keep running and wait for new entries");

@@ -1,5 +1,6 @@
 #include "checks/configuration_check.h"
 
+#include <algorithm>
 #include <cstddef>
 #include <cstring>
 #include <filesystem>
@@ -60,12 +61,14 @@ std::vector<Finding> FindingsForLog(const CheckResult& result) {
   return findings;
 }
 
-void LogFindings(const std::string& path) {
+bool LogFindings(const std::string& path) {
   CheckResult result = CheckSettings();
   result.Add(CheckProfile(path));
   for (const Finding& finding : FindingsForLog(result)) {
     WriteLog(LevelOf(finding.severity), FindingText(finding));
   }
+  const auto isError = [](const Finding& finding) { return finding.severity == Severity::kError; };
+  return std::none_of(result.findings.begin(), result.findings.end(), isError);
 }
 
 }  // namespace vela

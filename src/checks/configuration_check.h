@@ -30,7 +30,7 @@ std::string FindingText(const Finding& finding);
 std::vector<Finding> FindingsForLog(const CheckResult& result);
 
 /// Checks the settings and the profile file `path`, and writes the findings to the log of a
-/// service.
-void LogFindings(const std::string& path);
+/// service. Returns false when one of them is an error: every photo would fail.
+bool LogFindings(const std::string& path);
 
 }  // namespace vela

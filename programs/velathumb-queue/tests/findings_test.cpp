@@ -14,13 +14,26 @@ constexpr const char* kRightSettings = "photo_thumb_size_map=\"1\"\n";
 
 TEST_F(Findings, AreLoggedAtTheStart) {
   WriteFile(kSettings, std::string(kRightSettings) + "stall_timeout=soon\n");
-  WriteFile(kProfiles, ReadFile(kProfiles) + "qualty=90\nunsharp=foo\n");
-  EXPECT_THAT(RunRunner().err,
+  WriteFile(kProfiles, ReadFile(kProfiles) + "qualty=90\n");
+  const ProgramResult result = RunRunner();
+  EXPECT_EQ(result.exitCode, 0);
+  EXPECT_THAT(result.err,
               StartsWith("velathumb-queue: /etc/velainfo.conf:2: warning: stall_timeout is not a "
                          "number of seconds, or 0 for no limit: \"soon\"; 900 is used\n"
                          "velathumb-queue: /tmp/profiles.conf:6: warning: there is no key "
-                         "\"qualty\"; did you mean quality?\n"
-                         "velathumb-queue: /tmp/profiles.conf:7: error: unsharp is not "));
+                         "\"qualty\"; did you mean quality?\n"));
+}
+
+TEST_F(Findings, KeepTheQueueWhenEveryPhotoWouldFail) {
+  WriteFile(kProfiles, ReadFile(kProfiles) + "unsharp=foo\n");
+  Enqueue({"/tmp/a"});
+  const ProgramResult result = RunRunner();
+  EXPECT_EQ(result.exitCode, 78);
+  EXPECT_THAT(result.err,
+              AllOf(StartsWith("velathumb-queue: /tmp/profiles.conf:6: error: unsharp is not "),
+                    EndsWith("\nvelathumb-queue: the queue is kept until the errors are "
+                             "corrected\n")));
+  EXPECT_EQ(ReadFile(kQueueFile), "/tmp/a\n");
 }
 
 TEST_F(Findings, AreMissingWithoutAMistake) {
