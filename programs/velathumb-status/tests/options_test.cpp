@@ -40,7 +40,7 @@ TEST_F(CommandLine, InvalidArgumentsAreReportedOnStandardError) {
     std::string message;
   } cases[] = {
       {{},
-       "give a directory, --queue, --progress, --watch, --resume-time, --security or "
+       "give a directory, --failed, --queue, --progress, --watch, --resume-time, --security or "
        "--check-config"},
       {{"--json"}, "give a directory"},
       {{"--unknown", kTop}, "--unknown"},
