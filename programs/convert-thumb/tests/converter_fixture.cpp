@@ -88,11 +88,15 @@ std::string ExactSize(int width, int height) {
   return SizeText(width, height) + "!";
 }
 
-/// "-thumbnail" of ImageMagick 6 in other words; it leaves an opaque alpha channel behind.
+/// "-thumbnail" of ImageMagick 6 in other words; it leaves an opaque alpha channel behind, unless
+/// there is nothing to scale.
 std::vector<std::string> ScalingTo(const PixelCounts& to, const PixelCounts& from) {
   constexpr double kMuchSmaller = 0.1;
   constexpr int kGrid = 5;
   constexpr int kLeastSide = 26;
+  if (to.width == from.width && to.height == from.height) {
+    return {};
+  }
   const double area = static_cast<double>(to.width) * to.height / from.width / from.height;
   std::vector<std::string> words;
   if (area <= kMuchSmaller && to.width >= kLeastSide && to.height >= kLeastSide) {

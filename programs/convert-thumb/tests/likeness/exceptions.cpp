@@ -31,6 +31,9 @@ constexpr char kObservedOrientation[] =
 constexpr char kHolesAtEdges[] =
     "where a GIF is transparent, ImageMagick 7 leaves a pattern of holes at the edges";
 
+constexpr char kIgnoredTransparency[] =
+    "ImageMagick 7 reads the transparency of a HEIC; version 6 and the converter do not";
+
 constexpr char kLostProfile[] =
     "ImageMagick loses this photo's colour profile, without which its colours look faded";
 
@@ -41,6 +44,7 @@ constexpr std::array kEntries = {
     Entry{"WebP", "orientation 6", "", LikenessException::kUpright, kIgnoredOrientation, 6},
     Entry{"PNG", "orientation 6", "", LikenessException::kUpright, kObservedOrientation, 7},
     Entry{"GIF", "transparent parts", "", LikenessException::kOtherPicture, kHolesAtEdges, 7},
+    Entry{"HEIF", "HEIC, alpha", "", LikenessException::kOtherPicture, kIgnoredTransparency, 7},
     Entry{"Damaged", "PNG without its end chunk", "", LikenessException::kSucceeds, kWholePicture},
     Entry{"Camera", "phone_12mp.heic", "", LikenessException::kSurroundings, kLostProfile},
 };
