@@ -101,7 +101,8 @@ TEST_F(Companions, StatusPageIsNotWrittenThroughALink) {
       RunProgram(BuiltPath(VELATHUMB_STATUS_FILE), {"--html", page, InPhotos("d")}, options);
   EXPECT_FALSE(piped.timedOut);
   // An ordinary page is written as always.
-  RunProgram(BuiltPath(VELATHUMB_STATUS_FILE), {"--html", "/tmp/page.html", InPhotos("d")}, options);
+  RunProgram(BuiltPath(VELATHUMB_STATUS_FILE), {"--html", "/tmp/page.html", InPhotos("d")},
+             options);
   EXPECT_GT(FileSize("/tmp/page.html"), 0);
 }
 

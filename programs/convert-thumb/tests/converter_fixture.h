@@ -29,8 +29,8 @@ constexpr const char* kImageMagick = vela::kImageMagickProgram;
 std::vector<std::string> ReferenceArguments(const CommandLine& line);
 
 /// Runs ImageMagick with those arguments. Where the converter has left the work to ImageMagick,
-/// which shows in its first output, runs it with the line itself.
-ProgramResult RunReference(const CommandLine& line, const std::string& firstOutputOfConverter);
+/// which shows in its last output, runs it with the line itself.
+ProgramResult RunReference(const CommandLine& line, const std::string& lastOutputOfConverter);
 
 /// Starts a program with these signals at their default (SIG_DFL) or ignored (SIG_IGN), regardless
 /// of the test's own.

@@ -48,7 +48,7 @@ class Likeness : public ConverterTest, public ::testing::WithParamInterface<Like
     const CommandLine line = LineWithOutputsIn(runs.ourDirectory, path, vector);
     const ProgramResult ours = RunProgram(ConvertThumbPath(), line.Arguments());
     const ProgramResult theirs = RunReference(LineWithOutputsIn(runs.theirDirectory, path, vector),
-                                              line.outputs.front().path);
+                                              line.outputs.back().path);
     runs.ourExit = ours.exitCode;
     runs.theirExit = theirs.exitCode;
     runs.messages = "ours: " + ours.err + "\ntheirs: " + theirs.err;
