@@ -1,6 +1,8 @@
 // The step of the recursive walk, and the checks before a directory is processed.
 #include "thumb/directory_walk.h"
 
+#include <ftw.h>
+
 #include "thumb/thumb_test.h"
 
 using namespace vela;
