@@ -98,9 +98,9 @@ std::vector<std::string> ScalingTo(const PixelCounts& to, const PixelCounts& fro
   if (area <= kMuchSmaller && to.width >= kLeastSide && to.height >= kLeastSide) {
     words = {"-sample", ExactSize(kGrid * to.width, kGrid * to.height)};
   }
-  for (const std::string& word :
-       {std::string("-resize"), ExactSize(to.width, to.height), std::string("-alpha"),
-        std::string("set"), std::string("+profile"), std::string("!icc,!icm,*")}) {
+  for (const std::string& word : {std::string("-resize"), ExactSize(to.width, to.height),
+                                  std::string("-alpha"), std::string("set"), std::string("+repage"),
+                                  std::string("+profile"), std::string("!icc,!icm,*")}) {
     words.push_back(word);
   }
   return words;
