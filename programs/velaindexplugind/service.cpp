@@ -141,7 +141,7 @@ std::string Service::OpenSocket() {
 
 void LogFaultsOfSettings(const char* event) {
   for (const Finding& finding : FindingsForLog(CheckSettings())) {
-    LogLine line(LogLevel::kWarning, event);
+    LogLine line(LevelOf(finding.severity), event);
     line.Add("file", finding.file);
     if (finding.line != 0) {
       line.Add("line", finding.line);

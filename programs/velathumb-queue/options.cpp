@@ -18,7 +18,8 @@ constexpr ProgramText kProgramText = {
     "Exit status: 0 the queue is empty, or the entries were queued for a service, 1 entries are "
     "left for a later run: stopped by a signal,\n"
     "entries that cannot be processed now, or another velathumb-queue is running; 2 error;\n"
-    "78 velathumb cannot be started, or would fail with this profile or these settings."};
+    "78 velathumb cannot be started, or would make nothing, or nothing right, with this profile or "
+    "these settings."};
 
 void AddOptions(CLI::App& app, RunSettings& settings) {
   app.add_flag("-f,--follow", settings.follow, "keep running and wait for new entries");

@@ -6,7 +6,10 @@ _velathumb_status() {
     --progress --resume-time --security --check-config --watch --json --help --version'
   compopt -o filenames 2>/dev/null
   # Bash treats the equals sign as a separate word.
-  if [[ $previous == @(--html|--check-config) || ($previous == '=' && ${COMP_WORDS[COMP_CWORD - 2]} == --html) ]]; then
+  if [[ $previous == '=' ]]; then
+    previous=${COMP_WORDS[COMP_CWORD - 2]}
+  fi
+  if [[ $previous == @(--html|--check-config) ]]; then
     mapfile -t COMPREPLY < <(compgen -f -- "$current")
   elif [[ $current == -* ]]; then
     compopt +o filenames 2>/dev/null

@@ -7,7 +7,6 @@
 #include <system_error>
 
 #include "platform/velaindex.h"
-#include "posix/service_log.h"
 
 namespace vela {
 
@@ -16,8 +15,8 @@ namespace {
 constexpr char kAdministratorsProfile[] = "/etc/velathumb/thumb-profiles.conf";
 constexpr char kInstalledProfile[] = "share/velathumb/thumb-profiles.conf";
 
-LogLevel LevelOf(Severity severity) {
-  return severity == Severity::kError ? LogLevel::kError : LogLevel::kWarning;
+bool IsError(const Finding& finding) {
+  return finding.severity == Severity::kError;
 }
 
 }  // namespace
@@ -39,6 +38,10 @@ std::string FindingText(const Finding& finding) {
   return place + ": " + SeverityName(finding.severity) + ": " + finding.message;
 }
 
+LogLevel LevelOf(Severity severity) {
+  return severity == Severity::kError ? LogLevel::kError : LogLevel::kWarning;
+}
+
 std::vector<Finding> FindingsForLog(const CheckResult& result) {
   constexpr size_t kMostFindings = 20;
   std::vector<Finding> findings;
@@ -46,14 +49,11 @@ std::vector<Finding> FindingsForLog(const CheckResult& result) {
     findings.push_back({unchecked.file, 0, Severity::kWarning,
                         std::string("cannot be checked: ") + std::strerror(unchecked.error)});
   }
-  for (const Finding& finding : result.findings) {
-    findings.push_back(finding);
-    if (findings.size() == kMostFindings) {
-      break;
-    }
-  }
-  const size_t others = result.unchecked.size() + result.findings.size() - findings.size();
-  if (others > 0) {
+  findings.insert(findings.end(), result.findings.begin(), result.findings.end());
+  std::stable_partition(findings.begin(), findings.end(), IsError);
+  if (findings.size() > kMostFindings) {
+    const size_t others = findings.size() - kMostFindings;
+    findings.resize(kMostFindings);
     findings.push_back(
         {findings.back().file, 0, Severity::kWarning,
          std::to_string(others) + " more findings; velathumb-status --check-config lists all"});
@@ -67,8 +67,7 @@ bool LogFindings(const std::string& path) {
   for (const Finding& finding : FindingsForLog(result)) {
     WriteLog(LevelOf(finding.severity), FindingText(finding));
   }
-  const auto isError = [](const Finding& finding) { return finding.severity == Severity::kError; };
-  return std::none_of(result.findings.begin(), result.findings.end(), isError);
+  return std::none_of(result.findings.begin(), result.findings.end(), IsError);
 }
 
 }  // namespace vela

@@ -5,6 +5,7 @@
 #include <vector>
 
 #include "checks/finding.h"
+#include "posix/service_log.h"
 
 namespace vela {
 
@@ -25,12 +26,16 @@ std::string DefaultProfileFile();
 /// Returns the finding as a line of text without its newline: "FILE:LINE: SEVERITY: MESSAGE".
 std::string FindingText(const Finding& finding);
 
-/// Returns the findings as a service logs them when it starts: files that could not be checked are
-/// among them, and instead of very many only their number.
+/// Returns the level at which a service logs a finding.
+LogLevel LevelOf(Severity severity);
+
+/// Returns the findings as a service logs them when it starts: errors first, files that could not
+/// be checked among the warnings, and instead of very many only their number.
 std::vector<Finding> FindingsForLog(const CheckResult& result);
 
 /// Checks the settings and the profile file `path`, and writes the findings to the log of a
-/// service. Returns false when one of them is an error: every photo would fail.
+/// service. Returns false when one of them is an error: velathumb would make nothing, or nothing
+/// right.
 bool LogFindings(const std::string& path);
 
 }  // namespace vela

@@ -10,12 +10,29 @@ namespace vela {
 
 namespace {
 
-constexpr size_t kMostFindings = 1000;
+constexpr size_t kMostFindings = 1000;  // of each severity
 constexpr size_t kLongestQuotation = 80;
 
 /// The order of lines, the file as a whole last.
 bool IsBefore(const Finding& a, const Finding& b) {
   return a.line != 0 && (b.line == 0 || a.line < b.line);
+}
+
+bool IsContinuation(char byte) {
+  return (static_cast<unsigned char>(byte) & 0xc0) == 0x80;
+}
+
+/// Returns the beginning of the bytes that is quoted; a UTF-8 character is not cut in the middle.
+std::string_view CutBetweenCharacters(std::string_view bytes) {
+  constexpr size_t kLongestCharacter = 4;
+  if (bytes.size() <= kLongestQuotation) {
+    return bytes;
+  }
+  size_t end = kLongestQuotation;
+  while (end > kLongestQuotation - kLongestCharacter && IsContinuation(bytes[end])) {
+    --end;
+  }
+  return bytes.substr(0, end);
 }
 
 }  // namespace
@@ -30,7 +47,9 @@ void CheckResult::Add(CheckResult other) {
 }
 
 void FindingList::Add(int64_t line, Severity severity, std::string message) {
-  if (findings_.size() < kMostFindings) {
+  size_t& count = severity == Severity::kError ? errors_ : warnings_;
+  if (count < kMostFindings) {
+    ++count;
     findings_.push_back({file_, line, severity, std::move(message)});
   } else {
     isFull_ = true;
@@ -43,14 +62,15 @@ std::vector<Finding> FindingList::Take() {
     findings_.push_back({file_, 0, Severity::kWarning, "further findings are not listed"});
     isFull_ = false;
   }
+  warnings_ = 0;
+  errors_ = 0;
   return std::exchange(findings_, {});
 }
 
 std::string Quoted(std::string_view bytes) {
-  const bool isCut = bytes.size() > kLongestQuotation;
-  const std::string text =
-      EscapeControls(bytes.substr(0, kLongestQuotation), InvalidBytes::kEscape);
-  return '"' + text + (isCut ? "...\"" : "\"");
+  const std::string_view shown = CutBetweenCharacters(bytes);
+  const std::string text = EscapeControls(shown, InvalidBytes::kEscape);
+  return '"' + text + (shown.size() < bytes.size() ? "...\"" : "\"");
 }
 
 }  // namespace vela

@@ -1,6 +1,7 @@
 // What is wrong in a configuration file.
 #pragma once
 
+#include <cstddef>
 #include <cstdint>
 #include <string>
 #include <string_view>
@@ -40,7 +41,7 @@ struct CheckResult {
 };
 
 /// Collects the findings of one file. A file with nothing right in it does not fill the memory:
-/// after many findings the others are dropped, and the last one says so.
+/// after many findings of one severity the others of it are dropped, and the last one says so.
 class FindingList {
  public:
   explicit FindingList(std::string file) : file_(std::move(file)) {}
@@ -56,6 +57,8 @@ class FindingList {
  private:
   std::string file_;
   std::vector<Finding> findings_;
+  size_t warnings_ = 0;  // in the list
+  size_t errors_ = 0;
   bool isFull_ = false;
 };
 

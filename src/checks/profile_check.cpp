@@ -42,24 +42,16 @@ std::vector<std::string_view> KindNames() {
   return names;
 }
 
-std::string KindList() {
-  std::string list;
-  for (const std::string_view name : KindNames()) {
-    list += (list.empty() ? "" : ", ") + std::string(name);
-  }
-  return list;
-}
-
 const char* ModeText(const ThumbSizeTraits& kind) {
   return kind.fillsArea ? " fills its box" : " fits into its box";
 }
 
-/// Returns false for a text that ImageMagick rejects as well: without a digit, or with a character
-/// that no such text has. Otherwise ImageMagick decides.
+/// Returns false for a text that ImageMagick rejects as well, as it has a character that none of
+/// its geometries has. Otherwise ImageMagick decides; it accepts much, even a single "x". The last
+/// character is the multiplication sign of Latin-1.
 bool MayBeUnsharpMask(std::string_view text) {
-  return text.find_first_of("0123456789") != std::string_view::npos &&
-         text.find_first_not_of("0123456789.xX+-,%!^<>@ ") == std::string_view::npos &&
-         text.find('@') != 0;
+  constexpr std::string_view kGeometryCharacters = "0123456789.xX+-,%!^<>@()/:eE \t\v\f\r\xd7";
+  return text.find_first_not_of(kGeometryCharacters) == std::string_view::npos;
 }
 
 class ProfileCheck {
@@ -104,7 +96,7 @@ const ThumbSizeTraits* ProfileCheck::CheckKind(const ProfileSection& section) {
   if (kind == nullptr) {
     findings_.Warn(name->line, "the section " + Quoted(section.name) +
                                    " is ignored: " + Quoted(name->text) + " is none of " +
-                                   KindList() + SuggestName(name->text, KindNames()));
+                                   NameList(KindNames()) + SuggestName(name->text, KindNames()));
   }
   return kind;
 }
@@ -221,10 +213,11 @@ void ProfileCheck::CheckModes(int phase) {
     }
     first = first == nullptr ? &thumb : first;
     if (thumb.kind->fillsArea != first->kind->fillsArea) {
-      findings_.Warn(thumb.section->line,
-                     std::string(thumb.kind->shortName) + ModeText(*thumb.kind) + ", but " +
-                         first->kind->shortName + " (" + first->Place() + ") in the same phase" +
-                         ModeText(*first->kind) + ": their modes get exchanged");
+      findings_.Warn(thumb.section->line, std::string(thumb.kind->shortName) +
+                                              ModeText(*thumb.kind) + ", but " +
+                                              first->kind->shortName + " (" + first->Place() +
+                                              ") in the same phase" + ModeText(*first->kind) +
+                                              ": their modes are applied in the opposite order");
       return;
     }
   }

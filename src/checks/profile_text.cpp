@@ -20,6 +20,12 @@ bool IsThumbSection(std::string_view name) {
   return name.substr(0, kThumbSectionPrefix.size()) == kThumbSectionPrefix;
 }
 
+/// Returns what a message about the unknown key ends with.
+std::string KeySuggestion(std::string_view key) {
+  const std::string suggestion = SuggestName(key, kKeys);
+  return suggestion.empty() ? "; the keys are " + NameList(kKeys) : suggestion;
+}
+
 std::string DescribeInvalidLine(std::string_view line) {
   if (line.find('\0') != std::string_view::npos) {
     return "the line contains a zero byte";
@@ -102,7 +108,7 @@ void ProfileReader::ReadPair(const SectionLine& line, int64_t number) {
     return;
   }
   if (std::find(kKeys.begin(), kKeys.end(), line.name) == kKeys.end()) {
-    findings_.Warn(number, "there is no key " + Quoted(line.name) + SuggestName(line.name, kKeys));
+    findings_.Warn(number, "there is no key " + Quoted(line.name) + KeySuggestion(line.name));
     return;
   }
   auto& values = profile_.sections[current_].values;

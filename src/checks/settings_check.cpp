@@ -18,13 +18,15 @@ namespace vela {
 
 namespace {
 
+/// Returns what a message about the unknown key ends with.
 std::string Suggestion(std::string_view key) {
   std::vector<std::string_view> keys;
   keys.reserve(kSettings.size());
   for (const Setting& setting : kSettings) {
     keys.emplace_back(setting.key);
   }
-  return SuggestName(key, keys);
+  const std::string suggestion = SuggestName(key, keys);
+  return suggestion.empty() ? "; see velainfo.conf(5)" : suggestion;
 }
 
 /// Returns what applies instead of an invalid value.

@@ -58,6 +58,14 @@ std::string_view FindSimilarName(std::string_view given,
   return similar;
 }
 
+std::string NameList(const std::vector<std::string_view>& names) {
+  std::string list;
+  for (const std::string_view name : names) {
+    list += (list.empty() ? "" : ", ") + std::string(name);
+  }
+  return list;
+}
+
 std::string SuggestName(std::string_view given, const std::vector<std::string_view>& names) {
   const std::string_view similar = FindSimilarName(given, names);
   return similar.empty() ? std::string() : "; did you mean " + std::string(similar) + '?';

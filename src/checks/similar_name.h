@@ -12,6 +12,9 @@ namespace vela {
 std::string_view FindSimilarName(std::string_view given,
                                  const std::vector<std::string_view>& names);
 
+/// Returns the names with ", " between them.
+std::string NameList(const std::vector<std::string_view>& names);
+
 /// Returns "; did you mean NAME?", empty when no name is similar.
 std::string SuggestName(std::string_view given, const std::vector<std::string_view>& names);
 

@@ -1,4 +1,5 @@
-// The text of key/value files: one `key="value"` per line. The first line with a key counts.
+// The text of key/value files: one `key="value"` per line. Of a key given twice, the first line
+// counts.
 #pragma once
 
 #include <optional>
@@ -7,8 +8,7 @@
 
 namespace vela {
 
-// The text of key/value files: one `key="value"` per line. Of a key given twice, the first line
-// counts.
+/// A line of such a file. The parts refer to its text.
 struct KeyValueLine {
   enum class Kind {
     kBlank,    ///< blank, or a comment
@@ -20,33 +20,27 @@ struct KeyValueLine {
   std::string_view written = {};  ///< the value with its quotes and escapes
 };
 
-// The text of key/value files: one `key="value"` per line. Of a key given twice, the first line
-// counts.
+/// Parses a line without its newline.
 KeyValueLine ParseKeyValueLine(std::string_view line);
 
-// The text of key/value files: one `key="value"` per line. Of a key given twice, the first line
-// counts.
+/// A value without quotes and escapes.
 struct DecodedValue {
   std::string text;
   bool lacksClosingQuote = false;  ///< the opening quote then is a part of the value
   std::string_view rest = {};      ///< what follows the closing quote, without white space
 };
 
-// The text of key/value files: one `key="value"` per line. Of a key given twice, the first line
-// counts.
+/// Decodes a value as it is written in its line.
 DecodedValue DecodeValue(std::string_view written);
 
-// The text of key/value files: one `key="value"` per line. Of a key given twice, the first line
-// counts.
+/// Returns the value in the first line of `text` that has `key`.
 std::optional<std::string> FindValue(std::string_view text, std::string_view key);
 
-// The text of key/value files: one `key="value"` per line. Of a key given twice, the first line
-// counts. The text of key/value files: one `key="value"` per line. Of a key given twice, the first
-// line counts.
+/// Returns `text` with the first line that has `key` replaced, or with a line appended; all other
+/// lines stay byte for byte. IsStorable must accept the pair.
 std::string WithValue(std::string_view text, std::string_view key, std::string_view value);
 
-// The text of key/value files: one `key="value"` per line. Of a key given twice, the first line
-// counts.
+/// Returns whether the pair can be written as a line that is read back as the same pair.
 bool IsStorable(std::string_view key, std::string_view value);
 
 }  // namespace vela

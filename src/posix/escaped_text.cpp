@@ -63,11 +63,15 @@ bool IsHighControl(unsigned char byte) {
   return byte >= 0x80 && byte < 0xa0;
 }
 
-/// Returns whether a character of three bytes separates lines or changes the direction of the text.
+/// Returns whether a character of three bytes is invisible: it separates lines, changes the
+/// direction of the text, has no width or is a byte order mark.
 bool IsInvisibleFormat(std::string_view character) {
   const std::string_view end = character.substr(1);
+  if (character == "\xef\xbb\xbf") {
+    return true;
+  }
   return character.front() == '\xe2' &&
-         (end == "\x80\x8e" || end == "\x80\x8f" || (end >= "\x80\xa8" && end <= "\x80\xae") ||
+         ((end >= "\x80\x8b" && end <= "\x80\x8f") || (end >= "\x80\xa8" && end <= "\x80\xae") ||
           (end >= "\x81\xa6" && end <= "\x81\xa9"));
 }
 

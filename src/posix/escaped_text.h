@@ -12,7 +12,8 @@ enum class InvalidBytes { kKeep, kEscape };
 
 /// Returns the text with its control characters escaped: `\n` for a newline, `\x1b` and the like
 /// for the others, including the characters from U+0080 to U+009F, line and paragraph separators,
-/// and marks that change the direction of text. Backslashes are kept.
+/// marks that change the direction of text, and characters without a width, such as a byte order
+/// mark. Backslashes are kept.
 std::string EscapeControls(std::string_view text, InvalidBytes invalidBytes);
 
 }  // namespace vela

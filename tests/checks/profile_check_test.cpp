@@ -7,6 +7,8 @@
 #include "check_fixture.h"
 #include "support/build_paths.h"
 #include "support/privileges.h"
+#include "support/program.h"
+#include "support/stub_tool.h"
 
 using namespace vela;
 
@@ -71,7 +73,7 @@ const FindingsCase kCases[] = {
     {"Phase",
      Reference() + Section("S", 120, 7),
      {"5: warning: S fits into its box, but XL (\"thumb_XL\" in line 1) in the same phase fills "
-      "its box: their modes get exchanged",
+      "its box: their modes are applied in the opposite order",
       "8: warning: phase is not 0, 1 or 2: \"7\"; 0 is used"}},
     {"NegativePhase",
      Section("XL", 1280, -1),
@@ -79,7 +81,8 @@ const FindingsCase kCases[] = {
     {"MisspelledKey",
      Reference("qualty = 90\nflavour = x\n"),
      {"5: warning: there is no key \"qualty\"; did you mean quality?",
-      "6: warning: there is no key \"flavour\""}},
+      "6: warning: there is no key \"flavour\"; the keys are filename, size, quality, unsharp, "
+      "phase"}},
     {"UnsharpThatFailsEveryPhoto",
      Reference("unsharp = foo\n"),
      {"5: error: unsharp is not RADIUSxSIGMA+AMOUNT+THRESHOLD, such as 0x0.8+0.5+0.01: \"foo\"; "
@@ -106,7 +109,11 @@ const FindingsCase kCases[] = {
     {"ModesMixed",
      Reference() + Section("B", 640, 1) + Section("S", 120, 1) + Section("M", 320, 1),
      {"13: warning: M fills its box, but B (\"thumb_B\" in line 5) in the same phase fits into its "
-      "box: their modes get exchanged"}},
+      "box: their modes are applied in the opposite order"}},
+    {"ModesThatAreTheSameInBothOrders",
+     Reference() + Section("S", 120, 1) + Section("M", 320, 1) + Section("B", 640, 1),
+     {"9: warning: M fills its box, but S (\"thumb_S\" in line 5) in the same phase fits into its "
+      "box: their modes are applied in the opposite order"}},
     {"NoPhase0",
      Section("S", 120, 1),
      {" error: no thumbnail is made in phase 0; those of phases 1 and 2 are made from the largest "
@@ -163,12 +170,47 @@ const FindingsCase kCases[] = {
     {"HostileBytes",
      Reference("\x1b]0;x\x07 = \xff\n") + "[\x9b"
                                           "2J]\n",
-     {"5: warning: there is no key \"\\x1b]0;x\\x07\"",
+     {"5: warning: there is no key \"\\x1b]0;x\\x07\"; the keys are filename, size, quality, "
+      "unsharp, phase",
       "6: warning: the section \"\\x9b2J\" is ignored: the name of a thumbnail's section begins "
       "with \"thumb\""}},
 };
 
 INSTANTIATE_TEST_SUITE_P(Profiles, ProfileFindings, ValuesIn(kCases), CaseName());
+
+/// Returns whether ImageMagick makes a picture with the text as its unsharp mask.
+bool DoesImageMagickSharpen(const std::string& text) {
+  const std::string output = "/tmp/sharp.jpg";
+  RemoveTree(output);
+  const ProgramResult result =
+      RunProgram(kImageMagickPath, {"xc:red", "-unsharp", text, output}, ProgramOptions());
+  return result.exitCode == 0 && FileSize(output) > 0;
+}
+
+TEST_F(ProfileCheckTest, AnUnsharpMaskIsNoErrorWhenImageMagickAcceptsIt) {
+  for (const char* text :
+       {"1e0x1",  "(0x0.8)", "0x0.8\t+0.5", "0x0.8 +0.5", "x",         "X",        "-",
+        ".",      "0/2x1",   "0:1",         "@5",         "%5",        "0x0.8!",   "0x0.8^",
+        "0x0.8<", "0x0.8>",  "0x0.8,1",     "0x1E0",      "0\v\f\rx1", "0\xd7\x31"}) {
+    ASSERT_TRUE(DoesImageMagickSharpen(text)) << text;
+    EXPECT_THAT(Check(Reference(std::string("unsharp = ") + text + "\n")),
+                ElementsAre(AllOf(StartsWith("5: warning: unsharp is not "),
+                                  EndsWith("; the converter leaves the photos to ImageMagick"))))
+        << text;
+  }
+}
+
+TEST_F(ProfileCheckTest, AnUnsharpMaskIsAnErrorWhenImageMagickRejectsIt) {
+  for (const char* text :
+       {"foo", "0x0.8+0.5+0.01 ; soft", "1~", "0x0.8 # soft", "0xA", "\"0x0.8\"", "0x1p3", "inf",
+        "0x0.8+nan", "0x0.8_", "0*0.8", "0=0.8", "0x0.8|", "[0x0.8]", "0\xc3\x97\x30.8"}) {
+    ASSERT_FALSE(DoesImageMagickSharpen(text)) << text;
+    EXPECT_THAT(Check(Reference(std::string("unsharp = ") + text + "\n")),
+                ElementsAre(AllOf(StartsWith("5: error: unsharp is not "),
+                                  EndsWith("; every photo fails"))))
+        << text;
+  }
+}
 
 TEST_F(ProfileCheckTest, TheSampleProfileIsRight) {
   EXPECT_THAT(Check(ReadFile(SourceDirectory() + "/config/thumb-profiles.conf")), IsEmpty());
@@ -216,6 +258,36 @@ TEST_F(ProfileCheckTest, ManySectionsTakeNoLongerThanTheirNumber) {
   const auto start = std::chrono::steady_clock::now();
   EXPECT_THAT(Check(text), SizeIs(1001));
   EXPECT_LT(std::chrono::steady_clock::now() - start, std::chrono::seconds(20));
+}
+
+TEST_F(ProfileCheckTest, AnErrorAfterManyWarningsIsReported) {
+  std::string text = Reference();
+  for (int i = 0; i < 1500; ++i) {
+    text += "odd = 1\n";
+  }
+  const std::vector<std::string> lines = Check(text + "unsharp = foo\n");
+  ASSERT_THAT(lines, SizeIs(1002));
+  EXPECT_THAT(lines[1000], StartsWith("1505: error: unsharp is not "));
+  EXPECT_EQ(lines[1001], " warning: further findings are not listed");
+  EXPECT_FALSE(LogFindings(kProfile));
+}
+
+TEST_F(ProfileCheckTest, TheLogHasErrorsBeforeWarningsOfOtherFiles) {
+  std::string settings;
+  for (int i = 0; i < 30; ++i) {
+    settings += "foreign_key_" + std::to_string(i) + "=1\n";
+  }
+  WriteFile(kSettings, settings);
+  WriteFile(kProfile, Reference("odd = 1\nunsharp = foo\n"));
+  CheckResult result = CheckSettings();
+  result.Add(CheckProfile(kProfile));
+  result.unchecked.push_back({"/tmp/other", EACCES});
+  const std::vector<Finding> log = FindingsForLog(result);
+  ASSERT_THAT(log, SizeIs(21));
+  EXPECT_THAT(FindingText(log[0]), StartsWith("/tmp/profiles.conf:6: error: unsharp is not "));
+  EXPECT_EQ(FindingText(log[1]), "/tmp/other: warning: cannot be checked: Permission denied");
+  EXPECT_THAT(FindingText(log[2]), StartsWith("/etc/velainfo.conf:1: warning: "));
+  EXPECT_EQ(log[20].message, "13 more findings; velathumb-status --check-config lists all");
 }
 
 TEST_F(ProfileCheckTest, AFifoIsNotWaitedFor) {

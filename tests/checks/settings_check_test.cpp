@@ -31,6 +31,14 @@ TEST_P(SettingsFindings, AreReportedWithTheirLine) {
   EXPECT_THAT(Check(GetParam().text), ElementsAreArray(GetParam().findings));
 }
 
+std::string Repeated(const std::string& text, int times) {
+  std::string result;
+  for (int i = 0; i < times; ++i) {
+    result += text;
+  }
+  return result;
+}
+
 const FindingsCase kCases[] = {
     {"EverythingRight",
      "# comment\n\n photo_thumb_size_map = \"17\"\nvideo_thumb_size_map=63\ntool_timeout=\"0\"\n"
@@ -62,7 +70,7 @@ const FindingsCase kCases[] = {
     {"UnknownKey",
      "tool_timout=\"5\"\nflavour=\"x\"\n",
      {"1: warning: there is no setting \"tool_timout\"; did you mean tool_timeout?",
-      "2: warning: there is no setting \"flavour\""}},
+      "2: warning: there is no setting \"flavour\"; see velainfo.conf(5)"}},
     {"KeyOfOtherSoftware",
      "thumb_conv_paused=\"yes\"\n",
      {"1: warning: thumb_conv_paused has no effect here; thumb_conv_resume_time pauses the "
@@ -87,12 +95,27 @@ const FindingsCase kCases[] = {
       "600 is used"}},
     {"HostileBytes",
      "\x1b[2J\xff\u202e=\"1\"\ntool_timeout=\"\x07\n",
-     {"1: warning: there is no setting \"\\x1b[2J\\xff\\xe2\\x80\\xae\"",
+     {"1: warning: there is no setting \"\\x1b[2J\\xff\\xe2\\x80\\xae\"; see velainfo.conf(5)",
       "2: warning: tool_timeout is not a number of seconds, or 0 for no limit: \"\"\\x07\", "
       "without a closing quote; 600 is used"}},
     {"LongKey",
      std::string(100, 'k') + "=1",
-     {"1: warning: there is no setting \"" + std::string(80, 'k') + "...\""}},
+     {"1: warning: there is no setting \"" + std::string(80, 'k') + "...\"; see velainfo.conf(5)"}},
+    {"LongKeyOfLargeCharacters",
+     std::string(79, 'k') + "\u20ac" + "k=1",
+     {"1: warning: there is no setting \"" + std::string(79, 'k') + "...\"; see velainfo.conf(5)"}},
+    {"LongKeyThatEndsBetweenCharacters",
+     std::string(77, 'k') + "\u20ac\u20ac" + "=1",
+     {"1: warning: there is no setting \"" + std::string(77, 'k') +
+      "\u20ac...\"; see velainfo.conf(5)"}},
+    {"LongKeyOfContinuationBytes",
+     std::string(100, '\xbf') + "=1",
+     {"1: warning: there is no setting \"" + Repeated("\\xbf", 76) +
+      "...\"; see velainfo.conf(5)"}},
+    {"ByteOrderMark",
+     "\xef\xbb\xbftool_timeout=\"5\"\n",
+     {"1: warning: there is no setting \"\\xef\\xbb\\xbftool_timeout\"; did you mean "
+      "tool_timeout?"}},
 };
 
 INSTANTIATE_TEST_SUITE_P(Settings, SettingsFindings, ValuesIn(kCases), CaseName());

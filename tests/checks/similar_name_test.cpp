@@ -35,4 +35,9 @@ TEST(SimilarName, IsSuggestedInAMessage) {
   EXPECT_EQ(SuggestName("phase", kNames), "");
 }
 
+TEST(SimilarName, NamesAreListedWithCommas) {
+  EXPECT_EQ(NameList(kNames), "size, quality, tool_timeout, stall_timeout");
+  EXPECT_EQ(NameList({}), "");
+}
+
 }  // namespace

@@ -3,6 +3,7 @@
 
 #include <regex>
 
+#include "checks/configuration_check.h"
 #include "configuration/profile_values.h"
 #include "configuration/settings.h"
 #include "storage/thumb_size_class.h"
@@ -49,6 +50,15 @@ std::string DefaultIn(const std::string& page, const std::string& key) {
   return page.substr(begin, page.find_first_of(".,\n", begin) - begin);
 }
 
+std::vector<std::string> FindingTexts(const CheckResult& result) {
+  EXPECT_THAT(result.unchecked, IsEmpty());
+  std::vector<std::string> texts;
+  for (const Finding& finding : result.findings) {
+    texts.push_back(FindingText(finding));
+  }
+  return texts;
+}
+
 std::vector<std::string> SettingKeys() {
   std::vector<std::string> keys;
   for (const Setting& setting : kSettings) {
@@ -63,6 +73,17 @@ TEST_F(Documents, TheManPageHasEverySettingWithItsDefault) {
   for (const Setting& setting : kSettings) {
     EXPECT_EQ(DefaultIn(page, setting.key), DefaultText(setting)) << setting.key;
   }
+}
+
+TEST_F(Documents, TheExampleOfTheManPageWorksWithTheInstalledProfile) {
+  const std::vector<std::string> examples = Matches(
+      Read("docs/velainfo.conf.5"), R"(^\.Bd -literal -offset indent\n((?:[^.].*\n)+)\.Ed$)");
+  ASSERT_THAT(examples, SizeIs(1));
+  EXPECT_THAT(examples[0], HasSubstr("photo_thumb_size_map="));
+  WriteFile("/etc/velainfo.conf", examples[0]);
+  EXPECT_THAT(FindingTexts(CheckSettings()), IsEmpty());
+  EXPECT_THAT(FindingTexts(CheckProfile(SourceDirectory() + "/config/thumb-profiles.conf")),
+              IsEmpty());
 }
 
 TEST_F(Documents, TheReadmeHasEverySetting) {

@@ -41,12 +41,21 @@ TEST_F(IndexVersionTest, MistakesInTheSettingsAreLoggedAtTheStart) {
   WriteFile(kSettings, "tool_timeout=\"60\"\n\x1b[2J=1\nindex_versoin=\"3\"\n");
   IndexDaemon daemon;
   const std::string log = daemon.End(SIGTERM).err;
-  EXPECT_THAT(log, HasSubstr("level=warning event=settings file=/etc/velainfo.conf line=2 "
-                             "problem=\"there is no setting \\\"\\\\x1b[2J\\\"\"\n"));
+  EXPECT_THAT(
+      log, HasSubstr("level=warning event=settings file=/etc/velainfo.conf line=2 "
+                     "problem=\"there is no setting \\\"\\\\x1b[2J\\\"; see velainfo.conf(5)\"\n"));
   EXPECT_THAT(log, HasSubstr("level=warning event=settings file=/etc/velainfo.conf line=3 "
                              "problem=\"there is no setting \\\"index_versoin\\\"; did you mean "
                              "index_version?\"\n"));
   EXPECT_THAT(log, Not(HasSubstr("line=1 ")));
+}
+
+TEST_F(IndexVersionTest, AnErrorInTheSettingsIsLoggedAsOne) {
+  WriteFile(kSettings, "convert_memory_limit=\"512K\"\n");
+  IndexDaemon daemon;
+  EXPECT_THAT(daemon.End(SIGTERM).err,
+              HasSubstr("level=error event=settings file=/etc/velainfo.conf line=1 "
+                        "problem=\"convert_memory_limit is less than 1M: "));
 }
 
 TEST_F(IndexVersionTest, OfTheNearestDirectoryApplies) {

@@ -36,6 +36,28 @@ TEST_F(Findings, KeepTheQueueWhenEveryPhotoWouldFail) {
   EXPECT_EQ(ReadFile(kQueueFile), "/tmp/a\n");
 }
 
+TEST_F(Findings, KeepTheQueueWhenNothingRightWouldBeMade) {
+  WriteFile(kProfiles, ReadFile(kProfiles) + "size=0\n");
+  Enqueue({"/tmp/a"});
+  const ProgramResult result = RunRunner();
+  EXPECT_EQ(result.exitCode, 78);
+  EXPECT_THAT(result.err, HasSubstr("; no thumbnail has the right size\n"));
+  EXPECT_EQ(ReadFile(kQueueFile), "/tmp/a\n");
+}
+
+TEST_F(Findings, StopTheServiceWithTheirErrorInTheLogAfterManyForeignSettings) {
+  std::string settings = kRightSettings;
+  for (int i = 0; i < 30; ++i) {
+    settings += "foreign_key_" + std::to_string(i) + "=1\n";
+  }
+  WriteFile(kSettings, settings);
+  WriteFile(kProfiles, ReadFile(kProfiles) + "unsharp=foo\n");
+  const ProgramResult result = RunRunner();
+  EXPECT_EQ(result.exitCode, 78);
+  EXPECT_THAT(result.err,
+              StartsWith("velathumb-queue: /tmp/profiles.conf:6: error: unsharp is not "));
+}
+
 TEST_F(Findings, AreMissingWithoutAMistake) {
   WriteFile(kSettings, kRightSettings);
   EXPECT_THAT(RunRunner().err, Not(HasSubstr(".conf")));

@@ -38,7 +38,9 @@ TEST_F(OptionsTest, HelpListsEveryOption) {
                 AllOf(HasSubstr("--follow"), HasSubstr("--jobs"), HasSubstr("--profile"),
                       HasSubstr("--velathumb"), HasSubstr("--check-videos"), HasSubstr("--add"),
                       HasSubstr("--version"), HasSubstr("--wait"), HasSubstr("--now"),
-                      HasSubstr("--queue-only"), HasSubstr("Exit status")));
+                      HasSubstr("--queue-only"), HasSubstr("Exit status"),
+                      HasSubstr("78 velathumb cannot be started, or would make nothing, or nothing "
+                                "right, with this profile or these settings.")));
   }
 }
 

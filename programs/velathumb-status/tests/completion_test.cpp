@@ -89,6 +89,7 @@ TEST_F(Completion, ProposesDirectoriesOtherwise) {
 
 TEST_F(Completion, ProposesFilesForTheProfile) {
   EXPECT_THAT(Complete({"--check-config", "pa"}), ElementsAre("page.html"));
+  EXPECT_THAT(Complete({"--check-config", "=", "pa"}), ElementsAre("page.html"));
 }
 
 TEST_F(Completion, ProposesFilesForThePage) {
