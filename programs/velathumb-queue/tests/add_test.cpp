@@ -1,12 +1,14 @@
 // Adding entries: who does the work, and what the user is told.
 #include <fcntl.h>
 #include <grp.h>
+#include <signal.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
 #include <cerrno>
 
 #include "fake_systemd.h"
+#include "posix/file_lock.h"
 #include "queue_fixture.h"
 #include "service_state.h"
 #include "support/named_case.h"
@@ -24,6 +26,7 @@ using std::chrono::seconds;
 constexpr char kService[] = "velathumb-queue.service";
 constexpr char kPath[] = "velathumb-queue.path";
 constexpr char kTimer[] = "velathumb-queue.timer";
+constexpr char kRunnerLock[] = "/var/run/velathumb-queue.lock";
 
 class AddTest : public QueueTest {
  protected:
@@ -78,12 +81,58 @@ TEST_F(AddTest, AnotherRunnerThatIsRunningDoesTheWork) {
   Program runner = StartAndHold({"/tmp/a"});
   const ProgramResult result = velathumb_.Run({"--add", "/tmp/b"});
   EXPECT_EQ(result.exitCode, 0);
-  EXPECT_EQ(result.err,
-            "velathumb-queue: queued /tmp/b\n"
-            "velathumb-queue: the running velathumb-queue does the work\n");
+  EXPECT_EQ(
+      result.err,
+      "velathumb-queue: queued /tmp/b\n"
+      "velathumb-queue: the running velathumb-queue does the work unless it is being stopped; "
+      "then they stay queued\n");
   Release();
   EXPECT_TRUE(runner.Wait());
   EXPECT_THAT(velathumb_.Entries(), ElementsAre("/tmp/a", "/tmp/b"));
+}
+
+TEST_F(AddTest, ARunnerThatHasTakenTheEntriesDoesTheWork) {
+  FileDescriptor lock = TakeProcessLock(kRunnerLock, false);
+  ASSERT_TRUE(lock.IsOpen());
+  Program runner = velathumb_.Start({"--add", "/tmp/a"});
+  ASSERT_TRUE(WaitUntilExists(kQueueFile));
+  ASSERT_EQ(rename(kQueueFile, kTakenFile), 0);
+  const auto result = runner.Wait();
+  ASSERT_TRUE(result);
+  EXPECT_EQ(result->exitCode, 0);
+  EXPECT_EQ(result->err,
+            "velathumb-queue: queued /tmp/a\n"
+            "velathumb-queue: the running velathumb-queue does the work\n");
+}
+
+TEST_F(AddTest, TheWorkOfARunnerThatEndsWithoutTakingItIsDoneHere) {
+  FileDescriptor lock = TakeProcessLock(kRunnerLock, false);
+  ASSERT_TRUE(lock.IsOpen());
+  Program runner = velathumb_.Start({"--add", "/tmp/a"});
+  ASSERT_TRUE(WaitUntilExists(kQueueFile));
+  EXPECT_FALSE(runner.Wait(std::chrono::milliseconds(200)));
+  lock.Reset();
+  ExpectEnd(runner, 0);
+  EXPECT_THAT(velathumb_.Entries(), ElementsAre("/tmp/a"));
+  ExpectQueueDone();
+}
+
+TEST_F(AddTest, TheWorkOfARunnerThatIsBeingStoppedIsDoneHere) {
+  // A velathumb that converts may also take a moment to end.
+  velathumb_.Stub().PlanCall(
+      1, StubPlan().IgnoreSignal(SIGTERM).CreateFile("/tmp/here").WaitForFile("/tmp/go"));
+  Enqueue({"/tmp/b"});
+  Program stopped = velathumb_.Start();
+  ASSERT_TRUE(WaitUntilExists("/tmp/here"));
+  stopped.Kill(SIGTERM);
+  Program runner = velathumb_.Start({"--add", "/tmp/a"});
+  ASSERT_TRUE(WaitUntilExists(kQueueFile));
+  EXPECT_FALSE(runner.Wait(std::chrono::milliseconds(200)));
+  Release();
+  ExpectEnd(stopped, 1);
+  ExpectEnd(runner, 0);
+  EXPECT_THAT(velathumb_.Entries(), ElementsAre("/tmp/b", "/tmp/a"));
+  ExpectQueueDone();
 }
 
 TEST_F(AddTest, NowTellsByItsStatusThatAnotherRunnerHasTheWork) {
@@ -206,6 +255,36 @@ TEST_F(AddTest, ARunnerThatHasTheLockDoesTheWorkOfAServiceThatHasNotBeenStarted)
             "velathumb-queue: queued /tmp/b; the running velathumb-queue does the work\n");
   Release();
   ExpectEnd(runner, 0);
+}
+
+TEST_F(AddTest, AServiceThatIsBeingStoppedDoesNotDoTheWork) {
+  const FakeSystemd systemd({{{kService, "deactivating"}}, {kPath}});
+  const FileDescriptor lock = TakeProcessLock(kRunnerLock, false);
+  ASSERT_TRUE(lock.IsOpen());
+  EXPECT_EQ(LeftToOthers({"--add", "/tmp/a"}),
+            "velathumb-queue: queued /tmp/a; the service is enabled, but has not been started: "
+            "systemctl start velathumb-queue.path velathumb-queue.timer\n");
+}
+
+TEST_F(AddTest, ARunnerThatIsAboutToEndDoesNotDoTheWorkOfAService) {
+  const FakeSystemd systemd({{}, {kPath}});
+  FileDescriptor lock = TakeProcessLock(kRunnerLock, false);
+  ASSERT_TRUE(lock.IsOpen());
+  Program runner = velathumb_.Start({"--add", "/tmp/a"});
+  ASSERT_TRUE(WaitUntilExists(kQueueFile));
+  EXPECT_FALSE(runner.Wait(std::chrono::milliseconds(200)));
+  lock.Reset();
+  ExpectEnd(runner, 0);
+  EXPECT_EQ(runner.Error(),
+            "velathumb-queue: queued /tmp/a; the service is enabled, but has not been started: "
+            "systemctl start velathumb-queue.path velathumb-queue.timer\n");
+}
+
+TEST_F(AddTest, ASystemdThatDoesNotAnswerMayHaveAService) {
+  const Descriptor silent = MakeSilentSystemd();
+  EXPECT_EQ(LeftToOthers({"--add", "/tmp/a"}),
+            "velathumb-queue: queued /tmp/a; but systemd does not answer: unless "
+            "velathumb-queue.service does the work, start velathumb-queue\n");
 }
 
 TEST_F(AddTest, ASystemdThatDoesNotAnswerIsNotWaitedFor) {
