@@ -4,11 +4,13 @@
 
 #include <sysexits.h>
 
+#include <algorithm>
 #include <cerrno>
 #include <chrono>
 #include <string>
 #include <thread>
 #include <utility>
+#include <vector>
 
 #include "additions.h"
 #include "checks/configuration_check.h"
@@ -145,6 +147,15 @@ int EndWithoutLock(const RunSettings& settings, int error) {
   return kError;
 }
 
+/// Waits a second when the profile has errors: it may just be being written.
+void AwaitWriter(const std::string& profileFile) {
+  const std::vector<Finding> findings = CheckProfile(profileFile).findings;
+  if (std::any_of(findings.begin(), findings.end(),
+                  [](const Finding& finding) { return finding.severity == Severity::kError; })) {
+    std::this_thread::sleep_for(std::chrono::seconds(1));
+  }
+}
+
 int ProcessQueue(const RunSettings& settings, FileDescriptor lock) {
   if (!IsCommandUsable(settings.velathumb)) {
     return kMisconfigured;
@@ -155,6 +166,7 @@ int ProcessQueue(const RunSettings& settings, FileDescriptor lock) {
   if (!lock.IsOpen()) {
     return EndWithoutLock(settings, errno);
   }
+  AwaitWriter(settings.velathumb.profileFile);
   if (!LogFindings(settings.velathumb.profileFile)) {
     WriteLog(LogLevel::kError, "the queue is kept until the errors are corrected");
     return kMisconfigured;

@@ -280,8 +280,14 @@ void QueueRun::QueueUnfinished() {
 
 /// Takes the pending entries and processes them. Sets `isIdle` when there are none.
 RunEnd QueueRun::RunRound(bool& isIdle) {
-  if (!IsProfileUsable(settings_.velathumb.profileFile)) {
-    return RunEnd::kMisconfigured;
+  switch (CheckProfileUse(settings_.velathumb.profileFile, [this] { return events_.MustStop(); })) {
+    case ProfileState::kUnusable:
+      return RunEnd::kMisconfigured;
+    case ProfileState::kInterrupted:
+      return RunEnd::kStopped;
+    case ProfileState::kUsable:
+    case ProfileState::kUsableNow:
+      break;
   }
   QueueUnfinished();
   const TakenQueue::Outcome outcome = taken_.Take();
