@@ -1,6 +1,7 @@
 // Adding entries: who does the work, and what the user is told.
 #include <fcntl.h>
 #include <grp.h>
+#include <sched.h>
 #include <signal.h>
 #include <sys/stat.h>
 #include <unistd.h>
@@ -28,6 +29,45 @@ constexpr char kPath[] = "velathumb-queue.path";
 constexpr char kTimer[] = "velathumb-queue.timer";
 constexpr char kRunnerLock[] = "/var/run/velathumb-queue.lock";
 
+int BecomeOtherUser() {
+  return setgroups(0, nullptr) == 0 && setgid(kOwner) == 0 && setuid(kOwner) == 0 ? 0 : errno;
+}
+
+bool WriteText(const char* file, const std::string& text) {
+  const Descriptor out(open(file, O_WRONLY | O_CLOEXEC));
+  return write(out.Get(), text.data(), text.size()) == static_cast<ssize_t>(text.size());
+}
+
+/// For a sandbox with one user: gives that one, who has no privileges then, another number.
+int TakeOtherName() {
+  const std::string map = std::to_string(kOwner) + " 0 1\n";
+  return unshare(CLONE_NEWUSER) == 0 && WriteText("/proc/self/setgroups", "deny") &&
+                 WriteText("/proc/self/gid_map", map) && WriteText("/proc/self/uid_map", map)
+             ? 0
+             : errno;
+}
+
+/// In a sandbox with one user, keeps the owner of a file from changing it as if it were that of
+/// another one, as long as the object exists.
+class ClosedToOwner {
+ public:
+  explicit ClosedToOwner(const char* path) : path_(path) {
+    struct stat status = {};
+    EXPECT_EQ(stat(path, &status), 0) << path;
+    mode_ = status.st_mode & 07777;
+    Set(HasOtherUsers() ? mode_ : S_ISDIR(status.st_mode) ? 0555 : 0);
+  }
+  ~ClosedToOwner() { Set(mode_); }
+  ClosedToOwner(const ClosedToOwner&) = delete;
+  ClosedToOwner& operator=(const ClosedToOwner&) = delete;
+
+ private:
+  void Set(mode_t mode) const { EXPECT_EQ(chmod(path_, mode), 0) << path_; }
+
+  const char* path_;
+  mode_t mode_ = 0;
+};
+
 class AddTest : public QueueTest {
  protected:
   AddTest() { MakeEntryDirectories({"/tmp/a", "/tmp/b"}); }
@@ -49,9 +89,7 @@ class AddTest : public QueueTest {
     CopyFile(QueueProgramPath(), kCopy);
     EXPECT_EQ(chmod(kCopy, 0755), 0);
     ProgramOptions options;
-    options.beforeExec = {[] {
-      return setgroups(0, nullptr) == 0 && setgid(kOwner) == 0 && setuid(kOwner) == 0 ? 0 : errno;
-    }};
+    options.beforeExec = {HasOtherUsers() ? BecomeOtherUser : TakeOtherName};
     return RunProgram(kCopy, velathumb_.Arguments(arguments), options);
   }
 };
@@ -160,9 +198,7 @@ TEST_F(AddTest, NowKeepsAFasterServiceFromTakingTheWork) {
 }
 
 TEST_F(AddTest, AUserWithoutPermissionIsToldWhoMayAddToTheQueue) {
-  if (!HasOtherUsers()) {
-    GTEST_SKIP() << "the sandbox has one user, who may do everything";
-  }
+  const ClosedToOwner spool("/var/spool");
   const ProgramResult result = RunAsOtherUser({"--add", "/tmp/a"});
   EXPECT_EQ(result.exitCode, 2);
   EXPECT_EQ(result.err,
@@ -172,14 +208,12 @@ TEST_F(AddTest, AUserWithoutPermissionIsToldWhoMayAddToTheQueue) {
 }
 
 TEST_F(AddTest, AUserWithoutPermissionIsToldWhoMayProcessTheQueue) {
-  if (!HasOtherUsers()) {
-    GTEST_SKIP() << "the sandbox has one user, who may do everything";
-  }
   // With and without the file of an earlier run.
   for (const bool hasFile : {false, true}) {
     if (hasFile) {
       EXPECT_EQ(velathumb_.Run().exitCode, 0);
     }
+    const ClosedToOwner lock(hasFile ? kRunnerLock : "/run");
     const ProgramResult result = RunAsOtherUser({});
     EXPECT_EQ(result.exitCode, 2);
     EXPECT_EQ(result.err,
