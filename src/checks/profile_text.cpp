@@ -16,10 +16,6 @@ namespace {
 const std::vector<std::string_view> kKeys = {kFilenameKey, kSizeKey, kQualityKey, kUnsharpKey,
                                              kPhaseKey};
 
-bool IsThumbSection(std::string_view name) {
-  return name.substr(0, kThumbSectionPrefix.size()) == kThumbSectionPrefix;
-}
-
 std::string DescribeInvalidLine(std::string_view line) {
   if (line.find('\0') != std::string_view::npos) {
     return "the line contains a zero byte";
