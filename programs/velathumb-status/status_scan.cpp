@@ -156,7 +156,11 @@ void StatusScan::ScanTree(const std::string& root) {
   const int error = errno;
   std::sort(directories.begin(), directories.end());
   for (const std::string& directory : directories) {
-    directory == root ? ScanDirectory(directory) : ScanFound(directory);
+    if (directory == root) {
+      ScanDirectory(directory);
+    } else {
+      ScanFound(directory);
+    }
   }
   if (result != 0) {
     onError_(root, std::string("was not scanned completely: ") + std::strerror(error));
