@@ -273,18 +273,33 @@ void Batch::HandleUnfinished(size_t number, const std::vector<std::string>& dire
   }
 }
 
+/// Returns whether the profile has changed since velathumb was started, for the first time.
+bool Batch::IsProfileNew(const Child& child) {
+  FileVersion profile;
+  profile.Read(settings_.velathumb.profileFile.c_str());
+  return profile != child.profile &&
+         !std::exchange(histories_[plan_.Entry(child.number)].hasSeenNewProfile, true);
+}
+
 /// Returns false, having postponed the entry, when velathumb may have found a profile with which it
 /// skips directories, for instance one that was just being written.
 bool Batch::WasProfileUsable(const Child& child) {
-  const std::string& file = settings_.velathumb.profileFile;
-  FileVersion profile;
-  profile.Read(file.c_str());
   // The first fault is the only one that is logged.
-  if (failure_ == RunEnd::kMisconfigured || !IsProfileUsable(file)) {
-    failure_ = RunEnd::kMisconfigured;
-  } else if (profile == child.profile ||
-             std::exchange(histories_[plan_.Entry(child.number)].hasSeenNewProfile, true)) {
-    return true;
+  if (failure_ != RunEnd::kMisconfigured) {
+    const std::string& file = settings_.velathumb.profileFile;
+    switch (CheckProfileUse(file, [this] { return events_.MustStop(); })) {
+      case ProfileState::kUsable:
+        if (!IsProfileNew(child)) {
+          return true;
+        }
+        break;
+      case ProfileState::kUnusable:
+        failure_ = RunEnd::kMisconfigured;
+        break;
+      case ProfileState::kUsableNow:
+      case ProfileState::kInterrupted:
+        break;
+    }
   }
   plan_.Postpone(child.number, Clock::now());
   return false;

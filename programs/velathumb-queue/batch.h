@@ -67,6 +67,7 @@ class Batch {
   void ReapChildren();
   void HandleEnd(const Child& child, int status);
   void HandleSuccess(const Child& child);
+  bool IsProfileNew(const Child& child);
   bool WasProfileUsable(const Child& child);
   void HandleUnfinished(size_t number, const std::vector<std::string>& directories);
   void CheckProgress();

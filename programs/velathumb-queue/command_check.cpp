@@ -1,9 +1,12 @@
 #include "command_check.h"
 
+#include <chrono>
 #include <cstring>
 #include <string>
+#include <thread>
 
 #include "checks/configuration_check.h"
+#include "posix/deadline.h"
 #include "posix/files.h"
 #include "posix/service_log.h"
 #include "profiles/thumbnail_profile.h"
@@ -11,6 +14,10 @@
 namespace vela {
 
 namespace {
+
+/// How long the writer of a profile has, and how often a request to stop is looked for meanwhile.
+constexpr std::chrono::seconds kSecondLook(1);
+constexpr std::chrono::milliseconds kStopInterval(20);
 
 /// Returns where the profile file has its first error, and which; empty when that is unknown.
 std::string FirstErrorIn(const std::string& profileFile) {
@@ -49,8 +56,19 @@ bool IsFaultless(const std::string& fault) {
 
 }  // namespace
 
-bool IsProfileUsable(const std::string& profileFile) {
-  return IsFaultless(FindProfileFault(profileFile));
+ProfileState CheckProfileUse(const std::string& profileFile,
+                             const std::function<bool()>& mustStop) {
+  if (FindProfileFault(profileFile).empty()) {
+    return ProfileState::kUsable;
+  }
+  for (const Deadline second(kSecondLook); second.Left() > Deadline::Clock::duration::zero();) {
+    if (mustStop()) {
+      return ProfileState::kInterrupted;
+    }
+    std::this_thread::sleep_for(kStopInterval);
+  }
+  return IsFaultless(FindProfileFault(profileFile)) ? ProfileState::kUsableNow
+                                                    : ProfileState::kUnusable;
 }
 
 bool IsCommandUsable(const VelathumbCommand& command) {
@@ -58,7 +76,9 @@ bool IsCommandUsable(const VelathumbCommand& command) {
   if (error != 0) {
     return IsFaultless("cannot run " + command.path + ": " + std::strerror(error));
   }
-  return IsProfileUsable(command.profileFile);
+  // Signals are not handled yet: they end the program.
+  const auto mustStop = [] { return false; };
+  return CheckProfileUse(command.profileFile, mustStop) != ProfileState::kUnusable;
 }
 
 }  // namespace vela

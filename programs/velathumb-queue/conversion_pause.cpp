@@ -3,8 +3,8 @@
 #include <json/value.h>
 
 #include <algorithm>
-#include <cerrno>
 
+#include "ipc/absent_daemon.h"
 #include "ipc/velamk_ipc.h"
 #include "platform/velaindex.h"
 #include "platform/vlibc.h"
@@ -24,11 +24,6 @@ constexpr std::chrono::seconds kLongestWait(5);
 std::chrono::seconds TimeToNextCheck() {
   // A negative resume time is never reached, but the time until then is reported as 0.
   return std::clamp(TimeUntilResume(), std::chrono::seconds(1), kLongestWait);
-}
-
-/// Returns whether a request has failed, with this platform error, because nobody listens.
-bool IsNobodyListening(int error) {
-  return error == ENOENT || error == ECONNREFUSED;
 }
 
 bool IsTrue(const Json::Value& packet, const char* name) {

@@ -1,7 +1,6 @@
 #include "progress_line.h"
 
 #include <algorithm>
-#include <cstdint>
 #include <filesystem>
 #include <system_error>
 
@@ -18,19 +17,13 @@ namespace {
 constexpr char kGap[] = "  ";
 constexpr char kEllipsis[] = "...";
 
-std::string FormatCount(const ProgressCount& count, const char* unit) {
+std::string FormatCounts(const ProgressSummary& summary) {
+  const auto [unit, count] = ChooseCount(summary);
   if (count.total <= 0) {
     return std::to_string(std::max(count.completed, 0)) + ' ' + unit;
   }
-  // The counters may be inconsistent; the full value is not shown before the end.
-  const int64_t done = std::clamp(count.completed, 0, count.total);
-  return std::to_string(done * 100 / count.total) + "%  " + std::to_string(done) + " of " +
-         std::to_string(count.total) + ' ' + unit;
-}
-
-std::string FormatCounts(const ProgressSummary& summary) {
-  const bool isPhotos = summary.thumb.total <= 0 && summary.photo.total > 0;
-  return isPhotos ? FormatCount(summary.photo, "photos") : FormatCount(summary.thumb, "thumbnails");
+  return std::to_string(count.PartOf(100)) + "%  " + std::to_string(count.PartOf(count.total)) +
+         " of " + std::to_string(count.total) + ' ' + unit;
 }
 
 bool IsContinuationByte(char byte) {

@@ -105,22 +105,42 @@ void ProgressTotals::Reset() {
   SetCounter(THUMB_TYPE_PHOTO, "completed_thumb", 0);
 }
 
-void ProgressTotals::Set(const std::vector<std::string>& entries, const StopCheck& shouldStop) {
-  Sums sums;
+/// Returns false when it was stopped.
+bool ProgressTotals::Count(const std::vector<std::string>& entries, const StopCheck& shouldStop,
+                           Sums& sums) const {
   for (const std::string& entry : entries) {
     if (shouldStop()) {
-      return;
+      return false;
     }
     CountEntry(entry, shouldStop, sums);
   }
-  if (shouldStop()) {
-    return;
-  }
-  counted_.insert(sums.directories.begin(), sums.directories.end());
+  return !shouldStop();
+}
+
+void ProgressTotals::Write(const Sums& sums) const {
   SetTotal(THUMB_TYPE_PHOTO, "total", "completed", sums.photos, sums.failedPhotos);
   SetTotal(THUMB_TYPE_PHOTO, "total_thumb", "completed_thumb", sums.thumbs, sums.failedThumbs);
   if (countVideos_) {
     SetTotal(THUMB_TYPE_VIDEO, "total", "completed", CountQueuedVideos());
+  }
+}
+
+void ProgressTotals::Set(const std::vector<std::string>& entries, const StopCheck& shouldStop) {
+  Sums sums;
+  if (Count(entries, shouldStop, sums)) {
+    counted_.insert(sums.directories.begin(), sums.directories.end());
+    Write(sums);
+  }
+}
+
+void ProgressTotals::Update(const std::vector<std::string>& entries, const StopCheck& shouldStop) {
+  Sums sums;
+  if (Count(entries, shouldStop, sums)) {
+    counted_.insert(sums.directories.begin(), sums.directories.end());
+    // None has failed since Set took these out of the completed ones.
+    sums.failedPhotos = 0;
+    sums.failedThumbs = 0;
+    Write(sums);
   }
 }
 

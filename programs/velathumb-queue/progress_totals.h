@@ -27,9 +27,15 @@ class ProgressTotals {
   /// directory counted once. When `shouldStop` returns true, nothing is set.
   void Set(const std::vector<std::string>& entries, const StopCheck& shouldStop);
 
+  /// The same once more for the entries of the last Set, of which none was processed meanwhile.
+  void Update(const std::vector<std::string>& entries, const StopCheck& shouldStop);
+
  private:
   struct Sums;
 
+  bool Count(const std::vector<std::string>& entries, const StopCheck& shouldStop,
+             Sums& sums) const;
+  void Write(const Sums& sums) const;
   void CountEntry(const std::string& entry, const StopCheck& shouldStop, Sums& sums) const;
   void CountDirectory(const char* path, const StopCheck& shouldStop, Sums& sums) const;
 

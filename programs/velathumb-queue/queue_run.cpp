@@ -63,6 +63,7 @@ class QueueRun {
   RunEnd ProcessTaken(TakenQueue::Outcome outcome);
   bool WaitUntilAllowed();
   void SetTotals(TakenQueue::Outcome outcome);
+  bool WaitWithTotals(TakenQueue::Outcome outcome);
   bool RecordSeen();
   std::vector<std::string> FindEndless();
   RunEnd DeferEndless(const std::vector<std::string>& entries);
@@ -117,6 +118,21 @@ void QueueRun::SetTotals(TakenQueue::Outcome outcome) {
   totals_.Set(taken_.Entries(), [this] { return events_.MustStop(); });
 }
 
+/// Sets the totals and waits until conversion may run. Returns false when a signal ended the wait.
+bool QueueRun::WaitWithTotals(TakenQueue::Outcome outcome) {
+  if (gate_.MayStart()) {
+    SetTotals(outcome);
+    return !events_.IsStopping();
+  }
+  // During the pause others see what is outstanding instead of the end of an earlier run.
+  SetTotals(outcome);
+  if (!WaitUntilAllowed()) {
+    return false;
+  }
+  totals_.Update(taken_.Entries(), [this] { return events_.MustStop(); });
+  return true;
+}
+
 /// Repeats `act` while it finds a file locked. Returns its last result: EWOULDBLOCK when a signal
 /// ended the wait.
 int QueueRun::RetryWhileLocked(const std::function<int()>& act) {
@@ -145,10 +161,9 @@ RunEnd QueueRun::ProcessTaken(TakenQueue::Outcome outcome) {
   WriteLog(LogLevel::kInfo,
            (outcome == TakenQueue::Outcome::kResumed ? "resuming with " : "took ") +
                std::to_string(count) + (count == 1 ? " entry" : " entries"));
-  if (!WaitUntilAllowed()) {
+  if (!WaitWithTotals(outcome)) {
     return RunEnd::kStopped;
   }
-  SetTotals(outcome);
   Batch batch(settings_, taken_, events_, gate_, histories_, progress_);
   const RunEnd end = batch.Run();
   hasHandedBack_ = batch.HasHandedBack();
@@ -265,8 +280,14 @@ void QueueRun::QueueUnfinished() {
 
 /// Takes the pending entries and processes them. Sets `isIdle` when there are none.
 RunEnd QueueRun::RunRound(bool& isIdle) {
-  if (!IsProfileUsable(settings_.velathumb.profileFile)) {
-    return RunEnd::kMisconfigured;
+  switch (CheckProfileUse(settings_.velathumb.profileFile, [this] { return events_.MustStop(); })) {
+    case ProfileState::kUnusable:
+      return RunEnd::kMisconfigured;
+    case ProfileState::kInterrupted:
+      return RunEnd::kStopped;
+    case ProfileState::kUsable:
+    case ProfileState::kUsableNow:
+      break;
   }
   QueueUnfinished();
   const TakenQueue::Outcome outcome = taken_.Take();

@@ -111,6 +111,7 @@ void NoteState(std::string_view unit, std::string_view active, ServiceState& sta
   const bool hasFailed = active == "failed";
   if (unit == kService) {
     state.isRunning = isActive;
+    state.isStopping = active == "deactivating";
     state.hasFailed = state.hasFailed || hasFailed;
   } else if (unit == kPath) {
     state.isWatching = isActive;
@@ -120,15 +121,16 @@ void NoteState(std::string_view unit, std::string_view active, ServiceState& sta
   }
 }
 
-void ReadStates(sd_bus* bus, const Deadline& deadline, ServiceState& state) {
+/// Returns false when there was no answer.
+bool ReadStates(sd_bus* bus, const Deadline& deadline, ServiceState& state) {
   const Message call = NewCall(bus, "ListUnitsByNames");
   if (call == nullptr || sd_bus_message_append(call.get(), "as", 3, kService, kPath, kTimer) < 0) {
-    return;
+    return false;
   }
   const Message reply = Call(bus, call, deadline);
   if (reply == nullptr ||
       sd_bus_message_enter_container(reply.get(), SD_BUS_TYPE_ARRAY, "(ssssssouso)") < 0) {
-    return;
+    return false;
   }
   const char* unit = nullptr;
   const char* active = nullptr;
@@ -136,6 +138,7 @@ void ReadStates(sd_bus* bus, const Deadline& deadline, ServiceState& state) {
                              nullptr, nullptr, nullptr, nullptr, nullptr) > 0) {
     NoteState(unit, active, state);
   }
+  return true;
 }
 
 bool IsEnabled(sd_bus* bus, const char* unit, const Deadline& deadline) {
@@ -156,6 +159,11 @@ bool HasService(const ServiceState& state) {
 }
 
 ServiceText DescribeService(const ServiceState& state) {
+  if (!state.isKnown) {
+    return {true,
+            "but systemd does not answer: unless velathumb-queue.service does the work, start "
+            "velathumb-queue"};
+  }
   if (state.isRunning) {
     return {false, kRunningText};
   }
@@ -185,13 +193,14 @@ ServiceState AskForService(std::chrono::seconds limit) {
   }
   const Deadline deadline(limit);
   const Bus bus = ConnectToSystemd(deadline);
-  if (bus == nullptr) {
+  if (bus == nullptr || !ReadStates(bus.get(), deadline, state)) {
+    state.isKnown = false;
     return state;
   }
-  ReadStates(bus.get(), deadline, state);
   for (const char* unit : {kService, kPath, kTimer}) {
     state.isEnabled = state.isEnabled || IsEnabled(bus.get(), unit, deadline);
   }
+  state.isKnown = HasService(state) || MicrosecondsLeft(deadline) > 0;
   return state;
 }
 

@@ -1,15 +1,12 @@
 #include "taken_queue.h"
 
-#include <algorithm>
 #include <cerrno>
-#include <cstring>
 #include <ctime>
 #include <filesystem>
 #include <fstream>
 #include <optional>
 #include <system_error>
 
-#include "platform/system_rules.h"
 #include "platform/velaindex.h"
 #include "platform/vlibc.h"
 #include "posix/file_lock.h"
@@ -19,27 +16,6 @@
 namespace vela {
 
 namespace {
-
-/// Returns the path without empty and "." components. ".." components stay: where they lead depends
-/// on links.
-std::string NormalizePath(const std::string& path) {
-  std::string normalized;
-  for (size_t begin = 0; begin < path.size();) {
-    const size_t end = std::min(path.find('/', begin), path.size());
-    const std::string component = path.substr(begin, end - begin);
-    if (!component.empty() && component != ".") {
-      normalized += (normalized.empty() && path.front() != '/' ? "" : "/") + component;
-    }
-    begin = end + 1;
-  }
-  return normalized.empty() ? path.substr(0, 1) : normalized;
-}
-
-/// Returns what identifies an entry: the same for all spellings of its path.
-std::string KeyOf(const std::string& entry) {
-  const size_t begin = IsTreeEntry(entry) ? std::strlen(kTreePrefix) : 0;
-  return entry.substr(0, begin) + NormalizePath(entry.substr(begin));
-}
 
 /// Returns the size of the file, 0 when it is missing.
 uintmax_t SizeOf(const std::string& path) {
@@ -95,7 +71,7 @@ int TakenQueue::ReadJournal(std::unordered_set<std::string>& done) const {
   uintmax_t completeSize = 0;
   for (std::string line; std::getline(journal, line) && !journal.eof();) {
     completeSize += line.size() + 1;
-    done.insert(KeyOf(line));
+    done.insert(QueueEntryKey(line));
   }
   // A last line without a newline was cut off when it was written, and would be joined with the
   // line that is appended next.
@@ -117,7 +93,7 @@ int TakenQueue::ReadEntries() {
   }
   readSize_ = SizeOf(paths_.taken);
   const QueueRead read = ForEachQueueEntry(paths_.taken.c_str(), [&](const std::string& entry) {
-    if (!entry.empty() && known.insert(KeyOf(entry)).second) {
+    if (!entry.empty() && known.insert(QueueEntryKey(entry)).second) {
       entries_.push_back(entry);
     }
   });

@@ -2,10 +2,12 @@
 
 #include <json/writer.h>
 
+#include <algorithm>
 #include <chrono>
 #include <ostream>
 #include <string>
 #include <thread>
+#include <utility>
 
 #include "conversion_state.h"
 #include "index/strict_json.h"
@@ -124,6 +126,8 @@ class ProgressView {
     WriteProgressText(out_, state.progress);
     if (state.activity == Activity::kPaused) {
       out_ << ResumeText(state.resume) << '\n';
+    } else if (state.activity == Activity::kWaiting) {
+      out_ << "the queue has entries, but nothing processes them; velathumb-queue would\n";
     }
   }
 
@@ -137,19 +141,46 @@ class ProgressView {
   std::string lastLine_;
 };
 
+/// Notices that nothing processes the entries of the queue.
+class UnattendedQueue {
+ public:
+  explicit UnattendedQueue(std::chrono::milliseconds limit) : limit_(limit) {}
+
+  /// Takes one state after the other. Returns whether the queue has been waiting in the same state
+  /// for longer than the limit.
+  bool IsGivenUp(const ConversionState& state) {
+    const auto now = Clock::now();
+    std::string description = ToJsonText(DescribeState(state));
+    if (state.activity != Activity::kWaiting || description != last_) {
+      last_ = std::move(description);
+      since_ = now;
+    }
+    return state.activity == Activity::kWaiting && now - since_ >= limit_;
+  }
+
+ private:
+  using Clock = std::chrono::steady_clock;
+
+  const std::chrono::milliseconds limit_;
+  std::string last_;
+  Clock::time_point since_;
+};
+
 }  // namespace
 
-bool WatchProgress(std::ostream& out, bool isTerminal, bool asJson) {
+bool WatchProgress(std::ostream& out, bool isTerminal, bool asJson,
+                   std::chrono::milliseconds unattendedLimit) {
   ProgressView view(out, isTerminal, asJson);
+  UnattendedQueue unattended(unattendedLimit);
   ConversionState state = ReadConversionState();
   view.Show(state);
-  while (state.mayContinue && out.good()) {
-    std::this_thread::sleep_for(kInterval);
+  while (state.mayContinue && !unattended.IsGivenUp(state) && out.good()) {
+    std::this_thread::sleep_for(std::min(kInterval, unattendedLimit));
     state = ReadConversionState();
     view.Show(state);
   }
   view.End(state);
-  return state.progress.HasWork();
+  return state.progress.HasWork() || state.activity == Activity::kWaiting;
 }
 
 }  // namespace vela

@@ -71,6 +71,7 @@ class StatusScan {
  private:
   void ScanTree(const std::string& root);
   void ScanDirectory(const std::string& path);
+  void ScanFound(const std::string& path);
   bool ScanPhotos(DirectoryReport& directory);
 
   const ScanOptions options_;
@@ -136,6 +137,14 @@ void StatusScan::ScanDirectory(const std::string& path) {
   }
 }
 
+/// Scans a directory of a tree, which may have been removed since it was found.
+void StatusScan::ScanFound(const std::string& path) {
+  FileIdentity identity;
+  if (IdentifyDirectory(path, identity) != ENOENT) {
+    ScanDirectory(path);
+  }
+}
+
 void StatusScan::ScanTree(const std::string& root) {
   if (IsDirExist(root.c_str()) == 0) {
     ScanDirectory(root);
@@ -147,7 +156,11 @@ void StatusScan::ScanTree(const std::string& root) {
   const int error = errno;
   std::sort(directories.begin(), directories.end());
   for (const std::string& directory : directories) {
-    ScanDirectory(directory);
+    if (directory == root) {
+      ScanDirectory(directory);
+    } else {
+      ScanFound(directory);
+    }
   }
   if (result != 0) {
     onError_(root, std::string("was not scanned completely: ") + std::strerror(error));

@@ -16,10 +16,6 @@ namespace {
 const std::vector<std::string_view> kKeys = {kFilenameKey, kSizeKey, kQualityKey, kUnsharpKey,
                                              kPhaseKey};
 
-bool IsThumbSection(std::string_view name) {
-  return name.substr(0, kThumbSectionPrefix.size()) == kThumbSectionPrefix;
-}
-
 /// Returns what a message about the unknown key ends with.
 std::string KeySuggestion(std::string_view key) {
   const std::string suggestion = SuggestName(key, kKeys);

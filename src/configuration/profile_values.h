@@ -8,6 +8,9 @@ namespace vela {
 
 /// A section defines a thumbnail when its name begins with this.
 inline constexpr std::string_view kThumbSectionPrefix = "thumb";
+inline constexpr bool IsThumbSection(std::string_view name) {
+  return name.substr(0, kThumbSectionPrefix.size()) == kThumbSectionPrefix;
+}
 
 inline constexpr char kSizeKey[] = "size";
 inline constexpr char kQualityKey[] = "quality";

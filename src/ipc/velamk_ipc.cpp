@@ -2,7 +2,6 @@
 
 #include <json/value.h>
 
-#include <cerrno>
 #include <cstdlib>
 
 #include "ipc/absent_daemon.h"
@@ -42,8 +41,7 @@ int ToInt(const Json::Value& value) {
 /// Returns whether a request has failed, with this platform error, only because nobody listens, and
 /// that has been logged before.
 bool IsAbsenceKnown(int error) {
-  const bool isAbsent = error == ENOENT || error == ECONNREFUSED;
-  return isAbsent && std::getenv(kAbsentDaemonVariable) != nullptr;
+  return IsNobodyListening(error) && std::getenv(kAbsentDaemonVariable) != nullptr;
 }
 
 /// Replaces the request by the daemon's reply. Returns true when the daemon succeeded; a failure is
@@ -60,15 +58,20 @@ bool Exchange(Json::Value& packet, int line) {
   return false;
 }
 
-/// Does the same for a request about `path`; without one there is nothing to ask, which is a
-/// failure.
-bool ExchangeAbout(const char* path, Json::Value& packet, int line) {
+/// Adds the path that a request is about. Without one there is nothing to ask, which is a failure:
+/// it is logged with the operation's `line`, and false is returned.
+bool AddPath(const char* path, Json::Value& packet, int line) {
   if (path == nullptr) {
     LogError(kLogSource, line, "fail");
     return false;
   }
   packet["path"] = path;
-  return Exchange(packet, line);
+  return true;
+}
+
+/// Does the same as Exchange for a request about `path`.
+bool ExchangeAbout(const char* path, Json::Value& packet, int line) {
+  return AddPath(path, packet, line) && Exchange(packet, line);
 }
 
 bool QuerySwitch(const char* command, int line) {
@@ -80,8 +83,11 @@ bool QuerySwitch(const char* command, int line) {
 
 int GetMediaFromPluginDB(int type, const char* path, VELA_MEDIA_INFO& out) {
   Json::Value packet = MakeRequest("GET_MEDIA_FROM_PLUGIN_DB");
+  if (!AddPath(path, packet, 30)) {
+    return -1;
+  }
   packet["type"] = type;
-  if (!ExchangeAbout(path, packet, 30)) {
+  if (!Exchange(packet, 30)) {
     return -1;
   }
   Json::Value media = Member(packet, "media");

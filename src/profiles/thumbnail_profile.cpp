@@ -23,10 +23,6 @@ bool FillsArea(const std::string& thumbName) {
   return traits != nullptr && traits->fillsArea;
 }
 
-bool IsThumbSection(const std::string& section) {
-  return section.compare(0, kThumbSectionPrefix.size(), kThumbSectionPrefix) == 0;
-}
-
 /// Builds the profile of one section; null when the section has no wanted thumbnail.
 std::unique_ptr<const ThumbnailProfile> ReadProfile(const VELAUtils::ConfParser& conf,
                                                     const std::string& section, int32_t sizeMap) {

@@ -1,5 +1,7 @@
 #include "progress/progress_summary.h"
 
+#include <algorithm>
+#include <cstdint>
 #include <cstdio>
 
 #include "platform/velaindex.h"
@@ -22,6 +24,18 @@ std::string FormatCount(const char* kind, const ProgressCount& count) {
 }
 
 }  // namespace
+
+int ProgressCount::PartOf(int whole) const {
+  const int64_t done = std::clamp(completed, 0, total);
+  return static_cast<int>(done * whole / total);
+}
+
+FollowedCount ChooseCount(const ProgressSummary& summary) {
+  if (summary.thumb.total > 0 || summary.photo.total <= 0) {
+    return {"thumbnails", summary.thumb};
+  }
+  return {"photos", summary.photo};
+}
 
 const char* ConvProgressFile(int kind) {
   switch (kind) {

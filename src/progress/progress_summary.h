@@ -19,6 +19,10 @@ struct ProgressCount {
   float Ratio() const {
     return total == 0 ? 0.0F : static_cast<float>(completed) / static_cast<float>(total);
   }
+
+  /// Returns the completed part of `whole`, rounded down: the full value is not shown before the
+  /// end. From 0 to `whole` even when the counters are inconsistent; only with a total.
+  int PartOf(int whole) const;
 };
 
 /// All counters.
@@ -27,6 +31,14 @@ struct ProgressSummary {
   ProgressCount thumb;
   ProgressCount video;
 };
+
+/// The counter that shows the progress best: that of the thumbnails, or of the photos when the
+/// total of the thumbnails is not known.
+struct FollowedCount {
+  const char* unit;
+  ProgressCount count;
+};
+FollowedCount ChooseCount(const ProgressSummary& summary);
 
 /// Reads the counters; one that is missing or not a number counts as 0.
 ProgressSummary ReadProgressSummary();

@@ -1,5 +1,6 @@
 #include "storage/creation_queue.h"
 
+#include <algorithm>
 #include <cstring>
 #include <unordered_set>
 
@@ -16,7 +17,22 @@ namespace {
 /// The flags that all callers have always passed to the line search.
 constexpr int kLineSearchFlags = 1028;
 
-/// Returns whether the file has an entry that is not among `done`.
+/// Returns the path without empty and "." components. ".." components stay: where they lead depends
+/// on links.
+std::string NormalizePath(const std::string& path) {
+  std::string normalized;
+  for (size_t begin = 0; begin < path.size();) {
+    const size_t end = std::min(path.find('/', begin), path.size());
+    const std::string component = path.substr(begin, end - begin);
+    if (!component.empty() && component != ".") {
+      normalized += (normalized.empty() && path.front() != '/' ? "" : "/") + component;
+    }
+    begin = end + 1;
+  }
+  return normalized.empty() ? path.substr(0, 1) : normalized;
+}
+
+/// Returns whether the file has an entry that is not among `done`, a set of keys.
 bool HasEntryBeyond(const char* queueFile, const std::unordered_set<std::string>& done) {
   LineReader lines(queueFile);
   while (lines.IsOpen() && lines.Next()) {
@@ -24,7 +40,7 @@ bool HasEntryBeyond(const char* queueFile, const std::unordered_set<std::string>
       continue;
     }
     const std::string entry = lines.WithoutNewline();
-    if (!entry.empty() && done.count(entry) == 0) {
+    if (!entry.empty() && done.count(QueueEntryKey(entry)) == 0) {
       return true;
     }
   }
@@ -35,6 +51,11 @@ bool HasEntryBeyond(const char* queueFile, const std::unordered_set<std::string>
 
 bool IsTreeEntry(const std::string& entry) {
   return entry.compare(0, std::strlen(kTreePrefix), kTreePrefix) == 0;
+}
+
+std::string QueueEntryKey(const std::string& entry) {
+  const size_t begin = IsTreeEntry(entry) ? std::strlen(kTreePrefix) : 0;
+  return entry.substr(0, begin) + NormalizePath(entry.substr(begin));
 }
 
 bool HasQueueLine(const char* queueFile, const char* text) {
@@ -71,7 +92,8 @@ bool HasPhotosToProcess() {
     return true;
   }
   std::unordered_set<std::string> done;
-  ForEachQueueEntry(kDonePhotosFile, [&](const std::string& entry) { done.insert(entry); });
+  ForEachQueueEntry(kDonePhotosFile,
+                    [&](const std::string& entry) { done.insert(QueueEntryKey(entry)); });
   return HasEntryBeyond(kPhotoQueue.tempFile, done);
 }
 

@@ -29,6 +29,9 @@ inline constexpr CreationQueue kVideoQueue = {"/var/spool/flv_create.queue",
 /// Returns true when the entry stands for a directory tree.
 bool IsTreeEntry(const std::string& entry);
 
+/// Returns what identifies an entry: the same for all spellings of its path.
+std::string QueueEntryKey(const std::string& entry);
+
 /// Returns true when the queue file contains a line equal to `text`.
 bool HasQueueLine(const char* queueFile, const char* text);
 

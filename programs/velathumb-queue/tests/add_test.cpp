@@ -1,12 +1,15 @@
 // Adding entries: who does the work, and what the user is told.
 #include <fcntl.h>
 #include <grp.h>
+#include <sched.h>
+#include <signal.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
 #include <cerrno>
 
 #include "fake_systemd.h"
+#include "posix/file_lock.h"
 #include "queue_fixture.h"
 #include "service_state.h"
 #include "support/named_case.h"
@@ -24,6 +27,46 @@ using std::chrono::seconds;
 constexpr char kService[] = "velathumb-queue.service";
 constexpr char kPath[] = "velathumb-queue.path";
 constexpr char kTimer[] = "velathumb-queue.timer";
+constexpr char kRunnerLock[] = "/var/run/velathumb-queue.lock";
+
+int BecomeOtherUser() {
+  return setgroups(0, nullptr) == 0 && setgid(kOwner) == 0 && setuid(kOwner) == 0 ? 0 : errno;
+}
+
+bool WriteText(const char* file, const std::string& text) {
+  const Descriptor out(open(file, O_WRONLY | O_CLOEXEC));
+  return write(out.Get(), text.data(), text.size()) == static_cast<ssize_t>(text.size());
+}
+
+/// For a sandbox with one user: gives that one, who has no privileges then, another number.
+int TakeOtherName() {
+  const std::string map = std::to_string(kOwner) + " 0 1\n";
+  return unshare(CLONE_NEWUSER) == 0 && WriteText("/proc/self/setgroups", "deny") &&
+                 WriteText("/proc/self/gid_map", map) && WriteText("/proc/self/uid_map", map)
+             ? 0
+             : errno;
+}
+
+/// In a sandbox with one user, keeps the owner of a file from changing it as if it were that of
+/// another one, as long as the object exists.
+class ClosedToOwner {
+ public:
+  explicit ClosedToOwner(const char* path) : path_(path) {
+    struct stat status = {};
+    EXPECT_EQ(stat(path, &status), 0) << path;
+    mode_ = status.st_mode & 07777;
+    Set(HasOtherUsers() ? mode_ : S_ISDIR(status.st_mode) ? 0555 : 0);
+  }
+  ~ClosedToOwner() { Set(mode_); }
+  ClosedToOwner(const ClosedToOwner&) = delete;
+  ClosedToOwner& operator=(const ClosedToOwner&) = delete;
+
+ private:
+  void Set(mode_t mode) const { EXPECT_EQ(chmod(path_, mode), 0) << path_; }
+
+  const char* path_;
+  mode_t mode_ = 0;
+};
 
 class AddTest : public QueueTest {
  protected:
@@ -46,9 +89,7 @@ class AddTest : public QueueTest {
     CopyFile(QueueProgramPath(), kCopy);
     EXPECT_EQ(chmod(kCopy, 0755), 0);
     ProgramOptions options;
-    options.beforeExec = {[] {
-      return setgroups(0, nullptr) == 0 && setgid(kOwner) == 0 && setuid(kOwner) == 0 ? 0 : errno;
-    }};
+    options.beforeExec = {HasOtherUsers() ? BecomeOtherUser : TakeOtherName};
     return RunProgram(kCopy, velathumb_.Arguments(arguments), options);
   }
 };
@@ -78,12 +119,58 @@ TEST_F(AddTest, AnotherRunnerThatIsRunningDoesTheWork) {
   Program runner = StartAndHold({"/tmp/a"});
   const ProgramResult result = velathumb_.Run({"--add", "/tmp/b"});
   EXPECT_EQ(result.exitCode, 0);
-  EXPECT_EQ(result.err,
-            "velathumb-queue: queued /tmp/b\n"
-            "velathumb-queue: the running velathumb-queue does the work\n");
+  EXPECT_EQ(
+      result.err,
+      "velathumb-queue: queued /tmp/b\n"
+      "velathumb-queue: the running velathumb-queue does the work unless it is being stopped; "
+      "then they stay queued\n");
   Release();
   EXPECT_TRUE(runner.Wait());
   EXPECT_THAT(velathumb_.Entries(), ElementsAre("/tmp/a", "/tmp/b"));
+}
+
+TEST_F(AddTest, ARunnerThatHasTakenTheEntriesDoesTheWork) {
+  FileDescriptor lock = TakeProcessLock(kRunnerLock, false);
+  ASSERT_TRUE(lock.IsOpen());
+  Program runner = velathumb_.Start({"--add", "/tmp/a"});
+  ASSERT_TRUE(WaitUntilExists(kQueueFile));
+  ASSERT_EQ(rename(kQueueFile, kTakenFile), 0);
+  const auto result = runner.Wait();
+  ASSERT_TRUE(result);
+  EXPECT_EQ(result->exitCode, 0);
+  EXPECT_EQ(result->err,
+            "velathumb-queue: queued /tmp/a\n"
+            "velathumb-queue: the running velathumb-queue does the work\n");
+}
+
+TEST_F(AddTest, TheWorkOfARunnerThatEndsWithoutTakingItIsDoneHere) {
+  FileDescriptor lock = TakeProcessLock(kRunnerLock, false);
+  ASSERT_TRUE(lock.IsOpen());
+  Program runner = velathumb_.Start({"--add", "/tmp/a"});
+  ASSERT_TRUE(WaitUntilExists(kQueueFile));
+  EXPECT_FALSE(runner.Wait(std::chrono::milliseconds(200)));
+  lock.Reset();
+  ExpectEnd(runner, 0);
+  EXPECT_THAT(velathumb_.Entries(), ElementsAre("/tmp/a"));
+  ExpectQueueDone();
+}
+
+TEST_F(AddTest, TheWorkOfARunnerThatIsBeingStoppedIsDoneHere) {
+  // A velathumb that converts may also take a moment to end.
+  velathumb_.Stub().PlanCall(
+      1, StubPlan().IgnoreSignal(SIGTERM).CreateFile("/tmp/here").WaitForFile("/tmp/go"));
+  Enqueue({"/tmp/b"});
+  Program stopped = velathumb_.Start();
+  ASSERT_TRUE(WaitUntilExists("/tmp/here"));
+  stopped.Kill(SIGTERM);
+  Program runner = velathumb_.Start({"--add", "/tmp/a"});
+  ASSERT_TRUE(WaitUntilExists(kQueueFile));
+  EXPECT_FALSE(runner.Wait(std::chrono::milliseconds(200)));
+  Release();
+  ExpectEnd(stopped, 1);
+  ExpectEnd(runner, 0);
+  EXPECT_THAT(velathumb_.Entries(), ElementsAre("/tmp/b", "/tmp/a"));
+  ExpectQueueDone();
 }
 
 TEST_F(AddTest, NowTellsByItsStatusThatAnotherRunnerHasTheWork) {
@@ -111,9 +198,7 @@ TEST_F(AddTest, NowKeepsAFasterServiceFromTakingTheWork) {
 }
 
 TEST_F(AddTest, AUserWithoutPermissionIsToldWhoMayAddToTheQueue) {
-  if (!HasOtherUsers()) {
-    GTEST_SKIP() << "the sandbox has one user, who may do everything";
-  }
+  const ClosedToOwner spool("/var/spool");
   const ProgramResult result = RunAsOtherUser({"--add", "/tmp/a"});
   EXPECT_EQ(result.exitCode, 2);
   EXPECT_EQ(result.err,
@@ -123,14 +208,12 @@ TEST_F(AddTest, AUserWithoutPermissionIsToldWhoMayAddToTheQueue) {
 }
 
 TEST_F(AddTest, AUserWithoutPermissionIsToldWhoMayProcessTheQueue) {
-  if (!HasOtherUsers()) {
-    GTEST_SKIP() << "the sandbox has one user, who may do everything";
-  }
   // With and without the file of an earlier run.
   for (const bool hasFile : {false, true}) {
     if (hasFile) {
       EXPECT_EQ(velathumb_.Run().exitCode, 0);
     }
+    const ClosedToOwner lock(hasFile ? kRunnerLock : "/run");
     const ProgramResult result = RunAsOtherUser({});
     EXPECT_EQ(result.exitCode, 2);
     EXPECT_EQ(result.err,
@@ -206,6 +289,36 @@ TEST_F(AddTest, ARunnerThatHasTheLockDoesTheWorkOfAServiceThatHasNotBeenStarted)
             "velathumb-queue: queued /tmp/b; the running velathumb-queue does the work\n");
   Release();
   ExpectEnd(runner, 0);
+}
+
+TEST_F(AddTest, AServiceThatIsBeingStoppedDoesNotDoTheWork) {
+  const FakeSystemd systemd({{{kService, "deactivating"}}, {kPath}});
+  const FileDescriptor lock = TakeProcessLock(kRunnerLock, false);
+  ASSERT_TRUE(lock.IsOpen());
+  EXPECT_EQ(LeftToOthers({"--add", "/tmp/a"}),
+            "velathumb-queue: queued /tmp/a; the service is enabled, but has not been started: "
+            "systemctl start velathumb-queue.path velathumb-queue.timer\n");
+}
+
+TEST_F(AddTest, ARunnerThatIsAboutToEndDoesNotDoTheWorkOfAService) {
+  const FakeSystemd systemd({{}, {kPath}});
+  FileDescriptor lock = TakeProcessLock(kRunnerLock, false);
+  ASSERT_TRUE(lock.IsOpen());
+  Program runner = velathumb_.Start({"--add", "/tmp/a"});
+  ASSERT_TRUE(WaitUntilExists(kQueueFile));
+  EXPECT_FALSE(runner.Wait(std::chrono::milliseconds(200)));
+  lock.Reset();
+  ExpectEnd(runner, 0);
+  EXPECT_EQ(runner.Error(),
+            "velathumb-queue: queued /tmp/a; the service is enabled, but has not been started: "
+            "systemctl start velathumb-queue.path velathumb-queue.timer\n");
+}
+
+TEST_F(AddTest, ASystemdThatDoesNotAnswerMayHaveAService) {
+  const Descriptor silent = MakeSilentSystemd();
+  EXPECT_EQ(LeftToOthers({"--add", "/tmp/a"}),
+            "velathumb-queue: queued /tmp/a; but systemd does not answer: unless "
+            "velathumb-queue.service does the work, start velathumb-queue\n");
 }
 
 TEST_F(AddTest, ASystemdThatDoesNotAnswerIsNotWaitedFor) {

@@ -15,6 +15,9 @@ using namespace ::testing;
 /// What systemd is told when only a change of the configuration helps.
 constexpr int kMisconfigured = 78;
 
+/// Shorter than the runner waits for the writer of a profile, longer than it takes to give up.
+constexpr std::chrono::milliseconds kMoment(200);
+
 class CommandCheckTest : public QueueTest {
  protected:
   /// Fails the test unless the runner ends with the status for a wrong configuration, has started
@@ -104,6 +107,59 @@ TEST_F(CommandCheckTest, AnEntryWhoseProfileHasBecomeUnusableIsNotDone) {
 
 TEST_F(CommandCheckTest, ARunnerThatFollowsTheQueueEndsAsWell) {
   EndOfRun(StubPlan().Remove(kProfiles), {"--follow"});
+}
+
+TEST_F(CommandCheckTest, AProfileThatIsBeingWrittenAtTheStartIsWaitedFor) {
+  const std::string profile = ReadFile(kProfiles);
+  for (const char* unfinished : {"", "[thumb_s]\nfilename=VELAPHOTO_THUMB_S.jpg\nphase=2\n"}) {
+    WriteFile(kProfiles, unfinished);
+    Enqueue({"/tmp/a"});
+    const size_t starts = velathumb_.Entries().size();
+    Program runner = velathumb_.Start();
+    EXPECT_FALSE(runner.Wait(kMoment)) << unfinished;
+    WriteFile(kProfiles, profile);
+    ExpectEnd(runner, 0);
+    EXPECT_EQ(velathumb_.Entries().size(), starts + 1);
+    EXPECT_THAT(runner.Error(), Not(HasSubstr("profile"))) << unfinished;
+  }
+}
+
+TEST_F(CommandCheckTest, AProfileThatIsBeingWrittenDuringAnEntryIsWaitedFor) {
+  const std::string profile = ReadFile(kProfiles);
+  velathumb_.Stub().PlanCall(1, StubPlan().WriteFile(kProfiles, "").CreateFile("/tmp/here"));
+  Enqueue({"/tmp/a", "/tmp/b"});
+  Program runner = velathumb_.Start();
+  ASSERT_TRUE(WaitUntilExists("/tmp/here"));
+  EXPECT_FALSE(runner.Wait(kMoment));
+  WriteFile(kProfiles, profile);
+  ExpectEnd(runner, 0);
+  EXPECT_THAT(velathumb_.Entries(), ElementsAre("/tmp/a", "/tmp/b", "/tmp/a"));
+  ExpectQueueDone();
+}
+
+TEST_F(CommandCheckTest, AProfileThatIsBeingWrittenWhenEntriesComeIsWaitedFor) {
+  const std::string profile = ReadFile(kProfiles);
+  Program runner = velathumb_.Start({"--follow"});
+  EXPECT_FALSE(runner.Wait(kMoment));
+  WriteFile(kProfiles, "");
+  Enqueue({"/tmp/a"});
+  EXPECT_FALSE(runner.Wait(kMoment));
+  WriteFile(kProfiles, profile);
+  EXPECT_TRUE(velathumb_.WaitForStarts(1));
+  EXPECT_TRUE(WaitUntilGone(kTakenFile));
+  Stop(runner);
+}
+
+TEST_F(CommandCheckTest, ASignalEndsTheWaitForTheWriterOfAProfile) {
+  velathumb_.Stub().PlanCall(1, StubPlan().WriteFile(kProfiles, "").CreateFile("/tmp/here"));
+  Enqueue({"/tmp/a", "/tmp/b"});
+  Program runner = velathumb_.Start();
+  ASSERT_TRUE(WaitUntilExists("/tmp/here"));
+  EXPECT_FALSE(runner.Wait(kMoment));
+  Stop(runner);
+  EXPECT_EQ(ReadFile(kTakenFile), "/tmp/a\n/tmp/b\n");
+  EXPECT_EQ(velathumb_.Entries().size(), 1U);
+  EXPECT_THAT(runner.Error(), Not(HasSubstr("profile")));
 }
 
 TEST_F(CommandCheckTest, TheFaultIsLoggedOnceForAllJobs) {

@@ -151,6 +151,37 @@ TEST_F(PauseTest, ASlowAnswerIsValidForLonger) {
   EXPECT_EQ(daemon.Requests().size(), 1U);
 }
 
+bool WaitForCounter(const char* key, int value) {
+  for (int i = 0; i < 1000; ++i) {
+    if (GetConvProgress(THUMB_TYPE_PHOTO, key) == value) {
+      return true;
+    }
+    std::this_thread::sleep_for(std::chrono::milliseconds(10));
+  }
+  return false;
+}
+
+TEST_F(PauseTest, TheTotalsAreSetWhileTheServiceHasDisabledConversion) {
+  AddConvProgress(THUMB_TYPE_PHOTO, "total", 8);
+  AddConvProgress(THUMB_TYPE_PHOTO, "completed", 8);
+  MakePhoto("/tmp/a/1.jpg");
+  MakePhoto("/tmp/a/2.jpg");
+  DaemonPeer daemon;
+  daemon.Answer(kSwitch, SwitchedOff(true));
+  Enqueue({"/tmp/a"});
+  Program runner = velathumb_.Start();
+  EXPECT_TRUE(WaitForCounter("total", 2));
+  EXPECT_EQ(GetConvProgress(THUMB_TYPE_PHOTO, "completed"), 0);
+  EXPECT_THAT(velathumb_.Entries(), IsEmpty());
+  // Comes during the pause.
+  MakePhoto("/tmp/a/3.jpg");
+  daemon.Answer(kSwitch, SwitchedOff(false));
+  ExpectEnd(runner, 0);
+  EXPECT_EQ(GetConvProgress(THUMB_TYPE_PHOTO, "total"), 3);
+  EXPECT_EQ(GetConvProgress(THUMB_TYPE_PHOTO, "completed"), 0);
+  EXPECT_THAT(velathumb_.Entries(), ElementsAre("/tmp/a"));
+}
+
 TEST_F(PauseTest, ARunnerThatIsStoppedBeforeItCountsKeepsTheTotals) {
   AddConvProgress(THUMB_TYPE_PHOTO, "total", 1000);
   Enqueue({"/tmp/a"});

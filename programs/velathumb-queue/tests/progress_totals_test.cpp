@@ -137,6 +137,21 @@ TEST_F(TotalsTest, AnAbortedScanSetsNothing) {
   ExpectCounters(50, 70, 70, 90);
 }
 
+TEST_F(TotalsTest, AnUpdateDoesNotTakeFailuresOutASecondTime) {
+  const StubTool converter(kConverterPath);
+  converter.Plan(StubPlan().Exit(1));
+  MakePhoto("/tmp/p/bad.jpg");
+  Enqueue({"/tmp/p"});
+  ConvertQueue();
+  ExpectCounters(1, 1, 1, 1);
+  ProgressTotals totals(false);
+  const auto goOn = [] { return false; };
+  totals.Set({"/tmp/p"}, goOn);
+  ExpectCounters(1, 2, 1, 2);
+  totals.Update({"/tmp/p"}, goOn);
+  ExpectCounters(1, 2, 1, 2);
+}
+
 /// All six size classes, in three phases.
 class AllPhasesTest : public TotalsTest {
  protected:

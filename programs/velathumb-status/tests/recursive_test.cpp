@@ -6,8 +6,10 @@
 
 #include <cerrno>
 #include <sstream>
+#include <utility>
 
 #include "status_fixture.h"
+#include "status_scan.h"
 #include "storage/deep_files.h"
 #include "support/mounts.h"
 #include "support/seccomp_fail.h"
@@ -208,6 +210,41 @@ TEST_F(TreeStatusTest, DirectoriesTooDeepForAPathAreErrorsAndTheRestIsReported) 
   EXPECT_EQ(answer.Names().back(), "/tmp/other");
   EXPECT_EQ(answer.totals.name, "in 22 directories");
   EXPECT_EQ(answer.totals.numbers.photos, 21);
+}
+
+/// Removes a directory as soon as the first one is scanned.
+class RemovingSink : public vela::StatusSink {
+ public:
+  explicit RemovingSink(std::string directory) : directory_(std::move(directory)) {}
+
+  void BeginDirectory() override { RemoveTree(directory_); }
+  void EndDirectory(const vela::DirectoryReport& directory) override {
+    scanned.push_back(directory.path);
+  }
+
+  std::vector<std::string> scanned;
+
+ private:
+  const std::string directory_;
+};
+
+TEST_F(TreeStatusTest, ADirectoryThatIsRemovedDuringTheScanIsNoError) {
+  MakeDirectories(In("gone/below"));
+  MakeDirectories(In("kept"));
+  RemovingSink sink(In("gone"));
+  std::vector<std::string> errors;
+  const vela::ScanErrorHandler note = [&](const std::string& path, const std::string& message) {
+    errors.push_back(path + ": " + message);
+  };
+  vela::ScanOptions options;
+  options.recursive = true;
+  vela::ScanStatus({kTop}, options, sink, note);
+  EXPECT_THAT(sink.scanned, ElementsAre(kTop, In("kept")));
+  EXPECT_THAT(errors, IsEmpty());
+  // The root itself was asked for.
+  RemoveTree(kTop);
+  vela::ScanStatus({kTop}, options, sink, note);
+  EXPECT_THAT(errors, ElementsAre(std::string(kTop) + ": No such file or directory"));
 }
 
 TEST_F(TreeStatusTest, AnIncompleteWalkIsAnError) {

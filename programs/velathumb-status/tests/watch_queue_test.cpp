@@ -1,11 +1,13 @@
 // Following the conversion while no velathumb is running: its queue, its runner and its pauses.
 #include <chrono>
 #include <ctime>
+#include <sstream>
 #include <thread>
 
 #include "platform/velaindex.h"
 #include "posix/file_lock.h"
 #include "progress/velamk_progress.h"
+#include "progress_watch.h"
 #include "status_fixture.h"
 
 namespace vela_test {
@@ -81,6 +83,13 @@ TEST_F(WatchingTheQueue, DoesNotEndBeforeTakenEntriesAreDone) {
   EXPECT_THAT(EndOf(watch), EndsWith("no velathumb is running\n"));
 }
 
+TEST_F(WatchingTheQueue, EndsWhenAnotherSpellingOfTheEntryIsDone) {
+  WriteFile(kPhotosInProgress, "/tmp//a/\nR:/tmp/./b\n");
+  WriteFile(kDonePhotos, "/tmp/a\nR:/tmp/b/\n");
+  Program watch = Start();
+  EXPECT_THAT(EndOf(watch), EndsWith("no velathumb is running\n"));
+}
+
 TEST_F(WatchingTheQueue, EndsWhenOnlyDeferredEntriesAreLeft) {
   WriteFile(kDeferredPhotos, "/tmp/a\n");
   WriteFile(kPhotoQueue, "\n\n");
@@ -112,6 +121,20 @@ TEST_F(WatchingTheQueue, ShowsAPauseWhileEntriesAreQueued) {
   RemoveTree(kPhotoQueue);
   EXPECT_THAT(EndOf(watch), EndsWith("no velathumb is running\n"
                                      "conversion is paused indefinitely (resume time -1)\n"));
+}
+
+TEST_F(WatchingTheQueue, EndsWhenNothingProcessesTheQueue) {
+  WriteFile(kPhotoQueue, "/tmp/a\n");
+  std::ostringstream out;
+  EXPECT_TRUE(vela::WatchProgress(out, false, false, milliseconds(50)));
+  EXPECT_THAT(
+      out.str(),
+      AllOf(StartsWith(kWaiting),
+            EndsWith("no velathumb is running\nthe queue has entries, but nothing processes "
+                     "them; velathumb-queue would\n")));
+  std::ostringstream json;
+  EXPECT_TRUE(vela::WatchProgress(json, false, true, milliseconds(50)));
+  EXPECT_EQ(ReadJson(json.str())["activity"], Json::Value("waiting"));
 }
 
 TEST_F(WatchingTheQueue, JsonTellsTheActivity) {
