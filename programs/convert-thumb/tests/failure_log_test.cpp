@@ -100,9 +100,9 @@ TEST_F(FailureLog, SaysThatImageMagickIsMissing) {
   const std::string photo = MakeImage(directory_ + "/a.bmp", 300, 200);
   const WithoutImageMagick without;
   EXPECT_EQ(Fail(photo).err,
-            "convert-thumb: /usr/bin/convert-im6.q16: No such file or directory\n");
-  EXPECT_EQ(ErrorLines(), Lines{"convert-thumb: /tmp/converter/a.bmp: ImageMagick: "
-                                "/usr/bin/convert-im6.q16: No such file or directory"});
+            std::string("convert-thumb: ") + kImageMagick + ": No such file or directory\n");
+  EXPECT_EQ(ErrorLines(), Lines{std::string("convert-thumb: /tmp/converter/a.bmp: ImageMagick: ") +
+                                kImageMagick + ": No such file or directory"});
 }
 
 TEST_F(FailureLog, IsEmptyAfterASuccess) {
