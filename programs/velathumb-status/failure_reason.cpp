@@ -59,8 +59,8 @@ std::string NotStarted(const char* tool) {
 }
 
 std::string NoMessage(const char* tool) {
-  return std::string(tool) + " has ended without a message: it was killed, perhaps because " +
-         "tool_timeout was reached";
+  return std::string(tool) + " has ended without a message: it has crashed or was killed, " +
+         "perhaps because tool_timeout was reached";
 }
 
 std::string_view TakeLine(std::string_view& text) {

@@ -160,8 +160,8 @@ TEST_F(FailedPhotos, HaveAReasonWhenTheConverterIsKilled) {
   converter.Plan(StubPlan().DieBySignal(SIGKILL));
   MakeFailed("a.jpg");
   EXPECT_EQ(Reason(), std::string(kConverter) +
-                          " has ended without a message: it was killed, perhaps because "
-                          "tool_timeout was reached");
+                          " has ended without a message: it has crashed or was killed, "
+                          "perhaps because tool_timeout was reached");
 }
 
 TEST_F(FailedPhotos, HaveOneLineOfTheConverterAtMost500BytesLong) {
