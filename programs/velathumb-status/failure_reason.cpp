@@ -6,9 +6,13 @@
 #include <cstdint>
 #include <cstdio>
 #include <cstring>
+#include <optional>
 #include <string_view>
 
+#include "configuration/setting_values.h"
+#include "configuration/settings.h"
 #include "convert/photo_convert_job.h"
+#include "platform/system_rules.h"
 #include "platform/velaindex.h"
 #include "platform/vlibc.h"
 #include "posix/folder.h"
@@ -27,8 +31,9 @@ constexpr uint32_t kLargestSide = 1280;
 constexpr char kSizeHint[] = "jpeg:size=1280x1280";
 constexpr char kBox[] = "1280x1280>";
 
-/// A picture of more pixels may not fit into the memory that the converter allows ImageMagick.
-constexpr uint64_t kLargePhoto = 16'000'000;
+/// A picture that has less of the converter's memory for each pixel may not fit into what the
+/// converter allows ImageMagick: it needs several copies of 8 bytes per pixel.
+constexpr uint64_t kLeastBytesPerPixel = 34;
 /// In place of a directory for temporary files: none can be created.
 constexpr char kNoDirectory[] = "/dev/null";
 
@@ -59,8 +64,8 @@ std::string NotStarted(const char* tool) {
 }
 
 std::string NoMessage(const char* tool) {
-  return std::string(tool) + " has ended without a message: it was killed, perhaps because " +
-         "tool_timeout was reached";
+  return std::string(tool) + " has ended without a message: it has crashed or was killed, " +
+         "perhaps because tool_timeout was reached";
 }
 
 std::string_view TakeLine(std::string_view& text) {
@@ -124,6 +129,9 @@ std::string ReasonOfDcraw(const std::string& photo) {
     return NotStarted(kDcrawPath);
   }
   const ToolEnd end = AwaitTool(stream);
+  if (end.status == 0) {
+    return "its decoded form does not fit into /tmp";
+  }
   std::string_view output = end.output;
   const std::string_view line = TakeLine(output);
   return line.empty() ? NoMessage(kDcrawPath) : "dcraw: " + WithoutName(line, photo);
@@ -164,11 +172,19 @@ std::string FindLargestThumb(const PhotoReport& photo) {
   return largest;
 }
 
+/// Returns the bytes that the converter may use for one photo.
+uint64_t ConvertMemory() {
+  char text[64] = "";
+  VLIBCFileGetKeyValue(kSettingsFile, kConvertMemoryKey, text, sizeof text, 0);
+  const std::optional<size_t> limit = ParseByteCount(text);
+  return limit ? *limit : DefaultConvertMemory();
+}
+
 bool IsLarge(const std::string& photo) {
   uint32_t width = 0;
   uint32_t height = 0;
   return VELAIndexImgResGet(photo.c_str(), &width, &height) == 0 &&
-         uint64_t{width} * height > kLargePhoto;
+         uint64_t{width} * height > ConvertMemory() / kLeastBytesPerPixel;
 }
 
 /// Examines a photo for which files may have to be created.

@@ -26,17 +26,16 @@ void AddOptions(CLI::App& app, Options& options) {
   app.add_flag("-p,--photos", options.photos,
                "list incomplete photos with their missing, outdated and failed sizes")
       ->needs(directories);
-  app.add_flag("-r,--recursive", options.recursive, "include everything below the directories")
-      ->needs(directories);
+  app.add_flag("-r,--recursive", options.recursive, "include everything below the directories");
   auto* failed = app.add_flag(
       "--failed", options.failed,
       "list the failed photos of the directories, or of the current one, with their sizes, the "
       "time and the reason, for which the converter is run again");
   auto* json = app.add_flag("-j,--json", options.json, "write JSON");
-  app.add_flag("-0,--null", options.nulTerminated,
-               "with --failed, write only the paths, each followed by a null byte")
-      ->needs(failed)
-      ->excludes(json);
+  auto* null = app.add_flag("-0,--null", options.nulTerminated,
+                            "with --failed, write only the paths, each followed by a null byte")
+                   ->needs(failed)
+                   ->excludes(json);
   app.add_flag("--check-videos", options.checkVideos,
                "check videos too, with the index service; this REMOVES thumbnails of videos that "
                "are outdated or have the wrong orientation, and the Flash or MPEG-4 conversion of "
@@ -46,7 +45,8 @@ void AddOptions(CLI::App& app, Options& options) {
       ->type_name("FILE")
       ->needs(directories);
   auto* queue = app.add_flag("-q,--queue", options.queue, "show the entries of the queues");
-  app.add_flag("--progress", options.progress, "show the counters of conversion progress");
+  auto* progress =
+      app.add_flag("--progress", options.progress, "show the counters of conversion progress");
   auto* resumeTime =
       app.add_flag("--resume-time", options.resumeTime, "show until when conversion is paused");
   auto* security = app.add_flag("--security", options.security, "show how the tools are confined");
@@ -56,6 +56,10 @@ void AddOptions(CLI::App& app, Options& options) {
                           ->type_name("PROFILE")
                           ->expected(0, 1)
                           ->excludes(directories);
+  // Their texts are no paths.
+  for (CLI::Option* const report : {queue, progress, resumeTime, security, checkConfig}) {
+    null->excludes(report);
+  }
   app.add_flag("-w,--watch", options.watch,
                "follow the progress until nothing is running or queued")
       ->excludes(directories)
@@ -72,6 +76,9 @@ std::string FindContradiction(const Options& options) {
   const bool hasQuery = !options.directories.empty() || options.queue || options.progress ||
                         options.watch || options.resumeTime || options.security ||
                         options.checkConfig || options.failed;
+  if (options.recursive && options.directories.empty() && !options.failed) {
+    return "--recursive requires DIR or --failed";
+  }
   if (!hasQuery) {
     return "give a directory, --failed, --queue, --progress, --watch, --resume-time, --security or "
            "--check-config";

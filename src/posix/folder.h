@@ -16,6 +16,7 @@
 
 #include "posix/file_descriptor.h"
 #include "posix/files.h"
+#include "posix/signal_block.h"
 
 namespace vela {
 
@@ -147,7 +148,8 @@ int RemoveEntry(const std::string& path);
 std::string FindUnusedPath(const std::string& nameTemplate);
 
 /// A new directory in /tmp for files of this user's programs, which no other user can enter.
-/// Removed with its files, but not with directories in it, at the end.
+/// Removed with its files, but not with directories in it, at the end. SIGINT, SIGTERM and SIGHUP
+/// are blocked until then, so that they do not leave it behind.
 class ScratchDirectory {
  public:
   ScratchDirectory();
@@ -159,6 +161,7 @@ class ScratchDirectory {
   const std::string& Path() const { return path_; }
 
  private:
+  SignalBlock block_{SIGINT, SIGTERM, SIGHUP};
   std::string path_ = "/tmp/velathumb.XXXXXX";
 };
 

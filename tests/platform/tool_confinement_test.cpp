@@ -2,6 +2,7 @@
 #include "platform/standalone/tool_confinement.h"
 
 #include <sys/stat.h>
+#include <unistd.h>
 
 #include <algorithm>
 #include <cstdio>
@@ -161,6 +162,15 @@ TEST_F(ToolConfinement, ConverterReachesTheSystemLog) {
   InstallPerl(kConverterPath);
   OutputOf(kConverterPath, "-e", kLogging);
   EXPECT_THAT(ErrorLines(), ElementsAre("hello"));
+}
+
+TEST_F(ToolConfinement, ConverterThatIsALinkToAnotherProgramDoesNotReachTheSystemLog) {
+  InstallPerl("/usr/vela/bin/other");
+  RemoveTree(kConverterPath);
+  ASSERT_EQ(symlink("/usr/vela/bin/other", kConverterPath), 0);
+  const std::string program = std::string(kLogging) + "; print 'ended'";
+  EXPECT_EQ(OutputOf(kConverterPath, "-e", program.c_str()), "ended");
+  EXPECT_THAT(ErrorLines(), ElementsAre());
 }
 
 TEST_F(ToolConfinement, NothingThatAConverterScriptRunsReachesTheSystemLog) {

@@ -285,5 +285,23 @@ TEST_F(Folder, ScratchDirectoryIsPrivateAndGoesWithItsFiles) {
   EXPECT_TRUE(Exists(In("kept")));
 }
 
+/// Runs in a child, which it ends.
+void EndWithScratchDirectory(int signal) {
+  {
+    const ScratchDirectory scratch;
+    WriteFile(scratch.Path() + "/file", "content");
+    raise(signal);
+  }
+  _exit(0);
+}
+
+TEST_F(Folder, ScratchDirectoryIsNotLeftBehindByASignal) {
+  const std::vector<std::string> before = ListDirectory("/tmp");
+  for (const int signal : {SIGINT, SIGTERM, SIGHUP}) {
+    EXPECT_EXIT(EndWithScratchDirectory(signal), ::testing::KilledBySignal(signal), "");
+    EXPECT_EQ(ListDirectory("/tmp"), before) << signal;
+  }
+}
+
 }  // namespace
 }  // namespace vela_test

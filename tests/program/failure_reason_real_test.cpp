@@ -25,6 +25,35 @@ TEST_F(FailureReason, IsLoggedOnceForEachPhoto) {
   EXPECT_TRUE(HasThumbs(good, OfPhase(kinds_, 0)));
 }
 
+/// All files of photos that are neither thumbnails nor failure markers.
+Strings OtherFilesOf(const std::string& photo) {
+  Strings others;
+  for (const std::string& name : ListDirectory(MetadataDirOf(photo))) {
+    if (name.compare(0, 16, "VELAPHOTO_THUMB_") != 0) {
+      others.push_back(name);
+    }
+  }
+  return others;
+}
+
+TEST_F(FailureReason, IsLoggedForAnOptionOfTheProfileAndNothingIsLeftBehind) {
+  constexpr int kPasses = 5;
+  const DaemonPeer daemon;
+  WriteProfileFile(kProfiles, {{"thumb_XL", 100, 90, "foo", "VELAPHOTO_THUMB_XL.jpg", 0}});
+  const std::string photo = MakeJpeg(InPhotos("a.jpg"));
+  const Kind kind = {"XL", 100, false, 0};
+  for (int pass = 0; pass < kPasses; ++pass) {
+    Make();
+    EXPECT_TRUE(IsMarkedFailed(photo, {kind}));
+    EXPECT_THAT(OtherFilesOf(photo), IsEmpty());
+    RemoveTree(MarkerOf(photo, kind));
+  }
+  EXPECT_THAT(
+      ErrorLines(),
+      ::testing::AllOf(SizeIs(kPasses),
+                       ::testing::Each(::testing::StartsWith("convert-thumb: " + photo + ": "))));
+}
+
 }  // namespace
 
 }  // namespace vela_test::real

@@ -81,7 +81,8 @@ bool Finish(const HandedLine& handed, const ChildEnd& end) {
     return true;
   }
   RemoveHandedOutputs(handed);
-  if (!end.succeeded) {
+  // A stopped run says nothing about the photo.
+  if (!end.succeeded && !end.wasStopped) {
     LogFailureOf(end);
   }
   return false;

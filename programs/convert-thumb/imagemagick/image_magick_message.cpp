@@ -13,8 +13,9 @@ constexpr std::string_view kErrorSource = " @ error/";
 constexpr std::string_view kDescriptor = "/proc/self/fd/";
 
 /// Sources whose errors are consequences of what a decoder has reported before or after them.
-constexpr std::string_view kGeneralSources[] = {"cache.c",   "convert.c",   "image.c",
-                                                "mogrify.c", "operation.c", "resize.c"};
+constexpr std::string_view kGeneralSources[] = {"cache.c",     "convert.c",    "deprecate.c",
+                                                "image.c",     "magick-cli.c", "mogrify.c",
+                                                "operation.c", "resize.c"};
 
 std::string_view TakeLine(std::string_view& text) {
   const std::string_view line = text.substr(0, text.find('\n'));
@@ -47,12 +48,17 @@ std::string_view ChooseLine(std::string_view messages) {
   return best;
 }
 
-/// Removes the name that the photo or an output had for ImageMagick.
+/// Removes the name that the photo or an output had for ImageMagick, and the space before it.
+/// Version 7 quotes it with two apostrophes.
 void RemoveDescriptor(std::string& message) {
   const size_t descriptor = message.find(kDescriptor);
-  const size_t begin = message.rfind(" `", descriptor);
+  if (descriptor == std::string::npos) {
+    return;
+  }
+  const size_t quote = message.find_last_of("`'", descriptor);
   const size_t end = message.find('\'', descriptor);
-  if (descriptor != std::string::npos && begin != std::string::npos && end != std::string::npos) {
+  if (quote != std::string::npos && end != std::string::npos) {
+    const size_t begin = quote > 0 && message[quote - 1] == ' ' ? quote - 1 : quote;
     message.erase(begin, end + 1 - begin);
   }
 }

@@ -31,6 +31,7 @@ constexpr int kEndedBySignal = 128;
 constexpr size_t kMostErrors = 65536;
 
 volatile pid_t g_child = 0;
+volatile std::sig_atomic_t g_isStopped = 0;
 
 /// Two ends of a pipe.
 struct Pipe {
@@ -60,6 +61,7 @@ std::string PassErrorsOn(const FileDescriptor& reader) {
 
 void ForwardSignal(int signal) {
   const int error = errno;
+  g_isStopped = 1;
   kill(g_child, signal);
   errno = error;
 }
@@ -106,6 +108,7 @@ void ForwardSignals() {
   ChildEnd end;
   end.succeeded = WIFEXITED(waitStatus) && WEXITSTATUS(waitStatus) == 0;
   end.signal = WIFSIGNALED(waitStatus) ? WTERMSIG(waitStatus) : 0;
+  end.wasStopped = g_isStopped != 0;
   end.errors = std::move(errors);
   if (!finish(end) && end.succeeded) {
     PrintFailure();

@@ -13,9 +13,10 @@ void ReplaceProcess(const char* program, char* const* arguments);
 
 /// How a child has ended.
 struct ChildEnd {
-  bool succeeded = false;  ///< its exit status is 0
-  int signal = 0;          ///< that ended it; 0: none
-  std::string errors;      ///< the beginning of what it has written to standard error
+  bool succeeded = false;   ///< its exit status is 0
+  int signal = 0;           ///< that ended it; 0: none
+  bool wasStopped = false;  ///< a signal was forwarded to it; it may have ended in any way then
+  std::string errors;       ///< the beginning of what it has written to standard error
 };
 
 /// Runs the first of these programs that can be started in a child process and ends this process

@@ -46,7 +46,15 @@ constexpr FatalSignal kFatalSignals[] = {
     {SIGTRAP, "a library aborted, probably because it ran out of memory"},
     {SIGBUS, "the photo changed while it was being read"},
     {SIGXCPU, "the photo takes too much processor time"},
+#if !defined(VELA_SANITIZED)  // a sanitizer reports these itself
+    {SIGSEGV, "a library crashed on this photo"},
+    {SIGFPE, "a library crashed on this photo"},
+    {SIGILL, "a library crashed on this photo"},
+#endif
 };
+
+/// For a handler that runs because the stack is full: several times of what it needs.
+constexpr size_t kHandlerStackSize = size_t{64} << 10;
 
 bool IsSameFile(const struct stat& a, const struct stat& b) {
   return a.st_dev == b.st_dev && a.st_ino == b.st_ino;
@@ -85,6 +93,16 @@ void EndOnSignal(int number) {
     }
   }
   _exit(kFailed);
+}
+
+/// The stack of the calling thread can be full. In other threads a full stack ends the process at
+/// once.
+void UseHandlerStack() {
+  static char memory[kHandlerStackSize];
+  stack_t stack = {};
+  stack.ss_sp = memory;
+  stack.ss_size = sizeof memory;
+  sigaltstack(&stack, nullptr);
 }
 
 /// Creates the file of an output whose directory and name are set.
@@ -155,8 +173,10 @@ void RemoveOutputs() {
 }
 
 void CleanUpOnFatalSignals() {
+  UseHandlerStack();
   struct sigaction action = {};
   action.sa_handler = EndOnSignal;
+  action.sa_flags = SA_ONSTACK;
   sigfillset(&action.sa_mask);
   for (const FatalSignal& fatal : kFatalSignals) {
     sigaction(fatal.number, &action, nullptr);

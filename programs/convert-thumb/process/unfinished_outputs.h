@@ -27,8 +27,8 @@ bool SyncOutputs();
 void RemoveOutputs();
 
 /// From now on, signals after which the run cannot continue (out of memory in a library, a source
-/// that shrinks while it is being read, processor time used up) remove the outputs, print one line
-/// to standard error and end the process with status 1.
+/// that shrinks while it is being read, processor time used up, a crash) remove the outputs, print
+/// one line to standard error and end the process with status 1. Called by the main thread.
 void CleanUpOnFatalSignals();
 
 }  // namespace vela

@@ -100,9 +100,9 @@ TEST_F(FailureLog, SaysThatImageMagickIsMissing) {
   const std::string photo = MakeImage(directory_ + "/a.bmp", 300, 200);
   const WithoutImageMagick without;
   EXPECT_EQ(Fail(photo).err,
-            "convert-thumb: /usr/bin/convert-im6.q16: No such file or directory\n");
-  EXPECT_EQ(ErrorLines(), Lines{"convert-thumb: /tmp/converter/a.bmp: ImageMagick: "
-                                "/usr/bin/convert-im6.q16: No such file or directory"});
+            std::string("convert-thumb: ") + kImageMagick + ": No such file or directory\n");
+  EXPECT_EQ(ErrorLines(), Lines{std::string("convert-thumb: /tmp/converter/a.bmp: ImageMagick: ") +
+                                kImageMagick + ": No such file or directory"});
 }
 
 TEST_F(FailureLog, IsEmptyAfterASuccess) {
@@ -143,6 +143,49 @@ TEST_F(FailureLog, HasALineWhenALibraryAborts) {
   EXPECT_EQ(ErrorLines(), Lines{"convert-thumb: /tmp/converter/a.jpg: a library aborted, probably "
                                 "because it ran out of memory"});
 }
+
+TEST_F(FailureLog, HasALineWhenTheRunIsEndedBySignal) {
+  const struct {
+    int signal;
+    std::string reason;
+  } cases[] = {
+    {SIGBUS, "the photo changed while it was being read"},
+    {SIGXCPU, "the photo takes too much processor time"},
+#if !defined(__SANITIZE_ADDRESS__)  // AddressSanitizer reports crashes itself
+    {SIGSEGV, "a library crashed on this photo"},
+    {SIGFPE, "a library crashed on this photo"},
+    {SIGILL, "a library crashed on this photo"},
+#endif
+  };
+  Lines expected;
+  for (const auto& [signal, reason] : cases) {
+    EXPECT_EXIT(EndBySignal(signal), ExitedWithCode(1), "^convert-thumb: " + reason + "\n$")
+        << signal;
+    expected.push_back("convert-thumb: /tmp/converter/a.jpg: " + reason);
+  }
+  EXPECT_EQ(ErrorLines(), expected);
+}
+
+#if !defined(__SANITIZE_ADDRESS__)
+/// Uses up the stack of a process.
+int Recurse(int depth) {
+  volatile char page[4096];
+  page[0] = static_cast<char>(depth);
+  return depth < 0 ? 0 : Recurse(depth + 1) + page[0];
+}
+
+TEST_F(FailureLog, HasALineWhenTheStackIsFull) {
+  EXPECT_EXIT(
+      {
+        vela::LogFailuresOf("/tmp/converter/a.jpg");
+        vela::CleanUpOnFatalSignals();
+        _exit(Recurse(0));
+      },
+      ExitedWithCode(1), "^convert-thumb: a library crashed on this photo\n$");
+  EXPECT_EQ(ErrorLines(),
+            Lines{"convert-thumb: /tmp/converter/a.jpg: a library crashed on this photo"});
+}
+#endif
 
 /// The errors of sending through a connected socket, to it and to another one, after the process
 /// has confined itself: "0" for success.

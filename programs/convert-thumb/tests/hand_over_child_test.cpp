@@ -5,6 +5,7 @@
 #include "converter_fixture.h"
 #include "support/stub_files.h"
 #include "support/stub_tool.h"
+#include "support/system_log.h"
 
 namespace vela_test {
 namespace {
@@ -82,6 +83,15 @@ TEST_F(HandOverToChild, PassesSignalsOn) {
     EXPECT_EQ(result->signal, signal);
     EXPECT_FALSE(Exists(ProcessDirectory(child))) << signal;
   }
+  EXPECT_THAT(LogMessages(), IsEmpty()) << "the photo has not failed";
+}
+
+TEST_F(HandOverToChild, LogsTheSignalThatEndedIt) {
+  const StubTool stub(kImageMagick);
+  stub.Plan(StubPlan().DieBySignal(SIGKILL));
+  RunConverter(arguments_, Recorded());
+  EXPECT_THAT(ErrorLines(), ElementsAre("convert-thumb: /a.jpg: ImageMagick was ended by signal 9: "
+                                        "Killed"));
 }
 
 TEST_F(HandOverToChild, LeavesIgnoredSignalsIgnored) {

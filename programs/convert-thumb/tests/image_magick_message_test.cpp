@@ -49,6 +49,19 @@ INSTANTIATE_TEST_SUITE_P(
                  "one"},
         Messages{{"OnlyAWarning"}, "convert-im6.q16: odd @ warning/tiff.c/A/1.\n", "odd"},
         Messages{{"NoImageMagick"}, "sh: not found\n", "sh: not found"},
+        Messages{{"Version7"},
+                 "convert-im7.q16: improper image header '/proc/self/fd/3' @ "
+                 "error/bmp.c/ReadBMPImage/700.\n",
+                 "improper image header"},
+        Messages{{"Version7WithTextAfterTheName"},
+                 "convert-im7.q16: unable to open 'jpg:/proc/self/fd/7': No space left on device "
+                 "@ error/blob.c/OpenBlob/3596.\n",
+                 "unable to open: No space left on device"},
+        Messages{{"Version7DecoderAfterConsequences"},
+                 "convert-im7.q16: no images '/proc/self/fd/3' @ error/deprecate.c/A/1.\n"
+                 "convert-im7.q16: failed '/proc/self/fd/3' @ error/magick-cli.c/B/2.\n"
+                 "convert-im7.q16: Bogus table '/proc/self/fd/3' @ error/jpeg.c/C/3.\n",
+                 "Bogus table"},
         Messages{{"TextAboutOptions"},
                  "convert-im6.q16: invalid argument for option `-unsharp': foo @ "
                  "error/convert.c/ConvertImageCommand/3104.\n",

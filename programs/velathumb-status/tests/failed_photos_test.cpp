@@ -1,8 +1,11 @@
 // The list of failed photos with their reasons.
+#include <sys/resource.h>
+
 #include <csignal>
 
 #include "status_fixture.h"
 #include "support/images.h"
+#include "support/raw_photos.h"
 #include "support/stub_files.h"
 #include "support/stub_tool.h"
 #include "support/system_log.h"
@@ -136,6 +139,13 @@ TEST_F(FailedPhotos, AreThoseOfTheWorkingDirectoryByDefault) {
   EXPECT_EQ(RunStatus({"--failed", "-0"}, options).out, In("a.jpg") + '\0');
 }
 
+TEST_F(FailedPhotos, AreThoseBelowTheWorkingDirectoryOnRequest) {
+  MakeFailed("a.jpg");
+  ProgramOptions options;
+  options.workingDirectory = "/tmp";
+  EXPECT_EQ(RunStatus({"--failed", "-0", "-r"}, options).out, In("a.jpg") + '\0');
+}
+
 TEST_F(FailedPhotos, ArePathsWithNullBytesOnRequestWithoutRunningAnything) {
   const StubTool converter(kConverter);
   MakeFailed("a.jpg");
@@ -160,8 +170,35 @@ TEST_F(FailedPhotos, HaveAReasonWhenTheConverterIsKilled) {
   converter.Plan(StubPlan().DieBySignal(SIGKILL));
   MakeFailed("a.jpg");
   EXPECT_EQ(Reason(), std::string(kConverter) +
-                          " has ended without a message: it was killed, perhaps because "
-                          "tool_timeout was reached");
+                          " has ended without a message: it has crashed or was killed, "
+                          "perhaps because tool_timeout was reached");
+}
+
+TEST_F(FailedPhotos, HaveAReasonWhenThereIsNoSpaceForTheDecodedPhoto) {
+  MakeRawPhoto(In("a.dng"));
+  MarkAll("a.dng");
+  ProgramOptions options;
+  options.addedEnvironment = {"TZ=UTC"};
+  options.beforeExec = {LimitResource(RLIMIT_FSIZE, 1000), IgnoreSignal(SIGXFSZ)};
+  EXPECT_EQ(RunStatus({"--failed", kTop}, options).out,
+            Line("a.dng", "its decoded form does not fit into /tmp"));
+}
+
+/// The directory for temporary files that the last run of the converter was given.
+std::string LastScratchDirectory(const StubTool& converter) {
+  const std::string define = converter.Calls().back().Parameters().at(1);
+  return define.substr(define.find('=') + 1);
+}
+
+TEST_F(FailedPhotos, HaveFilesOnlyIfTheyDoNotFitIntoTheMemoryOfTheConverter) {
+  const StubTool converter(kConverter);
+  WriteFile(In("a.jpg"), ReadFile(MakeImage("/tmp/whole.jpg", 300, 200)));
+  MarkAll("a.jpg");
+  Reason();
+  EXPECT_EQ(LastScratchDirectory(converter), "/dev/null");
+  WriteFile("/etc/velainfo.conf", "convert_memory_limit=\"1M\"\n");
+  Reason();
+  EXPECT_THAT(LastScratchDirectory(converter), StartsWith("/tmp/velathumb."));
 }
 
 TEST_F(FailedPhotos, HaveOneLineOfTheConverterAtMost500BytesLong) {

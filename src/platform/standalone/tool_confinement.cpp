@@ -1,6 +1,8 @@
 #include "platform/standalone/tool_confinement.h"
 
 #include <algorithm>
+#include <cstdlib>
+#include <memory>
 #include <string>
 #include <string_view>
 #include <thread>
@@ -148,8 +150,23 @@ constexpr Tool kTools[] = {{"convert-thumb", AllowConverter, ResourceLimits::kNo
                            {"exiftool", AllowExiftool, kToolMemory, false, false},
                            {"compare", AllowCompare, kToolMemory, true, false}};
 
+std::string_view NameOf(std::string_view path) {
+  return path.substr(path.rfind('/') + 1);
+}
+
+struct FreeMemory {
+  void operator()(char* memory) const { std::free(memory); }
+};
+
+/// Returns whether the file at this path is a program and has the same name there. Another program
+/// may have been linked to the path, and a script does not confine what it runs.
+bool IsProgramItself(const char* path) {
+  const std::unique_ptr<char, FreeMemory> file(realpath(path, nullptr));
+  return file && NameOf(file.get()) == NameOf(path) && !BeginsWith(path, "#!");
+}
+
 const Tool* FindTool(std::string_view program) {
-  const std::string_view name = program.substr(program.rfind('/') + 1);
+  const std::string_view name = NameOf(program);
   const auto* const found = std::find_if(std::begin(kTools), std::end(kTools),
                                          [&](const Tool& tool) { return tool.name == name; });
   return found == std::end(kTools) ? nullptr : found;
@@ -199,8 +216,7 @@ Confinement ConfinementOfTool(const char* program, char* const arguments[],
   for (char* const* argument = arguments; *argument != nullptr; ++argument) {
     list.emplace_back(*argument);
   }
-  // A script in place of the program does not confine what it runs.
-  if (tool->logsFailures && !BeginsWith(program, "#!")) {
+  if (tool->logsFailures && IsProgramItself(program)) {
     confinement.sockets = SocketUse::kLocalDatagrams;
   }
   confinement.files = FilesOfEveryProgram();
