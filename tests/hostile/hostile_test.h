@@ -29,7 +29,7 @@ constexpr const char* kVictimMetadata = "/tmp/victim/metadata";
 constexpr int kPrivateColour = 40;
 
 /// Time limit for a run over a few photos, however it is disturbed.
-constexpr std::chrono::seconds kSoon(20);
+constexpr std::chrono::seconds kSoon(120);
 
 /// HasOtherUsers(). Where it is false, says that the calling test cannot check anything: links of
 /// user 0 may always be followed.

@@ -146,7 +146,7 @@ std::vector<std::string> RecordingVelathumb::Entries() const {
 }
 
 bool RecordingVelathumb::WaitForStarts(size_t count) const {
-  return WaitUntil([&] { return stub_.Calls().size() >= count; }, 10000);
+  return WaitUntil([&] { return stub_.Calls().size() >= count; }, 60000);
 }
 
 std::vector<std::string> RecordingVelathumb::Arguments(const std::vector<std::string>& more) const {
