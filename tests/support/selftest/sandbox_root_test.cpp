@@ -99,8 +99,8 @@ TEST_P(SandboxRoot, IsNotChangedForTheMachine) {
 }
 
 INSTANTIATE_TEST_SUITE_P(Kinds, SandboxRoot,
-                         testing::Values(RootCase{"Directory", false},
-                                         RootCase{"MountPoint", true}),
+                         testing::Values(RootCase{{"Directory"}, false},
+                                         RootCase{{"MountPoint"}, true}),
                          CaseName());
 
 }  // namespace
