@@ -1,4 +1,4 @@
-// Adding entries: who does the work, and what the user is told.
+// Adding entries: who does the work, and the message to the user.
 #include <fcntl.h>
 #include <grp.h>
 #include <sched.h>

@@ -12,7 +12,7 @@ namespace {
 
 using namespace ::testing;
 
-/// What systemd is told when only a change of the configuration helps.
+/// Exit status when only a change of the configuration helps.
 constexpr int kMisconfigured = 78;
 
 /// Shorter than the runner waits for the writer of a profile, longer than it takes to give up.
