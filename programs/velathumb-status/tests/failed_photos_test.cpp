@@ -121,6 +121,21 @@ TEST_F(FailedForReal, AreNeitherChangedNorLoggedNorIsAnythingLeftBehind) {
   EXPECT_THAT(LogMessages(), IsEmpty());
 }
 
+TEST_F(FailedForReal, HaveTheErrorOfTheProfileAsReasonWhenNothingElseIsWrong) {
+  WriteFile(In("a.jpg"), ReadFile(MakeJpeg("/tmp/whole.jpg")));
+  MarkAll("a.jpg");
+  const std::string profile = "/etc/velathumb/thumb-profiles.conf";
+  const std::string begin = "[thumb_s]\nfilename = VELAPHOTO_THUMB_S.jpg\nsize = 120\n";
+  WriteFile(profile, begin + "unsharp = foo\n");
+  EXPECT_THAT(Reason(),
+              StartsWith("it can be converted, but not with the profile " + profile +
+                         ": line 4: unsharp is not RADIUSxSIGMA+AMOUNT+THRESHOLD, such as "
+                         "0x0.8+0.5+0.01: \"foo\""));
+  WriteFile(profile, begin + "unsharp = 0x0.8+0.5+0.01\n");
+  EXPECT_THAT(Reason(), StartsWith("it can be converted now: the cause is gone, or it is in the "
+                                   "profile"));
+}
+
 TEST_F(FailedForReal, OfLaterPhasesAreMadeFromTheLargestThumbnail) {
   WriteFile(In("a.jpg"), "no photo");
   SetFileTime(In("a.jpg"), kFailureTime);
