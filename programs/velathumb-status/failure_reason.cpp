@@ -226,9 +226,9 @@ std::string FindFailureReason(const PhotoReport& photo) {
 }
 
 std::string ReasonFinder::Find(const PhotoReport& photo) {
-  if (photos_ >= kMostPhotos || time_ >= kLongest) {
+  if (photos_ >= kMostPhotos || time_ >= longest_) {
     return "not examined: only the first " + std::to_string(kMostPhotos) + " failed photos are, " +
-           "for " + std::to_string(kLongest.count()) + " seconds";
+           "for " + std::to_string(longest_.count()) + " seconds";
   }
   ++photos_;
   const auto begin = std::chrono::steady_clock::now();
