@@ -7,7 +7,7 @@ namespace vela {
 
 /// What the daemon says.
 struct PhotoSwitch {
-  bool isOff = false;         ///< photos must not be converted; false without a valid answer
+  bool isOff = false;              ///< photos must not be converted; false without a valid answer
   bool isNobodyListening = false;  ///< no daemon listens
 };
 
