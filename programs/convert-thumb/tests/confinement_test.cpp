@@ -27,6 +27,7 @@
 #include "command_line/allowed_files.h"
 #include "converter_fixture.h"
 #include "process/confinement.h"
+#include "support/child_call.h"
 #include "support/seccomp_fail.h"
 
 using namespace vela;
@@ -38,23 +39,6 @@ constexpr char kInside[] = "/tmp/inside";
 constexpr char kOutside[] = "/tmp/outside";
 constexpr char kInput[] = "/tmp/outside/input";
 constexpr char kData[] = "/tmp/data";
-
-/// The errno of a failed call, 0 on success.
-int ErrorOf(long result) {
-  return result < 0 ? errno : 0;
-}
-
-/// The result of `attempt` (0 to 255) in a separate process.
-int InChild(const std::function<int()>& attempt) {
-  const pid_t child = fork();
-  if (child == 0) {
-    _exit(attempt());
-  }
-  int status = 0;
-  EXPECT_EQ(waitpid(child, &status, 0), child);
-  EXPECT_TRUE(WIFEXITED(status));
-  return WEXITSTATUS(status);
-}
 
 AllowedFiles FilesInside() {
   AllowedFiles files;
