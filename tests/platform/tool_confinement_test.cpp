@@ -149,7 +149,7 @@ TEST_F(ToolConfinement, ConverterThatTurnsAPictureWritesOnlyInItsDirectory) {
               ElementsAre("wrote /tmp/turned/x", "scratch /tmp/turned"));
 }
 
-/// Returns those of the files that a converter with these arguments, started in /tmp/work, could
+/// Returns those of the files that a converter with these arguments, started in /tmp/here, could
 /// write to.
 Strings FilesWritten(const Strings& files, const Strings& arguments) {
   std::string script = "#!/bin/sh\n";
@@ -173,8 +173,8 @@ class OutputsOfTheConverter : public ToolConfinement {
       GTEST_SKIP() << "the kernel has no Landlock";
     }
     ToolConfinement::SetUp();
-    MakeDirectories("/tmp/work");
-    ASSERT_EQ(chdir("/tmp/work"), 0);
+    MakeDirectories("/tmp/here");
+    ASSERT_EQ(chdir("/tmp/here"), 0);
   }
   void TearDown() override {
     EXPECT_EQ(chdir("/"), 0);
@@ -183,23 +183,23 @@ class OutputsOfTheConverter : public ToolConfinement {
 };
 
 TEST_F(OutputsOfTheConverter, OpenNoDirectoryWhenTheyAreDiscarded) {
-  EXPECT_THAT(FilesWritten({"/dev/null", "/dev/x", "/tmp/work/jpg:/dev/x", "/tmp/work/x"},
+  EXPECT_THAT(FilesWritten({"/dev/null", "/dev/x", "/tmp/here/jpg:/dev/x", "/tmp/here/x"},
                            {kPhoto, "jpg:/dev/null"}),
               ElementsAre("/dev/null"));
-  EXPECT_THAT(FilesWritten({"/tmp/work/jpg:/dev/x", "/tmp/out/x"},
+  EXPECT_THAT(FilesWritten({"/tmp/here/jpg:/dev/x", "/tmp/out/x"},
                            {kPhoto, "-write", "jpg:/dev/null", "/tmp/out/b.jpg"}),
               ElementsAre("/tmp/out/x"));
 }
 
 TEST_F(OutputsOfTheConverter, OpenOnlyTheirRelativeDirectoryWhenItBeginsLikeAFormat) {
-  EXPECT_THAT(FilesWritten({"/tmp/out/x", "/tmp/work/jpg:/tmp/out/x", "/tmp/work/x"},
+  EXPECT_THAT(FilesWritten({"/tmp/out/x", "/tmp/here/jpg:/tmp/out/x", "/tmp/here/x"},
                            {kPhoto, "jpg:/tmp/out/b.jpg"}),
-              ElementsAre("/tmp/work/jpg:/tmp/out/x"));
+              ElementsAre("/tmp/here/jpg:/tmp/out/x"));
   EXPECT_THAT(
-      FilesWritten({"/tmp/work/a:b/x", "/tmp/work/b/x", "/tmp/work/x"}, {kPhoto, "a:b/b.jpg"}),
-      ElementsAre("/tmp/work/a:b/x"));
-  EXPECT_THAT(FilesWritten({"/dev/x", "/tmp/work/jpg:/dev/x"}, {kPhoto, "jpg:/dev/null.jpg"}),
-              ElementsAre("/tmp/work/jpg:/dev/x"));
+      FilesWritten({"/tmp/here/a:b/x", "/tmp/here/b/x", "/tmp/here/x"}, {kPhoto, "a:b/b.jpg"}),
+      ElementsAre("/tmp/here/a:b/x"));
+  EXPECT_THAT(FilesWritten({"/dev/x", "/tmp/here/jpg:/dev/x"}, {kPhoto, "jpg:/dev/null.jpg"}),
+              ElementsAre("/tmp/here/jpg:/dev/x"));
 }
 
 TEST_F(OutputsOfTheConverter, OpenNoOtherDirectoryOfTheSameNameWithFewerPercentSigns) {
