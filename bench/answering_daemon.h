@@ -1,11 +1,11 @@
-// A plugin daemon with the lowest possible cost.
+// An index daemon with the lowest possible cost.
 #pragma once
 
 #include <thread>
 
 namespace vela_bench {
 
-/// Answers every request on the plugin daemon's socket immediately, until it is destroyed.
+/// Answers every request on the index daemon's socket immediately, until it is destroyed.
 class AnsweringDaemon {
  public:
   AnsweringDaemon();

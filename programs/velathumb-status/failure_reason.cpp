@@ -121,7 +121,7 @@ std::string ReasonOfConverter(const std::string& source, const std::string& scra
       VLIBCPopen(kConvertToolPath, "rBE", "-define", define.c_str(),
                  (source + (hasPages ? "[0]" : "")).c_str(), "-define", kSizeHint, "-thumbnail",
                  kBox, "-quality", "90", "+profile", "!icc,*", "-flatten", "-auto-orient",
-                 "-colorspace", "sRGB", "jpg:/dev/null", nullptr);
+                 "-colorspace", "sRGB", kDiscardedOutput, nullptr);
   if (stream == nullptr) {
     return NotStarted(kConvertToolPath);
   }

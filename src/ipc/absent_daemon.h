@@ -1,4 +1,4 @@
-// What is known about the plugin daemon before a program asks it.
+// What is known about the index daemon before a program asks it.
 #pragma once
 
 #include <cerrno>

@@ -1,10 +1,10 @@
-// Client of the media-index plugin daemon: one JSON request and one JSON reply per call, no state
+// Client of the index daemon: one JSON request and one JSON reply per call, no state
 // between calls. Safe to call from any thread.
 #pragma once
 
 struct VELA_MEDIA_INFO;
 
-/// The plugin daemon's socket.
+/// The index daemon's socket.
 inline constexpr char PluginDaemonSocketPath[] = "/tmp/velaindexplugind_sock";
 
 /// Asks for the media record of `path` (`type` is a THUMB_TYPE). Returns 0 and fills `out`, or -1

@@ -17,6 +17,10 @@ inline constexpr uint64_t kLeastFreeSpace = uint64_t{1} << 30;
 /// Marks an argument or a queue entry as a directory tree.
 inline constexpr char kTreePrefix[] = "R:";
 
+/// As an output of the converter, the null device: the run only finds out whether the photo can be
+/// converted. With the prefix, ImageMagick writes a JPEG to it as well.
+inline constexpr char kDiscardedOutput[] = "jpg:/dev/null";
+
 /// The tools that are not confined: a file that only root can change, with the absolute path of a
 /// program on each line. It exists only if an administrator has made it.
 inline constexpr char kUnconfinedToolsFile[] = "/usr/vela/etc/unconfined-tools";

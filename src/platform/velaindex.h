@@ -1,5 +1,5 @@
 // Indexing library of the platform: media kinds, metadata files, size maps, media records, queues
-// and the exchange with the plugin daemon. All paths are NUL-terminated byte strings.
+// and the exchange with the index daemon. All paths are NUL-terminated byte strings.
 #pragma once
 
 #include <json/forwards.h>
@@ -7,7 +7,7 @@
 #include <cstddef>
 #include <cstdint>
 
-/// Media kinds, as the size-map queries, the progress files and the plugin daemon number them.
+/// Media kinds, as the size-map queries, the progress files and the index daemon number them.
 enum THUMB_TYPE { THUMB_TYPE_PHOTO = 1, THUMB_TYPE_VIDEO = 2 };
 
 /// The index library's record of one media file.

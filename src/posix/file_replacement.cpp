@@ -107,11 +107,13 @@ int ScratchFile::OpenOnce(bool& isReady) {
   return 0;
 }
 
-/// Also returns what some file systems report only when a file is closed, such as an exceeded
-/// quota. The file itself stays open, because closing it would release its lock.
-int WriteCompletely(int fd, std::string_view content) {
-  const int error = WriteAll(fd, content);
-  return error != 0 ? error : FlushFile(fd);
+/// Makes the file with this content. Also returns what some file systems report only when a file is
+/// closed, such as an exceeded quota. The file itself stays open, because closing it would release
+/// its lock.
+int Make(ScratchFile& scratch, std::string_view content) {
+  int error = scratch.Open();
+  error = error != 0 ? error : WriteAll(scratch.Fd(), content);
+  return error != 0 ? error : FlushFile(scratch.Fd());
 }
 
 /// Renames unless `to` exists. Returns 0 or an errno value.
@@ -133,11 +135,7 @@ int RenameToFreeName(const char* from, const char* to) {
 
 int CreateAtomically(const std::string& path, std::string_view content) {
   ScratchFile scratch(path);
-  int error = scratch.Open();
-  if (error != 0) {
-    return error;
-  }
-  error = WriteCompletely(scratch.Fd(), content);
+  int error = Make(scratch, content);
   if (error != 0) {
     return error;
   }
@@ -153,12 +151,7 @@ int CreateAtomically(const std::string& path, std::string_view content) {
 
 int ReplaceAtomically(const std::string& path, std::string_view content, const struct stat& old) {
   ScratchFile scratch(path);
-  int error = scratch.Open();
-  if (error != 0) {
-    return error;
-  }
-  error = WriteCompletely(scratch.Fd(), content);
-  if (error != 0) {
+  if (const int error = Make(scratch, content); error != 0) {
     return error;
   }
   const struct stat& own = scratch.Status();

@@ -10,7 +10,7 @@
 /// it (whole seconds), else 0; also 0 when the media file cannot be examined, which is logged.
 int IsEAThumbOutdated(const char* path, const char* name);
 
-/// Returns 1 when the plugin daemon's record of `path` is portrait, else 0; an unknown
+/// Returns 1 when the index daemon's record of `path` is portrait, else 0; an unknown
 /// record is logged.
 int IsMediaPortraitInDB(const char* path);
 

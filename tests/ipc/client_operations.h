@@ -1,4 +1,4 @@
-// The six operations of the plugin daemon's client, for tests that loop over all of them.
+// The six operations of the index daemon's client, for tests that loop over all of them.
 #pragma once
 
 #include <json/json.h>

@@ -149,6 +149,70 @@ TEST_F(ToolConfinement, ConverterThatTurnsAPictureWritesOnlyInItsDirectory) {
               ElementsAre("wrote /tmp/turned/x", "scratch /tmp/turned"));
 }
 
+/// Returns those of the files that a converter with these arguments, started in /tmp/here, could
+/// write to.
+Strings FilesWritten(const Strings& files, const Strings& arguments) {
+  std::string script = "#!/bin/sh\n";
+  for (const std::string& file : files) {
+    MakeDirectories(file.substr(0, file.rfind('/')));
+    script += "{ true >'" + file + "'; } 2>/dev/null && echo '" + file + "'\n";
+  }
+  InstallProgram(kConverterPath, script);
+  std::vector<const char*> list;
+  for (const std::string& argument : arguments) {
+    list.push_back(argument.c_str());
+  }
+  list.resize(5);
+  return Lines(OutputOf(kConverterPath, list[0], list[1], list[2], list[3], list[4]));
+}
+
+class OutputsOfTheConverter : public ToolConfinement {
+ protected:
+  void SetUp() override {
+    if (!HasLandlock()) {
+      GTEST_SKIP() << "the kernel has no Landlock";
+    }
+    ToolConfinement::SetUp();
+    MakeDirectories("/tmp/here");
+    ASSERT_EQ(chdir("/tmp/here"), 0);
+  }
+  void TearDown() override {
+    EXPECT_EQ(chdir("/"), 0);
+    ToolConfinement::TearDown();
+  }
+};
+
+TEST_F(OutputsOfTheConverter, OpenNoDirectoryWhenTheyAreDiscarded) {
+  EXPECT_THAT(FilesWritten({"/dev/null", "/dev/x", "/tmp/here/jpg:/dev/x", "/tmp/here/x"},
+                           {kPhoto, "jpg:/dev/null"}),
+              ElementsAre("/dev/null"));
+  EXPECT_THAT(FilesWritten({"/tmp/here/jpg:/dev/x", "/tmp/out/x"},
+                           {kPhoto, "-write", "jpg:/dev/null", "/tmp/out/b.jpg"}),
+              ElementsAre("/tmp/out/x"));
+}
+
+TEST_F(OutputsOfTheConverter, OpenOnlyTheirRelativeDirectoryWhenItBeginsLikeAFormat) {
+  EXPECT_THAT(FilesWritten({"/tmp/out/x", "/tmp/here/jpg:/tmp/out/x", "/tmp/here/x"},
+                           {kPhoto, "jpg:/tmp/out/b.jpg"}),
+              ElementsAre("/tmp/here/jpg:/tmp/out/x"));
+  EXPECT_THAT(
+      FilesWritten({"/tmp/here/a:b/x", "/tmp/here/b/x", "/tmp/here/x"}, {kPhoto, "a:b/b.jpg"}),
+      ElementsAre("/tmp/here/a:b/x"));
+  EXPECT_THAT(FilesWritten({"/dev/x", "/tmp/here/jpg:/dev/x"}, {kPhoto, "jpg:/dev/null.jpg"}),
+              ElementsAre("/tmp/here/jpg:/dev/x"));
+}
+
+TEST_F(OutputsOfTheConverter, OpenNoOtherDirectoryOfTheSameNameWithFewerPercentSigns) {
+  const Strings files = {"/tmp/turned/50%/x", "/tmp/turned/50%%/x"};
+  MakeDirectories("/tmp/turned/50%%");
+  CopyFile(kPhoto, "/tmp/turned/50%%/raw.jpg");
+  EXPECT_THAT(FilesWritten(
+                  files, {"-rotate", "90", "/tmp/turned/50%%/raw.jpg", "/tmp/turned/50%%/raw.jpg"}),
+              ElementsAre("/tmp/turned/50%%/x"));
+  EXPECT_THAT(FilesWritten(files, {kPhoto, "/tmp/turned/50%%/b.jpg"}),
+              ElementsAre("/tmp/turned/50%/x"));
+}
+
 /// Makes Perl send a line to the system log.
 constexpr char kLogging[] =
     "use Socket; socket(S, PF_UNIX, SOCK_DGRAM, 0) && connect(S, pack_sockaddr_un('/dev/log')) && "

@@ -21,6 +21,7 @@
 
 #include "posix/child_process.h"
 #include "posix/file_descriptor.h"
+#include "support/child_call.h"
 #include "support/files.h"
 #include "support/sandbox.h"
 #include "support/seccomp_fail.h"
@@ -37,31 +38,9 @@ constexpr char kInput[] = "/tmp/in/photo.jpg";
 constexpr char kSecret[] = "/tmp/other/secret.jpg";
 constexpr char kOutputs[] = "/tmp/out";
 
-/// The errno of a failed call, 0 on success.
-int ErrorOf(long result) {
-  return result < 0 ? errno : 0;
-}
-
 int ErrorOfOpening(const std::string& path, int flags = O_RDONLY) {
   const FileDescriptor file(open(path.c_str(), flags | O_CLOEXEC, 0600));
   return file.IsOpen() ? 0 : errno;
-}
-
-/// Returns the wait status of a child that runs `task` and exits with its result.
-int WaitStatusOf(const std::function<int()>& task) {
-  const pid_t child = fork();
-  if (child == 0) {
-    _exit(task());
-  }
-  int status = 0;
-  EXPECT_EQ(waitpid(child, &status, 0), child);
-  return status;
-}
-
-int InChild(const std::function<int()>& task) {
-  const int status = WaitStatusOf(task);
-  EXPECT_TRUE(WIFEXITED(status)) << "signal " << WTERMSIG(status);
-  return WEXITSTATUS(status);
 }
 
 /// Exit status of a child that could not be confined.

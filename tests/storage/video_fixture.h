@@ -1,4 +1,4 @@
-// A video with its metadata directory and a plugin daemon that has its record.
+// A video with its metadata directory and an index daemon that has its record.
 #pragma once
 
 #include <cstddef>

@@ -2,8 +2,6 @@
 
 #include <fcntl.h>
 #include <limits.h>
-#include <linux/audit.h>
-#include <linux/filter.h>
 #include <linux/seccomp.h>
 #include <poll.h>
 #include <signal.h>
@@ -25,26 +23,12 @@
 
 #include "support/descriptor.h"
 #include "support/environment_failure.h"
+#include "support/filter_instruction.h"
 #include "support/quiet_thread.h"
 
 namespace vela_test {
 
 namespace {
-
-#if defined(__x86_64__)
-constexpr uint32_t kArchitecture = AUDIT_ARCH_X86_64;
-#elif defined(__aarch64__)
-constexpr uint32_t kArchitecture = AUDIT_ARCH_AARCH64;
-#else
-#error "the filter does not know this machine's system call numbers"
-#endif
-
-using Filter = std::vector<sock_filter>;
-
-sock_filter Instruction(int code, uint32_t operand, int ifTrue = 0, int ifFalse = 0) {
-  return {static_cast<uint16_t>(code), static_cast<uint8_t>(ifTrue), static_cast<uint8_t>(ifFalse),
-          operand};
-}
 
 /// Announces the watched calls to the supervisor and lets all others pass.
 Filter AnnouncingFilter() {

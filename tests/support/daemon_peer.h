@@ -1,4 +1,4 @@
-// Simulates the plugin daemon at its socket.
+// Simulates the index daemon at its socket.
 #pragma once
 
 #include <cstddef>

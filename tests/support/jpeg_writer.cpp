@@ -1,12 +1,7 @@
-
-#include <cstdio>  // before jpeglib.h, which uses FILE
-#include <cstdlib>
 #include <vector>
 
-#include <jpeglib.h>
-
-#include "support/environment_failure.h"
 #include "support/images.h"
+#include "support/jpeg_encoder.h"
 #include "support/quadrants.h"
 
 namespace vela_test {
@@ -14,12 +9,6 @@ namespace vela_test {
 namespace {
 
 constexpr int kRgbParts = 3;
-
-[[noreturn]] void EncoderFailed(j_common_ptr encoder) {
-  char message[JMSG_LENGTH_MAX];
-  encoder->err->format_message(encoder, message);
-  EnvironmentFailure(std::string("cannot encode a JPEG: ") + message);
-}
 
 uint8_t GreyOf(const uint8_t* rgb) {
   return static_cast<uint8_t>((rgb[0] * 299 + rgb[1] * 587 + rgb[2] * 114) / 1000);
@@ -70,34 +59,30 @@ void WriteRows(const JpegRecipe& recipe, jpeg_compress_struct* encoder) {
   }
 }
 
+void SetUp(const JpegRecipe& recipe, jpeg_compress_struct* encoder) {
+  encoder->image_width = static_cast<JDIMENSION>(recipe.width);
+  encoder->image_height = static_cast<JDIMENSION>(recipe.height);
+  SetColour(recipe.colour, encoder);
+  jpeg_set_defaults(encoder);
+  jpeg_set_quality(encoder, recipe.quality, TRUE);
+}
+
+void WriteProfile(jpeg_compress_struct* encoder) {
+  const std::string profile = SrgbProfile();
+  jpeg_write_icc_profile(encoder, reinterpret_cast<const JOCTET*>(profile.data()),
+                         static_cast<unsigned int>(profile.size()));
+}
+
 }  // namespace
 
 std::string EncodeJpeg(const JpegRecipe& recipe) {
-  jpeg_compress_struct encoder{};
-  jpeg_error_mgr errors{};
-  encoder.err = jpeg_std_error(&errors);
-  errors.error_exit = EncoderFailed;
-  jpeg_create_compress(&encoder);
-  unsigned char* bytes = nullptr;
-  unsigned long size = 0;
-  jpeg_mem_dest(&encoder, &bytes, &size);
-  encoder.image_width = static_cast<JDIMENSION>(recipe.width);
-  encoder.image_height = static_cast<JDIMENSION>(recipe.height);
-  SetColour(recipe.colour, &encoder);
-  jpeg_set_defaults(&encoder);
-  jpeg_set_quality(&encoder, recipe.quality, TRUE);
-  jpeg_start_compress(&encoder, TRUE);
-  if (recipe.iccProfile) {
-    const std::string profile = SrgbProfile();
-    jpeg_write_icc_profile(&encoder, reinterpret_cast<const JOCTET*>(profile.data()),
-                           static_cast<unsigned int>(profile.size()));
-  }
-  WriteRows(recipe, &encoder);
-  jpeg_finish_compress(&encoder);
-  std::string file(reinterpret_cast<const char*>(bytes), size);
-  jpeg_destroy_compress(&encoder);
-  std::free(bytes);
-  return file;
+  return EncodeJpeg([&](jpeg_compress_struct* encoder) { SetUp(recipe, encoder); },
+                    [&](jpeg_compress_struct* encoder) {
+                      if (recipe.iccProfile) {
+                        WriteProfile(encoder);
+                      }
+                      WriteRows(recipe, encoder);
+                    });
 }
 
 }  // namespace vela_test

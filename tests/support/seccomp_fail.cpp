@@ -1,8 +1,6 @@
 #include "support/seccomp_fail.h"
 
 #include <fcntl.h>
-#include <linux/audit.h>
-#include <linux/filter.h>
 #include <linux/seccomp.h>
 #include <sys/prctl.h>
 #include <sys/syscall.h>
@@ -11,24 +9,11 @@
 #include <cstddef>
 #include <memory>
 
+#include "support/filter_instruction.h"
+
 namespace vela_test {
 
 namespace {
-
-#if defined(__x86_64__)
-constexpr uint32_t kArchitecture = AUDIT_ARCH_X86_64;
-#elif defined(__aarch64__)
-constexpr uint32_t kArchitecture = AUDIT_ARCH_AARCH64;
-#else
-#error "the filter does not know this machine's system call numbers"
-#endif
-
-using Filter = std::vector<sock_filter>;
-
-sock_filter Instruction(int code, uint32_t operand, int ifTrue = 0, int ifFalse = 0) {
-  return {static_cast<uint16_t>(code), static_cast<uint8_t>(ifTrue), static_cast<uint8_t>(ifFalse),
-          operand};
-}
 
 sock_filter Load(size_t offset) {
   return Instruction(BPF_LD | BPF_W | BPF_ABS, static_cast<uint32_t>(offset));

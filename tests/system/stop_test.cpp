@@ -22,6 +22,9 @@ using std::chrono::milliseconds;
 
 constexpr int kPhotos = 4;
 
+/// Ten seconds pass before what does not end by itself is killed.
+constexpr std::chrono::seconds kLongestStop(5);
+
 class StopTest : public SandboxTest {
  protected:
   /// Makes photos that take a noticeable time each, in a tree. Returns their paths.
@@ -39,7 +42,7 @@ class StopTest : public SandboxTest {
     return photos;
   }
 
-  /// Starts a runner, stops it after `delay`, and fails the test unless it ends within a second.
+  /// Starts a runner, stops it after `delay`, and fails the test unless it ends soon.
   static void StartAndStop(milliseconds delay) {
     Program runner = Machine::StartRunner({"--jobs", "2"});
     std::this_thread::sleep_for(delay);
@@ -47,19 +50,21 @@ class StopTest : public SandboxTest {
     runner.Kill(SIGTERM);
     const auto result = runner.Wait(std::chrono::seconds(30));
     ASSERT_TRUE(result);
-    EXPECT_LT(std::chrono::steady_clock::now() - start, std::chrono::seconds(1)) << delay.count();
+    EXPECT_LT(std::chrono::steady_clock::now() - start, kLongestStop) << delay.count();
     // A signal that comes before it is expected ends the program as well.
     EXPECT_TRUE(result->exitCode == 1 || result->exitCode == 0 || result->signal == SIGTERM)
         << result->err;
   }
 };
 
-TEST_F(StopTest, EndsWithinASecondAndTheNextRunMakesTheRest) {
+TEST_F(StopTest, EndsSoonAndTheNextRunMakesTheRest) {
   const std::vector<std::string> photos = MakeLargePhotos();
   Machine machine;
   WriteFile("/var/spool/thumb_create.queue", "R:/tmp/photos\n");
   // At various moments: while the work is counted, a photo is read, thumbnails are written.
-  for (const int delay : {30, 100, 200, 400, 700}) {
+  StartAndStop(milliseconds(30));
+  EXPECT_TRUE(Machine::HasQueue()) << "the work was completed first";
+  for (const int delay : {100, 200, 400, 700}) {
     StartAndStop(milliseconds(delay));
   }
   const ProgramResult last = Machine::RunRunner();

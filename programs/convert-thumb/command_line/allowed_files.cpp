@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <iterator>
 #include <string>
+#include <variant>
 #include <vector>
 
 #include "command_line/file_name.h"
@@ -24,6 +25,9 @@ void AddUnique(std::vector<std::string>& list, const std::string& text) {
 }
 
 void AddOutput(AllowedFiles& files, const std::string& path) {
+  if (path.empty()) {
+    return;
+  }
   if (IsDevice(path)) {
     AddUnique(files.devices, path);
   } else {
@@ -31,14 +35,29 @@ void AddOutput(AllowedFiles& files, const std::string& path) {
   }
 }
 
-void AddOutputArgument(AllowedFiles& files, const std::string& argument) {
-  const std::string path = WithoutDoubledPercents(argument);
-  AddOutput(files, path);
-  // The name may have a format as a prefix.
-  const size_t colon = path.find(':');
-  if (colon != std::string::npos && path.front() != '/') {
-    AddOutput(files, path.substr(colon + 1));
+/// Returns the file that ImageMagick, which alone understands the line, writes for this argument;
+/// empty when it names none.
+std::string UnknownOutput(const CommandLine& line, const std::string& argument) {
+  return argument == line.sourceFile ? argument
+                                     : WithoutDoubledPercents(SplitOutputArgument(argument).name);
+}
+
+/// Returns the files that the line names as outputs. In a line that this program understands, the
+/// beginning of "jpg:/tmp/a.jpg" is part of a relative path.
+std::vector<std::string> FindOutputFiles(const CommandLine& line) {
+  std::vector<std::string> files;
+  if (const auto* const conversion = std::get_if<ConversionPlan>(&line.task)) {
+    for (const OutputPlan& output : conversion->outputs) {
+      files.push_back(output.path);
+    }
+  } else if (const auto* const turn = std::get_if<TurnPlan>(&line.task)) {
+    files.push_back(turn->path);
+  } else {
+    for (const size_t index : line.outputIndices) {
+      files.push_back(UnknownOutput(line, line.arguments[index]));
+    }
   }
+  return files;
 }
 
 }  // namespace
@@ -49,8 +68,8 @@ AllowedFiles FindAllowedFiles(const CommandLine& line) {
   files.data.insert(files.data.end(), std::begin(kImageMagickData), std::end(kImageMagickData));
   files.inputs = {line.sourceFile};
   files.outputs = {line.scratchDirectory};
-  for (const size_t index : line.outputIndices) {
-    AddOutputArgument(files, line.arguments[index]);
+  for (const std::string& path : FindOutputFiles(line)) {
+    AddOutput(files, path);
   }
   return files;
 }

@@ -8,6 +8,7 @@
 #include "command_line/file_name.h"
 #include "command_line/option_values.h"
 #include "configuration/profile_values.h"
+#include "platform/system_rules.h"
 
 namespace vela {
 

@@ -1,6 +1,7 @@
 #include "command_line/file_name.h"
 
 #include <algorithm>
+#include <cstddef>
 
 namespace vela {
 
@@ -10,6 +11,11 @@ char ToLower(char character) {
   constexpr char kDistance = 'a' - 'A';
   return character >= 'A' && character <= 'Z' ? static_cast<char>(character + kDistance)
                                               : character;
+}
+
+bool IsLetterOrDigit(char character) {
+  return (character >= '0' && character <= '9') || (character >= 'A' && character <= 'Z') ||
+         (character >= 'a' && character <= 'z');
 }
 
 }  // namespace
@@ -42,6 +48,19 @@ std::string WithoutDoubledPercents(const std::string& text) {
     }
   }
   return plain;
+}
+
+OutputArgument SplitOutputArgument(const std::string& argument) {
+  if (!argument.empty() && argument.front() == '-') {
+    return {};
+  }
+  const size_t colon = argument.find(':');
+  const bool hasFormat =
+      colon != std::string::npos && colon > 0 &&
+      std::all_of(argument.begin(), argument.begin() + static_cast<std::ptrdiff_t>(colon),
+                  IsLetterOrDigit);
+  return hasFormat ? OutputArgument{argument.substr(0, colon + 1), argument.substr(colon + 1)}
+                   : OutputArgument{"", argument};
 }
 
 }  // namespace vela

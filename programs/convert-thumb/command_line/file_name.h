@@ -18,4 +18,13 @@ std::string DirectoryOf(const std::string& path);
 /// Returns the text with each "%%" replaced by "%".
 std::string WithoutDoubledPercents(const std::string& text);
 
+/// An output argument as ImageMagick reads it.
+struct OutputArgument {
+  std::string format;  ///< with the colon, "jpg:"; empty when the name is not preceded by one
+  std::string name;    ///< a path, perhaps with special meanings; empty when it names no file
+};
+
+/// Splits an output argument of which only ImageMagick understands the meaning.
+OutputArgument SplitOutputArgument(const std::string& argument);
+
 }  // namespace vela

@@ -4,6 +4,7 @@
 
 #include "command_line/file_name.h"
 #include "configuration/profile_values.h"
+#include "platform/system_rules.h"
 
 namespace vela {
 

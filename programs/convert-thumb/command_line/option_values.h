@@ -17,13 +17,9 @@ std::optional<ThumbnailBox> ParseThumbnailBox(const std::string& text);
 /// Parses degrees clockwise and returns quarter turns, 0 to 3; empty unless a multiple of 90.
 std::optional<int> ParseQuarterTurns(const std::string& text);
 
-/// The output argument that stands for the null device. With the prefix, ImageMagick writes a JPEG
-/// to it as well.
-inline constexpr char kDiscardedOutput[] = "jpg:/dev/null";
-
 /// Returns the file name of an output argument: of kDiscardedOutput the null device, of others the
-/// text, in which "%%" represents a percent sign. Empty when
-/// the text contains any other percent sign or does not name a JPEG file.
+/// text, in which "%%" represents a percent sign. Empty when the text contains any other percent
+/// sign or does not name a JPEG file.
 std::optional<std::string> ParseOutputPath(const std::string& text);
 
 }  // namespace vela

@@ -48,29 +48,9 @@ bool HandThumbnails(const CommandLine& line, const ConversionPlan& plan, HandedL
   return true;
 }
 
-/// The parts of an output argument that only ImageMagick understands completely.
-struct OutputArgument {
-  std::string prefix;  ///< with the colon
-  std::string name;    ///< a path, perhaps with special meanings
-};
-
-OutputArgument Split(const std::string& argument) {
-  const size_t colon = argument.find(':');
-  const bool hasPrefix =
-      colon != std::string::npos && colon > 0 &&
-      std::all_of(argument.begin(), argument.begin() + static_cast<std::ptrdiff_t>(colon),
-                  [](char character) {
-                    return (character >= '0' && character <= '9') ||
-                           (character >= 'A' && character <= 'Z') ||
-                           (character >= 'a' && character <= 'z');
-                  });
-  return hasPrefix ? OutputArgument{argument.substr(0, colon + 1), argument.substr(colon + 1)}
-                   : OutputArgument{"", argument};
-}
-
 /// Returns true when ImageMagick writes to the file of exactly this name.
 bool IsPlainOutput(const OutputArgument& parts) {
-  const std::string format = parts.prefix.substr(0, parts.prefix.find(':'));
+  const std::string format = parts.format.substr(0, parts.format.find(':'));
   return IsPlainName(parts.name) && (format.empty() || !CoderPrefix(format).empty());
 }
 
@@ -89,9 +69,9 @@ void ReportRefusedName(const std::string& argument, const std::string& unsupport
 }
 
 bool HandUnknown(std::string& argument, const std::string& unsupportedOption, HandedLine& handed) {
-  const OutputArgument parts = Split(argument);
-  if (parts.name.empty() || argument.front() == '-') {
-    return true;  // no file
+  const OutputArgument parts = SplitOutputArgument(argument);
+  if (parts.name.empty()) {
+    return true;
   }
   const std::string path = WithoutDoubledPercents(parts.name);
   std::optional<Place> place = FindPlace(path);
@@ -102,7 +82,7 @@ bool HandUnknown(std::string& argument, const std::string& unsupportedOption, Ha
     return true;
   }
   const std::string prefix =
-      parts.prefix.empty() ? CoderPrefix(std::string(ExtensionOf(path))) : parts.prefix;
+      parts.format.empty() ? CoderPrefix(std::string(ExtensionOf(path))) : parts.format;
   if (!IsPlainName(path) || prefix.empty()) {
     ReportRefusedName(argument, unsupportedOption);
     return false;

@@ -27,6 +27,7 @@
 #include "command_line/allowed_files.h"
 #include "converter_fixture.h"
 #include "process/confinement.h"
+#include "support/child_call.h"
 #include "support/seccomp_fail.h"
 
 using namespace vela;
@@ -38,23 +39,6 @@ constexpr char kInside[] = "/tmp/inside";
 constexpr char kOutside[] = "/tmp/outside";
 constexpr char kInput[] = "/tmp/outside/input";
 constexpr char kData[] = "/tmp/data";
-
-/// The errno of a failed call, 0 on success.
-int ErrorOf(long result) {
-  return result < 0 ? errno : 0;
-}
-
-/// The result of `attempt` (0 to 255) in a separate process.
-int InChild(const std::function<int()>& attempt) {
-  const pid_t child = fork();
-  if (child == 0) {
-    _exit(attempt());
-  }
-  int status = 0;
-  EXPECT_EQ(waitpid(child, &status, 0), child);
-  EXPECT_TRUE(WIFEXITED(status));
-  return WEXITSTATUS(status);
-}
 
 AllowedFiles FilesInside() {
   AllowedFiles files;
@@ -212,6 +196,88 @@ TEST_F(Confinement, RefusesTheFileBehindAnOutputThatIsALink) {
               return ErrorOfOpening("/tmp/inside/link.jpg", O_WRONLY | O_TRUNC);
             }),
             ErrorOutside());
+}
+
+/// Arguments of a run in kInside, and files there and elsewhere of which it may write one.
+struct OutputCase {
+  std::vector<std::string> arguments;
+  std::string written;
+  std::vector<std::string> others;
+};
+
+const OutputCase kOutputCases[] = {
+    {{"a.jpg", "-thumbnail", "9x9>", "-quality", "80", "jpg:/dev/null"},
+     "/dev/null",
+     {"/dev/x", "/tmp/inside/x", "/tmp/inside/jpg:/dev/x"}},
+    {{"a.jpg", "-thumbnail", "9x9>", "-quality", "80", "jpg:/tmp/outside/o.jpg"},
+     "/tmp/inside/jpg:/tmp/outside/x",
+     {"/tmp/outside/x", "/tmp/inside/x"}},
+    {{"a.jpg", "-thumbnail", "9x9>", "-quality", "80", "a:b/o.jpg"},
+     "/tmp/inside/a:b/x",
+     {"/tmp/inside/b/x", "/tmp/inside/x"}},
+    {{"-rotate", "90", "jpg:/tmp/outside/o.jpg", "jpg:/tmp/outside/o.jpg"},
+     "/tmp/inside/jpg:/tmp/outside/x",
+     {"/tmp/outside/x", "/tmp/inside/x"}},
+    {{"-rotate", "90", "50%%/o.jpg", "50%%/o.jpg"},
+     "/tmp/inside/50%%/x",
+     {"/tmp/inside/50%/x", "/tmp/inside/x"}},
+    {{"-rotate", "45", "50%%/o.jpg", "50%%/o.jpg"},
+     "/tmp/inside/50%%/x",
+     {"/tmp/inside/50%/x", "/tmp/inside/x"}},
+    // Only ImageMagick understands these.
+    {{"a.jpg", "-negate", "png:/tmp/outside/o"},
+     "/tmp/outside/x",
+     {"/tmp/inside/png:/tmp/outside/x", "/tmp/inside/x"}},
+    {{"a.jpg", "-negate", "50%%/o.png"}, "/tmp/inside/50%/x", {"/tmp/inside/x"}},
+    {{"a.jpg", "-negate", "./a:b/o.png"}, "/tmp/inside/a:b/x", {"/tmp/inside/b/x"}},
+    {{"a.jpg", "-negate", "null:"}, "/dev/null", {"/dev/x", "/tmp/inside/x"}},
+    {{"a.jpg", "-negate", "-"}, "/dev/null", {"/dev/x", "/tmp/inside/x"}},
+};
+
+TEST_F(Confinement, WritesOnlyInTheDirectoriesThatTheOutputsName) {
+  ASSERT_EQ(chdir(kInside), 0);
+  for (const OutputCase& one : kOutputCases) {
+    AllowedFiles files = FindAllowedFiles(vela::ParseCommandLine(one.arguments));
+    files.outputs.erase(files.outputs.begin());  // the directory for temporary files, /tmp
+    std::vector<std::string> paths = one.others;
+    paths.push_back(one.written);
+    for (const std::string& path : paths) {
+      MakeDirectories(path.substr(0, path.rfind('/')));
+    }
+    for (const std::string& path : paths) {
+      EXPECT_EQ(InChild([&] {
+                  Confine(files);
+                  return ErrorOfOpening(path, O_WRONLY | O_CREAT);
+                }),
+                path == one.written ? 0 : ErrorOutside())
+          << path << " " << one.arguments.back();
+    }
+  }
+  EXPECT_EQ(chdir("/"), 0);
+}
+
+TEST_F(Confinement, LetsAPhotoBeDiscarded) {
+  for (const std::string& photo : {MakePhoto("a.jpg", 300, 200), MakePicture("a.bmp", 300, 200)}) {
+    ProgramOptions options;
+    options.workingDirectory = kInside;
+    options.addedEnvironment = {"TMPDIR=/dev/null"};
+    ExpectSuccess(RunConverter({photo, "-thumbnail", "160x160>", "-quality", "80", "jpg:/dev/null"},
+                               options));
+    EXPECT_EQ(ListDirectory(kInside), std::vector<std::string>{"file"}) << photo;
+  }
+}
+
+TEST_F(Confinement, LetsARelativePathBeginLikeAFormat) {
+  ProgramOptions options;
+  options.workingDirectory = kInside;
+  MakeDirectories("/tmp/inside/jpg:/tmp/outside");
+  for (const std::string& photo : {MakePhoto("a.jpg", 300, 200), MakePicture("a.bmp", 300, 200)}) {
+    const CommandLine line{photo, directory_, {{{}, "jpg:/tmp/outside/o.jpg"}}};
+    ExpectSuccess(RunConverter(line.Arguments(), options));
+    EXPECT_TRUE(Exists("/tmp/inside/jpg:/tmp/outside/o.jpg"));
+    EXPECT_FALSE(Exists("/tmp/outside/o.jpg"));
+    RemoveTree("/tmp/inside/jpg:/tmp/outside/o.jpg");
+  }
 }
 
 TEST_F(Confinement, DoesNotOpenADirectoryThatAnOutputNames) {

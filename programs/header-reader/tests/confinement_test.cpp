@@ -23,23 +23,12 @@
 #include <vector>
 
 #include "support/capabilities.h"
+#include "support/child_call.h"
 #include "support/files.h"
 #include "support/sandbox.h"
 
 namespace vela_test {
 namespace {
-
-/// The result of `attempt` (0 to 255) in a separate process.
-int InChild(const std::function<int()>& attempt) {
-  const pid_t child = fork();
-  if (child == 0) {
-    _exit(attempt());
-  }
-  int status = 0;
-  EXPECT_EQ(waitpid(child, &status, 0), child);
-  EXPECT_TRUE(WIFEXITED(status)) << status;
-  return WEXITSTATUS(status);
-}
 
 /// The same after the process has been confined.
 int Confined(const std::function<int()>& attempt) {
@@ -47,11 +36,6 @@ int Confined(const std::function<int()>& attempt) {
     const int error = vela::EnterConfinement();
     return error != 0 ? error : attempt();
   });
-}
-
-/// The errno of a failed call, 0 on success.
-int ErrorOf(long result) {
-  return result < 0 ? errno : 0;
 }
 
 struct Call {

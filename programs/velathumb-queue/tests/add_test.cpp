@@ -1,8 +1,10 @@
 // Adding entries: who does the work, and the message to the user.
 #include <fcntl.h>
 #include <grp.h>
+#include <poll.h>
 #include <sched.h>
 #include <signal.h>
+#include <sys/inotify.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
@@ -68,9 +70,49 @@ class ClosedToOwner {
   mode_t mode_ = 0;
 };
 
+/// Notices how often a file is opened.
+class OpenWatch {
+ public:
+  explicit OpenWatch(const char* path) : events_(inotify_init1(IN_CLOEXEC)) {
+    EXPECT_GE(inotify_add_watch(events_.Get(), path, IN_OPEN), 0) << path;
+  }
+
+  /// Waits until this has happened `count` times, at most 20 s each; returns whether it has.
+  bool WaitFor(int count) const {
+    for (int i = 0; i < count; ++i) {
+      pollfd event = {events_.Get(), POLLIN, 0};
+      inotify_event one = {};
+      if (poll(&event, 1, 20000) != 1 || read(events_.Get(), &one, sizeof one) != sizeof one) {
+        return false;
+      }
+    }
+    return true;
+  }
+
+ private:
+  Descriptor events_;
+};
+
 class AddTest : public QueueTest {
  protected:
   AddTest() { MakeEntryDirectories({"/tmp/a", "/tmp/b"}); }
+
+  /// Starts a runner that adds /tmp/a, and returns it when it has asked for the lock, which another
+  /// one must hold, more than once.
+  Program AddAndWaitForTheLock() const {
+    const OpenWatch lock(kRunnerLock);
+    Program runner = velathumb_.Start({"--add", "/tmp/a"});
+    EXPECT_TRUE(lock.WaitFor(2));
+    EXPECT_EQ(ReadFile(kQueueFile), "/tmp/a\n");
+    return runner;
+  }
+
+  /// The same with a runner that ends without taking the entry.
+  Program AddBeforeTheEndOfAnotherRunner() const {
+    const FileDescriptor lock = TakeProcessLock(kRunnerLock, false);
+    EXPECT_TRUE(lock.IsOpen());
+    return AddAndWaitForTheLock();
+  }
 
   /// Fails the test unless adding the entry succeeds and leaves it to others. Returns the messages.
   std::string LeftToOthers(const std::vector<std::string>& arguments) const {
@@ -144,12 +186,7 @@ TEST_F(AddTest, ARunnerThatHasTakenTheEntriesDoesTheWork) {
 }
 
 TEST_F(AddTest, TheWorkOfARunnerThatEndsWithoutTakingItIsDoneHere) {
-  FileDescriptor lock = TakeProcessLock(kRunnerLock, false);
-  ASSERT_TRUE(lock.IsOpen());
-  Program runner = velathumb_.Start({"--add", "/tmp/a"});
-  ASSERT_TRUE(WaitUntilExists(kQueueFile));
-  EXPECT_FALSE(runner.Wait(std::chrono::milliseconds(200)));
-  lock.Reset();
+  Program runner = AddBeforeTheEndOfAnotherRunner();
   ExpectEnd(runner, 0);
   EXPECT_THAT(velathumb_.Entries(), ElementsAre("/tmp/a"));
   ExpectQueueDone();
@@ -163,9 +200,7 @@ TEST_F(AddTest, TheWorkOfARunnerThatIsBeingStoppedIsDoneHere) {
   Program stopped = velathumb_.Start();
   ASSERT_TRUE(WaitUntilExists("/tmp/here"));
   stopped.Kill(SIGTERM);
-  Program runner = velathumb_.Start({"--add", "/tmp/a"});
-  ASSERT_TRUE(WaitUntilExists(kQueueFile));
-  EXPECT_FALSE(runner.Wait(std::chrono::milliseconds(200)));
+  Program runner = AddAndWaitForTheLock();
   Release();
   ExpectEnd(stopped, 1);
   ExpectEnd(runner, 0);
@@ -302,12 +337,7 @@ TEST_F(AddTest, AServiceThatIsBeingStoppedDoesNotDoTheWork) {
 
 TEST_F(AddTest, ARunnerThatIsAboutToEndDoesNotDoTheWorkOfAService) {
   const FakeSystemd systemd({{}, {kPath}});
-  FileDescriptor lock = TakeProcessLock(kRunnerLock, false);
-  ASSERT_TRUE(lock.IsOpen());
-  Program runner = velathumb_.Start({"--add", "/tmp/a"});
-  ASSERT_TRUE(WaitUntilExists(kQueueFile));
-  EXPECT_FALSE(runner.Wait(std::chrono::milliseconds(200)));
-  lock.Reset();
+  Program runner = AddBeforeTheEndOfAnotherRunner();
   ExpectEnd(runner, 0);
   EXPECT_EQ(runner.Error(),
             "velathumb-queue: queued /tmp/a; the service is enabled, but has not been started: "

@@ -5,8 +5,10 @@
 #include <unistd.h>
 
 #include <cerrno>
+#include <chrono>
 #include <cstdint>
 #include <memory>
+#include <thread>
 
 #include "support/sandbox.h"
 
@@ -71,6 +73,16 @@ ProgramResult RunStatusAsOrdinaryUser(const std::vector<std::string>& arguments)
   ProgramOptions options;
   options.beforeExec = {DropCapabilities()};
   return RunStatus(arguments, options);
+}
+
+bool WaitForOutput(const Program& program, const std::string& text) {
+  for (int i = 0; i < 2000; ++i) {
+    if (program.Output().find(text) != std::string::npos) {
+      return true;
+    }
+    std::this_thread::sleep_for(std::chrono::milliseconds(10));
+  }
+  return false;
 }
 
 ProgramOptions WithOutputAt(int descriptor) {

@@ -20,6 +20,9 @@ ProgramResult RunStatus(const std::vector<std::string>& arguments,
 /// Runs it with these arguments and without capabilities, so that permission bits apply to it.
 ProgramResult RunStatusAsOrdinaryUser(const std::vector<std::string>& arguments);
 
+/// Waits until the started program has printed this text, at most 20 s; returns whether it has.
+bool WaitForOutput(const Program& program, const std::string& text);
+
 /// Starts the program with its standard output at the descriptor, which stays the caller's.
 ProgramOptions WithOutputAt(int descriptor);
 

@@ -2,7 +2,6 @@
 #include <chrono>
 #include <ctime>
 #include <sstream>
-#include <thread>
 
 #include "platform/velaindex.h"
 #include "posix/file_lock.h"
@@ -41,16 +40,6 @@ class WatchingTheQueue : public SandboxTest {
     return StartProgram(StatusProgramPath(), arguments);
   }
 
-  static bool WaitForOutput(const Program& program, const std::string& text) {
-    for (int i = 0; i < 2000; ++i) {
-      if (program.Output().find(text) != std::string::npos) {
-        return true;
-      }
-      std::this_thread::sleep_for(milliseconds(10));
-    }
-    return false;
-  }
-
   /// Fails the test unless the program shows a change of the counters, and thus is still running,
   /// after it has had the time to notice that no velathumb is.
   static void ExpectToFollow(const Program& watch) {
@@ -66,6 +55,18 @@ class WatchingTheQueue : public SandboxTest {
     EXPECT_TRUE(result);
     return result ? result->out : std::string();
   }
+
+  /// Fails the test unless the program ends and says last that nothing is running.
+  static void ExpectEnd(Program& watch) {
+    EXPECT_THAT(EndOf(watch), EndsWith("no velathumb is running\n"));
+  }
+
+  /// Writes the setting, with which conversion is paused for an hour. Returns its value.
+  static std::string Pause() {
+    const std::string resume = std::to_string(time(nullptr) + 3600);
+    WriteFile(kSettings, "thumb_conv_resume_time=\"" + resume + "\"\n");
+    return resume;
+  }
 };
 
 TEST_F(WatchingTheQueue, DoesNotEndBetweenTwoEntriesOfARunner) {
@@ -74,7 +75,7 @@ TEST_F(WatchingTheQueue, DoesNotEndBetweenTwoEntriesOfARunner) {
   Program watch = Start();
   ExpectToFollow(watch);
   lock.Reset();
-  EXPECT_THAT(EndOf(watch), EndsWith("no velathumb is running\n"));
+  ExpectEnd(watch);
 }
 
 TEST_F(WatchingTheQueue, DoesNotEndBeforePendingEntriesAreTaken) {
@@ -85,7 +86,7 @@ TEST_F(WatchingTheQueue, DoesNotEndBeforePendingEntriesAreTaken) {
   RemoveTree(kPhotoQueue);
   ExpectToFollow(watch);
   lock.Reset();
-  EXPECT_THAT(EndOf(watch), EndsWith("no velathumb is running\n"));
+  ExpectEnd(watch);
 }
 
 TEST_F(WatchingTheQueue, DoesNotEndBeforeTakenEntriesAreDone) {
@@ -94,14 +95,14 @@ TEST_F(WatchingTheQueue, DoesNotEndBeforeTakenEntriesAreDone) {
   Program watch = Start();
   ASSERT_TRUE(WaitForOutput(watch, kWaiting));
   WriteFile(kDonePhotos, "/tmp/a\nR:/tmp/b\n");
-  EXPECT_THAT(EndOf(watch), EndsWith("no velathumb is running\n"));
+  ExpectEnd(watch);
 }
 
 TEST_F(WatchingTheQueue, EndsWhenAnotherSpellingOfTheEntryIsDone) {
   WriteFile(kPhotosInProgress, "/tmp//a/\nR:/tmp/./b\n");
   WriteFile(kDonePhotos, "/tmp/a\nR:/tmp/b/\n");
   Program watch = Start();
-  EXPECT_THAT(EndOf(watch), EndsWith("no velathumb is running\n"));
+  ExpectEnd(watch);
 }
 
 TEST_F(WatchingTheQueue, EndsWhenOnlyDeferredEntriesAreLeft) {
@@ -122,8 +123,7 @@ TEST_F(WatchingTheQueue, EndsWhenOnlyDeferredEntriesAreLeft) {
 TEST_F(WatchingTheQueue, ShowsAPauseInsteadOfTheCountersOfAnEarlierRun) {
   AddConvProgress(THUMB_TYPE_PHOTO, "total_thumb", 8);
   AddConvProgress(THUMB_TYPE_PHOTO, "completed_thumb", 8);
-  const long resume = time(nullptr) + 3600;
-  WriteFile(kSettings, "thumb_conv_resume_time=\"" + std::to_string(resume) + "\"\n");
+  Pause();
   vela::FileDescriptor lock = vela::TakeProcessLock(kRunnerLock, false);
   Program watch = Start();
   ASSERT_TRUE(WaitForOutput(watch, "\n"));
@@ -132,7 +132,7 @@ TEST_F(WatchingTheQueue, ShowsAPauseInsteadOfTheCountersOfAnEarlierRun) {
   WriteFile(kSettings, "thumb_conv_resume_time=\"\"\n");
   ASSERT_TRUE(WaitForOutput(watch, "] 100%  8 of 8 thumbnails"));
   lock.Reset();
-  EXPECT_THAT(EndOf(watch), EndsWith("no velathumb is running\n"));
+  ExpectEnd(watch);
 }
 
 TEST_F(WatchingTheQueue, ShowsAPauseWhileEntriesAreQueued) {
@@ -246,14 +246,12 @@ TEST_F(WatchingTheQueue, EndsWhenNothingProcessesTheQueue) {
 }
 
 TEST_F(WatchingTheQueue, JsonTellsTheActivity) {
-  const long resume = time(nullptr) + 3600;
-  WriteFile(kSettings, "thumb_conv_resume_time=\"" + std::to_string(resume) + "\"\n");
+  const std::string resume = Pause();
   WriteFile(kPhotoQueue, "/tmp/a\n");
   Program watch = Start({"--watch", "--json"});
   ASSERT_TRUE(WaitForOutput(watch, "\n"));
   const Json::Value paused = ReadJson(watch.Output());
-  ExpectMembers(paused,
-                "{\"activity\": \"paused\", \"resume_time\": " + std::to_string(resume) + "}");
+  ExpectMembers(paused, "{\"activity\": \"paused\", \"resume_time\": " + resume + "}");
   EXPECT_GT(paused["seconds_until_resume"].asInt(), 3500);
   WriteFile(kSettings, "");
   ASSERT_TRUE(WaitForOutput(watch, "\"activity\":\"waiting\""));

@@ -41,16 +41,6 @@ std::string FinalText(const char* newline) {
   return text + "no velathumb is running" + newline;
 }
 
-bool WaitForOutput(const Program& program, const std::string& text) {
-  for (int i = 0; i < 2000; ++i) {
-    if (program.Output().find(text) != std::string::npos) {
-      return true;
-    }
-    std::this_thread::sleep_for(milliseconds(10));
-  }
-  return false;
-}
-
 void AddThumbs(int total, int completed) {
   AddConvProgress(THUMB_TYPE_PHOTO, "total_thumb", total);
   AddConvProgress(THUMB_TYPE_PHOTO, "completed_thumb", completed);

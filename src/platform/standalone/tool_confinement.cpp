@@ -56,8 +56,8 @@ std::string DirectoryOf(const std::string& path) {
   return slash == 0 ? "/" : path.substr(0, slash);
 }
 
-/// Returns the directory of an output. Percent signs are doubled in the names of outputs.
-std::string OutputDirectory(const std::string& argument) {
+/// Percent signs are doubled in the names of outputs.
+std::string WithoutDoubledPercents(const std::string& argument) {
   std::string path;
   for (size_t i = 0; i < argument.size(); ++i) {
     path += argument[i];
@@ -65,7 +65,7 @@ std::string OutputDirectory(const std::string& argument) {
       ++i;
     }
   }
-  return DirectoryOf(path);
+  return path;
 }
 
 /// Returns the file that the converter's argument names: the argument without a page selection.
@@ -80,6 +80,17 @@ void AddUnique(Arguments& list, const std::string& text) {
   if (std::find(list.begin(), list.end(), text) == list.end()) {
     list.push_back(text);
   }
+}
+
+/// Allows the directory of one output. That of a picture that is turned in place is named like the
+/// input. In any other "jpg:/tmp/a.jpg" the beginning is part of a relative path, which a photo may
+/// have, and does not open /tmp.
+void AllowOutput(const std::string& argument, const std::string& input, AllowedFiles& files) {
+  if (argument == kDiscardedOutput) {
+    return;
+  }
+  const std::string path = argument == input ? input : WithoutDoubledPercents(argument);
+  AddUnique(files.outputs, DirectoryOf(path));
 }
 
 /// Options with their values come first, then the input; an output follows each "-write", and the
@@ -106,7 +117,7 @@ void AllowConverter(const Arguments& arguments, Confinement& confinement) {
   files.inputs.push_back(InputFile(arguments[input]));
   for (size_t i = input + 1; i < arguments.size(); ++i) {
     if (arguments[i - 1] == "-write" || i + 1 == arguments.size()) {
-      AddUnique(files.outputs, OutputDirectory(arguments[i]));
+      AllowOutput(arguments[i], arguments[input], files);
     }
   }
   if (!hasScratchDirectory && !files.outputs.empty()) {

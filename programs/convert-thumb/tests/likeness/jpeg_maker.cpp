@@ -1,21 +1,11 @@
 #include "likeness/jpeg_maker.h"
 
 #include <algorithm>
-#include <cstdio>  // before jpeglib.h, which uses FILE
-#include <cstdlib>
 
-#include <jpeglib.h>
-
-#include "support/environment_failure.h"
+#include "support/jpeg_encoder.h"
 
 namespace vela_test {
 namespace {
-
-[[noreturn]] void EncoderFailed(j_common_ptr encoder) {
-  char message[JMSG_LENGTH_MAX];
-  encoder->err->format_message(encoder, message);
-  EnvironmentFailure(std::string("cannot encode a JPEG: ") + message);
-}
 
 bool HasInks(JpegColours colours) {
   return colours == JpegColours::kCmyk || colours == JpegColours::kLumaChromaInk;
@@ -132,24 +122,15 @@ void WriteRows(const Samples& picture, const JpegKind& kind, jpeg_compress_struc
 }  // namespace
 
 std::string EncodeKind(const Samples& picture, const JpegKind& kind) {
-  jpeg_compress_struct encoder{};
-  jpeg_error_mgr errors{};
-  encoder.err = jpeg_std_error(&errors);
-  errors.error_exit = EncoderFailed;
-  jpeg_create_compress(&encoder);
-  unsigned char* bytes = nullptr;
-  unsigned long size = 0;
-  jpeg_mem_dest(&encoder, &bytes, &size);
-  SetInput(picture, kind.colours, &encoder);
-  SetKind(kind, &encoder);
-  jpeg_start_compress(&encoder, TRUE);
-  WriteMetadata(kind, &encoder);
-  WriteRows(picture, kind, &encoder);
-  jpeg_finish_compress(&encoder);
-  std::string file(reinterpret_cast<const char*>(bytes), size);
-  jpeg_destroy_compress(&encoder);
-  std::free(bytes);
-  return file;
+  return EncodeJpeg(
+      [&](jpeg_compress_struct* encoder) {
+        SetInput(picture, kind.colours, encoder);
+        SetKind(kind, encoder);
+      },
+      [&](jpeg_compress_struct* encoder) {
+        WriteMetadata(kind, encoder);
+        WriteRows(picture, kind, encoder);
+      });
 }
 
 }  // namespace vela_test
