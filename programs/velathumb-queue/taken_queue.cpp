@@ -40,11 +40,12 @@ QueuePaths PhotoQueuePaths() {
 
 int TakenQueue::RemoveEmptyQueue(time_t modified) const {
   // The process that has just created it is waiting for the lock; if the file were removed at once,
-  // both could repeat that forever. That process may have been killed, though.
+  // both could repeat that forever. That process may have been killed, though. Until then it counts
+  // as locked: a service that ended would be started again at once, as the file exists.
   constexpr time_t kGracePeriod = 10;  // seconds
   const time_t age = time(nullptr) - modified;
   if (age >= 0 && age <= kGracePeriod) {
-    return ENOENT;
+    return EWOULDBLOCK;
   }
   const int error = RemoveFileIfPresent(paths_.queue);
   return error != 0 ? error : ENOENT;

@@ -35,7 +35,7 @@ class TakenQueue {
     kNothing,  ///< no entries
     kResumed,  ///< entries that an earlier run has left
     kTaken,    ///< new entries
-    kBusy,     ///< the queue is locked; to be tried again
+    kBusy,     ///< the queue is locked, or new and still empty; to be tried again
     kFailed,   ///< the reason is logged
   };
 

@@ -90,7 +90,7 @@ void Append(char* buffer, size_t& length, std::string_view text) {
 }  // namespace
 
 void LogFailuresOf(const std::string& source) {
-  std::string name = EscapeControls(PhotoName(AbsolutePath(source)), InvalidBytes::kKeep);
+  std::string name = EscapeControls(PhotoName(AbsolutePath(source)), InvalidBytes::kEscape);
   name = std::string(kPrefix) + (name.empty() ? "" : name + ": ");
   std::string reportedSource = source + ": ";
   std::replace_if(reportedSource.begin(), reportedSource.end(), IsControl, ' ');
@@ -131,7 +131,7 @@ void LogFailure() {
     std::string_view line = g_line;
     const bool isNamed = line.substr(0, log->source.size()) == log->source;
     line.remove_prefix(isNamed ? log->source.size() : 0);
-    log->connection.SendError(log->beginning + EscapeControls(line, InvalidBytes::kKeep));
+    log->connection.SendError(log->beginning + EscapeControls(line, InvalidBytes::kEscape));
   } catch (const std::exception&) {
     log->connection.SendError(log->beginning + "out of memory");
   }

@@ -81,10 +81,11 @@ TEST_F(FailureLog, HasTheWholePathOfARelativeName) {
 }
 
 TEST_F(FailureLog, IsOneLineWhateverThePhotosName) {
-  Fail(MakeText("a\n<11>sshd: accepted\x1b[2J\xe2\x80\xa8.jpg"));
-  EXPECT_EQ(ErrorLines(),
-            Lines{"convert-thumb: /tmp/converter/a\\n<11>sshd: accepted\\x1b[2J\\xe2\\x80\\xa8.jpg:"
-                  " not a photo in a known format"});
+  Fail(MakeText("a\n<11>sshd: accepted\x1b[2J\xe2\x80\xa8\xe9.jpg"));
+  EXPECT_EQ(
+      ErrorLines(),
+      Lines{"convert-thumb: /tmp/converter/a\\n<11>sshd: accepted\\x1b[2J\\xe2\\x80\\xa8\\xe9.jpg:"
+            " not a photo in a known format"});
 }
 
 TEST_F(FailureLog, HasTheReasonThatImageMagickGives) {

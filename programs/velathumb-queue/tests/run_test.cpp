@@ -19,6 +19,12 @@ TEST_F(QueueRunTest, WithoutAQueueDoesNothing) {
   EXPECT_THAT(ListDirectory("/var/spool"), IsEmpty());
 }
 
+TEST_F(QueueRunTest, EndsOnlyWhenANewEmptyQueueIsFilledOrGone) {
+  WriteFile(kQueueFile, "");
+  SetFileTimeFromNow(kQueueFile, -8);
+  ExpectRun({});
+}
+
 TEST_F(QueueRunTest, TakesEachEntryOnceInTheOrderOfFirstAppearance) {
   Enqueue({"/tmp/c", "/tmp/a", "/tmp/c", "R:/tmp/a", "/tmp/b", "/tmp/a"});
   ExpectRun({"/tmp/c", "/tmp/a", "R:/tmp/a", "/tmp/b"});

@@ -293,7 +293,7 @@ TEST_F(TakenQueueTest, EntriesThatCannotBePutBackAreKept) {
 
 TEST_F(TakenQueueTest, ANewEmptyQueueIsLeftToItsWriter) {
   WriteFile(kQueueFile, "");
-  EXPECT_EQ(taken_.Take(), Outcome::kNothing);
+  EXPECT_EQ(taken_.Take(), Outcome::kBusy);
   EXPECT_TRUE(Exists(kQueueFile));
   EXPECT_FALSE(Exists(kTakenFile));
   AppendToQueue({"/a"});

@@ -156,7 +156,10 @@ void Performance::WriteNextOutputs(size_t count,
 void Performance::Print(int descriptor, const std::string& text, size_t times) {
   for (size_t i = 0; i < times; ++i) {
     if (WriteWhole(descriptor, text) != 0) {
-      status_ = 1;  // the reader has closed its end
+      // The reader has closed its end. A write that had to wait fails without SIGPIPE, which only
+      // the next one raises.
+      status_ = 1;
+      WriteWhole(descriptor, text);
       return;
     }
   }
