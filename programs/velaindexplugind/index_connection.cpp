@@ -116,6 +116,22 @@ int EndOf(int stepCode) {
 
 }  // namespace
 
+bool IndexResult::IsUnusable() const {
+  constexpr int kPrimaryCode = 0xff;
+  if (code == kNewerTables) {
+    return true;
+  }
+  switch (code & kPrimaryCode) {
+    case SQLITE_NOTADB:
+    case SQLITE_CORRUPT:
+    case SQLITE_PERM:
+    case SQLITE_READONLY:
+      return true;
+    default:
+      return false;
+  }
+}
+
 IndexResult IndexConnection::ResultOf(int code) const {
   if (code == SQLITE_OK) {
     return {};

@@ -20,6 +20,10 @@ struct IndexResult {
 
   bool IsOk() const { return code == SQLITE_OK; }
 
+  /// Returns whether the operation fails again until an administrator changes or removes the
+  /// database.
+  bool IsUnusable() const;
+
   /// Returns whether the operation failed because other writers held the database.
   bool IsBusy() const {
     constexpr int kPrimaryCode = 0xff;

@@ -9,7 +9,6 @@
 #include <cerrno>
 #include <cstdio>
 #include <cstdlib>
-#include <cstring>
 
 #include "instance_lock.h"
 #include "log.h"
@@ -23,10 +22,6 @@ namespace {
 constexpr int kBacklog = 4096;
 constexpr mode_t kSocketMode = 0660;
 constexpr int kBindTries = 100;
-
-std::string ErrorAt(const std::string& what, int error) {
-  return what + ": " + std::strerror(error);
-}
 
 /// Returns 0 when a process listens at the path, otherwise an errno value.
 int TryConnect(const std::string& path) {
@@ -57,7 +52,7 @@ bool MoveAside(const std::string& path) {
 
 /// All users can write to the directory of the socket. None of them must be able to keep root's
 /// daemon from starting, or to answer in its place, by creating the socket first.
-std::string Evict(const std::string& path, uid_t owner) {
+StartProblem Evict(const std::string& path, uid_t owner) {
   LogLine(LogLevel::kWarning, "socket").Add("replaced", path).Add("owner", UserName(owner)).Write();
   if (unlink(path.c_str()) == 0 || errno == ENOENT) {
     return {};
@@ -65,29 +60,29 @@ std::string Evict(const std::string& path, uid_t owner) {
   if (errno == EISDIR && MoveAside(path)) {
     return {};
   }
-  return ErrorAt(path, errno);
+  return ProblemAt(path, errno);
 }
 
 /// Removes what is at the path, if it is not in use.
-std::string ClearPath(const std::string& path) {
+StartProblem ClearPath(const std::string& path) {
   struct stat status;
   if (lstat(path.c_str(), &status) != 0) {
-    return errno == ENOENT ? std::string() : ErrorAt(path, errno);
+    return errno == ENOENT ? StartProblem() : ProblemAt(path, errno);
   }
   if (EffectiveUser() == 0 && status.st_uid != 0) {
     return Evict(path, status.st_uid);
   }
   if (!S_ISSOCK(status.st_mode)) {
-    return path + " is not a socket";
+    return {path + " is not a socket", true};
   }
   const int error = TryConnect(path);
   if (error == 0) {
-    return "another instance listens at " + path;
+    return {"another instance listens at " + path};
   }
   if (error != ECONNREFUSED) {
-    return error == ENOENT ? std::string() : ErrorAt(path, error);
+    return error == ENOENT ? StartProblem() : ProblemAt(path, error);
   }
-  return unlink(path.c_str()) == 0 || errno == ENOENT ? std::string() : ErrorAt(path, errno);
+  return unlink(path.c_str()) == 0 || errno == ENOENT ? StartProblem() : ProblemAt(path, errno);
 }
 
 /// An ordinary user who starts the daemon keeps it private.
@@ -105,26 +100,26 @@ int BindPrivately(int fd, const std::string& path) {
 
 }  // namespace
 
-std::string ListeningSocket::TakeFromManager(bool& isTaken) {
+StartProblem ListeningSocket::TakeFromManager(bool& isTaken) {
   isTaken = false;
   const int count = sd_listen_fds(1);
   if (count < 0) {
-    return ErrorAt("sockets from the service manager", -count);
+    return ProblemAt("sockets from the service manager", -count);
   }
   if (count == 0) {
     return {};
   }
   if (count > 1) {
-    return "the service manager passed more than one socket";
+    return {"the service manager passed more than one socket", true};
   }
   socket_ = FileDescriptor(SD_LISTEN_FDS_START);
   const int isRight = sd_is_socket(socket_.Get(), AF_UNIX, SOCK_STREAM, 1);
   if (isRight <= 0) {
-    return "the service manager passed something other than a listening local socket";
+    return {"the service manager passed something other than a listening local socket", true};
   }
   const int flags = fcntl(socket_.Get(), F_GETFL);
   if (flags < 0 || fcntl(socket_.Get(), F_SETFL, flags | O_NONBLOCK) != 0) {
-    return ErrorAt("the socket from the service manager", errno);
+    return ProblemAt("the socket from the service manager", errno);
   }
   isTaken = true;
   return {};
@@ -134,37 +129,42 @@ std::string ListeningSocket::Address() const {
   return LocalAddressOf(socket_.Get());
 }
 
-std::string ListeningSocket::Bind(const std::string& path) {
+bool ListeningSocket::HasOtherGroup(gid_t group) const {
+  struct stat status;
+  return lstat(Address().c_str(), &status) == 0 && status.st_gid != group;
+}
+
+StartProblem ListeningSocket::Bind(const std::string& path) {
   if (!FitsLocalAddress(path)) {
-    return ErrorAt(path, ENAMETOOLONG);
+    return ProblemAt(path, ENAMETOOLONG);
   }
   socket_ = MakeLocalSocket();
   if (!socket_.IsOpen()) {
-    return ErrorAt("socket", errno);
+    return ProblemAt("socket", errno);
   }
   // Another user may occupy the path again before the daemon binds it, but not every time.
   int error = EADDRINUSE;
   for (int i = 0; i < kBindTries && error == EADDRINUSE; ++i) {
-    const std::string problem = ClearPath(path);
-    if (!problem.empty()) {
+    const StartProblem problem = ClearPath(path);
+    if (!problem.IsNone()) {
       return problem;
     }
     error = BindPrivately(socket_.Get(), path);
   }
-  return error == 0 ? std::string() : ErrorAt(path, error);
+  return error == 0 ? StartProblem() : ProblemAt(path, error);
 }
 
-std::string ListeningSocket::Make(const std::string& path, std::optional<gid_t> group) {
-  std::string problem = LockSocket(path, lock_);
-  if (problem.empty()) {
+StartProblem ListeningSocket::Make(const std::string& path, std::optional<gid_t> group) {
+  StartProblem problem = LockSocket(path, lock_);
+  if (problem.IsNone()) {
     problem = Bind(path);
   }
-  if (!problem.empty()) {
+  if (!problem.IsNone()) {
     return problem;
   }
   struct stat status;
   if (lstat(path.c_str(), &status) != 0) {
-    return ErrorAt(path, errno);
+    return ProblemAt(path, errno);
   }
   path_ = path;
   device_ = status.st_dev;
@@ -172,7 +172,7 @@ std::string ListeningSocket::Make(const std::string& path, std::optional<gid_t> 
   const bool isReady = lchown(path.c_str(), EffectiveUser(), group.value_or(DefaultGroup())) == 0 &&
                        chmod(path.c_str(), kSocketMode) == 0 &&
                        listen(socket_.Get(), kBacklog) == 0;
-  return isReady ? std::string() : ErrorAt(path, errno);
+  return isReady ? StartProblem() : ProblemAt(path, errno);
 }
 
 bool ListeningSocket::Unlink() {

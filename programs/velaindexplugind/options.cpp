@@ -20,7 +20,7 @@ constexpr ProgramText kProgramText = {
     "Answers requests about photos and videos on the local socket of the index service and stores\n"
     "their data in the embedded index database. Runs in the foreground.",
     "Exit status: 0 ended by a signal or request carried out, 1 could not start or request not\n"
-    "carried out, 2 invalid command line."};
+    "carried out, 2 invalid command line, 78 could not start with these options or this index."};
 
 /// Options that are parsed further.
 struct OptionText {

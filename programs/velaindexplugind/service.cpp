@@ -1,5 +1,6 @@
 #include "service.h"
 
+#include <sysexits.h>
 #include <systemd/sd-daemon.h>
 
 #include <chrono>
@@ -21,11 +22,13 @@
 #include "listening_socket.h"
 #include "log.h"
 #include "posix/accounts.h"
+#include "posix/files.h"
 #include "posix/processes.h"
 #include "request_handler.h"
 #include "request_log.h"
 #include "server.h"
 #include "settings.h"
+#include "start_problem.h"
 
 namespace vela {
 
@@ -33,6 +36,8 @@ namespace {
 
 constexpr int kStarted = 0;
 constexpr int kNotStarted = 1;
+/// Not without an administrator: systemd need not start the daemon again.
+constexpr int kMisconfigured = EX_CONFIG;
 
 /// The age at which a request that waits to write to the index fails.
 constexpr std::chrono::milliseconds kWriteTimeout(5000);
@@ -69,6 +74,16 @@ void LogGroupFailure(const std::string& path, gid_t group, int error) {
       .Add("path", path)
       .Add("gid", group)
       .Add("error", std::strerror(error))
+      .Add("advice", "a service without CAP_CHOWN needs Group= in its unit")
+      .Write();
+}
+
+void LogSocketGroup(const std::string& path, gid_t group) {
+  LogLine(LogLevel::kWarning, "socket")
+      .Add("path", path)
+      .Add("gid", group)
+      .Add("error", "it keeps the group that the service manager has given it")
+      .Add("advice", "set SocketGroup= in its unit")
       .Write();
 }
 
@@ -76,8 +91,7 @@ class Service {
  public:
   explicit Service(const Options& options) : options_(options), log_(options.logRequests) {}
 
-  /// Returns an error message, empty on success.
-  std::string Start();
+  StartProblem Start();
 
   /// Serves requests until a signal stops the daemon.
   void Run();
@@ -87,10 +101,10 @@ class Service {
   static int OnReloadSignal(sd_event_source* source, const signalfd_siginfo* info, void* service);
   static int OnStopTime(sd_event_source* source, uint64_t time, void* service);
 
-  std::string FindOptionsGroup();
-  std::string OpenIndex();
-  std::string OpenSocket();
-  std::string StartServer();
+  StartProblem FindOptionsGroup();
+  StartProblem OpenIndex();
+  StartProblem OpenSocket();
+  StartProblem StartServer();
   int WatchSignals();
   void LoadSettings(const char* event);
   void BeginStop(const char* signalName);
@@ -109,31 +123,39 @@ class Service {
   bool isStopping_ = false;
 };
 
-std::string Service::FindOptionsGroup() {
+StartProblem Service::FindOptionsGroup() {
   if (options_.group.empty()) {
     return {};
   }
   group_ = FindGroup(options_.group);
-  return group_ ? std::string() : "there is no group " + options_.group;
+  return group_ ? StartProblem() : StartProblem{"there is no group " + options_.group, true};
 }
 
-std::string Service::OpenIndex() {
+StartProblem Service::OpenIndex() {
   const IndexFile file = {options_.database, group_, true, LogGroupFailure};
-  std::string problem = LockIndex(file, lock_);
-  if (!problem.empty()) {
+  const std::optional<FileStatus> status = ExamineFile(file.path);
+  if (status && !status->isRegular) {
+    return {file.path + " is not a file", true};
+  }
+  StartProblem problem = LockIndex(file, lock_);
+  if (!problem.IsNone()) {
     return problem;
   }
   index_ = std::make_unique<IndexStore>(file);
   handler_ = std::make_unique<RequestHandler>(*index_);
   writer_ = std::make_unique<IndexWriter>(*index_, kWriteTimeout);
   const IndexResult opened = index_->Open();
-  return opened.IsOk() ? std::string() : file.path + ": " + opened.message;
+  return opened.IsOk() ? StartProblem()
+                       : StartProblem{file.path + ": " + opened.message, opened.IsUnusable()};
 }
 
-std::string Service::OpenSocket() {
+StartProblem Service::OpenSocket() {
   bool isTaken = false;
-  const std::string problem = socket_.TakeFromManager(isTaken);
-  if (!problem.empty() || isTaken) {
+  StartProblem problem = socket_.TakeFromManager(isTaken);
+  if (isTaken && group_ && socket_.HasOtherGroup(*group_)) {
+    LogSocketGroup(socket_.Address(), *group_);
+  }
+  if (!problem.IsNone() || isTaken) {
     return problem;
   }
   return socket_.Make(PluginDaemonSocketPath, group_);
@@ -195,7 +217,7 @@ int Service::WatchSignals() {
   return result;
 }
 
-std::string Service::StartServer() {
+StartProblem Service::StartServer() {
   sd_event* loop = nullptr;
   int result = sd_event_new(&loop);
   loop_.reset(loop);
@@ -203,7 +225,7 @@ std::string Service::StartServer() {
     result = WatchSignals();
   }
   if (result < 0) {
-    return std::string("event loop: ") + std::strerror(-result);
+    return ProblemAt("event loop", -result);
   }
   ServerLimits limits;
   limits.workers = options_.workers;
@@ -211,21 +233,21 @@ std::string Service::StartServer() {
   limits.clientTimeout = std::chrono::seconds(options_.clientTimeout);
   server_ = std::make_unique<Server>(loop, limits, *handler_, *writer_, log_);
   const int error = server_->Start(socket_.Fd());
-  return error == 0 ? std::string() : std::string("event loop: ") + std::strerror(error);
+  return error == 0 ? StartProblem() : ProblemAt("event loop", error);
 }
 
-std::string Service::Start() {
-  std::string problem = FindOptionsGroup();
-  if (problem.empty()) {
+StartProblem Service::Start() {
+  StartProblem problem = FindOptionsGroup();
+  if (problem.IsNone()) {
     problem = OpenIndex();
   }
-  if (problem.empty()) {
+  if (problem.IsNone()) {
     problem = OpenSocket();
   }
-  if (problem.empty()) {
+  if (problem.IsNone()) {
     problem = StartServer();
   }
-  if (!problem.empty()) {
+  if (!problem.IsNone()) {
     return problem;
   }
   LogLine(LogLevel::kInfo, "start")
@@ -280,22 +302,22 @@ void Service::Run() {
 }  // namespace
 
 int RunService(const Options& options) {
-  std::string problem;
+  StartProblem problem;
   try {
     // The event loop receives these; threads started later inherit the block.
     BlockSignals({SIGTERM, SIGINT, SIGHUP});
     IgnoreBrokenPipes();
     Service service(options);
     problem = service.Start();
-    if (problem.empty()) {
+    if (problem.IsNone()) {
       service.Run();
       return kStarted;
     }
   } catch (const std::exception& error) {
-    problem = error.what();
+    problem = {error.what()};
   }
-  LogLine(LogLevel::kError, "start").Add("error", problem).Write();
-  return kNotStarted;
+  LogLine(LogLevel::kError, "start").Add("error", problem.text).Write();
+  return problem.isPermanent ? kMisconfigured : kNotStarted;
 }
 
 }  // namespace vela

@@ -5,8 +5,8 @@
 
 namespace vela {
 
-/// Runs the daemon until a signal ends it. Returns the exit status: 0, or 1 when it could not
-/// start, which is then logged.
+/// Runs the daemon until a signal ends it. Returns the exit status: 0, or, when it could not start,
+/// which is then logged, 78 if only an administrator can change that and 1 otherwise.
 int RunService(const Options& options);
 
 }  // namespace vela

@@ -19,16 +19,6 @@ namespace {
 constexpr std::chrono::seconds kSecondLook(1);
 constexpr std::chrono::milliseconds kStopInterval(20);
 
-/// Returns where the profile file has its first error, and which; empty when that is unknown.
-std::string FirstErrorIn(const std::string& profileFile) {
-  for (const Finding& finding : CheckProfile(profileFile).findings) {
-    if (finding.severity == Severity::kError && finding.line != 0) {
-      return ": line " + std::to_string(finding.line) + ": " + finding.message;
-    }
-  }
-  return {};
-}
-
 /// Returns why velathumb would make no thumbnail with this profile file, empty when it would.
 std::string FindProfileFault(const std::string& profileFile) {
   const int error = CheckAccess(profileFile, FileAccess::kRead);
@@ -37,7 +27,8 @@ std::string FindProfileFault(const std::string& profileFile) {
   }
   ThumbnailProfileList profiles;
   if (ParseThumbnailProfiles(profiles, profileFile, "/") == 0) {
-    return "cannot parse the profile " + profileFile + FirstErrorIn(profileFile);
+    const std::string where = FirstErrorOfProfile(profileFile);
+    return "cannot parse the profile " + profileFile + (where.empty() ? "" : ": ") + where;
   }
   if (GetProfileCount(profiles, kAllPhases) == 0) {
     return "the profile " + profileFile +

@@ -1,13 +1,9 @@
 #include "conversion_pause.h"
 
-#include <json/value.h>
-
 #include <algorithm>
 
-#include "ipc/absent_daemon.h"
+#include "ipc/photo_switch.h"
 #include "ipc/velamk_ipc.h"
-#include "platform/velaindex.h"
-#include "platform/vlibc.h"
 #include "posix/service_log.h"
 #include "progress/resume_state.h"
 
@@ -26,22 +22,15 @@ std::chrono::seconds TimeToNextCheck() {
   return std::clamp(TimeUntilResume(), std::chrono::seconds(1), kLongestWait);
 }
 
-bool IsTrue(const Json::Value& packet, const char* name) {
-  const Json::Value value = packet.isObject() ? packet[name] : Json::Value();
-  return value.isConvertibleTo(Json::booleanValue) && value.asBool();
-}
-
 }  // namespace
 
-/// Sends the request of IsDisableConvertPhoto, but does not wait half an hour for a daemon that
-/// does not answer, because the runner handles no signals meanwhile.
+/// Does not wait half an hour for a daemon that does not answer, because the runner handles no
+/// signals meanwhile.
 bool PauseGate::IsSwitchedOff() {
-  constexpr int kAnswerTimeout = 3;  // seconds
-  Json::Value packet(Json::objectValue);
-  packet["command"] = "IS_DISABLE_CONVERT_PHOTO";
-  const int result = AutoSendRecvPacket(PluginDaemonSocketPath, -1, packet, kAnswerTimeout);
-  NoteAbsence(result != 0 && IsNobodyListening(VLIBCErrGet()));
-  return IsTrue(packet, "success") && IsTrue(packet, "result");
+  constexpr std::chrono::seconds kAnswerLimit(3);
+  const PhotoSwitch answer = AskPhotoSwitch(kAnswerLimit);
+  NoteAbsence(answer.isNobodyListening);
+  return answer.isOff;
 }
 
 void PauseGate::NoteAbsence(bool isAbsent) {

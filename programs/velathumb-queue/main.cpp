@@ -36,6 +36,8 @@ constexpr int kEntriesLeft = 1;
 constexpr int kError = 2;
 /// Nothing but a change of the configuration helps: systemd need not start the program again.
 constexpr int kMisconfigured = EX_CONFIG;
+/// The same for the command line, which must not look like an error that may pass.
+constexpr int kInvalidCommandLine = EX_USAGE;
 
 constexpr const char* kLockFile = kQueueRunnerLock;
 
@@ -203,5 +205,6 @@ int Run(RunSettings& settings) {
 }  // namespace vela
 
 int main(int argc, char** argv) {
-  return vela::RunProgram(argc, argv, vela::ParseOptions, vela::Run, vela::kError);
+  return vela::RunProgram(argc, argv, vela::ParseOptions, vela::Run, vela::kError,
+                          vela::kInvalidCommandLine);
 }

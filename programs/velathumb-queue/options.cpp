@@ -18,6 +18,7 @@ constexpr ProgramText kProgramText = {
     "Exit status: 0 the queue is empty, or the entries were queued for a service, 1 entries are "
     "left for a later run: stopped by a signal,\n"
     "entries that cannot be processed now, or another velathumb-queue is running; 2 error;\n"
+    "64 invalid command line;\n"
     "78 velathumb cannot be started, or would make nothing, or nothing right, with this profile or "
     "these settings."};
 

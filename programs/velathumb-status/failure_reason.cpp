@@ -9,6 +9,7 @@
 #include <optional>
 #include <string_view>
 
+#include "checks/configuration_check.h"
 #include "configuration/setting_values.h"
 #include "configuration/settings.h"
 #include "convert/photo_convert_job.h"
@@ -102,6 +103,17 @@ std::string_view MainLine(std::string_view output) {
   return last.empty() ? first : last;
 }
 
+/// Returns what can be said of a photo that the converter accepts.
+std::string ReasonOfProfile() {
+  const std::string profile = DefaultProfileFile();
+  const std::string error = FirstErrorOfProfile(profile);
+  if (!error.empty()) {
+    return "it can be converted, but not with the profile " + profile + ": " + error;
+  }
+  return "it can be converted now: the cause is gone, or it is in the profile; the system log has "
+         "the reason that it had then";
+}
+
 std::string ReasonOfConverter(const std::string& source, const std::string& scratch) {
   const std::string define = "registry:temporary-path=" + scratch;
   const bool hasPages = BlVELAIndexIsMultiplePagePhotoFile(source.c_str());
@@ -115,9 +127,7 @@ std::string ReasonOfConverter(const std::string& source, const std::string& scra
   }
   const ToolEnd end = AwaitTool(stream);
   if (end.status == 0) {
-    return "it can be converted now: the cause is gone, or it is in the profile; the system log "
-           "has "
-           "the reason that it had then";
+    return ReasonOfProfile();
   }
   const std::string_view line = MainLine(end.output);
   return line.empty() ? NoMessage(kConvertToolPath) : WithoutName(line, source);
@@ -216,9 +226,9 @@ std::string FindFailureReason(const PhotoReport& photo) {
 }
 
 std::string ReasonFinder::Find(const PhotoReport& photo) {
-  if (photos_ >= kMostPhotos || time_ >= kLongest) {
+  if (photos_ >= kMostPhotos || time_ >= longest_) {
     return "not examined: only the first " + std::to_string(kMostPhotos) + " failed photos are, " +
-           "for " + std::to_string(kLongest.count()) + " seconds";
+           "for " + std::to_string(longest_.count()) + " seconds";
   }
   ++photos_;
   const auto begin = std::chrono::steady_clock::now();

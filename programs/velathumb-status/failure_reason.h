@@ -21,7 +21,8 @@ class ReasonFinder : public StatusSink {
   static constexpr int kMostPhotos = 100;
   static constexpr std::chrono::seconds kLongest{60};
 
-  explicit ReasonFinder(StatusSink& next) : next_(next) {}
+  explicit ReasonFinder(StatusSink& next, std::chrono::seconds longest = kLongest)
+      : next_(next), longest_(longest) {}
 
   void BeginDirectory() override { next_.BeginDirectory(); }
   void TakePhoto(const PhotoReport& photo) override;
@@ -32,6 +33,7 @@ class ReasonFinder : public StatusSink {
   std::string Find(const PhotoReport& photo);
 
   StatusSink& next_;
+  const std::chrono::seconds longest_;
   int photos_ = 0;
   std::chrono::steady_clock::duration time_{};
 };

@@ -16,6 +16,7 @@
 #include "progress_bar.h"
 #include "progress_rate.h"
 #include "progress_report.h"
+#include "storage/creation_queue.h"
 
 namespace vela {
 
@@ -33,6 +34,8 @@ const char* ActivityName(Activity activity) {
   switch (activity) {
     case Activity::kRunning:
       return "running";
+    case Activity::kIdle:
+      return "idle";
     case Activity::kPaused:
       return "paused";
     case Activity::kWaiting:
@@ -43,11 +46,25 @@ const char* ActivityName(Activity activity) {
   return "ended";
 }
 
+Json::Value PauseName(Pause pause) {
+  switch (pause) {
+    case Pause::kNone:
+      break;
+    case Pause::kResumeTime:
+      return "resume_time";
+    case Pause::kIndexService:
+      return "index_service";
+  }
+  return {};
+}
+
 /// Returns what has to change for a new line.
 Json::Value DescribeState(const ConversionState& state) {
   Json::Value object = DescribeProgress(state.progress);
   object["activity"] = ActivityName(state.activity);
-  object["resume_time"] = state.activity == Activity::kPaused
+  object["paused_by"] = PauseName(state.pause);
+  object["deferred_entries"] = Json::Int64{state.deferred};
+  object["resume_time"] = state.pause == Pause::kResumeTime
                               ? Json::Value(Json::Int64{state.resume.resumeTime})
                               : Json::Value();
   return object;
@@ -61,20 +78,23 @@ Json::Value DescribeMoment(const ConversionState& state, const FollowedCount& fo
   object["unit"] = followed.unit;
   object["rate"] = perSecond ? Json::Value(*perSecond) : Json::Value();
   object["seconds_left"] = left ? Json::Value(Json::Int64{left->count()}) : Json::Value();
-  object["seconds_until_resume"] =
-      state.activity == Activity::kPaused && state.resume.resumeTime > 0
-          ? Json::Value(Json::Int64{state.resume.waitSeconds})
-          : Json::Value();
+  object["seconds_until_resume"] = state.pause == Pause::kResumeTime && state.resume.resumeTime > 0
+                                       ? Json::Value(Json::Int64{state.resume.waitSeconds})
+                                       : Json::Value();
   return object;
 }
 
-/// Returns the line for a terminal of `width` columns. During a pause the counters are those of an
-/// earlier run, and a bar would show it as finished.
+/// Returns the line for a terminal of `width` columns. While no velathumb is running the counters
+/// may be those of an earlier run, and a bar would show it as finished.
 std::string FormatLine(const ConversionState& state, const FollowedCount& followed,
                        const ProgressRate& rate, int width) {
   switch (state.activity) {
     case Activity::kPaused:
-      return ResumeText(state.resume);
+      return PauseText(state);
+    case Activity::kIdle:
+      return HasPhotosToProcess() ? "velathumb-queue is running, but no velathumb: it counts "
+                                    "photos, or directories are locked"
+                                  : "velathumb-queue is waiting for entries";
     case Activity::kWaiting:
       return "the queue has entries, waiting for velathumb-queue";
     case Activity::kRunning:
@@ -125,9 +145,13 @@ class ProgressView {
     }
     WriteProgressText(out_, state.progress);
     if (state.activity == Activity::kPaused) {
-      out_ << ResumeText(state.resume) << '\n';
+      out_ << PauseText(state) << '\n';
     } else if (state.activity == Activity::kWaiting) {
       out_ << "the queue has entries, but nothing processes them; velathumb-queue would\n";
+    }
+    if (state.deferred > 0) {
+      out_ << state.deferred << (state.deferred == 1 ? " entry is" : " entries are")
+           << " deferred to a later run; velathumb-status --queue lists them\n";
     }
   }
 
@@ -141,46 +165,67 @@ class ProgressView {
   std::string lastLine_;
 };
 
-/// Notices that nothing processes the entries of the queue.
-class UnattendedQueue {
+/// Notices that nothing happens.
+class Standstill {
  public:
-  explicit UnattendedQueue(std::chrono::milliseconds limit) : limit_(limit) {}
+  using Clock = std::chrono::steady_clock;
 
-  /// Takes one state after the other. Returns whether the queue has been waiting in the same state
-  /// for longer than the limit.
-  bool IsGivenUp(const ConversionState& state) {
+  /// Takes one state after the other. Returns for how long it has been the same.
+  Clock::duration Note(const ConversionState& state) {
     const auto now = Clock::now();
     std::string description = ToJsonText(DescribeState(state));
-    if (state.activity != Activity::kWaiting || description != last_) {
+    if (description != last_) {
       last_ = std::move(description);
       since_ = now;
     }
-    return state.activity == Activity::kWaiting && now - since_ >= limit_;
+    return now - since_;
   }
 
  private:
-  using Clock = std::chrono::steady_clock;
-
-  const std::chrono::milliseconds limit_;
   std::string last_;
   Clock::time_point since_;
 };
 
+/// Reads and shows one state after the other.
+class Watch {
+ public:
+  Watch(ProgressView& view, const WatchLimits& limits) : view_(view), limits_(limits) {}
+
+  /// Returns whether there is more to follow.
+  bool Step() {
+    state_ = observer_.Read();
+    const auto standstill = standstill_.Note(state_);
+    const bool hasVelathumb = !state_.progress.instances.empty();
+    if (state_.activity == Activity::kRunning && !hasVelathumb && standstill >= limits_.idle) {
+      state_.activity = Activity::kIdle;
+    }
+    view_.Show(state_);
+    const bool isGivenUp =
+        state_.activity == Activity::kWaiting && standstill >= limits_.unattended;
+    return state_.mayContinue && !isGivenUp;
+  }
+
+  const ConversionState& State() const { return state_; }
+
+ private:
+  ProgressView& view_;
+  const WatchLimits limits_;
+  ConversionObserver observer_;
+  ConversionState state_;
+  Standstill standstill_;
+};
+
 }  // namespace
 
-bool WatchProgress(std::ostream& out, bool isTerminal, bool asJson,
-                   std::chrono::milliseconds unattendedLimit) {
+bool WatchProgress(std::ostream& out, bool isTerminal, bool asJson, const WatchLimits& limits) {
   ProgressView view(out, isTerminal, asJson);
-  UnattendedQueue unattended(unattendedLimit);
-  ConversionState state = ReadConversionState();
-  view.Show(state);
-  while (state.mayContinue && !unattended.IsGivenUp(state) && out.good()) {
-    std::this_thread::sleep_for(std::min(kInterval, unattendedLimit));
-    state = ReadConversionState();
-    view.Show(state);
+  Watch watch(view, limits);
+  while (watch.Step() && out.good()) {
+    std::this_thread::sleep_for(std::min({kInterval, limits.unattended, limits.idle}));
   }
+  const ConversionState& state = watch.State();
   view.End(state);
-  return state.progress.HasWork() || state.activity == Activity::kWaiting;
+  return state.progress.HasWork() || state.deferred > 0 || state.activity == Activity::kWaiting;
 }
 
 }  // namespace vela

@@ -21,6 +21,15 @@ bool IsError(const Finding& finding) {
 
 }  // namespace
 
+std::string FirstErrorOfProfile(const std::string& path) {
+  for (const Finding& finding : CheckProfile(path).findings) {
+    if (IsError(finding) && finding.line != 0) {
+      return "line " + std::to_string(finding.line) + ": " + finding.message;
+    }
+  }
+  return {};
+}
+
 std::string ChooseProfileFile(const std::string& local, const std::string& installed) {
   return IsFileExist(local.c_str()) != 0 ? local : installed;
 }

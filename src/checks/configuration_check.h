@@ -15,6 +15,10 @@ CheckResult CheckSettings();
 /// Checks the profile file `path`, with the sizes that the settings ask for.
 CheckResult CheckProfile(const std::string& path);
 
+/// Returns where the profile file has its first error, and which: "line LINE: MESSAGE"; empty when
+/// it has none, or none in a line.
+std::string FirstErrorOfProfile(const std::string& path);
+
 /// Returns the profile file that is used unless another one is given: `local` if anything is there,
 /// even when it cannot be read, otherwise `installed`.
 std::string ChooseProfileFile(const std::string& local, const std::string& installed);

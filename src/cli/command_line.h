@@ -26,7 +26,7 @@ enum class ParseOutcome {
   kUsageError,  ///< usage error, reported on standard error
 };
 
-/// Exit status after a usage error, the same for all programs.
+/// Exit status after a usage error, of all programs that have no reason for another one.
 inline constexpr int kUsageError = 2;
 
 /// Returns the arguments that follow the name of the program.
@@ -45,17 +45,17 @@ ParseOutcome ParseCommandLine(
 void ReportException(const char* message) noexcept;
 
 /// The body of main: calls `parse` and, when that returns kRun, `run` with the options. Returns the
-/// exit status: that of `run`, 0 after help or version, kUsageError after a usage error,
+/// exit status: that of `run`, 0 after help or version, `usageStatus` after a usage error,
 /// `failureStatus` when `run` throws.
 template <typename Options, typename Run>
 int RunProgram(int argc, char** argv, ParseOutcome (*parse)(int, char**, Options&), const Run& run,
-               int failureStatus) noexcept {
-  int status = kUsageError;
+               int failureStatus, int usageStatus = kUsageError) noexcept {
+  int status = usageStatus;
   try {
     Options options;
     const ParseOutcome outcome = parse(argc, argv, options);
     if (outcome != ParseOutcome::kRun) {
-      return outcome == ParseOutcome::kDone ? 0 : kUsageError;
+      return outcome == ParseOutcome::kDone ? 0 : usageStatus;
     }
     status = failureStatus;
     return run(options);

@@ -42,9 +42,17 @@ class Arguments {
     return matches;
   }
 
+  /// Remembers an option that ends the parsing. Returns false.
+  bool Refuse(const std::string& option, const std::string& value) {
+    refused_ = option + " " + value;
+    return false;
+  }
+  const std::string& RefusedOption() const { return refused_; }
+
  private:
   const std::vector<std::string>& arguments_;
   size_t next_ = 0;
+  std::string refused_;
 };
 
 /// Collects the options of one output.
@@ -60,7 +68,7 @@ class OutputOptions {
       return AddStep(Step::Kind::kAutoOrient);
     }
     const std::string* const value = arguments.Take();
-    return value != nullptr && TakeValue(option, *value);
+    return value != nullptr && (TakeValue(option, *value) || arguments.Refuse(option, *value));
   }
 
   /// Returns the output; empty when a required option is missing.
@@ -215,8 +223,7 @@ bool SkipScratchDirectory(Arguments& arguments) {
 }
 
 /// Empty unless every argument is supported.
-std::optional<ConversionPlan> ParseConversion(const std::vector<std::string>& arguments) {
-  Arguments rest(arguments);
+std::optional<ConversionPlan> ParseConversion(Arguments& rest) {
   if (!SkipScratchDirectory(rest)) {
     return std::nullopt;
   }
@@ -302,10 +309,13 @@ std::string SourceFile(const std::string& argument) {
 
 CommandLine ParseCommandLine(std::vector<std::string> arguments) {
   CommandLine line;
+  Arguments rest(arguments);
   if (std::optional<TurnPlan> turn = ParseTurn(arguments)) {
     line.task = std::move(*turn);
-  } else if (std::optional<ConversionPlan> conversion = ParseConversion(arguments)) {
+  } else if (std::optional<ConversionPlan> conversion = ParseConversion(rest)) {
     line.task = std::move(*conversion);
+  } else {
+    line.unsupportedOption = rest.RefusedOption();
   }
   line.sourceIndex = FindSource(arguments);
   if (line.sourceIndex < arguments.size()) {

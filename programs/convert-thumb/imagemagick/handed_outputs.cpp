@@ -74,7 +74,21 @@ bool IsPlainOutput(const OutputArgument& parts) {
   return IsPlainName(parts.name) && (format.empty() || !CoderPrefix(format).empty());
 }
 
-bool HandUnknown(std::string& argument, HandedLine& handed) {
+/// Names what the administrator can change: an option, which a profile may contain, rather than the
+/// name of the output.
+void ReportRefusedName(const std::string& argument, const std::string& unsupportedOption) {
+  if (unsupportedOption.empty()) {
+    ReportFailure("%s: ImageMagick is not given this name in a directory that others can change",
+                  argument.c_str());
+  } else {
+    ReportFailure(
+        "the option %s is only known to ImageMagick, which is not given %s: others can "
+        "change its directory",
+        unsupportedOption.c_str(), argument.c_str());
+  }
+}
+
+bool HandUnknown(std::string& argument, const std::string& unsupportedOption, HandedLine& handed) {
   const OutputArgument parts = Split(argument);
   if (parts.name.empty() || argument.front() == '-') {
     return true;  // no file
@@ -90,8 +104,7 @@ bool HandUnknown(std::string& argument, HandedLine& handed) {
   const std::string prefix =
       parts.prefix.empty() ? CoderPrefix(std::string(ExtensionOf(path))) : parts.prefix;
   if (!IsPlainName(path) || prefix.empty()) {
-    ReportFailure("%s: ImageMagick is not given this name in a directory that others can change",
-                  argument.c_str());
+    ReportRefusedName(argument, unsupportedOption);
     return false;
   }
   return Hand(path, prefix, argument, handed);
@@ -108,7 +121,7 @@ bool HandOutputs(const CommandLine& line, HandedLine& handed) {
   }
   return std::all_of(line.outputIndices.begin(), line.outputIndices.end(), [&](size_t index) {
     const bool isReplaced = handed.arguments[index] != line.arguments[index];
-    return isReplaced || HandUnknown(handed.arguments[index], handed);
+    return isReplaced || HandUnknown(handed.arguments[index], line.unsupportedOption, handed);
   });
 }
 

@@ -1,6 +1,7 @@
 // The line that a failed run leaves in the system log.
 
 #include <sys/socket.h>
+#include <sys/stat.h>
 #include <sys/un.h>
 #include <unistd.h>
 
@@ -95,6 +96,38 @@ TEST_F(FailureLog, HasTheReasonThatImageMagickGives) {
   EXPECT_THAT(result.err, HasSubstr("improper image header"));
   EXPECT_EQ(ErrorLines(),
             Lines{"convert-thumb: /tmp/converter/a.bmp: ImageMagick: improper image header"});
+}
+
+TEST_F(FailureLog, NamesAnInvalidOptionOfTheProfileWhereOthersCanChangeTheFolder) {
+  const std::string photo = MakePhoto("a.jpg", 300, 200);
+  ThumbOptions options;
+  options.unsharp = "foo";
+  const std::string folder = directory_ + "/@eaDir/a.jpg";
+  const CommandLine line{photo, "", {{options, folder + "/VELAPHOTO_THUMB_S.jpg"}}};
+  MakeDirectories(folder);
+  for (const std::string& own : {directory_ + "/@eaDir", folder}) {
+    ASSERT_EQ(chmod(own.c_str(), 0755), 0);
+  }
+  // Where nobody else can interfere, ImageMagick says it.
+  EXPECT_THAT(RunConverter(line.Arguments()).err, HasSubstr("`-unsharp': foo"));
+  ASSERT_EQ(chmod(folder.c_str(), 0777), 0);
+  const std::string reason =
+      "the option -unsharp foo is only known to ImageMagick, which is not "
+      "given " +
+      folder + "/VELAPHOTO_THUMB_S.jpg: others can change its directory";
+  EXPECT_EQ(RunConverter(line.Arguments()).err, "convert-thumb: " + reason + "\n");
+  EXPECT_EQ(ErrorLines().back(), "convert-thumb: " + photo + ": " + reason);
+}
+
+TEST_F(FailureLog, NamesTheOutputWhenTheOptionsAreSupported) {
+  const std::string photo = MakePhoto("a.jpg", 300, 200);
+  const std::string folder = directory_ + "/@eaDir/a.jpg";
+  MakeDirectories(folder);
+  ASSERT_EQ(chmod(folder.c_str(), 0777), 0);
+  const std::string output = folder + "/a.jpg";
+  EXPECT_EQ(RunConverter({photo, output}).err,
+            "convert-thumb: " + output +
+                ": ImageMagick is not given this name in a directory that others can change\n");
 }
 
 TEST_F(FailureLog, SaysThatImageMagickIsMissing) {

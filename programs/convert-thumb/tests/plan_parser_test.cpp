@@ -123,6 +123,8 @@ TEST(PlanParser, RefusesUnknownOptions) {
     line.insert(line.end(), options.begin(), options.end());
     line.emplace_back("/o.jpg");
     EXPECT_FALSE(ParseConversion(line)) << options.front() << " " << options.back();
+    const std::string value = options.size() == 1 ? "/o.jpg" : options.back();
+    EXPECT_EQ(ParseCommandLine(line).unsupportedOption, options.front() + " " + value);
   }
   EXPECT_FALSE(ParseConversion({"-rotate", "90", "/a.jpg", "/a.jpg"}));
   EXPECT_FALSE(ParseConversion({}));

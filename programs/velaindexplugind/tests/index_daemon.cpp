@@ -39,9 +39,10 @@ ProgramResult RunDaemon(const std::vector<std::string>& arguments) {
   return RunProgram(IndexDaemonPath(), arguments);
 }
 
-std::string ExpectRefusal(const std::vector<std::string>& arguments, const std::string& text) {
+std::string ExpectRefusal(const std::vector<std::string>& arguments, const std::string& text,
+                          NoStart status) {
   const ProgramResult result = RunDaemon(arguments);
-  EXPECT_EQ(result.exitCode, 1);
+  EXPECT_EQ(result.exitCode, static_cast<int>(status));
   EXPECT_THAT(result.err, testing::HasSubstr(text));
   return result.err;
 }

@@ -34,9 +34,16 @@ std::string IndexDaemonPath();
 /// Runs the program to its end.
 ProgramResult RunDaemon(const std::vector<std::string>& arguments);
 
-/// Fails the test unless the daemon refuses to start with these arguments, with status 1 and a log
-/// that has the text. Returns the log.
-std::string ExpectRefusal(const std::vector<std::string>& arguments, const std::string& text);
+/// How the daemon ends when it cannot start.
+enum class NoStart {
+  kPassing = 1,    ///< systemd starts it again
+  kPermanent = 78  ///< systemd leaves it to an administrator
+};
+
+/// Fails the test unless the daemon refuses to start with these arguments, with this status and a
+/// log that has the text. Returns the log.
+std::string ExpectRefusal(const std::vector<std::string>& arguments, const std::string& text,
+                          NoStart status);
 
 /// A running daemon.
 class IndexDaemon {

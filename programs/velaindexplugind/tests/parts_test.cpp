@@ -2,6 +2,7 @@
 #include <gtest/gtest.h>
 #include <unistd.h>
 
+#include <cerrno>
 #include <chrono>
 #include <optional>
 #include <string>
@@ -11,6 +12,7 @@
 #include "request.h"
 #include "request_handler.h"
 #include "request_log.h"
+#include "start_problem.h"
 
 using namespace vela;
 
@@ -35,6 +37,28 @@ TEST(ParentOfTest, GoesUpToTheRootAndEnds) {
   EXPECT_EQ(ParentOf("/a/bc/d"), "/a/bc");
   EXPECT_EQ(ParentOf("/a"), "/");
   EXPECT_EQ(ParentOf("/"), "");
+}
+
+TEST(StartProblemTest, OnlyWhatMayPassIsTriedAgain) {
+  for (const int error : {ENOSPC, EDQUOT, EIO, ENOMEM, EMFILE, ENFILE, EAGAIN, EADDRINUSE}) {
+    EXPECT_FALSE(ProblemAt("/a", error).isPermanent) << error;
+  }
+  for (const int error : {EACCES, EPERM, ENOENT, ENOTDIR, EISDIR, ELOOP, EROFS, ENAMETOOLONG}) {
+    EXPECT_TRUE(ProblemAt("/a", error).isPermanent) << error;
+  }
+  EXPECT_EQ(ProblemAt("/a", ENOSPC).text, "/a: No space left on device");
+  EXPECT_TRUE(StartProblem().IsNone());
+}
+
+TEST(IndexResultTest, ADatabaseThatIsInUseOrFullMayBecomeUsable) {
+  for (const int code :
+       {SQLITE_BUSY, SQLITE_FULL, SQLITE_IOERR_READ, SQLITE_CANTOPEN, SQLITE_NOMEM, SQLITE_OK}) {
+    EXPECT_FALSE((IndexResult{code, ""}.IsUnusable())) << code;
+  }
+  for (const int code : {SQLITE_NOTADB, SQLITE_CORRUPT_INDEX, SQLITE_READONLY_DIRECTORY,
+                         SQLITE_PERM, kNewerTables}) {
+    EXPECT_TRUE((IndexResult{code, ""}.IsUnusable())) << code;
+  }
 }
 
 TEST(ParseWholeNumberTest, AcceptsDigitsOnly) {

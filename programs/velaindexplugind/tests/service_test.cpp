@@ -39,12 +39,12 @@ void ExpectCleanEnd(Program& program) {
 }
 
 /// Starts the daemon as a service manager with socket activation does.
-Program StartGiven(const Descriptor& given) {
+Program StartGiven(const Descriptor& given, const std::string& arguments = "",
+                   ProgramOptions options = ProgramOptions()) {
   const std::string number = std::to_string(given.Get());
-  ProgramOptions options;
   options.keptDescriptors = {given.Get()};
   const std::string script = "exec 3<&" + number + " " + (number == "3" ? "" : number + "<&-") +
-                             "; LISTEN_FDS=1 LISTEN_PID=$$ exec \"$0\"";
+                             "; LISTEN_FDS=1 LISTEN_PID=$$ exec \"$0\" " + arguments;
   return StartProgram("/bin/bash", {"-c", script, IndexDaemonPath()}, options);
 }
 
@@ -126,7 +126,7 @@ TEST_F(ServiceTest, SecondInstanceRefusesToStart) {
       {{"--database", "/tmp/other/index.db"},
        "another instance listens at /tmp/velaindexplugind_sock"}};
   for (const auto& [arguments, message] : cases) {
-    const std::string log = ExpectRefusal(arguments, message);
+    const std::string log = ExpectRefusal(arguments, message, NoStart::kPassing);
     EXPECT_EQ(std::count(log.begin(), log.end(), '\n'), 1);
     EXPECT_EQ(GetIndexVersion("/a"), 0);
   }
@@ -144,13 +144,13 @@ TEST_F(ServiceTest, SocketLeftByADeadInstanceIsReplaced) {
 
 TEST_F(ServiceTest, AnythingButASocketIsKept) {
   WriteFile(PluginDaemonSocketPath, "precious");
-  ExpectRefusal({}, "is not a socket");
+  ExpectRefusal({}, "is not a socket", NoStart::kPermanent);
   EXPECT_EQ(ReadFile(PluginDaemonSocketPath), "precious");
   RemoveTree(PluginDaemonSocketPath);
 
   // A link is not followed either.
   ASSERT_EQ(symlink("/tmp/elsewhere", PluginDaemonSocketPath), 0);
-  ExpectRefusal({}, "is not a socket");
+  ExpectRefusal({}, "is not a socket", NoStart::kPermanent);
   EXPECT_TRUE(Exists(PluginDaemonSocketPath));
 }
 
@@ -189,14 +189,14 @@ TEST_F(ServiceTest, RootReplacesAnythingOfAnotherUser) {
 
 TEST_F(ServiceTest, SocketOfAnotherListenerIsKept) {
   const Descriptor other = ListenAt(PluginDaemonSocketPath);
-  ExpectRefusal({}, "another instance listens at /tmp/velaindexplugind_sock");
+  ExpectRefusal({}, "another instance listens at /tmp/velaindexplugind_sock", NoStart::kPassing);
   EXPECT_TRUE(ConnectToDaemon().IsOpen());
 }
 
 TEST_F(ServiceTest, RefusesToStartWhileAnotherPreparesItsSocket) {
   const Descriptor lock(open("/run/velaindexplugind.lock", O_RDWR | O_CREAT | O_CLOEXEC, 0600));
   ASSERT_EQ(flock(lock.Get(), LOCK_EX | LOCK_NB), 0);
-  ExpectRefusal({}, "another instance listens at /tmp/velaindexplugind_sock");
+  ExpectRefusal({}, "another instance listens at /tmp/velaindexplugind_sock", NoStart::kPassing);
   EXPECT_FALSE(Exists(PluginDaemonSocketPath));
 }
 
@@ -318,8 +318,41 @@ TEST_F(ServiceTest, GroupCanBeChosen) {
 }
 
 TEST_F(ServiceTest, UnknownGroupIsAnError) {
-  ExpectRefusal({"--group", "no-such-group"}, "there is no group no-such-group");
+  ExpectRefusal({"--group", "no-such-group"}, "there is no group no-such-group",
+                NoStart::kPermanent);
   EXPECT_FALSE(Exists(PluginDaemonSocketPath));
+}
+
+TEST_F(ServiceTest, AGroupThatAServiceCannotGiveAwayIsNamedWithItsRemedy) {
+  if (!HasOtherUsers()) {
+    ExpectRefusal({"--group", "daemon"}, "Invalid argument", NoStart::kPassing);
+    return;
+  }
+  const Descriptor given = ListenAt(PluginDaemonSocketPath);
+  ProgramOptions options;
+  options.beforeExec = {DropCapabilities()};
+  Program program = StartGiven(given, "--group daemon", options);
+  EXPECT_EQ(GetIndexVersion("/a"), 0);
+  program.Kill(SIGTERM);
+  const std::string log = program.Wait()->err;
+  EXPECT_THAT(log, HasSubstr("level=warning event=socket path=/tmp/velaindexplugind_sock gid=1 "
+                             "error=\"it keeps the group that the service manager has given it\" "
+                             "advice=\"set SocketGroup= in its unit\"\n"));
+  for (const char* path : {"/var/lib/velaindex", kIndexDatabase}) {
+    EXPECT_THAT(log,
+                HasSubstr("level=warning event=database path=" + std::string(path) +
+                          " gid=1 error=\"Operation not permitted\" "
+                          "advice=\"a service without CAP_CHOWN needs Group= in its unit\"\n"));
+    EXPECT_EQ(StatusOf(path).st_gid, 0U);
+  }
+}
+
+TEST_F(ServiceTest, AnInheritedSocketWithTheGroupIsNotMentioned) {
+  const Descriptor given = ListenAt(PluginDaemonSocketPath);
+  Program program = StartGiven(given, "--group root");
+  EXPECT_EQ(GetIndexVersion("/a"), 0);
+  program.Kill(SIGTERM);
+  EXPECT_THAT(program.Wait()->err, Not(HasSubstr("level=warning")));
 }
 
 TEST_F(ServiceTest, UsesAnInheritedSocket) {

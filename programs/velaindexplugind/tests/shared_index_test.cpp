@@ -116,19 +116,20 @@ TEST_F(SharedIndexTest, OfANewerVersionIsNotUsed) {
     EXPECT_EQ(daemon.End(SIGTERM).exitCode, 0);
   }
   Query("UPDATE velaindexplugind_schema SET version = 2");
-  ExpectRefusal({}, "those of a newer velaindexplugind");
+  ExpectRefusal({}, "those of a newer velaindexplugind", NoStart::kPermanent);
   EXPECT_FALSE(Exists(PluginDaemonSocketPath));
   EXPECT_EQ(Query("SELECT version FROM velaindexplugind_schema"), Rows{"2"});
 }
 
 TEST_F(SharedIndexTest, ThatIsNotADatabaseKeepsTheDaemonFromStarting) {
   WriteFile(kIndexDatabase, std::string(8192, 'x'));
-  ExpectRefusal({}, "not a database");
+  ExpectRefusal({}, "not a database", NoStart::kPermanent);
   EXPECT_EQ(ReadFile(kIndexDatabase), std::string(8192, 'x'));
 }
 
 TEST_F(SharedIndexTest, ThatCannotBeCreatedKeepsTheDaemonFromStarting) {
-  ExpectRefusal({"--database", "/proc/none/index.db"}, "/proc/none/index.db");
+  ExpectRefusal({"--database", "/proc/none/index.db"}, "/proc/none/index.db", NoStart::kPermanent);
+  ExpectRefusal({"--database", "/tmp"}, "/tmp is not a file", NoStart::kPermanent);
 }
 
 TEST_F(SharedIndexTest, ThatIsRemovedIsCreatedAgain) {

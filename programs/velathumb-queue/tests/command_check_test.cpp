@@ -36,10 +36,10 @@ class CommandCheckTest : public QueueTest {
   /// The recording velathumb.
   std::string Recorder() const { return velathumb_.Arguments()[1]; }
 
-  /// Lets velathumb change the profile, runs the runner for two entries and expects the status for
-  /// a wrong configuration; both entries are left. Returns the messages.
+  /// Lets velathumb change the profile for the first of two entries, runs the runner for them and
+  /// expects the status for a wrong configuration; both entries are left. Returns the messages.
   std::string EndOfRun(const StubPlan& plan, const std::vector<std::string>& options = {}) {
-    velathumb_.Stub().PlanCall(1, plan);
+    velathumb_.Stub().PlanWhen("/tmp/a", plan);
     Enqueue({"/tmp/a", "/tmp/b"});
     const ProgramResult result = velathumb_.Run(options);
     EXPECT_EQ(result.exitCode, kMisconfigured);

@@ -134,9 +134,10 @@ TEST_F(VideoCheck, WithoutTheOptionNothingIsRemovedAndTheServiceIsNotQueried) {
   const std::vector<std::string> before = ListTree(kTop);
   RunStatus({"--recursive", "--photos", "--queue", "--progress", "--resume-time", kTop});
   RunStatus({"--recursive", "--photos", "--json", "--queue", "--progress", kTop});
-  RunStatus({"--watch"});
-  EXPECT_EQ(ListTree(kTop), before);
   EXPECT_EQ(Daemon().Connections(), 0U);
+  RunStatus({"--watch"});
+  EXPECT_THAT(Daemon().Commands(), Each("IS_DISABLE_CONVERT_PHOTO"));
+  EXPECT_EQ(ListTree(kTop), before);
 }
 
 TEST_F(VideoCheck, QueuedVideosAreNotCounted) {

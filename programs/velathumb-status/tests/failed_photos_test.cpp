@@ -1,8 +1,15 @@
 // The list of failed photos with their reasons.
 #include <sys/resource.h>
+#include <sys/stat.h>
 
+#include <algorithm>
 #include <csignal>
+#include <sstream>
+#include <thread>
+#include <utility>
 
+#include "failure_reason.h"
+#include "posix/landlock.h"
 #include "status_fixture.h"
 #include "support/images.h"
 #include "support/raw_photos.h"
@@ -60,6 +67,26 @@ class FailedPhotos : public StatusTest {
     return In(name) + ": " + reason + " (S, SM, M, B, L, XL since 2026-01-02 03:04)\n";
   }
 };
+
+/// The reasons of the photos that it takes.
+class ReasonsOf : public vela::StatusSink {
+ public:
+  void TakePhoto(const vela::PhotoReport& photo) override { list_.push_back(photo.reason); }
+  const std::vector<std::string>& List() const { return list_; }
+
+ private:
+  std::vector<std::string> list_;
+};
+
+/// The bitmap with another size in its header.
+std::string WithBitmapSize(std::string bitmap, uint32_t width, uint32_t height) {
+  constexpr size_t kSizeOffset = 18;
+  for (size_t i = 0; i < 4; ++i) {
+    bitmap[kSizeOffset + i] = static_cast<char>(width >> (8 * i));
+    bitmap[kSizeOffset + 4 + i] = static_cast<char>(height >> (8 * i));
+  }
+  return bitmap;
+}
 
 /// With the project's own converter; ImageMagick alone gives other reasons.
 class FailedForReal : public FailedPhotos {
@@ -119,6 +146,21 @@ TEST_F(FailedForReal, AreNeitherChangedNorLoggedNorIsAnythingLeftBehind) {
   EXPECT_THAT(Differences(before, RecordTree(kTop)), IsEmpty());
   EXPECT_EQ(ListDirectory("/tmp"), names);
   EXPECT_THAT(LogMessages(), IsEmpty());
+}
+
+TEST_F(FailedForReal, HaveTheErrorOfTheProfileAsReasonWhenNothingElseIsWrong) {
+  WriteFile(In("a.jpg"), ReadFile(MakeJpeg("/tmp/whole.jpg")));
+  MarkAll("a.jpg");
+  const std::string profile = "/etc/velathumb/thumb-profiles.conf";
+  const std::string begin = "[thumb_s]\nfilename = VELAPHOTO_THUMB_S.jpg\nsize = 120\n";
+  WriteFile(profile, begin + "unsharp = foo\n");
+  EXPECT_THAT(Reason(),
+              StartsWith("it can be converted, but not with the profile " + profile +
+                         ": line 4: unsharp is not RADIUSxSIGMA+AMOUNT+THRESHOLD, such as "
+                         "0x0.8+0.5+0.01: \"foo\""));
+  WriteFile(profile, begin + "unsharp = 0x0.8+0.5+0.01\n");
+  EXPECT_THAT(Reason(), StartsWith("it can be converted now: the cause is gone, or it is in the "
+                                   "profile"));
 }
 
 TEST_F(FailedForReal, OfLaterPhasesAreMadeFromTheLargestThumbnail) {
@@ -243,6 +285,204 @@ TEST_F(FailedPhotos, AreExaminedUpToALimit) {
   EXPECT_EQ(list[kExamined - 1]["reason"], "bad");
   EXPECT_EQ(list[kExamined]["reason"],
             "not examined: only the first 100 failed photos are, for 60 seconds");
+}
+
+TEST_F(FailedPhotos, AreExaminedForALimitedTime) {
+  const StubTool converter(kConverter);
+  converter.Plan(StubPlan().Sleep(1100).PrintError("bad\n").Exit(1));
+  ReasonsOf reasons;
+  vela::ReasonFinder finder(reasons, std::chrono::seconds(1));
+  vela::PhotoReport photo;
+  photo.failures[0] = kFailureTime;
+  for (const char* name : {"a.jpg", "b.jpg"}) {
+    MakeFailed(name);
+    photo.path = In(name);
+    finder.TakePhoto(photo);
+  }
+  EXPECT_THAT(reasons.List(),
+              ElementsAre("bad",
+                          "not examined: only the first 100 failed photos are, for 1 "
+                          "seconds"));
+  EXPECT_THAT(converter.Calls(), SizeIs(1));
+}
+
+TEST_F(FailedPhotos, AreNotExaminedWithoutAFailure) {
+  const StubTool converter(kConverter);
+  ReasonsOf reasons;
+  vela::ReasonFinder finder(reasons);
+  vela::PhotoReport photo;
+  photo.path = In("a.jpg");
+  finder.TakePhoto(photo);
+  EXPECT_THAT(reasons.List(), ElementsAre(""));
+  EXPECT_THAT(converter.Calls(), IsEmpty());
+}
+
+TEST_F(FailedPhotos, AreNotExaminedInADirectoryWhoseOwnerIsUnknown) {
+  const StubTool converter(kConverter);
+  WriteFile("/etc/velainfo.conf", "work_as_owner=\"yes\"\n");
+  vela::PhotoReport photo;
+  photo.path = "/tmp/removed/a.jpg";
+  EXPECT_EQ(vela::FindFailureReason(photo), "the owner of its directory is unknown");
+  EXPECT_THAT(converter.Calls(), IsEmpty());
+}
+
+TEST_F(FailedPhotos, AreTooLargeWhenTheyHaveMorePixelsThanTheSetting) {
+  RawRecipe recipe;
+  recipe.width = 64;
+  recipe.height = 48;
+  MakeRawPhoto(In("a.dng"), recipe);
+  MarkAll("a.dng");
+  const StubTool converter(kConverter);
+  converter.Plan(StubPlan().PrintError("bad\n").Exit(1));
+  WriteFile("/etc/velainfo.conf", "raw_pixel_limit=\"3071\"\n");
+  EXPECT_EQ(Reason(), "the raw photo is larger than raw_pixel_limit allows");
+  WriteFile("/etc/velainfo.conf", "raw_pixel_limit=\"3072\"\n");
+  EXPECT_EQ(Reason(), "bad");
+}
+
+TEST_F(FailedPhotos, HaveFilesIfTheyHaveMoreThanAboutSixteenMegapixels) {
+  const StubTool converter(kConverter);
+  const std::string small = ReadFile(MakeImage("/tmp/small.bmp", 8, 8));
+  for (const auto& [height, hasFiles] : {std::pair(3840, false), std::pair(4096, true)}) {
+    MakeFailed("a.bmp", WithBitmapSize(small, 4096, height));
+    Reason();
+    EXPECT_EQ(LastScratchDirectory(converter) != "/dev/null", hasFiles) << height;
+  }
+}
+
+/// The attempts of a converter that a photo has taken over, in one line.
+constexpr char kHostileConverter[] = R"(#!/bin/sh
+did=
+for file in /tmp/photos/new /tmp/photos/@eaDir/a.jpg/new /tmp/new /var/spool/new /etc/new; do
+  { true >"$file"; } 2>/dev/null && did="$did wrote $file"
+done
+for file in /tmp/photos/a.jpg /tmp/photos/b.jpg /tmp/private/secret /etc/passwd; do
+  text=
+  { read -r text <"$file" || [ -n "$text" ]; } 2>/dev/null && did="$did read $file"
+done
+echo "did:$did" >&2
+exit 1
+)";
+
+void InstallConverter(const std::string& script) {
+  RemoveTree(kConverter);
+  WriteFile(kConverter, script);
+  ASSERT_EQ(chmod(kConverter, 0755), 0);
+}
+
+TEST_F(FailedPhotos, AreReadByAConverterThatCanReadNothingElseAndWriteNothing) {
+  MakeFailed("a.jpg");
+  WriteFile(In("b.jpg"), "other");
+  WriteFile("/tmp/private/secret", "secret");
+  InstallConverter(kHostileConverter);
+  EXPECT_EQ(Reason(), vela::LandlockVersion() > 0
+                          ? "did: read /tmp/photos/a.jpg"
+                          : "did: wrote /tmp/photos/new wrote /tmp/photos/@eaDir/a.jpg/new wrote "
+                            "/tmp/new wrote /var/spool/new wrote /etc/new read /tmp/photos/a.jpg "
+                            "read /tmp/photos/b.jpg read /tmp/private/secret read /etc/passwd");
+}
+
+/// The lines of /proc/PID/status with these keys, without white space.
+std::vector<std::string> StatusLines(const std::string& process,
+                                     const std::vector<std::string>& keys) {
+  std::vector<std::string> found;
+  std::istringstream in(ReadFile("/proc/" + process + "/status"));
+  for (std::string line; std::getline(in, line);) {
+    line.erase(std::remove(line.begin(), line.end(), '\t'), line.end());
+    for (const std::string& key : keys) {
+      if (line.compare(0, key.size() + 1, key + ":") == 0) {
+        found.push_back(line);
+      }
+    }
+  }
+  return found;
+}
+
+/// The child of the process that has this name, once it is there.
+std::string AwaitChild(pid_t parent, const std::string& name) {
+  const std::string own = std::to_string(parent);
+  for (int i = 0; i < 2000; ++i) {
+    std::istringstream children(ReadFile("/proc/" + own + "/task/" + own + "/children"));
+    for (std::string child; children >> child;) {
+      if (ReadFile("/proc/" + child + "/comm") == name + "\n") {
+        return child;
+      }
+    }
+    std::this_thread::sleep_for(std::chrono::milliseconds(10));
+  }
+  ADD_FAILURE() << "no " << name;
+  return "self";
+}
+
+TEST_F(FailedPhotos, AreReadByAConverterWithoutPrivilegesLikeThatOfAnOrdinaryRun) {
+  MakeFailed("a.jpg");
+  InstallConverter("#!/bin/sh\nwhile :; do :; done\n");
+  Program status = StartProgram(StatusProgramPath(), {"--failed", kTop});
+  const std::string converter = AwaitChild(status.Pid(), "convert-thumb");
+  EXPECT_THAT(StatusLines(converter, {"NoNewPrivs", "Seccomp", "CapEff", "CapBnd"}),
+              ElementsAre("CapEff:0000000000000006", "CapBnd:0000000000000006", "NoNewPrivs:1",
+                          "Seccomp:2"));
+  kill(std::stoi(converter), SIGKILL);
+  EXPECT_THAT(status.Wait()->out, HasSubstr("has ended without a message"));
+}
+
+/// A file name that attacks a terminal, a script or a reader of JSON.
+struct HostileName {
+  const char* name;
+  const char* shown;   ///< in text
+  const char* base64;  ///< of the path; empty for valid UTF-8
+};
+
+constexpr HostileName kHostileNames[] = {
+    {"a\nb.jpg", "a\\nb.jpg", ""},
+    {"a\x1b]0;title\x07.jpg", "a\\x1b]0;title\\x07.jpg", ""},
+    {"a\x1b[2J\r.jpg", "a\\x1b[2J\\x0d.jpg", ""},
+    // The control sequence introducer of one byte, and as a character.
+    {"a\x9b[2J.jpg", "a\\x9b[2J.jpg", "L3RtcC9waG90b3MvYZtbMkouanBn"},
+    {"a\u009b[2J.jpg", "a\\xc2\\x9b[2J.jpg", ""},
+    // The rest from right to left.
+    {"a\u202egpj.jpg", "a\\xe2\\x80\\xaegpj.jpg", ""},
+    {"a\xff\xc3.jpg", "a\xff\xc3.jpg", "L3RtcC9waG90b3MvYf/DLmpwZw=="},
+    {"a\\n.jpg", "a\\\\n.jpg", ""},
+    {"a\"},{\"path\":\"x.jpg", "a\"},{\"path\":\"x.jpg", ""},
+    {"-0 $(touch x).jpg", "-0 $(touch x).jpg", ""},
+};
+
+TEST_F(FailedPhotos, WithHostileNamesAreOneLineEachWithoutControlCharacters) {
+  const StubTool converter(kConverter);
+  converter.Plan(StubPlan().PrintError("bad\n").Exit(1));
+  for (const auto& [name, shown, base64] : kHostileNames) {
+    SCOPED_TRACE(shown);
+    RemoveTree(kTop);
+    MakeFailed(name);
+    EXPECT_EQ(List({kTop}).out, In(shown) + ": bad (S, SM, M, B, L, XL since 2026-01-02 03:04)\n");
+  }
+}
+
+TEST_F(FailedPhotos, WithHostileNamesAreOneValidObjectEachInJson) {
+  const StubTool converter(kConverter);
+  converter.Plan(StubPlan().PrintError("bad\n").Exit(1));
+  for (const auto& [name, shown, base64] : kHostileNames) {
+    SCOPED_TRACE(shown);
+    RemoveTree(kTop);
+    MakeFailed(name);
+    // Checks that all of it is valid UTF-8 and strict JSON.
+    const Json::Value list = QueryJson({"--failed", kTop})["failed"];
+    ASSERT_EQ(list.size(), 1U);
+    EXPECT_EQ(list[0]["reason"], "bad");
+    const bool isText = std::string(base64).empty();
+    EXPECT_EQ(list[0].isMember("path_base64"), !isText);
+    EXPECT_EQ(list[0][isText ? "path" : "path_base64"], isText ? In(name) : base64);
+  }
+}
+
+TEST_F(FailedPhotos, WithHostileNamesAreUnchangedBetweenNullBytes) {
+  for (const auto& [name, shown, base64] : kHostileNames) {
+    SCOPED_TRACE(shown);
+    RemoveTree(kTop);
+    MakeFailed(name);
+    EXPECT_EQ(List({"-0", kTop}).out, In(name) + '\0');
+  }
 }
 
 }  // namespace

@@ -8,7 +8,9 @@
 #include "posix/file_lock.h"
 #include "progress/velamk_progress.h"
 #include "progress_watch.h"
+#include "running_conversion.h"
 #include "status_fixture.h"
+#include "support/daemon_peer.h"
 
 namespace vela_test {
 namespace {
@@ -20,6 +22,18 @@ constexpr const char* kSettings = "/etc/velainfo.conf";
 constexpr const char* kDonePhotos = "/var/spool/thumb_create.queue.done";
 constexpr const char* kRunnerLock = "/var/run/velathumb-queue.lock";
 constexpr const char* kWaiting = "the queue has entries, waiting for velathumb-queue\n";
+
+constexpr const char* kSwitch = "IS_DISABLE_CONVERT_PHOTO";
+constexpr const char* kSwitchedOff =
+    "conversion is paused: the index service has switched it off\n";
+
+DaemonReply SwitchedOff(bool isOff) {
+  return DaemonReply::Line(isOff ? R"({"success":true,"result":true})"
+                                 : R"({"success":true,"result":false})");
+}
+
+/// An unattended queue is given up soon.
+constexpr vela::WatchLimits kSoon = {milliseconds(50), std::chrono::seconds(60)};
 
 class WatchingTheQueue : public SandboxTest {
  protected:
@@ -93,8 +107,16 @@ TEST_F(WatchingTheQueue, EndsWhenAnotherSpellingOfTheEntryIsDone) {
 TEST_F(WatchingTheQueue, EndsWhenOnlyDeferredEntriesAreLeft) {
   WriteFile(kDeferredPhotos, "/tmp/a\n");
   WriteFile(kPhotoQueue, "\n\n");
-  Program watch = Start();
-  EXPECT_THAT(EndOf(watch), EndsWith("no velathumb is running\n"));
+  const ProgramResult one = RunStatus({"--watch"});
+  EXPECT_EQ(one.exitCode, 1);
+  EXPECT_THAT(one.out, EndsWith("no velathumb is running\n1 entry is deferred to a later run; "
+                                "velathumb-status --queue lists them\n"));
+  WriteFile(kDeferredPhotos, "/tmp/a\n\nR:/tmp/b\n");
+  EXPECT_THAT(RunStatus({"--watch"}).out,
+              EndsWith("2 entries are deferred to a later run; velathumb-status --queue lists "
+                       "them\n"));
+  ExpectMembers(ReadJson(RunStatus({"--watch", "--json"}).out),
+                R"({"activity": "ended", "deferred_entries": 2, "paused_by": null})");
 }
 
 TEST_F(WatchingTheQueue, ShowsAPauseInsteadOfTheCountersOfAnEarlierRun) {
@@ -123,17 +145,103 @@ TEST_F(WatchingTheQueue, ShowsAPauseWhileEntriesAreQueued) {
                                      "conversion is paused indefinitely (resume time -1)\n"));
 }
 
+TEST_F(WatchingTheQueue, ShowsThatTheIndexServiceHasSwitchedConversionOff) {
+  AddConvProgress(THUMB_TYPE_PHOTO, "total_thumb", 8);
+  AddConvProgress(THUMB_TYPE_PHOTO, "completed_thumb", 8);
+  DaemonPeer daemon;
+  daemon.Answer(kSwitch, SwitchedOff(true));
+  vela::FileDescriptor lock = vela::TakeProcessLock(kRunnerLock, false);
+  Program watch = Start();
+  Program json = Start({"--watch", "--json"});
+  ASSERT_TRUE(WaitForOutput(watch, "\n"));
+  ASSERT_TRUE(WaitForOutput(json, "\n"));
+  EXPECT_EQ(watch.Output(), kSwitchedOff);
+  ExpectMembers(ReadJson(json.Output()),
+                R"({"activity": "paused", "paused_by": "index_service", "resume_time": null,
+                    "seconds_until_resume": null})");
+  daemon.Answer(kSwitch, SwitchedOff(false));
+  ASSERT_TRUE(WaitForOutput(watch, "] 100%  8 of 8 thumbnails"));
+  ASSERT_TRUE(WaitForOutput(json, "\"activity\":\"running\""));
+  daemon.Answer(kSwitch, SwitchedOff(true));
+  ASSERT_TRUE(WaitForOutput(watch, std::string("\n") + kSwitchedOff));
+  lock.Reset();
+  EXPECT_THAT(EndOf(watch), EndsWith(std::string("no velathumb is running\n") + kSwitchedOff));
+  EXPECT_THAT(EndOf(json), HasSubstr("\"paused_by\":null"));
+}
+
+TEST_F(WatchingTheQueue, ShowsThatConversionIsSwitchedOffWhileEntriesAreQueued) {
+  DaemonPeer daemon;
+  daemon.Answer(kSwitch, SwitchedOff(true));
+  WriteFile(kPhotoQueue, "/tmp/a\n");
+  Program watch = Start();
+  ASSERT_TRUE(WaitForOutput(watch, kSwitchedOff));
+  daemon.Answer(kSwitch, SwitchedOff(false));
+  ASSERT_TRUE(WaitForOutput(watch, kWaiting));
+  RemoveTree(kPhotoQueue);
+  EXPECT_THAT(EndOf(watch), EndsWith("no velathumb is running\n"));
+}
+
+TEST_F(WatchingTheQueue, ShowsTheProgressOfAVelathumbThatContinuesAlthoughConversionIsOff) {
+  DaemonPeer daemon;
+  AddConvProgress(THUMB_TYPE_PHOTO, "total_thumb", 4);
+  AddConvProgress(THUMB_TYPE_PHOTO, "completed_thumb", 1);
+  RunningConversion conversion;
+  daemon.Answer(kSwitch, SwitchedOff(true));
+  Program watch = Start({"--watch", "--json"});
+  ASSERT_TRUE(WaitForOutput(watch, "\n"));
+  ExpectMembers(ReadJson(watch.Output()), R"({"activity": "running", "paused_by": null})");
+  conversion.Finish();
+  EndOf(watch);
+}
+
+TEST_F(WatchingTheQueue, DoesNotWaitLongForADaemonThatDoesNotAnswer) {
+  DaemonPeer daemon;
+  daemon.Answer(kSwitch, DaemonReply::Silence());
+  vela::FileDescriptor lock = vela::TakeProcessLock(kRunnerLock, false);
+  Program watch = Start();
+  ExpectToFollow(watch);
+  EXPECT_EQ(daemon.Requests().size(), 1U);
+  lock.Reset();
+  EXPECT_THAT(EndOf(watch), EndsWith("no velathumb is running\n"));
+}
+
+TEST_F(WatchingTheQueue, ShowsThatARunnerHasNothingToDo) {
+  AddConvProgress(THUMB_TYPE_PHOTO, "total_thumb", 8);
+  AddConvProgress(THUMB_TYPE_PHOTO, "completed_thumb", 8);
+  vela::FileDescriptor lock = vela::TakeProcessLock(kRunnerLock, false);
+  Program watch = Start();
+  ASSERT_TRUE(WaitForOutput(watch, "8 of 8 thumbnails\nvelathumb-queue is waiting for entries\n"));
+  AddConvProgress(THUMB_TYPE_PHOTO, "total_thumb", 8);
+  ASSERT_TRUE(WaitForOutput(watch, "]  50%  8 of 16 thumbnails"));
+  lock.Reset();
+  EndOf(watch);
+}
+
+TEST_F(WatchingTheQueue, ShowsThatARunnerHasStartedNoVelathumbForItsEntries) {
+  WriteFile(kPhotosInProgress, "/tmp/a\n");
+  vela::FileDescriptor lock = vela::TakeProcessLock(kRunnerLock, false);
+  Program watch = Start();
+  Program json = Start({"--watch", "--json"});
+  EXPECT_TRUE(WaitForOutput(watch,
+                            "\nvelathumb-queue is running, but no velathumb: it counts "
+                            "photos, or directories are locked\n"));
+  EXPECT_TRUE(WaitForOutput(json, "\"activity\":\"idle\""));
+  lock.Reset();
+  RemoveTree(kPhotosInProgress);
+  EndOf(watch);
+}
+
 TEST_F(WatchingTheQueue, EndsWhenNothingProcessesTheQueue) {
   WriteFile(kPhotoQueue, "/tmp/a\n");
   std::ostringstream out;
-  EXPECT_TRUE(vela::WatchProgress(out, false, false, milliseconds(50)));
+  EXPECT_TRUE(vela::WatchProgress(out, false, false, kSoon));
   EXPECT_THAT(
       out.str(),
       AllOf(StartsWith(kWaiting),
             EndsWith("no velathumb is running\nthe queue has entries, but nothing processes "
                      "them; velathumb-queue would\n")));
   std::ostringstream json;
-  EXPECT_TRUE(vela::WatchProgress(json, false, true, milliseconds(50)));
+  EXPECT_TRUE(vela::WatchProgress(json, false, true, kSoon));
   EXPECT_EQ(ReadJson(json.str())["activity"], Json::Value("waiting"));
 }
 

@@ -169,10 +169,10 @@ TEST_F(Watching, JsonIsOneObjectALine) {
   std::vector<Json::Value> moments;
   for (const std::string& line : LinesOf(result->out)) {
     moments.push_back(ReadJson(line));
-    EXPECT_THAT(
-        moments.back().getMemberNames(),
-        UnorderedElementsAre("photo", "thumb", "video", "instances", "activity", "unit", "rate",
-                             "seconds_left", "resume_time", "seconds_until_resume"));
+    EXPECT_THAT(moments.back().getMemberNames(),
+                UnorderedElementsAre("photo", "thumb", "video", "instances", "activity", "unit",
+                                     "rate", "seconds_left", "resume_time", "seconds_until_resume",
+                                     "paused_by", "deferred_entries"));
     EXPECT_EQ(moments.back()["unit"], Json::Value("thumbnails"));
   }
   ASSERT_GE(moments.size(), 3U);
