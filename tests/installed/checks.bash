@@ -92,12 +92,14 @@ has_state() { # UNIT STATE
   [[ $(property "$1" ActiveState) == "$2" ]]
 }
 
-# Prints a file of a unit's control group, in whichever hierarchy it is; nothing if there is none.
-control_group_file() { # UNIT NAME...
-  local group name
-  group=$(property "$1" ControlGroup)
+# Prints the first of these files of a control group, in whichever hierarchy it is; nothing if there is
+# none.
+control_group_file() { # GROUP NAME...
+  local name hierarchy
   for name in "${@:2}"; do
-    cat /sys/fs/cgroup{,/unified,/memory,/pids}"$group/$name" 2>/dev/null && return
+    for hierarchy in '' /unified /memory /pids; do
+      cat "/sys/fs/cgroup$hierarchy$1/$name" 2>/dev/null && return
+    done
   done
 }
 
