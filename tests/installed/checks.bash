@@ -84,6 +84,10 @@ journal_has() { # UNIT TEXT
   grep -qF -- "$2" < <(journal -u "$1")
 }
 
+has_reached() { # TARGET
+  grep -qF "Reached target $1" < <(journal)
+}
+
 property() { # UNIT NAME
   systemctl show -p "$2" --value "$1"
 }
