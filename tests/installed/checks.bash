@@ -45,20 +45,32 @@ within_a_second() { # WHAT COMMAND [ARGUMENT]...
   local start=${EPOCHREALTIME/./} took
   "${@:2}" || fails "$1 failed"
   took=$((${EPOCHREALTIME/./} - start))
-  printf '    %s took %d ms\n' "$1" $((took / 1000))
+  note "$1 took $((took / 1000)) ms"
   ((took < 1000000)) || fails "$1 took a second or more"
 }
 
+note() { # TEXT
+  printf '    %s\n' "$1"
+}
+
+# Prints the case's name, time and outcome on a line, and after it what the case has printed.
 run_case() { # NAME
-  local before=$failures start=$SECONDS
-  printf '%s\n' "${1//_/ }"
+  local before=$failures start=${EPOCHREALTIME/./} log=/run/case.log took
+  printf '%-45s' "${1//_/ }"
   JOURNAL_START=$(journalctl -n 0 --show-cursor | sed -n 's/^-- cursor: //p')
-  "$1"
+  "$1" >"$log" 2>&1
+  took=$(((${EPOCHREALTIME/./} - start) / 100000))
+  printf '%4d.%d s  %s\n' $((took / 10)) $((took % 10)) \
+    "$( ((failures > before)) && echo FAILED || echo ok)"
+  cat "$log"
   if ((failures > before)); then
-    printf '    the journal meanwhile:\n'
-    journal -u 'vela*' -u "$RUNNER" -u "$DAEMON" | tail -n 40 | sed 's/^/      /'
+    show_journal
   fi
-  printf '    %d s\n' $((SECONDS - start))
+}
+
+show_journal() {
+  printf '    the journal of the services meanwhile:\n'
+  journal -u 'vela*' | tail -n 60 | sed 's/^/      /'
 }
 
 # --- services -------------------------------------------------------------------------------------
@@ -72,6 +84,10 @@ journal_has() { # UNIT TEXT
   grep -qF -- "$2" < <(journal -u "$1")
 }
 
+has_reached() { # TARGET
+  grep -qF "Reached target $1" < <(journal)
+}
+
 property() { # UNIT NAME
   systemctl show -p "$2" --value "$1"
 }
@@ -80,8 +96,19 @@ has_state() { # UNIT STATE
   [[ $(property "$1" ActiveState) == "$2" ]]
 }
 
+# Prints the first of these files of a control group, in whichever hierarchy it is; nothing if there is
+# none.
+control_group_file() { # GROUP NAME...
+  local name hierarchy
+  for name in "${@:2}"; do
+    for hierarchy in '' /unified /memory /pids; do
+      cat "/sys/fs/cgroup$hierarchy$1/$name" 2>/dev/null && return
+    done
+  done
+}
+
 # Prints the names of the processes of the services and of their tools.
-processes_left() {
+processes() {
   cat /proc/[0-9]*/comm 2>/dev/null | grep -E '^(vela|convert|dcraw|header-reader)' || true
 }
 
@@ -126,6 +153,11 @@ incomplete_photos() { # DIRECTORY
   find "$1" -type f ! -path '*/@eaDir/*' | while IFS= read -r photo; do
     (($(thumbs "${photo%/*}/@eaDir/${photo##*/}") == ${#SIZES[@]})) || echo "$photo"
   done
+}
+
+# Prints the owners and modes that the metadata directories and thumbnails of a tree have, each once.
+modes_of_metadata() { # DIRECTORY
+  find "$1" -path '*/@eaDir*' -printf '%y %u %m\n' | sort -u
 }
 
 # Fails unless all photos of a directory have all thumbnails and nothing else is beside them.

@@ -1,6 +1,7 @@
 // make_photos DIRECTORY
 //
 // Makes one photo of each kind that thumbnails are made of.
+#include <array>
 #include <cstdio>
 #include <filesystem>
 #include <string>
@@ -15,6 +16,11 @@ using namespace vela_test;
 /// Larger than every thumbnail, so that each has exactly its size.
 constexpr int kWidth = 1800;
 constexpr int kHeight = 1350;
+
+/// Every extension of raw photos that the index knows, besides dng and nef.
+constexpr std::array kOtherRawKinds = {"3fr", "arw", "cr2", "crw", "dcr", "erf", "k25",
+                                       "kdc", "mef", "mos", "mrw", "orf", "pef", "ptx",
+                                       "raf", "raw", "rw2", "sr2", "srf", "srw", "x3f"};
 
 JpegRecipe Jpeg() {
   JpegRecipe recipe;
@@ -42,9 +48,13 @@ void MakePhotos(const std::string& folder) {
   for (const char* name : {"scan.tiff", "screen.bmp", "web.webp", "phone.heic", "layers.psd"}) {
     MakeImage(folder + "/" + name, kWidth, kHeight);
   }
-  std::filesystem::copy_file(folder + "/phone.heic", folder + "/phone.heif");
+  // Of the same container with the other codec.
+  MakeImage("avif:" + folder + "/phone.heif", kWidth, kHeight);
   MakeRawPhoto(folder + "/negative.dng", raw);
   MakeRawPhoto(folder + "/negative.NEF", rawWithPreview);
+  for (const char* kind : kOtherRawKinds) {
+    MakeRawPhoto(folder + "/raw photos/negative." + kind, raw);
+  }
 }
 
 }  // namespace
