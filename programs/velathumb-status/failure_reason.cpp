@@ -168,11 +168,15 @@ std::string ReasonOfRaw(const std::string& photo, const std::string& scratch) {
                                            : ReasonOfDcraw(photo);
 }
 
-/// Returns the largest thumbnail that is present, empty without one.
+/// Returns the largest thumbnail that is present, empty without one that is larger than all that
+/// have failed.
 std::string FindLargestThumb(const PhotoReport& photo) {
   std::string largest;
   for (const EA_THUMB_SIZE size : kThumbSizesSmallestFirst) {
     const EAThumbInfo& row = rgEAThumbInfo[size];
+    if (photo.failures[static_cast<size_t>(size)].has_value()) {
+      largest.clear();
+    }
     char thumb[PATH_MAX] = "";
     if (photo.thumbs.states[static_cast<size_t>(size)] == ThumbState::kPresent &&
         GetEAFilePath(photo.path.c_str(), row.name, row.oldName, thumb, sizeof thumb) == 0) {
@@ -226,9 +230,11 @@ std::string FindFailureReason(const PhotoReport& photo) {
 }
 
 std::string ReasonFinder::Find(const PhotoReport& photo) {
-  if (photos_ >= kMostPhotos || time_ >= longest_) {
-    return "not examined: only the first " + std::to_string(kMostPhotos) + " failed photos are, " +
-           "for " + std::to_string(longest_.count()) + " seconds";
+  if (photos_ >= limits_.photos || time_ >= limits_.time) {
+    const auto seconds = std::chrono::duration_cast<std::chrono::seconds>(limits_.time);
+    return "not examined: only the first " + std::to_string(limits_.photos) +
+           " failed photos are, for " + std::to_string(seconds.count()) +
+           " seconds; --failed examines all";
   }
   ++photos_;
   const auto begin = std::chrono::steady_clock::now();

@@ -2,6 +2,7 @@
 #pragma once
 
 #include <chrono>
+#include <limits>
 #include <string>
 
 #include "status_report.h"
@@ -9,20 +10,27 @@
 namespace vela {
 
 /// Tries to convert a photo, confined as in velathumb, and discards the result. Uses the photo's
-/// largest thumbnail instead if there is one: the others are made from it. Nothing is changed; what
-/// a raw or a large photo needs files for is in a private directory in /tmp for the time. Returns
-/// the reason of the failure in one line of unchecked text, or a line that says that there is none.
+/// largest thumbnail instead if it is larger than those that have failed: they are made from it.
+/// Nothing is changed; what a raw or a large photo needs files for is in a private directory in
+/// /tmp for the time. Returns the reason of the failure in one line of unchecked text, or a line
+/// that says that there is none.
 std::string FindFailureReason(const PhotoReport& photo);
+
+/// When ReasonFinder stops examining photos.
+struct ReasonLimits {
+  int photos;                                ///< after so many
+  std::chrono::steady_clock::duration time;  ///< after so long
+};
+
+constexpr ReasonLimits kNoReasonLimits{std::numeric_limits<int>::max(),
+                                       std::chrono::steady_clock::duration::max()};
+/// For a page that is about all photos and may be made often.
+constexpr ReasonLimits kPageReasonLimits{100, std::chrono::seconds(60)};
 
 /// Adds the reasons to failed photos on their way to another sink.
 class ReasonFinder : public StatusSink {
  public:
-  /// No photo is examined after so many, or after so long.
-  static constexpr int kMostPhotos = 100;
-  static constexpr std::chrono::seconds kLongest{60};
-
-  explicit ReasonFinder(StatusSink& next, std::chrono::seconds longest = kLongest)
-      : next_(next), longest_(longest) {}
+  ReasonFinder(StatusSink& next, const ReasonLimits& limits) : next_(next), limits_(limits) {}
 
   void BeginDirectory() override { next_.BeginDirectory(); }
   void TakePhoto(const PhotoReport& photo) override;
@@ -33,7 +41,7 @@ class ReasonFinder : public StatusSink {
   std::string Find(const PhotoReport& photo);
 
   StatusSink& next_;
-  const std::chrono::seconds longest_;
+  const ReasonLimits limits_;
   int photos_ = 0;
   std::chrono::steady_clock::duration time_{};
 };

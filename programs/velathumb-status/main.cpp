@@ -157,7 +157,7 @@ void StatusRun::Scan(HtmlPage* page) {
   if (page != nullptr) {
     sinks.Append(page);
   }
-  ReasonFinder finder(sinks);
+  ReasonFinder finder(sinks, options_.failed ? kNoReasonLimits : kPageReasonLimits);
   const bool findsReasons = page != nullptr || (options_.failed && !options_.nulTerminated);
   ScanStatus(options_.directories, {options_.recursive, options_.checkVideos},
              findsReasons ? static_cast<StatusSink&>(finder) : sinks, ErrorHandler());

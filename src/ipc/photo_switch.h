@@ -1,4 +1,4 @@
-// The plugin daemon's switch for the conversion of photos, for programs that cannot wait long.
+// The index daemon's switch for the conversion of photos, for programs that cannot wait long.
 #pragma once
 
 #include <chrono>

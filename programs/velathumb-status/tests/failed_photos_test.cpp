@@ -174,6 +174,15 @@ TEST_F(FailedForReal, OfLaterPhasesAreMadeFromTheLargestThumbnail) {
                                   "(S, M since 2026-01-02 03:04)\n");
 }
 
+TEST_F(FailedForReal, OfASizeAboveTheThumbnailsAreMadeFromThePhoto) {
+  WriteFile(In("a.jpg"), "no photo");
+  SetFileTime(In("a.jpg"), kFailureTime);
+  WriteFile(Derived("a.jpg", "VELAPHOTO_THUMB_S.jpg"), ReadFile(MakeJpeg("/tmp/whole.jpg")));
+  Mark("a.jpg", "XL");
+  EXPECT_EQ(List({kTop}).out,
+            In("a.jpg") + ": not a photo in a known format (XL since 2026-01-02 03:04)\n");
+}
+
 TEST_F(FailedPhotos, AreThoseOfTheWorkingDirectoryByDefault) {
   MakeFailed("a.jpg");
   ProgramOptions options;
@@ -273,7 +282,7 @@ TEST_F(FailedPhotos, AreEscapedWhateverTheReason) {
   EXPECT_EQ(page.find('\x1b'), std::string::npos);
 }
 
-TEST_F(FailedPhotos, AreExaminedUpToALimit) {
+TEST_F(FailedPhotos, AreAllExaminedForTheListAndSomeForThePage) {
   const StubTool converter(kConverter);
   converter.Plan(StubPlan().PrintError("bad\n").Exit(1));
   constexpr int kExamined = 100;
@@ -282,16 +291,22 @@ TEST_F(FailedPhotos, AreExaminedUpToALimit) {
   }
   const Json::Value list = QueryJson({"--failed", kTop})["failed"];
   ASSERT_EQ(list.size(), 101U);
-  EXPECT_EQ(list[kExamined - 1]["reason"], "bad");
-  EXPECT_EQ(list[kExamined]["reason"],
-            "not examined: only the first 100 failed photos are, for 60 seconds");
+  EXPECT_EQ(list[kExamined]["reason"], "bad");
+
+  RunStatus({"--html", "/tmp/status.html", kTop});
+  const std::string page = ReadFile("/tmp/status.html");
+  const std::string limited =
+      "Reason: not examined: only the first 100 failed photos are, for 60 seconds; --failed "
+      "examines all<";
+  EXPECT_THAT(page, HasSubstr(limited));
+  EXPECT_EQ(page.find(limited), page.rfind(limited));
 }
 
 TEST_F(FailedPhotos, AreExaminedForALimitedTime) {
   const StubTool converter(kConverter);
   converter.Plan(StubPlan().Sleep(1100).PrintError("bad\n").Exit(1));
   ReasonsOf reasons;
-  vela::ReasonFinder finder(reasons, std::chrono::seconds(1));
+  vela::ReasonFinder finder(reasons, {100, std::chrono::seconds(1)});
   vela::PhotoReport photo;
   photo.failures[0] = kFailureTime;
   for (const char* name : {"a.jpg", "b.jpg"}) {
@@ -302,14 +317,14 @@ TEST_F(FailedPhotos, AreExaminedForALimitedTime) {
   EXPECT_THAT(reasons.List(),
               ElementsAre("bad",
                           "not examined: only the first 100 failed photos are, for 1 "
-                          "seconds"));
+                          "seconds; --failed examines all"));
   EXPECT_THAT(converter.Calls(), SizeIs(1));
 }
 
 TEST_F(FailedPhotos, AreNotExaminedWithoutAFailure) {
   const StubTool converter(kConverter);
   ReasonsOf reasons;
-  vela::ReasonFinder finder(reasons);
+  vela::ReasonFinder finder(reasons, vela::kNoReasonLimits);
   vela::PhotoReport photo;
   photo.path = In("a.jpg");
   finder.TakePhoto(photo);
