@@ -133,9 +133,10 @@ TEST_F(ThumbContent, FirstPageOnly) {
 
 TEST_F(ThumbContent, LayeredPsdAsAWhole) {
   const std::string photo = InPhotos("layers.psd");
-  // The first picture is the one that shows all layers together; the others are the layers.
-  MakeImage("/tmp/whole.png", 240, 160);
-  Draw({"/tmp/whole.png", "(", "-size", "240x160", "xc:grey", ")", "(", "-size", "90x90",
+  // The first picture is the one that shows all layers together; the others are the layers. If it
+  // had a palette, as a PNG of few colours has, ImageMagick 7 would draw another one instead of it.
+  MakePpm("/tmp/whole.ppm", 240, 160);
+  Draw({"/tmp/whole.ppm", "(", "-size", "240x160", "xc:grey", ")", "(", "-size", "90x90",
         "xc:black", ")", "-type", "TrueColor", photo});
   MakeAll();
   ExpectQuadrants(photo);

@@ -12,6 +12,7 @@
 #include "decoding/vips_traits.h"
 #include "decoding/webp_frame.h"
 #include "picture/picture.h"
+#include "platform/installed_names.h"
 
 namespace vela {
 
@@ -21,6 +22,9 @@ namespace {
 constexpr int kStripRows = 16;
 constexpr Background kWhite = {kBrightest, kBrightest, kBrightest};
 constexpr char kInterlaced[] = "interlaced";
+/// Later versions of ImageMagick let the library of the format convert to RGB, with opacity, and so
+/// does libvips.
+constexpr bool kReadsHeifAsLumaChroma = kImageMagickVersion <= 6;
 
 VipsImage* Load(const VipsLibrary& vips, VipsSource* source, PhotoFormat format) {
   VipsImage* image = nullptr;
@@ -177,7 +181,7 @@ struct VipsReader::State {
     return frame != WebpFrame::kUnsupported && (HasOpacity(*image) || !traits.transparent);
   }
 
-  /// Opacity is ignored. The file stores brightness and colour differences, which ImageMagick
+  /// Opacity is ignored. The file stores brightness and colour differences, which ImageMagick 6
   /// converts to RGB before other steps only if there is a colour profile.
   void ChooseHeifChange() {
     if (traits.colourProfile.empty()) {
@@ -189,7 +193,7 @@ struct VipsReader::State {
   }
 
   void ChooseChange() {
-    if (file.format == PhotoFormat::kHeif) {
+    if (file.format == PhotoFormat::kHeif && kReadsHeifAsLumaChroma) {
       ChooseHeifChange();
     } else if (image->Type == VIPS_INTERPRETATION_CMYK) {
       change = RowChange::kInvert;

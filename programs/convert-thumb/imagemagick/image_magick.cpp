@@ -81,6 +81,10 @@ bool Finish(const HandedLine& handed, const ChildEnd& end) {
     return true;
   }
   RemoveHandedOutputs(handed);
+  if (end.wasIdle) {
+    ReportFailure("ImageMagick did nothing for %d seconds", kMostIdleSeconds);
+    return false;
+  }
   // A stopped run says nothing about the photo.
   if (!end.succeeded && !end.wasStopped) {
     LogFailureOf(end);

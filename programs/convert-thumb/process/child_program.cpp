@@ -2,6 +2,7 @@
 
 #include <fcntl.h>
 #include <sys/prctl.h>
+#include <sys/time.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
@@ -10,12 +11,14 @@
 #include <csignal>
 #include <cstdio>
 #include <cstring>
+#include <ctime>
 #include <optional>
 #include <utility>
 
 #include "posix/file_content.h"
 #include "posix/file_descriptor.h"
 #include "process/failure_report.h"
+#include "process/idle_time.h"
 #include "process/write_signals.h"
 
 namespace vela {
@@ -32,6 +35,11 @@ constexpr size_t kMostErrors = 65536;
 
 volatile pid_t g_child = 0;
 volatile std::sig_atomic_t g_isStopped = 0;
+
+/// The processor time of the child; set before the first look at it.
+clockid_t g_childClock = 0;
+IdleTime g_childIdleTime;
+volatile std::sig_atomic_t g_isIdle = 0;
 
 /// Two ends of a pipe.
 struct Pipe {
@@ -89,6 +97,40 @@ void ForwardSignals() {
   }
 }
 
+/// Called every second.
+void LookAtChild(int) {
+  const int error = errno;
+  timespec used = {};
+  if (clock_gettime(g_childClock, &used) == 0 &&
+      g_childIdleTime.Update(used.tv_sec, used.tv_nsec) >= kMostIdleSeconds) {
+    g_isIdle = 1;
+    kill(g_child, SIGKILL);
+  }
+  errno = error;
+}
+
+void SetTimer(time_t seconds) {
+  const itimerval timer = {{seconds, 0}, {seconds, 0}};
+  setitimer(ITIMER_REAL, &timer, nullptr);
+}
+
+/// Kills the child when it stops working: without memory, ImageMagick 7 waits for its own lock
+/// forever. It is a signal that looks at the child, because there may be no memory for a thread.
+void WatchChild() {
+  if (clock_getcpuclockid(g_child, &g_childClock) != 0) {
+    return;
+  }
+  struct sigaction action = {};
+  action.sa_handler = LookAtChild;
+  action.sa_flags = SA_RESTART;
+  sigaction(SIGALRM, &action, nullptr);
+  sigset_t alarm;
+  sigemptyset(&alarm);
+  sigaddset(&alarm, SIGALRM);
+  sigprocmask(SIG_UNBLOCK, &alarm, nullptr);
+  SetTimer(1);
+}
+
 [[noreturn]] void Execute(const std::vector<const char*>& programs, char* const* arguments,
                           pid_t parent, const sigset_t& mask, const FileDescriptor& errors) {
   prctl(PR_SET_PDEATHSIG, SIGKILL);
@@ -109,8 +151,9 @@ void ForwardSignals() {
   end.succeeded = WIFEXITED(waitStatus) && WEXITSTATUS(waitStatus) == 0;
   end.signal = WIFSIGNALED(waitStatus) ? WTERMSIG(waitStatus) : 0;
   end.wasStopped = g_isStopped != 0;
+  end.wasIdle = g_isIdle != 0;
   end.errors = std::move(errors);
-  if (!finish(end) && end.succeeded) {
+  if (!finish(end) && (end.succeeded || end.wasIdle)) {
     PrintFailure();
     _exit(kFailed);
   }
@@ -136,6 +179,11 @@ void ResetChildSignal() {
 
 /// Returns the wait status of the child; empty, with errno set, when it cannot be determined.
 std::optional<int> WaitForExit(pid_t child) {
+  siginfo_t end;
+  // Only its process id is not reused yet.
+  while (waitid(P_PID, static_cast<id_t>(child), &end, WEXITED | WNOWAIT) < 0 && errno == EINTR) {
+  }
+  SetTimer(0);
   int status = 0;
   while (waitpid(child, &status, 0) < 0) {
     if (errno != EINTR) {
@@ -180,6 +228,7 @@ void RunInChildAndExit(const std::vector<const char*>& programs, char* const* ar
   errors.writer.Reset();
   // Standard error may be broken, and the outputs must be removed nevertheless.
   IgnoreWriteSignals();
+  WatchChild();
   std::string messages = PassErrorsOn(errors.reader);
   if (const std::optional<int> status = WaitForExit(child)) {
     ExitAs(*status, std::move(messages), finish);

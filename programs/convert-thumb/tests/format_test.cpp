@@ -3,6 +3,7 @@
 #include <sys/stat.h>
 
 #include "converter_fixture.h"
+#include "png_chunks.h"
 #include "support/build_paths.h"
 #include "support/missing_library.h"
 #include "support/stub_tool.h"
@@ -23,6 +24,15 @@ class Formats : public ConverterTest {
                  double leastMean = 48) const {
     SCOPED_TRACE(name);
     ExpectOwnPictures(MakePicture(name, kWidth, kHeight, options), UsualOutputs(), leastMean);
+  }
+
+  /// Makes a PNG with an exponent of the brightness, in 100,000ths, and no other chunk about
+  /// colours than those in `others`.
+  std::string MakePngWithGamma(uint32_t exponent, const std::string& others = "") const {
+    const std::string path =
+        MakePicture("a.png", 300, 200, {"-depth", "8", "-define", "png:exclude-chunk=all"});
+    AddToPng(path, others + PngGamma(exponent));
+    return path;
   }
 
   /// The dynamic linker's log of a conversion of the picture.
@@ -77,6 +87,18 @@ TEST_F(Formats, PngOfGreys) {
               45);
     EXPECT_EQ(DecodeJpeg(directory_ + "/ours0.jpg")->Components(), 1) << depth;
   }
+}
+
+TEST_F(Formats, PngOfEveryGamma) {
+  const std::string standard = PngChunk("sRGB", std::string(1, '\0'));
+  for (const uint32_t exponent : {30000U, 45455U, 74000U, 76000U, 100000U}) {
+    SCOPED_TRACE(exponent);
+    ExpectSamePictures(MakePngWithGamma(exponent), UsualOutputs(), 48);
+    // The other chunk says that the exponent is 0.45455; which of them counts depends on the
+    // library.
+    ExpectSamePictures(MakePngWithGamma(exponent, standard), UsualOutputs(), 48);
+  }
+  ExpectOwnPictures(MakePngWithGamma(74000), UsualOutputs(), 48);
 }
 
 TEST_F(Formats, TiffOfEveryCompression) {
@@ -184,7 +206,7 @@ TEST_F(Formats, HandsOverFilesThatItReadsDifferently) {
   ExpectHandedOver(MakePicture("a.bmp", 300, 200), outputs);
   ExpectHandedOver(MakePicture("lab.tif", 300, 200, {"-colorspace", "Lab"}), outputs);
   ExpectHandedOver(MakePicture("ycc.tif", 300, 200, {"-colorspace", "YCbCr"}), outputs);
-  ExpectHandedOver(MakePicture("linear.png", 300, 200, {"-set", "gamma", "1"}), outputs);
+  ExpectHandedOver(MakePngWithGamma(100000), outputs);
   ExpectHandedOver(MakePicture("part.gif", 300, 200, {"-repage", "400x300+10+10"}), outputs);
   ExpectHandedOver(MakePicture("plain.ppm", 300, 200, {"-compress", "none"}), outputs);
   const std::string map = directory_ + "/odd.pgm";
@@ -251,7 +273,7 @@ TEST_F(Formats, DamagedTiffIsNotReportedByItsLibrary) {
 }
 
 TEST_F(Formats, LibvipsLeavesTheEnvironmentToImageMagick) {
-  const std::string source = MakePicture("linear.png", 300, 200, {"-set", "gamma", "1"});
+  const std::string source = MakePngWithGamma(100000);
   // The converter can run only ImageMagick, so a shell has to take its place.
   RemoveTool(kImageMagick);
   CopyFile("/bin/sh", kImageMagick);

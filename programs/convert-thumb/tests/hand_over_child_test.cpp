@@ -3,6 +3,7 @@
 #include <csignal>
 
 #include "converter_fixture.h"
+#include "process/idle_time.h"
 #include "support/stub_files.h"
 #include "support/stub_tool.h"
 #include "support/system_log.h"
@@ -84,6 +85,35 @@ TEST_F(HandOverToChild, PassesSignalsOn) {
     EXPECT_FALSE(Exists(ProcessDirectory(child))) << signal;
   }
   EXPECT_THAT(LogMessages(), IsEmpty()) << "the photo has not failed";
+}
+
+TEST_F(HandOverToChild, EndsAChildThatStopsWorking) {
+  const StubTool stub(kImageMagick);
+  stub.Plan(EndlessWork());
+  const ProgramResult result = RunConverter(arguments_, Recorded());
+  EXPECT_EQ(result.exitCode, 1);
+  EXPECT_EQ(result.err, "convert-thumb: ImageMagick did nothing for 60 seconds\n");
+  EXPECT_THAT(ErrorLines(),
+              ElementsAre("convert-thumb: /a.jpg: ImageMagick did nothing for 60 seconds"));
+  EXPECT_FALSE(Exists(arguments_.back()));
+  EXPECT_FALSE(Exists(ProcessDirectory(stub.Calls().front().pid)));
+}
+
+TEST(IdleTime, CountsLooksWithoutWork) {
+  vela::IdleTime idle;
+  EXPECT_EQ(idle.Update(0, 0), 0);
+  EXPECT_EQ(idle.Update(0, 0), 1);
+  EXPECT_EQ(idle.Update(0, 0), 2);
+}
+
+TEST(IdleTime, EndsWithAnyWork) {
+  vela::IdleTime idle;
+  idle.Update(7, 500);
+  idle.Update(7, 500);
+  EXPECT_EQ(idle.Update(7, 501), 0);
+  EXPECT_EQ(idle.Update(7, 501), 1);
+  EXPECT_EQ(idle.Update(8, 501), 0);
+  EXPECT_EQ(idle.Update(8, 501), 1);
 }
 
 TEST_F(HandOverToChild, LogsTheSignalThatEndedIt) {

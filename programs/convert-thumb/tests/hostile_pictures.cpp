@@ -1,26 +1,18 @@
 #include "hostile_pictures.h"
 
-#include <array>
 #include <utility>
 #include <vector>
+
+#include "png_chunks.h"
 
 namespace vela_test {
 namespace {
 
 constexpr unsigned kByteBits = 8;
 
-/// `count` bytes of a number, big-endian.
-std::string Big(uint64_t number, unsigned count) {
-  std::string bytes;
-  for (unsigned i = count; i > 0; --i) {
-    bytes += static_cast<char>(number >> ((i - 1) * kByteBits) & 0xFF);
-  }
-  return bytes;
-}
-
-/// The same, little-endian.
+/// `count` bytes of a number, little-endian.
 std::string Little(uint64_t number, unsigned count) {
-  const std::string big = Big(number, count);
+  const std::string big = BigEndian(number, count);
   return {big.rbegin(), big.rend()};
 }
 
@@ -28,34 +20,9 @@ std::string Zeros(size_t count) {
   return std::string(count, '\0');
 }
 
-std::array<uint32_t, 256> CrcTable() {
-  std::array<uint32_t, 256> table = {};
-  for (uint32_t i = 0; i < table.size(); ++i) {
-    uint32_t value = i;
-    for (unsigned bit = 0; bit < kByteBits; ++bit) {
-      value = (value & 1) != 0 ? 0xEDB88320U ^ (value >> 1) : value >> 1;
-    }
-    table[i] = value;
-  }
-  return table;
-}
-
-uint32_t Crc(const std::string& bytes) {
-  static const std::array<uint32_t, 256> table = CrcTable();
-  uint32_t crc = 0xFFFFFFFFU;
-  for (const char byte : bytes) {
-    crc = table[(crc ^ static_cast<unsigned char>(byte)) & 0xFF] ^ (crc >> kByteBits);
-  }
-  return crc ^ 0xFFFFFFFFU;
-}
-
-std::string PngChunk(const std::string& name, const std::string& data) {
-  return Big(data.size(), 4) + name + data + Big(Crc(name + data), 4);
-}
-
 std::string Png(uint32_t width, uint32_t height, const std::string& data) {
   const std::string rgb("\x08\x02\0\0\0", 5);
-  return "\x89PNG\r\n\x1a\n" + PngChunk("IHDR", Big(width, 4) + Big(height, 4) + rgb) +
+  return "\x89PNG\r\n\x1a\n" + PngChunk("IHDR", BigEndian(width, 4) + BigEndian(height, 4) + rgb) +
          PngChunk("IDAT", data) + PngChunk("IEND", "");
 }
 
@@ -109,7 +76,7 @@ std::string CompressedZeros(uint64_t count) {
     bits.Add(kZero, 8);
   }
   bits.Add(0, 7);
-  return "\x78\x9c" + bits.Take() + Big(count % kChecksumBase << 16 | 1, 4);
+  return "\x78\x9c" + bits.Take() + BigEndian(count % kChecksumBase << 16 | 1, 4);
 }
 
 struct TiffEntry {
@@ -154,11 +121,12 @@ std::string ClaimingJpeg(uint32_t width, uint32_t height) {
   const std::string frame("\xFF\xC0\0\x0B\x08", 5);
   const std::string component("\x01\x01\x11\0", 4);
   // One code of one bit: a block equal to the previous one.
-  const std::string codes = "\xFF\xC4" + Big(20, 2);
+  const std::string codes = "\xFF\xC4" + BigEndian(20, 2);
   const std::string lengths = "\x01" + Zeros(15);
   const std::string scan("\xFF\xDA\0\x08\x01\x01\0\0\x3F\0", 10);
-  return start + std::string(64, '\x01') + frame + Big(height, 2) + Big(width, 2) + component +
-         codes + Zeros(1) + lengths + Zeros(1) + codes + "\x10" + lengths + Zeros(1) + scan;
+  return start + std::string(64, '\x01') + frame + BigEndian(height, 2) + BigEndian(width, 2) +
+         component + codes + Zeros(1) + lengths + Zeros(1) + codes + "\x10" + lengths + Zeros(1) +
+         scan;
 }
 
 std::string ClaimingPng(uint32_t width, uint32_t height) {
@@ -194,8 +162,8 @@ std::string ClaimingBmp(uint32_t width, uint32_t height) {
 }
 
 std::string ClaimingPsd(uint32_t width, uint32_t height) {
-  return "8BPS" + Big(1, 2) + Zeros(6) + Big(3, 2) + Big(height, 4) + Big(width, 4) + Big(8, 2) +
-         Big(3, 2) + Zeros(14) + Zeros(1000);
+  return "8BPS" + BigEndian(1, 2) + Zeros(6) + BigEndian(3, 2) + BigEndian(height, 4) +
+         BigEndian(width, 4) + BigEndian(8, 2) + BigEndian(3, 2) + Zeros(14) + Zeros(1000);
 }
 
 std::string BlackPng(uint32_t width, uint32_t height) {

@@ -17,6 +17,7 @@ enum class LikenessException {
 struct KnownDifference {
   LikenessException kind = LikenessException::kNone;
   std::string why;
+  double leastDecibels = 0;  ///< kOtherPicture: how similar the pictures are nevertheless
 };
 
 /// The known difference of an input (its format and description) with a vector.

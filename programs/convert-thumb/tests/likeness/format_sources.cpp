@@ -50,9 +50,7 @@ void AddPngAlpha(std::vector<LikenessSource>& sources) {
 void AddPngChunks(std::vector<LikenessSource>& sources) {
   sources.push_back(Png("interlaced", Written({"-depth", "8", "-interlace", "Plane"})));
   sources.push_back(Png("wide RGB profile", WrittenWithProfile({"-depth", "8"}, WideRgbProfile)));
-  sources.push_back(
-      Png("gamma 0.6", Written({"-depth", "8", "-define", "png:exclude-chunk=sRGB,cHRM", "-gamma",
-                                "1", "-set", "gamma", "0.6"})));
+  sources.push_back(Png("gamma 0.6", WithGamma(60000)));
   sources.push_back(Png("gamma and primaries",
                         Written({"-depth", "8", "-define", "png:include-chunk=gAMA,cHRM"})));
   sources.push_back(

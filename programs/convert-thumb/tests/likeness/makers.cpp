@@ -4,6 +4,7 @@
 #include <utility>
 
 #include "converter_fixture.h"
+#include "png_chunks.h"
 #include "support/environment_failure.h"
 #include "support/files.h"
 #include "support/program.h"
@@ -51,6 +52,13 @@ FileMaker WrittenWithProfile(std::vector<std::string> options, std::string (*pro
     words.insert(words.end(), {"-profile", profile});
     const PhotoSize size;
     Write(MakePhotoSamples(size.width, size.height), words, path);
+  };
+}
+
+FileMaker WithGamma(uint32_t exponent) {
+  return [exponent](const std::string& path) {
+    Written({"-depth", "8", "-define", "png:exclude-chunk=all"})(path);
+    AddToPng(path, PngGamma(exponent));
   };
 }
 

@@ -2,6 +2,7 @@
 #pragma once
 
 #include <cstddef>
+#include <cstdint>
 #include <functional>
 #include <string>
 #include <vector>
@@ -25,6 +26,9 @@ FileMaker WrittenWithAlpha(std::vector<std::string> options, PhotoSize size = {}
 
 /// The same with a colour profile embedded, as profileOf() returns it.
 FileMaker WrittenWithProfile(std::vector<std::string> options, std::string (*profileOf)());
+
+/// The photo as a PNG that declares this exponent of the brightness, in 100,000ths.
+FileMaker WithGamma(uint32_t exponent);
 
 /// The photo as a PPM, also of sizes that ImageMagick rejects.
 FileMaker Raw(PhotoSize size);
