@@ -109,7 +109,7 @@ TEST_F(FailureLog, NamesAnInvalidOptionOfTheProfileWhereOthersCanChangeTheFolder
     ASSERT_EQ(chmod(own.c_str(), 0755), 0);
   }
   // Where nobody else can interfere, ImageMagick says it.
-  EXPECT_THAT(RunConverter(line.Arguments()).err, HasSubstr("`-unsharp': foo"));
+  EXPECT_THAT(RunConverter(line.Arguments()).err, HasSubstr("-unsharp': foo"));
   ASSERT_EQ(chmod(folder.c_str(), 0777), 0);
   const std::string reason =
       "the option -unsharp foo is only known to ImageMagick, which is not "
