@@ -57,7 +57,8 @@ StartProblem Evict(const std::string& path, uid_t owner) {
   if (unlink(path.c_str()) == 0 || errno == ENOENT) {
     return {};
   }
-  if (errno == EISDIR && MoveAside(path)) {
+  // The owner may have removed the directory meanwhile.
+  if (errno == EISDIR && (MoveAside(path) || errno == ENOENT)) {
     return {};
   }
   return ProblemAt(path, errno);

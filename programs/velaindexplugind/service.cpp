@@ -3,6 +3,7 @@
 #include <sysexits.h>
 #include <systemd/sd-daemon.h>
 
+#include <cerrno>
 #include <chrono>
 #include <cstdint>
 #include <cstdlib>
@@ -128,7 +129,13 @@ StartProblem Service::FindOptionsGroup() {
     return {};
   }
   group_ = FindGroup(options_.group);
-  return group_ ? StartProblem() : StartProblem{"there is no group " + options_.group, true};
+  if (group_) {
+    return {};
+  }
+  const int error = errno;
+  return error == 0 ? StartProblem{"there is no group " + options_.group, true}
+                    : StartProblem{"cannot look up the group " + options_.group + ": " +
+                                   std::strerror(error)};
 }
 
 StartProblem Service::OpenIndex() {

@@ -19,6 +19,8 @@ std::optional<gid_t> FindGroup(const std::string& name) {
     error = getgrnam_r(name.c_str(), &entry, text.data(), text.size(), &found);
   }
   if (found == nullptr) {
+    // Some name services say in this way that the name is unknown.
+    errno = error == ENOENT || error == ESRCH ? 0 : error;
     return std::nullopt;
   }
   return entry.gr_gid;

@@ -8,7 +8,8 @@
 
 namespace vela {
 
-/// Returns the id of the group `name`, nothing when there is no such group.
+/// Returns the id of the group `name`, nothing with errno 0 when there is no such group, or with
+/// another errno value when that cannot be found out.
 std::optional<gid_t> FindGroup(const std::string& name);
 
 /// Returns the name of the user, or the number in decimal when the user has none. Not thread-safe.

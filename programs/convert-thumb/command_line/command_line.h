@@ -21,8 +21,8 @@ struct CommandLine {
   /// A conversion or a turn only if every single argument is supported.
   std::variant<UnknownTask, ConversionPlan, TurnPlan> task;
 
-  /// The first option of an unknown task that is not supported, with its value, such as
-  /// "-unsharp foo"; empty when something else is the reason.
+  /// The first option of an unknown task that is not supported, with the argument after
+  /// it, such as "-unsharp foo"; empty when something else is the reason.
   std::string unsupportedOption;
 
   /// Index of the argument that names the source; arguments.size() if there is none. Set for an

@@ -151,7 +151,7 @@ void WatchChild() {
   end.succeeded = WIFEXITED(waitStatus) && WEXITSTATUS(waitStatus) == 0;
   end.signal = WIFSIGNALED(waitStatus) ? WTERMSIG(waitStatus) : 0;
   end.wasStopped = g_isStopped != 0;
-  end.wasIdle = g_isIdle != 0;
+  end.wasIdle = g_isIdle != 0 && !end.wasStopped;
   end.errors = std::move(errors);
   if (!finish(end) && (end.succeeded || end.wasIdle)) {
     PrintFailure();

@@ -11,8 +11,8 @@ namespace vela {
 /// on failure, with errno set.
 void ReplaceProcess(const char* program, char* const* arguments);
 
-/// A disk that has to start, or a server that is slow, takes less.
-constexpr int kMostIdleSeconds = 60;
+/// A disk that has to start, or a file server that is replaced by another, takes less.
+constexpr int kMostIdleSeconds = 180;
 
 /// How a child has ended.
 struct ChildEnd {

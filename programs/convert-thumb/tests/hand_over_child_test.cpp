@@ -1,6 +1,10 @@
 // ImageMagick in a child, where it is not installed under the converter's name.
 
+#include <chrono>
 #include <csignal>
+#include <cstdlib>
+#include <optional>
+#include <thread>
 
 #include "converter_fixture.h"
 #include "process/idle_time.h"
@@ -35,6 +39,24 @@ class HandOverToChild : public ConverterTest {
   }
 
   static std::string ProcessDirectory(pid_t pid) { return "/proc/" + std::to_string(pid); }
+
+  /// Waits until the process has a handler of the signal; returns whether it has.
+  static bool WaitUntilCaught(pid_t pid, int signal) {
+    constexpr char kCaught[] = "\nSigCgt:\t";
+    for (int i = 0; i < 1000; ++i) {
+      const std::string status = ReadFile(ProcessDirectory(pid) + "/status");
+      const size_t caught = status.find(kCaught);
+      if (caught == std::string::npos) {
+        return false;
+      }
+      const char* const mask = status.c_str() + caught + sizeof kCaught - 1;
+      if ((std::strtoull(mask, nullptr, 16) >> (signal - 1) & 1) != 0) {
+        return true;
+      }
+      std::this_thread::sleep_for(std::chrono::milliseconds(10));
+    }
+    return false;
+  }
 };
 
 TEST_F(HandOverToChild, KeepsTheProcessAndItsName) {
@@ -90,11 +112,19 @@ TEST_F(HandOverToChild, PassesSignalsOn) {
 TEST_F(HandOverToChild, EndsAChildThatStopsWorking) {
   const StubTool stub(kImageMagick);
   stub.Plan(EndlessWork());
-  const ProgramResult result = RunConverter(arguments_, Recorded());
-  EXPECT_EQ(result.exitCode, 1);
-  EXPECT_EQ(result.err, "convert-thumb: ImageMagick did nothing for 60 seconds\n");
+  Program program = Start();
+  ASSERT_TRUE(WaitUntilCaught(program.Pid(), SIGALRM));
+  // Each signal is a look at the child; otherwise there is one every second.
+  std::optional<ProgramResult> result;
+  for (int looks = 0; looks < 10000 && !result; ++looks) {
+    program.Kill(SIGALRM);
+    result = program.Wait(std::chrono::milliseconds(2));
+  }
+  ASSERT_TRUE(result);
+  EXPECT_EQ(result->exitCode, 1);
+  EXPECT_EQ(result->err, "convert-thumb: ImageMagick did nothing for 180 seconds\n");
   EXPECT_THAT(ErrorLines(),
-              ElementsAre("convert-thumb: /a.jpg: ImageMagick did nothing for 60 seconds"));
+              ElementsAre("convert-thumb: /a.jpg: ImageMagick did nothing for 180 seconds"));
   EXPECT_FALSE(Exists(arguments_.back()));
   EXPECT_FALSE(Exists(ProcessDirectory(stub.Calls().front().pid)));
 }
